@@ -1,0 +1,2 @@
+corvista_test(framework LABELS threads SOURCES
+  framework/strings_test.cpp)
