@@ -1,7 +1,11 @@
 # The plug-in: every room in one shared library that exports OpenMI and the processor builder, nothing else.
 get_property(rooms GLOBAL PROPERTY CORVISTA_ROOMS)
-add_library(vantrelcvicoshwmi SHARED)
-target_link_libraries(vantrelcvicoshwmi PRIVATE ${rooms} corvista_framework)
+set(objects)
+foreach(room ${rooms})
+  list(APPEND objects $<TARGET_OBJECTS:${room}>)
+endforeach()
+add_library(vantrelcvicoshwmi SHARED ${objects})
+target_link_libraries(vantrelcvicoshwmi PRIVATE corvista_framework)
 target_link_options(vantrelcvicoshwmi PRIVATE
   -Wl,--version-script=${CMAKE_SOURCE_DIR}/mi/plugin.map -Wl,--no-undefined -Wl,--as-needed)
 set_target_properties(vantrelcvicoshwmi PROPERTIES
@@ -10,3 +14,8 @@ if(CORVISTA_SANITIZE)
   target_link_options(vantrelcvicoshwmi PRIVATE -Wl,--undefined-version -Wl,-z,undefs)
 endif()
 install(TARGETS vantrelcvicoshwmi LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR} NAMELINK_SKIP)
+
+# The same code for the tests, which reach below OpenMI.
+add_library(plugin_code STATIC EXCLUDE_FROM_ALL ${objects})
+target_link_libraries(plugin_code PUBLIC corvista_framework)
+set_target_properties(plugin_code PROPERTIES LINKER_LANGUAGE CXX)

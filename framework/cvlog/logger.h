@@ -28,13 +28,13 @@ public:
     virtual void write(const LogRecord& record) = 0;
 };
 
-/// The agent's logger. A line goes to a sink when its level is at least the sink's threshold; with both sinks off a
-/// call costs two comparisons. Never throws; any thread.
+/// The agent's logger. A line goes to a sink when its level is at least the sink's threshold; with both sinks
+/// off a call costs two comparisons. Never throws; any thread.
 class CORVISTA_API CVLogger {
 public:
-    static void logLevelMessage(const char* function, const char* source, int line, const std::string& component,
-                                int level, char* reserved1, int reserved2, int reserved3,
-                                const std::string& message) noexcept;
+    static void logLevelMessage(const char* function, const char* source, int line,
+                                const std::string& component, int level, char* reserved1, int reserved2,
+                                int reserved3, const std::string& message) noexcept;
     static void traceLevelMessage(const char* function, const char* source, int line,
                                   const std::string& component, int level, char* reserved1, int reserved2,
                                   int reserved3, const std::string& message) noexcept;
@@ -45,8 +45,8 @@ public:
     static void setTrace(LogSink* sink, int threshold);
 };
 
-/// A sink that appends lines to a file descriptor: time, thread, level, component, source:line, function, message;
-/// a line break inside a message is written as "\n" so that a record stays one line.
+/// A sink that appends lines to a file descriptor: time, thread, level, component, source:line, function,
+/// message; a line break inside a message is written as "\n" so that a record stays one line.
 class CORVISTA_API DescriptorSink : public LogSink {
 public:
     explicit DescriptorSink(int descriptor) : descriptor_(descriptor) {}

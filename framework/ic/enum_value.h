@@ -16,6 +16,8 @@ private:
     unsigned int code_ = 0;
 };
 
-inline std::ostream& operator<<(std::ostream& out, const EnumValue& value) { return out << value.code(); }
+inline std::ostream& operator<<(std::ostream& out, const EnumValue& value) {
+    return out << value.code();
+}
 
 }  // namespace IC

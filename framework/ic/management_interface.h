@@ -17,17 +17,17 @@ using AlertHandler = Error (*)(const std::vector<Alert>& alerts, const void* con
 using LoadCallBack = Error (*)(Node* const& node, const void* context);
 using FindCallBack = Error (*)(const std::string& name, Node** node);
 
-/// What a plug-in is to the agent: the list of its nodes, start and stop, the way for alerts. All operations may be
-/// called from many threads at once; no lock is held while a callback of the agent runs.
-/// The order of the virtual operations is part of the binary contract between agent and plug-in.
+/// What a plug-in is to the agent: the list of its nodes, start and stop, the way for alerts. All operations
+/// may be called from many threads at once; no lock is held while a callback of the agent runs. The order of
+/// the virtual operations is part of the binary contract between agent and plug-in.
 class CORVISTA_API ManagementInterface {
 public:
     ManagementInterface();
     ManagementInterface(const ManagementInterface&) = delete;
     ManagementInterface& operator=(const ManagementInterface&) = delete;
 
-    /// Fills `nodes` with the nodes of the list. The pointers stay good until the node is withdrawn; a reader on
-    /// another thread than the one that withdraws uses hold() or holdAll().
+    /// Fills `nodes` with the nodes of the list. The pointers stay good until the node is withdrawn; a reader
+    /// on another thread than the one that withdraws uses hold() or holdAll().
     virtual Error getMap(std::vector<Node*>& nodes);
     /// @param miId id of this interface, @param ownNodeId id of the interface's node,
     /// @param firstNodeId where the node-id counter starts. Failure when a number is none.
@@ -44,8 +44,8 @@ public:
     virtual Error unload();
     virtual ~ManagementInterface();
     virtual operator std::string() const;
-    /// Takes ownership of a node made after start-up, lists it and hands it to the agent's load callback, whose
-    /// result it returns. A node that the agent refuses stays owned but is not listed.
+    /// Takes ownership of a node made after start-up, lists it and hands it to the agent's load callback,
+    /// whose result it returns. A node that the agent refuses stays owned but is not listed.
     virtual Error addNewNode(Node* node);
     /// Withdraws a node: out of the list at once, freed when the last operation on it has returned.
     /// Failure when the node is not one of this interface's.

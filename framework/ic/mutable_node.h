@@ -4,8 +4,8 @@
 
 namespace IC {
 
-/// A node with a store of properties: the base of every node of the plug-in. All operations may be called from
-/// many threads at once; none of them calls out while it holds its lock.
+/// A node with a store of properties: the base of every node of the plug-in. All operations may be called
+/// from many threads at once; none of them calls out while it holds its lock.
 class CORVISTA_API MutableNode : public Node {
 public:
     /// @param nodeId   unique among all nodes of the plug-in
@@ -19,7 +19,8 @@ public:
     ~MutableNode() override;
     unsigned int getStatus() const override;
     std::string getDescription() const override;
-    /// What was stored last; an id that was never stored gives status 1 and "no such property: <id>", `out` untouched.
+    /// What was stored last; an id that was never stored gives status 1 and "no such property: <id>", `out`
+    /// untouched.
     Error getProperty(unsigned int id, PropertyValue& out) const override;
     Error getProperties(std::map<unsigned int, PropertyValue>& out) const override;
     /// Stores a copy.

@@ -24,8 +24,8 @@ public:
     KindType kind() const { return kind_; }
     bool empty() const { return std::holds_alternative<std::monostate>(value_); }
 
-    /// The value as 32 bits: a fraction is dropped, a negative scaled value wraps to two's complement, an empty
-    /// number is 0. Throws ConversionError when the value does not fit.
+    /// The value as 32 bits: a fraction is dropped, a negative scaled value wraps to two's complement, an
+    /// empty number is 0. Throws ConversionError when the value does not fit.
     operator unsigned int() const;
     unsigned long long toUnsigned64() const;
     double toDouble() const;

@@ -36,13 +36,13 @@ public:
     /// True when the value holds nothing: of kind `none`, or built from a kind alone.
     bool empty() const { return std::holds_alternative<std::monostate>(value_); }
 
-    /// A number, an enumeration's code, or a text that is wholly a decimal number (a leading '-' wraps to two's
-    /// complement). Throws ConversionError for anything else, an empty value included.
+    /// A number, an enumeration's code, or a text that is wholly a decimal number (a leading '-' wraps to
+    /// two's complement). Throws ConversionError for anything else, an empty value included.
     explicit operator unsigned int() const;
     /// The printable text: lists are joined with one blank, an empty value is "".
     explicit operator std::string() const;
-    /// A list of texts as it is, a text as a list of one, an empty value as an empty list. Throws ConversionError
-    /// for numbers and enumerations.
+    /// A list of texts as it is, a text as a list of one, an empty value as an empty list. Throws
+    /// ConversionError for numbers and enumerations.
     explicit operator std::vector<std::string>() const;
 
     /// Typed views for readers that look at the kind first; null when the value is of another type.
@@ -57,7 +57,8 @@ private:
 
     KindType kind_ = none;
     bool known_ = false;
-    std::variant<std::monostate, Number, std::string, EnumValue, std::vector<std::string>, std::vector<Number>>
+    std::variant<std::monostate, Number, std::string, EnumValue, std::vector<std::string>,
+                 std::vector<Number>>
         value_;
 };
 

@@ -11,8 +11,8 @@
 using EthernetPortsByController = std::map<std::string, std::vector<CEthernetPort*>*>;
 using EthernetPortsByName = std::map<std::string, CEthernetPort*>;
 
-/// The host's ports as the kernel's /sys/class/net tells them, read once at construction. What is handed out lives as
-/// long as the object. One object belongs to one thread.
+/// The host's ports as the kernel's /sys/class/net tells them, read once at construction. What is handed out
+/// lives as long as the object. One object belongs to one thread.
 class CORVISTA_API CNetworkInfo {
 public:
     /// @param includeDown also ports whose interface is down
@@ -21,8 +21,8 @@ public:
     CNetworkInfo& operator=(const CNetworkInfo&) = delete;
     ~CNetworkInfo();
 
-    /// Physical ports by controller: Ethernet links with no upper kind of their own (no bond, bridge, VLAN, tun/tap,
-    /// wireless). Paravirtual links (virtio, veth) count. Null when /sys/class/net cannot be read.
+    /// Physical ports by controller: Ethernet links with no upper kind of their own (no bond, bridge, VLAN,
+    /// tun/tap, wireless). Paravirtual links (virtio, veth) count. Null when /sys/class/net cannot be read.
     const EthernetPortsByController* getNICInfo() const;
     /// The names of the virtual NICs: Ethernet links that no hardware stands behind (veth, macvlan, dummy).
     const std::vector<std::string>& getVNICNames() const;

@@ -17,9 +17,10 @@ public:
     ~PropertyFileError() override;
 };
 
-/// A file of keys and values: UTF-8 text, one `key=value` a line; backslash escapes newline (\n), itself and, in keys,
-/// '='. Lines that are damaged (no '=', broken escape, not UTF-8) are passed over. What is written reaches the disk
-/// whole or not at all. One object belongs to one thread.
+/// A file of keys and values: UTF-8 text, one `key=value` a line; backslash escapes newline (\n), itself and,
+/// in keys,
+/// '='. Lines that are damaged (no '=', broken escape, not UTF-8) are passed over. What is written reaches
+/// the disk whole or not at all. One object belongs to one thread.
 class CORVISTA_API PropertyFile {
 public:
     explicit PropertyFile(const File::Path& path);
@@ -29,10 +30,11 @@ public:
     ~PropertyFile();
 
     /// @param mode 1 reads an existing file; 3 reads what is there, accepts changes and creates the file.
-    /// Throws PropertyFileError when the file cannot be read (mode 1: also when it is missing) or the mode is another.
+    /// Throws PropertyFileError when the file cannot be read (mode 1: also when it is missing) or the mode is
+    /// another.
     void open(unsigned long mode);
-    /// Writes the changes (mode 3) through a temporary file that replaces the old one. Throws PropertyFileError when
-    /// that fails; the old file is then untouched.
+    /// Writes the changes (mode 3) through a temporary file that replaces the old one. Throws
+    /// PropertyFileError when that fails; the old file is then untouched.
     void close();
 
     /// The value of a key, or an empty text when the file has no such key.

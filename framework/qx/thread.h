@@ -23,8 +23,8 @@ public:
     bool start(void* argument);
     /// Waits until run has returned; a sleep of the thread returns early while it is waited for.
     void join();
-    /// Ends the thread without cancelling it in the middle of anything: its sleeps return at once and the commands
-    /// it has started are killed, so that its reads end and run returns by itself. Does not wait.
+    /// Ends the thread without cancelling it in the middle of anything: its sleeps return at once and the
+    /// commands it has started are killed, so that its reads end and run returns by itself. Does not wait.
     void abort();
 
     /// Blocks the calling thread. Returns early in a thread that is being joined or aborted.
@@ -36,8 +36,8 @@ private:
     std::shared_ptr<State> state_;
 };
 
-/// Makes sleeps and event timeouts run faster by that factor, so that minutes of a monitor's waiting cost a test
-/// seconds. 1 is real time. For tests alone.
+/// Makes sleeps and event timeouts run faster by that factor, so that minutes of a monitor's waiting cost a
+/// test seconds. 1 is real time. For tests alone.
 CORVISTA_API void setClockSpeed(double factor);
 
 }  // namespace QX

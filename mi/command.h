@@ -1,0 +1,61 @@
+#pragma once
+
+#include <cstddef>
+#include <cstdio>
+#include <optional>
+#include <string>
+
+#include "mi/my_process.h"
+
+namespace IC {
+
+constexpr std::size_t kCommandBuffer =
+    512;  ///< bytes of a command line and of a line read, the final zero included
+
+/// The command line a format makes, or nothing when it would not fit its 512 bytes: then it is logged at
+/// level 6000 and never run, since half a command is another command.
+[[gnu::format(printf, 1, 2)]] std::optional<std::string> formatCommand(const char* format, ...);
+
+/// One running shell command whose output is read line by line. The output ends, and the command is waited
+/// for, when the object goes.
+class HostCommand {
+public:
+    /// @param command what formatCommand gave; nothing counts as a command that could not be started
+    explicit HostCommand(const std::optional<std::string>& command);
+    /// Runs a text that was put together from pieces; the number of open pipes is logged.
+    static HostCommand fromText(const std::string& command);
+    HostCommand(const HostCommand&) = delete;
+    HostCommand& operator=(const HostCommand&) = delete;
+
+    bool started() const { return pipe_ != nullptr; }
+    /// The next line as it came, its line break included: at most `longest` characters, the rest of a longer
+    /// line comes with the next call. Nothing at the end of output, or when the command was not started.
+    std::optional<std::string> nextLine(std::size_t longest = kCommandBuffer - 1);
+
+private:
+    struct FromText {};
+    HostCommand(FromText, const std::string& command);
+
+    MyProcess process_;
+    FILE* pipe_ = nullptr;
+};
+
+/// A command read through a plain pipe: not counted among the open pipes.
+class PlainCommand {
+public:
+    explicit PlainCommand(const std::optional<std::string>& command);
+    PlainCommand(const PlainCommand&) = delete;
+    PlainCommand& operator=(const PlainCommand&) = delete;
+    ~PlainCommand();
+
+    bool started() const { return pipe_ != nullptr; }
+    std::optional<std::string> nextLine();
+
+private:
+    FILE* pipe_ = nullptr;
+};
+
+/// Runs a command to its end, for what it does. Its exit status is not examined.
+void runToEnd(const std::string& command);
+
+}  // namespace IC

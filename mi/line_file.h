@@ -1,0 +1,57 @@
+#pragma once
+
+#include <cstddef>
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace IC {
+
+/// A text file of the host that is read whole, changed line by line and written back whole. Every writer of
+/// the plug-in is a rule for one line and the lines it appends; whatever the rule does not touch stays byte
+/// for byte.
+class LineFile {
+public:
+    /// What becomes of a line.
+    enum class Fate { keep, drop };
+
+    /// Rules see no line longer than this (characters, without the line break): such a line is kept as it is,
+    /// for a tool's own line buffer would tear it in two and half of it could be taken for a key.
+    static constexpr std::size_t longestLine = 512;
+
+    LineFile() = default;  ///< no lines
+    /// The lines of a file; nothing when it cannot be opened for reading.
+    static std::optional<LineFile> read(const std::string& path);
+
+    /// Calls `rule(std::string& line)` for every line in order. The line carries its line break, which the
+    /// last line of a file may lack; the rule may change the line and says whether it stays.
+    template <class Rule>
+    void rewrite(Rule rule) {
+        std::vector<std::string> kept;
+        for (std::string& line : lines_) {
+            if (isTooLong(line) || rule(line) == Fate::keep) {
+                kept.push_back(std::move(line));
+            }
+        }
+        lines_ = std::move(kept);
+    }
+
+    /// Adds a line (with its line break) at the end; a last line without a line break gets one first.
+    void append(const std::string& line);
+    /// Adds a line (with its line break) at the start.
+    void prepend(const std::string& line);
+    void clear() { lines_.clear(); }
+    const std::vector<std::string>& lines() const { return lines_; }
+
+    /// Replaces the content of the file, created when it is missing. A failure half-way (disk full) leaves
+    /// what was written so far and is logged at level 6000.
+    /// @return whether the file could be opened for writing
+    bool write(const std::string& path) const;
+
+private:
+    static bool isTooLong(const std::string& line);
+
+    std::vector<std::string> lines_;
+};
+
+}  // namespace IC

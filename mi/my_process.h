@@ -1,0 +1,32 @@
+#pragma once
+
+#include <atomic>
+#include <cstdio>
+#include <string>
+
+namespace IC {
+
+/// One command pipe for the length of a scope: closed on every way out of it.
+class MyProcess {
+public:
+    /// Pipes opened and not yet closed, in the whole plug-in. A pipe that could not be opened counts for
+    /// good: the number is read in logs and decides nothing.
+    static std::atomic<int> cnt;
+
+    MyProcess();
+    MyProcess(const MyProcess&) = delete;
+    MyProcess& operator=(const MyProcess&) = delete;
+    ~MyProcess();
+
+    /// Runs the command in the shell.
+    /// @param mode "r" to read its output
+    /// @return the pipe, owned by this object; null when the shell could not be started
+    FILE* mypopen(const char* command, const char* mode);
+    /// The same; the number of open pipes is logged.
+    FILE* mypopen(std::string command, const char* mode);
+
+private:
+    FILE* pipe_;
+};
+
+}  // namespace IC

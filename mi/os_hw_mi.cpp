@@ -1,0 +1,123 @@
+#include "mi/os_hw_mi.h"
+
+#include "mi/globals.h"
+#include "mi/log.h"
+#include "mi/shut_down.h"
+
+namespace IC {
+
+namespace {
+
+struct Step {
+    const char* name;
+    void (*run)(OsHwMI& mi);
+};
+
+// The order of start-up: each builder hangs its nodes under those of the rows above it.
+constexpr Step kStartUp[] = {
+    {"createOsHwNodes", [](OsHwMI& mi) { mi.createOsHwNodes(); }},
+    {"createRootNode", [](OsHwMI& mi) { mi.createRootNode(); }},
+    {"createComputerNodes", [](OsHwMI& mi) { mi.createComputerNodes(); }},
+    {"createChassisNodes", [](OsHwMI& mi) { mi.createChassisNodes(); }},
+    {"createPlanarNodes", [](OsHwMI& mi) { mi.createPlanarNodes(); }},
+    {"createNetworkControllerNodes", [](OsHwMI& mi) { mi.createNetworkControllerNodes(); }},
+    {"createDiskControllerNodes", [](OsHwMI& mi) { mi.createDiskControllerNodes(); }},
+};
+
+/// Runs one step; what it throws is logged and goes no further.
+template <class Work>
+void guarded(const char* name, Work work) {
+    try {
+        work();
+    } catch (const std::exception& failure) {
+        log(kError) << name << " failed: " << failure.what();
+    } catch (...) {
+        log(kError) << name << " failed: unknown exception";
+    }
+}
+
+}  // namespace
+
+OsHwMI::OsHwMI() = default;
+OsHwMI::~OsHwMI() = default;
+
+Error OsHwMI::initialize(unsigned int miId, const Number& ownNodeId, const Number& firstNodeId) {
+    const LogScope scope("initialize");
+    {
+        const std::lock_guard lock(inventoryGuard_);
+        inventory_ = std::make_unique<Inventory>();
+    }
+    node_ = nullptr;
+    initializing_ = 1;
+    OSHWMI::myerr = ManagementInterface::initialize(miId, ownNodeId, firstNodeId);
+    for (const Step& step : kStartUp) {
+        guarded(step.name, [&] { step.run(*this); });
+    }
+    OSHWMI::bInitflag = true;
+    return OSHWMI::myerr;
+}
+
+Error OsHwMI::unload() {
+    const LogScope scope("unload");
+    HardDriveNodeUpdate = true;
+    guarded("stopHardDriveMonitor", [&] { stopHardDriveMonitor(); });
+    Error result = ManagementInterface::unload();
+    driveNodes_.clear();
+    partitionNodes_.clear();
+    const std::lock_guard lock(inventoryGuard_);
+    inventory_.reset();
+    return result;
+}
+
+void OsHwMI::publishNode(Node* node) {
+    const LogScope scope("publishNode");
+    const Error result = addNewNode(node);
+    if (result.getStatus() != 0) {
+        log(kError) << "addNewNode error = " << result;
+    }
+}
+
+void OsHwMI::stopHardDriveMonitor() {
+    if (!driveMonitorRuns_) {
+        return;
+    }
+    driveMonitorRuns_ = false;
+    driveMonitor_->stop();
+    log(kProgress) << "disable Hard Drive updates: waiting for HardDriveUpdateMonitor Termination ";
+    driveMonitor_->join();
+    log(kProgress) << "disable Hard Drive updates: HardDriveUpdateMonitor terminated.";
+    driveMonitor_.reset();
+}
+
+unsigned int OsHwMI::drawNodeId() {
+    const std::lock_guard lock(inventoryGuard_);
+    const unsigned int id = takeNodeId();
+    if (inventory_) {
+        inventory_->drawnIds.push_back(id);
+    }
+    return id;
+}
+
+void OsHwMI::rememberByName(const std::string& name, MutableNode* node) {
+    const std::lock_guard lock(inventoryGuard_);
+    if (inventory_) {
+        inventory_->nodesByName.emplace(name, node);
+    }
+}
+
+std::map<std::string, MutableNode*> OsHwMI::nodesByName() const {
+    const std::lock_guard lock(inventoryGuard_);
+    return inventory_ ? inventory_->nodesByName : std::map<std::string, MutableNode*>{};
+}
+
+bool OsHwMI::findNetworkPort(std::string name, MutableNode** node) const {
+    const std::map<std::string, MutableNode*> nodes = nodesByName();
+    const auto found = nodes.find(name);
+    if (found == nodes.end()) {
+        return false;
+    }
+    *node = found->second;
+    return true;
+}
+
+}  // namespace IC

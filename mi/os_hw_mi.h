@@ -1,0 +1,146 @@
+#pragma once
+
+#include <map>
+#include <memory>
+#include <mutex>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "framework/ic/management_interface.h"
+#include "framework/netinfo/records.h"
+#include "framework/qx/event.h"
+#include "framework/qx/thread.h"
+
+namespace IC {
+
+class NetworkMonitor;
+
+/// The plug-in object: builds the tree of the host's nodes, starts and stops the monitors. There is one,
+/// myoshwmi. Each builder lives in the room of the nodes it builds; initialize calls them in a fixed order.
+class OsHwMI : public ManagementInterface {
+public:
+    OsHwMI();
+    ~OsHwMI() override;
+
+    /// Builds the tree and starts the monitors. A step that fails is logged and the next one runs.
+    /// @return the result of the base class's initialize
+    Error initialize(unsigned int miId, const Number& ownNodeId, const Number& firstNodeId) override;
+    /// Stops the monitors, frees the nodes, removes the plug-in's own files. Safe without an initialize
+    /// before it.
+    Error unload() override;
+
+    /// Hands a node made after start-up to the agent. A refusal is logged and not retried.
+    void publishNode(Node* node);
+
+    // The static tree (mi/static_tree.cpp; the computer in computer/).
+    void createOsHwNodes();
+    void createRootNode();
+    void createComputerNodes();
+    void createChassisNodes();
+    void createPlanarNodes();
+    void createNetworkControllerNodes();
+    void createDiskControllerNodes();
+
+    // computer/
+    void updateHostAndDomainName();
+    void vpdUpdate();
+
+    // storage/ — `update`: withdraw the old nodes first and publish the new ones
+    void createHardDriveNodes(bool update);
+    void createPartitionNodes(bool update);
+    void startHDDThread();
+    void HDDThreadProcess();
+    void HardDrive_Checksum(bool keepCurrent);
+    void Partition_Checksum(bool keepCurrent);
+
+    // network/ — the flag is accepted and not read: first build and rebuild run the same walk
+    void createNetworkPortNodes(bool update);
+    void createNetworkTeamingNodes();
+    void createLANEndPointNodes();
+    void createIPConfigNodes(std::vector<CIPInfo*>* addresses, std::string name, MutableNode* parent,
+                             unsigned int& index);
+    void stringFormatForDNSServersAndSuffixes(std::string& servers, std::string& suffixes);
+    /// Looks an interface up among the published nodes.
+    /// @param node receives the node when there is one
+    bool findNetworkPort(std::string name, MutableNode** node) const;
+
+    // indications/
+    void enableIndications();
+    void disableIndications();
+    void createCurNetNodeMap();
+    unsigned int bondedNetNodeStatus(const std::string& bond);
+    void writePrevNetNodeMap();
+    void readPrevNetNodeMap();
+    void checkAndSendNetAlert();
+
+    // cpu/ — the agent may call createCpuNodes; nothing in the plug-in does
+    void createCpuNodeAndMap();
+    __attribute__((visibility("default"))) void createCpuNodes();
+
+private:
+    friend struct OsHwMITestAccess;
+
+    /// Made by initialize and freed by unload.
+    struct Inventory {
+        std::vector<unsigned int> drawnIds;               ///< every id taken from the counter
+        std::map<std::string, MutableNode*> nodesByName;  ///< by interface name, bonds included
+        std::map<std::string, unsigned int>
+            currentStates;  ///< link state by interface; the network monitor's alone
+        std::map<std::string, unsigned int> previousStates;
+        std::map<unsigned int, MutableNode*> processors;  ///< by processor number, from 1
+    };
+    /// What a fingerprint was when the nodes were last built, and what it is now.
+    struct Fingerprint {
+        std::string reference;
+        std::string current;
+    };
+
+    /// Takes the next node id and remembers it as drawn.
+    unsigned int drawNodeId();
+    /// Makes a node of the next id under `parent`. The caller lists it (appendNode) or publishes it.
+    template <class NodeT, class... More>
+    NodeT* makeNode(const MutableNode& parent, unsigned int type, unsigned int index, More&&... more) {
+        return new NodeT(drawNodeId(), parent.getNodeId(), miIds(), type, index, std::forward<More>(more)...);
+    }
+    MutableNode* createStaticNode(const MutableNode& parent, unsigned int type, unsigned int index,
+                                  const char* description);
+    /// An interface that is known already keeps its node.
+    void rememberByName(const std::string& name, MutableNode* node);
+    /// A copy: the walk over the interfaces and the network monitor run at the same time.
+    std::map<std::string, MutableNode*> nodesByName() const;
+    void stopHardDriveMonitor();
+
+    mutable std::mutex inventoryGuard_;  ///< guards drawnIds and nodesByName; never held while a command runs
+    std::unique_ptr<Inventory> inventory_;
+    int initializing_ = 0;  ///< 1 once initialize was called
+
+    MutableNode* osHwNode_ = nullptr;
+    MutableNode* rootNode_ = nullptr;
+    MutableNode* computerNode_ = nullptr;
+    MutableNode* chassisNode_ = nullptr;
+    MutableNode* planarNode_ = nullptr;
+    MutableNode* networkControllerNode_ = nullptr;
+    MutableNode* diskControllerNode_ = nullptr;
+    MutableNode* node_ = nullptr;         ///< the node being built
+    MutableNode* currentPort_ = nullptr;  ///< the port whose IP configuration is being built
+
+    std::vector<Node*> driveNodes_;
+    std::vector<Node*> partitionNodes_;
+    QX::Event driveMonitorEnded_{true};
+    std::unique_ptr<QX::Thread> driveMonitor_;
+    bool driveMonitorRuns_ = false;
+    Fingerprint driveMd5_;
+    Fingerprint driveSha1_;
+    Fingerprint partitionMd5_;
+    Fingerprint partitionSha1_;
+
+    QX::Event networkMonitorEnded_{true};
+    NetworkMonitor* networkMonitor_ = nullptr;
+    std::string hostName_;
+    std::string domainName_;
+    std::vector<std::string> dnsServers_;
+    std::vector<std::string> dnsSuffixes_;
+};
+
+}  // namespace IC

@@ -1,0 +1,43 @@
+#include "mi/text.h"
+
+#include <cstring>
+
+namespace IC {
+
+char* strget(char* text, char delim) {
+    while (*text != '\0' && *text == delim) {
+        ++text;
+    }
+    for (char* newline = std::strchr(text, '\n'); newline != nullptr;
+         newline = std::strchr(newline + 1, '\n')) {
+        *newline = '\0';
+    }
+    return text;
+}
+
+char* strreplace(char* text, char from, char to) {
+    if (*text == '\0') {
+        return text;
+    }
+    for (char* at = text + 1; *at != '\0'; ++at) {
+        if (*at == from) {
+            *at = to;
+            if (to == '\0') {
+                break;
+            }
+        }
+    }
+    return text;
+}
+
+std::string trimEnd(std::string text, char unwanted) {
+    text.erase(text.find_last_not_of(unwanted) + 1);
+    return text;
+}
+
+std::string trimStart(std::string text, char unwanted) {
+    text.erase(0, text.find_first_not_of(unwanted));
+    return text;
+}
+
+}  // namespace IC

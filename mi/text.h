@@ -1,0 +1,29 @@
+#pragma once
+
+#include <string>
+
+namespace IC {
+
+/// The first line of `text` behind its leading `delim` characters; every newline from there to the end
+/// becomes a NUL.
+/// @return a pointer into `text`
+char* strget(char* text, char delim);
+
+/// Replaces `from` by `to`, beginning with the second character: callers keep a leading separator. Stops at
+/// the end of the text, and right after a replacement by NUL.
+/// @return `text`
+char* strreplace(char* text, char from, char to);
+
+/// `text` without the `unwanted` characters at its end.
+std::string trimEnd(std::string text, char unwanted = '\n');
+/// `text` without the `unwanted` characters at its start.
+std::string trimStart(std::string text, char unwanted = ' ');
+
+inline bool contains(const std::string& text, const char* part) {
+    return text.find(part) != std::string::npos;
+}
+inline bool contains(const std::string& text, const std::string& part) {
+    return contains(text, part.c_str());
+}
+
+}  // namespace IC
