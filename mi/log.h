@@ -1,9 +1,7 @@
 #pragma once
 
 #include <concepts>
-#include <source_location>
 #include <string>
-#include <string_view>
 
 #include "framework/cvlog/message_buffer.h"
 #include "framework/ic/error.h"
@@ -42,12 +40,12 @@ extern const LogSource mainLogSource;         ///< "OsHwMI_ix86"
 extern const LogSource indicationsLogSource;  ///< "OsHwMIInd_ix86"
 extern const LogSource processorsLogSource;   ///< "OsHwMICpu_ix86"
 
-/// One log line: collects what is streamed into it and goes out at the end of the statement, first to the
-/// log, then to the trace. Never throws.
+/// One log line: collects what is streamed into it and goes out at the end of the statement, first to the log, then
+/// to the trace. Never throws.
 class LogLine {
 public:
-    LogLine(const LogSource& source, int level, const std::source_location& where)
-        : source_(source), level_(level), where_(where) {}
+    LogLine(const LogSource& source, int level, const char* function, int line)
+        : source_(source), level_(level), function_(function), line_(line) {}
     LogLine(const LogLine&) = delete;
     LogLine& operator=(const LogLine&) = delete;
     ~LogLine();
@@ -61,38 +59,36 @@ public:
 private:
     const LogSource& source_;
     int level_;
-    std::source_location where_;
+    const char* function_;
+    int line_;
     CVLog::CVMessageBuffer buffer_;
 };
 
-inline LogLine log(int level, const std::source_location& where = std::source_location::current()) {
-    return {mainLogSource, level, where};
+// A line of each source. The last two arguments are the caller's function name and line: leave them out.
+inline LogLine log(int level, const char* function = __builtin_FUNCTION(), int line = __builtin_LINE()) {
+    return {mainLogSource, level, function, line};
 }
-inline LogLine logInd(int level, const std::source_location& where = std::source_location::current()) {
-    return {indicationsLogSource, level, where};
+inline LogLine logInd(int level, const char* function = __builtin_FUNCTION(), int line = __builtin_LINE()) {
+    return {indicationsLogSource, level, function, line};
 }
-inline LogLine logCpu(int level, const std::source_location& where = std::source_location::current()) {
-    return {processorsLogSource, level, where};
+inline LogLine logCpu(int level, const char* function = __builtin_FUNCTION(), int line = __builtin_LINE()) {
+    return {processorsLogSource, level, function, line};
 }
 
-/// Writes "<name>: entry" now and "<name>: exit" when the scope is left. Without a name it takes the
-/// function's.
+/// Writes "<name>: entry" now and "<name>: exit" when the scope is left. Without a name it takes the function's.
 class LogScope {
 public:
-    explicit LogScope(std::string name = {}, const LogSource& source = mainLogSource,
-                      const std::source_location& where = std::source_location::current());
+    explicit LogScope(const char* name = nullptr, const LogSource& source = mainLogSource,
+                      const char* function = __builtin_FUNCTION(), int line = __builtin_LINE());
     LogScope(const LogScope&) = delete;
     LogScope& operator=(const LogScope&) = delete;
     ~LogScope();
 
 private:
-    std::string name_;
+    const char* name_;
     const LogSource& source_;
-    std::source_location where_;
+    const char* function_;
+    int line_;
 };
-
-/// The bare function name in a compiler's full signature: "initialize" of "IC::Error
-/// IC::OsHwMI::initialize(…)".
-std::string_view bareFunctionName(std::string_view signature);
 
 }  // namespace IC
