@@ -1,0 +1,142 @@
+// The rules of the house that a compiler does not check: who includes whom, one seam to the host, short
+// functions.
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <filesystem>
+#include <fstream>
+#include <map>
+#include <regex>
+#include <set>
+#include <sstream>
+
+namespace {
+
+namespace fs = std::filesystem;
+
+const fs::path kTree = CORVISTA_SOURCE_DIR;
+
+const std::map<std::string, std::set<std::string>> kMayInclude = {
+    {"framework", {"framework"}},
+    {"mi", {"mi", "framework"}},
+    {"computer", {"computer", "mi", "framework"}},
+    {"storage", {"storage", "mi", "framework"}},
+    {"network", {"network", "mi", "framework"}},
+    {"indications", {"indications", "mi", "framework"}},
+    {"cpu", {"cpu", "mi", "framework"}},
+    {"agent", {"agent", "framework"}},
+    {"hosttools", {"hosttools"}},
+};
+const std::set<std::string> kPlugin = {"mi", "computer", "storage", "network", "indications", "cpu"};
+
+std::vector<fs::path> sources(const std::string& room) {
+    std::vector<fs::path> found;
+    for (const auto& entry : fs::recursive_directory_iterator(kTree / room)) {
+        if (entry.path().extension() == ".cpp" || entry.path().extension() == ".h") {
+            found.push_back(entry.path());
+        }
+    }
+    return found;
+}
+
+std::string content(const fs::path& file) {
+    std::ostringstream text;
+    text << std::ifstream(file).rdbuf();
+    return text.str();
+}
+
+std::vector<std::string> lines(const fs::path& file) {
+    std::vector<std::string> found;
+    std::ifstream in(file);
+    for (std::string line; std::getline(in, line);) {
+        found.push_back(line);
+    }
+    return found;
+}
+
+/// The code without comments and texts, so that a word in a message is no call.
+std::string codeOnly(const fs::path& file) {
+    static const std::regex noise(R"re("(\\.|[^"\\\n])*"|//[^\n]*|/\*[^*]*\*+([^/*][^*]*\*+)*/)re");
+    return std::regex_replace(content(file), noise, "");
+}
+
+TEST(House, RoomsIncludeOnlyWhatTheyMay) {
+    const std::regex include(R"re(^\s*#include "([^"]+)")re");
+    for (const auto& [room, allowed] : kMayInclude) {
+        const auto files = sources(room);
+        EXPECT_FALSE(files.empty()) << room;
+        for (const fs::path& file : files) {
+            for (const std::string& line : lines(file)) {
+                std::smatch match;
+                if (std::regex_search(line, match, include)) {
+                    const std::string from = match[1].str().substr(0, match[1].str().find('/'));
+                    EXPECT_TRUE(allowed.contains(from)) << file << " includes " << match[1];
+                }
+            }
+        }
+    }
+}
+
+TEST(House, ThePluginHasOneSeamToTheShell) {
+    const std::regex call(R"re(\b(popen|system|execl|execv|execvp|execlp|posix_spawn|fork|vfork)\s*\()re");
+    std::set<std::string> seams;
+    for (const std::string& room : kPlugin) {
+        for (const fs::path& file : sources(room)) {
+            if (std::regex_search(codeOnly(file), call)) {
+                seams.insert(fs::relative(file, kTree));
+            }
+        }
+    }
+    EXPECT_EQ(seams, (std::set<std::string>{"mi/command.cpp", "mi/my_process.cpp"}));
+}
+
+TEST(House, ThePluginHasOneWayToTheLogger) {
+    for (const std::string& room : kPlugin) {
+        for (const fs::path& file : sources(room)) {
+            if (fs::relative(file, kTree) != "mi/log.cpp") {
+                EXPECT_EQ(codeOnly(file).find("LevelMessage"), std::string::npos) << file;
+            }
+        }
+    }
+}
+
+TEST(House, SourcesAndHeadersStayShort) {
+    for (const auto& [room, allowed] : kMayInclude) {
+        for (const fs::path& file : sources(room)) {
+            const std::size_t longest = file.extension() == ".h" ? 200 : 400;
+            EXPECT_LE(lines(file).size(), longest) << file;
+        }
+    }
+}
+
+/// Length of the longest function of a file: from a line at column 0 (or inside a namespace) that opens a
+/// brace after a parenthesis to the closing brace at the same column. Enough for code that clang-format has
+/// laid out.
+std::size_t longestFunction(const fs::path& file) {
+    std::size_t longest = 0;
+    const auto all = lines(file);
+    for (std::size_t i = 0; i < all.size(); ++i) {
+        const std::size_t indent = all[i].find_first_not_of(' ');
+        if (indent == std::string::npos || !all[i].ends_with("{") || all[i].find(')') == std::string::npos ||
+            all[i].starts_with("namespace") || indent > 4) {
+            continue;
+        }
+        const std::string closing = std::string(indent, ' ') + "}";
+        const auto end =
+            std::find_if(all.begin() + static_cast<std::ptrdiff_t>(i), all.end(), [&](const auto& line) {
+                return line == closing || line == closing + ";" || line.starts_with(closing + " ");
+            });
+        longest = std::max(longest, static_cast<std::size_t>(end - all.begin()) - i + 1);
+    }
+    return longest;
+}
+
+TEST(House, FunctionsStayShort) {
+    for (const auto& [room, allowed] : kMayInclude) {
+        for (const fs::path& file : sources(room)) {
+            EXPECT_LE(longestFunction(file), 60U) << file;
+        }
+    }
+}
+
+}  // namespace
