@@ -7,20 +7,32 @@ namespace IC {
 LogLine::~LogLine() {
     try {
         const std::string message = buffer_.str();
-        CVLog::CVLogger::logLevelMessage(function_, source_.name, line_, *source_.component, level_, nullptr, 0, 0,
-                                         message);
-        CVLog::CVLogger::traceLevelMessage(function_, source_.name, line_, *source_.component, level_, nullptr, 0,
-                                           0, message);
+        CVLog::CVLogger::logLevelMessage(function_, source_.name, line_, *source_.component, level_, nullptr,
+                                         0, 0, message);
+        CVLog::CVLogger::traceLevelMessage(function_, source_.name, line_, *source_.component, level_,
+                                           nullptr, 0, 0, message);
     } catch (...) {
         // No memory for a log line: the work itself goes on.
     }
 }
 
 LogScope::LogScope(const char* name, const LogSource& source, const char* function, int line)
-    : name_(name != nullptr ? name : function), source_(source), function_(function), line_(line) {
-    LogLine(source_, kProgress, function_, line_) << name_ << ": entry";
+    : exit_(name != nullptr ? name : function),
+      exitEnd_(": exit"),
+      source_(source),
+      function_(function),
+      line_(line) {
+    LogLine(source_, kProgress, function_, line_) << exit_ << ": entry";
 }
 
-LogScope::~LogScope() { LogLine(source_, kProgress, function_, line_) << name_ << ": exit"; }
+LogScope::LogScope(const char* entry, const char* exit, const LogSource& source, const char* function,
+                   int line)
+    : exit_(exit), exitEnd_(""), source_(source), function_(function), line_(line) {
+    LogLine(source_, kProgress, function_, line_) << entry;
+}
+
+LogScope::~LogScope() {
+    LogLine(source_, kProgress, function_, line_) << exit_ << exitEnd_;
+}
 
 }  // namespace IC

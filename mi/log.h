@@ -40,8 +40,8 @@ extern const LogSource mainLogSource;         ///< "OsHwMI_ix86"
 extern const LogSource indicationsLogSource;  ///< "OsHwMIInd_ix86"
 extern const LogSource processorsLogSource;   ///< "OsHwMICpu_ix86"
 
-/// One log line: collects what is streamed into it and goes out at the end of the statement, first to the log, then
-/// to the trace. Never throws.
+/// One log line: collects what is streamed into it and goes out at the end of the statement, first to the
+/// log, then to the trace. Never throws.
 class LogLine {
 public:
     LogLine(const LogSource& source, int level, const char* function, int line)
@@ -75,17 +75,23 @@ inline LogLine logCpu(int level, const char* function = __builtin_FUNCTION(), in
     return {processorsLogSource, level, function, line};
 }
 
-/// Writes "<name>: entry" now and "<name>: exit" when the scope is left. Without a name it takes the function's.
+/// Writes "<name>: entry" now and "<name>: exit" when the scope is left. Without a name it takes the
+/// function's.
 class LogScope {
 public:
     explicit LogScope(const char* name = nullptr, const LogSource& source = mainLogSource,
                       const char* function = __builtin_FUNCTION(), int line = __builtin_LINE());
+    /// For functions with words of their own ("Entering getNICTeams", "Exiting getNICTeams"): the whole
+    /// texts.
+    LogScope(const char* entry, const char* exit, const LogSource& source = mainLogSource,
+             const char* function = __builtin_FUNCTION(), int line = __builtin_LINE());
     LogScope(const LogScope&) = delete;
     LogScope& operator=(const LogScope&) = delete;
     ~LogScope();
 
 private:
-    const char* name_;
+    const char* exit_;
+    const char* exitEnd_;
     const LogSource& source_;
     const char* function_;
     int line_;
