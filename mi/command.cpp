@@ -63,6 +63,14 @@ std::optional<std::string> HostCommand::nextLine(std::size_t longest) {
     return readLine(pipe_, longest);
 }
 
+FirstLine firstLine(HostCommand&& command) {
+    return {command.started(), command.nextLine()};
+}
+
+FirstLine firstLine(const std::optional<std::string>& command) {
+    return firstLine(HostCommand(command));
+}
+
 PlainCommand::PlainCommand(const std::optional<std::string>& command)
     : pipe_(command ? popen(command->c_str(), "r") : nullptr) {}
 

@@ -40,6 +40,14 @@ private:
     FILE* pipe_ = nullptr;
 };
 
+/// All that most queries take of a command.
+struct FirstLine {
+    bool started;                     ///< false when the command could not be run at all
+    std::optional<std::string> line;  ///< as it came, its line break included; nothing when none was printed
+};
+FirstLine firstLine(HostCommand&& command);
+FirstLine firstLine(const std::optional<std::string>& command);
+
 /// A command read through a plain pipe: not counted among the open pipes.
 class PlainCommand {
 public:

@@ -1,0 +1,37 @@
+#include "network/dhcp_queries.h"
+
+#include "mi/command.h"
+#include "mi/log.h"
+#include "network/address_parse.h"
+
+namespace IC {
+
+bool checkIsDhcp(const std::string& name) {
+    const LogScope scope("NetworkPortNode::checkIsDhcp ");
+    return firstLine(formatCommand("cat /var/lib/dhcpcd/dhcpcd-%s.info 2> /dev/null", name.c_str()))
+        .line.has_value();
+}
+
+void getBootProto(const std::string& name, std::string& keyword) {
+    const LogScope scope("Entering getBootProto", "Exiting getBootProto");
+    keyword.clear();
+    const FirstLine answer = firstLine(
+        formatCommand("cat /etc/sysconfig/network/ifcfg-eth-id-`ifconfig %s 2> /dev/null |grep HWaddr "
+                      "|awk '{print $5}'|tr '[A-Z]' '[a-z]'` | grep BOOTPROTO | cut -d '=' -f2 2> /dev/null",
+                      name.c_str()));
+    if (answer.line) {
+        keyword = parse::bootProto(*answer.line);
+    }
+}
+
+bool getDHCPv6Servers(const std::string& /*name*/, std::string& server) {
+    const LogScope scope;
+    const FirstLine answer = firstLine(formatCommand(
+        "cat /var/lib/dhcpv6/client6.leases* 2> /dev/null | grep SDUID | cut -d ' ' -f3 2> /dev/null"));
+    if (answer.line) {
+        server = parse::dhcpv6Server(*answer.line);
+    }
+    return answer.line.has_value();
+}
+
+}  // namespace IC

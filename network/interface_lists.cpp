@@ -1,0 +1,64 @@
+#include "network/interface_lists.h"
+
+#include "mi/command.h"
+#include "mi/log.h"
+#include "network/link_parse.h"
+
+namespace IC {
+
+bool getNICString(const std::string& line, std::string& name) {
+    const LogScope scope;
+    parse::NICName found = parse::nicName(line);
+    name = std::move(found.name);
+    return !found.ofBridge;
+}
+
+bool getbridgeInterfaces(std::vector<std::string>& members) {
+    const LogScope scope;
+    HostCommand listing(formatCommand("brctl show | awk '{print $NF}' | grep -v interfaces"));
+    bool any = false;
+    while (const auto line = listing.nextLine()) {
+        const std::string& member = members.emplace_back(parse::bridgeMember(*line));
+        log(kProgress) << "getbridgeInterfaces: after" << member;
+        any = true;
+    }
+    return any;
+}
+
+bool getSlaveInterfaces(const std::string& bond, std::vector<std::string>& members) {
+    const LogScope scope("Entering getSlaveInterfaces", "Exiting getSlaveInterfaces");
+    HostCommand slaves =
+        HostCommand::fromText("cat /proc/net/bonding/" + bond + " 2> /dev/null | grep \"Slave Interface:\"");
+    if (!slaves.started()) {
+        log(kError) << "isNICUp - grepping slave device error";
+        return false;
+    }
+    while (const auto line = slaves.nextLine()) {
+        const std::string& member = members.emplace_back(parse::bondMember(*line));
+        log(kProgress) << "Slave Found:" << member;
+    }
+    return true;
+}
+
+CEthernetPort* getVLANInterface(const EthernetPortsByName* vlans, std::string name) {
+    const LogScope scope;
+    if (vlans == nullptr) {
+        return nullptr;
+    }
+    const auto found = vlans->find(name);
+    return found == vlans->end() ? nullptr : found->second;
+}
+
+CEthernetPort* isPhysicalPort(const EthernetPortsByController* ports, std::string name) {
+    const LogScope scope;
+    for (const auto& [controller, portsOfController] : *ports) {
+        for (CEthernetPort* port : *portsOfController) {
+            if (port->name == name) {
+                return port;
+            }
+        }
+    }
+    return nullptr;
+}
+
+}  // namespace IC

@@ -1,0 +1,117 @@
+#include "network/link_queries.h"
+
+#include <unistd.h>
+
+#include "mi/command.h"
+#include "mi/log.h"
+#include "mi/text.h"
+#include "network/link_parse.h"
+
+namespace IC {
+
+namespace {
+
+/// First line of an `ethtool` pipeline, which all report a shell that cannot be started in the same words.
+std::optional<std::string> ethtoolLine(const std::optional<std::string>& command) {
+    const FirstLine answer = firstLine(command);
+    if (!answer.started) {
+        log(kError) << "NetworkPort getProperty - ethtool error";
+    }
+    return answer.line;
+}
+
+HostCommand grepBondFile(const std::string& bond, const char* label) {
+    return HostCommand::fromText("cat /proc/net/bonding/" + bond + " 2> /dev/null | grep \"" + label + "\"");
+}
+
+bool isMiiStatusUp(const std::string& bond) {
+    const FirstLine status = firstLine(grepBondFile(bond, "MII Status:"));
+    if (!status.started) {
+        log(kError) << "isNICUp - cat /proc/net/bonding/bond* error";
+    }
+    return status.line && parse::isMiiUp(*status.line);
+}
+
+bool areMembersUp(const std::string& bond) {
+    HostCommand members = grepBondFile(bond, "Slave Interface:");
+    if (!members.started()) {
+        log(kError) << "isNICUp - grepping slave device error";
+        return false;
+    }
+    bool any = false;
+    while (const auto line = members.nextLine()) {
+        if (!isNICUp(parse::bondMemberToProbe(*line))) {
+            return false;
+        }
+        any = true;
+    }
+    return any;
+}
+
+}  // namespace
+
+bool getNetworkSpeed(const std::string& name, unsigned long long& speed) {
+    const LogScope scope;
+    const auto line = ethtoolLine(formatCommand(
+        "ethtool %s 2> /dev/null | grep Speed | tr -s ' ' | cut -d ' ' -f2 2> /dev/null", name.c_str()));
+    if (line) {
+        speed = parse::networkSpeed(*line);
+    }
+    return line.has_value();
+}
+
+bool getNetworkDuplex(const std::string& name) {
+    const LogScope scope;
+    const auto line = ethtoolLine(formatCommand("ethtool %s 2> /dev/null | grep Duplex", name.c_str()));
+    return line && parse::isFullDuplex(*line);
+}
+
+bool getAutoSense(const std::string& name) {
+    const LogScope scope;
+    const auto line =
+        ethtoolLine(formatCommand("ethtool %s 2> /dev/null | grep Auto-negotiation", name.c_str()));
+    return line && parse::isAutoSense(*line);
+}
+
+void getHardwareAddress(std::string name, std::string& address) {
+    const LogScope scope;
+    const FirstLine answer =
+        firstLine(formatCommand("ifconfig %s 2> /dev/null |grep HWaddr |awk '{print $5}'"
+                                "|tr '[A-Z]' '[a-z]' 2> /dev/null",
+                                name.c_str()));
+    if (!answer.started) {
+        log(kProgress) << "getHardwareAddress: Can not get Hardware Address for SLES machine";
+        return;
+    }
+    address = trimEnd(answer.line.value_or(""));
+}
+
+bool isInterfaceUP(std::string name) {
+    const LogScope scope;
+    // The blank at the end is nothing to the shell: the name is looked for anywhere in the lines, and eth1
+    // finds eth10. A bond's aliases (bond0:1) are found by their bond's name this way.
+    name += ' ';
+    const auto command = access(ifconfigSnapshotPath, R_OK) == 0
+                             ? formatCommand("cat %s | grep %s", ifconfigSnapshotPath, name.c_str())
+                             : formatCommand("ifconfig | grep %s", name.c_str());
+    return firstLine(command).line.has_value();
+}
+
+bool isNICUp(std::string name) {
+    const LogScope scope;
+    if (contains(name, "bond")) {
+        return isMiiStatusUp(name) && areMembersUp(name);
+    }
+    const FirstLine answer =
+        firstLine(HostCommand::fromText("ethtool " + name + " 2> /dev/null" + " | grep \"Link detected\""));
+    if (!answer.started) {
+        log(kError) << "isNICUp - ethtool error";
+    }
+    if (!answer.line) {
+        return false;
+    }
+    log(kProgress) << "buffer = " << *answer.line;
+    return parse::isLinkDetected(*answer.line);
+}
+
+}  // namespace IC

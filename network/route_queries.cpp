@@ -1,0 +1,62 @@
+#include "network/route_queries.h"
+
+#include "mi/command.h"
+#include "mi/log.h"
+#include "mi/text.h"
+#include "network/address_parse.h"
+
+namespace IC {
+
+namespace {
+
+constexpr char kOnLink[] = "0.0.0.0";  ///< what `route -n` prints for a route without a gateway
+
+bool firstLineInto(const std::optional<std::string>& command, std::string& text) {
+    const FirstLine answer = firstLine(command);
+    if (answer.line) {
+        text = trimEnd(*answer.line);
+    }
+    return answer.line.has_value();
+}
+
+}  // namespace
+
+bool getIPV4Gateway(const std::string& name, std::string& gateway) {
+    const LogScope scope;
+    gateway.clear();
+    {
+        HostCommand routes(formatCommand("route -n | grep %s | tr -s ' ' 2> /dev/null", name.c_str()));
+        if (!routes.started()) {
+            return false;
+        }
+        while (const auto line = routes.nextLine()) {
+            log(kProgress) << "Buff :" << *line;
+            gateway = parse::gatewayField(*line).value_or(gateway);
+            if (!gateway.empty() && gateway != kOnLink) {
+                return true;
+            }
+        }
+    }
+    log(kProgress) << "gw :" << gateway;
+    if (gateway != kOnLink) {
+        return false;
+    }
+    return firstLineInto(
+        formatCommand("route -n | grep \"^0.0.0.0\" | tr -s ' ' | cut -d ' ' -f2 2> /dev/null"), gateway);
+}
+
+bool getIPV6Gateway(const std::string& name, std::string& gateway) {
+    const LogScope scope;
+    gateway.clear();
+    return firstLineInto(formatCommand("route -A inet6 -n 2> /dev/null | grep %s | grep UG | tr -s ' '"
+                                       " | cut -d ' ' -f2 2> /dev/null",
+                                       name.c_str()),
+                         gateway);
+}
+
+bool isIPv6GatewayAddressPresent(const std::string& address) {
+    const LogScope scope;
+    return contains(address, ":");
+}
+
+}  // namespace IC
