@@ -97,17 +97,4 @@ private:
     int line_;
 };
 
-/// The same in the other wording in use: "Entering <function>" and "Exiting <function>".
-class EnteringScope {
-public:
-    explicit EnteringScope(const char* function = __builtin_FUNCTION(), int line = __builtin_LINE());
-    EnteringScope(const EnteringScope&) = delete;
-    EnteringScope& operator=(const EnteringScope&) = delete;
-    ~EnteringScope();
-
-private:
-    const char* function_;
-    int line_;
-};
-
 }  // namespace IC
