@@ -22,6 +22,9 @@ constexpr Step kStartUp[] = {
     {"createPlanarNodes", [](OsHwMI& mi) { mi.createPlanarNodes(); }},
     {"createNetworkControllerNodes", [](OsHwMI& mi) { mi.createNetworkControllerNodes(); }},
     {"createDiskControllerNodes", [](OsHwMI& mi) { mi.createDiskControllerNodes(); }},
+    {"createHardDriveNodes", [](OsHwMI& mi) { mi.createHardDriveNodes(false); }},
+    {"createPartitionNodes", [](OsHwMI& mi) { mi.createPartitionNodes(false); }},
+    {"startHDDThread", [](OsHwMI& mi) { mi.startHDDThread(); }},
 };
 
 /// Runs one step; what it throws is logged and goes no further.
@@ -62,6 +65,7 @@ Error OsHwMI::unload() {
     HardDriveNodeUpdate = true;
     guarded("stopHardDriveMonitor", [&] { stopHardDriveMonitor(); });
     Error result = ManagementInterface::unload();
+    guarded("deleteFdiskTmp", [] { deleteFdiskTmp(); });
     driveNodes_.clear();
     partitionNodes_.clear();
     const std::lock_guard lock(inventoryGuard_);

@@ -11,6 +11,7 @@
 #include "framework/netinfo/records.h"
 #include "framework/qx/event.h"
 #include "framework/qx/thread.h"
+#include "mi/fingerprint.h"
 
 namespace IC {
 
@@ -90,11 +91,7 @@ private:
         std::map<std::string, unsigned int> previousStates;
         std::map<unsigned int, MutableNode*> processors;  ///< by processor number, from 1
     };
-    /// What a fingerprint was when the nodes were last built, and what it is now.
-    struct Fingerprint {
-        std::string reference;
-        std::string current;
-    };
+    struct StorageKind;  // storage/storage_build.h
 
     /// Takes the next node id and remembers it as drawn.
     unsigned int drawNodeId();
@@ -110,6 +107,11 @@ private:
     /// A copy: the walk over the interfaces and the network monitor run at the same time.
     std::map<std::string, MutableNode*> nodesByName() const;
     void stopHardDriveMonitor();
+    /// The frame of both storage builders: the old nodes go, each line of the listing may give a new one.
+    void buildStorageNodes(const StorageKind& kind, bool update);
+    void handOver(std::unique_ptr<MutableNode> node, const StorageKind& kind, bool update);
+    std::unique_ptr<MutableNode> buildHardDrive(const std::string& line, unsigned int index, bool update);
+    std::unique_ptr<MutableNode> buildPartition(const std::string& line, unsigned int index, bool update);
 
     mutable std::mutex inventoryGuard_;  ///< guards drawnIds and nodesByName; never held while a command runs
     std::unique_ptr<Inventory> inventory_;
@@ -130,10 +132,8 @@ private:
     QX::Event driveMonitorEnded_{true};
     std::unique_ptr<QX::Thread> driveMonitor_;
     bool driveMonitorRuns_ = false;
-    Fingerprint driveMd5_;
-    Fingerprint driveSha1_;
-    Fingerprint partitionMd5_;
-    Fingerprint partitionSha1_;
+    FingerprintPair driveFingerprints_;
+    FingerprintPair partitionFingerprints_;
 
     QX::Event networkMonitorEnded_{true};
     NetworkMonitor* networkMonitor_ = nullptr;

@@ -1,0 +1,88 @@
+#include "storage/drive_monitor.h"
+
+#include "mi/globals.h"
+#include "mi/log.h"
+#include "mi/os_hw_mi.h"
+
+namespace IC {
+
+namespace {
+
+constexpr int kSlices = 12;
+constexpr unsigned int kSliceMilliseconds = 5000;
+
+}  // namespace
+
+HardDriveUpdateMonitor::HardDriveUpdateMonitor(QX::Event* completed) : completed_(completed) {
+    log(kProgress) << "HardDriveUpdateMonitor::const: entry";
+    log(kProgress) << "HardDriveUpdateMonitor::Const: exit";
+}
+
+HardDriveUpdateMonitor::~HardDriveUpdateMonitor() {
+    const LogScope scope("HardDriveUpdateMonitor::~HardDriveUpdateMonitor");
+    // Before the members that run uses are gone.
+    stopRequested = true;
+    join();
+}
+
+void HardDriveUpdateMonitor::stop() {
+    const LogScope scope("HardDriveUpdateMonitor::stop");
+    stopRequested = true;
+    stopSignal_.signal();
+    QX::Thread::sleep(1);
+}
+
+void* HardDriveUpdateMonitor::run(void*) {
+    {
+        const LogScope scope("HardDriveUpdateMonitor::run");
+        // One minute more before the first pass: start-up has only just read the layout.
+        waitOneMinute();
+        while (!ending()) {
+            waitOneMinute();
+            // Also after a stop that came during this wait: a loop once begun ends with its comparison.
+            pass();
+        }
+    }
+    done = true;
+    completed_->signal();
+    return nullptr;
+}
+
+bool HardDriveUpdateMonitor::ending() const {
+    return done || stopRequested || HardDriveNodeUpdate;
+}
+
+void HardDriveUpdateMonitor::waitOneMinute() const {
+    for (int slice = 0; slice < kSlices; ++slice) {
+        if (!ending()) {
+            QX::Thread::sleep(kSliceMilliseconds);
+        }
+    }
+}
+
+void HardDriveUpdateMonitor::pass() {
+    try {
+        myoshwmi.HDDThreadProcess();
+    } catch (const std::exception& failure) {
+        log(kError) << "HDDThreadProcess failed: " << failure.what();
+    } catch (...) {
+        log(kError) << "HDDThreadProcess failed: unknown exception";
+    }
+}
+
+void OsHwMI::startHDDThread() {
+    const LogScope scope("startHDDThread");
+    try {
+        driveMonitor_ = std::make_unique<HardDriveUpdateMonitor>(&driveMonitorEnded_);
+        if (driveMonitor_->start(nullptr)) {
+            driveMonitorRuns_ = true;
+            log(kProgress) << "HardDriveUpdateThread thread created.";
+        } else {
+            log(kError) << "HardDriveUpdateThread thread failed.";
+        }
+    } catch (...) {
+        log(kError) << "HardDriveUpdateThread Caught unknown exception";
+    }
+}
+
+}  // namespace IC

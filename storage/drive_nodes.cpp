@@ -1,0 +1,78 @@
+#include <cmath>
+#include <cstdlib>
+
+#include "mi/command.h"
+#include "mi/log.h"
+#include "mi/node_types.h"
+#include "mi/text.h"
+#include "storage/hard_drive_node.h"
+#include "storage/storage_build.h"
+
+namespace IC {
+
+namespace {
+
+constexpr unsigned int kStatusGood = 1;
+
+/// Disks proper. Software RAID and mapper devices are listed like disks but are none.
+bool isDrive(const std::string& device) {
+    return contains(device, "/dev/sd") || contains(device, "/dev/hd");
+}
+
+/// Bytes as fdisk prints them, in thousands. A text that is no number counts as 0, and so does what no size
+/// can be (converting it would be undefined).
+unsigned long long thousandsOfBytes(const std::string& text) {
+    constexpr double end = 18446744073709551616.0;  // 2^64
+    const double bytes = std::strtod(text.c_str(), nullptr);
+    return bytes > 0 && bytes < end ? static_cast<unsigned long long>(bytes) / 1000 : 0;
+}
+
+void fillDrive(HardDriveNode& node, const std::string& sizeInBytes) {
+    const std::string& device = node.name();
+    node.setProperty(HardDriveNode::devicePath, PropertyValue(device, true));
+    node.setProperty(HardDriveNode::driveSize, PropertyValue(Number(thousandsOfBytes(sizeInBytes)), true));
+    PropertyValue health;
+    if (node.getProperty(HardDriveNode::healthState, health).getStatus() != 0) {
+        return;
+    }
+    node.setProperty(HardDriveNode::healthState, health);
+    if (health == PropertyValue(Number(1U), true)) {
+        log(kProgress) << "Hard Drive Node::Normal " << device;
+    }
+}
+
+}  // namespace
+
+void OsHwMI::createHardDriveNodes(bool update) {
+    static constexpr StorageKind drives = {
+        .builder = "createHardDriveNodes",
+        .listing = "cat /tmp/fdisk_tmp | grep ^Disk",
+        .withdrawnText = "Delete a Hrad Drive entry: ",
+        .publishedText = "Updated Hard Drive Node Published",
+        .nodes = &OsHwMI::driveNodes_,
+        .build = &OsHwMI::buildHardDrive,
+    };
+    buildStorageNodes(drives, update);
+}
+
+std::unique_ptr<MutableNode> OsHwMI::buildHardDrive(const std::string& line, unsigned int index,
+                                                    bool update) {
+    const auto answer = askAboutLine(formatCommand("echo \"%s\" | cut -d \" \" -f2", line.c_str()));
+    const std::string device = trimEnd(answer.value_or(""), ':');
+    if (!isDrive(device)) {
+        return nullptr;
+    }
+    std::unique_ptr<HardDriveNode> node(
+        makeNode<HardDriveNode>(*diskControllerNode_, NodeType::hardDrive, index, device));
+    log(kProgress) << (update ? "Hard Drive Update created " : "New Hard Drive Node created ") << device;
+    node->setDescription("Hard Drive");
+    node->setStatus(kStatusGood);
+    const auto size = askAboutLine(formatCommand("echo \"%s\" | cut -d \" \" -f5", line.c_str()));
+    if (!size) {
+        return nullptr;
+    }
+    fillDrive(*node, *size);
+    return node;
+}
+
+}  // namespace IC

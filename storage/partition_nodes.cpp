@@ -1,0 +1,64 @@
+#include <cstdlib>
+
+#include "mi/command.h"
+#include "mi/log.h"
+#include "mi/node_types.h"
+#include "mi/text.h"
+#include "storage/disk_partition.h"
+#include "storage/storage_build.h"
+
+namespace IC {
+
+namespace {
+
+constexpr unsigned int kStatusGood = 1;
+
+std::string firstToken(const std::string& line) {
+    const std::string text = trimStart(line);
+    return text.substr(0, text.find(' '));
+}
+
+/// Blocks as fdisk prints them. The value goes through the host's own `long`: where that has 32 bits a
+/// partition of 2 TiB or more stays at 2147483647, the number that agents of such hosts have always been
+/// shown.
+unsigned long long blocks(const std::string& text) {
+    const long number = std::strtol(text.c_str(), nullptr, 10);
+    return static_cast<unsigned long long>(static_cast<long long>(number));
+}
+
+}  // namespace
+
+void OsHwMI::createPartitionNodes(bool update) {
+    static constexpr StorageKind partitions = {
+        .builder = "createPartitionNodes",
+        .listing = "cat /tmp/fdisk_tmp | grep ^/dev",
+        .withdrawnText = "Delete a Partition entry: ",
+        .publishedText = "Partition Node Published",
+        .nodes = &OsHwMI::partitionNodes_,
+        .build = &OsHwMI::buildPartition,
+    };
+    buildStorageNodes(partitions, update);
+}
+
+std::unique_ptr<MutableNode> OsHwMI::buildPartition(const std::string& line, unsigned int index, bool) {
+    const std::string device = firstToken(line);
+    std::unique_ptr<DiskPartition> node(
+        makeNode<DiskPartition>(*diskControllerNode_, NodeType::partition, index, device));
+    node->setStatus(kStatusGood);
+    node->setDescription("Partition");
+    node->setProperty(DiskPartition::devicePath, PropertyValue(device, true));
+    node->setProperty(DiskPartition::partitionName, PropertyValue(device, true));
+    const auto answer =
+        askAboutLine(formatCommand("echo \"%s\" |  tr -s '*' ' '  | cut -d ' ' -f4", line.c_str()));
+    if (!answer) {
+        return nullptr;
+    }
+    const std::string size = trimEnd(*answer, '+');
+    log(kProgress) << "Partition blocksize : " << size;
+    const unsigned long long number = blocks(size);
+    log(kProgress) << "Partition blocksize in Uint64 : " << number;
+    node->setProperty(DiskPartition::partitionBlocks, PropertyValue(Number(number), true));
+    return node;
+}
+
+}  // namespace IC
