@@ -1,5 +1,12 @@
 #pragma once
 
+namespace IC {
+
+/// Status of a node whose device is there and works.
+constexpr unsigned int kStatusGood = 1;
+
+}  // namespace IC
+
 namespace IC::NodeType {
 
 // What the agent knows a node's class by.

@@ -9,8 +9,6 @@ namespace IC {
 
 namespace {
 
-constexpr unsigned int kStatusGood = 1;
-
 void describe(MutableNode& node, const char* description) {
     node.setStatus(kStatusGood);
     node.setDescription(description);

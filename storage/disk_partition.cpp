@@ -3,8 +3,24 @@
 #include <utility>
 
 #include "mi/log.h"
+#include "mi/property_table.h"
 
 namespace IC {
+
+namespace {
+
+/// A device that is listed counts as healthy: the listing says nothing more about it.
+Error readHealthState(const DiskPartition&, PropertyValue& out) {
+    out = PropertyValue(Number(1U), true);
+    return result(true);
+}
+
+constexpr Property<DiskPartition> kLive[] = {
+    {DiskPartition::healthState, "HealthState", readHealthState},
+};
+static_assert(idsAscend(kLive));
+
+}  // namespace
 
 DiskPartition::DiskPartition(unsigned int nodeId, unsigned int linkedId, std::vector<unsigned int> miIds,
                              unsigned int nodeType, unsigned int index, std::string name)
@@ -18,11 +34,8 @@ DiskPartition::~DiskPartition() {
 
 Error DiskPartition::getProperty(unsigned int id, PropertyValue& out) const {
     const LogScope scope("DiskPartition::getProperty");
-    if (id != healthState) {
-        return MutableNode::getProperty(id, out);
-    }
-    out = PropertyValue(Number(1U), true);
-    return {};
+    const auto* row = findProperty(kLive, id);
+    return row != nullptr ? row->read(*this, out) : MutableNode::getProperty(id, out);
 }
 
 Error DiskPartition::setProperty(const unsigned int& id, const PropertyValue& value) {

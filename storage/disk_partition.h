@@ -10,7 +10,7 @@ namespace IC {
 /// A partition: a "/dev" line of the disk snapshot.
 class DiskPartition : public MutableNode {
 public:
-    enum Property : unsigned int {
+    enum PropertyId : unsigned int {
         devicePath = 89,        ///< text
         partitionName = 108,    ///< text: the device path again
         partitionBlocks = 112,  ///< unsigned 64-bit, blocks of 1024 bytes

@@ -12,8 +12,6 @@ namespace IC {
 
 namespace {
 
-constexpr unsigned int kStatusGood = 1;
-
 /// Disks proper. Software RAID and mapper devices are listed like disks but are none.
 bool isDrive(const std::string& device) {
     return contains(device, "/dev/sd") || contains(device, "/dev/hd");

@@ -8,56 +8,68 @@ namespace IC {
 
 namespace {
 
-/// The lines of the snapshot that describe one kind of node, and the commands that digest them.
+struct Digest {
+    const char* command;
+    const char* logged;
+};
+
+/// The lines of the snapshot that describe one kind of node: how they are digested, and what the log says.
 struct Extract {
-    const char* title;  ///< in the log
-    const char* md5Command;
-    const char* sha1Command;
+    const char* entry;
+    const char* exit;
+    const char* different;
+    Digest md5;
+    Digest sha1;
 };
 
 constexpr Extract kDrives = {
-    "Hard Drive Check Sum",
-    "cat /tmp/fdisk_tmp | grep ^Disk |md5sum |awk '{print $1}'",
-    "cat /tmp/fdisk_tmp | grep ^Disk |sha1sum |awk '{print $1}'",
+    .entry = "Hard Drive Check Sum : Entry",
+    .exit = "Hard Drive Check Sum : Exit",
+    .different = "Hard Drive Check Sum found Different",
+    .md5 = {"cat /tmp/fdisk_tmp | grep ^Disk |md5sum |awk '{print $1}'",
+            "cond ::Hard Drive Check Sum : MD5 :: "},
+    .sha1 = {"cat /tmp/fdisk_tmp | grep ^Disk |sha1sum |awk '{print $1}'",
+             "cond ::Hard Drive Check Sum : SHA1 :: "},
 };
 constexpr Extract kPartitions = {
-    "Partition Check Sum",
-    "cat /tmp/fdisk_tmp | grep ^/dev |md5sum |awk '{print $1}'",
-    "cat /tmp/fdisk_tmp | grep ^/dev |sha1sum |awk '{print $1}'",
+    .entry = "Partition Check Sum : Entry",
+    .exit = "Partition Check Sum : Exit",
+    .different = "Partition Check Sum found Different",
+    .md5 = {"cat /tmp/fdisk_tmp | grep ^/dev |md5sum |awk '{print $1}'",
+            "cond ::Partition Check Sum : MD5 :: "},
+    .sha1 = {"cat /tmp/fdisk_tmp | grep ^/dev |sha1sum |awk '{print $1}'",
+             "cond ::Partition Check Sum : SHA1 :: "},
 };
 
 /// The digest, or "" when its command fails: an empty value differs from any earlier one, so that the nodes
 /// are built anew rather than kept on no evidence.
-std::string digest(const char* command, const char* title, const char* kind) {
-    HostCommand answer = startUnderFileLock(command);
+std::string take(const Digest& digest) {
+    HostCommand answer = startUnderFileLock(digest.command);
     if (!answer.started()) {
         return {};
     }
     std::string value = trimEnd(answer.nextLine().value_or(""));
-    log(kProgress) << "cond ::" << title << " : " << kind << " :: " << value;
+    log(kProgress) << digest.logged << value;
     return value;
 }
 
 void takeFingerprints(const Extract& extract, FingerprintPair& pair, bool keepCurrent) {
-    log(kProgress) << extract.title << " : Entry";
-    pair.md5.current.clear();
-    pair.sha1.current.clear();
-    pair.md5.current = digest(extract.md5Command, extract.title, "MD5");
-    pair.sha1.current = digest(extract.sha1Command, extract.title, "SHA1");
+    const LogScope scope(extract.entry, extract.exit);
+    pair.md5.current = take(extract.md5);
+    pair.sha1.current = take(extract.sha1);
     if (!keepCurrent) {
         pair.accept();
     }
-    log(kProgress) << extract.title << " : Exit";
 }
 
 template <class Rebuild>
-void rebuildIfDifferent(FingerprintPair& pair, const char* different, Rebuild rebuild) {
+void rebuildIfDifferent(const Extract& extract, FingerprintPair& pair, Rebuild rebuild) {
     if (!pair.differs()) {
         return;
     }
     rebuild();
     pair.accept();
-    log(kProgress) << different;
+    log(kProgress) << extract.different;
 }
 
 }  // namespace
@@ -73,16 +85,14 @@ void OsHwMI::Partition_Checksum(bool keepCurrent) {
 // The references start empty, so that the first pass always rebuilds both kinds: agents rely on seeing every
 // drive and partition published once after start.
 void OsHwMI::HDDThreadProcess() {
-    log(kProgress) << "Hard Drive ThreadProcess :: Entry";
-    if (takeDiskSnapshot()) {
-        HardDrive_Checksum(true);
-        Partition_Checksum(true);
-        rebuildIfDifferent(driveFingerprints_, "Hard Drive Check Sum found Different",
-                           [this] { createHardDriveNodes(true); });
-        rebuildIfDifferent(partitionFingerprints_, "Partition Check Sum found Different",
-                           [this] { createPartitionNodes(true); });
+    const LogScope scope("Hard Drive ThreadProcess :: Entry", "Hard Drive ThreadProcess :: Exit");
+    if (!takeDiskSnapshot()) {
+        return;
     }
-    log(kProgress) << "Hard Drive ThreadProcess :: Exit";
+    HardDrive_Checksum(true);
+    Partition_Checksum(true);
+    rebuildIfDifferent(kDrives, driveFingerprints_, [this] { createHardDriveNodes(true); });
+    rebuildIfDifferent(kPartitions, partitionFingerprints_, [this] { createPartitionNodes(true); });
 }
 
 }  // namespace IC

@@ -10,7 +10,7 @@ namespace IC {
 /// A hard drive: a "Disk" line of the disk snapshot.
 class HardDriveNode : public MutableNode {
 public:
-    enum Property : unsigned int {
+    enum PropertyId : unsigned int {
         driveSize = 37,     ///< unsigned 64-bit, thousands of bytes
         devicePath = 89,    ///< text
         healthState = 123,  ///< live: always 1

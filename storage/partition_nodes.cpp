@@ -11,8 +11,6 @@ namespace IC {
 
 namespace {
 
-constexpr unsigned int kStatusGood = 1;
-
 std::string firstToken(const std::string& line) {
     const std::string text = trimStart(line);
     return text.substr(0, text.find(' '));
