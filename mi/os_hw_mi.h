@@ -107,6 +107,9 @@ private:
     /// A copy: the walk over the interfaces and the network monitor run at the same time.
     std::map<std::string, MutableNode*> nodesByName() const;
     void stopHardDriveMonitor();
+    /// What a bond member's change since the last pass means for the bond (indications/).
+    unsigned int memberVerdict(const std::string& member) const;
+    void sendAlert(const Alert& alert);
     /// The frame of both storage builders: the old nodes go, each line of the listing may give a new one.
     void buildStorageNodes(const StorageKind& kind, bool update);
     void handOver(std::unique_ptr<MutableNode> node, const StorageKind& kind, bool update);

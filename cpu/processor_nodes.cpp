@@ -1,0 +1,66 @@
+// One node for each logical processor the kernel lists, under the planar.
+#include <cstdlib>
+#include <fstream>
+
+#include "mi/command.h"
+#include "mi/log.h"
+#include "mi/node_types.h"
+#include "mi/os_hw_mi.h"
+#include "mi/text.h"
+
+namespace IC {
+
+namespace {
+
+/// Properties of a processor node.
+enum ProcessorProperty : unsigned int {
+    kClockSpeed = 80,  ///< whole MHz, from the "cpu MHz" line of /proc/cpuinfo
+};
+
+constexpr char kListProcessors[] = "cat /proc/cpuinfo 2> /dev/null |grep processor 2> /dev/null ";
+constexpr std::size_t kLongestLine = 127;
+
+}  // namespace
+
+void OsHwMI::createCpuNodeAndMap() {
+    const LogScope scope("createCpuNodeAndMap", processorsLogSource);
+    HostCommand command{std::string(kListProcessors)};
+    if (!command.started()) {
+        logCpu(kError) << "createCpuNodeAndMap(): cmd_cpu error";
+        return;
+    }
+    inventory_->processors.clear();
+    unsigned int number = 1;
+    while (const auto line = command.nextLine(kLongestLine)) {
+        if (!contains(*line, ":")) {
+            logCpu(kError) << "Invalid format: buffer = " << *line;
+            continue;
+        }
+        node_ = makeNode<MutableNode>(*planarNode_, NodeType::processor, number);
+        appendNode(node_);
+        inventory_->processors.emplace(number++, node_);
+    }
+}
+
+void OsHwMI::createCpuNodes() {
+    const LogScope scope("createCpuNodes", processorsLogSource);
+    if (!inventory_ || planarNode_ == nullptr) {
+        return;  // called outside initialize and unload: there is no tree to hang them in
+    }
+    createCpuNodeAndMap();
+    std::ifstream cpuinfo("/proc/cpuinfo");
+    auto processor = inventory_->processors.begin();
+    for (std::string line; processor != inventory_->processors.end() && std::getline(cpuinfo, line);) {
+        if (!contains(line, "cpu MHz")) {
+            continue;
+        }
+        const std::string speed = line.substr(line.find(':') + 1);
+        processor->second->setDescription("Processor");
+        processor->second->setProperty(
+            kClockSpeed,
+            PropertyValue(Number(static_cast<unsigned int>(std::strtoul(speed.c_str(), nullptr, 10))), true));
+        ++processor;
+    }
+}
+
+}  // namespace IC

@@ -1,0 +1,15 @@
+// All globals of the indication source.
+#include "indications/globals.h"
+
+#include "mi/log.h"
+
+namespace IC {
+
+std::string OSHWMI_IND::loggerOsHwMIInd = "Corvista.IC.MI.OsHwMIInd";
+const LogSource indicationsLogSource{"OsHwMIInd_ix86", &OSHWMI_IND::loggerOsHwMIInd};
+
+Error OSHWMI_IND::myerr;
+std::vector<std::string> OSHWMI_IND::slaves;
+std::atomic<bool> OSHWMI_IND::datFileAvailable{false};
+
+}  // namespace IC

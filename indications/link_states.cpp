@@ -1,0 +1,111 @@
+// The link states of this pass, read from the published nodes.
+#include <algorithm>
+#include <optional>
+
+#include "indications/globals.h"
+#include "indications/link_state.h"
+#include "mi/command.h"
+#include "mi/log.h"
+#include "mi/os_hw_mi.h"
+#include "mi/text.h"
+
+namespace IC {
+
+namespace {
+
+struct NamedState {
+    std::string name;
+    unsigned int state;
+};
+
+/// What a node says of itself now; nothing when one of the two reads fails.
+std::optional<NamedState> readState(const MutableNode& node) {
+    PropertyValue name(PropertyValue::text, true);
+    PropertyValue state(PropertyValue::number, true);
+    if (node.getProperty(LinkState::nameProperty, name).getStatus() != 0 ||
+        node.getProperty(LinkState::stateProperty, state).getStatus() != 0) {
+        return std::nullopt;
+    }
+    try {
+        return NamedState{static_cast<std::string>(name), static_cast<unsigned int>(state)};
+    } catch (const ConversionError& failure) {
+        logInd(kError) << "Link state of " << static_cast<std::string>(name) << ": " << failure.what();
+        return std::nullopt;
+    }
+}
+
+/// The member's name in a line "Slave Interface: eth0".
+std::string slaveName(std::string line) {
+    constexpr char label[] = "Slave Interface:";
+    if (const auto at = line.find(label); at != std::string::npos) {
+        line.erase(at, sizeof label - 1);
+    }
+    return trimEnd(trimStart(std::move(line)));
+}
+
+/// What one member's change means for its bond.
+unsigned int verdict(unsigned int before, unsigned int now) {
+    if (before == LinkState::up && now == LinkState::down) {
+        return LinkState::switchedOver;
+    }
+    if (before == LinkState::down && now == LinkState::up) {
+        return LinkState::switchedBack;
+    }
+    return LinkState::noVerdict;
+}
+
+}  // namespace
+
+void OsHwMI::createCurNetNodeMap() {
+    const LogScope scope("OsHwMI::createCurNetNodeMap(): entry", "returning from createCurNetNodeMap",
+                         indicationsLogSource);
+    inventory_->currentStates.clear();
+    for (const auto& [key, node] : nodesByName()) {
+        const auto now = readState(*node);
+        if (!now) {
+            continue;
+        }
+        unsigned int state = now->state;
+        if (contains(now->name, "bond")) {
+            logInd(kProgress) << "Calling bondedNetNodeStatus() for bonded interface: " << now->name;
+            const unsigned int failOver = bondedNetNodeStatus(now->name);
+            state = failOver == LinkState::noVerdict ? state : failOver;
+        }
+        inventory_->currentStates[now->name] = state;
+    }
+}
+
+unsigned int OsHwMI::bondedNetNodeStatus(const std::string& bond) {
+    logInd(kProgress) << "bondedNetNodeStatus: entry";
+    HostCommand command(formatCommand(
+        "cat /proc/net/bonding/%s 2> /dev/null | grep \"Slave Interface: \" 2> /dev/null", bond.c_str()));
+    if (!command.started()) {
+        logInd(kError) << "OsHwMI::bondedNetNodeStatus - grepping slave device error";
+        return LinkState::noVerdict;
+    }
+    std::vector<std::string> members;
+    while (const auto line = command.nextLine()) {
+        members.push_back(slaveName(*line));
+        logInd(kProgress) << "OsHwMI::bondedNetNodeStatus - slaveInterface is: " << members.back();
+        OSHWMI_IND::slaves.push_back(members.back());
+    }
+    unsigned int status = LinkState::noVerdict;
+    for (auto member = members.begin(); member != members.end() && status == LinkState::noVerdict; ++member) {
+        status = memberVerdict(*member);
+    }
+    logInd(kProgress) << "Returning from bondedNetNodeStatus(). Status: " << status;
+    return status;
+}
+
+unsigned int OsHwMI::memberVerdict(const std::string& member) const {
+    // Compared with the last pass only: the current map is still being built when this is asked.
+    const auto before = inventory_->previousStates.find(member);
+    MutableNode* node = nullptr;
+    if (before == inventory_->previousStates.end() || !findNetworkPort(member, &node)) {
+        return LinkState::noVerdict;
+    }
+    const auto now = readState(*node);
+    return now && now->name == member ? verdict(before->second, now->state) : LinkState::noVerdict;
+}
+
+}  // namespace IC

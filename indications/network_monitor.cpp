@@ -1,0 +1,104 @@
+#include "indications/network_monitor.h"
+
+#include <memory>
+#include <typeinfo>
+
+#include "indications/globals.h"
+#include "mi/globals.h"
+#include "mi/log.h"
+#include "mi/os_hw_mi.h"
+
+namespace IC {
+
+namespace {
+
+constexpr unsigned long kSecondsBetweenPasses = 30;
+constexpr unsigned int kLongestWait = 10;  // seconds for the thread to end
+
+}  // namespace
+
+NetworkMonitor::NetworkMonitor(QX::Event* ended) : ended_(ended) {
+    const LogScope scope("NetworkMonitor::NetworkMonitor", indicationsLogSource);
+}
+
+NetworkMonitor::~NetworkMonitor() {
+    const LogScope scope("NetworkMonitor::~NetworkMonitor", indicationsLogSource);
+    join();  // the thread still reads our members when it says that it is done
+}
+
+void NetworkMonitor::stop() {
+    const LogScope scope("NetworkMonitor::stop", indicationsLogSource);
+    stopRequested_ = true;
+    wake_.signal();
+    QX::Thread::sleep(1);
+}
+
+void* NetworkMonitor::run(void*) {
+    logInd(kProgress) << "NetworkMonitor: run entry";
+    while (!ending()) {
+        try {
+            pass();
+        } catch (const std::exception& failure) {
+            logInd(kError) << "OsHwMIInd Caught " << failure.what();
+        }
+        OSHWMI_IND::slaves.clear();
+        if (!ending()) {
+            wake_.wait(kSecondsBetweenPasses);
+        }
+    }
+    done_ = true;
+    ended_->signal();
+    logInd(kProgress) << "NetworkMonitor: run exit";
+    return nullptr;
+}
+
+void NetworkMonitor::pass() {
+    myoshwmi.readPrevNetNodeMap();
+    myoshwmi.createCurNetNodeMap();
+    if (stopRequested_) {
+        return;  // the commands of this pass may have been killed: what they answered is not the host's state
+    }
+    myoshwmi.checkAndSendNetAlert();
+    myoshwmi.writePrevNetNodeMap();
+}
+
+void OsHwMI::enableIndications() {
+    const LogScope scope("enableIndications", indicationsLogSource);
+    try {
+        logInd(kProgress) << "Creating NetworkMonitor thread.";
+        auto monitor = std::make_unique<NetworkMonitor>(&networkMonitorEnded_);
+        if (!monitor->start(nullptr)) {
+            logInd(kError) << "NetworkMonitor thread failed.";
+            return;
+        }
+        networkMonitor_ = monitor.release();
+        logInd(kProgress) << "NetworkMonitor thread created.";
+    } catch (const std::exception& failure) {
+        logInd(kError) << "OsHwMIInd Caught " << failure.what() << " Type " << typeid(failure).name();
+    } catch (...) {
+        logInd(kError) << "OsHwMIInd Caught unknown exception";
+    }
+}
+
+void OsHwMI::disableIndications() {
+    const LogScope scope("disableIndications", indicationsLogSource);
+    if (networkMonitor_ == nullptr) {
+        return;
+    }
+    logInd(kProgress) << "eventThreadNetIndications: Stopping thread...";
+    networkMonitor_->stop();
+    if (!networkMonitor_->isDone()) {
+        logInd(kProgress) << "eventThreadNetIndications: Aborting thread...";
+        networkMonitor_->abort();
+    }
+    for (unsigned int waits = 0; !networkMonitor_->isDone() && waits < kLongestWait; ++waits) {
+        logInd(kProgress) << "eventThreadNetIndications: Waiting for thread " << waits << " seconds so far";
+        networkMonitorEnded_.wait(1);
+    }
+    logInd(kProgress) << (networkMonitor_->isDone() ? "eventThreadNetIndicationsThread terminated."
+                                                    : "eventThreadNetIndications termination failed.");
+    delete networkMonitor_;
+    networkMonitor_ = nullptr;
+}
+
+}  // namespace IC

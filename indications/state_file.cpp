@@ -1,0 +1,77 @@
+// The link states of the last pass, kept across restarts of the agent: one key an interface, its state in
+// decimal.
+#include <charconv>
+#include <optional>
+#include <stdexcept>
+
+#include "framework/qx/corvista_utilities.h"
+#include "framework/qx/property_file.h"
+#include "framework/qx/strings.h"
+#include "indications/globals.h"
+#include "mi/log.h"
+#include "mi/os_hw_mi.h"
+
+namespace IC {
+
+namespace {
+
+// As the files of the agent are read and written.
+constexpr unsigned long kRead = 1;
+constexpr unsigned long kReadAndWrite = 3;
+
+/// The data directory's text carries its slash.
+std::string stateFilePath() {
+    const char* directory = QX::CorvistaUtilities::getMoraineDataDir();
+    if (directory == nullptr) {
+        logInd(kNoAnswer) << "NULL returned by CorvistaUtilities::getMoraineDataDir()";
+        throw std::runtime_error("no data directory");
+    }
+    return std::string(directory) + "oshwminetind.dat";
+}
+
+std::optional<unsigned int> decimal(const std::string& text) {
+    unsigned int number = 0;
+    const char* end = text.data() + text.size();
+    const auto [stopped, failure] = std::from_chars(text.data(), end, number);
+    return failure == std::errc() && stopped == end ? std::optional(number) : std::nullopt;
+}
+
+}  // namespace
+
+void OsHwMI::writePrevNetNodeMap() {
+    const LogScope scope("writePrevNetNodeMap", indicationsLogSource);
+    try {
+        QX::PropertyFile file{QX::File::Path(stateFilePath())};
+        file.open(kReadAndWrite);
+        // What is not visited stays: an interface that comes back is compared with what it was.
+        for (const auto& [name, state] : inventory_->currentStates) {
+            file.setValue(QX::make_wstring(name), std::to_wstring(state));
+        }
+        file.close();
+    } catch (const std::exception&) {
+        logInd(kError) << "OSHWMI_NET_IND_DAT_FILE: Exception in writing file";
+    }
+}
+
+void OsHwMI::readPrevNetNodeMap() {
+    const LogScope scope("readPrevNetNodeMap", indicationsLogSource);
+    inventory_->previousStates.clear();
+    try {
+        QX::PropertyFile file{QX::File::Path(stateFilePath())};
+        file.open(kRead);
+        for (const std::wstring& key : file.enumerateKeys()) {
+            if (const auto state = decimal(QX::make_string(file.getValue(key)))) {
+                inventory_->previousStates[QX::make_string(key)] = *state;
+            }
+        }
+        file.close();
+        OSHWMI_IND::datFileAvailable = true;
+    } catch (const std::exception&) {
+        // The first start of all has no file: an empty map raises no alert.
+        logInd(kProgress) << "OSHWMI_NET_IND_DAT_FILE: Not available";
+        inventory_->previousStates.clear();
+        OSHWMI_IND::datFileAvailable = false;
+    }
+}
+
+}  // namespace IC
