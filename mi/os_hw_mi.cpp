@@ -24,6 +24,7 @@ constexpr Step kStartUp[] = {
     {"createDiskControllerNodes", [](OsHwMI& mi) { mi.createDiskControllerNodes(); }},
     {"createHardDriveNodes", [](OsHwMI& mi) { mi.createHardDriveNodes(false); }},
     {"createPartitionNodes", [](OsHwMI& mi) { mi.createPartitionNodes(false); }},
+    {"enableIndications", [](OsHwMI& mi) { mi.enableIndications(); }},
     {"startHDDThread", [](OsHwMI& mi) { mi.startHDDThread(); }},
 };
 
@@ -64,6 +65,7 @@ Error OsHwMI::unload() {
     const LogScope scope("unload");
     HardDriveNodeUpdate = true;
     guarded("stopHardDriveMonitor", [&] { stopHardDriveMonitor(); });
+    guarded("disableIndications", [&] { disableIndications(); });
     Error result = ManagementInterface::unload();
     guarded("deleteFdiskTmp", [] { deleteFdiskTmp(); });
     driveNodes_.clear();
