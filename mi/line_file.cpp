@@ -1,10 +1,75 @@
 #include "mi/line_file.h"
 
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
 #include <fstream>
+#include <string_view>
+#include <utility>
 
 #include "mi/log.h"
 
 namespace IC {
+
+namespace {
+
+/// A file whose content is replaced where it stands: it keeps its owner, its rights and its links.
+class File {
+public:
+    explicit File(const std::string& path)
+        : descriptor_(open(path.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0666)) {}
+    File(const File&) = delete;
+    File& operator=(const File&) = delete;
+    ~File() {
+        if (opened()) {
+            close(descriptor_);
+        }
+    }
+
+    bool opened() const { return descriptor_ >= 0; }
+
+    /// Makes room for `size` bytes without touching the content. False when the disk is full; a file system
+    /// that cannot reserve is taken at its word later.
+    bool reserve(std::size_t size) const {
+        struct stat before {};
+        if (size == 0 || fstat(descriptor_, &before) != 0 ||
+            fallocate(descriptor_, 0, 0, static_cast<off_t>(size)) == 0) {
+            return true;
+        }
+        if (errno != ENOSPC && errno != EDQUOT) {
+            return true;
+        }
+        cutTo(before.st_size);
+        return false;
+    }
+
+    bool put(std::string_view content) const {
+        const auto size = static_cast<off_t>(content.size());
+        while (!content.empty()) {
+            const ssize_t written = ::write(descriptor_, content.data(), content.size());
+            if (written < 0 && errno == EINTR) {
+                continue;
+            }
+            if (written <= 0) {
+                cutTo(size - static_cast<off_t>(content.size()));
+                return false;
+            }
+            content.remove_prefix(static_cast<std::size_t>(written));
+        }
+        cutTo(size);
+        return true;
+    }
+
+private:
+    /// What is no regular file has no length to cut.
+    void cutTo(off_t size) const { [[maybe_unused]] const int ignored = ftruncate(descriptor_, size); }
+
+    int descriptor_;
+};
+
+}  // namespace
 
 bool LineFile::isTooLong(const std::string& line) {
     const std::size_t length = line.ends_with('\n') ? line.size() - 1 : line.size();
@@ -20,7 +85,7 @@ std::optional<LineFile> LineFile::read(const std::string& path) {
     for (std::string line; std::getline(in, line);) {
         file.lines_.push_back(in.eof() ? line : line + '\n');
     }
-    return file;
+    return in.bad() ? std::nullopt : std::optional(std::move(file));
 }
 
 void LineFile::append(const std::string& line) {
@@ -34,19 +99,20 @@ void LineFile::prepend(const std::string& line) {
     lines_.insert(lines_.begin(), line);
 }
 
-bool LineFile::write(const std::string& path) const {
-    std::ofstream out(path, std::ios::trunc);
-    if (!out) {
-        return false;
+LineFile::Written LineFile::replace(const std::string& path) const {
+    const File file(path);
+    if (!file.opened()) {
+        return Written::notOpened;
     }
+    std::string content;
     for (const std::string& line : lines_) {
-        out << line;
+        content += line;
     }
-    out.close();
-    if (!out) {
-        log(kError) << "Could not write all of '" << path << "'.";
+    if (file.reserve(content.size()) && file.put(content)) {
+        return Written::whole;
     }
-    return true;
+    log(kError) << "Could not write all of '" << path << "'.";
+    return Written::notWhole;
 }
 
 }  // namespace IC

@@ -20,7 +20,8 @@ public:
     static constexpr std::size_t longestLine = 512;
 
     LineFile() = default;  ///< no lines
-    /// The lines of a file; nothing when it cannot be opened for reading.
+    /// The lines of a file; nothing when it cannot be opened for reading, or not read to its end: rewriting
+    /// it would lose the rest.
     static std::optional<LineFile> read(const std::string& path);
 
     /// Calls `rule(std::string& line)` for every line in order. The line carries its line break, which the
@@ -43,10 +44,16 @@ public:
     void clear() { lines_.clear(); }
     const std::vector<std::string>& lines() const { return lines_; }
 
-    /// Replaces the content of the file, created when it is missing. A failure half-way (disk full) leaves
-    /// what was written so far and is logged at level 6000.
+    /// What became of a file that was to be written.
+    enum class Written { notOpened, notWhole, whole };
+
+    /// Replaces the content of the file, created when it is missing. The room it takes is reserved first, so
+    /// that a full disk leaves the file as it was; where the file system cannot reserve, a failure half-way
+    /// leaves what was written so far. Both are logged at level 6000.
+    Written replace(const std::string& path) const;
+    /// The same for writers that go on either way.
     /// @return whether the file could be opened for writing
-    bool write(const std::string& path) const;
+    bool write(const std::string& path) const { return replace(path) != Written::notOpened; }
 
 private:
     static bool isTooLong(const std::string& line);
