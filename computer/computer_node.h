@@ -4,12 +4,42 @@
 
 namespace IC {
 
-/// The computer system as a whole.
+/// Property ids of the computer node.
+namespace ComputerProperty {
+constexpr unsigned int hostName = 108;
+constexpr unsigned int ownerContact = 115;
+constexpr unsigned int ownerName = 116;
+constexpr unsigned int powerAction = 123;
+constexpr unsigned int powerActions = 125;  ///< the values powerAction may have; stored, not asked
+constexpr unsigned int currentTime = 126;
+constexpr unsigned int timeZoneOffset = 127;
+constexpr unsigned int constant200 = 200;
+}  // namespace ComputerProperty
+
+/// Values of ComputerProperty::powerAction.
+namespace PowerAction {
+constexpr unsigned int running = 1;  ///< the state of a host that answers; writing it does nothing
+constexpr unsigned int restart = 9;
+constexpr unsigned int halt = 12;
+}  // namespace PowerAction
+
+/// The computer system as a whole: names, owner, clock, power.
 class ComputerNode : public MutableNode {
 public:
     ComputerNode(unsigned int nodeId, unsigned int linkedId, std::vector<unsigned int> miIds,
                  unsigned int nodeType, unsigned int index);
     ~ComputerNode() override;
+
+    /// Asks the host: its name (gethostname), the owner's data (asset file), the clock in seconds since
+    /// 1970-01-01 UTC, the offset from UTC in force in minutes (east positive). Every other id gives what was
+    /// stored last.
+    /// @return status 1 when the host did not answer; `out` is then empty
+    Error getProperty(unsigned int id, PropertyValue& out) const override;
+    /// Changes the host once start-up is over; until then every value is only stored. The owner's data are
+    /// stored as well, the clock (an ISO 8601 text) and the zone (one of the offsets of the zone table) are
+    /// not: they are read from the host. A power action is run without waiting for its success.
+    /// @return status 1 when the change was not made or the value is none that the property can have
+    Error setProperty(const unsigned int& id, const PropertyValue& value) override;
 };
 
 }  // namespace IC

@@ -88,10 +88,14 @@ std::optional<LineFile> LineFile::read(const std::string& path) {
     return in.bad() ? std::nullopt : std::optional(std::move(file));
 }
 
-void LineFile::append(const std::string& line) {
+void LineFile::endLastLine() {
     if (!lines_.empty() && !lines_.back().ends_with('\n')) {
         lines_.back() += '\n';
     }
+}
+
+void LineFile::append(const std::string& line) {
+    endLastLine();
     lines_.push_back(line);
 }
 

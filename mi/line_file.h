@@ -37,6 +37,8 @@ public:
         lines_ = std::move(kept);
     }
 
+    /// Gives the last line a line break when it lacks one.
+    void endLastLine();
     /// Adds a line (with its line break) at the end; a last line without a line break gets one first.
     void append(const std::string& line);
     /// Adds a line (with its line break) at the start.

@@ -47,12 +47,15 @@ OsHwMI::~OsHwMI() = default;
 
 Error OsHwMI::initialize(unsigned int miId, const Number& ownNodeId, const Number& firstNodeId) {
     const LogScope scope("initialize");
+    // Also the second time: the builders fill nodes, they must not write what they read back to the host.
+    OSHWMI::bInitflag = false;
     {
         const std::lock_guard lock(inventoryGuard_);
         inventory_ = std::make_unique<Inventory>();
     }
     node_ = nullptr;
     initializing_ = 1;
+    guarded("updateHostAndDomainName", [&] { updateHostAndDomainName(); });
     OSHWMI::myerr = ManagementInterface::initialize(miId, ownNodeId, firstNodeId);
     for (const Step& step : kStartUp) {
         guarded(step.name, [&] { step.run(*this); });

@@ -1,0 +1,67 @@
+#include <initializer_list>
+#include <string>
+#include <vector>
+
+#include "computer/computer_node.h"
+#include "mi/command.h"
+#include "mi/log.h"
+#include "mi/node_types.h"
+#include "mi/os_hw_mi.h"
+#include "mi/text.h"
+
+namespace IC {
+
+namespace {
+
+/// Stores what the host answers now.
+bool storeAnswer(MutableNode& computer, unsigned int id) {
+    PropertyValue value;
+    if (computer.getProperty(id, value).getStatus() != 0) {
+        return false;
+    }
+    computer.setProperty(id, value);
+    return true;
+}
+
+void primeOwner(MutableNode& computer) {
+    for (const unsigned int id : {ComputerProperty::ownerName, ComputerProperty::ownerContact}) {
+        if (!storeAnswer(computer, id)) {
+            computer.setProperty(ComputerProperty::ownerName, PropertyValue("", true));
+            computer.setProperty(ComputerProperty::ownerContact, PropertyValue("", true));
+        }
+    }
+}
+
+void primeHostName(MutableNode& computer) {
+    HostCommand command{std::string("hostname 2> /dev/null")};
+    const auto line = command.nextLine();
+    if (line && !contains(*line, "Unknown")) {
+        computer.setProperty(ComputerProperty::hostName, PropertyValue(trimEnd(*line), true));
+    }
+}
+
+/// Fills the store of a new node, so that a reader of all its properties finds them there. Before the end of
+/// start-up writing a property only stores it.
+void prime(MutableNode& computer) {
+    computer.setProperty(ComputerProperty::powerAction, PropertyValue(EnumValue(PowerAction::running), true));
+    const std::vector<Number> accepted{PowerAction::running, PowerAction::restart, PowerAction::halt};
+    computer.setProperty(ComputerProperty::powerActions, PropertyValue(accepted, true));
+    primeOwner(computer);
+    storeAnswer(computer, ComputerProperty::currentTime);
+    storeAnswer(computer, ComputerProperty::timeZoneOffset);
+    primeHostName(computer);
+}
+
+}  // namespace
+
+void OsHwMI::createComputerNodes() {
+    const LogScope scope("createComputerNodes");
+    auto* computer = makeNode<ComputerNode>(*rootNode_, NodeType::computer, 0);
+    computerNode_ = node_ = computer;
+    appendNode(computer);
+    prime(*computer);
+    computer->setStatus(1);
+    computer->setDescription("Computer");
+}
+
+}  // namespace IC

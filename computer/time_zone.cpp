@@ -1,0 +1,99 @@
+#include "computer/time_zone.h"
+
+#include <unistd.h>
+
+#include <cstdio>
+#include <string>
+
+#include "computer/zone_table.h"
+#include "mi/command.h"
+#include "mi/line_file.h"
+#include "mi/log.h"
+
+namespace IC {
+
+namespace {
+
+constexpr char kClockFile[] = "/etc/sysconfig/clock";
+constexpr char kClockCopy[] = "/etc/sysconfig/clock.bak";
+constexpr char kLocalTime[] = "/etc/localtime";
+constexpr char kOldLocalTime[] = "/etc/localtime.bak";
+constexpr char kZoneDirectory[] = "/usr/share/zoneinfo/";
+
+/// Ends every line with a line break and replaces the first one that begins with `key`.
+/// @return whether there was one
+bool replaceFirst(LineFile& file, const char* key, const std::string& replacement) {
+    bool replaced = false;
+    file.endLastLine();
+    file.rewrite([&](std::string& line) {
+        if (!replaced && line.starts_with(key)) {
+            line = replacement;
+            replaced = true;
+        }
+        return LineFile::Fate::keep;
+    });
+    return replaced;
+}
+
+/// Writes the changed lines to the copy and the copy back. Each way is left out when a file of its cannot be
+/// opened. A copy that is not whole, for want of room, is never taken back, and a copy that could not be
+/// taken back whole is not removed: it is all there is.
+void rewriteClock(const std::string& timezoneLine) {
+    auto written = LineFile::Written::notOpened;
+    if (auto clock = LineFile::read(kClockFile)) {
+        replaceFirst(*clock, "TIMEZONE", timezoneLine);
+        written = clock->replace(kClockCopy);
+    }
+    if (written != LineFile::Written::notWhole) {
+        const auto copy = LineFile::read(kClockCopy);
+        if (copy && copy->replace(kClockFile) == LineFile::Written::notWhole) {
+            return;
+        }
+    }
+    remove(kClockCopy);
+}
+
+bool switchLocalTime(const std::string& zoneFile) {
+    rename(kLocalTime, kOldLocalTime);
+    if (symlink(zoneFile.c_str(), kLocalTime) == 0) {
+        return true;
+    }
+    if (rename(kOldLocalTime, kLocalTime) != 0) {
+        log(kError) << "rename /etc/localtime.bak to /etc/localtime failed";
+    }
+    return false;
+}
+
+}  // namespace
+
+bool setTimezone(unsigned int offset) {
+    log(kProgress) << "setTimezone: enter";
+    const Zone* zone = findZone(offset);
+    if (zone == nullptr) {
+        return false;
+    }
+    const std::string zoneFile = std::string(kZoneDirectory) + zone->file;
+    log(kProgress) << "tz_file: " << zoneFile;
+    log(kProgress) << "tz_string: " << zone->name;
+    rewriteClock(std::string("TIMEZONE=\"") + zone->name + "\"\n");
+    const bool switched = switchLocalTime(zoneFile);
+    log(kProgress) << "setTimezone: exit";
+    return switched;
+}
+
+bool setAutoDSTEnabled(bool utc) {
+    const LogScope scope;
+    HostCommand::fromText(std::string("/bin/cp ") + kClockFile + " " + kClockCopy);
+    const auto clock = LineFile::read(kClockFile);
+    auto copy = LineFile::read(kClockCopy);
+    bool replaced = false;
+    // Whether cp did its work is not asked; a copy that is not the clock file's own must not become it.
+    if (clock && copy && copy->lines() == clock->lines()) {
+        replaced = replaceFirst(*copy, "HWCLOCK", utc ? "HWCLOCK=\"-u\"\n" : "HWCLOCK=\"--localtime\"\n");
+        replaced &= copy->replace(kClockFile) == LineFile::Written::whole;
+    }
+    remove(kClockCopy);
+    return replaced;
+}
+
+}  // namespace IC
