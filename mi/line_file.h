@@ -18,6 +18,7 @@ public:
     /// Rules see no line longer than this (characters, without the line break): such a line is kept as it is,
     /// for a tool's own line buffer would tear it in two and half of it could be taken for a key.
     static constexpr std::size_t longestLine = 512;
+    static bool isTooLong(const std::string& line);
 
     LineFile() = default;  ///< no lines
     /// The lines of a file; nothing when it cannot be opened for reading, or not read to its end: rewriting
@@ -58,8 +59,6 @@ public:
     bool write(const std::string& path) const { return replace(path) != Written::notOpened; }
 
 private:
-    static bool isTooLong(const std::string& line);
-
     std::vector<std::string> lines_;
 };
 

@@ -1,0 +1,48 @@
+#pragma once
+
+#include <initializer_list>
+#include <string>
+
+#include "mi/line_file.h"
+
+namespace IC {
+
+/// The one line that a writer of interface files gives a key.
+struct KeyLine {
+    /// What a line that holds the key becomes.
+    enum class Held {
+        replaced,       ///< `line`; the keys behind this one look at the new text
+        kept,           ///< it stays; the keys behind this one look at it too
+        keptUntouched,  ///< it stays, whatever other keys it holds
+    };
+
+    const char* key;   ///< looked for anywhere in a line: "IPADDR_" finds every secondary address
+    std::string line;  ///< with its line break; "" appends nothing
+    Held held = Held::replaced;
+    bool seen = false;  ///< whether a line held the key
+};
+
+/// The configuration file of an interface, /etc/sysconfig/network/ifcfg-eth-id-<hardware address>: read whole
+/// when the object is made, changed by key, written back whole. A missing file is created from what a writer
+/// appends.
+class InterfaceFile {
+public:
+    /// @param mac hardware address as getHardwareAddress gives it
+    explicit InterfaceFile(const std::string& mac);
+
+    const std::string& path() const { return path_; }
+    /// Looks for the keys in every line, in the order given, and marks those seen.
+    void replace(std::initializer_list<KeyLine*> keys);
+    /// Appends the lines of the keys that were not seen, in the order given.
+    void appendMissing(std::initializer_list<const KeyLine*> keys);
+    /// The last line as it stands now; "" when there is none.
+    std::string lastLine() const;
+    /// @return whether the file could be opened for writing; it is the old one when not
+    bool write() const { return file_.write(path_); }
+
+private:
+    std::string path_;
+    LineFile file_;
+};
+
+}  // namespace IC

@@ -1,0 +1,81 @@
+#include "network/ipv6_writer.h"
+
+#include "mi/command.h"
+#include "mi/log.h"
+#include "mi/text.h"
+#include "network/interface_file.h"
+#include "network/routes_file.h"
+
+namespace IC {
+
+void setIPv6Address(std::string, std::string address, std::string mac) {
+    const LogScope scope;
+    KeyLine label{"LABEL_", "LABEL_1='1'\n"};
+    KeyLine secondary{"IPADDR_", "IPADDR_1=" + address + '\n'};
+    KeyLine bootProto{"BOOTPROTO=", "BOOTPROTO=static\n", KeyLine::Held::kept};
+    InterfaceFile file(mac);
+    file.replace({&label, &secondary, &bootProto});
+    file.appendMissing({&bootProto, &label, &secondary});
+    if (file.write()) {
+        log(kChange) << "Writing IP Address";
+    }
+}
+
+void setIPv6PrefixLength(std::string, unsigned int prefixLength, std::string mac) {
+    const LogScope scope;
+    KeyLine length{"PREFIXLEN_", "PREFIXLEN_1=" + std::to_string(prefixLength) + '\n'};
+    InterfaceFile file(mac);
+    file.replace({&length});
+    file.appendMissing({&length});
+    if (file.write()) {
+        log(kChange) << "File open '/etc/sysconfig/network' in write mode.";
+    }
+}
+
+void setIPv6Gateway(std::string ifName, std::string gateway, std::string) {
+    const LogScope scope;
+    setIPv6GatewayForSuSe10(ifName, gateway);
+}
+
+void setIPv6GatewayForSuSe10(std::string const& ifName, std::string const& gateway) {
+    const LogScope scope("setIPv6GatewayForSuSe: entry", "setIPv6GatewayForSuSe10: exit");
+    if (ifName.empty() || gateway.empty()) {
+        log(kError) << "Either NIC or gateway is null";
+        return;
+    }
+    std::vector<std::string> gateways;
+    getStaticIPV6GatewaysOnSuSe10(ifName, gateways);
+    const bool isPresent = std::erase(gateways, gateway) > 0;
+    if (!isPresent && !HostCommand(formatCommand("ip -6 route add default via %s dev %s 2> /dev/null",
+                                                 gateway.c_str(), ifName.c_str()))
+                           .started()) {
+        log(kError) << "Could not execute 'ip -6 route add default' command";
+        return;
+    }
+    deleteStaticIPv6GatewayOnSuSe10(ifName, gateways);
+    if (replaceDefaultRoute(AddressFamily::ipv6, gateway) == RoutesRewrite::notWritten) {
+        log(kError) << "Can not open '/etc/sysconfig/network/routes' in write mode.";
+    }
+}
+
+bool getStaticIPV6GatewaysOnSuSe10(std::string const& ifName, std::vector<std::string>& gateways) {
+    const LogScope scope;
+    HostCommand routes(formatCommand("route -A inet6 -n 2> /dev/null | grep %s | grep UG | grep -v UGDA"
+                                     " | tr -s ' ' | cut -d ' ' -f2 2> /dev/null",
+                                     ifName.c_str()));
+    bool any = false;
+    while (const auto line = routes.nextLine()) {
+        gateways.push_back(trimEnd(*line));
+        any = true;
+    }
+    return any;
+}
+
+void deleteStaticIPv6GatewayOnSuSe10(std::string const& ifName, std::vector<std::string> const& gateways) {
+    const LogScope scope;
+    for (const std::string& gateway : gateways) {
+        HostCommand::fromText("ip -6 route delete default via " + gateway + " dev " + ifName);
+    }
+}
+
+}  // namespace IC

@@ -1,0 +1,46 @@
+#include "network/routes_file.h"
+
+#include <algorithm>
+
+#include "mi/line_file.h"
+#include "mi/text.h"
+#include "network/route_queries.h"
+
+namespace IC {
+
+namespace {
+
+constexpr char kRoutes[] = "/etc/sysconfig/network/routes";
+
+bool isComment(const std::string& line) {
+    return contains(line, "#");
+}
+
+/// Whether the file is worth keeping for this line. One that is too long to be looked into counts, so that it
+/// is never thrown away with the comments.
+bool isWorthKeeping(const std::string& line) {
+    return LineFile::isTooLong(line) || !isComment(line);
+}
+
+}  // namespace
+
+RoutesRewrite replaceDefaultRoute(AddressFamily family, const std::string& gateway) {
+    auto file = LineFile::read(kRoutes);
+    if (!file) {
+        return RoutesRewrite::notRead;
+    }
+    const bool isIPv6 = family == AddressFamily::ipv6;
+    if (std::ranges::any_of(file->lines(), isWorthKeeping)) {
+        file->rewrite([&](const std::string& line) {
+            const bool stays = isComment(line) || isIPv6GatewayAddressPresent(line) != isIPv6;
+            return stays ? LineFile::Fate::keep : LineFile::Fate::drop;
+        });
+    } else {
+        file->clear();
+    }
+    const std::string route = "default\t" + gateway + "\t-\n";
+    isIPv6 ? file->append(route) : file->prepend(route);
+    return file->write(kRoutes) ? RoutesRewrite::written : RoutesRewrite::notWritten;
+}
+
+}  // namespace IC

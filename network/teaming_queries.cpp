@@ -1,0 +1,139 @@
+#include "network/teaming_queries.h"
+
+#include <filesystem>
+
+#include "mi/command.h"
+#include "mi/line_file.h"
+#include "mi/log.h"
+#include "mi/text.h"
+#include "network/bonding_status.h"
+
+namespace IC {
+
+namespace {
+
+namespace fs = std::filesystem;
+
+constexpr char kBonding[] = "/proc/net/bonding";
+
+/// The first line a command prints, without its line break; "" when it prints none.
+std::string answer(const std::optional<std::string>& command) {
+    return trimEnd(firstLine(command).line.value_or(""));
+}
+
+/// What stands behind the colon of a line that `cut` has opened.
+std::string behindColon(const std::string& line) { return trimStart(trimEnd(line)); }
+
+std::string interfaceFileValue(const std::string& port, const char* key) {
+    return answer(formatCommand("cat /etc/sysconfig/network/ifcfg-eth-id-`ifconfig %s 2> /dev/null |grep HWaddr "
+                                "|awk '{print $5}'|tr '[A-Z]' '[a-z]'` | grep %s | cut -d '=' -f2 2> /dev/null",
+                                port.c_str(), key));
+}
+
+std::string activeMember(const std::string& team, const std::string& port) {
+    std::error_code unreadable;
+    if (!fs::exists(fs::path(kBonding) / team, unreadable)) {
+        return "";
+    }
+    const std::string line = answer(
+        formatCommand("cat /proc/net/bonding/%s 2> /dev/null | grep -i \"Currently Active Slave: %s\" 2> /dev/null",
+                      team.c_str(), port.c_str()));
+    // The search for eth1 also finds eth10.
+    return parse::isActiveMember(line, port) ? line : "";
+}
+
+/// The member's section, read without a tool. A `grep` that works line by line, as most do, can never match
+/// the two-line patterns of the commands below.
+parse::BondingMember sectionOf(const std::string& team, const std::string& port) {
+    const LineFile file = LineFile::read(fs::path(kBonding) / team).value_or(LineFile());
+    return parse::bondingMember(file.lines(), port).value_or(parse::BondingMember());
+}
+
+std::string miiStatus(const std::string& team, const std::string& port) {
+    const std::string status =
+        answer(formatCommand("cat /proc/net/bonding/%s 2> /dev/null | grep -P \"Slave Interface: %s\\nMII Status\" "
+                             "2> /dev/null | grep \"MII Status: \" 2> /dev/null | cut -d' ' -f3 2> /dev/null",
+                             team.c_str(), port.c_str()));
+    return status.empty() ? sectionOf(team, port).miiStatus : status;
+}
+
+std::string linkFailures(const std::string& team, const std::string& port, const std::string& status) {
+    const std::string count = answer(formatCommand(
+        "cat /proc/net/bonding/%s 2> /dev/null | grep -P \"Slave Interface: %s\\nMII Status: %s\\n\" 2> /dev/null "
+        "| grep \"Link Failure Count: \" 2> /dev/null | cut -d ' ' -f4 2> /dev/null",
+        team.c_str(), port.c_str(), status.c_str()));
+    if (!count.empty()) {
+        return count;
+    }
+    // The state may have changed since it was asked for: then this is not the section that was meant.
+    const parse::BondingMember section = sectionOf(team, port);
+    return section.miiStatus == status ? section.linkFailures : "";
+}
+
+}  // namespace
+
+bool getNICTeams(std::vector<std::string>& teams) {
+    const LogScope scope("Entering getNICTeams", "Exiting getNICTeams");
+    std::error_code missing;
+    fs::directory_iterator directory(kBonding, missing);
+    if (missing) {
+        return false;
+    }
+    for (const auto& entry : directory) {
+        const std::string name = entry.path().filename();
+        if (!name.starts_with('.') && !name.ends_with('~')) {
+            teams.push_back(name);
+        }
+    }
+    return true;
+}
+
+bool getBondingMode(std::string team, std::string& mode) {
+    const LogScope scope("Entering getBondingMode", "Exiting getBondingMode");
+    mode.clear();
+    const FirstLine first = firstLine(formatCommand(
+        "cat /proc/net/bonding/%s 2> /dev/null | grep \"Bonding Mode: \" | cut -d ':' -f2 2> /dev/null", team.c_str()));
+    if (first.line) {
+        mode = behindColon(*first.line);
+    }
+    return first.line.has_value();
+}
+
+bool getBondingMembers(std::string team, std::vector<std::string>& members) {
+    const LogScope scope("Entering getBondingMembers", "Exiting getBondingMembers");
+    HostCommand listing(
+        formatCommand("cat /proc/net/bonding/%s 2> /dev/null | grep \"Slave Interface: \" | cut -d ':' -f2 2> /dev/null",
+                      team.c_str()));
+    bool any = false;
+    while (const auto line = listing.nextLine()) {
+        members.push_back(behindColon(*line));
+        any = true;
+    }
+    return any;
+}
+
+void getNICTeamingInformation(std::string const& port, unsigned int id, std::string& result, std::string& master) {
+    const LogScope scope("Entering getNICTeamingInformation", "Exiting getNICTeamingInformation");
+    switch (id) {
+        case TeamingProperty::role:
+            result = interfaceFileValue(port, "SLAVE");
+            master = interfaceFileValue(port, "MASTER");
+            break;
+        case TeamingProperty::activeMember:
+            result = activeMember(master, port);
+            break;
+        case TeamingProperty::miiStatus:
+            result = miiStatus(master, port);
+            break;
+        case TeamingProperty::linkFailures: {
+            std::string status;
+            getNICTeamingInformation(port, TeamingProperty::miiStatus, status, master);
+            result = linkFailures(master, port, status);
+            break;
+        }
+        default:
+            break;
+    }
+}
+
+}  // namespace IC
