@@ -24,6 +24,7 @@ constexpr Step kStartUp[] = {
     {"createDiskControllerNodes", [](OsHwMI& mi) { mi.createDiskControllerNodes(); }},
     {"createHardDriveNodes", [](OsHwMI& mi) { mi.createHardDriveNodes(false); }},
     {"createPartitionNodes", [](OsHwMI& mi) { mi.createPartitionNodes(false); }},
+    {"createNetworkTeamingNodes", [](OsHwMI& mi) { mi.createNetworkTeamingNodes(); }},
     {"enableIndications", [](OsHwMI& mi) { mi.enableIndications(); }},
     {"startHDDThread", [](OsHwMI& mi) { mi.startHDDThread(); }},
 };
@@ -70,6 +71,7 @@ Error OsHwMI::unload() {
     guarded("stopHardDriveMonitor", [&] { stopHardDriveMonitor(); });
     guarded("disableIndications", [&] { disableIndications(); });
     Error result = ManagementInterface::unload();
+    guarded("deleteSavedConfigurations", [] { deleteSavedConfigurations(); });
     guarded("deleteFdiskTmp", [] { deleteFdiskTmp(); });
     driveNodes_.clear();
     partitionNodes_.clear();

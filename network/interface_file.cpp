@@ -5,7 +5,8 @@
 namespace IC {
 
 InterfaceFile::InterfaceFile(const std::string& mac)
-    : path_("/etc/sysconfig/network/ifcfg-eth-id-" + mac), file_(LineFile::read(path_).value_or(LineFile())) {}
+    : path_("/etc/sysconfig/network/ifcfg-eth-id-" + mac),
+      file_(LineFile::read(path_).value_or(LineFile())) {}
 
 void InterfaceFile::replace(std::initializer_list<KeyLine*> keys) {
     file_.rewrite([&](std::string& line) {

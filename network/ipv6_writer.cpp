@@ -60,9 +60,10 @@ void setIPv6GatewayForSuSe10(std::string const& ifName, std::string const& gatew
 
 bool getStaticIPV6GatewaysOnSuSe10(std::string const& ifName, std::vector<std::string>& gateways) {
     const LogScope scope;
-    HostCommand routes(formatCommand("route -A inet6 -n 2> /dev/null | grep %s | grep UG | grep -v UGDA"
-                                     " | tr -s ' ' | cut -d ' ' -f2 2> /dev/null",
-                                     ifName.c_str()));
+    HostCommand routes(
+        formatCommand("route -A inet6 -n 2> /dev/null | grep %s | grep UG | grep -v UGDA"
+                      " | tr -s ' ' | cut -d ' ' -f2 2> /dev/null",
+                      ifName.c_str()));
     bool any = false;
     while (const auto line = routes.nextLine()) {
         gateways.push_back(trimEnd(*line));

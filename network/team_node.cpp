@@ -54,8 +54,9 @@ void storeSnapshot(NetworkTeamingNode& node) {
 
 }  // namespace
 
-NetworkTeamingNode::NetworkTeamingNode(unsigned int nodeId, unsigned int linkedId, std::vector<unsigned int> miIds,
-                                       unsigned int nodeType, unsigned int index, std::string name)
+NetworkTeamingNode::NetworkTeamingNode(unsigned int nodeId, unsigned int linkedId,
+                                       std::vector<unsigned int> miIds, unsigned int nodeType,
+                                       unsigned int index, std::string name)
     : MutableNode(nodeId, linkedId, std::move(miIds), nodeType, index), name_(std::move(name)) {
     const LogScope scope("NetworkTeamingNode::NetworkTeamingNode");
 }

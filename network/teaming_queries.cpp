@@ -22,12 +22,15 @@ std::string answer(const std::optional<std::string>& command) {
 }
 
 /// What stands behind the colon of a line that `cut` has opened.
-std::string behindColon(const std::string& line) { return trimStart(trimEnd(line)); }
+std::string behindColon(const std::string& line) {
+    return trimStart(trimEnd(line));
+}
 
 std::string interfaceFileValue(const std::string& port, const char* key) {
-    return answer(formatCommand("cat /etc/sysconfig/network/ifcfg-eth-id-`ifconfig %s 2> /dev/null |grep HWaddr "
-                                "|awk '{print $5}'|tr '[A-Z]' '[a-z]'` | grep %s | cut -d '=' -f2 2> /dev/null",
-                                port.c_str(), key));
+    return answer(
+        formatCommand("cat /etc/sysconfig/network/ifcfg-eth-id-`ifconfig %s 2> /dev/null |grep HWaddr "
+                      "|awk '{print $5}'|tr '[A-Z]' '[a-z]'` | grep %s | cut -d '=' -f2 2> /dev/null",
+                      port.c_str(), key));
 }
 
 std::string activeMember(const std::string& team, const std::string& port) {
@@ -35,9 +38,9 @@ std::string activeMember(const std::string& team, const std::string& port) {
     if (!fs::exists(fs::path(kBonding) / team, unreadable)) {
         return "";
     }
-    const std::string line = answer(
-        formatCommand("cat /proc/net/bonding/%s 2> /dev/null | grep -i \"Currently Active Slave: %s\" 2> /dev/null",
-                      team.c_str(), port.c_str()));
+    const std::string line = answer(formatCommand(
+        "cat /proc/net/bonding/%s 2> /dev/null | grep -i \"Currently Active Slave: %s\" 2> /dev/null",
+        team.c_str(), port.c_str()));
     // The search for eth1 also finds eth10.
     return parse::isActiveMember(line, port) ? line : "";
 }
@@ -50,18 +53,19 @@ parse::BondingMember sectionOf(const std::string& team, const std::string& port)
 }
 
 std::string miiStatus(const std::string& team, const std::string& port) {
-    const std::string status =
-        answer(formatCommand("cat /proc/net/bonding/%s 2> /dev/null | grep -P \"Slave Interface: %s\\nMII Status\" "
-                             "2> /dev/null | grep \"MII Status: \" 2> /dev/null | cut -d' ' -f3 2> /dev/null",
-                             team.c_str(), port.c_str()));
+    const std::string status = answer(
+        formatCommand("cat /proc/net/bonding/%s 2> /dev/null | grep -P \"Slave Interface: %s\\nMII Status\" "
+                      "2> /dev/null | grep \"MII Status: \" 2> /dev/null | cut -d' ' -f3 2> /dev/null",
+                      team.c_str(), port.c_str()));
     return status.empty() ? sectionOf(team, port).miiStatus : status;
 }
 
 std::string linkFailures(const std::string& team, const std::string& port, const std::string& status) {
-    const std::string count = answer(formatCommand(
-        "cat /proc/net/bonding/%s 2> /dev/null | grep -P \"Slave Interface: %s\\nMII Status: %s\\n\" 2> /dev/null "
-        "| grep \"Link Failure Count: \" 2> /dev/null | cut -d ' ' -f4 2> /dev/null",
-        team.c_str(), port.c_str(), status.c_str()));
+    const std::string count =
+        answer(formatCommand("cat /proc/net/bonding/%s 2> /dev/null | grep -P \"Slave Interface: %s\\nMII "
+                             "Status: %s\\n\" 2> /dev/null "
+                             "| grep \"Link Failure Count: \" 2> /dev/null | cut -d ' ' -f4 2> /dev/null",
+                             team.c_str(), port.c_str(), status.c_str()));
     if (!count.empty()) {
         return count;
     }
@@ -92,7 +96,8 @@ bool getBondingMode(std::string team, std::string& mode) {
     const LogScope scope("Entering getBondingMode", "Exiting getBondingMode");
     mode.clear();
     const FirstLine first = firstLine(formatCommand(
-        "cat /proc/net/bonding/%s 2> /dev/null | grep \"Bonding Mode: \" | cut -d ':' -f2 2> /dev/null", team.c_str()));
+        "cat /proc/net/bonding/%s 2> /dev/null | grep \"Bonding Mode: \" | cut -d ':' -f2 2> /dev/null",
+        team.c_str()));
     if (first.line) {
         mode = behindColon(*first.line);
     }
@@ -101,9 +106,9 @@ bool getBondingMode(std::string team, std::string& mode) {
 
 bool getBondingMembers(std::string team, std::vector<std::string>& members) {
     const LogScope scope("Entering getBondingMembers", "Exiting getBondingMembers");
-    HostCommand listing(
-        formatCommand("cat /proc/net/bonding/%s 2> /dev/null | grep \"Slave Interface: \" | cut -d ':' -f2 2> /dev/null",
-                      team.c_str()));
+    HostCommand listing(formatCommand(
+        "cat /proc/net/bonding/%s 2> /dev/null | grep \"Slave Interface: \" | cut -d ':' -f2 2> /dev/null",
+        team.c_str()));
     bool any = false;
     while (const auto line = listing.nextLine()) {
         members.push_back(behindColon(*line));
@@ -112,7 +117,8 @@ bool getBondingMembers(std::string team, std::vector<std::string>& members) {
     return any;
 }
 
-void getNICTeamingInformation(std::string const& port, unsigned int id, std::string& result, std::string& master) {
+void getNICTeamingInformation(std::string const& port, unsigned int id, std::string& result,
+                              std::string& master) {
     const LogScope scope("Entering getNICTeamingInformation", "Exiting getNICTeamingInformation");
     switch (id) {
         case TeamingProperty::role:

@@ -33,6 +33,7 @@ bool getBondingMembers(std::string team, std::vector<std::string>& members);
 /// @param id a TeamingProperty; any other changes nothing
 /// @param result the answer; "" when there is none
 /// @param master for the role it receives the team's name or "", for the others it names the port's team
-void getNICTeamingInformation(std::string const& port, unsigned int id, std::string& result, std::string& master);
+void getNICTeamingInformation(std::string const& port, unsigned int id, std::string& result,
+                              std::string& master);
 
 }  // namespace IC
