@@ -21,7 +21,8 @@ struct LogRecord {
     const std::string& message;
 };
 
-/// Where lines end up. write may be called from many threads at once.
+/// Where lines end up. write may be called from many threads at once; it must not log itself. What it throws
+/// is lost.
 class CORVISTA_API LogSink {
 public:
     virtual ~LogSink();

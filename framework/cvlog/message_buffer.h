@@ -1,6 +1,7 @@
 #pragma once
 
-#include <sstream>
+#include <memory>
+#include <ostream>
 #include <string>
 
 #include "framework/export.h"
@@ -11,6 +12,8 @@ namespace CVLog {
 class CORVISTA_API CVMessageBuffer {
 public:
     CVMessageBuffer();
+    CVMessageBuffer(const CVMessageBuffer&) = delete;
+    CVMessageBuffer& operator=(const CVMessageBuffer&) = delete;
     ~CVMessageBuffer();
 
     CVMessageBuffer& operator<<(const char* text);  ///< null prints "(null)"
@@ -19,12 +22,15 @@ public:
     CVMessageBuffer& operator<<(unsigned int number);
     CVMessageBuffer& operator<<(int number);
     CVMessageBuffer& operator<<(bool flag);  ///< prints 1 or 0
-    operator std::ostream&() { return stream_; }
+    /// A stream that adds to the text, for whatever has an operator<< of its own; made when first asked for.
+    operator std::ostream&();
 
-    std::string str() const;
+    std::string str() const { return text_; }
 
 private:
-    std::ostringstream stream_;
+    struct Stream;
+    std::string text_;
+    std::unique_ptr<Stream> stream_;
 };
 
 }  // namespace CVLog

@@ -2,6 +2,7 @@
 
 #include <functional>
 #include <memory>
+#include <mutex>
 #include <shared_mutex>
 #include <string>
 #include <utility>
@@ -45,7 +46,9 @@ public:
     virtual ~ManagementInterface();
     virtual operator std::string() const;
     /// Takes ownership of a node made after start-up, lists it and hands it to the agent's load callback,
-    /// whose result it returns. A node that the agent refuses stays owned but is not listed.
+    /// whose result it returns. A node that the agent refuses stays owned but is not listed. A node that is
+    /// owned already is handed over again. Failure for null and for a node that is no MutableNode; it stays
+    /// the caller's.
     virtual Error addNewNode(Node* node);
     /// Withdraws a node: out of the list at once, freed when the last operation on it has returned.
     /// Failure when the node is not one of this interface's.
@@ -56,11 +59,12 @@ public:
     /// A handle that keeps the node alive across its withdrawal; empty when there is none with that id.
     std::shared_ptr<MutableNode> hold(unsigned int nodeId) const;
     std::vector<std::shared_ptr<MutableNode>> holdAll() const;
-    /// `withdrawn` hears of every node taken out with deleteNode, on the thread that withdraws it.
+    /// `withdrawn` hears of every listed node taken out with deleteNode, on the thread that withdraws it.
     void setWithdrawCallBack(void (*withdrawn)(const Node& node, const void* context), const void* context);
 
 protected:
-    /// Takes ownership of a start-up node and lists it.
+    /// Takes ownership of a start-up node and lists it; null and a node that is listed already change
+    /// nothing.
     void appendNode(MutableNode* node);
     /// The next free node id; the counter advances by one.
     unsigned int takeNodeId();
@@ -70,12 +74,17 @@ protected:
     std::pair<AlertHandler, const void*> alertHandler() const;
 
 private:
+    using NodeList = std::vector<std::shared_ptr<MutableNode>>;
+
+    std::shared_ptr<MutableNode> list(MutableNode* node);
+    void refuse(const std::shared_ptr<MutableNode>& node);
+
     mutable std::shared_mutex guard_;  // guards everything below
     unsigned int nextNodeId_ = 1;
     unsigned int ownNodeId_ = 0;
     std::vector<unsigned int> miIds_;
-    std::vector<std::shared_ptr<MutableNode>> nodes_;
-    std::vector<std::shared_ptr<MutableNode>> refused_;  // owned, but the agent would not have them
+    NodeList nodes_;
+    NodeList refused_;  // owned, but the agent would not have them
     AlertHandler alertHandler_ = nullptr;
     const void* alertContext_ = nullptr;
     LoadCallBack load_ = nullptr;

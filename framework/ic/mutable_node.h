@@ -1,12 +1,15 @@
 #pragma once
 
+#include <memory>
+
 #include "framework/ic/node.h"
 
 namespace IC {
 
 /// A node with a store of properties: the base of every node of the plug-in. All operations may be called
-/// from many threads at once; none of them calls out while it holds its lock.
-class CORVISTA_API MutableNode : public Node {
+/// from many threads at once; none of them calls out while it holds its lock. A management interface owns it
+/// through shared handles; the node knows them, so that handing it over twice is harmless.
+class CORVISTA_API MutableNode : public Node, public std::enable_shared_from_this<MutableNode> {
 public:
     /// @param nodeId   unique among all nodes of the plug-in
     /// @param linkedId id of the node this one hangs under, 0 for none
@@ -30,7 +33,9 @@ public:
     virtual unsigned int getLinkedId() const;
     virtual unsigned int getIndex() const;
     virtual std::vector<unsigned int> getMIIds() const;
+    /// Adds an owner; one that is there already stays as it is.
     virtual Error addMI(unsigned int miId);
+    /// Failure when the node has no such owner.
     virtual Error delMI(unsigned int miId);
     virtual Error setStatus(unsigned int status);
     virtual Error setDescription(const std::string& description);

@@ -17,7 +17,8 @@ public:
     ~Event();
 
     void signal();
-    /// Waits until the event is signalled or the time runs out.
+    /// Waits until the event is signalled or the time runs out. Returns early in a thread that is being
+    /// aborted.
     /// @param seconds how long at the most
     /// @return whether the event was signalled
     bool wait(unsigned long seconds);

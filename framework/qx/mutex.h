@@ -1,12 +1,13 @@
 #pragma once
 
+#include <condition_variable>
 #include <mutex>
 
 #include "framework/export.h"
 
 namespace QX {
 
-/// A lock with a timeout.
+/// A lock with a timeout. It is not recursive, and any thread may unlock it.
 class CORVISTA_API Mutex {
 public:
     Mutex();
@@ -20,7 +21,9 @@ public:
     void unlock();
 
 private:
-    std::timed_mutex mutex_;
+    std::mutex guard_;
+    std::condition_variable freed_;
+    bool held_ = false;  // guarded by guard_
 };
 
 }  // namespace QX

@@ -17,10 +17,10 @@ public:
     ~PropertyFileError() override;
 };
 
-/// A file of keys and values: UTF-8 text, one `key=value` a line; backslash escapes newline (\n), itself and,
-/// in keys,
-/// '='. Lines that are damaged (no '=', broken escape, not UTF-8) are passed over. What is written reaches
-/// the disk whole or not at all. One object belongs to one thread.
+/// A file of keys and values: UTF-8 text, one `key=value` a line; backslash escapes newline (\n), itself, '='
+/// in keys and, as \xHH, bytes that are not UTF-8. Of lines with the same key the last one counts. Lines that
+/// are damaged (no '=', broken escape, not UTF-8) are passed over. What is written reaches the disk whole or
+/// not at all. One object belongs to one thread.
 class CORVISTA_API PropertyFile {
 public:
     explicit PropertyFile(const File::Path& path);
@@ -31,10 +31,11 @@ public:
 
     /// @param mode 1 reads an existing file; 3 reads what is there, accepts changes and creates the file.
     /// Throws PropertyFileError when the file cannot be read (mode 1: also when it is missing) or the mode is
-    /// another.
+    /// another. Opening an open file starts anew from the disk.
     void open(unsigned long mode);
     /// Writes the changes (mode 3) through a temporary file that replaces the old one. Throws
-    /// PropertyFileError when that fails; the old file is then untouched.
+    /// PropertyFileError when that fails; the old file is then untouched and the object still open, so that
+    /// close can be tried again.
     void close();
 
     /// The value of a key, or an empty text when the file has no such key.

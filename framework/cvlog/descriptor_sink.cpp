@@ -1,0 +1,78 @@
+#include <sys/time.h>
+#include <unistd.h>
+
+#include <array>
+#include <cerrno>
+#include <cstdio>
+#include <ctime>
+#include <string_view>
+
+#include "framework/cvlog/logger.h"
+
+namespace CVLog {
+namespace {
+
+/// Local time with milliseconds and offset: 2026-11-20T21:03:00.123+0100.
+std::string now() {
+    timeval time{};
+    gettimeofday(&time, nullptr);
+    tm local{};
+    localtime_r(&time.tv_sec, &local);
+    std::array<char, 32> date{};
+    std::array<char, 8> offset{};
+    std::array<char, 8> fraction{};
+    strftime(date.data(), date.size(), "%Y-%m-%dT%H:%M:%S", &local);
+    strftime(offset.data(), offset.size(), "%z", &local);
+    std::snprintf(fraction.data(), fraction.size(), ".%03d", static_cast<int>(time.tv_usec / 1000));
+    return std::string(date.data()) + fraction.data() + offset.data();
+}
+
+/// Line breaks spelt out, so that a record stays one line.
+std::string onOneLine(std::string_view text) {
+    std::string line;
+    line.reserve(text.size());
+    for (const char character : text) {
+        switch (character) {
+            case '\n':
+                line += "\\n";
+                break;
+            case '\r':
+                line += "\\r";
+                break;
+            default:
+                line += character;
+        }
+    }
+    return line;
+}
+
+const char* orNull(const char* text) {
+    return text != nullptr ? text : "(null)";
+}
+
+}  // namespace
+
+std::string formatRecord(const LogRecord& record) {
+    return now() + " " + std::to_string(gettid()) + " " + std::to_string(record.level) + " " +
+           record.component + " " + orNull(record.source) + ":" + std::to_string(record.line) + " " +
+           orNull(record.function) + ": " + onOneLine(record.message);
+}
+
+DescriptorSink::~DescriptorSink() = default;
+
+void DescriptorSink::write(const LogRecord& record) {
+    const std::string line = formatRecord(record) + "\n";
+    // One write a line keeps the lines of threads and processes apart; only a pipe or a full disk takes less
+    // than all.
+    std::string_view rest = line;
+    while (!rest.empty()) {
+        const ssize_t written = ::write(descriptor_, rest.data(), rest.size());
+        if (written >= 0) {
+            rest.remove_prefix(static_cast<std::size_t>(written));
+        } else if (errno != EINTR) {
+            return;
+        }
+    }
+}
+
+}  // namespace CVLog

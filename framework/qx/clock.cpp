@@ -1,0 +1,25 @@
+#include "framework/qx/clock.h"
+
+#include <algorithm>
+#include <atomic>
+
+#include "framework/qx/thread.h"
+
+namespace QX {
+namespace {
+
+std::atomic<double> clockSpeed{1.0};
+constexpr double longestWait = 1e9;  // seconds
+
+}  // namespace
+
+std::chrono::nanoseconds scaled(std::chrono::duration<double> real) {
+    const double seconds = std::min(real.count() / clockSpeed.load(), longestWait);
+    return std::chrono::nanoseconds(static_cast<long long>(seconds * 1e9));
+}
+
+void setClockSpeed(double factor) {
+    clockSpeed = factor > 0 ? factor : 1.0;
+}
+
+}  // namespace QX

@@ -1,0 +1,16 @@
+#pragma once
+
+#include <cstddef>
+#include <string_view>
+
+namespace QX {
+
+struct Utf8Character {
+    char32_t code = 0;
+    std::size_t length = 0;  ///< bytes; 0 when the text does not start with a whole, valid character
+};
+
+/// The character at the start of `text`: no overlong forms, no surrogates, nothing above U+10FFFF.
+Utf8Character firstUtf8Character(std::string_view text);
+
+}  // namespace QX
