@@ -1,0 +1,116 @@
+#include "tests/support/world.h"
+
+#include <fcntl.h>
+#include <linux/capability.h>
+#include <sched.h>
+#include <sys/prctl.h>
+#include <sys/syscall.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <csignal>
+#include <cstdlib>
+#include <exception>
+
+#include "tests/support/files.h"
+#include "tests/support/report.h"
+#include "tests/support/system_call.h"
+
+namespace fake_host {
+namespace {
+
+constexpr int namespaces = CLONE_NEWNS | CLONE_NEWUTS | CLONE_NEWNET | CLONE_NEWIPC | CLONE_NEWPID;
+
+// What would reach the machine from a root process that has no user namespace around it.
+constexpr int dangerous[] = {CAP_SYS_TIME, CAP_SYS_BOOT,   CAP_SYS_MODULE,  CAP_SYS_RAWIO, CAP_MKNOD,
+                             CAP_SYSLOG,   CAP_WAKE_ALARM, CAP_MAC_ADMIN,   CAP_SYS_PACCT, CAP_SYS_TTY_CONFIG,
+                             CAP_BPF,      CAP_PERFMON,    CAP_MAC_OVERRIDE};
+
+struct Owner {
+    uid_t user;
+    gid_t group;
+};
+
+void put(const char* path, const std::string& text) {
+    int file = must(open(path, O_WRONLY | O_CLOEXEC), std::string("open ") + path);
+    ssize_t written = write(file, text.data(), text.size());
+    close(file);
+    must(written, std::string("write ") + path);
+}
+
+void becomeRoot(const Owner& owner) {
+    put("/proc/self/setgroups", "deny");
+    put("/proc/self/uid_map", "0 " + std::to_string(owner.user) + " 1");
+    put("/proc/self/gid_map", "0 " + std::to_string(owner.group) + " 1");
+}
+
+void dropDangerousCapabilities() {
+    __user_cap_header_struct header{_LINUX_CAPABILITY_VERSION_3, 0};
+    __user_cap_data_struct sets[_LINUX_CAPABILITY_U32S_3];
+    must(syscall(SYS_capget, &header, sets), "read the capabilities");
+    for (int capability : dangerous) {
+        must(prctl(PR_CAPBSET_DROP, capability, 0, 0, 0), "drop a capability");
+        auto& set = sets[CAP_TO_INDEX(capability)];
+        set.effective &= ~CAP_TO_MASK(capability);
+        set.permitted &= ~CAP_TO_MASK(capability);
+        set.inheritable &= ~CAP_TO_MASK(capability);
+    }
+    must(syscall(SYS_capset, &header, sets), "drop the capabilities");
+}
+
+[[noreturn]] void runInit(int report, const std::function<void()>& body, const Owner* mapped) {
+    try {
+        prctl(PR_SET_PDEATHSIG, SIGKILL);
+        if (mapped) becomeRoot(*mapped);
+        buildRoot();
+        if (!mapped) dropDangerousCapabilities();
+        must(sethostname("localhost", 9), "set the host name");
+    } catch (const std::exception& error) {
+        send(report, {Report::problem, 0, 0, "", error.what()});
+        _exit(1);
+    }
+    pid_t child = fork();
+    if (child == 0) {
+        body();
+        std::exit(0);
+    }
+    int status = 0;
+    pid_t gone;
+    while ((gone = waitpid(-1, &status, 0)) != child)
+        if (gone < 0 && errno != EINTR) _exit(1);
+    send(report, {Report::ended, status, 0, "", ""});
+    _exit(0);
+}
+
+// The plain system call, unlike fork and unshare, works beside a sanitizer's background thread. The child has
+// the thread library's idea of its parent's thread id; it does nothing that needs it and forks again
+// properly.
+pid_t cloneInto(int flags) {
+    return static_cast<pid_t>(syscall(SYS_clone, flags | SIGCHLD, nullptr, nullptr, nullptr, nullptr));
+}
+
+bool userNamespaceWanted() {
+    const char* wanted = std::getenv("CORVISTA_TEST_USER_NAMESPACE");
+    return geteuid() != 0 || !wanted || std::string(wanted) != "0";
+}
+
+}  // namespace
+
+pid_t startWorld(int report, const std::function<void()>& body) {
+    Owner owner{geteuid(), getegid()};
+    prepareRoot();
+    pid_t init = -1;
+    if (userNamespaceWanted()) {
+        init = cloneInto(namespaces | CLONE_NEWUSER);
+        if (init == 0) runInit(report, body, &owner);
+    }
+    if (init < 0 && owner.user == 0) {
+        init = cloneInto(namespaces);
+        if (init == 0) runInit(report, body, nullptr);
+    }
+    return must(init,
+                "create the namespaces of a fake host (as a user this needs unprivileged user namespaces: "
+                "kernel.unprivileged_userns_clone=1, user.max_user_namespaces>0)");
+}
+
+}  // namespace fake_host
