@@ -57,7 +57,7 @@ void prime(MutableNode& computer) {
 void OsHwMI::createComputerNodes() {
     const LogScope scope("createComputerNodes");
     auto* computer = makeNode<ComputerNode>(*rootNode_, NodeType::computer, 0);
-    computerNode_ = node_ = computer;
+    computerNode_ = computer;
     appendNode(computer);
     prime(*computer);
     computer->setStatus(1);

@@ -36,9 +36,9 @@ void OsHwMI::createCpuNodeAndMap() {
             logCpu(kError) << "Invalid format: buffer = " << *line;
             continue;
         }
-        node_ = makeNode<MutableNode>(*planarNode_, NodeType::processor, number);
-        appendNode(node_);
-        inventory_->processors.emplace(number++, node_);
+        auto* processor = makeNode<MutableNode>(*planarNode_, NodeType::processor, number);
+        appendNode(processor);
+        inventory_->processors.emplace(number++, processor);
     }
 }
 

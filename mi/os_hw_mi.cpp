@@ -24,6 +24,7 @@ constexpr Step kStartUp[] = {
     {"createDiskControllerNodes", [](OsHwMI& mi) { mi.createDiskControllerNodes(); }},
     {"createHardDriveNodes", [](OsHwMI& mi) { mi.createHardDriveNodes(false); }},
     {"createPartitionNodes", [](OsHwMI& mi) { mi.createPartitionNodes(false); }},
+    {"createNetworkPortNodes", [](OsHwMI& mi) { mi.createNetworkPortNodes(false); }},
     {"createNetworkTeamingNodes", [](OsHwMI& mi) { mi.createNetworkTeamingNodes(); }},
     {"enableIndications", [](OsHwMI& mi) { mi.enableIndications(); }},
     {"startHDDThread", [](OsHwMI& mi) { mi.startHDDThread(); }},
@@ -54,7 +55,6 @@ Error OsHwMI::initialize(unsigned int miId, const Number& ownNodeId, const Numbe
         const std::lock_guard lock(inventoryGuard_);
         inventory_ = std::make_unique<Inventory>();
     }
-    node_ = nullptr;
     initializing_ = 1;
     guarded("updateHostAndDomainName", [&] { updateHostAndDomainName(); });
     OSHWMI::myerr = ManagementInterface::initialize(miId, ownNodeId, firstNodeId);

@@ -16,6 +16,9 @@
 namespace IC {
 
 class NetworkMonitor;
+class PortWalk;
+struct HostFacts;
+struct ListedInterface;
 
 /// The plug-in object: builds the tree of the host's nodes, starts and stops the monitors. There is one,
 /// myoshwmi. Each builder lives in the room of the nodes it builds; initialize calls them in a fixed order.
@@ -110,6 +113,14 @@ private:
     /// What a bond member's change since the last pass means for the bond (indications/).
     unsigned int memberVerdict(const std::string& member) const;
     void sendAlert(const Alert& alert);
+    // Steps of createNetworkPortNodes (network/).
+    void visitInterface(const ListedInterface& interface, const PortWalk& walk, unsigned int& index);
+    MutableNode* createPort(const std::string& name, unsigned int index);
+    MutableNode* createIPConfig(const ListedInterface& interface, const MutableNode& parent,
+                                const PortWalk& walk, unsigned int index,
+                                std::map<std::string, std::string>& settings);
+    void saveSettings(const std::string& name, const HostFacts& host,
+                      std::map<std::string, std::string> settings);
     /// The frame of both storage builders: the old nodes go, each line of the listing may give a new one.
     void buildStorageNodes(const StorageKind& kind, bool update);
     void handOver(std::unique_ptr<MutableNode> node, const StorageKind& kind, bool update);
@@ -127,8 +138,6 @@ private:
     MutableNode* planarNode_ = nullptr;
     MutableNode* networkControllerNode_ = nullptr;
     MutableNode* diskControllerNode_ = nullptr;
-    MutableNode* node_ = nullptr;         ///< the node being built
-    MutableNode* currentPort_ = nullptr;  ///< the port whose IP configuration is being built
 
     std::vector<Node*> driveNodes_;
     std::vector<Node*> partitionNodes_;
@@ -142,6 +151,7 @@ private:
     NetworkMonitor* networkMonitor_ = nullptr;
     std::string hostName_;
     std::string domainName_;
+    std::mutex portWalkGuard_;  ///< one walk over the interfaces at a time; guards the two lists below
     std::vector<std::string> dnsServers_;
     std::vector<std::string> dnsSuffixes_;
 };

@@ -18,19 +18,19 @@ void describe(MutableNode& node, const char* description) {
 
 MutableNode* OsHwMI::createStaticNode(const MutableNode& parent, unsigned int type, unsigned int index,
                                       const char* description) {
-    node_ = makeNode<MutableNode>(parent, type, index);
-    appendNode(node_);
+    auto* node = makeNode<MutableNode>(parent, type, index);
+    appendNode(node);
     if (description != nullptr) {
-        describe(*node_, description);
+        describe(*node, description);
     }
-    return node_;
+    return node;
 }
 
 void OsHwMI::createOsHwNodes() {
     const LogScope scope("createOsHwNodes");
-    osHwNode_ = node_ = new MutableNode(ownNodeId(), 0, miIds(), NodeType::osHardware, 0);
-    appendNode(node_);
-    describe(*node_, "OsHw Management Interface");
+    osHwNode_ = new MutableNode(ownNodeId(), 0, miIds(), NodeType::osHardware, 0);
+    appendNode(osHwNode_);
+    describe(*osHwNode_, "OsHw Management Interface");
 }
 
 void OsHwMI::createRootNode() {

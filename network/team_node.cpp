@@ -86,7 +86,6 @@ void OsHwMI::createNetworkTeamingNodes() {
         ++index;
         try {
             auto* node = makeNode<NetworkTeamingNode>(*computerNode_, NodeType::networkTeam, index, team);
-            node_ = node;
             appendNode(node);
             storeSnapshot(*node);
         } catch (const std::exception&) {

@@ -1,0 +1,45 @@
+#include "network/ip_facts.h"
+
+#include <algorithm>
+
+#include "mi/command.h"
+#include "mi/text.h"
+#include "network/dhcp_queries.h"
+#include "network/ipv6_writer.h"
+#include "network/route_queries.h"
+
+namespace IC {
+
+std::string preferredIPv6Gateway(const std::string& name) {
+    std::vector<std::string> gateways;
+    if (getStaticIPV6GatewaysOnSuSe10(name, gateways)) {
+        return gateways.front();
+    }
+    std::string gateway;
+    getIPV6Gateway(name, gateway);
+    return gateway;
+}
+
+std::vector<std::string> dhcpServersOf(const std::string& name) {
+    std::vector<std::string> servers;
+    const FirstLine lease = firstLine(formatCommand(
+        "cat /var/lib/dhcpcd/dhcpcd-%s.info 2> /dev/null | grep DHCPSID | cut -d '=' -f2 2> /dev/null",
+        name.c_str()));
+    if (lease.line) {
+        std::string server = trimEnd(*lease.line);
+        std::erase_if(server, [](char letter) { return letter == '\'' || letter == '"'; });
+        servers.push_back(server);
+    }
+    if (std::string server; getDHCPv6Servers(name, server)) {
+        servers.push_back(server);
+    }
+    return servers;
+}
+
+std::string ipv6InterfaceIdOf(const std::string& address) {
+    const FirstLine group = firstLine(formatCommand("echo %s | cut -d: -f4 2> /dev/null", address.c_str()));
+    const std::string text = trimEnd(group.line.value_or(""));
+    return text.substr(0, text.find(' '));
+}
+
+}  // namespace IC

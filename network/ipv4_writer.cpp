@@ -1,0 +1,146 @@
+#include "network/ipv4_writer.h"
+
+#include "mi/command.h"
+#include "mi/line_file.h"
+#include "mi/log.h"
+#include "mi/text.h"
+#include "network/interface_file.h"
+#include "network/ip_origin.h"
+#include "network/link_codes.h"
+#include "network/routes_file.h"
+
+namespace IC {
+
+namespace {
+
+constexpr char kFileOpened[] = "File open '/etc/sysconfig/network' in write mode.";
+constexpr char kStaticBootProto[] = "BOOTPROTO=static\n";
+
+/// The BOOTPROTO line of an origin; "" for one that is not written.
+std::string bootProtoLine(unsigned int origin, bool dhcpv6Known) {
+    switch (origin) {
+        case IPOrigin::fixed:
+            return kStaticBootProto;
+        case IPOrigin::dhcp:
+            return dhcpv6Known ? "BOOTPROTO=dhcp\n" : "BOOTPROTO=dhcp4\n";
+        default:
+            return "";
+    }
+}
+
+/// The command that takes an interface to a status; "" for a status that is none.
+std::string statusCommand(const std::string& ifName, unsigned int status) {
+    switch (status) {
+        case 1:
+        case 9:
+            return "ifconfig " + ifName + " up";
+        case 12:
+        case 16:
+            return "ifconfig " + ifName + " down";
+        default:
+            return "";
+    }
+}
+
+}  // namespace
+
+void setIPOrigin(std::string, PropertyValue origin, std::string mac) {
+    const LogScope scope;
+    // Any answer counts, so on a host with a shell this is always "known".
+    const bool dhcpv6Known = HostCommand(std::string("rpm -qa | grep dhcpv6*")).started();
+    InterfaceFile file(mac);
+    log(kProgress) << "File open " << file.path() << " in read mode.";
+    KeyLine bootProto{"BOOTPROTO=", bootProtoLine(originCode(origin), dhcpv6Known)};
+    if (bootProto.line.empty()) {
+        bootProto.held = KeyLine::Held::kept;
+    }
+    KeyLine startMode{"STARTMODE=", "STARTMODE='auto'\n"};
+    file.replace({&bootProto, &startMode});
+    if (bootProto.line.empty()) {
+        bootProto.line = file.lastLine();  // an origin that has no line of its own repeats the last one
+    }
+    file.appendMissing({&bootProto, &startMode});
+    log(kChange) << "IP Origin  = " << origin;
+    if (file.write()) {
+        log(kChange) << kFileOpened;
+    }
+}
+
+void setIPv4Address(std::string, std::string address, std::string mac) {
+    const LogScope scope("Entering setIPv4Address", "Exiting setIPv4Address");
+    KeyLine bootProto{"BOOTPROTO=", kStaticBootProto, KeyLine::Held::kept};
+    KeyLine ipAddress{"IPADDR=", "IPADDR=" + address + '\n'};
+    InterfaceFile file(mac);
+    file.replace({&bootProto, &ipAddress});
+    file.appendMissing({&bootProto, &ipAddress});
+    file.write();
+}
+
+void setSubnetMask(std::string ifName, std::string mask, std::string mac) {
+    const LogScope scope("Entering setSubnetMask", "Exiting setSubnetMask");
+    KeyLine bootProto{"BOOTPROTO=", kStaticBootProto, KeyLine::Held::keptUntouched};
+    KeyLine netmask{"NETMASK=", "NETMASK=" + mask + '\n'};
+    InterfaceFile file(mac);
+    file.replace({&bootProto, &netmask});
+    file.appendMissing({&bootProto, &netmask});
+    if (file.write()) {
+        log(kChange) << "Writing Subnet to File";
+    } else {
+        log(kError) << "Failed to open the file for writing";
+    }
+    if (!HostCommand(formatCommand("ifconfig %s netmask %s", ifName.c_str(), mask.c_str())).started()) {
+        log(kError) << "Can not Change Subnet Mask.";
+    }
+}
+
+void setIPV4Gateway(std::string ifName, std::string ipAddress, std::string gateway) {
+    const LogScope scope("Entering setIPV4Gateway", "Exiting setIPV4Gateway");
+    if (!HostCommand(formatCommand("route del -host %s gw %s %s 2> /dev/null", ipAddress.c_str(),
+                                   gateway.c_str(), ifName.c_str()))
+             .started()) {
+        return;
+    }
+    LineFile routes;
+    routes.append(ipAddress + '\t' + gateway + "\t-\n");
+    if (!routes.write("/etc/sysconfig/network/ifroute-" + ifName)) {
+        log(kError) << "Can not open '/etc/sysconfig/network/ifroute' in write mode.";
+        return;
+    }
+    setIPv4GatewayForSuSe10(ifName, gateway);
+}
+
+void setIPv4GatewayForSuSe10(std::string const& ifName, std::string const& gateway) {
+    const LogScope scope;
+    if (ifName.empty() || gateway.empty()) {
+        log(kError) << "Either NIC or gateway is null";
+        return;
+    }
+    replaceDefaultRoute(AddressFamily::ipv4, gateway);
+}
+
+void setInterfaceStatus(const std::string& ifName, unsigned int status) {
+    log(kProgress) << "Status Value : " << status;
+    const bool isFailOver = status == LinkCode::switchedOver || status == LinkCode::switchedBack;
+    if (contains(ifName, "bond") && isFailOver) {
+        log(kProgress) << "Status updation for bonded interface. New status is: " << status;
+        return;
+    }
+    const std::string command = statusCommand(ifName, status);
+    if (command.empty()) {
+        log(kError) << "IPConfigNode::setProperty: Invalid status request.";
+    }
+    HostCommand::fromText(command);  // an empty command is run as well: it changes nothing
+}
+
+void restartNetwork() {
+    const LogScope scope("restartNetwork Called.", "restartNetwork: exit");
+    if (!HostCommand(std::string("service network restart")).started()) {
+        log(kError) << "Can not bring up interface.";
+    }
+}
+
+void disableNMControlled(std::string const&) {
+    const LogScope scope("Entering disableNMControlled\n", "Exiting disableNMControlled\n");
+}
+
+}  // namespace IC

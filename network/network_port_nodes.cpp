@@ -1,0 +1,86 @@
+// The walk over the host's interfaces: a port node for each port, an IP configuration below it, its settings
+// saved.
+#include "mi/log.h"
+#include "mi/node_types.h"
+#include "mi/os_hw_mi.h"
+#include "mi/text.h"
+#include "network/dns.h"
+#include "network/port_node.h"
+#include "network/port_walk.h"
+#include "network/saved_settings.h"
+
+namespace IC {
+
+void OsHwMI::createNetworkPortNodes(bool /*update*/) {
+    const LogScope scope;
+    const std::lock_guard oneWalkAtATime(portWalkGuard_);
+    const std::vector<ListedInterface> interfaces = PortWalk::list();
+    dnsServers_.clear();
+    dnsSuffixes_.clear();
+    getDNSDetails(dnsServers_, dnsSuffixes_);
+    const PortWalk walk({trimEnd(hostName_), trimEnd(domainName_), dnsServers_, dnsSuffixes_});
+    unsigned int index = 0;
+    for (const ListedInterface& interface : interfaces) {
+        try {
+            visitInterface(interface, walk, index);
+        } catch (const std::exception& failure) {
+            log(kError) << "NetworkPort error " << failure.what();
+        }
+    }
+}
+
+void OsHwMI::visitInterface(const ListedInterface& interface, const PortWalk& walk, unsigned int& index) {
+    const std::string& name = interface.name;
+    MutableNode* known = nullptr;
+    if (findNetworkPort(name, &known) || walk.isBridgeMember(name) || walk.hasZeroAddress(name)) {
+        return;
+    }
+    std::map<std::string, std::string> settings;
+    MutableNode* port = walk.isPort(name) ? createPort(name, index) : nullptr;
+    MutableNode* config = nullptr;
+    if (PortWalk::hasIPConfig(name)) {
+        // What has no port of its own, a bond or a bridge, hangs under the controller.
+        MutableNode& parent = port != nullptr ? *port : *networkControllerNode_;
+        config = createIPConfig(interface, parent, walk, ++index, settings);
+    }
+    if (MutableNode* node = port != nullptr ? port : config) {
+        log(kProgress) << "Inserting the interface in the Map " << name;
+        rememberByName(name, node);
+    }
+    saveSettings(name, walk.host(), std::move(settings));
+}
+
+MutableNode* OsHwMI::createPort(const std::string& name, unsigned int index) {
+    auto* port = makeNode<NetworkPortNode>(*networkControllerNode_, NodeType::networkPort, index, name);
+    appendNode(port);
+    port->setDescription("Network Port");
+    port->fill();
+    return port;
+}
+
+MutableNode* OsHwMI::createIPConfig(const ListedInterface& interface, const MutableNode& parent,
+                                    const PortWalk& walk, unsigned int index,
+                                    std::map<std::string, std::string>& settings) {
+    log(kProgress) << "Creating an IPConfigNode for " << interface.name;
+    auto* config = makeNode<IPConfigNode>(parent, NodeType::ipConfiguration, index, interface.name);
+    appendNode(config);
+    log(kProgress) << "Size of Inteface  " << static_cast<unsigned int>(walk.bridgeMemberCount());
+    config->setDescription(interface.fromBridgeListing ? "Bridge" : "IP Configuration");
+    fillIPConfig(*config, walk.host(), settings);
+    return config;
+}
+
+void OsHwMI::saveSettings(const std::string& name, const HostFacts& host,
+                          std::map<std::string, std::string> settings) {
+    std::string servers;
+    std::string suffixes;
+    stringFormatForDNSServersAndSuffixes(servers, suffixes);
+    settings.emplace("HOSTNAME", host.hostName);
+    settings.emplace("DOMAINNAME", host.domainName);
+    settings.emplace("DNSSERVERS", servers);
+    settings.emplace("DNSSUFFIXES", suffixes);
+    settings.emplace("CONFIG_NAME", name);
+    createSettingData(name, std::move(settings));
+}
+
+}  // namespace IC

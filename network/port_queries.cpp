@@ -1,0 +1,40 @@
+#include "network/port_queries.h"
+
+#include <cstdlib>
+
+#include "mi/command.h"
+#include "mi/log.h"
+#include "mi/text.h"
+
+namespace IC {
+
+std::string parse::linkMode(const std::string& line) {
+    const std::string mode = trimEnd(line);
+    return mode.substr(0, mode.find('/'));
+}
+
+unsigned int parse::baseTSpeed(const std::string& mode) {
+    char* end = nullptr;
+    const unsigned long number = std::strtoul(mode.c_str(), &end, 10);
+    return std::string(end).starts_with("baseT") ? static_cast<unsigned int>(number) : 0;
+}
+
+std::string getSupportedLinkMode(const std::string& name) {
+    const LogScope scope;
+    const FirstLine answer = firstLine(
+        formatCommand("ethtool %s 2> /dev/null | grep \"Supported link modes\" | tr -s ' ' | cut -d ' ' -f4",
+                      name.c_str()));
+    return parse::linkMode(answer.line.value_or(""));
+}
+
+WakeOnLan getWakeOnLan(const std::string& name) {
+    const LogScope scope;
+    HostCommand command(formatCommand("ethtool %s 2> /dev/null | grep \"Wake-on\"", name.c_str()));
+    WakeOnLan found;
+    while (const auto line = command.nextLine()) {
+        (contains(*line, "Supports Wake-on") ? found.supported : found.enabled) = true;
+    }
+    return found;
+}
+
+}  // namespace IC

@@ -1,0 +1,90 @@
+#include "network/port_walk.h"
+
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <utility>
+
+#include "mi/command.h"
+#include "mi/log.h"
+#include "mi/text.h"
+#include "network/interface_lists.h"
+#include "network/link_queries.h"
+
+namespace IC {
+
+namespace {
+
+// The interfaces named vmnic…, as VMware hosts call theirs.
+constexpr char kListVMware[] = "grep ^v[a-z0-9] /proc/net/dev 2> /dev/null";
+// Ethernet, bonding and USB interfaces, then the rows of the bridge listing.
+constexpr char kListInterfaces[] =
+    "egrep 'eth|bond|usb' /proc/net/dev > /tmp/__tmp; brctl show |grep -vw 'bridge name' >>/tmp/__tmp 2> "
+    "/dev/null; cat /tmp/__tmp; rm /tmp/__tmp";
+constexpr char kZeroAddress[] = "00:00:00:00:00:00";
+
+bool isVMware() {
+    struct stat release {};
+    return stat("/etc/vmware-release", &release) == 0;
+}
+
+ListedInterface listedInterface(const std::string& line) {
+    ListedInterface found;
+    getNICString(trimStart(trimStart(line), '\t'), found.name);
+    found.fromBridgeListing = !contains(line, ":");  // only /proc/net/dev prints colons
+    return found;
+}
+
+}  // namespace
+
+PortWalk::PortWalk(HostFacts host) : host_(std::move(host)) {
+    getbridgeInterfaces(bridgeMembers_);
+    log(kProgress) << "IPv6 configured: " << (access("/proc/net/if_inet6", R_OK) == 0);
+    runToEnd(std::string("ifconfig > ") + ifconfigSnapshotPath);
+}
+
+PortWalk::~PortWalk() {
+    try {
+        runToEnd(std::string("rm -rf ") + ifconfigSnapshotPath);
+    } catch (const std::exception& failure) {
+        log(kError) << "NetworkPort error " << failure.what();
+    }
+}
+
+std::vector<ListedInterface> PortWalk::list() {
+    const bool vmware = isVMware();
+    if (vmware) {
+        log(kProgress) << "Machine has vmware";
+    }
+    HostCommand listing(std::string(vmware ? kListVMware : kListInterfaces));
+    std::vector<ListedInterface> found;
+    while (const auto line = listing.nextLine()) {
+        found.push_back(listedInterface(*line));
+    }
+    return found;
+}
+
+bool PortWalk::isBridgeMember(const std::string& name) const {
+    return std::ranges::find(bridgeMembers_, name) != bridgeMembers_.end();
+}
+
+bool PortWalk::hasZeroAddress(const std::string& name) const {
+    if (interfaces_.getMACAddress(name) != kZeroAddress) {
+        return false;
+    }
+    log(kProgress) << "Permanent_address compare" << name;
+    return true;
+}
+
+bool PortWalk::isPort(const std::string& name) const {
+    const EthernetPortsByController* ports = network_.getNICInfo();
+    return (ports != nullptr && isPhysicalPort(ports, name) != nullptr) ||
+           getVLANInterface(network_.getVLANInfo(), name) != nullptr || contains(name, "vmnic");
+}
+
+bool PortWalk::hasIPConfig(const std::string& name) {
+    return firstLine(formatCommand("ifconfig -a | grep %s 2> /dev/null", name.c_str())).line.has_value();
+}
+
+}  // namespace IC
