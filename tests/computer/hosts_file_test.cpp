@@ -1,0 +1,147 @@
+// /etc/hosts and /etc/HOSTNAME as a change of name leaves them.
+#include <gmock/gmock.h>
+
+#include "mi/host_name.h"
+#include "tests/computer/computer_tools.h"
+#include "tests/support/fake_host.h"
+#include "tests/support/log_capture.h"
+
+namespace {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+constexpr char kHosts[] = "/etc/hosts";
+constexpr char kHostName[] = "/etc/HOSTNAME";
+
+class HostsFile : public HostFixture {
+protected:
+    void setUpHost(FakeHost& host) override { host.recordOnly("hostname"); }
+
+    static void change(const std::string& address = "") {
+        IC::executeDomainandHostnameChanges("alpha", "example.org", true, address);
+    }
+};
+
+constexpr char kEntry[] = "127.0.0.2\talpha.example.org\talpha\n";
+
+HOST_TEST_F(HostsFile, HoldsOneEntryForTheHostAtTheEnd) {
+    host.file(kHosts,
+              "127.0.0.2 old.example.org old\n127.0.0.1\tlocalhost\n  127.0.0.2 second\n::1 localhost\n");
+    change();
+    EXPECT_EQ(host.read(kHosts), std::string("127.0.0.1\tlocalhost\n::1 localhost\n") + kEntry);
+    EXPECT_EQ(host.read(kHostName), "alpha.example.org");
+    EXPECT_THAT(host.calls(), ElementsAre("hostname alpha.example.org"));
+}
+
+HOST_TEST_F(HostsFile, GivesUpTheLinesOfTheAddressAndOfTheLoopback) {
+    host.file(kHosts, "10.0.0.5 old\n127.0.0.2 older\n10.0.0.50 neighbour\n110.0.0.5 far\n10.0.0.6 stays\n");
+    change("10.0.0.5");
+    EXPECT_EQ(host.read(kHosts), "10.0.0.6 stays\n10.0.0.5\talpha.example.org\talpha\n");
+}
+
+HOST_TEST_F(HostsFile, GivesUpACommentThatMentionsTheAddress) {
+    host.file(kHosts, "# 127.0.0.2 is ours\n# comment\nx127.0.0.2y\n");
+    change();
+    EXPECT_EQ(host.read(kHosts), std::string("# comment\n") + kEntry);
+}
+
+HOST_TEST_F(HostsFile, KeepsEveryOtherLineByteForByte) {
+    const std::string contents[] = {
+        "# comment\n\n\t10.0.0.1   b  a # tail\nunknown words\n",
+        "10.0.0.1 dos\r\n\r\n",
+        std::string("10.0.0.1 \xff\0\x01\n", 13),
+        lineOf(511, "10.0.0.1 ") + "\n" + lineOf(512, "10.0.0.1 ") + "\n" + lineOf(513, "10.0.0.1 ") + "\n" +
+            lineOf(5000, "10.0.0.1 ") + "\n",
+        "",
+    };
+    for (const std::string& content : contents) {
+        host.file(kHosts, content);
+        change();
+        EXPECT_EQ(host.read(kHosts), content + kEntry);
+    }
+}
+
+HOST_TEST_F(HostsFile, EndsALastLineBeforeTheEntry) {
+    host.file(kHosts, "10.0.0.1 last");
+    change();
+    EXPECT_EQ(host.read(kHosts), std::string("10.0.0.1 last\n") + kEntry);
+    host.file(kHosts, "10.0.0.1 last\n127.0.0.2 old");
+    change();
+    EXPECT_EQ(host.read(kHosts), std::string("10.0.0.1 last\n") + kEntry);
+}
+
+HOST_TEST_F(HostsFile, ReadsLinesOfUpTo512Characters) {
+    host.file(kHosts, lineOf(511, "127.0.0.2 ") + "\n" + lineOf(512, "127.0.0.2 ") + "\r\n");
+    change();
+    EXPECT_EQ(host.read(kHosts), lineOf(512, "127.0.0.2 ") + "\r\n" + kEntry) << "the CR is the 513th";
+    host.file(kHosts, lineOf(511, "127.0.0.2 ") + "\n" + lineOf(512, "127.0.0.2 ") + "\n" +
+                          lineOf(513, "127.0.0.2 ") + "\n");
+    change();
+    EXPECT_EQ(host.read(kHosts), lineOf(513, "127.0.0.2 ") + "\n" + kEntry);
+}
+
+HOST_TEST_F(HostsFile, IsTheSameAfterTheSameChange) {
+    host.file(kHosts, "10.0.0.1 a\n");
+    change();
+    const auto once = host.read(kHosts);
+    change();
+    EXPECT_EQ(host.read(kHosts), once);
+}
+
+HOST_TEST_F(HostsFile, StopsTheChangeWhenItIsMissing) {
+    LogCapture capture;
+    change();
+    EXPECT_THAT(capture.messages(6000), ElementsAre("Can not open '/etc/hosts' in Read mode."));
+    EXPECT_THAT(host.calls(), ElementsAre("hostname alpha.example.org"));
+    EXPECT_FALSE(host.exists(kHosts));
+    EXPECT_FALSE(host.exists(kHostName));
+    EXPECT_EQ(capture.messages().back(), "executeDomainandHostnameChanges: exit");
+}
+
+HOST_TEST_F(HostsFile, StopsTheChangeOnAReadOnlyFileSystem) {
+    host.file(kHosts, "127.0.0.2 old\n");
+    host.file(kHostName, "old");
+    host.readOnly("/etc");
+    LogCapture capture;
+    change();
+    EXPECT_THAT(capture.messages(6000), ElementsAre("Can not open '/etc/hosts' in write mode."));
+    EXPECT_EQ(host.read(kHosts), "127.0.0.2 old\n");
+    EXPECT_EQ(host.read(kHostName), "old");
+}
+
+HOST_TEST_F(HostsFile, StaysWholeOnAFullDisk) {
+    const std::string content = lineOf(400, "10.0.0.1 ") + "\n127.0.0.2 old\n";
+    std::string big;
+    while (big.size() < 8000) {
+        big += content;
+    }
+    host.file(kHosts, big);
+    host.fullDisk("/etc");
+    LogCapture capture;
+    IC::executeDomainandHostnameChanges(std::string(400, 'n'), "", true, "10.9.9.9");
+    EXPECT_THAT(capture.messages(6000),
+                testing::Not(testing::Contains("Can not open '/etc/hosts' in write mode.")));
+    const auto after = host.read(kHosts);
+    ASSERT_TRUE(after);
+    EXPECT_TRUE(*after == big || after->ends_with(std::string(400, 'n') + "\n"))
+        << "old or new, nothing between";
+}
+
+HOST_TEST_F(HostsFile, IsChangedAlsoWhenTheNameFileCannotBeWritten) {
+    host.file(kHosts, "");
+    host.directory(kHostName);
+    LogCapture capture;
+    change();
+    EXPECT_EQ(host.read(kHosts), kEntry);
+    EXPECT_THAT(capture.messages(6000), IsEmpty());
+}
+
+HOST_TEST_F(HostsFile, GoesWithANameFileThatIsWrittenAnew) {
+    host.file(kHosts, "");
+    host.file(kHostName, "a much longer name than the new one.example.org\nand a second line\n");
+    change();
+    EXPECT_EQ(host.read(kHostName), "alpha.example.org");
+}
+
+}  // namespace

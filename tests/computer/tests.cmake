@@ -1,0 +1,12 @@
+corvista_test(computer LIBRARIES plugin_code test_support SOURCES
+  computer/calendar_test.cpp
+  computer/clock_file_test.cpp
+  computer/computer_node_test.cpp
+  computer/computer_start_test.cpp
+  computer/failing_calls.cpp
+  computer/firmware_version_test.cpp
+  computer/host_name_test.cpp
+  computer/hosts_file_test.cpp
+  computer/local_time_test.cpp
+  computer/owner_data_test.cpp
+  computer/zone_table_test.cpp)
