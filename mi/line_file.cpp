@@ -15,6 +15,11 @@ namespace IC {
 
 namespace {
 
+/// Whether the last call failed for want of space.
+bool outOfRoom() {
+    return errno == ENOSPC || errno == EDQUOT;
+}
+
 /// A file whose content is replaced where it stands: it keeps its owner, its rights and its links.
 class File {
 public:
@@ -38,7 +43,7 @@ public:
             fallocate(descriptor_, 0, 0, static_cast<off_t>(size)) == 0) {
             return true;
         }
-        if (errno != ENOSPC && errno != EDQUOT) {
+        if (!outOfRoom()) {
             return true;
         }
         cutTo(before.st_size);
@@ -105,14 +110,16 @@ void LineFile::prepend(const std::string& line) {
 
 LineFile::Written LineFile::replace(const std::string& path) const {
     const File file(path);
-    if (!file.opened()) {
+    // A file of a lower layer needs room to be opened at all.
+    const bool noRoom = !file.opened() && outOfRoom();
+    if (!file.opened() && !noRoom) {
         return Written::notOpened;
     }
     std::string content;
     for (const std::string& line : lines_) {
         content += line;
     }
-    if (file.reserve(content.size()) && file.put(content)) {
+    if (!noRoom && file.reserve(content.size()) && file.put(content)) {
         return Written::whole;
     }
     log(kError) << "Could not write all of '" << path << "'.";

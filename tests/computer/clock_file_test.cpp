@@ -40,7 +40,7 @@ std::vector<Change> changes() {
          "A=1\r\nNEW\nB=2\r\n"},
         {"an empty file stays empty", "", ""},
         {"bytes that are no text stay", std::string("\xff\0\x01\nKEY=\n\xc3", 10),
-         std::string("\xff\0\x01\nNEW\n\xc3\n", 11)},
+         std::string("\xff\0\x01\nNEW\n\xc3\n", 10)},
         {"long lines of others stay",
          lineOf(511, "A=") + "\n" + lineOf(512, "B=") + "\n" + lineOf(513, "C=") + "\n" + lineOf(5000, "D=") +
              "\nKEY=\n",

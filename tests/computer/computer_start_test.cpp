@@ -136,12 +136,12 @@ HOST_TEST(ComputerStart, ChangesNothingOnTheHostAlsoTheSecondTime) {
     host.file(kAssetFile, "Computer.OwnerContact=a\nOther=b\n");
     host.file("/etc/sysconfig/clock", "TIMEZONE=\"old\"\n");
     host.tool("hostname %any", "alpha\n");
-    host.tool("fdisk -ls", "");
-    IC::OsHwMI mi;
+    host.expectUnrecorded();  // what the network's builders ask is not of interest here
+    const LogCapture quiet;
     for (int start = 0; start < 2; ++start) {
-        EXPECT_EQ(mi.initialize(1, Number(1U), Number(2U)).getStatus(), 0);
+        EXPECT_EQ(IC::myoshwmi.initialize(1, Number(1U), Number(2U)).getStatus(), 0);
         EXPECT_TRUE(IC::OSHWMI::bInitflag);
-        mi.unload();
+        IC::myoshwmi.unload();
     }
     EXPECT_EQ(host.read(kAssetFile), "Computer.OwnerContact=a\nOther=b\n");
     EXPECT_EQ(host.read("/etc/sysconfig/clock"), "TIMEZONE=\"old\"\n");

@@ -133,8 +133,8 @@ HOST_TEST(Owner, TakesEveryText) {
 
 /// What a write that cannot be done leaves: the old file and the framework's old value.
 void expectRefusal(FakeHost& host, const std::string& content) {
-    LogCapture capture;
     RunningComputer computer;
+    LogCapture capture;
     EXPECT_EQ(computer.write(116, std::string(20000, 'n')), 1);
     EXPECT_THAT(
         capture.messages(),
