@@ -3,7 +3,6 @@
 
 #include <array>
 #include <cerrno>
-#include <cstdio>
 #include <ctime>
 #include <string_view>
 
@@ -20,11 +19,12 @@ std::string now() {
     localtime_r(&time.tv_sec, &local);
     std::array<char, 32> date{};
     std::array<char, 8> offset{};
-    std::array<char, 8> fraction{};
-    strftime(date.data(), date.size(), "%Y-%m-%dT%H:%M:%S", &local);
-    strftime(offset.data(), offset.size(), "%z", &local);
-    std::snprintf(fraction.data(), fraction.size(), ".%03d", static_cast<int>(time.tv_usec / 1000));
-    return std::string(date.data()) + fraction.data() + offset.data();
+    const std::size_t dateLength = strftime(date.data(), date.size(), "%Y-%m-%dT%H:%M:%S", &local);
+    const std::size_t offsetLength = strftime(offset.data(), offset.size(), "%z", &local);
+    // Four digits, of which the first makes way for the point.
+    std::string fraction = std::to_string(1000 + time.tv_usec / 1000);
+    fraction.front() = '.';
+    return std::string(date.data(), dateLength) + fraction + std::string(offset.data(), offsetLength);
 }
 
 /// Line breaks spelt out, so that a record stays one line.

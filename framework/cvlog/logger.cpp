@@ -8,8 +8,8 @@
 namespace CVLog {
 namespace {
 
-constexpr int errorLevel = 6000;
-constexpr int off = INT_MAX;
+constexpr int kErrorLevel = 6000;
+constexpr int kOff = INT_MAX;
 
 DescriptorSink& standardError() {
     // Never destroyed: other libraries log while they are being unloaded.
@@ -41,7 +41,7 @@ public:
         const std::unique_lock lock(guard_);
         sink_ = sink;
         toStandardError_ = false;
-        threshold_.store(sink != nullptr ? threshold : off, std::memory_order_relaxed);
+        threshold_.store(sink != nullptr ? threshold : kOff, std::memory_order_relaxed);
     }
 
 private:
@@ -52,8 +52,8 @@ private:
     LogSink* sink_ = nullptr;
 };
 
-constinit Channel logChannel(errorLevel, true);
-constinit Channel traceChannel(off, false);
+constinit Channel logChannel(kErrorLevel, true);
+constinit Channel traceChannel(kOff, false);
 
 void deliver(Channel& channel, const LogRecord& record) noexcept {
     try {

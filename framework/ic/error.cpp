@@ -6,7 +6,7 @@
 namespace IC {
 
 Error::Error(unsigned char status, Number code, std::string text)
-    : status_(status), code_(std::move(code)), text_(std::move(text)) {}
+    : status_(status), code_(code), text_(std::move(text)) {}
 
 Error::operator std::string() const {
     if (!text_.empty()) {

@@ -134,7 +134,7 @@ Error ManagementInterface::addNewNode(Node* node) {
     if (load == nullptr) {
         return {};  // the agent finds it in the map
     }
-    const Error result = load(node, context);
+    Error result = load(node, context);
     if (result.getStatus() != Error::success) {
         refuse(handle);
     }

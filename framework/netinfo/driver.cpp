@@ -9,14 +9,15 @@
 
 #include <algorithm>
 #include <array>
-#include <cstdio>
 #include <cstring>
 #include <new>
+
+#include "framework/qx/hex.h"
 
 namespace netinfo {
 namespace {
 
-constexpr unsigned int addressLength = 6;
+constexpr unsigned int kAddressLength = 6;
 
 /// Asks the driver; `request` starts with the number of the question and takes the answer.
 bool ask(const std::string& interface, void* request) {
@@ -47,21 +48,20 @@ std::string driverName(const std::string& interface) {
 }
 
 std::string driverPermanentAddress(const std::string& interface) {
-    constexpr std::size_t room = 32;
-    alignas(ethtool_perm_addr) std::array<unsigned char, sizeof(ethtool_perm_addr) + room> buffer{};
+    constexpr std::size_t kRoom = 32;
+    alignas(ethtool_perm_addr) std::array<unsigned char, sizeof(ethtool_perm_addr) + kRoom> buffer{};
     auto* const request = new (buffer.data()) ethtool_perm_addr{};
     request->cmd = ETHTOOL_GPERMADDR;
-    request->size = room;
-    if (!ask(interface, request) || request->size != addressLength) {
+    request->size = kRoom;
+    if (!ask(interface, request) || request->size != kAddressLength) {
         return {};
     }
     std::string text;
-    for (unsigned int index = 0; index < addressLength; ++index) {
-        std::array<char, 4> digits{};
+    for (unsigned int index = 0; index < kAddressLength; ++index) {
         const unsigned int byte = buffer[sizeof(ethtool_perm_addr) + index];
-        std::snprintf(digits.data(), digits.size(), "%s%02x", index == 0 ? "" : ":", byte);
-        text += digits.data();
+        text += {QX::kHexDigits[byte >> 4U], QX::kHexDigits[byte & 0xfU], ':'};
     }
+    text.pop_back();
     return text;
 }
 

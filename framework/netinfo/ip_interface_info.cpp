@@ -83,7 +83,7 @@ CIPInterfaceInfo::CIPInterfaceInfo() : data_(std::make_unique<Data>()) {}
 CIPInterfaceInfo::~CIPInterfaceInfo() = default;
 
 std::string CIPInterfaceInfo::getMACAddress(std::string name) const {
-    return netinfo::readAttribute(netinfo::classDirectory, name, "address");
+    return netinfo::readAttribute(netinfo::kClassDirectory, name, "address");
 }
 
 const IPInfoByInterface* CIPInterfaceInfo::getInterfaceIPsInfo() {

@@ -8,7 +8,7 @@
 
 namespace {
 
-constexpr const char* noAddress = "00:00:00:00:00:00";
+constexpr const char* kNoAddress = "00:00:00:00:00:00";
 
 /// A link of its own that a device stands behind, or one end of a pair, which a guest knows as its network
 /// card.
@@ -26,10 +26,10 @@ bool isPhysical(const netinfo::Link& link) {
 
 std::string permanentAddress(const netinfo::Link& link) {
     std::string address = netinfo::driverPermanentAddress(link.name);
-    if (address.empty() || address == noAddress) {
+    if (address.empty() || address == kNoAddress) {
         address = link.permanentAddress;
     }
-    return address.empty() ? noAddress : address;
+    return address.empty() ? kNoAddress : address;
 }
 
 }  // namespace
@@ -67,7 +67,7 @@ void CNetworkInfo::Data::add(const netinfo::Link& link) {
 }
 
 CNetworkInfo::CNetworkInfo(bool includeDown) : data_(std::make_unique<Data>()) {
-    const auto links = netinfo::readLinks(netinfo::classDirectory);
+    const auto links = netinfo::readLinks(netinfo::kClassDirectory);
     data_->readable = links.has_value();
     if (!links) {
         return;

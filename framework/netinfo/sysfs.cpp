@@ -12,16 +12,16 @@ namespace {
 
 namespace fs = std::filesystem;
 
-constexpr std::string_view ethernet = "1";  // ARPHRD_ETHER
-constexpr unsigned long interfaceUp = 0x1;  // IFF_UP
+constexpr std::string_view kEthernet = "1";  // ARPHRD_ETHER
+constexpr unsigned long kInterfaceUp = 0x1;  // IFF_UP
 
 // Kinds by the DEVTYPE of uevent. Others (dsa, gadget) are ports of their own.
-constexpr std::array<std::string_view, 14> upperTypes{"bond",    "bridge",  "vlan",   "wlan",     "wwan",
-                                                      "macvlan", "macvtap", "ipvlan", "vxlan",    "geneve",
-                                                      "macsec",  "hsr",     "batadv", "bluetooth"};
+constexpr std::array<std::string_view, 14> kUpperTypes{"bond",    "bridge",  "vlan",   "wlan",     "wwan",
+                                                       "macvlan", "macvtap", "ipvlan", "vxlan",    "geneve",
+                                                       "macsec",  "hsr",     "batadv", "bluetooth"};
 // Kinds by a file or directory that only they have.
-constexpr std::array<std::string_view, 5> upperMarks{"bonding", "bridge", "tun_flags", "phy80211",
-                                                     "wireless"};
+constexpr std::array<std::string_view, 5> kUpperMarks{"bonding", "bridge", "tun_flags", "phy80211",
+                                                      "wireless"};
 
 std::string firstLine(const fs::path& file) {
     std::ifstream in(file);
@@ -36,11 +36,11 @@ bool isThere(const fs::path& path) {
 }
 
 std::string deviceType(const fs::path& link) {
-    constexpr std::string_view key = "DEVTYPE=";
+    constexpr std::string_view kKey = "DEVTYPE=";
     std::ifstream in(link / "uevent");
     for (std::string line; std::getline(in, line);) {
-        if (line.starts_with(key)) {
-            return line.substr(key.size());
+        if (line.starts_with(kKey)) {
+            return line.substr(kKey.size());
         }
     }
     return {};
@@ -59,8 +59,8 @@ bool hasLower(const fs::path& link) {
 }
 
 bool isUpper(const fs::path& link, const std::string& type, bool hardware) {
-    return std::ranges::find(upperTypes, type) != upperTypes.end() ||
-           std::ranges::any_of(upperMarks, [&](std::string_view mark) { return isThere(link / mark); }) ||
+    return std::ranges::find(kUpperTypes, type) != kUpperTypes.end() ||
+           std::ranges::any_of(kUpperMarks, [&](std::string_view mark) { return isThere(link / mark); }) ||
            (!hardware && hasLower(link));
 }
 
@@ -70,12 +70,12 @@ bool isUp(const fs::path& link) {
     if (text.starts_with("0x")) {
         std::from_chars(text.data() + 2, text.data() + text.size(), flags, 16);
     }
-    return (flags & interfaceUp) != 0;
+    return (flags & kInterfaceUp) != 0;
 }
 
 /// The members of a bond all show the bond's address; what they had before is kept aside.
 std::string permanentAddress(const fs::path& link) {
-    const std::string kept = firstLine(link / "bonding_slave" / "perm_hwaddr");
+    std::string kept = firstLine(link / "bonding_slave" / "perm_hwaddr");
     if (!kept.empty()) {
         return kept;
     }
@@ -112,7 +112,7 @@ std::optional<std::vector<Link>> readLinks(const std::string& directory) {
     fs::directory_iterator entry(directory, problem);
     std::vector<Link> links;
     for (const fs::directory_iterator end; !problem && entry != end; entry.increment(problem)) {
-        if (firstLine(entry->path() / "type") == ethernet) {
+        if (firstLine(entry->path() / "type") == kEthernet) {
             links.push_back(describe(entry->path()));
         }
     }

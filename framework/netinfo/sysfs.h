@@ -19,10 +19,10 @@ struct Link {
     bool paired = false;    ///< looks like one end of a veth pair
 };
 
-constexpr const char* classDirectory = "/sys/class/net";
+constexpr const char* kClassDirectory = "/sys/class/net";
 
 /// All Ethernet links, by name; nothing when the directory cannot be read.
-/// @param directory classDirectory, or a copy of it
+/// @param directory kClassDirectory, or a copy of it
 std::optional<std::vector<Link>> readLinks(const std::string& directory);
 
 /// The first line of one attribute file of a link, "" when it cannot be read or the name is none.

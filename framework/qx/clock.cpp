@@ -9,12 +9,12 @@ namespace QX {
 namespace {
 
 std::atomic<double> clockSpeed{1.0};
-constexpr double longestWait = 1e9;  // seconds
+constexpr double kLongestWait = 1e9;  // seconds
 
 }  // namespace
 
 std::chrono::nanoseconds scaled(std::chrono::duration<double> real) {
-    const double seconds = std::min(real.count() / clockSpeed.load(), longestWait);
+    const double seconds = std::min(real.count() / clockSpeed.load(), kLongestWait);
     return std::chrono::nanoseconds(static_cast<long long>(seconds * 1e9));
 }
 

@@ -10,7 +10,7 @@
 namespace QX {
 namespace {
 
-constexpr unsigned int iso8601 = 3;
+constexpr unsigned int kIso8601 = 3;
 
 /// Reads a text from the left; what does not fit makes the whole text wrong.
 class Reader {
@@ -123,7 +123,7 @@ long long parse(const std::string& text) {
 }  // namespace
 
 DateTime::DateTime(const std::string& text, unsigned int format) : seconds_(0) {
-    if (format != iso8601) {
+    if (format != kIso8601) {
         throw std::invalid_argument("no such time format: " + std::to_string(format));
     }
     try {

@@ -12,13 +12,13 @@ Mutex::Mutex() = default;
 Mutex::~Mutex() = default;
 
 bool Mutex::lock(unsigned long milliseconds) {
-    constexpr auto forEver = std::numeric_limits<unsigned long>::max();
-    constexpr unsigned long longest = 1'000'000'000;  // eleven days; more would overflow the clock one day
+    constexpr auto kForEver = std::numeric_limits<unsigned long>::max();
+    constexpr unsigned long kLongest = 1'000'000'000;  // eleven days; more would overflow the clock one day
     const auto isFree = [this] { return !held_; };
     std::unique_lock lock(guard_);
-    if (milliseconds == forEver) {
+    if (milliseconds == kForEver) {
         freed_.wait(lock, isFree);
-    } else if (!freed_.wait_for(lock, std::chrono::milliseconds(std::min(milliseconds, longest)), isFree)) {
+    } else if (!freed_.wait_for(lock, std::chrono::milliseconds(std::min(milliseconds, kLongest)), isFree)) {
         return false;
     }
     held_ = true;

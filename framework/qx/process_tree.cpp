@@ -71,9 +71,9 @@ bool isRunning(pid_t process) {
 
 /// Stops a process and waits, though not for ever, until it has: only then is its list of children final.
 void freeze(const Process& process) {
-    constexpr int patience = 100;
+    constexpr int kPatience = 100;
     process.send(SIGSTOP);
-    for (int tries = 0; tries < patience && isRunning(process.id()); ++tries) {
+    for (int tries = 0; tries < kPatience && isRunning(process.id()); ++tries) {
         std::this_thread::sleep_for(std::chrono::microseconds(100));
     }
 }

@@ -10,8 +10,8 @@
 namespace QX {
 namespace {
 
-constexpr unsigned long readMode = 1;
-constexpr unsigned long writeMode = 3;
+constexpr unsigned long kReadMode = 1;
+constexpr unsigned long kWriteMode = 3;
 
 std::map<std::wstring, std::wstring> parse(std::string_view content) {
     std::map<std::wstring, std::wstring> values;
@@ -41,12 +41,12 @@ PropertyFile::PropertyFile(const File::Path& path) : path_(path.str()) {}
 PropertyFile::~PropertyFile() = default;
 
 void PropertyFile::open(unsigned long mode) {
-    if (mode != readMode && mode != writeMode) {
+    if (mode != kReadMode && mode != kWriteMode) {
         throw PropertyFileError(path_ + ": no such mode: " + std::to_string(mode));
     }
     try {
         const auto content = readWholeFile(path_);
-        if (!content && mode == readMode) {
+        if (!content && mode == kReadMode) {
             throw PropertyFileError(path_ + ": no such file");
         }
         values_ = parse(content.value_or(""));
@@ -58,7 +58,7 @@ void PropertyFile::open(unsigned long mode) {
 }
 
 void PropertyFile::close() {
-    if (mode_ == writeMode && changed_) {
+    if (mode_ == kWriteMode && changed_) {
         try {
             replaceWholeFile(path_, format(values_));
         } catch (const std::system_error& error) {
@@ -101,7 +101,7 @@ std::vector<std::wstring> PropertyFile::enumerateKeys() const {
 }
 
 void PropertyFile::requireWritable() const {
-    if (mode_ != writeMode) {
+    if (mode_ != kWriteMode) {
         throw PropertyFileError(path_ + ": not open for writing");
     }
 }

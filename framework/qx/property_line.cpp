@@ -2,6 +2,7 @@
 
 #include <charconv>
 
+#include "framework/qx/hex.h"
 #include "framework/qx/utf8.h"
 
 namespace QX {
@@ -9,13 +10,12 @@ namespace {
 
 /// Appends a text with everything escaped that would break the line, the key or the file's UTF-8.
 void appendEscaped(std::string& line, std::string_view text, bool isKey) {
-    constexpr std::string_view hexDigits = "0123456789abcdef";
     while (!text.empty()) {
         const std::size_t length = firstUtf8Character(text).length;
         const char first = text.front();
         if (length == 0) {
             const auto byte = static_cast<unsigned char>(first);
-            line += {'\\', 'x', hexDigits[byte >> 4U], hexDigits[byte & 0xfU]};
+            line += {'\\', 'x', kHexDigits[byte >> 4U], kHexDigits[byte & 0xfU]};
         } else if (first == '\n') {
             line += "\\n";
         } else if (first == '\\' || (isKey && first == '=')) {

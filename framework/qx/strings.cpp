@@ -8,15 +8,11 @@ namespace QX {
 namespace {
 
 // A byte b that is not UTF-8 stands as this plus b: lone surrogates, which valid text never holds.
-constexpr char32_t strayByte = 0xdc00;
-constexpr char32_t replacement = 0xfffd;
+constexpr char32_t kStrayByte = 0xdc00;
+constexpr char32_t kReplacement = 0xfffd;
 
 bool isStrayByte(char32_t code) {
-    return code >= strayByte + 0x80 && code <= strayByte + 0xff;
-}
-
-bool isScalar(char32_t code) {
-    return code <= 0x10ffff && (code < 0xd800 || code > 0xdfff);
+    return code >= kStrayByte + 0x80 && code <= kStrayByte + 0xff;
 }
 
 char byteOf(char32_t bits) {
@@ -45,7 +41,7 @@ std::wstring make_wstring(const std::string& text) {
     while (!rest.empty()) {
         auto [code, length] = firstUtf8Character(rest);
         if (length == 0) {
-            code = strayByte + static_cast<unsigned char>(rest.front());
+            code = kStrayByte + static_cast<unsigned char>(rest.front());
             length = 1;
         }
         wide += static_cast<wchar_t>(code);
@@ -60,9 +56,9 @@ std::string make_string(const std::wstring& text) {
     for (const wchar_t character : text) {
         const auto code = static_cast<char32_t>(character);
         if (isStrayByte(code)) {
-            narrow += byteOf(code - strayByte);
+            narrow += byteOf(code - kStrayByte);
         } else {
-            appendUtf8(narrow, isScalar(code) ? code : replacement);
+            appendUtf8(narrow, isUnicodeScalar(code) ? code : kReplacement);
         }
     }
     return narrow;

@@ -93,7 +93,7 @@ bool Thread::start(void* argument) {
 
 void Thread::join() {
     // How often to look for commands that an aborted thread has still started.
-    constexpr std::chrono::milliseconds lookAgain{20};
+    constexpr std::chrono::milliseconds kLookAgain{20};
     std::unique_lock lock(state_->guard);
     if (state_->isCurrent()) {
         return;
@@ -102,7 +102,7 @@ void Thread::join() {
     while (state_->running) {
         if (!state_->aborted) {
             state_->changed.wait(lock);
-        } else if (state_->changed.wait_for(lock, lookAgain) == std::cv_status::timeout && state_->running) {
+        } else if (state_->changed.wait_for(lock, kLookAgain) == std::cv_status::timeout && state_->running) {
             killChildrenOf(
                 state_->kernelId);  // under the lock: the thread cannot end and leave its id to another
         }

@@ -11,18 +11,14 @@ struct Form {
     char32_t least;        // the first code that needs this form
 };
 
-constexpr std::array<Form, 4> forms{
+constexpr std::array<Form, 4> kForms{
     {{0x80, 0x00, 0}, {0xe0, 0xc0, 0x80}, {0xf0, 0xe0, 0x800}, {0xf8, 0xf0, 0x10000}}};
-
-bool isScalar(char32_t code) {
-    return code <= 0x10ffff && (code < 0xd800 || code > 0xdfff);
-}
 
 }  // namespace
 
 Utf8Character firstUtf8Character(std::string_view text) {
-    for (std::size_t length = 1; length <= forms.size() && length <= text.size(); ++length) {
-        const Form& form = forms[length - 1];
+    for (std::size_t length = 1; length <= kForms.size() && length <= text.size(); ++length) {
+        const Form& form = kForms[length - 1];
         const auto first = static_cast<unsigned char>(text[0]);
         if ((first & form.mask) != form.marker) {
             continue;
@@ -35,7 +31,7 @@ Utf8Character firstUtf8Character(std::string_view text) {
             }
             code = (code << 6U) | (byte & 0x3fU);
         }
-        return code >= form.least && isScalar(code) ? Utf8Character{code, length} : Utf8Character{};
+        return code >= form.least && isUnicodeScalar(code) ? Utf8Character{code, length} : Utf8Character{};
     }
     return {};
 }

@@ -5,6 +5,11 @@
 
 namespace QX {
 
+/// A code that stands for a character: no surrogate, nothing above the last one.
+constexpr bool isUnicodeScalar(char32_t code) {
+    return code <= 0x10ffff && (code < 0xd800 || code > 0xdfff);
+}
+
 struct Utf8Character {
     char32_t code = 0;
     std::size_t length = 0;  ///< bytes; 0 when the text does not start with a whole, valid character

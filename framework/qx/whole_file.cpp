@@ -15,6 +15,8 @@
 #include <utility>
 #include <vector>
 
+#include "framework/qx/hex.h"
+
 namespace QX {
 namespace {
 
@@ -38,12 +40,17 @@ public:
     }
     int get() const { return number_; }
     bool isOpen() const { return number_ >= 0; }
-    /// A close that can fail: some file systems tell only then that data was lost.
-    bool close() { return ::close(std::exchange(number_, -1)) == 0; }
 
 private:
     int number_;
 };
+
+/// Some file systems tell only at close that data was lost. A copy is closed for the answer; the file itself
+/// stays open for the lock that keeps sweeps away.
+bool closesCleanly(const Descriptor& file) {
+    const int copy = fcntl(file.get(), F_DUPFD_CLOEXEC, 0);
+    return copy >= 0 && ::close(copy) == 0;
+}
 
 void writeAll(const Descriptor& file, std::string_view content, const std::string& path) {
     while (!content.empty()) {
@@ -58,14 +65,13 @@ void writeAll(const Descriptor& file, std::string_view content, const std::strin
 
 // The name of a temporary file is "." + name + "." + 16 hexadecimal digits + ".tmp". Its writer holds a lock
 // on it as long as it needs it; one without a lock was left behind.
-constexpr std::size_t randomDigits = 16;
-constexpr std::string_view suffix = ".tmp";
+constexpr std::size_t kRandomDigits = 16;
+constexpr std::string_view kSuffix = ".tmp";
 
 std::string randomName() {
-    constexpr std::string_view hexDigits = "0123456789abcdef";
     std::random_device source;
-    std::string digits(randomDigits, '0');
-    std::ranges::generate(digits, [&] { return hexDigits[source() % hexDigits.size()]; });
+    std::string digits(kRandomDigits, '0');
+    std::ranges::generate(digits, [&] { return kHexDigits[source() % kHexDigits.size()]; });
     return digits;
 }
 
@@ -75,9 +81,9 @@ std::string temporaryPrefix(const fs::path& target) {
 
 bool isTemporaryOf(const fs::path& target, const std::string& name) {
     const std::string prefix = temporaryPrefix(target);
-    return name.size() == prefix.size() + randomDigits + suffix.size() && name.starts_with(prefix) &&
-           name.ends_with(suffix) &&
-           name.find_first_not_of("0123456789abcdef", prefix.size()) == prefix.size() + randomDigits;
+    return name.size() == prefix.size() + kRandomDigits + kSuffix.size() && name.starts_with(prefix) &&
+           name.ends_with(kSuffix) &&
+           name.find_first_not_of(kHexDigits, prefix.size()) == prefix.size() + kRandomDigits;
 }
 
 fs::path directoryOf(const fs::path& target) {
@@ -87,10 +93,10 @@ fs::path directoryOf(const fs::path& target) {
 /// A file of a new name, locked by us. The sweep of another writer may catch it between creation and lock:
 /// then again.
 std::pair<Descriptor, fs::path> createTemporary(const fs::path& target) {
-    constexpr mode_t ordinary = 0644;
+    constexpr mode_t kOrdinary = 0644;
     for (;;) {
-        fs::path path = directoryOf(target) / (temporaryPrefix(target) + randomName() + std::string(suffix));
-        Descriptor file(::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, ordinary));
+        fs::path path = directoryOf(target) / (temporaryPrefix(target) + randomName() + std::string(kSuffix));
+        Descriptor file(::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kOrdinary));
         if (!file.isOpen()) {
             if (errno == EEXIST) {
                 continue;
@@ -159,7 +165,7 @@ std::optional<std::string> readWholeFile(const std::string& path) {
         fail(path, "read: not a regular file", S_ISDIR(status.st_mode) ? EISDIR : EINVAL);
     }
     std::string content;
-    std::vector<char> buffer(64 * 1024);
+    std::vector<char> buffer(std::size_t{64} * 1024);
     for (;;) {
         const ssize_t count = ::read(file.get(), buffer.data(), buffer.size());
         if (count == 0) {
@@ -179,19 +185,15 @@ void replaceWholeFile(const std::string& path, const std::string& content) {
     try {
         writeAll(file, content, path);
         copyOwnership(file, path);
-        if (fsync(file.get()) != 0) {
+        if (fsync(file.get()) != 0 || !closesCleanly(file)) {
             fail(path, "bring it to the disk");
         }
-        // The rename comes before the close, which gives up the lock that keeps sweeps away.
         if (::rename(temporary.c_str(), path.c_str()) != 0) {
             fail(path, "replace");
         }
     } catch (...) {
         ::unlink(temporary.c_str());
         throw;
-    }
-    if (!file.close()) {
-        fail(path, "close");
     }
     syncDirectory(path);
 }
