@@ -17,7 +17,6 @@ namespace IC {
 
 class NetworkMonitor;
 class PortWalk;
-struct HostFacts;
 struct ListedInterface;
 
 /// The plug-in object: builds the tree of the host's nodes, starts and stops the monitors. There is one,
@@ -114,13 +113,12 @@ private:
     unsigned int memberVerdict(const std::string& member) const;
     void sendAlert(const Alert& alert);
     // Steps of createNetworkPortNodes (network/).
-    void visitInterface(const ListedInterface& interface, const PortWalk& walk, unsigned int& index);
+    void visitInterface(const ListedInterface& interface, const PortWalk& walk,
+                        std::map<std::string, std::string> settings, unsigned int& index);
     MutableNode* createPort(const std::string& name, unsigned int index);
     MutableNode* createIPConfig(const ListedInterface& interface, const MutableNode& parent,
                                 const PortWalk& walk, unsigned int index,
                                 std::map<std::string, std::string>& settings);
-    void saveSettings(const std::string& name, const HostFacts& host,
-                      std::map<std::string, std::string> settings);
     /// The frame of both storage builders: the old nodes go, each line of the listing may give a new one.
     void buildStorageNodes(const StorageKind& kind, bool update);
     void handOver(std::unique_ptr<MutableNode> node, const StorageKind& kind, bool update);

@@ -15,27 +15,33 @@ void OsHwMI::createNetworkPortNodes(bool /*update*/) {
     const LogScope scope;
     const std::lock_guard oneWalkAtATime(portWalkGuard_);
     const std::vector<ListedInterface> interfaces = PortWalk::list();
-    dnsServers_.clear();
-    dnsSuffixes_.clear();
-    getDNSDetails(dnsServers_, dnsSuffixes_);
-    const PortWalk walk({trimEnd(hostName_), trimEnd(domainName_), dnsServers_, dnsSuffixes_});
+    PortWalk walk(trimEnd(hostName_), trimEnd(domainName_));
+    dnsServers_ = walk.host().dnsServers;
+    dnsSuffixes_ = walk.host().dnsSuffixes;
+    std::string servers;
+    std::string suffixes;
+    stringFormatForDNSServersAndSuffixes(servers, suffixes);
+    const std::map<std::string, std::string> shared = {{"HOSTNAME", walk.host().hostName},
+                                                       {"DOMAINNAME", walk.host().domainName},
+                                                       {"DNSSERVERS", servers},
+                                                       {"DNSSUFFIXES", suffixes}};
     unsigned int index = 0;
     for (const ListedInterface& interface : interfaces) {
         try {
-            visitInterface(interface, walk, index);
+            visitInterface(interface, walk, shared, index);
         } catch (const std::exception& failure) {
             log(kError) << "NetworkPort error " << failure.what();
         }
     }
 }
 
-void OsHwMI::visitInterface(const ListedInterface& interface, const PortWalk& walk, unsigned int& index) {
+void OsHwMI::visitInterface(const ListedInterface& interface, const PortWalk& walk,
+                            std::map<std::string, std::string> settings, unsigned int& index) {
     const std::string& name = interface.name;
     MutableNode* known = nullptr;
     if (findNetworkPort(name, &known) || walk.isBridgeMember(name) || walk.hasZeroAddress(name)) {
         return;
     }
-    std::map<std::string, std::string> settings;
     MutableNode* port = walk.isPort(name) ? createPort(name, index) : nullptr;
     MutableNode* config = nullptr;
     if (PortWalk::hasIPConfig(name)) {
@@ -47,7 +53,8 @@ void OsHwMI::visitInterface(const ListedInterface& interface, const PortWalk& wa
         log(kProgress) << "Inserting the interface in the Map " << name;
         rememberByName(name, node);
     }
-    saveSettings(name, walk.host(), std::move(settings));
+    settings.emplace("CONFIG_NAME", name);
+    createSettingData(name, std::move(settings));
 }
 
 MutableNode* OsHwMI::createPort(const std::string& name, unsigned int index) {
@@ -68,19 +75,6 @@ MutableNode* OsHwMI::createIPConfig(const ListedInterface& interface, const Muta
     config->setDescription(interface.fromBridgeListing ? "Bridge" : "IP Configuration");
     fillIPConfig(*config, walk.host(), settings);
     return config;
-}
-
-void OsHwMI::saveSettings(const std::string& name, const HostFacts& host,
-                          std::map<std::string, std::string> settings) {
-    std::string servers;
-    std::string suffixes;
-    stringFormatForDNSServersAndSuffixes(servers, suffixes);
-    settings.emplace("HOSTNAME", host.hostName);
-    settings.emplace("DOMAINNAME", host.domainName);
-    settings.emplace("DNSSERVERS", servers);
-    settings.emplace("DNSSUFFIXES", suffixes);
-    settings.emplace("CONFIG_NAME", name);
-    createSettingData(name, std::move(settings));
 }
 
 }  // namespace IC

@@ -9,6 +9,7 @@
 #include "mi/command.h"
 #include "mi/log.h"
 #include "mi/text.h"
+#include "network/dns.h"
 #include "network/interface_lists.h"
 #include "network/link_queries.h"
 
@@ -38,8 +39,10 @@ ListedInterface listedInterface(const std::string& line) {
 
 }  // namespace
 
-PortWalk::PortWalk(HostFacts host) : host_(std::move(host)) {
+PortWalk::PortWalk(std::string hostName, std::string domainName)
+    : host_{std::move(hostName), std::move(domainName), {}, {}} {
     getbridgeInterfaces(bridgeMembers_);
+    getDNSDetails(host_.dnsServers, host_.dnsSuffixes);
     log(kProgress) << "IPv6 configured: " << (access("/proc/net/if_inet6", R_OK) == 0);
     runToEnd(std::string("ifconfig > ") + ifconfigSnapshotPath);
 }

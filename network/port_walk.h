@@ -19,9 +19,9 @@ struct ListedInterface {
 /// What one walk over the host's interfaces has to hand: read at its start, the same for every interface.
 class PortWalk {
 public:
-    /// Reads the bridge members, the kernel's ports and VLANs, and keeps the output of `ifconfig` for the
-    /// length of the walk.
-    explicit PortWalk(HostFacts host);
+    /// Reads the bridge members, the resolver, the kernel's ports and VLANs, and keeps the output of
+    /// `ifconfig` for the length of the walk.
+    PortWalk(std::string hostName, std::string domainName);
     PortWalk(const PortWalk&) = delete;
     PortWalk& operator=(const PortWalk&) = delete;
     ~PortWalk();

@@ -1,0 +1,284 @@
+// Start and stop of the whole plug-in.
+#include <gmock/gmock.h>
+
+#include <thread>
+
+#include "mi/globals.h"
+#include "mi/my_process.h"
+#include "mi/os_hw_mi.h"
+#include "tests/support/fake_host.h"
+#include "tests/support/log_capture.h"
+#include "tests/support/no_descriptors.h"
+
+extern "C" int OpenMI(IC::ManagementInterface** mi, IC::Error** err);
+
+namespace {
+
+using IC::MutableNode;
+using IC::Number;
+using IC::OsHwMI;
+
+/// The lines that this thread logged; the monitors speak at the same time.
+std::vector<std::string> ownMessages(const LogCapture& capture) {
+    std::vector<std::string> found;
+    for (const LogLine& line : capture.lines()) {
+        if (line.channel == LogLine::Channel::log && line.thread == std::this_thread::get_id()) {
+            found.push_back(line.message);
+        }
+    }
+    return found;
+}
+
+IC::Error initialize(OsHwMI& mi) {
+    return mi.initialize(1, Number(1U), Number(2U));
+}
+
+std::vector<std::shared_ptr<MutableNode>> nodesOfType(const OsHwMI& mi, unsigned int type) {
+    std::vector<std::shared_ptr<MutableNode>> found;
+    for (const auto& node : mi.holdAll()) {
+        if (node->nodeType() == type) {
+            found.push_back(node);
+        }
+    }
+    return found;
+}
+
+IC::Error refuse(IC::Node* const&, const void*) {
+    return {7, Number(), "the agent is full"};
+}
+
+/// What the agent's thread logs on a host without disks, interfaces, tools and a data directory.
+const std::vector<std::string> kWholeLife = {
+    "initialize: entry",
+    "updateHostAndDomainName: entry",
+    "updateHostAndDomainName: exit",
+    "createOsHwNodes: entry",
+    "createOsHwNodes: exit",
+    "Node::ROOT: start",
+    "Node::ROOT: end",
+    "createComputerNodes: entry",
+    "ComputerNode::ComputerNode: entry",
+    "ComputerNode::ComputerNode: exit",
+    "ComputerNode::setProperty: entry",
+    "ComputerNode::setProperty: exit",
+    "ComputerNode::setProperty: entry",
+    "ComputerNode::setProperty: exit",
+    "ComputerNode::getProperty: entry",
+    "ComputerNode::getProperty : OwnerContact/OwnerName - Cannot read asset dat file.",
+    "ComputerNode::getProperty: exit",
+    "ComputerNode::setProperty: entry",
+    "ComputerNode::setProperty: exit",
+    "ComputerNode::setProperty: entry",
+    "ComputerNode::setProperty: exit",
+    "ComputerNode::getProperty: entry",
+    "ComputerNode::getProperty : OwnerContact/OwnerName - Cannot read asset dat file.",
+    "ComputerNode::getProperty: exit",
+    "ComputerNode::setProperty: entry",
+    "ComputerNode::setProperty: exit",
+    "ComputerNode::setProperty: entry",
+    "ComputerNode::setProperty: exit",
+    "ComputerNode::getProperty: entry",
+    "ComputerNode::getProperty: exit",
+    "ComputerNode::setProperty: entry",
+    "ComputerNode::setProperty: exit",
+    "ComputerNode::getProperty: entry",
+    "ComputerNode::getProperty: exit",
+    "ComputerNode::setProperty: entry",
+    "ComputerNode::setProperty: exit",
+    "createComputerNodes: exit",
+    "createChassisNodes: entry",
+    "createChassisNodes: exit",
+    "createPlanarNodes: entry",
+    "createPlanarNodes: exit",
+    "createNetworkControllerNodes: entry",
+    "createNetworkControllerNodes: exit",
+    "createDiskControllerNodes: entry",
+    "createDiskControllerNodes: exit",
+    "createHardDriveNodes: entry",
+    "createHardDriveNodes: exit",
+    "createPartitionNodes: entry",
+    "createPartitionNodes: exit",
+    "createNetworkPortNodes: entry",
+    "getbridgeInterfaces: entry",
+    "getbridgeInterfaces: exit",
+    "getDNSDetails: entry",
+    "getDNSDetails: exit",
+    "IPv6 configured: 0",
+    "stringFormatForDNSServersAndSuffixes: entry",
+    "stringFormatForDNSServersAndSuffixes: exit",
+    "createNetworkPortNodes: exit",
+    "createNetworkTeamingNodes: entry",
+    "Entering getNICTeams",
+    "Exiting getNICTeams",
+    "createNetworkTeamingNodes: exit",
+    "enableIndications: entry",
+    "Creating NetworkMonitor thread.",
+    "NetworkMonitor::NetworkMonitor: entry",
+    "NetworkMonitor::NetworkMonitor: exit",
+    "NetworkMonitor thread created.",
+    "enableIndications: exit",
+    "startHDDThread: entry",
+    "HardDriveUpdateMonitor::const: entry",
+    "HardDriveUpdateMonitor::Const: exit",
+    "HardDriveUpdateThread thread created.",
+    "startHDDThread: exit",
+    "initialize: exit",
+    "unload: entry",
+    "HardDriveUpdateMonitor::stop: entry",
+    "HardDriveUpdateMonitor::stop: exit",
+    "disable Hard Drive updates: waiting for HardDriveUpdateMonitor Termination ",
+    "disable Hard Drive updates: HardDriveUpdateMonitor terminated.",
+    "HardDriveUpdateMonitor::~HardDriveUpdateMonitor: entry",
+    "HardDriveUpdateMonitor::~HardDriveUpdateMonitor: exit",
+    "disableIndications: entry",
+    "eventThreadNetIndications: Stopping thread...",
+    "NetworkMonitor::stop: entry",
+    "NetworkMonitor::stop: exit",
+    "eventThreadNetIndicationsThread terminated.",
+    "NetworkMonitor::~NetworkMonitor: entry",
+    "NetworkMonitor::~NetworkMonitor: exit",
+    "disableIndications: exit",
+    "ComputerNode::~ComputerNode: entry",
+    "ComputerNode::~ComputerNode: exit",
+    "deleteSavedConfigurations: entry",
+    "deleteSavedConfigurations: exit",
+    "deleteFdiskTmp: entry",
+    "Deleting /tmp/fdisk_tmp",
+    "deleteFdiskTmp: exit",
+    "unload: exit"};
+
+HOST_TEST(OpenMI, HandsOutThePluginObjectAndItsErrorEachTime) {
+    LogCapture capture;
+    for (int i = 0; i < 2; ++i) {
+        IC::ManagementInterface* mi = nullptr;
+        IC::Error* error = nullptr;
+        EXPECT_EQ(OpenMI(&mi, &error), 0);
+        EXPECT_EQ(mi, &IC::myoshwmi);
+        EXPECT_EQ(error, &IC::OSHWMI::myerr);
+    }
+    EXPECT_THAT(capture.messages(3000),
+                testing::ElementsAre("OpenMI: entry", "OpenMI: exit", "OpenMI: entry", "OpenMI: exit"));
+    EXPECT_EQ(capture.lines().front().function, "OpenMI");
+    EXPECT_TRUE(capture.everyLineTwice());
+}
+
+HOST_TEST(Lifecycle, BuildsTheStaticTree) {
+    initialize(IC::myoshwmi);
+    struct Expected {
+        unsigned int id, parent, type, index, status;
+        const char* description;
+    };
+    const Expected expected[] = {
+        {1, 0, 38, 0, 1, "OsHw Management Interface"},
+        {2, 1, 59, 0, 1, "ROOT Node"},
+        {3, 2, 40, 0, 1, "Computer"},
+        {4, 3, 1, 0, 0, ""},
+        {5, 4, 41, 0, 1, "Planar"},
+        {6, 4, 49, 0, 1, "Network Controller"},
+        {7, 5, 50, 1, 1, "Disk Controller"},
+    };
+    const auto nodes = IC::myoshwmi.holdAll();
+    ASSERT_EQ(nodes.size(), std::size(expected));
+    for (std::size_t i = 0; i < nodes.size(); ++i) {
+        SCOPED_TRACE(expected[i].description);
+        EXPECT_EQ(nodes[i]->getNodeId(), expected[i].id);
+        EXPECT_EQ(nodes[i]->getLinkedId(), expected[i].parent);
+        EXPECT_EQ(nodes[i]->nodeType(), expected[i].type);
+        EXPECT_EQ(nodes[i]->getIndex(), expected[i].index);
+        EXPECT_EQ(nodes[i]->getStatus(), expected[i].status);
+        EXPECT_EQ(nodes[i]->getDescription(), expected[i].description);
+        EXPECT_EQ(nodes[i]->getMIIds(), std::vector<unsigned int>{1});
+    }
+    std::vector<IC::Node*> map;
+    EXPECT_EQ(IC::myoshwmi.getMap(map).getStatus(), 0);
+    EXPECT_EQ(map.size(), std::size(expected));
+    IC::myoshwmi.unload();
+}
+
+HOST_TEST(Lifecycle, TakesTheFirstDiskSnapshotAndRemovesItAtTheEnd) {
+    host.tool("fdisk -ls", "Disk /dev/sda: 80.0 GB, 80026361856 bytes\n");
+    initialize(IC::myoshwmi);
+    EXPECT_EQ(host.read("/tmp/fdisk_tmp"), "Disk /dev/sda: 80.0 GB, 80026361856 bytes\n");
+    EXPECT_EQ(nodesOfType(IC::myoshwmi, 11).size(), 1U);
+    IC::myoshwmi.unload();
+    EXPECT_FALSE(host.exists("/tmp/fdisk_tmp"));
+}
+
+HOST_TEST(Lifecycle, GoesOnWithoutASnapshotWhenTheShellCannotBeStarted) {
+    LogCapture capture;
+    {
+        const NoDescriptors none;
+        initialize(IC::myoshwmi);
+    }
+    EXPECT_THAT(capture.messages(6000),
+                testing::Contains("Command : fdisk -ls 2>/dev/null > /tmp/fdisk_tmp failed!!"));
+    EXPECT_EQ(nodesOfType(IC::myoshwmi, 50).size(), 1U);
+    IC::myoshwmi.unload();
+}
+
+HOST_TEST(Lifecycle, KeepsTheBaseResultAndGoesOnWhenTheBaseFails) {
+    const IC::Error result = IC::myoshwmi.initialize(1, Number(), Number());
+    EXPECT_NE(result.getStatus(), 0);
+    EXPECT_EQ(IC::OSHWMI::myerr.getStatus(), result.getStatus());
+    EXPECT_TRUE(IC::OSHWMI::bInitflag);
+    EXPECT_EQ(IC::myoshwmi.holdAll().size(), 7U);
+    IC::myoshwmi.unload();
+}
+
+HOST_TEST(Lifecycle, ActsOnTheHostOnlyAfterTheStart) {
+    EXPECT_FALSE(IC::OSHWMI::bInitflag);
+    EXPECT_EQ(initialize(IC::myoshwmi).getStatus(), 0);
+    EXPECT_TRUE(IC::OSHWMI::bInitflag);
+    EXPECT_FALSE(IC::HardDriveNodeUpdate);
+    IC::myoshwmi.unload();
+    EXPECT_TRUE(IC::HardDriveNodeUpdate);
+}
+
+HOST_TEST(Lifecycle, LogsARefusedNodeAndGoesOn) {
+    initialize(IC::myoshwmi);
+    IC::myoshwmi.setLoadCallBack(refuse, nullptr, nullptr);
+    LogCapture capture;
+    IC::myoshwmi.publishNode(new MutableNode(900, 1, {1}, 11, 0));
+    EXPECT_THAT(ownMessages(capture),
+                testing::ElementsAre("publishNode: entry", "addNewNode error = the agent is full",
+                                     "publishNode: exit"));
+    EXPECT_EQ(capture.messages(6000), std::vector<std::string>{"addNewNode error = the agent is full"});
+    IC::myoshwmi.unload();
+}
+
+HOST_TEST(Lifecycle, StopsWithoutAStart) {
+    LogCapture capture;
+    EXPECT_EQ(IC::myoshwmi.unload().getStatus(), 0);
+    EXPECT_THAT(capture.messages(),
+                testing::ElementsAre("unload: entry", "disableIndications: entry", "disableIndications: exit",
+                                     "deleteSavedConfigurations: entry", "deleteSavedConfigurations: exit",
+                                     "deleteFdiskTmp: entry", "Deleting /tmp/fdisk_tmp",
+                                     "deleteFdiskTmp: exit", "unload: exit"));
+}
+
+HOST_TEST(Lifecycle, StopsAtOnce) {
+    initialize(IC::myoshwmi);
+    const auto start = std::chrono::steady_clock::now();
+    IC::myoshwmi.unload();
+    EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(2));
+}
+
+HOST_TEST(Lifecycle, LogsEveryLineTwiceInTheOrderOfTheSequences) {
+    LogCapture capture;
+    initialize(IC::myoshwmi);
+    IC::myoshwmi.unload();
+    EXPECT_TRUE(capture.everyLineTwice());
+    for (const LogLine& line : capture.lines()) {
+        EXPECT_TRUE(line.reserved1Null);
+        EXPECT_EQ(line.reserved2, 0);
+        EXPECT_EQ(line.reserved3, 0);
+        EXPECT_GT(line.line, 0);
+        const bool ofMain = line.source == "OsHwMI_ix86" && line.component == "Corvista.IC.MI.OsHwMI";
+        const bool ofIndications =
+            line.source == "OsHwMIInd_ix86" && line.component == "Corvista.IC.MI.OsHwMIInd";
+        EXPECT_TRUE(ofMain || ofIndications) << line.source << ' ' << line.component;
+    }
+    EXPECT_THAT(ownMessages(capture), testing::ElementsAreArray(kWholeLife));
+}
+
+}  // namespace

@@ -1,0 +1,113 @@
+#include "mi/line_file.h"
+
+#include "tests/support/fake_host.h"
+#include "tests/support/log_capture.h"
+
+namespace {
+
+using IC::LineFile;
+using Fate = LineFile::Fate;
+
+Fate keepAll(std::string&) {
+    return Fate::keep;
+}
+
+/// Replaces every line that contains "KEY=".
+Fate replaceKey(std::string& line) {
+    if (line.find("KEY=") != std::string::npos) {
+        line = "KEY=new\n";
+    }
+    return Fate::keep;
+}
+
+void editKey(const char* path) {
+    auto file = LineFile::read(path);
+    ASSERT_TRUE(file);
+    file->rewrite(replaceKey);
+    EXPECT_TRUE(file->write(path));
+}
+
+std::string ofLength(std::size_t length, const std::string& start) {
+    return start + std::string(length - start.size(), 'x');
+}
+
+HOST_TEST(LineFile, KeepsWhatNoRuleTouchesByteForByte) {
+    const std::string contents[] = {
+        "",
+        "\n\n",
+        "# comment\n\tkey = value \nlast\n",
+        "dos\r\nlines\r\n",
+        "no line break at the end",
+        std::string("nul\0inside\n", 11),
+        "\xff\xfe not UTF-8 \xc3\n",
+        ofLength(511, "a") + "\n" + ofLength(512, "b") + "\n" + ofLength(513, "c") + "\n" +
+            ofLength(5000, "d"),
+    };
+    for (const std::string& content : contents) {
+        host.file("/etc/file", content);
+        auto file = LineFile::read("/etc/file");
+        ASSERT_TRUE(file);
+        file->rewrite(keepAll);
+        EXPECT_TRUE(file->write("/etc/file"));
+        EXPECT_EQ(host.read("/etc/file"), content);
+    }
+}
+
+HOST_TEST(LineFile, ReplacesALineInPlace) {
+    host.file("/etc/file", "first\nKEY=old\r\nlast");
+    editKey("/etc/file");
+    EXPECT_EQ(host.read("/etc/file"), "first\nKEY=new\nlast");
+}
+
+HOST_TEST(LineFile, DropsALine) {
+    host.file("/etc/file", "a\nb\nc\n");
+    auto file = LineFile::read("/etc/file");
+    ASSERT_TRUE(file);
+    file->rewrite([](std::string& line) { return line == "b\n" ? Fate::drop : Fate::keep; });
+    EXPECT_EQ(file->lines(), (std::vector<std::string>{"a\n", "c\n"}));
+}
+
+HOST_TEST(LineFile, ShowsARuleLinesOf511And512CharactersAndKeepsALongerOneUntouched) {
+    host.file("/etc/file",
+              ofLength(511, "KEY=") + "\n" + ofLength(512, "KEY=") + "\n" + ofLength(513, "KEY=") + "\n");
+    editKey("/etc/file");
+    EXPECT_EQ(host.read("/etc/file"), "KEY=new\nKEY=new\n" + ofLength(513, "KEY=") + "\n");
+}
+
+HOST_TEST(LineFile, AppendsBehindALastLineWithoutLineBreak) {
+    host.file("/etc/file", "first\nlast");
+    auto file = LineFile::read("/etc/file");
+    ASSERT_TRUE(file);
+    file->append("new\n");
+    file->prepend("top\n");
+    file->write("/etc/file");
+    EXPECT_EQ(host.read("/etc/file"), "top\nfirst\nlast\nnew\n");
+}
+
+HOST_TEST(LineFile, CreatesAMissingFile) {
+    EXPECT_FALSE(LineFile::read("/etc/missing"));
+    LineFile file;
+    file.append("only\n");
+    EXPECT_TRUE(file.write("/etc/missing"));
+    EXPECT_EQ(host.read("/etc/missing"), "only\n");
+}
+
+HOST_TEST(LineFile, SaysWhenAFileCannotBeOpenedForWriting) {
+    host.file("/etc/keep/file", "old\n");
+    host.readOnly("/etc/keep");
+    LineFile file;
+    file.append("new\n");
+    EXPECT_FALSE(file.write("/etc/keep/file"));
+    EXPECT_EQ(host.read("/etc/keep/file"), "old\n");
+}
+
+HOST_TEST(LineFile, LeavesTheOldFileWhenTheDiskIsFull) {
+    host.file("/etc/full/file", "old\n");
+    host.fullDisk("/etc/full");
+    LineFile file;
+    file.append(std::string(100000, 'n') + "\n");
+    EXPECT_FALSE(file.write("/etc/full/file"));
+    EXPECT_EQ(host.read("/etc/full/file"), "old\n");
+}
+
+}  // namespace
