@@ -1,0 +1,96 @@
+#include "network/routes_file.h"
+
+#include <sys/mount.h>
+#include <sys/resource.h>
+
+#include <csignal>
+
+#include "tests/network/killed_writer.h"
+#include "tests/support/fake_host.h"
+#include "tests/support/log_capture.h"
+
+namespace {
+
+using IC::AddressFamily;
+using IC::RoutesRewrite;
+
+constexpr char kRoutes[] = "/etc/sysconfig/network/routes";
+
+std::string rewritten(FakeHost& host, AddressFamily family, const std::string& content) {
+    host.file(kRoutes, content);
+    EXPECT_EQ(IC::replaceDefaultRoute(family, family == AddressFamily::ipv4 ? "10.0.0.1" : "fd00::1"),
+              RoutesRewrite::written);
+    return host.read(kRoutes).value_or("missing");
+}
+
+HOST_TEST(RoutesFile, TakesAnIPv4RouteInFrontAndKeepsOnlyIPv6) {
+    EXPECT_EQ(rewritten(host, AddressFamily::ipv4,
+                        "default 10.0.0.9 -\n# c\ndefault fd00::9 -\n10.1.0.0 10.0.0.8 -"),
+              "default\t10.0.0.1\t-\n# c\ndefault fd00::9 -\n");
+    EXPECT_EQ(rewritten(host, AddressFamily::ipv4, "default 10.0.0.9 -\ndefault fd00::9 -"),
+              "default\t10.0.0.1\t-\ndefault fd00::9 -");
+}
+
+HOST_TEST(RoutesFile, TakesAnIPv6RouteAtTheEndAndKeepsOnlyIPv4) {
+    EXPECT_EQ(rewritten(host, AddressFamily::ipv6,
+                        "default 10.0.0.9 -\n# c\ndefault fd00::9 -\n10.1.0.0 10.0.0.8 -"),
+              "default 10.0.0.9 -\n# c\n10.1.0.0 10.0.0.8 -\ndefault\tfd00::1\t-\n");
+}
+
+HOST_TEST(RoutesFile, OfCommentsAloneBecomesTheRouteAlone) {
+    EXPECT_EQ(rewritten(host, AddressFamily::ipv4, "# a\n# b: c\n"), "default\t10.0.0.1\t-\n");
+    EXPECT_EQ(rewritten(host, AddressFamily::ipv6, "# a\n# b: c\n"), "default\tfd00::1\t-\n");
+}
+
+HOST_TEST(RoutesFile, NeverLosesALineThatIsTooLong) {
+    const std::string tooLong = std::string(513, 'x') + "\n";
+    for (const AddressFamily family : {AddressFamily::ipv4, AddressFamily::ipv6}) {
+        EXPECT_NE(rewritten(host, family, tooLong).find(tooLong), std::string::npos);
+        EXPECT_NE(rewritten(host, family, "#" + tooLong).find("#" + tooLong), std::string::npos);
+    }
+    EXPECT_EQ(rewritten(host, AddressFamily::ipv4, std::string(512, 'x') + "\n"), "default\t10.0.0.1\t-\n");
+}
+
+HOST_TEST(RoutesFile, IsNotMade) {
+    EXPECT_EQ(IC::replaceDefaultRoute(AddressFamily::ipv4, "10.0.0.1"), RoutesRewrite::notRead);
+    EXPECT_FALSE(host.exists(kRoutes));
+}
+
+HOST_TEST(RoutesFile, IsTheOldOneWhenItCannotBeWritten) {
+    host.file(kRoutes, "default 10.0.0.9 -\n");
+    host.readOnly("/etc/sysconfig");
+    EXPECT_EQ(IC::replaceDefaultRoute(AddressFamily::ipv4, "10.0.0.1"), RoutesRewrite::notWritten);
+    EXPECT_EQ(host.read(kRoutes), "default 10.0.0.9 -\n");
+}
+
+HOST_TEST(RoutesFile, IsTheOldOneWhenTheDiskIsFull) {
+    host.file(kRoutes, "default 10.0.0.9 -\n");
+    host.fullDisk("/etc/sysconfig/network");
+    IC::replaceDefaultRoute(AddressFamily::ipv4, "10.0.0.1");
+    EXPECT_EQ(host.read(kRoutes), "default 10.0.0.9 -\n");
+}
+
+// Neither old nor new nor empty: where room cannot be reserved beforehand there is nothing better to have.
+HOST_TEST(RoutesFile, IsTheNewOnesBeginningWhenAWriteEndsHalfWayOnAFileSystemThatCannotReserve) {
+    host.directory("/etc/sysconfig/network");
+    ASSERT_EQ(mount("ramfs", "/etc/sysconfig/network", "ramfs", 0, nullptr), 0);
+    host.file(kRoutes, "default 10.0.0.9 -\ndefault fd00::9 -\n");
+    signal(SIGXFSZ, SIG_IGN);
+    const rlimit sevenBytes{7, RLIM_INFINITY};
+    setrlimit(RLIMIT_FSIZE, &sevenBytes);
+    LogCapture capture;
+    EXPECT_EQ(IC::replaceDefaultRoute(AddressFamily::ipv4, "10.0.0.1"), RoutesRewrite::written);
+    EXPECT_EQ(host.read(kRoutes), "default");
+    EXPECT_THAT(capture.messages(6000),
+                testing::ElementsAre("Could not write all of '/etc/sysconfig/network/routes'."));
+    const rlimit unlimited{RLIM_INFINITY, RLIM_INFINITY};
+    setrlimit(RLIMIT_FSIZE, &unlimited);
+}
+
+HOST_TEST(RoutesFile, IsTheOldOneWhenTheWriterIsKilledBeforeItWrites) {
+    host.file(kRoutes, "default 10.0.0.9 -\n");
+    killBeforeItWrites(kRoutes, [] { IC::replaceDefaultRoute(AddressFamily::ipv4, "10.0.0.1"); });
+    EXPECT_EQ(host.read(kRoutes), "default 10.0.0.9 -\n");
+}
+
+}  // namespace
