@@ -14,6 +14,7 @@ const LogSource mainLogSource{"OsHwMI_ix86", &OSHWMI::loggerOsHwMI};
 std::atomic<int> MyProcess::cnt{0};
 std::atomic<bool> OSHWMI::bInitflag{false};
 std::atomic<bool> HardDriveNodeUpdate{false};
+std::map<std::string, CEthernetPort*>* m_mapEthernetPorts = nullptr;
 Error OSHWMI::myerr;
 QX::Mutex OSHWMI::myfileLock;
 OsHwMI myoshwmi;

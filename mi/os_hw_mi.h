@@ -15,6 +15,7 @@
 
 namespace IC {
 
+class CLANEndPointNode;
 class NetworkMonitor;
 class PortWalk;
 struct ListedInterface;
@@ -112,6 +113,7 @@ private:
     /// What a bond member's change since the last pass means for the bond (indications/).
     unsigned int memberVerdict(const std::string& member) const;
     void sendAlert(const Alert& alert);
+    CLANEndPointNode* createLANEndPoint(const std::string& name, unsigned int parent, unsigned int index);
     // Steps of createNetworkPortNodes (network/).
     void visitInterface(const ListedInterface& interface, const PortWalk& walk,
                         std::map<std::string, std::string> settings, unsigned int& index);
