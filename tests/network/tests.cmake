@@ -11,3 +11,19 @@ corvista_test(network_config SOURCES
   network/team_node_test.cpp
   network/teaming_queries_test.cpp
   LIBRARIES plugin_code test_support)
+
+corvista_test(network_queries SOURCES
+  network/address_queries_test.cpp
+  network/command_lines.cpp
+  network/interface_lists_test.cpp
+  network/kernel_network_test.cpp
+  network/link_queries_test.cpp
+  network/query_parse_test.cpp
+  network/recorded_addresses_test.cpp
+  network/recorded_dhcp_test.cpp
+  network/recorded_ethtool_test.cpp
+  network/recorded_ifconfig_test.cpp
+  network/recorded_members_test.cpp
+  network/recording.cpp
+  network/route_queries_test.cpp
+  LIBRARIES plugin_code test_support)
