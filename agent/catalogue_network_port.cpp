@@ -1,0 +1,62 @@
+// Network ports, LAN endpoints and teams.
+#include "agent/catalogue.h"
+
+namespace cvagent {
+
+namespace {
+
+constexpr Label kLinkStates[] = {{1, "up"}, {12, "down"}, {32, "switched over"}, {33, "switched back"}};
+constexpr Label kPortTypes[] = {
+    {0, "unknown"},       {1, "other"},        {50, "10BaseT"},
+    {51, "10-100BaseT"},  {52, "100BaseT"},    {53, "1000BaseT"},
+    {54, "2500BaseT"},    {55, "10GBaseT"},    {56, "10GBase-CX4"},
+    {100, "100Base-FX"},  {101, "100Base-SX"}, {103, "1000Base-LX"},
+    {104, "1000Base-CX"}, {105, "10GBase-SR"}, {106, "10GBase-SW"},
+    {107, "10GBase-LX4"}, {108, "10GBase-LR"}, {109, "10GBase-LW"},
+    {110, "10GBase-ER"},  {111, "10GBase-EW"}, {16000, "vendor reserved"},
+};
+constexpr Label kWake[] = {{3, "magic packet"}};
+
+constexpr auto port = NodeType::networkPort;
+
+constexpr Property kRows[] = {
+    {port, 0, "PortNames", Kind::texts, Unit::none, {}, "the interface name, as a list of one"},
+    {port,
+     38,
+     "SupportedSpeed",
+     Kind::number,
+     Unit::megabitsPerSecond,
+     {},
+     "speed of the first link mode that the port supports"},
+    {port, 57, "LinkSpeed", Kind::number, Unit::kilobitsPerSecond, {}, "speed of the link; 0 without one"},
+    {port, 67, "AutoNegotiation", Kind::number, Unit::none, {}, "whether speed and duplex are negotiated"},
+    {port, 82, "FullDuplex", Kind::number, Unit::none, {}, "whether the link is full duplex"},
+    {port, 108, "InterfaceName", Kind::text, Unit::none, {}, "the interface name"},
+    {port, 110, "PortConstant110", Kind::enumeration, Unit::none, {}, "always 1"},
+    {port, 111, "PortConstant111", Kind::enumeration, Unit::none, {}, "always 1"},
+    {port, 121, "DisplayName", Kind::text, Unit::none, {}, "the interface name once more"},
+    {port, 123, "LinkState", Kind::number, Unit::none, kLinkStates, "whether the port has a link"},
+    {port, 125, "LinkStates", Kind::numbers, Unit::none, kLinkStates, "the states a port can have"},
+    {port, 182, "WakeOnLanSupported", Kind::numbers, Unit::none, kWake,
+     "ways in which the port can wake the host; none when it cannot"},
+    {port, 183, "WakeOnLanEnabled", Kind::numbers, Unit::none, kWake,
+     "ways in which the port is set up to wake the host"},
+    {port, 185, "PortType", Kind::number, Unit::none, kPortTypes, "kind of the first link mode supported"},
+    {port, 193, "IsTeamMember", Kind::number, Unit::none, {}, "whether the port belongs to a team"},
+    {port, 194, "IsActiveMember", Kind::number, Unit::none, {}, "whether it carries the team's traffic now"},
+    {port, 195, "MemberLinkStatus", Kind::text, Unit::none, {}, "the team's word for the member's link"},
+    {port, 196, "MemberLinkFailures", Kind::number, Unit::none, {}, "how often the member's link has failed"},
+    {port, 199, "TeamName", Kind::text, Unit::none, {}, "the team the port belongs to; empty for none"},
+    {NodeType::lanEndpoint, 108, "InterfaceName", Kind::text, Unit::none, {}, "the interface name"},
+    {NodeType::team, 165, "MemberPorts", Kind::texts, Unit::none, {}, "the ports that form the team"},
+    {NodeType::team, 197, "TeamName", Kind::text, Unit::none, {}, "the team's interface name"},
+    {NodeType::team, 198, "TeamMode", Kind::text, Unit::none, {}, "how the team uses its members"},
+};
+
+}  // namespace
+
+std::span<const Property> networkPortProperties() {
+    return kRows;
+}
+
+}  // namespace cvagent

@@ -1,0 +1,31 @@
+#pragma once
+
+#include <stdexcept>
+#include <string>
+
+namespace cvagent {
+
+/// How the program ends; scripts rely on the numbers.
+enum class ExitStatus {
+    done = 0,
+    failed = 1,    ///< the plug-in or the host failed
+    usage = 2,     ///< the command line makes no sense
+    notFound = 3,  ///< no such node or property
+    refused = 4,   ///< the value is not one the property accepts
+    busy = 5,      ///< another agent holds the data directory
+};
+
+/// Ends the command: the text goes to standard error and says what to do next.
+class Failure : public std::runtime_error {
+public:
+    Failure(ExitStatus status, const std::string& text) : std::runtime_error(text), status_(status) {}
+    ExitStatus status() const { return status_; }
+
+private:
+    ExitStatus status_;
+};
+
+/// A stop signal came while a command that prints one answer was at work.
+struct Interrupted {};
+
+}  // namespace cvagent

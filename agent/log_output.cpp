@@ -1,0 +1,132 @@
+#include "agent/log_output.h"
+
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <mutex>
+#include <optional>
+#include <utility>
+
+#include "agent/failure.h"
+#include "agent/print.h"
+#include "agent/surroundings.h"
+#include "framework/cvlog/logger.h"
+
+namespace cvagent {
+
+namespace {
+
+constexpr std::size_t kMostErrors = 50;  // of one call; a plug-in in trouble can report thousands
+
+/// Log files hold the host's settings: only their owner reads them.
+int openLog(const std::string& file) {
+    const int descriptor = open(file.c_str(), O_WRONLY | O_APPEND | O_CREAT | O_CLOEXEC, 0600);
+    if (descriptor < 0) {
+        throw Failure(ExitStatus::failed, "cannot write to '" + printable(file) +
+                                              "': " + std::strerror(errno) + "; name another file or none");
+    }
+    return descriptor;
+}
+
+}  // namespace
+
+/// Writes lines to a descriptor and keeps the errors.
+class LogOutput::Sink : public CVLog::LogSink {
+public:
+    /// @param file none: standard error when `show`, else nowhere
+    Sink(const std::optional<std::string>& file, bool show, int lowest)
+        : lowest_(lowest), seen_(show && !file) {
+        if (file) {
+            own_ = openLog(*file);
+        }
+        if (file || show) {
+            lines_.emplace(file ? own_ : messageDescriptor());
+        }
+    }
+    Sink(const Sink&) = delete;
+    Sink& operator=(const Sink&) = delete;
+    ~Sink() override {
+        if (own_ >= 0) {
+            close(own_);
+        }
+    }
+
+    void write(const CVLog::LogRecord& record) override {
+        const bool toLines = lines_ && record.level >= lowest_;
+        if (toLines) {
+            lines_->write(record);
+        }
+        if (record.level >= kErrorLevel && !(toLines && seen_)) {
+            keep(record);
+        }
+    }
+
+    std::vector<std::string> takeErrors() {
+        const std::lock_guard lock(guard_);
+        std::vector<std::string> texts;
+        for (const auto& [text, count] : errors_) {
+            texts.push_back(count == 1 ? text : text + " (" + std::to_string(count) + " times)");
+        }
+        if (lost_ > 0) {
+            texts.push_back("and " + std::to_string(lost_) + " more; --log FILE keeps them all");
+        }
+        errors_.clear();
+        lost_ = 0;
+        return texts;
+    }
+
+    int threshold() const { return std::min(lowest_, kErrorLevel); }
+
+private:
+    void keep(const CVLog::LogRecord& record) {
+        const std::string text = record.message + " [" + (record.function ? record.function : "?") + "]";
+        const std::lock_guard lock(guard_);
+        const auto known = std::find_if(errors_.begin(), errors_.end(),
+                                        [&text](const auto& error) { return error.first == text; });
+        if (known != errors_.end()) {
+            ++known->second;
+        } else if (errors_.size() < kMostErrors) {
+            errors_.emplace_back(text, 1);
+        } else {
+            ++lost_;
+        }
+    }
+
+    int lowest_;
+    bool seen_;  ///< what lines_ gets, the user sees
+    int own_ = -1;
+    std::optional<CVLog::DescriptorSink> lines_;
+    std::mutex guard_;
+    std::vector<std::pair<std::string, std::size_t>> errors_;  // text and how often; guarded by guard_
+    std::size_t lost_ = 0;                                     // guarded by guard_
+};
+
+LogOutput::LogOutput(const Options& options, bool live)
+    : log_(std::make_unique<Sink>(options.logFile, live || options.logLevel,
+                                  options.logLevel.value_or(kErrorLevel))) {
+    CVLog::CVLogger::setLog(log_.get(), log_->threshold());
+    if (options.traceFile) {
+        trace_ = std::make_unique<Sink>(options.traceFile, false, 0);
+        CVLog::CVLogger::setTrace(trace_.get(), 0);
+    }
+}
+
+LogOutput::~LogOutput() {
+    CVLog::CVLogger::setLog(nullptr, 0);
+    CVLog::CVLogger::setTrace(nullptr, 0);
+}
+
+std::vector<std::string> LogOutput::takeErrors() {
+    return log_->takeErrors();
+}
+
+void LogOutput::showErrors() {
+    for (const std::string& error : takeErrors()) {
+        complain("the plug-in reports: " + error);
+    }
+}
+
+}  // namespace cvagent

@@ -1,0 +1,35 @@
+#pragma once
+
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "agent/catalogue.h"
+#include "framework/ic/error.h"
+
+namespace cvagent {
+
+/// What reading one property gave.
+struct Reading {
+    unsigned int id = 0;
+    std::optional<Property> row;  ///< none: the catalogue does not know the property
+    IC::PropertyValue value;
+    std::string error;  ///< empty when the read succeeded
+
+    bool failed() const { return !error.empty(); }
+    std::string name() const { return row ? row->name : std::to_string(id); }
+};
+
+/// Reads properties through the plug-in, several at a time: most of a read is waiting for the host's tools.
+/// Never throws for what a read does.
+/// @return one reading an id, in the order of the ids
+std::vector<Reading> readProperties(const IC::MutableNode& node, const std::vector<unsigned int>& ids);
+Reading readProperty(const IC::MutableNode& node, unsigned int id);
+
+/// The stored properties as readings; nothing is asked of the host.
+std::vector<Reading> storedReadings(const IC::MutableNode& node);
+
+/// The text of an error for people; never empty.
+std::string errorText(const IC::Error& error);
+
+}  // namespace cvagent

@@ -1,0 +1,41 @@
+#include "agent/session.h"
+
+#include "agent/failure.h"
+#include "agent/host_tools.h"
+#include "agent/signals.h"
+
+namespace cvagent {
+
+Session::Session(const Options& options, Listener* listener)
+    : file_(options.plugin ? *options.plugin : pluginBesideProgram()), log_(options, listener != nullptr) {
+    hintAtRoot(data_);
+    prepareSurroundings();
+    if (options.hostTools != HostTools::native) {
+        putAdaptersFirst(inspectHostTools(options.hostTools, Look::adapters), data_.path() + "host-tools");
+    }
+    StopSignals::install();
+    try {
+        load(listener);
+    } catch (const Failure&) {
+        log_.showErrors();
+        throw;
+    }
+    log_.showErrors();
+}
+
+Session::~Session() {
+    plugin_.reset();
+    log_.showErrors();
+}
+
+void Session::load(Listener* listener) {
+    plugin_ = std::make_unique<Plugin>(file_, listener);
+}
+
+void Session::goOnUnlessStopped() {
+    if (StopSignals::received() != 0) {
+        throw Interrupted();
+    }
+}
+
+}  // namespace cvagent
