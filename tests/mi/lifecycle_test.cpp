@@ -1,8 +1,6 @@
 // Start and stop of the whole plug-in.
 #include <gmock/gmock.h>
 
-#include <thread>
-
 #include "mi/globals.h"
 #include "mi/my_process.h"
 #include "mi/os_hw_mi.h"
@@ -17,17 +15,6 @@ namespace {
 using IC::MutableNode;
 using IC::Number;
 using IC::OsHwMI;
-
-/// The lines that this thread logged; the monitors speak at the same time.
-std::vector<std::string> ownMessages(const LogCapture& capture) {
-    std::vector<std::string> found;
-    for (const LogLine& line : capture.lines()) {
-        if (line.channel == LogLine::Channel::log && line.thread == std::this_thread::get_id()) {
-            found.push_back(line.message);
-        }
-    }
-    return found;
-}
 
 IC::Error initialize(OsHwMI& mi) {
     return mi.initialize(1, Number(1U), Number(2U));
@@ -239,7 +226,7 @@ HOST_TEST(Lifecycle, LogsARefusedNodeAndGoesOn) {
     IC::myoshwmi.setLoadCallBack(refuse, nullptr, nullptr);
     LogCapture capture;
     IC::myoshwmi.publishNode(new MutableNode(900, 1, {1}, 11, 0));
-    EXPECT_THAT(ownMessages(capture),
+    EXPECT_THAT(capture.ownMessages(),
                 testing::ElementsAre("publishNode: entry", "addNewNode error = the agent is full",
                                      "publishNode: exit"));
     EXPECT_EQ(capture.messages(6000), std::vector<std::string>{"addNewNode error = the agent is full"});
@@ -278,7 +265,7 @@ HOST_TEST(Lifecycle, LogsEveryLineTwiceInTheOrderOfTheSequences) {
             line.source == "OsHwMIInd_ix86" && line.component == "Corvista.IC.MI.OsHwMIInd";
         EXPECT_TRUE(ofMain || ofIndications) << line.source << ' ' << line.component;
     }
-    EXPECT_THAT(ownMessages(capture), testing::ElementsAreArray(kWholeLife));
+    EXPECT_THAT(capture.ownMessages(), testing::ElementsAreArray(kWholeLife));
 }
 
 }  // namespace

@@ -6,6 +6,7 @@
 #include <map>
 #include <memory>
 #include <mutex>
+#include <optional>
 #include <sstream>
 
 using Channel = LogLine::Channel;
@@ -39,6 +40,17 @@ std::string describe(const LogLine& line) {
          << line.level << ' ' << line.component << ' ' << line.source << ':' << line.line << ' '
          << line.function << ": \"" << line.message << '"';
     return text.str();
+}
+
+/// The messages that went to the log, of one level or of all.
+std::vector<std::string> logged(const std::vector<LogLine>& lines, std::optional<int> level = {}) {
+    std::vector<std::string> found;
+    for (const LogLine& line : lines) {
+        if (line.channel == Channel::log && line.level == level.value_or(line.level)) {
+            found.push_back(line.message);
+        }
+    }
+    return found;
 }
 
 }  // namespace
@@ -85,17 +97,25 @@ std::vector<LogLine> LogCapture::lines() const {
 }
 
 std::vector<std::string> LogCapture::messages() const {
-    std::vector<std::string> found;
-    for (const LogLine& line : lines())
-        if (line.channel == Channel::log) found.push_back(line.message);
-    return found;
+    return logged(lines());
 }
 
 std::vector<std::string> LogCapture::messages(int level) const {
-    std::vector<std::string> found;
-    for (const LogLine& line : lines())
-        if (line.channel == Channel::log && line.level == level) found.push_back(line.message);
-    return found;
+    return logged(lines(), level);
+}
+
+std::vector<LogLine> LogCapture::ownLines() const {
+    std::vector<LogLine> own = lines();
+    std::erase_if(own, [](const LogLine& line) { return line.thread != std::this_thread::get_id(); });
+    return own;
+}
+
+std::vector<std::string> LogCapture::ownMessages() const {
+    return logged(ownLines());
+}
+
+std::vector<std::string> LogCapture::ownMessages(int level) const {
+    return logged(ownLines(), level);
 }
 
 void LogCapture::clear() {

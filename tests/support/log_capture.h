@@ -39,6 +39,10 @@ public:
     std::vector<LogLine> lines() const;         ///< log and trace
     std::vector<std::string> messages() const;  ///< of the log
     std::vector<std::string> messages(int level) const;
+    /// The same of what the calling thread logged, whatever the monitors say meanwhile.
+    std::vector<LogLine> ownLines() const;
+    std::vector<std::string> ownMessages() const;
+    std::vector<std::string> ownMessages(int level) const;
     void clear();
 
     /// Holds when in every thread each line went to the log and right after it, unchanged, to the trace.

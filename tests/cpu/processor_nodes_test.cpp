@@ -1,0 +1,171 @@
+#include <gmock/gmock.h>
+
+#include "mi/globals.h"
+#include "mi/os_hw_mi.h"
+#include "tests/support/fake_host.h"
+#include "tests/support/log_capture.h"
+#include "tests/support/no_descriptors.h"
+
+namespace {
+
+using IC::Number;
+using IC::PropertyValue;
+using testing::ElementsAre;
+
+/// One processor's part of /proc/cpuinfo.
+std::string processor(unsigned int number, const std::string& speed) {
+    return "processor\t: " + std::to_string(number) +
+           "\nvendor_id\t: GenuineIntel\nmodel name\t: Intel(R) Xeon(R) CPU           E5410  @ 2.33GHz\n"
+           "cpu MHz\t\t: " +
+           speed + "\ncache size\t: 6144 KB\n\n";
+}
+
+/// The plug-in with its static tree, on a host without anything.
+class Started {
+public:
+    Started() {
+        mi_.initialize(1, Number(1U), Number(2U));
+        for (const auto& node : mi_.holdAll()) {
+            planar_ = node->nodeType() == 41 ? node->getNodeId() : planar_;
+            lastId_ = node->getNodeId();
+        }
+    }
+    Started(const Started&) = delete;
+    Started& operator=(const Started&) = delete;
+    ~Started() { mi_.unload(); }
+
+    std::vector<std::shared_ptr<IC::MutableNode>> processors() const {
+        std::vector<std::shared_ptr<IC::MutableNode>> found;
+        for (const auto& node : mi_.holdAll()) {
+            if (node->nodeType() == 4) {
+                found.push_back(node);
+            }
+        }
+        return found;
+    }
+    std::vector<std::string> speeds() const {
+        std::vector<std::string> found;
+        for (const auto& node : processors()) {
+            PropertyValue speed("none", false);
+            node->getProperty(80, speed);
+            found.push_back(static_cast<std::string>(speed));
+        }
+        return found;
+    }
+    IC::OsHwMI& mi() { return mi_; }
+    unsigned int planar() const { return planar_; }
+    unsigned int lastId() const { return lastId_; }
+
+private:
+    IC::OsHwMI& mi_ = IC::myoshwmi;
+    unsigned int planar_ = 0;
+    unsigned int lastId_ = 0;
+};
+
+HOST_TEST(Processors, AreOneNodeEachUnderThePlanar) {
+    host.file("/proc/cpuinfo", processor(0, "2394.230") + processor(1, "2394.230") +
+                                   processor(2, "1000.999") + processor(3, "800"));
+    Started plugin;
+    EXPECT_TRUE(plugin.processors().empty()) << "start-up does not build them";
+    plugin.mi().createCpuNodes();
+    const auto nodes = plugin.processors();
+    ASSERT_EQ(nodes.size(), 4U);
+    for (unsigned int i = 0; i < 4; ++i) {
+        EXPECT_EQ(nodes[i]->getIndex(), i + 1);
+        EXPECT_EQ(nodes[i]->getNodeId(), plugin.lastId() + 1 + i);
+        EXPECT_EQ(nodes[i]->getLinkedId(), plugin.planar());
+        EXPECT_EQ(nodes[i]->getDescription(), "Processor");
+        EXPECT_EQ(nodes[i]->getMIIds(), std::vector<unsigned int>{1});
+    }
+    EXPECT_THAT(plugin.speeds(), ElementsAre("2394", "2394", "1000", "800"));
+    PropertyValue speed;
+    EXPECT_EQ(nodes[0]->getProperty(80, speed).getStatus(), 0);
+    EXPECT_EQ(speed, PropertyValue(Number(2394U), true));
+}
+
+HOST_TEST(Processors, GoWithoutSpeedWhenTheKernelTellsNone) {
+    host.file("/proc/cpuinfo", "processor\t: 0\nprocessor\t: 1\ncpu MHz\t\t: 1200.000\n");
+    Started plugin;
+    plugin.mi().createCpuNodes();
+    ASSERT_EQ(plugin.processors().size(), 2U);
+    EXPECT_THAT(plugin.speeds(), ElementsAre("1200", "none")) << "the first speed is the first processor's";
+    EXPECT_EQ(plugin.processors()[1]->getDescription(), "");
+}
+
+HOST_TEST(Processors, StopAtTheEndOfTheMapWhenThereAreMoreSpeeds) {
+    host.file("/proc/cpuinfo", processor(0, "1000.0") + "cpu MHz\t\t: 3000.000\n");
+    Started plugin;
+    plugin.mi().createCpuNodes();
+    EXPECT_THAT(plugin.speeds(), ElementsAre("1000"));
+}
+
+HOST_TEST(Processors, AreNoneWithoutCpuinfo) {
+    Started plugin;
+    LogCapture capture;
+    plugin.mi().createCpuNodes();
+    EXPECT_TRUE(plugin.processors().empty());
+    EXPECT_TRUE(capture.ownMessages(6000).empty());
+}
+
+HOST_TEST(Processors, SkipALineWithoutColon) {
+    host.file("/proc/cpuinfo", "processor 0\n" + processor(1, "1000.0"));
+    Started plugin;
+    LogCapture capture;
+    plugin.mi().createCpuNodes();
+    EXPECT_EQ(plugin.processors().size(), 1U);
+    EXPECT_THAT(capture.ownMessages(6000), ElementsAre("Invalid format: buffer = processor 0\n"));
+}
+
+HOST_TEST(Processors, ReadLinesOf127Characters) {
+    host.file("/proc/cpuinfo", "processor\t: " + std::string(150, 'x') + "\n");
+    Started plugin;
+    LogCapture capture;
+    plugin.mi().createCpuNodes();
+    EXPECT_EQ(plugin.processors().size(), 1U);
+    EXPECT_THAT(capture.ownMessages(6000),
+                ElementsAre("Invalid format: buffer = " + std::string(150 - (127 - 12), 'x') + "\n"));
+}
+
+HOST_TEST(Processors, BuiltAgainStartFromOne) {
+    host.file("/proc/cpuinfo", processor(0, "1000.0"));
+    Started plugin;
+    plugin.mi().createCpuNodes();
+    plugin.mi().createCpuNodes();
+    ASSERT_EQ(plugin.processors().size(), 2U);
+    EXPECT_EQ(plugin.processors()[1]->getIndex(), 1U);
+    EXPECT_THAT(plugin.speeds(), ElementsAre("1000", "1000"));
+}
+
+HOST_TEST(Processors, AreNoneWhenTheShellCannotBeStarted) {
+    host.file("/proc/cpuinfo", processor(0, "1000.0"));
+    Started plugin;
+    LogCapture capture;
+    {
+        const NoDescriptors none;
+        plugin.mi().createCpuNodes();
+    }
+    EXPECT_TRUE(plugin.processors().empty());
+    EXPECT_THAT(capture.ownMessages(6000), ElementsAre("createCpuNodeAndMap(): cmd_cpu error"));
+}
+
+HOST_TEST(Processors, AreLeftAloneOutsideStartAndStop) {
+    host.file("/proc/cpuinfo", processor(0, "1000.0"));
+    IC::myoshwmi.createCpuNodes();
+    EXPECT_TRUE(IC::myoshwmi.holdAll().empty());
+}
+
+HOST_TEST(Processors, SpeakWithTheirOwnSourceAndComponent) {
+    host.file("/proc/cpuinfo", processor(0, "1000.0"));
+    Started plugin;
+    LogCapture capture;
+    plugin.mi().createCpuNodes();
+    EXPECT_THAT(capture.ownMessages(3000), ElementsAre("createCpuNodes: entry", "createCpuNodeAndMap: entry",
+                                                       "createCpuNodeAndMap: exit", "createCpuNodes: exit"));
+    EXPECT_TRUE(capture.everyLineTwice());
+    for (const LogLine& line : capture.ownLines()) {
+        EXPECT_EQ(line.source, "OsHwMICpu_ix86");
+        EXPECT_EQ(line.component, "Corvista.IC.MI.OsHwMICpu");
+    }
+}
+
+}  // namespace

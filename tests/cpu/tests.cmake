@@ -1,0 +1,3 @@
+corvista_test(cpu SOURCES
+  cpu/processor_nodes_test.cpp
+  LIBRARIES plugin_code test_support)
