@@ -1,0 +1,376 @@
+#include "framework/qx/thread.h"
+
+#include <gtest/gtest.h>
+#include <sys/resource.h>
+#include <unistd.h>
+
+#include <array>
+#include <atomic>
+#include <chrono>
+#include <csignal>
+#include <cstdio>
+#include <fstream>
+#include <functional>
+#include <thread>
+
+#include "framework/cvlog/logger.h"
+#include "framework/qx/event.h"
+
+namespace {
+
+using namespace std::chrono_literals;
+using Clock = std::chrono::steady_clock;
+
+constexpr unsigned int kLong = 600'000;  // milliseconds; a test that sleeps them out has failed
+
+class Worker : public QX::Thread {
+public:
+    explicit Worker(std::function<void*(void*)> work) : work_(std::move(work)) {}
+    explicit Worker(const std::function<void()>& work)
+        : work_([work](void* /*argument*/) -> void* {
+              work();
+              return nullptr;
+          }) {}
+    ~Worker() override { join(); }
+    void* run(void* argument) override { return work_(argument); }
+
+private:
+    std::function<void*(void*)> work_;
+};
+
+/// Waits for a condition that must come true soon.
+bool soon(const std::function<bool()>& holds) {
+    for (const auto end = Clock::now() + 20s; Clock::now() < end; std::this_thread::sleep_for(2ms)) {
+        if (holds()) {
+            return true;
+        }
+    }
+    return false;
+}
+
+/// Whether a process runs: one that only waits to be collected does not.
+bool isRunning(pid_t process) {
+    std::ifstream in("/proc/" + std::to_string(process) + "/stat");
+    std::string line;
+    std::getline(in, line);
+    const auto name = line.rfind(')');
+    return name != std::string::npos && line.at(name + 2) != 'Z' && line.at(name + 2) != 'X';
+}
+
+/// Runs a command, reads it to its end and keeps the lines where the test can see them.
+class Reader {
+public:
+    void read(const char* command) {
+        FILE* const pipe = popen(command, "r");
+        ASSERT_NE(pipe, nullptr);
+        std::array<char, 512> line{};
+        while (fgets(line.data(), line.size(), pipe) != nullptr) {
+            lines_[count_] = std::stoi(line.data());
+            ++count_;
+        }
+        pclose(pipe);
+    }
+    int count() const { return count_; }
+    int line(int index) const { return lines_.at(static_cast<std::size_t>(index)); }
+
+private:
+    std::array<std::atomic<int>, 16> lines_{};
+    std::atomic<int> count_ = 0;
+};
+
+TEST(Thread, RunsWithItsArgument) {
+    int value = 0;
+    Worker worker([](void* argument) -> void* {
+        *static_cast<int*>(argument) = 42;
+        return nullptr;
+    });
+    EXPECT_TRUE(worker.start(&value));
+    worker.join();
+    EXPECT_EQ(value, 42);
+}
+
+TEST(Thread, TheBaseRunsNothing) {
+    QX::Thread thread;
+    thread.stop();
+    EXPECT_TRUE(thread.start(nullptr));
+    thread.join();
+}
+
+TEST(Thread, ThatNeverRanCanBeJoinedAndAborted) {
+    QX::Thread thread;
+    thread.join();
+    thread.abort();
+    thread.join();
+}
+
+TEST(Thread, StartsAgainOnceItHasEnded) {
+    std::atomic<int> runs = 0;
+    Worker worker([&] {
+        ++runs;
+        QX::Thread::sleep(kLong);
+    });
+    EXPECT_TRUE(worker.start(nullptr));
+    EXPECT_FALSE(worker.start(nullptr));
+    worker.join();
+    EXPECT_TRUE(worker.start(nullptr));
+    worker.abort();
+    worker.join();
+    worker.join();
+    EXPECT_EQ(runs, 2);
+}
+
+TEST(Thread, ANewRunSleepsAgain) {
+    std::atomic<bool> slept = false;
+    Worker worker([&] {
+        const auto start = Clock::now();
+        QX::Thread::sleep(50);
+        slept = Clock::now() - start >= 49ms;
+    });
+    worker.start(nullptr);
+    worker.abort();
+    worker.join();
+    slept = false;
+    worker.start(nullptr);
+    EXPECT_TRUE(soon([&] { return slept.load(); }));
+    worker.join();
+}
+
+TEST(Thread, StartsAgainWithoutAJoin) {
+    std::atomic<int> runs = 0;
+    Worker worker([&] { ++runs; });
+    worker.start(nullptr);
+    EXPECT_TRUE(soon([&] { return worker.start(nullptr); }));
+    worker.join();
+    EXPECT_EQ(runs, 2);
+}
+
+TEST(Thread, CanBeJoinedByManyAtOnce) {
+    std::atomic<bool> finished = false;
+    Worker worker([&] {
+        std::this_thread::sleep_for(30ms);
+        finished = true;
+    });
+    worker.start(nullptr);
+    std::vector<std::thread> joiners;
+    for (int count = 0; count < 4; ++count) {
+        joiners.emplace_back([&] {
+            worker.join();
+            EXPECT_TRUE(finished);
+        });
+    }
+    for (std::thread& joiner : joiners) {
+        joiner.join();
+    }
+}
+
+TEST(Thread, DestroyedWhileItRunsIsJoined) {
+    std::atomic<bool> finished = false;
+    {
+        Worker worker([&] {
+            QX::Thread::sleep(kLong);
+            finished = true;
+        });
+        worker.start(nullptr);
+    }
+    EXPECT_TRUE(finished);
+}
+
+TEST(Thread, MayDestroyItselfAtItsEnd) {
+    class OwnEnd : public QX::Thread {
+    public:
+        explicit OwnEnd(std::atomic<bool>& gone) : gone_(gone) {}
+        ~OwnEnd() override { gone_ = true; }
+        void* run(void* /*argument*/) override {
+            join();
+            delete this;
+            return nullptr;
+        }
+
+    private:
+        std::atomic<bool>& gone_;
+    };
+    std::atomic<bool> gone = false;
+    auto* const thread = new OwnEnd(gone);
+    EXPECT_TRUE(thread->start(nullptr));
+    EXPECT_TRUE(soon([&] { return gone.load(); }));
+}
+
+TEST(Thread, AnExceptionEndsItAndIsLogged) {
+    class Sink : public CVLog::LogSink {
+    public:
+        void write(const CVLog::LogRecord& record) override {
+            level = record.level;
+            message = record.message;
+        }
+        int level = 0;
+        std::string message;
+    } sink;
+    CVLog::CVLogger::setLog(&sink, 0);
+    Worker worker([] { throw std::runtime_error("disk on fire"); });
+    worker.start(nullptr);
+    worker.join();
+    CVLog::CVLogger::setLog(nullptr, 0);
+    EXPECT_EQ(sink.level, 6000);
+    EXPECT_EQ(sink.message, "thread ended by an exception: disk on fire");
+}
+
+TEST(Thread, StartTellsWhenTheSystemGivesNone) {
+    // In a process of its own that may not have another thread. Root is not bound by the limit, so it steps
+    // down.
+    const auto startWithoutRoom = [] {
+        const rlimit none{1, 1};
+        if (setrlimit(RLIMIT_NPROC, &none) != 0 || (getuid() == 0 && setresuid(54321, 54321, 54321) != 0)) {
+            _exit(2);
+        }
+        QX::Thread thread;
+        const bool started = thread.start(nullptr);
+        thread.join();
+        _exit(started ? 1 : 0);
+    };
+    EXPECT_EXIT(startWithoutRoom(), testing::ExitedWithCode(0), "");
+}
+
+TEST(ThreadSleep, BlocksForMilliseconds) {
+    const auto start = Clock::now();
+    QX::Thread::sleep(30);
+    EXPECT_GE(Clock::now() - start, 29ms);
+    EXPECT_LT(Clock::now() - start, 10s);
+}
+
+TEST(ThreadSleep, FollowsTheClockSpeed) {
+    QX::setClockSpeed(1000);
+    const auto start = Clock::now();
+    QX::Thread::sleep(kLong / 20);
+    EXPECT_LT(Clock::now() - start, 10s);
+    QX::setClockSpeed(0);  // no speed at all means real time
+    QX::Thread::sleep(1);
+    QX::setClockSpeed(1);
+}
+
+TEST(ThreadSleep, EndsWhenTheThreadIsJoined) {
+    std::atomic<int> sleeps = 0;
+    Worker worker([&] {
+        for (; sleeps < 12; ++sleeps) {
+            QX::Thread::sleep(kLong);
+        }
+    });
+    worker.start(nullptr);
+    std::this_thread::sleep_for(20ms);
+    EXPECT_EQ(sleeps, 0);
+    worker.join();
+    EXPECT_EQ(sleeps, 12);
+}
+
+TEST(ThreadSleep, EndsWhenTheThreadIsAborted) {
+    std::atomic<bool> finished = false;
+    Worker worker([&] {
+        QX::Thread::sleep(kLong);
+        finished = true;
+    });
+    worker.start(nullptr);
+    std::this_thread::sleep_for(20ms);
+    worker.abort();
+    EXPECT_TRUE(soon([&] { return finished.load(); }));
+}
+
+TEST(ThreadSleep, OfOthersGoesOn) {
+    Worker other([] { QX::Thread::sleep(kLong); });
+    other.start(nullptr);
+    other.abort();
+    other.join();
+    const auto start = Clock::now();
+    QX::Thread::sleep(30);
+    EXPECT_GE(Clock::now() - start, 29ms);
+}
+
+TEST(ThreadAbort, EndsAWaitForAnEvent) {
+    QX::Event event(true);
+    std::atomic<int> answer = -1;
+    Worker worker([&] { answer = event.wait(kLong) ? 1 : 0; });
+    worker.start(nullptr);
+    std::this_thread::sleep_for(20ms);
+    worker.abort();
+    worker.join();
+    EXPECT_EQ(answer, 0);
+    event.signal();
+    EXPECT_TRUE(event.wait(0));  // others wait as ever
+}
+
+TEST(ThreadAbort, RacesWithTheStartOfAWait) {
+    for (int round = 0; round < 300; ++round) {
+        QX::Event event(true);
+        Worker worker([&] {
+            event.wait(kLong);
+            QX::Thread::sleep(kLong);
+        });
+        worker.start(nullptr);
+        worker.abort();
+        worker.join();
+    }
+}
+
+TEST(ThreadAbort, KillsACommandAndEverythingItStarted) {
+    // Every stage tells its process and holds the pipe open: the shell, a child of it, one of a subshell, one
+    // behind a pipe.
+    constexpr const char* kCommand =
+        "echo $$; sleep 1000 & echo $!; (sleep 1000 & echo $!; wait) & echo $!; "
+        "sh -c 'echo $$; sleep 1000' | cat; wait";
+    Reader reader;
+    Worker worker([&] { reader.read(kCommand); });
+    worker.start(nullptr);
+    ASSERT_TRUE(soon([&] { return reader.count() == 5; }));
+    worker.abort();
+    worker.join();
+    for (int index = 0; index < 5; ++index) {
+        EXPECT_TRUE(soon([&] { return !isRunning(reader.line(index)); })) << index;
+    }
+}
+
+TEST(ThreadAbort, EndsCommandsThatAreStartedAfterIt) {
+    Reader reader;
+    std::atomic<bool> aborted = false;
+    std::atomic<int> commands = 0;
+    Worker worker([&] {
+        while (!aborted) {
+            std::this_thread::yield();
+        }
+        for (; commands < 3; ++commands) {
+            reader.read("sleep 1000");
+        }
+    });
+    worker.start(nullptr);
+    worker.abort();
+    aborted = true;
+    worker.join();
+    EXPECT_EQ(commands, 3);
+}
+
+TEST(ThreadAbort, DuringAJoinStillKills) {
+    Reader reader;
+    Worker worker([&] { reader.read("echo $$; exec sleep 1000"); });
+    worker.start(nullptr);
+    std::thread joiner([&] { worker.join(); });
+    ASSERT_TRUE(soon([&] { return reader.count() == 1; }));
+    worker.abort();
+    joiner.join();
+    EXPECT_FALSE(isRunning(reader.line(0)));
+}
+
+TEST(ThreadAbort, LeavesTheCommandsOfOtherThreadsAlone) {
+    Reader mine;
+    Reader others;
+    Worker victim([&] { mine.read("echo $$; exec sleep 1000"); });
+    Worker bystander([&] { others.read("echo $$; exec sleep 1000"); });
+    victim.start(nullptr);
+    bystander.start(nullptr);
+    ASSERT_TRUE(soon([&] { return mine.count() == 1 && others.count() == 1; }));
+    victim.abort();
+    victim.join();
+    EXPECT_FALSE(isRunning(mine.line(0)));
+    EXPECT_TRUE(isRunning(others.line(0)));
+    bystander.abort();
+    bystander.join();
+    EXPECT_FALSE(isRunning(others.line(0)));
+}
+
+}  // namespace
