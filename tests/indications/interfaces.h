@@ -1,0 +1,42 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "framework/ic/mutable_node.h"
+#include "mi/globals.h"
+#include "tests/support/plugin_access.h"
+
+/// An interface's node whose state a test sets.
+class InterfaceNode : public IC::MutableNode {
+public:
+    InterfaceNode(unsigned int id, const std::string& name, unsigned int state)
+        : MutableNode(id, 1, {1}, 12, 0) {
+        setPath("/ports/" + name);
+        MutableNode::setProperty(108, {name, true});
+        is(state);
+    }
+    void is(unsigned int state) { MutableNode::setProperty(123, {IC::Number(state), true}); }
+};
+
+/// The plug-in object with interfaces of the test's own and no monitor.
+class Interfaces {
+public:
+    Interfaces() { IC::OsHwMITestAccess::makeInventory(mi_); }
+    Interfaces(const Interfaces&) = delete;
+    Interfaces& operator=(const Interfaces&) = delete;
+    ~Interfaces() { mi_.unload(); }
+
+    InterfaceNode& add(const std::string& name, unsigned int state) {
+        auto* node = new InterfaceNode(++lastId_, name, state);
+        IC::OsHwMITestAccess::addInterface(mi_, name, node);
+        return *node;
+    }
+    IC::OsHwMI& mi() { return mi_; }
+    std::map<std::string, unsigned int>& current() { return IC::OsHwMITestAccess::current(mi_); }
+    std::map<std::string, unsigned int>& previous() { return IC::OsHwMITestAccess::previous(mi_); }
+
+private:
+    IC::OsHwMI& mi_ = IC::myoshwmi;
+    unsigned int lastId_ = 100;
+};

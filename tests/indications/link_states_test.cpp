@@ -1,0 +1,154 @@
+#include <gmock/gmock.h>
+
+#include "indications/globals.h"
+#include "tests/indications/interfaces.h"
+#include "tests/support/fake_host.h"
+#include "tests/support/log_capture.h"
+#include "tests/support/no_descriptors.h"
+
+namespace {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+using testing::Pair;
+
+const std::string kBond =
+    "Ethernet Channel Bonding Driver: v3.0.3 (March 23, 2006)\n\nBonding Mode: fault-tolerance "
+    "(active-backup)\n"
+    "Primary Slave: None\nCurrently Active Slave: eth0\nMII Status: up\n\n"
+    "Slave Interface: eth0\nMII Status: up\nLink Failure Count: 0\nPermanent HW addr: 00:0c:29:00:00:01\n\n"
+    "Slave Interface: eth1\nMII Status: up\nLink Failure Count: 0\nPermanent HW addr: 00:0c:29:00:00:02\n";
+
+/// A bond of eth0 and eth1 whose states of the last pass are as given.
+class Bond {
+public:
+    Bond(FakeHost& host, std::map<std::string, unsigned int> previous)
+        : eth0(interfaces.add("eth0", 1)), eth1(interfaces.add("eth1", 1)), bond(interfaces.add("bond0", 1)) {
+        host.file("/proc/net/bonding/bond0", kBond);
+        interfaces.previous() = std::move(previous);
+    }
+    unsigned int state() {
+        interfaces.mi().createCurNetNodeMap();
+        return interfaces.current().at("bond0");
+    }
+
+    Interfaces interfaces;
+    InterfaceNode& eth0;
+    InterfaceNode& eth1;
+    InterfaceNode& bond;
+};
+
+HOST_TEST(LinkStates, AreReadFromTheNodesInTheOrderOfTheirNames) {
+    Interfaces interfaces;
+    interfaces.add("eth1", 12);
+    interfaces.add("eth0", 1);
+    interfaces.current()["gone"] = 1;
+    LogCapture capture;
+    interfaces.mi().createCurNetNodeMap();
+    EXPECT_THAT(interfaces.current(), ElementsAre(Pair("eth0", 1), Pair("eth1", 12)));
+    EXPECT_THAT(capture.ownMessages(),
+                ElementsAre("OsHwMI::createCurNetNodeMap(): entry", "returning from createCurNetNodeMap"));
+    EXPECT_THAT(host.calls(), IsEmpty());
+}
+
+HOST_TEST(LinkStates, PassOverANodeThatCannotBeRead) {
+    Interfaces interfaces;
+    interfaces.add("eth0", 1);
+    auto* nameless = new IC::MutableNode(200, 1, {1}, 12, 1);
+    IC::OsHwMITestAccess::addInterface(interfaces.mi(), "eth1", nameless);
+    auto* stateless = new IC::MutableNode(201, 1, {1}, 12, 2);
+    stateless->setProperty(108, {"eth2", true});
+    IC::OsHwMITestAccess::addInterface(interfaces.mi(), "eth2", stateless);
+    auto& odd = interfaces.add("eth3", 1);
+    odd.setProperty(123, {"not a number", true});
+    interfaces.mi().createCurNetNodeMap();
+    EXPECT_THAT(interfaces.current(), ElementsAre(Pair("eth0", 1)));
+}
+
+HOST_TEST(LinkStates, OfABondAreItsOwnWhileNoMemberChanges) {
+    Bond bond(host, {{"eth0", 1}, {"eth1", 1}, {"bond0", 1}});
+    bond.bond.is(12);
+    EXPECT_EQ(bond.state(), 12U);
+}
+
+HOST_TEST(LinkStates, OfABondAreSwitchedOverWhenAMemberGoesDown) {
+    Bond bond(host, {{"eth0", 1}, {"eth1", 1}, {"bond0", 1}});
+    bond.eth0.is(12);
+    EXPECT_EQ(bond.state(), 32U);
+}
+
+HOST_TEST(LinkStates, OfABondAreSwitchedBackWhenAMemberComesBack) {
+    Bond bond(host, {{"eth0", 12}, {"eth1", 1}, {"bond0", 1}});
+    EXPECT_EQ(bond.state(), 33U);
+}
+
+HOST_TEST(LinkStates, OfABondAreDecidedByItsFirstChangedMember) {
+    Bond bond(host, {{"eth0", 12}, {"eth1", 1}, {"bond0", 1}});
+    bond.eth1.is(12);
+    EXPECT_EQ(bond.state(), 33U) << "eth0 came back and stands before eth1, which went down";
+}
+
+HOST_TEST(LinkStates, OfABondCompareMembersWithTheLastPassAlone) {
+    Bond bond(host, {{"bond0", 1}});
+    bond.interfaces.current() = {{"eth0", 1}, {"eth1", 1}};
+    bond.eth0.is(12);
+    EXPECT_EQ(bond.state(), 1U) << "eth0 was not in the last pass; that this pass has seen it does not count";
+}
+
+HOST_TEST(LinkStates, OfABondPassOverMembersWithoutANode) {
+    Bond bond(host, {{"eth0", 1}, {"eth1", 1}, {"eth9", 1}, {"bond0", 1}});
+    host.file("/proc/net/bonding/bond0", "Slave Interface: eth9\nSlave Interface: eth1\n");
+    bond.eth1.is(12);
+    EXPECT_EQ(bond.state(), 32U);
+}
+
+HOST_TEST(LinkStates, OfABondPassOverAMemberThatIsCalledOtherwiseOrCannotBeRead) {
+    Bond bond(host, {{"eth0", 1}, {"eth1", 1}, {"bond0", 1}});
+    bond.eth0.is(12);
+    bond.eth0.setProperty(108, {"renamed", true});
+    bond.eth1.setProperty(123, {"?", true});
+    EXPECT_EQ(bond.state(), 1U);
+}
+
+HOST_TEST(LinkStates, OfABondIgnoreCodesThatAreNeitherUpNorDown) {
+    Bond bond(host, {{"eth0", 32}, {"eth1", 1}, {"bond0", 32}});
+    bond.eth1.is(33);
+    EXPECT_EQ(bond.state(), 1U);
+}
+
+HOST_TEST(LinkStates, GatherTheMembersOfAllBonds) {
+    Bond bond(host, {});
+    host.file("/proc/net/bonding/bond1", "Slave Interface: eth7\nSlave Interface:   eth8\n");
+    bond.interfaces.add("bond1", 1);
+    LogCapture capture;
+    bond.interfaces.mi().createCurNetNodeMap();
+    EXPECT_THAT(IC::OSHWMI_IND::slaves, ElementsAre("eth0", "eth1", "eth7", "eth8"));
+    EXPECT_THAT(capture.ownMessages(),
+                testing::IsSupersetOf({"Calling bondedNetNodeStatus() for bonded interface: bond0",
+                                       "OsHwMI::bondedNetNodeStatus - slaveInterface is: eth0",
+                                       "OsHwMI::bondedNetNodeStatus - slaveInterface is: eth8",
+                                       "Returning from bondedNetNodeStatus(). Status: 34"}));
+    EXPECT_TRUE(capture.everyLineTwice());
+    EXPECT_EQ(capture.ownLines().front().source, "OsHwMIInd_ix86");
+    EXPECT_EQ(capture.ownLines().front().component, "Corvista.IC.MI.OsHwMIInd");
+}
+
+HOST_TEST(LinkStates, GiveNoVerdictWhenTheMembersCannotBeAsked) {
+    Bond bond(host, {{"eth0", 1}, {"bond0", 1}});
+    bond.eth0.is(12);
+    LogCapture capture;
+    const NoDescriptors none;
+    EXPECT_EQ(bond.interfaces.mi().bondedNetNodeStatus("bond0"), 34U);
+    EXPECT_THAT(capture.ownMessages(6000),
+                ElementsAre("OsHwMI::bondedNetNodeStatus - grepping slave device error"));
+}
+
+HOST_TEST(LinkStates, OfABondWithoutAStatusFileAreItsOwn) {
+    Interfaces interfaces;
+    interfaces.add("bond0", 12);
+    interfaces.mi().createCurNetNodeMap();
+    EXPECT_THAT(interfaces.current(), ElementsAre(Pair("bond0", 12)));
+    EXPECT_THAT(IC::OSHWMI_IND::slaves, IsEmpty());
+}
+
+}  // namespace

@@ -1,0 +1,170 @@
+#include "indications/network_monitor.h"
+
+#include <gmock/gmock.h>
+
+#include <atomic>
+#include <chrono>
+#include <mutex>
+#include <thread>
+
+#include "tests/indications/interfaces.h"
+#include "tests/support/fake_host.h"
+#include "tests/support/log_capture.h"
+#include "tests/support/no_threads.h"
+
+namespace {
+
+using namespace std::chrono_literals;
+using testing::Contains;
+using testing::ElementsAre;
+
+constexpr char kFile[] = "/opt/vantrel/corvista/data/oshwminetind.dat";
+
+/// Waits until something holds; false when it does not within ten seconds.
+template <class Condition>
+bool eventually(Condition holds) {
+    for (int i = 0; i < 1000; ++i) {
+        if (holds()) {
+            return true;
+        }
+        std::this_thread::sleep_for(10ms);
+    }
+    return false;
+}
+
+struct Heard {
+    std::mutex guard;
+    std::vector<std::string> messages;
+
+    static IC::Error hear(const std::vector<IC::Alert>& alerts, const void* context) {
+        auto* heard = const_cast<Heard*>(static_cast<const Heard*>(context));
+        const std::lock_guard lock(heard->guard);
+        heard->messages.push_back(alerts.at(0).message());
+        return {};
+    }
+    std::vector<std::string> now() {
+        const std::lock_guard lock(guard);
+        return messages;
+    }
+};
+
+HOST_TEST(NetworkMonitor, RaisesEachChangeOnceAndKeepsTheStateAcrossARestart) {
+    host.directory("/opt/vantrel/corvista/data");
+    QX::setClockSpeed(1000);  // 30 seconds pass in 30 ms
+    Interfaces interfaces;
+    auto& eth0 = interfaces.add("eth0", 1);
+    Heard heard;
+    interfaces.mi().registerForAlerts(Heard::hear, &heard);
+    interfaces.mi().enableIndications();
+    ASSERT_TRUE(eventually([&] { return host.read(kFile) == "eth0=1\n"; }));
+    eth0.is(12);
+    ASSERT_TRUE(eventually([&] { return !heard.now().empty(); }));
+    std::this_thread::sleep_for(200ms);  // several passes
+    EXPECT_THAT(heard.now(), ElementsAre("NIC is Offline "));
+    interfaces.mi().disableIndications();
+    EXPECT_EQ(host.read(kFile), "eth0=12\n");
+    eth0.is(1);
+    interfaces.mi().enableIndications();
+    ASSERT_TRUE(eventually([&] { return heard.now().size() == 2; }));
+    std::this_thread::sleep_for(200ms);
+    EXPECT_THAT(heard.now(), ElementsAre("NIC is Offline ", "NIC is Online "));
+    interfaces.mi().disableIndications();
+}
+
+HOST_TEST(NetworkMonitor, StopsAtOnceInTheMiddleOfItsWait) {
+    Interfaces interfaces;
+    LogCapture capture;
+    interfaces.mi().enableIndications();
+    ASSERT_TRUE(eventually([&] { return !capture.messages(6000).empty(); })) << "the first pass is over";
+    const auto start = std::chrono::steady_clock::now();
+    interfaces.mi().disableIndications();
+    EXPECT_LT(std::chrono::steady_clock::now() - start, 1s);
+    EXPECT_THAT(
+        capture.ownMessages(),
+        ElementsAre("enableIndications: entry", "Creating NetworkMonitor thread.",
+                    "NetworkMonitor::NetworkMonitor: entry", "NetworkMonitor::NetworkMonitor: exit",
+                    "NetworkMonitor thread created.", "enableIndications: exit", "disableIndications: entry",
+                    "eventThreadNetIndications: Stopping thread...", "NetworkMonitor::stop: entry",
+                    "NetworkMonitor::stop: exit", "eventThreadNetIndicationsThread terminated.",
+                    "NetworkMonitor::~NetworkMonitor: entry", "NetworkMonitor::~NetworkMonitor: exit",
+                    "disableIndications: exit"));
+    EXPECT_THAT(capture.messages(), Contains("NetworkMonitor: run entry"));
+    EXPECT_THAT(capture.messages(), Contains("NetworkMonitor: run exit"));
+}
+
+HOST_TEST(NetworkMonitor, IsAbortedInTheMiddleOfACommandAndReportsNothingOfThatPass) {
+    host.file(kFile, "bond0=1\n");
+    host.file("/proc/net/bonding/bond0", "Slave Interface: eth0\n");
+    host.tool("grep %any", ToolAnswer{"", 0, "", 20000});  // a tool that hangs
+    Interfaces interfaces;
+    interfaces.add("bond0", 12);
+    Heard heard;
+    interfaces.mi().registerForAlerts(Heard::hear, &heard);
+    LogCapture capture;
+    interfaces.mi().enableIndications();
+    ASSERT_TRUE(eventually([&] { return !host.callsOf("grep").empty(); }));
+    const auto start = std::chrono::steady_clock::now();
+    interfaces.mi().disableIndications();
+    EXPECT_LT(std::chrono::steady_clock::now() - start, 5s);
+    EXPECT_THAT(capture.ownMessages(), Contains("eventThreadNetIndications: Aborting thread..."));
+    EXPECT_THAT(capture.ownMessages(),
+                Contains("eventThreadNetIndications: Waiting for thread 0 seconds so far"));
+    EXPECT_THAT(capture.ownMessages(), Contains("eventThreadNetIndicationsThread terminated."));
+    EXPECT_TRUE(heard.now().empty());
+    EXPECT_EQ(host.read(kFile), "bond0=1\n");
+}
+
+HOST_TEST(NetworkMonitor, LeavesIndicationsOffWhenItsThreadWillNotStart) {
+    Interfaces interfaces;
+    LogCapture capture;
+    {
+        const NoThreads none;
+        interfaces.mi().enableIndications();
+    }
+    EXPECT_THAT(capture.ownMessages(), Contains("NetworkMonitor thread failed."));
+    capture.clear();
+    interfaces.mi().disableIndications();
+    EXPECT_THAT(capture.ownMessages(), ElementsAre("disableIndications: entry", "disableIndications: exit"));
+}
+
+HOST_TEST(NetworkMonitor, StoppedBeforeItRunsDoesNoPass) {
+    QX::Event ended(true);
+    IC::NetworkMonitor monitor(&ended);
+    EXPECT_FALSE(monitor.isDone());
+    monitor.stop();
+    LogCapture capture;
+    EXPECT_EQ(monitor.run(nullptr), nullptr);
+    EXPECT_TRUE(monitor.isDone());
+    EXPECT_TRUE(ended.wait(0));
+    EXPECT_THAT(capture.ownMessages(), ElementsAre("NetworkMonitor: run entry", "NetworkMonitor: run exit"));
+}
+
+HOST_TEST(NetworkMonitor, RunsCleanBesideReadersAndWriters) {
+    host.directory("/opt/vantrel/corvista/data");
+    QX::setClockSpeed(30000);  // a pass every millisecond
+    Interfaces interfaces;
+    std::vector<InterfaceNode*> nodes;
+    for (int i = 0; i < 8; ++i) {
+        nodes.push_back(&interfaces.add("eth" + std::to_string(i), 1));
+    }
+    interfaces.mi().enableIndications();
+    std::atomic<bool> done{false};
+    std::vector<std::thread> agents;
+    for (unsigned int seed = 0; seed < 4; ++seed) {
+        agents.emplace_back([&, seed] {
+            for (unsigned int i = seed; !done; ++i) {
+                nodes[i % nodes.size()]->is(i % 3 == 0 ? 12 : 1);
+                IC::PropertyValue value;
+                EXPECT_EQ(nodes[(i + 1) % nodes.size()]->getProperty(123, value).getStatus(), 0);
+            }
+        });
+    }
+    std::this_thread::sleep_for(500ms);
+    done = true;
+    for (std::thread& agent : agents) {
+        agent.join();
+    }
+    interfaces.mi().disableIndications();
+}
+
+}  // namespace
