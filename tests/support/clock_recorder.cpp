@@ -51,6 +51,14 @@ int recordAdjustment(const char* function, const timex* change) {
     return record(function, change->time.tv_sec, change->time.tv_usec, false);
 }
 
+#ifdef CLOCK_RECORDER_PRELOADED
+// What the program starts is recorded as a tool; it need not load this, and of another word size it could
+// not.
+__attribute__((constructor)) void stayInThisProgram() {
+    unsetenv("LD_PRELOAD");
+}
+#endif
+
 }  // namespace
 
 #define RECORDED extern "C" __attribute__((visibility("default")))

@@ -17,8 +17,7 @@ struct ToolAnswer {
     int status = 0;
     std::string err = {};
     int delayMilliseconds = 0;
-    std::string action =
-        {};  ///< a shell script run before `out` is printed, with the tool's arguments as $1...
+    std::string action = {};  ///< a shell script, run before `out` is printed, with the arguments as $1...
 };
 
 /// One attempt to set the clock, which only the recorder has seen.
@@ -59,8 +58,8 @@ public:
     void remove(const std::string& path);  ///< a file or a whole directory; fine when there is none
     std::optional<std::string> read(const std::string& path) const;  ///< nothing when it cannot be read
     bool exists(const std::string& path) const;                      ///< a dangling link exists
-    std::vector<std::string> listDirectory(
-        const std::string& path) const;  ///< sorted names, empty when there is none
+    /// The names in a directory, sorted; empty when there is none.
+    std::vector<std::string> listDirectory(const std::string& path) const;
 
     /// From here on a write below the path (a file or directory) fails with EROFS.
     void readOnly(const std::string& path);
@@ -80,11 +79,10 @@ public:
     void tool(const std::string& command, const ToolAnswer& answer);
     /// The first call gets the first answer and so on; further calls get the last one.
     void toolInTurn(const std::string& command, const std::vector<ToolAnswer>& answers);
-    void toolMissing(
-        const std::string& name);  ///< as if it were not installed; the start for all but the recorders
-    void recordOnly(const std::string& name);  ///< any arguments, prints nothing, status 0
-    void realTool(const std::string& name);    ///< the machine's own program, not recorded
-    void expectUnrecorded();                   ///< calls without an answer do not fail this test
+    void toolMissing(const std::string& name);  ///< as if it were not installed, as most are at the start
+    void recordOnly(const std::string& name);   ///< any arguments, prints nothing, status 0
+    void realTool(const std::string& name);     ///< the machine's own program, not recorded
+    void expectUnrecorded();                    ///< calls without an answer do not fail this test
     std::vector<std::string> unrecorded() const;
 
     /// The calls of scripted tools in the order they began, written like the commands above.
@@ -92,7 +90,8 @@ public:
     std::vector<std::string> callsOf(const std::string& name) const;
     void clearCalls();
 
-    // --- Clock. Setting it succeeds and changes nothing, here and in programs started with run.
+    // --- Clock. Setting it succeeds and changes nothing, here and in programs of this build started with
+    // run.
     std::vector<ClockCall> clockCalls() const;
     void clockFails(int error);  ///< setting the clock fails with this errno; 0 ends that
 

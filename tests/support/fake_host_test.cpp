@@ -76,6 +76,15 @@ HOST_TEST(FakeHostIsolation, ProcessesAndNetworkAreItsOwn) {
     if_freenameindex(links);
 }
 
+HOST_TEST(FakeHostIsolation, EveryProcessStandsInProcHoweverManyThereWere) {
+    if (access("/proc/sys/kernel/ns_last_pid", F_OK) != 0)
+        GTEST_SKIP() << "this kernel cannot tell the last process";
+    for (int round = 0; round < 40; ++round)
+        EXPECT_EQ(
+            shell("for i in 1 2 3 4 5 6 7 8 9 10; do (:); done; test -d /proc/$$ || echo missing $$").out,
+            "");
+}
+
 HOST_TEST(FakeHostIsolation, ToolsOfTheMachineAreOutOfReach) {
     for (std::string name :
          {"ifconfig", "ethtool", "route", "ip", "brctl", "fdisk", "hostname", "systemctl", "mount", "date",

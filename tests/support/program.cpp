@@ -21,8 +21,9 @@ using namespace std::chrono;
 
 namespace {
 
-// The address sanitizer wants to be the first library loaded, but the clock recorder has to be.
-std::vector<std::string> surroundings() {
+// The clock recorder goes into programs of this build only: the machine's may be of another word size. The
+// address sanitizer wants to be the first library loaded, but the recorder has to be.
+std::vector<std::string> surroundings(const std::string& program) {
     std::vector<std::string> variables;
     std::string options = "verify_asan_link_order=0";
     for (char** at = environ; *at; ++at) {
@@ -34,7 +35,8 @@ std::vector<std::string> surroundings() {
             variables.push_back(variable);
     }
     variables.push_back("ASAN_OPTIONS=" + options);
-    variables.push_back("LD_PRELOAD=" + buildDirectory() + "/fakehost/libclockrecorder.so");
+    if (program.rfind(buildDirectory(), 0) == 0)
+        variables.push_back("LD_PRELOAD=" + buildDirectory() + "/fakehost/libclockrecorder.so");
     return variables;
 }
 
@@ -51,7 +53,7 @@ pid_t spawn(std::vector<std::string> words, const std::string& prefix) {
     constexpr int created = O_WRONLY | O_CREAT | O_TRUNC | O_APPEND;
     posix_spawn_file_actions_addopen(&actions, STDOUT_FILENO, (prefix + ".out").c_str(), created, 0644);
     posix_spawn_file_actions_addopen(&actions, STDERR_FILENO, (prefix + ".err").c_str(), created, 0644);
-    std::vector<std::string> variables = surroundings();
+    std::vector<std::string> variables = surroundings(words.front());
     pid_t child = -1;
     int error = posix_spawnp(&child, words.front().c_str(), &actions, nullptr, pointers(words).data(),
                              pointers(variables).data());

@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <linux/capability.h>
+#include <poll.h>
 #include <sched.h>
 #include <sys/prctl.h>
 #include <sys/syscall.h>
@@ -58,27 +59,55 @@ void dropDangerousCapabilities() {
     must(syscall(SYS_capset, &header, sets), "drop the capabilities");
 }
 
+/// Keeps the numbers of new processes within what /proc shows. Without the kernel's help they just grow.
+class ProcessNumbers {
+public:
+    ProcessNumbers() : last_(open("/proc/sys/kernel/ns_last_pid", O_RDWR | O_CLOEXEC)) {}
+    void keepLow() const {
+        char digits[16] = {};
+        if (last_ < 0 || pread(last_, digits, sizeof digits - 1, 0) <= 0) return;
+        if (std::atoi(digits) < highestProcess / 4) return;
+        [[maybe_unused]] ssize_t put = pwrite(last_, "2", 1, 0);
+    }
+
+private:
+    int last_;  // opened before the kernel's settings become read-only
+};
+
+// Takes in the processes that lose their parent, as the first process of a host must.
+int waitForBody(pid_t body, const ProcessNumbers& numbers) {
+    pollfd ended{static_cast<int>(must(syscall(SYS_pidfd_open, body, 0), "watch the body")), POLLIN, 0};
+    while (poll(&ended, 1, 20) <= 0) {
+        numbers.keepLow();
+        siginfo_t next{};
+        while (waitid(P_ALL, 0, &next, WEXITED | WNOHANG | WNOWAIT) == 0 && next.si_pid > 0 &&
+               next.si_pid != body) {
+            waitpid(next.si_pid, nullptr, 0);
+            next.si_pid = 0;
+        }
+    }
+    int status = 0;
+    must(waitpid(body, &status, 0), "wait for the body");
+    return status;
+}
+
 [[noreturn]] void runInit(int report, const std::function<void()>& body, const Owner* mapped) {
     try {
         prctl(PR_SET_PDEATHSIG, SIGKILL);
         if (mapped) becomeRoot(*mapped);
+        ProcessNumbers numbers;
         buildRoot();
         if (!mapped) dropDangerousCapabilities();
         must(sethostname("localhost", 9), "set the host name");
+        pid_t child = must(fork(), "start the body");
+        if (child == 0) {
+            body();
+            std::exit(0);
+        }
+        send(report, {Report::ended, waitForBody(child, numbers), 0, "", ""});
     } catch (const std::exception& error) {
         send(report, {Report::problem, 0, 0, "", error.what()});
-        _exit(1);
     }
-    pid_t child = fork();
-    if (child == 0) {
-        body();
-        std::exit(0);
-    }
-    int status = 0;
-    pid_t gone;
-    while ((gone = waitpid(-1, &status, 0)) != child)
-        if (gone < 0 && errno != EINTR) _exit(1);
-    send(report, {Report::ended, status, 0, "", ""});
     _exit(0);
 }
 

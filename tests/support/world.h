@@ -6,6 +6,10 @@
 
 namespace fake_host {
 
+/// The processes that a fake host's /proc shows, for leak and race checkers and for code that looks at its
+/// children. The numbers are given out anew from the start long before this one is reached.
+inline constexpr int highestProcess = 256;
+
 /// Starts a process in new user, mount, UTS, network, IPC and PID namespaces over a fresh root directory; it
 /// runs `body` in a child of its own and leaves by _exit when that has ended, which ends everything else in
 /// there. `report` receives a Report::problem when the root cannot be built, else the child's wait status.

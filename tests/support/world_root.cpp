@@ -32,7 +32,6 @@ constexpr const char* plainTools[] = {
 // What the kernel shows of processes and itself; everything else in /proc belongs to the test.
 constexpr const char* realProc[] = {"self",   "thread-self", "mounts",      "meminfo", "stat",
                                     "uptime", "loadavg",     "filesystems", "sys",     "version"};
-constexpr int linkedProcesses = 512;  // leak and race checkers look at /proc/<process>
 
 constexpr const char* devices[] = {"null", "zero", "full", "random", "urandom", "tty"};
 
@@ -119,7 +118,7 @@ void linkMachine() {
 
 void linkProc() {
     for (std::string name : realProc) link("proc/" + name, "/.proc/" + name);
-    for (int process = 1; process <= linkedProcesses; ++process) {
+    for (int process = 1; process <= highestProcess; ++process) {
         std::string name = std::to_string(process);
         link("proc/" + name, "/.proc/" + name);
     }
