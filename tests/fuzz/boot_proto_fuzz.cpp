@@ -1,0 +1,16 @@
+#include <algorithm>
+
+#include "network/address_parse.h"
+#include "tests/fuzz/lines.h"
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+    fuzz::eachLine(data, size, [](const std::string& line) {
+        const std::string keyword = IC::parse::bootProto(line);
+        AGREED(keyword.find_first_of("'\"") == keyword.npos);
+        const auto quotes =
+            std::count(line.begin(), line.end(), '\'') + std::count(line.begin(), line.end(), '"');
+        const std::size_t lineBreaks = line.size() - (line.find_last_not_of('\n') + 1);
+        AGREED(keyword.size() == line.size() - lineBreaks - static_cast<std::size_t>(quotes));
+    });
+    return 0;
+}
