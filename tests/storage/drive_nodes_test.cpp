@@ -1,0 +1,286 @@
+// Drives: given this snapshot, these nodes, after these commands, with these lines in the log.
+#include "mi/disk_snapshot.h"
+#include "mi/globals.h"
+#include "mi/node_types.h"
+#include "mi/shut_down.h"
+#include "storage/hard_drive_node.h"
+#include "tests/storage/storage_host.h"
+
+namespace {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+using Access = IC::OsHwMITestAccess;
+
+const std::string kOneDrive = "Disk /dev/sda: 80.0 GB, 80026361856 bytes\n";
+const std::string kListing = "cat /tmp/fdisk_tmp | grep ^Disk";
+
+std::string pathCommand(const std::string& line) {
+    return "echo \"" + line + "\" | cut -d \" \" -f2";
+}
+
+std::string sizeCommand(const std::string& line) {
+    return "echo \"" + line + "\" | cut -d \" \" -f5";
+}
+
+void build(FakeHost& host, const std::string& snapshot, bool update = false) {
+    host.file(IC::diskSnapshotPath, snapshot);
+    IC::myoshwmi.createHardDriveNodes(update);
+}
+
+class Drives : public StorageHost {};
+
+HOST_TEST_F(Drives, ADriveHasPathSizeInThousandsOfBytesAndHealth) {
+    build(host, kOneDrive);
+    EXPECT_THAT(drives(), ElementsAre(Seen{101, 1, "/dev/sda", 80026361}));
+    const auto node = nodesOfType(IC::NodeType::hardDrive).at(0);
+    EXPECT_EQ(node->getLinkedId(), kControllerId);
+    EXPECT_THAT(node->getMIIds(), ElementsAre(7));
+    EXPECT_EQ(node->getStatus(), 1U);
+    EXPECT_EQ(node->getDescription(), "Hard Drive");
+    std::map<unsigned int, IC::PropertyValue> stored;
+    node->getProperties(stored);
+    EXPECT_THAT(stored, ElementsAre(testing::Pair(37, IC::PropertyValue(IC::Number(80026361ULL), true)),
+                                    testing::Pair(89, IC::PropertyValue("/dev/sda", true)),
+                                    testing::Pair(123, IC::PropertyValue(IC::Number(1U), true))));
+    EXPECT_TRUE(stored.at(37).known());
+}
+
+HOST_TEST_F(Drives, TheHostIsAskedOneCommandAtATimeUnderTheFileLock) {
+    std::vector<bool> locked;
+    shell_stub::beforeEach([&](const std::string&) { locked.push_back(shell_stub::fileLockIsHeld()); });
+    build(host, listing("mbr_logical"));
+    const std::string disk = "Disk /dev/sda: 80.0 GB, 80026361856 bytes";
+    EXPECT_THAT(shell_stub::commands(), ElementsAre(kListing, pathCommand(disk), sizeCommand(disk),
+                                                    pathCommand("Disk identifier: 0x8f3d0cf1")));
+    EXPECT_THAT(locked, ElementsAre(true, true, true, true));
+    EXPECT_FALSE(shell_stub::fileLockIsHeld());
+}
+
+HOST_TEST_F(Drives, OutputIsReadAfterTheLockIsReleased) {
+    host.tool("cut %any", ToolAnswer{.out = "/dev/sda:\n", .delayMilliseconds = 400});
+    host.file(IC::diskSnapshotPath, kOneDrive);
+    std::thread builder([] { IC::myoshwmi.createHardDriveNodes(false); });
+    while (host.callsOf("cut").empty()) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(1));
+    }
+    const bool held = shell_stub::fileLockIsHeld();
+    const bool stillAtTheFirst = host.callsOf("cut").size() == 1;
+    builder.join();
+    EXPECT_TRUE(stillAtTheFirst);
+    EXPECT_FALSE(held);
+}
+
+HOST_TEST_F(Drives, TheFirstBuildLogsEveryStep) {
+    LogCapture log;
+    build(host, kOneDrive);
+    EXPECT_THAT(log.messages(),
+                ElementsAre("createHardDriveNodes: entry", "HardDriveNode::HardDriveNode: entry",
+                            "HardDriveNode::HardDriveNode: exit", "New Hard Drive Node created /dev/sda",
+                            "HardDriveNode::setProperty: entry", "HardDriveNode::setProperty: exit",
+                            "HardDriveNode::setProperty: entry", "HardDriveNode::setProperty: exit",
+                            "HardDriveNode::getProperty: entry", "HardDriveNode::getProperty: exit",
+                            "HardDriveNode::setProperty: entry", "HardDriveNode::setProperty: exit",
+                            "Hard Drive Node::Normal /dev/sda", "createHardDriveNodes: exit"));
+    EXPECT_EQ(log.messages(3000), log.messages());
+    EXPECT_TRUE(log.everyLineTwice());
+}
+
+HOST_TEST_F(Drives, AnUpdateWithdrawsTheOldNodesAndPublishesTheNewOnesOneByOne) {
+    build(host, kOneDrive + "Disk /dev/sdb: 500.1 GB, 500107862016 bytes\n");
+    EXPECT_THAT(diary(), IsEmpty()) << "the first nodes are in the map that the agent reads";
+    LogCapture log;
+    build(host, "Disk /dev/sdc: 1000.2 GB, 1000204886016 bytes\n", true);
+    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "withdrawn /dev/sdb", "published /dev/sdc"));
+    EXPECT_THAT(drives(), ElementsAre(Seen{103, 1, "/dev/sdc", 1000204886}));
+    EXPECT_THAT(withoutPropertyLines(log.messages()),
+                ElementsAre("createHardDriveNodes: entry", "Delete a Hrad Drive entry: Hard Drive",
+                            "HardDriveNode::~HardDriveNode: entry", "HardDriveNode::~HardDriveNode: exit",
+                            "Delete a Hrad Drive entry: Hard Drive", "HardDriveNode::~HardDriveNode: entry",
+                            "HardDriveNode::~HardDriveNode: exit", "HardDriveNode::HardDriveNode: entry",
+                            "HardDriveNode::HardDriveNode: exit", "Hard Drive Update created /dev/sdc",
+                            "Hard Drive Node::Normal /dev/sdc", "publishNode: entry", "publishNode: exit",
+                            "Updated Hard Drive Node Published", "createHardDriveNodes: exit"));
+    EXPECT_THAT(Access::drawnIds(), ElementsAre(100, 101, 102, 103));
+}
+
+HOST_TEST_F(Drives, ANodeThatIsBeingReadOutlivesItsWithdrawal) {
+    build(host, kOneDrive);
+    auto held = nodesOfType(IC::NodeType::hardDrive).at(0);
+    LogCapture log;
+    build(host, "", true);
+    EXPECT_THAT(log.messages(), testing::Not(testing::Contains("HardDriveNode::~HardDriveNode: entry")));
+    IC::PropertyValue path;
+    EXPECT_EQ(held->getProperty(89, path).getStatus(), 0);
+    EXPECT_EQ(std::string(path), "/dev/sda");
+    held.reset();
+    EXPECT_THAT(log.messages(), testing::Contains("HardDriveNode::~HardDriveNode: exit"));
+}
+
+HOST_TEST_F(Drives, AnEmptySnapshotGivesNoneAndAnUpdateStillWithdraws) {
+    build(host, "");
+    EXPECT_THAT(drives(), IsEmpty());
+    build(host, kOneDrive);
+    build(host, "", true);
+    EXPECT_THAT(drives(), IsEmpty());
+    EXPECT_THAT(Access::drives(), IsEmpty());
+    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda"));
+}
+
+HOST_TEST_F(Drives, AMissingSnapshotGivesNone) {
+    IC::myoshwmi.createHardDriveNodes(false);
+    EXPECT_THAT(drives(), IsEmpty());
+}
+
+HOST_TEST_F(Drives, OnlyDisksProperAreKept) {
+    build(host, listing("raid_and_mapper"));
+    EXPECT_THAT(drives(),
+                ElementsAre(Seen{101, 1, "/dev/sda", 500107862}, Seen{102, 2, "/dev/sdb", 500107862}));
+    build(host, listing("other_buses"), true);
+    EXPECT_THAT(drives(), IsEmpty());
+    build(host, listing("ide"), true);
+    EXPECT_THAT(drives(), ElementsAre(Seen{103, 1, "/dev/hda", 40020664}));
+}
+
+HOST_TEST_F(Drives, AnyNumberOfDrivesAndADiskWithoutATable) {
+    build(host, listing("many_drives"));
+    EXPECT_THAT(drives(),
+                ElementsAre(Seen{101, 1, "/dev/sda", 500107862}, Seen{102, 2, "/dev/sdb", 500108910},
+                            Seen{103, 3, "/dev/sdz", 500109959}, Seen{104, 4, "/dev/sdaa", 500111007},
+                            Seen{105, 5, "/dev/sdab", 500112056}));
+    build(host, listing("no_table"), true);
+    EXPECT_THAT(drives(), ElementsAre(Seen{106, 1, "/dev/sdb", 2000398934}));
+}
+
+HOST_TEST_F(Drives, ADriveOfMoreThanTwoTebibytesKeepsItsSizeOnEveryHost) {
+    build(host, listing("gpt_large"));
+    EXPECT_THAT(drives(), ElementsAre(Seen{101, 1, "/dev/sda", 3000592982}));
+    build(host, "Disk /dev/sda: 18 TB, 18000207937536 bytes\n", true);
+    EXPECT_EQ(drives().at(0).size, 18000207937ULL);
+}
+
+HOST_TEST_F(Drives, ASizeThatIsNoNumberCountsAsNothing) {
+    for (const std::string size : {"", "bytes", "-5000", "nan", "inf", "1e30"}) {
+        build(host, "Disk /dev/sda: 80.0 GB, " + size + " bytes\n", true);
+        EXPECT_EQ(drives().at(0).size, 0U) << size;
+    }
+    build(host, "Disk /dev/sda:\n", true);
+    EXPECT_EQ(drives().at(0).size, 0U) << "a line that ends behind the device";
+    build(host, "Disk /dev/sda: 80.0 GB, 80026361856bytes\n", true);
+    EXPECT_EQ(drives().at(0).size, 80026361U) << "what follows the digits does not count";
+}
+
+HOST_TEST_F(Drives, EveryColonBehindTheDeviceGoes) {
+    build(host, "Disk /dev/sda::: 80.0 GB, 999 bytes\nDisk /dev/sdb 80.0 GB, 1000 bytes\nDisk\nDiskless\n");
+    EXPECT_THAT(drives(), ElementsAre(Seen{101, 1, "/dev/sda", 0}, Seen{102, 2, "/dev/sdb", 1}));
+}
+
+HOST_TEST_F(Drives, ALineGoesToTheShellAsItIs) {
+    const std::string line = "Disk /dev/sda: 'x'  `y` ; | & 42";
+    shell_stub::answerWith([&](const std::string& command) -> std::optional<std::string> {
+        if (command == pathCommand(line)) return "/dev/sda:\n";
+        if (command == sizeCommand(line)) return "5000\n";
+        return std::nullopt;
+    });
+    build(host, line + "\n");
+    EXPECT_THAT(shell_stub::commands(), ElementsAre(kListing, pathCommand(line), sizeCommand(line)));
+    EXPECT_THAT(drives(), ElementsAre(Seen{101, 1, "/dev/sda", 5}));
+}
+
+HOST_TEST_F(Drives, ALineTooLongForItsCommandIsSkipped) {
+    const std::string start = "Disk /dev/sda: 80.0 GB, 80026361856 ";
+    const std::string fits = start + std::string(511 - pathCommand(start).size(), 'x');
+    const std::string tooLong = fits + "x";
+    LogCapture log;
+    build(host, tooLong + "\n" + fits + "\nDisk /dev/sdb: 80.0 GB, 1000 bytes\n");
+    EXPECT_THAT(drives(), ElementsAre(Seen{101, 1, "/dev/sda", 80026361}, Seen{102, 2, "/dev/sdb", 1}));
+    EXPECT_THAT(log.messages(6000),
+                ElementsAre("Command too long, not run: " + pathCommand(tooLong), "Command :  failed!!"));
+    EXPECT_THAT(shell_stub::commands(), testing::Not(testing::Contains(pathCommand(tooLong))));
+}
+
+HOST_TEST_F(Drives, AListingThatCannotStartLeavesNoNodes) {
+    build(host, kOneDrive);
+    shell_stub::failWhen([](const std::string& command) { return command == kListing; });
+    LogCapture log;
+    build(host, kOneDrive, true);
+    EXPECT_THAT(log.messages(6000), ElementsAre("fdisk command " + kListing + " failed!!"));
+    EXPECT_EQ(log.messages().back(), "createHardDriveNodes: exit");
+    EXPECT_THAT(drives(), IsEmpty());
+    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda"));
+}
+
+HOST_TEST_F(Drives, ALineWhoseCommandCannotStartIsSkipped) {
+    const std::string a = "Disk /dev/sda: 80.0 GB, 1000 bytes";
+    const std::string b = "Disk /dev/sdb: 80.0 GB, 2000 bytes";
+    const std::string c = "Disk /dev/sdc: 80.0 GB, 3000 bytes";
+    shell_stub::failWhen(
+        [&](const std::string& command) { return command == pathCommand(a) || command == sizeCommand(b); });
+    LogCapture log;
+    build(host, a + "\n" + b + "\n" + c + "\n");
+    EXPECT_THAT(drives(), ElementsAre(Seen{102, 1, "/dev/sdc", 3}));
+    EXPECT_EQ(Access::drives().size(), 1U);
+    EXPECT_THAT(log.messages(6000), ElementsAre("Command : " + pathCommand(a) + " failed!!",
+                                                "Command : " + sizeCommand(b) + " failed!!"));
+}
+
+HOST_TEST_F(Drives, ToolsThatAreMissingGiveNoDrives) {
+    host.toolMissing("cut");
+    LogCapture log;
+    build(host, kOneDrive);
+    EXPECT_THAT(drives(), IsEmpty());
+    EXPECT_THAT(log.messages(6000), IsEmpty());
+}
+
+HOST_TEST_F(Drives, ANodeThatTheAgentRefusesIsLoggedAndGoesWithTheNextUpdate) {
+    agentRefuses();
+    LogCapture log;
+    build(host, kOneDrive, true);
+    EXPECT_THAT(log.messages(6000), ElementsAre("addNewNode error = the agent is full"));
+    EXPECT_THAT(drives(), IsEmpty());
+    EXPECT_EQ(Access::drives().size(), 1U);
+    build(host, "", true);
+    EXPECT_THAT(log.messages(), testing::Contains("HardDriveNode::~HardDriveNode: exit"));
+    EXPECT_THAT(Access::drives(), IsEmpty());
+}
+
+HOST_TEST_F(Drives, HealthIsAlwaysGoodAndWritesAreOnlyStored) {
+    build(host, kOneDrive);
+    const auto node = nodesOfType(IC::NodeType::hardDrive).at(0);
+    shell_stub::clearCommands();
+    EXPECT_EQ(node->setProperty(123, IC::PropertyValue(IC::Number(12U), true)).getStatus(), 0);
+    EXPECT_EQ(node->setProperty(200, IC::PropertyValue("label", true)).getStatus(), 0);
+    IC::PropertyValue value;
+    EXPECT_EQ(node->getProperty(123, value).getStatus(), 0);
+    EXPECT_EQ(value, IC::PropertyValue(IC::Number(1U), true));
+    EXPECT_EQ(value.asNumber()->kind(), IC::Number::unsigned32);
+    EXPECT_EQ(node->getProperty(200, value).getStatus(), 0);
+    EXPECT_EQ(std::string(value), "label");
+    EXPECT_EQ(node->getProperty(999, value).getStatus(), 1);
+    EXPECT_THAT(shell_stub::commands(), IsEmpty());
+}
+
+HOST_TEST_F(Drives, TheSnapshotIsRemovedUnderTheFileLock) {
+    host.file(IC::diskSnapshotPath, kOneDrive);
+    bool locked = false;
+    shell_stub::beforeEach([&](const std::string&) { locked = shell_stub::fileLockIsHeld(); });
+    LogCapture log;
+    IC::deleteFdiskTmp();
+    EXPECT_FALSE(host.exists(IC::diskSnapshotPath));
+    EXPECT_TRUE(locked);
+    EXPECT_THAT(shell_stub::commands(), ElementsAre("rm /tmp/fdisk_tmp 2> /dev/null"));
+    EXPECT_THAT(log.messages(),
+                ElementsAre("deleteFdiskTmp: entry", "Deleting /tmp/fdisk_tmp", "deleteFdiskTmp: exit"));
+}
+
+HOST_TEST_F(Drives, ASnapshotThatCannotBeRemovedIsLogged) {
+    host.file(IC::diskSnapshotPath, kOneDrive);
+    shell_stub::failWhen([](const std::string&) { return true; });
+    LogCapture log;
+    IC::deleteFdiskTmp();
+    EXPECT_TRUE(host.exists(IC::diskSnapshotPath));
+    EXPECT_THAT(log.messages(6000), ElementsAre("Could not delete /tmp/fdisk_tmp"));
+    EXPECT_EQ(log.messages().back(), "deleteFdiskTmp: exit");
+}
+
+}  // namespace

@@ -1,0 +1,243 @@
+// A pass of the drive monitor: snapshot, fingerprints, comparison, and what is built anew.
+#include "mi/disk_snapshot.h"
+#include "mi/globals.h"
+#include "mi/node_types.h"
+#include "tests/storage/storage_host.h"
+
+namespace {
+
+using testing::Contains;
+using testing::ElementsAre;
+using testing::IsEmpty;
+using testing::Not;
+using Access = IC::OsHwMITestAccess;
+
+const std::string kSnapshot = "fdisk -ls 2>/dev/null > /tmp/fdisk_tmp";
+const std::string kDriveMd5 = "cat /tmp/fdisk_tmp | grep ^Disk |md5sum |awk '{print $1}'";
+const std::string kDriveSha1 = "cat /tmp/fdisk_tmp | grep ^Disk |sha1sum |awk '{print $1}'";
+const std::string kPartitionMd5 = "cat /tmp/fdisk_tmp | grep ^/dev |md5sum |awk '{print $1}'";
+const std::string kPartitionSha1 = "cat /tmp/fdisk_tmp | grep ^/dev |sha1sum |awk '{print $1}'";
+
+const std::string kDisk = "Disk /dev/sda: 80.0 GB, 80026361856 bytes\n";
+const std::string kFirst = "/dev/sda1   *           1          13      104391   83  Linux\n";
+const std::string kSecond = "/dev/sda2              14        1288    10241437+  83  Linux\n";
+const std::string kLayout = kDisk + kFirst;
+const std::string kDiskMd5 = "e63cb20a64a37eea14605a6b34421272";
+const std::string kDiskSha1 = "f8ed562930176188860b15a5e93af7042f17d042";
+const std::string kFirstMd5 = "2ed0b4a29505d32d645577847dbbe12b";
+const std::string kFirstSha1 = "fd1f5f57717ef5ece8cd45e1e7c3b9f1b847df6c";
+
+const std::vector<std::string> kComparison = {kSnapshot, kDriveMd5, kDriveSha1, kPartitionMd5,
+                                              kPartitionSha1};
+
+class LayoutComparison : public StorageHost {
+protected:
+    /// A pass over this layout; the commands, the diary are those of this pass alone.
+    static void pass(FakeHost& host, const std::string& layout) {
+        host.tool("fdisk -ls", layout);
+        shell_stub::clearCommands();
+        diary().clear();
+        IC::myoshwmi.HDDThreadProcess();
+    }
+    static void startWith(FakeHost& host, const std::string& layout) {
+        host.file(IC::diskSnapshotPath, layout);
+        IC::myoshwmi.createHardDriveNodes(false);
+        IC::myoshwmi.createPartitionNodes(false);
+        pass(host, layout);
+    }
+};
+
+HOST_TEST_F(LayoutComparison, TheFirstPassAlwaysRebuildsBothKinds) {
+    LogCapture log;
+    startWith(host, kLayout);
+    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "published /dev/sda", "withdrawn /dev/sda1",
+                                     "published /dev/sda1"));
+    EXPECT_THAT(log.messages(), Contains("Hard Drive Check Sum found Different"));
+    EXPECT_THAT(log.messages(), Contains("Partition Check Sum found Different"));
+}
+
+HOST_TEST_F(LayoutComparison, AnUnchangedLayoutTouchesNothing) {
+    startWith(host, kLayout);
+    const auto drivesBefore = drives();
+    LogCapture log;
+    pass(host, kLayout);
+    EXPECT_THAT(diary(), IsEmpty());
+    EXPECT_EQ(shell_stub::commands(), kComparison);
+    EXPECT_THAT(
+        log.messages(),
+        ElementsAre("Hard Drive ThreadProcess :: Entry", "Hard Drive Check Sum : Entry",
+                    "cond ::Hard Drive Check Sum : MD5 :: " + kDiskMd5,
+                    "cond ::Hard Drive Check Sum : SHA1 :: " + kDiskSha1, "Hard Drive Check Sum : Exit",
+                    "Partition Check Sum : Entry", "cond ::Partition Check Sum : MD5 :: " + kFirstMd5,
+                    "cond ::Partition Check Sum : SHA1 :: " + kFirstSha1, "Partition Check Sum : Exit",
+                    "Hard Drive ThreadProcess :: Exit"));
+    EXPECT_EQ(log.messages(3000), log.messages());
+    EXPECT_EQ(drives(), drivesBefore);
+}
+
+HOST_TEST_F(LayoutComparison, EveryCommandIsStartedUnderTheFileLock) {
+    std::vector<bool> locked;
+    shell_stub::beforeEach([&](const std::string&) { locked.push_back(shell_stub::fileLockIsHeld()); });
+    pass(host, kLayout);
+    // The comparison, the listing of the drives with two questions, that of the partitions with one.
+    EXPECT_EQ(locked, std::vector<bool>(kComparison.size() + 5, true));
+    EXPECT_FALSE(shell_stub::fileLockIsHeld());
+}
+
+HOST_TEST_F(LayoutComparison, AnAddedPartitionRebuildsThePartitionsAlone) {
+    startWith(host, kLayout);
+    const auto drivesBefore = drives();
+    LogCapture log;
+    pass(host, kLayout + kSecond);
+    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda1", "published /dev/sda1", "published /dev/sda2"));
+    EXPECT_EQ(drives(), drivesBefore);
+    EXPECT_THAT(shell_stub::commands(), Not(Contains("cat /tmp/fdisk_tmp | grep ^Disk")));
+    EXPECT_THAT(log.messages(), Not(Contains("Hard Drive Check Sum found Different")));
+    EXPECT_THAT(log.messages(), Contains("Partition Check Sum found Different"));
+    pass(host, kLayout + kSecond);
+    EXPECT_THAT(diary(), IsEmpty());
+}
+
+HOST_TEST_F(LayoutComparison, ARemovedDiskTakesItsDriveAndItsPartitions) {
+    const std::string other = "Disk /dev/sdb: 80.0 GB, 1000000 bytes\n";
+    const std::string its = "/dev/sdb1 1 2 300 83 Linux\n";
+    startWith(host, kLayout + other + its);
+    pass(host, kLayout);
+    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "withdrawn /dev/sdb", "published /dev/sda",
+                                     "withdrawn /dev/sda1", "withdrawn /dev/sdb1", "published /dev/sda1"));
+    EXPECT_EQ(drives().size(), 1U);
+    EXPECT_EQ(partitions().size(), 1U);
+}
+
+HOST_TEST_F(LayoutComparison, ADiskWithoutPartitionsRebuildsTheDrivesAlone) {
+    startWith(host, kLayout);
+    pass(host, kLayout + "Disk /dev/sdb: 80.0 GB, 1000000 bytes\n");
+    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "published /dev/sda", "published /dev/sdb"));
+    EXPECT_EQ(partitions().size(), 1U);
+}
+
+HOST_TEST_F(LayoutComparison, LinesThatDescribeNoDeviceDoNotCount) {
+    startWith(host, kLayout);
+    pass(host, "255 heads, 63 sectors/track\n" + kLayout + "\nUnits = cylinders of 16065 * 512\n");
+    EXPECT_THAT(diary(), IsEmpty());
+}
+
+HOST_TEST_F(LayoutComparison, AMissingFdiskLooksLikeAHostWithoutDisks) {
+    startWith(host, kLayout);
+    host.toolMissing("fdisk");
+    diary().clear();
+    IC::myoshwmi.HDDThreadProcess();
+    EXPECT_EQ(host.read(IC::diskSnapshotPath), "");
+    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "withdrawn /dev/sda1"));
+}
+
+HOST_TEST_F(LayoutComparison, ASnapshotThatCannotBeTakenSkipsThePass) {
+    startWith(host, kLayout);
+    shell_stub::failWhen([](const std::string& command) { return command == kSnapshot; });
+    LogCapture log;
+    pass(host, "");
+    EXPECT_THAT(shell_stub::commands(), ElementsAre(kSnapshot));
+    EXPECT_THAT(diary(), IsEmpty());
+    EXPECT_THAT(log.messages(),
+                ElementsAre("Hard Drive ThreadProcess :: Entry", "Hard Drive ThreadProcess :: Exit"));
+    shell_stub::failWhen({});
+    pass(host, "");
+    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "withdrawn /dev/sda1")) << "retried by the next";
+}
+
+HOST_TEST_F(LayoutComparison, WithoutMd5sumChangesAreFoundBySha1Alone) {
+    host.remove("/usr/bin/md5sum");
+    LogCapture log;
+    startWith(host, kLayout);
+    EXPECT_THAT(log.messages(), Contains("cond ::Hard Drive Check Sum : MD5 :: "));
+    EXPECT_THAT(log.messages(), Contains("cond ::Hard Drive Check Sum : SHA1 :: " + kDiskSha1));
+    EXPECT_EQ(diary().size(), 4U);
+    pass(host, kLayout);
+    EXPECT_THAT(diary(), IsEmpty());
+    pass(host, kLayout + kSecond);
+    EXPECT_EQ(partitions().size(), 2U);
+}
+
+HOST_TEST_F(LayoutComparison, AFingerprintThatFailsCountsAsAChangeOnce) {
+    startWith(host, kLayout);
+    shell_stub::failWhen([](const std::string& command) { return command == kDriveMd5; });
+    LogCapture log;
+    pass(host, kLayout);
+    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "published /dev/sda"));
+    EXPECT_EQ(Access::driveFingerprints().md5.reference, "");
+    EXPECT_EQ(Access::driveFingerprints().sha1.reference, kDiskSha1);
+    EXPECT_THAT(log.messages(), Not(Contains(testing::HasSubstr("Hard Drive Check Sum : MD5"))));
+    EXPECT_THAT(log.messages(6000), IsEmpty());
+    pass(host, kLayout);
+    EXPECT_THAT(diary(), IsEmpty()) << "the empty value is the reference now";
+    shell_stub::failWhen({});
+    pass(host, kLayout);
+    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "published /dev/sda")) << "and back again once";
+}
+
+HOST_TEST_F(LayoutComparison, ComparedFingerprintsMoveToTheReference) {
+    startWith(host, kLayout);
+    EXPECT_EQ(Access::driveFingerprints().md5.reference, kDiskMd5);
+    EXPECT_EQ(Access::driveFingerprints().md5.current, "");
+    EXPECT_EQ(Access::driveFingerprints().sha1.reference, kDiskSha1);
+    EXPECT_EQ(Access::driveFingerprints().sha1.current, "");
+    EXPECT_EQ(Access::partitionFingerprints().md5.reference, kFirstMd5);
+    EXPECT_EQ(Access::partitionFingerprints().sha1.reference, kFirstSha1);
+    EXPECT_EQ(Access::partitionFingerprints().sha1.current, "");
+}
+
+HOST_TEST_F(LayoutComparison, TheFlagSaysWhereNewFingerprintsStay) {
+    host.file(IC::diskSnapshotPath, kLayout);
+    IC::myoshwmi.HardDrive_Checksum(true);
+    IC::myoshwmi.Partition_Checksum(true);
+    EXPECT_EQ(Access::driveFingerprints().md5.current, kDiskMd5);
+    EXPECT_EQ(Access::driveFingerprints().md5.reference, "");
+    EXPECT_EQ(Access::partitionFingerprints().sha1.current, kFirstSha1);
+    IC::myoshwmi.HardDrive_Checksum(false);
+    IC::myoshwmi.Partition_Checksum(false);
+    EXPECT_EQ(Access::driveFingerprints().md5.current, "");
+    EXPECT_EQ(Access::driveFingerprints().md5.reference, kDiskMd5);
+    EXPECT_EQ(Access::partitionFingerprints().sha1.current, "");
+    EXPECT_EQ(Access::partitionFingerprints().sha1.reference, kFirstSha1);
+}
+
+// fdisk can take long over a disk that has to spin up. Whoever reads the snapshot after it must find it
+// whole.
+HOST_TEST_F(LayoutComparison, ASlowFdiskIsWaitedForBeforeAnybodyReads) {
+    host.tool("fdisk -ls", ToolAnswer{.out = kSecond, .action = "printf '" + kLayout + "'; sleep 0.4"});
+    std::vector<std::string> torn;
+    shell_stub::beforeEach([&](const std::string& command) {
+        if (command != kSnapshot && host.read(IC::diskSnapshotPath) != kLayout + kSecond) {
+            torn.push_back(command);
+        }
+    });
+    IC::myoshwmi.HDDThreadProcess();
+    EXPECT_GT(shell_stub::commands().size(), kComparison.size());
+    EXPECT_THAT(torn, IsEmpty());
+    EXPECT_EQ(drives().size(), 1U);
+    EXPECT_EQ(partitions().size(), 2U);
+}
+
+HOST_TEST_F(LayoutComparison, AtStartTheBuildersFindTheSnapshotOfASlowFdiskWhole) {
+    host.tool("fdisk -ls", ToolAnswer{.out = kSecond, .action = "printf '" + kLayout + "'; sleep 0.4"});
+    EXPECT_TRUE(IC::takeDiskSnapshot());
+    IC::myoshwmi.createHardDriveNodes(false);
+    IC::myoshwmi.createPartitionNodes(false);
+    EXPECT_EQ(drives().size(), 1U);
+    EXPECT_EQ(partitions().size(), 2U);
+}
+
+HOST_TEST_F(LayoutComparison, TheLockIsFreeWhileFdiskWrites) {
+    host.tool("fdisk -ls", ToolAnswer{.out = kLayout, .delayMilliseconds = 400});
+    std::thread monitor([] { IC::myoshwmi.HDDThreadProcess(); });
+    while (host.callsOf("fdisk").empty()) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(1));
+    }
+    const bool held = shell_stub::fileLockIsHeld();
+    const bool writing = shell_stub::commands().size() == 1;
+    monitor.join();
+    EXPECT_TRUE(writing);
+    EXPECT_FALSE(held);
+}
+
+}  // namespace

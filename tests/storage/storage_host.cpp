@@ -1,0 +1,155 @@
+#include "tests/storage/storage_host.h"
+
+#include <fstream>
+#include <sstream>
+
+#include "mi/globals.h"
+#include "mi/node_types.h"
+#include "storage/disk_partition.h"
+#include "storage/hard_drive_node.h"
+
+namespace IC {
+
+void OsHwMITestAccess::plantDiskController(unsigned int firstNodeId) {
+    myoshwmi.ManagementInterface::initialize(7, Number(1U), Number(firstNodeId));
+    myoshwmi.inventory_ = std::make_unique<OsHwMI::Inventory>();
+    myoshwmi.diskControllerNode_ =
+        new MutableNode(myoshwmi.drawNodeId(), 1, myoshwmi.miIds(), NodeType::diskController, 1);
+    myoshwmi.appendNode(myoshwmi.diskControllerNode_);
+}
+
+unsigned int OsHwMITestAccess::diskControllerId() {
+    return myoshwmi.diskControllerNode_->getNodeId();
+}
+
+std::vector<unsigned int> OsHwMITestAccess::drawnIds() {
+    return myoshwmi.inventory_->drawnIds;
+}
+
+const std::vector<Node*>& OsHwMITestAccess::drives() {
+    return myoshwmi.driveNodes_;
+}
+
+const std::vector<Node*>& OsHwMITestAccess::partitions() {
+    return myoshwmi.partitionNodes_;
+}
+
+FingerprintPair& OsHwMITestAccess::driveFingerprints() {
+    return myoshwmi.driveFingerprints_;
+}
+
+FingerprintPair& OsHwMITestAccess::partitionFingerprints() {
+    return myoshwmi.partitionFingerprints_;
+}
+
+bool OsHwMITestAccess::monitorRuns() {
+    return myoshwmi.driveMonitorRuns_;
+}
+
+bool OsHwMITestAccess::monitorEndedWithin(unsigned long seconds) {
+    return myoshwmi.driveMonitorEnded_.wait(seconds);
+}
+
+void OsHwMITestAccess::stopMonitor() {
+    HardDriveNodeUpdate = true;
+    myoshwmi.stopHardDriveMonitor();
+}
+
+}  // namespace IC
+
+namespace {
+
+bool refusing = false;
+
+std::string pathOf(const IC::Node& node) {
+    IC::PropertyValue path;
+    node.getProperty(IC::HardDriveNode::devicePath, path);
+    return std::string(path);
+}
+
+unsigned long long numberOf(const IC::Node& node, unsigned int id) {
+    IC::PropertyValue value;
+    EXPECT_EQ(node.getProperty(id, value).getStatus(), 0) << "property " << id;
+    EXPECT_NE(value.asNumber(), nullptr) << "property " << id;
+    return value.asNumber() != nullptr ? value.asNumber()->toUnsigned64() : 0;
+}
+
+std::vector<Seen> look(unsigned int type, unsigned int sizeProperty) {
+    std::vector<Seen> seen;
+    for (const auto& node : IC::myoshwmi.holdAll()) {
+        if (node->nodeType() == type) {
+            seen.push_back(
+                {node->getNodeId(), node->getIndex(), pathOf(*node), numberOf(*node, sizeProperty)});
+        }
+    }
+    return seen;
+}
+
+}  // namespace
+
+std::string listing(const std::string& name) {
+    const std::string path = testsDirectory() + "/storage/listings/" + name + ".txt";
+    std::ifstream file(path);
+    if (!file) {
+        throw std::runtime_error("no such listing: " + path);
+    }
+    std::ostringstream text;
+    text << file.rdbuf();
+    return text.str();
+}
+
+std::vector<std::string> withoutPropertyLines(const std::vector<std::string>& messages) {
+    std::vector<std::string> kept;
+    for (const std::string& message : messages) {
+        if (message.find("::setProperty: ") == std::string::npos &&
+            message.find("::getProperty: ") == std::string::npos) {
+            kept.push_back(message);
+        }
+    }
+    return kept;
+}
+
+void StorageHost::setUpHost(FakeHost&) {
+    IC::OsHwMITestAccess::plantDiskController(kControllerId);
+    IC::myoshwmi.setLoadCallBack(
+        [](IC::Node* const& node, const void*) -> IC::Error {
+            if (refusing) {
+                return {1, IC::Number(), "the agent is full"};
+            }
+            diary().push_back("published " + pathOf(*node));
+            return {};
+        },
+        nullptr, nullptr);
+    IC::myoshwmi.setWithdrawCallBack(
+        [](const IC::Node& node, const void*) { diary().push_back("withdrawn " + pathOf(node)); }, nullptr);
+}
+
+void StorageHost::tearDownHost(FakeHost&) {
+    IC::OsHwMITestAccess::stopMonitor();
+    shell_stub::failWhen({});
+    shell_stub::beforeEach({});
+    IC::myoshwmi.ManagementInterface::unload();
+}
+
+std::vector<Seen> StorageHost::drives() {
+    return look(IC::NodeType::hardDrive, IC::HardDriveNode::driveSize);
+}
+
+std::vector<Seen> StorageHost::partitions() {
+    return look(IC::NodeType::partition, IC::DiskPartition::partitionBlocks);
+}
+
+std::vector<std::shared_ptr<IC::MutableNode>> StorageHost::nodesOfType(unsigned int type) {
+    auto nodes = IC::myoshwmi.holdAll();
+    std::erase_if(nodes, [type](const auto& node) { return node->nodeType() != type; });
+    return nodes;
+}
+
+std::vector<std::string>& StorageHost::diary() {
+    static std::vector<std::string> entries;
+    return entries;
+}
+
+void StorageHost::agentRefuses() {
+    refusing = true;
+}

@@ -1,0 +1,9 @@
+corvista_test(storage SOURCES
+  storage/drive_monitor_test.cpp
+  storage/drive_nodes_test.cpp
+  storage/layout_comparison_test.cpp
+  storage/partition_nodes_test.cpp
+  storage/rebuild_stress_test.cpp
+  storage/shell_stub.cpp
+  storage/storage_host.cpp
+  LIBRARIES plugin_code test_support LABELS threads)
