@@ -7,8 +7,8 @@
 
 #include <cerrno>
 
-#include "tests/network/command_lines.h"
 #include "tests/network/recording.h"
+#include "tests/support/command_lines.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"

@@ -4,7 +4,7 @@
 
 #include "network/link_queries.h"
 #include "network/port_type.h"
-#include "tests/network/command_lines.h"
+#include "tests/support/command_lines.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"

@@ -1,7 +1,7 @@
 #include "network/ipv6_writer.h"
 
-#include "tests/network/command_lines.h"
 #include "tests/network/killed_writer.h"
+#include "tests/support/command_lines.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"

@@ -2,7 +2,7 @@
 
 #include <gmock/gmock.h>
 
-#include "tests/network/command_lines.h"
+#include "tests/support/command_lines.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"

@@ -3,8 +3,8 @@
 #include <gmock/gmock.h>
 
 #include "network/dhcp_queries.h"
-#include "tests/network/command_lines.h"
 #include "tests/network/recording.h"
+#include "tests/support/command_lines.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"

@@ -4,8 +4,8 @@
 
 #include "mi/globals.h"
 #include "tests/network/bonding_files.h"
-#include "tests/network/command_lines.h"
 #include "tests/network/plugin_access.h"
+#include "tests/support/command_lines.h"
 #include "tests/support/log_capture.h"
 
 namespace {

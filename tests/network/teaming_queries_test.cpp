@@ -1,7 +1,7 @@
 #include "network/teaming_queries.h"
 
 #include "tests/network/bonding_files.h"
-#include "tests/network/command_lines.h"
+#include "tests/support/command_lines.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"
 

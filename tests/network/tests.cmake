@@ -1,6 +1,5 @@
 corvista_test(network_config SOURCES
   network/bonding_status_test.cpp
-  network/command_lines.cpp
   network/dns_test.cpp
   network/esx_test.cpp
   network/interface_file_test.cpp
@@ -14,7 +13,6 @@ corvista_test(network_config SOURCES
 
 corvista_test(network_queries SOURCES
   network/address_queries_test.cpp
-  network/command_lines.cpp
   network/interface_lists_test.cpp
   network/kernel_network_test.cpp
   network/link_queries_test.cpp

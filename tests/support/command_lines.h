@@ -4,7 +4,7 @@
 #include <vector>
 
 /// While it lives, keeps the command lines that the code under test gives to the shell, in order and as they
-/// are written, pipelines included. They run all the same.
+/// are written, pipelines included. They run all the same. One at a time; the code may use any thread.
 class CommandLines {
 public:
     CommandLines();
@@ -12,10 +12,6 @@ public:
     CommandLines(const CommandLines&) = delete;
     CommandLines& operator=(const CommandLines&) = delete;
 
-    const std::vector<std::string>& all() const { return lines_; }
-    void clear() { lines_.clear(); }
-
-private:
-    friend void rememberCommandLine(const char* line);
-    std::vector<std::string> lines_;
+    std::vector<std::string> all() const;
+    void clear();
 };

@@ -1,0 +1,80 @@
+#include "tests/support/command_lines.h"
+
+#include <dlfcn.h>
+
+#include <cerrno>
+#include <cstdio>
+#include <mutex>
+
+#include "tests/support/no_descriptors.h"
+
+namespace {
+
+/// What the stand-in for popen does beside its work.
+struct Watch {
+    std::mutex guard;
+    bool remembers = false;
+    bool refuses = false;
+    std::vector<std::string> lines;
+};
+
+Watch& watch() {
+    static Watch only;
+    return only;
+}
+
+/// @return whether the command may run
+bool note(const char* line) {
+    const std::lock_guard lock(watch().guard);
+    if (watch().remembers) {
+        watch().lines.emplace_back(line);
+    }
+    return !watch().refuses;
+}
+
+void refuse(bool on) {
+    const std::lock_guard lock(watch().guard);
+    watch().refuses = on;
+}
+
+}  // namespace
+
+CommandLines::CommandLines() {
+    const std::lock_guard lock(watch().guard);
+    watch().lines.clear();
+    watch().remembers = true;
+}
+
+CommandLines::~CommandLines() {
+    const std::lock_guard lock(watch().guard);
+    watch().remembers = false;
+}
+
+std::vector<std::string> CommandLines::all() const {
+    const std::lock_guard lock(watch().guard);
+    return watch().lines;
+}
+
+void CommandLines::clear() {
+    const std::lock_guard lock(watch().guard);
+    watch().lines.clear();
+}
+
+NoDescriptors::NoDescriptors() {
+    refuse(true);
+}
+
+NoDescriptors::~NoDescriptors() {
+    refuse(false);
+}
+
+// Stands in front of the C library's for the code in this program.
+extern "C" __attribute__((visibility("default"))) FILE* popen(const char* line, const char* mode) {
+    using Popen = FILE* (*)(const char*, const char*);
+    static const auto next = reinterpret_cast<Popen>(dlsym(RTLD_NEXT, "popen"));
+    if (!note(line)) {
+        errno = EMFILE;
+        return nullptr;
+    }
+    return next(line, mode);
+}
