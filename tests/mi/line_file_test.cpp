@@ -1,5 +1,10 @@
 #include "mi/line_file.h"
 
+#include <sys/mount.h>
+#include <sys/stat.h>
+
+#include <filesystem>
+
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 
@@ -101,13 +106,72 @@ HOST_TEST(LineFile, SaysWhenAFileCannotBeOpenedForWriting) {
     EXPECT_EQ(host.read("/etc/keep/file"), "old\n");
 }
 
-HOST_TEST(LineFile, LeavesTheOldFileWhenTheDiskIsFull) {
+/// A file of that many bytes that finds no room.
+void expectNoRoom(FakeHost& host, const char* path, std::size_t bytes) {
+    LineFile file;
+    file.append(std::string(bytes - 1, 'n') + "\n");
+    LogCapture capture;
+    EXPECT_EQ(file.replace(path), LineFile::Written::notWhole);
+    EXPECT_TRUE(file.write(path)) << "a writer that goes on either way takes it for opened";
+    const std::string line = std::string("Could not write all of '") + path + "'.";
+    EXPECT_EQ(capture.messages(6000), (std::vector<std::string>{line, line}));
+    EXPECT_EQ(host.read(path), "old\n");
+}
+
+HOST_TEST(LineFile, LeavesTheOldFileWhenAFullDiskCannotEvenOpenIt) {
     host.file("/etc/full/file", "old\n");
     host.fullDisk("/etc/full");
+    expectNoRoom(host, "/etc/full/file", 100000);
+}
+
+HOST_TEST(LineFile, LeavesTheOldFileWhenTheDiskHasNoRoomForALongerOne) {
+    host.directory("/etc/small");
+    ASSERT_EQ(mount("small", "/etc/small", "tmpfs", 0, "size=16k"), 0);
+    host.file("/etc/small/file", "old\n");
+    expectNoRoom(host, "/etc/small/file", 20000);
+    LineFile shorter;
+    shorter.append("new\n");
+    EXPECT_EQ(shorter.replace("/etc/small/file"), LineFile::Written::whole);
+    EXPECT_EQ(host.read("/etc/small/file"), "new\n");
+}
+
+HOST_TEST(LineFile, SaysWhenAFileThatCannotReserveRoomEndsHalfWay) {
     LineFile file;
-    file.append(std::string(100000, 'n') + "\n");
-    EXPECT_EQ(file.replace("/etc/full/file"), LineFile::Written::notWhole);
-    EXPECT_EQ(host.read("/etc/full/file"), "old\n");
+    file.append("new\n");
+    LogCapture capture;
+    EXPECT_EQ(file.replace("/dev/full"), LineFile::Written::notWhole);
+    EXPECT_EQ(capture.messages(6000), std::vector<std::string>{"Could not write all of '/dev/full'."});
+}
+
+HOST_TEST(LineFile, KeepsTheFilesRightsAndLinksAndCutsALongerOne) {
+    host.file("/etc/real", std::string(9000, 'o'), 0640);
+    host.symlink("/etc/link", "real");
+    LineFile file;
+    file.append("new\n");
+    EXPECT_EQ(file.replace("/etc/link"), LineFile::Written::whole);
+    EXPECT_EQ(host.read("/etc/real"), "new\n");
+    struct stat after {};
+    ASSERT_EQ(lstat("/etc/real", &after), 0);
+    EXPECT_EQ(after.st_mode, S_IFREG | 0640U);
+    EXPECT_TRUE(std::filesystem::is_symlink("/etc/link"));
+}
+
+HOST_TEST(LineFile, DoesNotTakeWhatCannotBeReadForAnEmptyFile) {
+    host.directory("/etc/file");
+    EXPECT_FALSE(LineFile::read("/etc/file"));
+}
+
+HOST_TEST(LineFile, EndsALastLineWithoutLineBreak) {
+    for (const char* content : {"first\nlast", "first\nlast\n"}) {
+        host.file("/etc/file", content);
+        auto file = LineFile::read("/etc/file");
+        ASSERT_TRUE(file);
+        file->endLastLine();
+        EXPECT_EQ(file->lines(), (std::vector<std::string>{"first\n", "last\n"}));
+    }
+    LineFile none;
+    none.endLastLine();
+    EXPECT_TRUE(none.lines().empty());
 }
 
 }  // namespace
