@@ -5,6 +5,7 @@ corvista_test(framework LABELS threads SOURCES
   framework/event_test.cpp
   framework/log_test.cpp
   framework/management_interface_test.cpp
+  framework/netinfo_test.cpp
   framework/node_test.cpp
   framework/number_test.cpp
   framework/property_file_test.cpp
@@ -12,4 +13,5 @@ corvista_test(framework LABELS threads SOURCES
   framework/slots_test.cpp
   framework/stress_test.cpp
   framework/strings_test.cpp
-  framework/thread_test.cpp)
+  framework/thread_test.cpp
+  LIBRARIES test_support)
