@@ -1,0 +1,12 @@
+corvista_test(hosttools LIBRARIES hosttools SOURCES
+  hosttools/disks_test.cpp
+  hosttools/fdisk_listing_test.cpp
+  hosttools/fdisk_tool_test.cpp
+  hosttools/files_test.cpp
+  hosttools/host_tree.cpp
+  hosttools/partition_table_test.cpp
+  hosttools/process.cpp
+  hosttools/text_test.cpp)
+target_compile_definitions(hosttools_test PRIVATE
+  HOSTTOOLS_BIN="$<TARGET_FILE_DIR:corvista-hosttools>/bin" HOSTTOOLS_RECORDINGS="${CMAKE_CURRENT_LIST_DIR}")
+add_dependencies(hosttools_test corvista-hosttools)
