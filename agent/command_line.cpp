@@ -49,10 +49,33 @@ void addJson(CLI::App& command, Options& options) {
     command.add_flag("--json", options.json, "Print JSON");
 }
 
-/// Values are taken as they stand: "[a,b]" is one value, not two.
-CLI::Option* addWords(CLI::App& command, const char* name, std::vector<std::string>& words,
-                      const char* help) {
-    return command.add_option(name, words, help)->type_name("")->allow_extra_args(false);
+// The parser would take a word in brackets apart ("[a,b]"); a mark in front keeps it whole.
+constexpr char kMark = '\x01';
+
+std::vector<std::string> marked(int count, const char* const* words) {
+    std::vector<std::string> all;
+    for (int i = count - 1; i > 0; --i) {  // the parser takes them from the back
+        const std::string word = words[i];
+        all.push_back(word.starts_with('[') || word.starts_with(kMark) ? kMark + word : word);
+    }
+    return all;
+}
+
+void unmark(std::string& word) {
+    if (word.starts_with(kMark)) {
+        word.erase(0, 1);
+    }
+}
+
+void unmark(Options& options) {
+    for (std::vector<std::string>* list : {&options.values, &options.properties}) {
+        for (std::string& word : *list) {
+            unmark(word);
+        }
+    }
+    for (std::string* word : {&options.node, &options.property, &options.nodeClass}) {
+        unmark(*word);
+    }
 }
 
 void addReaders(CLI::App& app, Options& options) {
@@ -63,8 +86,9 @@ void addReaders(CLI::App& app, Options& options) {
 
     CLI::App* get = app.add_subcommand("get", "Read a node's properties now");
     get->add_option("NODE", options.node, kNodeHelp)->required()->type_name("");
-    addWords(*get, "PROPERTY", options.properties,
-             "Numbers or names of properties; all known ones when none is named");
+    get->add_option("PROPERTY", options.properties,
+                    "Numbers or names of properties; all known ones when none is named")
+        ->type_name("");
     addJson(*get, options);
     get->callback([&options] { options.command = Command::get; });
 
@@ -84,7 +108,9 @@ void addSet(CLI::App& app, Options& options) {
     set->add_option("PROPERTY", options.property, "Number or name of the property")
         ->required()
         ->type_name("");
-    addWords(*set, "VALUE", options.values, "The new value; several for a list, \"\" empties it")->required();
+    set->add_option("VALUE", options.values, "The new value; several for a list, \"\" empties it")
+        ->required()
+        ->type_name("");
     set->add_flag("-y,--yes", options.yes, "Do not ask before the host is restarted or halted");
     addJson(*set, options);
     set->footer(
@@ -127,7 +153,8 @@ std::optional<Options> parseCommandLine(int count, const char* const* words, int
     addSet(app, options);
     addOffline(app, options);
     try {
-        app.parse(count, words);
+        app.parse(marked(count, words));
+        unmark(options);
         return options;
     } catch (const CLI::Success& help) {
         status = app.exit(help);

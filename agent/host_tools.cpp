@@ -113,8 +113,8 @@ std::optional<std::string> adapterDirectory() {
     return built ? built : besideProgram({"../lib/corvista"}, "hosttools");
 }
 
-std::vector<ToolReport> inspectHostTools(HostTools choice, Look look) {
-    const std::optional<std::string> adapters = adapterDirectory();
+std::vector<ToolReport> inspectHostTools(HostTools choice, Look look,
+                                         const std::optional<std::string>& adapters) {
     std::vector<ToolReport> reports;
     for (const Tool& tool : kTools) {
         if (look == Look::everything || tool.classic != nullptr) {
@@ -137,10 +137,11 @@ void putAdaptersFirst(const std::vector<ToolReport>& reports, const std::string&
     const auto unwanted = [](const ToolReport& report) {
         return !report.useAdapter && !report.adapter.empty();
     };
-    if (std::none_of(reports.begin(), reports.end(), used)) {
+    const auto first = std::find_if(reports.begin(), reports.end(), used);
+    if (first == reports.end()) {
         return;
     }
-    std::string directory = adapterDirectory().value_or("");
+    std::string directory = fs::path(first->adapter).parent_path();
     if (std::any_of(reports.begin(), reports.end(), unwanted)) {
         directory = linkDirectory;
         makeLinks(reports, directory);

@@ -28,7 +28,9 @@ enum class Look { adapters, everything };
 
 /// Looks for the tools on PATH. Those that there are adapters for are run once, side by side, to see which
 /// format they print; they are asked for what changes nothing. Forced choices run nothing.
-std::vector<ToolReport> inspectHostTools(HostTools choice, Look look);
+/// @param adapters where the adapters are; nothing when there are none
+std::vector<ToolReport> inspectHostTools(HostTools choice, Look look,
+                                         const std::optional<std::string>& adapters);
 
 /// Puts the adapters that are to be used in front of PATH.
 /// @param linkDirectory where links to some of the adapters are put when not all of them are used

@@ -76,12 +76,12 @@ Plugin::~Plugin() {
 }
 
 void Plugin::load() {
-    const bool isPath = file_.find('/') != std::string::npos;
-    const std::string path = !isPath && std::filesystem::exists(file_) ? "./" + file_ : file_;
     std::error_code ignored;
-    if (path.find('/') != std::string::npos && !std::filesystem::exists(path, ignored)) {
+    if (!std::filesystem::exists(file_, ignored)) {
         fail("there is no plug-in file " + inQuotes(file_) + "; name the right one with --plugin FILE");
     }
+    // Without a slash the loader would look at its own places.
+    const std::string path = file_.find('/') == std::string::npos ? "./" + file_ : file_;
     library_ = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
     if (library_ == nullptr) {
         const char* reason = dlerror();

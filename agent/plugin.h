@@ -7,8 +7,8 @@
 
 namespace cvagent {
 
-/// The plug-in beside this program: in its build tree or where it was installed. A bare library name, left to
-/// the system's loader, when there is none.
+/// The plug-in beside this program: in its build tree or where it was installed. The library's bare name when
+/// it is at neither place.
 std::string pluginBesideProgram();
 
 /// A loaded and initialized plug-in. It knows the plug-in by OpenMI and by the exported builder of processor

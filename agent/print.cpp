@@ -184,6 +184,10 @@ void complain(const std::string& text) {
     [[maybe_unused]] const ssize_t written = write(messageDescriptor(), shown.data(), shown.size());
 }
 
+void ask(const std::string& question) {
+    [[maybe_unused]] const ssize_t written = write(messageDescriptor(), question.data(), question.size());
+}
+
 std::string valueText(const std::optional<Property>& property, const IC::PropertyValue& value) {
     if (value.empty()) {
         return "not known";

@@ -33,6 +33,8 @@ std::string inQuotes(const std::string& text);
 void print(const std::string& text);
 /// One message of the program to the standard error it was started with.
 void complain(const std::string& text);
+/// A question, in the same place; the answer is typed behind it.
+void ask(const std::string& question);
 
 /// A value for people: with its unit, its label, a size in GB and GiB.
 /// @param property its row of the catalogue; none for a property that is not in it

@@ -39,11 +39,12 @@ std::string errorText(const IC::Error& error) {
 }
 
 Reading readProperty(const IC::MutableNode& node, unsigned int id) {
-    Reading reading{id, findProperty(node.nodeType(), id), {}, {}};
+    Reading reading{id, findProperty(node.nodeType(), id), {}, {}, false};
     try {
         const IC::Error result = node.getProperty(id, reading.value);
         if (result.getStatus() != 0) {
             reading.error = errorText(result);
+            reading.missing = result.text() == "no such property: " + std::to_string(id);
         }
     } catch (const std::exception& exception) {
         reading.error = std::string("the plug-in threw: ") + exception.what();
@@ -62,7 +63,7 @@ std::vector<Reading> readProperties(const IC::MutableNode& node, const std::vect
 std::vector<Reading> storedReadings(const IC::MutableNode& node) {
     std::vector<Reading> readings;
     for (const auto& [id, value] : storedProperties(node)) {
-        readings.push_back({id, findProperty(node.nodeType(), id), value, {}});
+        readings.push_back({id, findProperty(node.nodeType(), id), value, {}, false});
     }
     return readings;
 }

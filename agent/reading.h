@@ -14,7 +14,8 @@ struct Reading {
     unsigned int id = 0;
     std::optional<Property> row;  ///< none: the catalogue does not know the property
     IC::PropertyValue value;
-    std::string error;  ///< empty when the read succeeded
+    std::string error;     ///< empty when the read succeeded
+    bool missing = false;  ///< it failed because the node has no such property
 
     bool failed() const { return !error.empty(); }
     std::string name() const { return row ? row->name : std::to_string(id); }

@@ -11,7 +11,8 @@ Session::Session(const Options& options, Listener* listener)
     hintAtRoot(data_);
     prepareSurroundings();
     if (options.hostTools != HostTools::native) {
-        putAdaptersFirst(inspectHostTools(options.hostTools, Look::adapters), data_.path() + "host-tools");
+        putAdaptersFirst(inspectHostTools(options.hostTools, Look::adapters, adapterDirectory()),
+                         data_.path() + "host-tools");
     }
     StopSignals::install();
     try {

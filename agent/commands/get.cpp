@@ -63,7 +63,7 @@ std::string listing(const IC::MutableNode& node, const std::vector<Reading>& rea
         const std::string id = std::to_string(reading.id);
         text += "  " + style.faint(std::string(id.size() < 5 ? 5 - id.size() : 0, ' ') + id) + "  " +
                 padded(reading.name(), width) + "  ";
-        text += reading.failed() ? style.bad("not known: " + printable(reading.error))
+        text += reading.failed() ? style.bad("not known (" + printable(reading.error) + ")")
                                  : valueText(reading.row, reading.value);
         text += "\n";
     }
@@ -73,11 +73,8 @@ std::string listing(const IC::MutableNode& node, const std::vector<Reading>& rea
 /// Properties that were asked for by name must all be there. In a listing of everything a host may well not
 /// know some.
 ExitStatus verdict(const IC::MutableNode& node, const std::vector<Reading>& readings, bool named) {
-    const Properties stored = storedProperties(node);
     const auto failed = [](const Reading& reading) { return reading.failed(); };
-    const auto unknown = [&stored](const Reading& reading) {
-        return reading.failed() && !reading.row && !stored.contains(reading.id);
-    };
+    const auto unknown = [](const Reading& reading) { return reading.missing && !reading.row; };
     if (named && std::any_of(readings.begin(), readings.end(), unknown)) {
         complain("there is no such property; see: cvagent properties " + className(node.nodeType()));
         return ExitStatus::notFound;

@@ -64,7 +64,7 @@ void confirmPower(const IC::MutableNode& node, const Property& row, const IC::Pr
     if (isatty(STDIN_FILENO) != 1) {
         throw Failure(ExitStatus::usage, "this would " + what + " the host; add --yes to do it");
     }
-    std::cerr << "This will " << what << " the host at once. Go on? [y/N] " << std::flush;
+    ask("This will " + what + " the host at once. Go on? [y/N] ");
     std::string answer;
     std::getline(std::cin, answer);
     if (answer != "y" && answer != "Y" && answer != "yes") {
@@ -83,7 +83,7 @@ IC::Error write(IC::MutableNode& node, const Property& row, const IC::PropertyVa
 }
 
 std::string shown(const Reading& reading) {
-    return reading.failed() ? "not known: " + printable(reading.error)
+    return reading.failed() ? "not known (" + printable(reading.error) + ")"
                             : valueText(reading.row, reading.value);
 }
 
@@ -102,7 +102,7 @@ void hintAtDifference(const Property& row, const IC::PropertyValue& written, con
 }
 
 void writeOnly(const IC::MutableNode& node, const Property& row, const Options& options, const Style& style) {
-    const Reading none{row.id, row, {}, "can only be written"};
+    const Reading none{row.id, row, {}, "can only be written", false};
     print(options.json ? json::change(node, none, none)
                        : style.strong(printable(node.getPath())) + "\n  " + row.name + "\n    done\n");
 }

@@ -1,0 +1,229 @@
+// A plug-in small enough to know all of: a tree of a few nodes, properties that are slow, failing or
+// throwing, and threads that publish, withdraw and alert. FAKE_PLUGIN, a list of words, tells it what to do
+// besides:
+//   fail, null, throw       OpenMI returns 7, hands out nothing, throws
+//   badstart, throwstart    initialize fails, throws
+//   slow                    initialize takes half a second
+//   errors                  initialize logs errors
+//   churn                   a thread publishes and withdraws drives until unload
+//   alert                   a thread sends one alert
+// FAKE_PLUGIN_DIARY names a file that gets a line for each write and for the unload.
+#include <atomic>
+#include <chrono>
+#include <cstdlib>
+#include <fstream>
+#include <stdexcept>
+#include <string>
+#include <thread>
+
+#include "framework/cvlog/logger.h"
+#include "framework/ic/management_interface.h"
+
+namespace {
+
+using IC::Error;
+using IC::Number;
+using IC::PropertyValue;
+
+bool told(const std::string& word) {
+    const char* words = std::getenv("FAKE_PLUGIN");
+    return words != nullptr && (" " + std::string(words) + " ").find(" " + word + " ") != std::string::npos;
+}
+
+void note(const std::string& line) {
+    if (const char* file = std::getenv("FAKE_PLUGIN_DIARY")) {
+        std::ofstream(file, std::ios::app) << line << std::endl;
+    }
+}
+
+void logError(const std::string& message) {
+    static const std::string component = "Fake";
+    CVLog::CVLogger::logLevelMessage("fake", "fake_plugin", 1, component, 6000, nullptr, 0, 0, message);
+    CVLog::CVLogger::traceLevelMessage("fake", "fake_plugin", 1, component, 6000, nullptr, 0, 0, message);
+}
+
+/// 900 is slow, 901 fails and logs, 902 throws; 115 writes with an error line, 116 does not write.
+class FakeNode : public IC::MutableNode {
+public:
+    using MutableNode::MutableNode;
+
+    Error getProperty(unsigned int id, PropertyValue& out) const override {
+        switch (id) {
+            case 900:
+                std::this_thread::sleep_for(std::chrono::milliseconds(200));
+                out = PropertyValue("slow", true);
+                return {};
+            case 901:
+                logError("no answer from the host");
+                return {1, Number(), "the host does not answer"};
+            case 902:
+                throw std::runtime_error("thrown by the plug-in");
+            default:
+                return MutableNode::getProperty(id, out);
+        }
+    }
+    Error setProperty(const unsigned int& id, const PropertyValue& value) override {
+        if (!ready) {
+            return MutableNode::setProperty(id, value);
+        }
+        note(std::to_string(id) + "=" + static_cast<std::string>(value));
+        if (id == 115) {
+            logError("the disk is nearly full");
+        }
+        if (id == 116) {
+            return {1, Number(), "the disk is full"};
+        }
+        return MutableNode::setProperty(id, value);
+    }
+
+    static std::atomic<bool> ready;
+};
+std::atomic<bool> FakeNode::ready{false};
+
+class FakeInterface : public IC::ManagementInterface {
+public:
+    Error initialize(unsigned int miId, const Number& ownNodeId, const Number& firstNodeId) override {
+        note("initialize " + std::to_string(miId) + " " + ownNodeId.toString() + " " +
+             firstNodeId.toString());
+        const Error result = ManagementInterface::initialize(miId, ownNodeId, firstNodeId);
+        if (told("throwstart")) {
+            throw std::runtime_error("cannot start");
+        }
+        build();
+        if (told("slow")) {
+            note("slow");
+            std::this_thread::sleep_for(std::chrono::milliseconds(500));
+        }
+        if (told("errors")) {
+            logError("first error");
+            logError("second error");
+            logError("second error");
+        }
+        FakeNode::ready = true;
+        running_ = true;
+        if (told("churn")) {
+            churn_ = std::thread([this] { churn(); });
+        }
+        if (told("alert")) {
+            alert_ = std::thread([this] { alert(); });
+        }
+        return told("badstart") ? Error(1, Number(), "no host here") : result;
+    }
+
+    Error unload() override {
+        running_ = false;
+        for (std::thread* thread : {&churn_, &alert_}) {
+            if (thread->joinable()) {
+                thread->join();
+            }
+        }
+        FakeNode::ready = false;
+        note("unload");
+        return ManagementInterface::unload();
+    }
+
+    /// What the exported builder makes: one processor.
+    void addProcessor() {
+        auto* processor = make(planar_, 4, 1, "Processor");
+        processor->MutableNode::setProperty(80, PropertyValue(Number(2400U), true));
+        appendNode(processor);
+    }
+
+private:
+    FakeNode* make(unsigned int parent, unsigned int type, unsigned int index,
+                   const std::string& description) {
+        const unsigned int id = type == 38 ? ownNodeId() : takeNodeId();
+        auto* node = new FakeNode(id, parent, miIds(), type, index);
+        node->setStatus(1);
+        node->setDescription(description);
+        return node;
+    }
+    unsigned int add(FakeNode* node) {
+        appendNode(node);
+        return node->getNodeId();
+    }
+    FakeNode* makeDrive(const std::string& device) {
+        auto* drive = make(disks_, 11, 0, "Hard Drive");
+        drive->MutableNode::setProperty(89, PropertyValue(device, true));
+        drive->MutableNode::setProperty(37, PropertyValue(Number(80026361ULL), true));
+        return drive;
+    }
+
+    void build() {
+        const unsigned int top = add(make(0, 38, 0, "OsHw Management Interface"));
+        const unsigned int root = add(make(top, 59, 0, "ROOT Node"));
+        auto* computer = make(root, 40, 0, "Computer");
+        computer->setProperty(108, PropertyValue("fake", true));
+        computer->setProperty(115, PropertyValue("", true));
+        computer->setProperty(123, PropertyValue(IC::EnumValue(1), true));
+        computer->setProperty(127, PropertyValue(Number(-210.0), true));
+        const unsigned int chassis = add(make(add(computer), 1, 0, ""));
+        planar_ = add(make(chassis, 41, 0, "Planar"));
+        disks_ = add(make(planar_, 50, 1, "Disk Controller"));
+        add(makeDrive("/dev/sda"));
+        const unsigned int network = add(make(chassis, 49, 0, "Network Controller"));
+        auto* port = make(network, 12, 1, "Network Port");
+        port->setProperty(108, PropertyValue("eth0", true));
+        port->setProperty(57, PropertyValue(Number(1000000ULL), true));
+        port->setProperty(123, PropertyValue(Number(12U), true));
+        auto* ip = make(add(port), 29, 1, "IP Configuration");
+        ip->setProperty(108, PropertyValue("eth0", true));
+        ip->setProperty(24, PropertyValue(IC::EnumValue(3), true));
+        ip->setProperty(94, PropertyValue(std::vector<std::string>{"192.0.2.53"}, true));
+        ip->setProperty(125, PropertyValue(std::vector<Number>{Number(0U), Number(1U), Number(12U)}, true));
+        add(ip);
+    }
+
+    void churn() {
+        while (running_) {
+            FakeNode* drive = makeDrive("/dev/sdb");
+            addNewNode(drive);
+            std::this_thread::sleep_for(std::chrono::milliseconds(1));
+            deleteNode(drive);
+        }
+    }
+
+    void alert() {
+        std::this_thread::sleep_for(std::chrono::milliseconds(50));
+        std::string path;
+        for (const auto& node : holdAll()) {
+            path = node->nodeType() == 12 ? node->getPath() : path;
+        }
+        const auto [handler, context] = alertHandler();
+        if (handler != nullptr) {
+            handler({IC::Alert(1, 0, {path}, 12, "NIC is Offline ")}, context);
+        }
+    }
+
+    unsigned int planar_ = 0;
+    unsigned int disks_ = 0;
+    std::atomic<bool> running_{false};
+    std::thread churn_;
+    std::thread alert_;
+};
+
+FakeInterface fakeInterface;
+Error fakeError;
+
+}  // namespace
+
+extern "C" __attribute__((visibility("default"))) int OpenMI(IC::ManagementInterface** mi, Error** error) {
+    if (told("throw")) {
+        throw std::runtime_error("not today");
+    }
+    if (told("fail")) {
+        fakeError = Error(1, Number(), "not licensed");
+        *error = &fakeError;
+        return 7;
+    }
+    *mi = told("null") ? nullptr : &fakeInterface;
+    *error = &fakeError;
+    return 0;
+}
+
+// The agent asks for the builder of processor nodes by its linker name.
+extern "C" __attribute__((visibility("default"))) void createProcessors(IC::ManagementInterface* mi) __asm__(
+    "_ZN2IC6OsHwMI14createCpuNodesEv");
+extern "C" void createProcessors(IC::ManagementInterface* mi) {
+    static_cast<FakeInterface*>(mi)->addProcessor();
+}

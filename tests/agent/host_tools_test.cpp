@@ -1,0 +1,156 @@
+#include "agent/host_tools.h"
+
+#include <gmock/gmock.h>
+
+#include <cstdlib>
+
+#include "agent/probe.h"
+#include "tests/support/fake_host.h"
+
+namespace {
+
+using cvagent::HostTools;
+using cvagent::inspectHostTools;
+using cvagent::Look;
+using cvagent::ToolReport;
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+constexpr const char* kAdapters = "/opt/adapters";
+
+/// A host with programs in the adapters' directory; they are never run here.
+void installAdapters(FakeHost& host) {
+    for (const std::string name : {"ifconfig", "route", "fdisk"}) {
+        host.file(std::string(kAdapters) + "/" + name, "#!/bin/sh\n", 0755);
+    }
+}
+
+std::vector<std::string> adapted(const std::vector<ToolReport>& reports) {
+    std::vector<std::string> names;
+    for (const ToolReport& report : reports) {
+        if (report.useAdapter) {
+            names.push_back(report.tool);
+        }
+    }
+    return names;
+}
+
+const std::string kClassicIfconfig = "lo        Link encap:Local Loopback  \n";
+const std::string kModernIfconfig = "lo: flags=73<UP,LOOPBACK,RUNNING>  mtu 65536\n";
+const std::string kRoute = "Kernel IP routing table\n";
+const std::string kDisks = "\nDisk /dev/sda: 80.0 GB, 80026361856 bytes\n";
+
+HOST_TEST(HostTools, ThatSpeakTheClassicFormatsStay) {
+    installAdapters(host);
+    host.tool("ifconfig lo", kClassicIfconfig);
+    host.tool("route -n", kRoute);
+    host.tool("fdisk -ls", kDisks);
+    EXPECT_THAT(adapted(inspectHostTools(HostTools::automatic, Look::adapters, kAdapters)), IsEmpty());
+}
+
+HOST_TEST(HostTools, ThatSpeakAnotherFormatAreReplacedOneByOne) {
+    installAdapters(host);
+    host.tool("ifconfig lo", kModernIfconfig);
+    host.tool("route -n", kRoute);
+    host.tool("fdisk -ls", {"", 1, "fdisk: bad usage\n"});
+    const auto reports = inspectHostTools(HostTools::automatic, Look::adapters, kAdapters);
+    EXPECT_THAT(adapted(reports), ElementsAre("ifconfig", "fdisk"));
+    EXPECT_EQ(reports[0].used(), "/opt/adapters/ifconfig");
+    EXPECT_EQ(reports[1].used(), "/tools/route");
+    EXPECT_FALSE(reports[2].classic);
+}
+
+HOST_TEST(HostTools, ThatAreMissingAreReplaced) {
+    installAdapters(host);
+    EXPECT_THAT(adapted(inspectHostTools(HostTools::automatic, Look::adapters, kAdapters)),
+                ElementsAre("ifconfig", "route", "fdisk"));
+}
+
+HOST_TEST(HostTools, WithoutAdaptersTheHostsOwnAreUsed) {
+    host.tool("ifconfig lo", kModernIfconfig);
+    const auto reports = inspectHostTools(HostTools::automatic, Look::adapters, std::nullopt);
+    EXPECT_THAT(adapted(reports), IsEmpty());
+    EXPECT_EQ(reports[0].used(), "/tools/ifconfig");
+    EXPECT_TRUE(reports[1].missing());
+}
+
+HOST_TEST(HostTools, AHostWithoutDisksHasAClassicFdisk) {
+    installAdapters(host);
+    host.tool("fdisk -ls", "");
+    EXPECT_THAT(adapted(inspectHostTools(HostTools::automatic, Look::adapters, kAdapters)),
+                ElementsAre("ifconfig", "route"));
+}
+
+HOST_TEST(HostTools, ForcedChoicesRunNothing) {
+    installAdapters(host);
+    host.tool("ifconfig lo", kClassicIfconfig);
+    EXPECT_THAT(adapted(inspectHostTools(HostTools::native, Look::adapters, kAdapters)), IsEmpty());
+    EXPECT_THAT(adapted(inspectHostTools(HostTools::classic, Look::adapters, kAdapters)),
+                ElementsAre("ifconfig", "route", "fdisk"));
+    EXPECT_THAT(host.calls(), IsEmpty());
+}
+
+HOST_TEST(HostTools, TheAdaptersDirectoryComesFirstWhenAllAreUsed) {
+    installAdapters(host);
+    cvagent::putAdaptersFirst(inspectHostTools(HostTools::classic, Look::adapters, kAdapters), "/tmp/links");
+    EXPECT_EQ(std::string(std::getenv("PATH")), "/opt/adapters:/tools:/usr/sbin:/usr/bin:/sbin:/bin");
+    EXPECT_FALSE(host.exists("/tmp/links"));
+}
+
+HOST_TEST(HostTools, OnlyTheAdaptersInUseComeFirst) {
+    installAdapters(host);
+    host.file("/tmp/links/route", "left from the last start", 0755);
+    host.tool("ifconfig lo", kClassicIfconfig);
+    host.tool("route -n", kRoute);
+    cvagent::putAdaptersFirst(inspectHostTools(HostTools::automatic, Look::adapters, kAdapters),
+                              "/tmp/links");
+    EXPECT_EQ(std::string(std::getenv("PATH")), "/tmp/links:/tools:/usr/sbin:/usr/bin:/sbin:/bin");
+    EXPECT_THAT(host.listDirectory("/tmp/links"), ElementsAre("fdisk"));
+}
+
+HOST_TEST(HostTools, ThePathStaysWhenNoAdapterIsUsed) {
+    cvagent::putAdaptersFirst(inspectHostTools(HostTools::native, Look::adapters, kAdapters), "/tmp/links");
+    EXPECT_EQ(std::string(std::getenv("PATH")), "/tools:/usr/sbin:/usr/bin:/sbin:/bin");
+}
+
+HOST_TEST(HostTools, EverythingIsLookedAtForTheDoctor) {
+    host.tool("ethtool -h", "");
+    const auto reports = inspectHostTools(HostTools::native, Look::everything, std::nullopt);
+    std::map<std::string, const ToolReport*> byName;
+    for (const ToolReport& report : reports) {
+        byName[report.tool] = &report;
+        EXPECT_NE(report.package, "") << report.tool;
+        EXPECT_NE(report.purpose, "") << report.tool;
+    }
+    EXPECT_EQ(byName.at("ethtool")->used(), "/tools/ethtool");
+    EXPECT_TRUE(byName.at("brctl")->missing());
+    EXPECT_EQ(byName.at("brctl")->package, "bridge-utils");
+    EXPECT_EQ(byName.at("md5sum")->used(), "/usr/bin/md5sum");
+}
+
+HOST_TEST(Probe, KillsAProgramThatTakesTooLong) {
+    host.tool("ifconfig lo", {kClassicIfconfig, 0, "", 20000});
+    cvagent::Probe probe({"/tools/ifconfig", "lo"});
+    EXPECT_FALSE(probe.finish(std::chrono::milliseconds(100)));
+}
+
+HOST_TEST(Probe, AMissingProgramIsNoSuccess) {
+    cvagent::Probe probe({"/nowhere"});
+    EXPECT_FALSE(probe.finish(std::chrono::milliseconds(100)));
+    EXPECT_EQ(probe.output(), "");
+}
+
+HOST_TEST(Doctor, TellsWhatIsFoundUsedAndMissing) {
+    host.tool("ifconfig lo", kModernIfconfig);
+    host.tool("route -n", kRoute);
+    const Finished run = host.run({CVAGENT_PROGRAM, "doctor", "--host-tools", "native"});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.out, testing::HasSubstr("/tools/ifconfig (not the classic format)"));
+    EXPECT_THAT(run.out, testing::ContainsRegex("\nroute +/tools/route +the host's own\n"));
+    EXPECT_THAT(run.out,
+                testing::ContainsRegex("\nbrctl +not found +missing: .*install the package bridge-utils\n"));
+    EXPECT_THAT(run.out, testing::HasSubstr("apt-get install bridge-utils ethtool"));
+    EXPECT_FALSE(host.exists("/opt/vantrel"));
+}
+
+}  // namespace

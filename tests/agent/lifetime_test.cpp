@@ -1,0 +1,114 @@
+// Loading and unloading plug-ins again and again, and reading nodes while they come and go.
+#include <gmock/gmock.h>
+
+#include <atomic>
+#include <filesystem>
+#include <thread>
+
+#include "agent/log_output.h"
+#include "agent/plugin.h"
+#include "agent/reading.h"
+#include "agent/surroundings.h"
+#include "agent/tree.h"
+#include "tests/support/fake_host.h"
+
+namespace {
+
+using cvagent::Event;
+using cvagent::Plugin;
+
+std::size_t entries(const std::string& directory) {
+    const std::filesystem::directory_iterator all(directory);
+    return static_cast<std::size_t>(std::distance(begin(all), end(all)));
+}
+
+/// What a process must not gather: threads and descriptors.
+std::pair<std::size_t, std::size_t> holdings() {
+    return {entries("/proc/self/task"), entries("/proc/self/fd")};
+}
+
+/// Counts what it hears.
+class Counter : public cvagent::Listener {
+public:
+    void hear(const Event& event) override {
+        ++(event.kind == Event::Kind::withdrawn ? withdrawn : published);
+    }
+    std::atomic<int> published{0};
+    std::atomic<int> withdrawn{0};
+};
+
+void loadAgainAndAgain(const std::string& file, int times) {
+    const cvagent::LogOutput log({}, false);
+    { Plugin first(file, nullptr); }  // what the C library keeps from its first use
+    const auto before = holdings();
+    for (int i = 0; i < times; ++i) {
+        Counter counter;
+        Plugin plugin(file, &counter);
+        ASSERT_GE(plugin.interface().holdAll().size(), 7U) << i;
+    }
+    EXPECT_EQ(holdings(), before);
+}
+
+HOST_TEST(PluginLifetime, TwoHundredLoadsLeaveNothingBehind) {
+    setenv("FAKE_PLUGIN", "churn", 1);
+    loadAgainAndAgain(FAKE_PLUGIN_FILE, 200);
+}
+
+HOST_TEST(PluginLifetime, TwoHundredLoadsOfTheRealPluginLeaveNothingBehind) {
+    const cvagent::QuietCommands quiet;
+    loadAgainAndAgain(CORVISTA_PLUGIN_FILE, 200);
+    EXPECT_THAT(host.listDirectory("/tmp"), testing::IsEmpty());
+}
+
+HOST_TEST(PluginLifetime, TwoHundredFailuresLeaveNothingBehind) {
+    setenv("FAKE_PLUGIN", "badstart churn", 1);
+    const auto before = holdings();
+    for (int i = 0; i < 200; ++i) {
+        EXPECT_ANY_THROW(Plugin(FAKE_PLUGIN_FILE, nullptr));
+    }
+    EXPECT_EQ(holdings(), before);
+}
+
+HOST_TEST(PluginLifetime, NodesAreReadWhileTheyComeAndGo) {
+    setenv("FAKE_PLUGIN", "churn alert", 1);
+    Counter counter;
+    std::atomic<int> reads{0};
+    {
+        Plugin plugin(FAKE_PLUGIN_FILE, &counter);
+        std::vector<std::jthread> readers;
+        for (int i = 0; i < 4; ++i) {
+            readers.emplace_back([&](const std::stop_token& stop) {
+                while (!stop.stop_requested()) {
+                    for (const cvagent::Handle& node : plugin.interface().holdAll()) {
+                        reads += static_cast<int>(cvagent::readProperties(*node, {89, 108}).size());
+                    }
+                    cvagent::setPaths(plugin.interface());
+                }
+            });
+        }
+        std::this_thread::sleep_for(std::chrono::milliseconds(500));
+    }
+    EXPECT_GT(reads, 0);
+    EXPECT_GT(counter.published, 0);
+    EXPECT_GT(counter.withdrawn, 0);
+}
+
+HOST_TEST(PluginLifetime, HandlesKeepWithdrawnNodesAlive) {
+    setenv("FAKE_PLUGIN", "churn", 1);
+    Counter counter;
+    Plugin plugin(FAKE_PLUGIN_FILE, &counter);
+    cvagent::Handle drive;
+    while (!drive) {
+        for (const cvagent::Handle& node : plugin.interface().holdAll()) {
+            drive = cvagent::pathComponent(*node) == "hard-drive:sdb" ? node : drive;
+        }
+    }
+    const int seen = counter.withdrawn;
+    while (counter.withdrawn < seen + 2) {
+        std::this_thread::yield();
+    }
+    EXPECT_EQ(cvagent::readProperty(*drive, 37).error, "");
+    EXPECT_EQ(drive->getPath(), "/oshw/root/computer/chassis/planar/disk-controller/hard-drive:sdb");
+}
+
+}  // namespace

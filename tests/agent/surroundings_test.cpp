@@ -1,0 +1,191 @@
+// The command line, the data directory, the log files, broken plug-ins.
+#include <gmock/gmock.h>
+#include <signal.h>
+#include <sys/stat.h>
+
+#include <filesystem>
+#include <set>
+
+#include "agent/surroundings.h"
+#include "tests/agent/cvagent_run.h"
+#include "tests/agent/terminal.h"
+
+namespace {
+
+using testing::HasSubstr;
+using testing::IsEmpty;
+using testing::Not;
+using testing::StartsWith;
+
+constexpr const char* kData = "/opt/vantrel/corvista/data";
+
+mode_t modeOf(const std::string& path) {
+    struct stat found {};
+    EXPECT_EQ(stat(path.c_str(), &found), 0) << path;
+    return found.st_mode & 07777U;
+}
+
+HOST_TEST(CommandLine, HelpIsEverywhere) {
+    CvagentRun cvagent(host);
+    for (const std::vector<std::string>& words :
+         std::vector<std::vector<std::string>>{{"--help"},
+                                               {"-h"},
+                                               {"tree", "--help"},
+                                               {"get", "--help"},
+                                               {"set", "--help"},
+                                               {"watch", "--help"},
+                                               {"properties", "--help"},
+                                               {"doctor", "--help"},
+                                               {"--version"}}) {
+        const Finished run = cvagent(words);
+        EXPECT_EQ(run.status, 0) << words.front();
+        EXPECT_THAT(run.out, HasSubstr("cvagent"));
+        EXPECT_THAT(run.err, IsEmpty());
+    }
+}
+
+HOST_TEST(CommandLine, WrongUsageEndsWithStatusTwoAndSaysWhereToLook) {
+    CvagentRun cvagent(host);
+    for (const std::vector<std::string>& words :
+         std::vector<std::vector<std::string>>{{},
+                                               {"tre"},
+                                               {"--nonsense"},
+                                               {"get"},
+                                               {"set"},
+                                               {"set", "computer"},
+                                               {"set", "computer", "115"},
+                                               {"watch", "--for", "soon"},
+                                               {"watch", "--for", "-1"},
+                                               {"tree", "extra"},
+                                               {"tree", "--yes"},
+                                               {"--log-level", "high", "tree"},
+                                               {"--host-tools", "some", "tree"},
+                                               {"properties", "computer", "extra"},
+                                               {"tree", "get"}}) {
+        const Finished run = cvagent(words);
+        EXPECT_EQ(run.status, 2) << (words.empty() ? "nothing" : words.back());
+        EXPECT_THAT(run.err, StartsWith("cvagent: "));
+        EXPECT_THAT(run.err, HasSubstr("--help"));
+        EXPECT_THAT(run.out, IsEmpty());
+    }
+    EXPECT_THAT(cvagent.diary(), IsEmpty());
+}
+
+HOST_TEST(DataDirectory, IsMadeForItsOwnerAlone) {
+    CvagentRun cvagent(host);
+    EXPECT_EQ(cvagent({"tree"}).status, 0);
+    EXPECT_EQ(modeOf(kData), 0700U);
+    EXPECT_EQ(modeOf("/opt/vantrel/corvista"), 0755U);
+    EXPECT_EQ(cvagent.setting("CORVISTA_DATA_DIR=/var/other")({"tree"}).status, 0);
+    EXPECT_EQ(modeOf("/var/other"), 0700U);
+}
+
+HOST_TEST(DataDirectory, KeepsTheModeItHas) {
+    host.directory(kData, 0750);
+    EXPECT_EQ(CvagentRun(host)({"tree"}).status, 0);
+    EXPECT_EQ(modeOf(kData), 0750U);
+}
+
+HOST_TEST(DataDirectory, IsHeldByOneAgent) {
+    CvagentRun cvagent(host);
+    cvagent.telling("churn");
+    RunningProgram first = cvagent.start({"watch"});
+    ASSERT_TRUE(first.waitForOutput("published"));
+    for (const std::vector<std::string>& words : std::vector<std::vector<std::string>>{
+             {"tree"}, {"get", "computer"}, {"set", "computer", "115", "x"}, {"watch", "--for", "0"}}) {
+        const Finished second = cvagent(words);
+        EXPECT_EQ(second.status, 5);
+        EXPECT_THAT(second.err,
+                    HasSubstr("another agent holds the data directory '/opt/vantrel/corvista/data/'"));
+    }
+    EXPECT_EQ(cvagent({"properties"}).status, 0);
+    first.signal(SIGKILL);
+    EXPECT_EQ(first.wait().status, 128 + SIGKILL);
+    EXPECT_EQ(cvagent({"tree"}).status, 0);
+}
+
+HOST_TEST(DataDirectory, ThatCannotBeMadeIsNamed) {
+    host.file("/opt/vantrel", "a file");
+    const Finished run = CvagentRun(host)({"tree"});
+    EXPECT_EQ(run.status, 1);
+    EXPECT_THAT(run.err, HasSubstr("'/opt/vantrel/corvista/data/'"));
+    EXPECT_THAT(run.err, HasSubstr("CORVISTA_DATA_DIR=DIRECTORY"));
+    const Finished empty = CvagentRun(host).setting("CORVISTA_DATA_DIR=")({"tree"});
+    EXPECT_EQ(empty.status, 2);
+    EXPECT_THAT(empty.err, HasSubstr("CORVISTA_DATA_DIR is empty"));
+}
+
+TEST(WithoutRoot, SaysWhatWillBeMissingAndUsesTheHome) {
+    const std::filesystem::path home =
+        std::filesystem::temp_directory_path() / ("cvagent-home-" + std::to_string(getpid()));
+    std::filesystem::create_directory(home);
+    std::filesystem::permissions(home, std::filesystem::perms::all);
+    const OnTerminal run = runAsNobody(
+        {CVAGENT_PROGRAM, "--host-tools", "native", "--plugin", FAKE_PLUGIN_FILE, "tree"}, home.string());
+    const bool kept = std::filesystem::is_directory(home / ".local/state/corvista/data");
+    std::filesystem::remove_all(home);
+    if (run.status == 127) {
+        GTEST_SKIP() << "the build tree is closed to other users";
+    }
+    EXPECT_EQ(run.status, 0) << run.output;
+    EXPECT_THAT(run.output, HasSubstr("without root some facts will be missing"));
+    EXPECT_THAT(run.output, HasSubstr("hard-drive:sda"));
+    EXPECT_TRUE(kept);
+}
+
+HOST_TEST(Logs, GoToTheFilesNamed) {
+    const Finished run =
+        CvagentRun(host).telling("errors")({"--log", "/tmp/log", "--trace", "/tmp/trace", "tree"});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(host.read("/tmp/log").value_or(""), HasSubstr("6000 Fake fake_plugin:1 fake: first error\n"));
+    EXPECT_THAT(host.read("/tmp/trace").value_or(""), HasSubstr("first error\n"));
+    EXPECT_EQ(modeOf("/tmp/log"), 0600U);
+    EXPECT_THAT(run.err, HasSubstr("the plug-in reports: first error"));
+}
+
+HOST_TEST(Logs, GoToStandardErrorFromTheLevelAskedFor) {
+    CvagentRun cvagent(host);
+    cvagent.telling("errors");
+    const Finished shown = cvagent({"--log-level", "6000", "tree"});
+    EXPECT_THAT(shown.err, HasSubstr("6000 Fake fake_plugin:1 fake: first error\n"));
+    EXPECT_THAT(shown.err, Not(HasSubstr("the plug-in reports")));
+}
+
+HOST_TEST(Logs, AFileThatCannotBeWrittenEndsTheCommand) {
+    CvagentRun cvagent(host);
+    const Finished run = cvagent({"--log", "/nowhere/log", "tree"});
+    EXPECT_EQ(run.status, 1);
+    EXPECT_THAT(run.err, HasSubstr("cannot write to '/nowhere/log'"));
+    EXPECT_THAT(cvagent.diary(), IsEmpty());
+}
+
+HOST_TEST(BrokenPlugins, EachHaveAMessageOfTheirOwn) {
+    host.file("/tmp/text.so", "no library");
+    host.file("/tmp/empty.so", "");
+    std::set<std::string> messages;
+    const auto expect = [&](CvagentRun cvagent, const std::string& message) {
+        const Finished run = cvagent({"tree"});
+        EXPECT_EQ(run.status, 1) << message;
+        EXPECT_THAT(run.err, HasSubstr(message));
+        EXPECT_THAT(run.out, IsEmpty());
+        EXPECT_TRUE(messages.insert(run.err).second) << message;
+    };
+    expect(CvagentRun(host).plugin("/nowhere.so"), "there is no plug-in file '/nowhere.so'");
+    expect(CvagentRun(host).plugin("/tmp/text.so"), "cannot load the plug-in '/tmp/text.so'");
+    expect(CvagentRun(host).plugin("/tmp/empty.so"), "cannot load the plug-in '/tmp/empty.so'");
+    expect(CvagentRun(host).plugin("/tmp"), "cannot load the plug-in '/tmp'");
+    expect(CvagentRun(host).plugin(FRAMEWORK_FILE), "is a library but no plug-in: it has no OpenMI");
+    expect(CvagentRun(host).telling("fail"), "refused to start: OpenMI returned 7 (not licensed)");
+    expect(CvagentRun(host).telling("null"), "is broken: its OpenMI returned no interface");
+    expect(CvagentRun(host).telling("throw"), "threw an exception: not today");
+    expect(CvagentRun(host).telling("badstart"), "did not initialize: no host here");
+    expect(CvagentRun(host).telling("throwstart"), "threw an exception: cannot start");
+}
+
+HOST_TEST(BrokenPlugins, ThatFailedToStartAreStillUnloaded) {
+    CvagentRun cvagent(host);
+    cvagent.telling("badstart churn")({"tree"});
+    EXPECT_THAT(cvagent.diary(), testing::EndsWith("unload\n"));
+}
+
+}  // namespace

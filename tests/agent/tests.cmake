@@ -1,0 +1,28 @@
+add_library(fake_plugin MODULE agent/fake_plugin.cpp)
+target_link_libraries(fake_plugin PRIVATE corvista_framework corvista_options)
+
+set(agent_test_programs
+  CVAGENT_PROGRAM="$<TARGET_FILE:cvagent>"
+  CORVISTA_PLUGIN_FILE="$<TARGET_FILE:vantrelcvicoshwmi>"
+  FAKE_PLUGIN_FILE="$<TARGET_FILE:fake_plugin>"
+  FRAMEWORK_FILE="$<TARGET_FILE:corvista_framework>")
+
+corvista_test(agent LIBRARIES agent_code test_support util SOURCES
+  agent/catalogue_test.cpp
+  agent/host_tools_test.cpp
+  agent/json_test.cpp
+  agent/print_test.cpp
+  agent/read_commands_test.cpp
+  agent/set_command_test.cpp
+  agent/surroundings_test.cpp
+  agent/terminal.cpp
+  agent/tree_test.cpp
+  agent/value_check_test.cpp
+  agent/watch_command_test.cpp)
+target_compile_definitions(agent_test PRIVATE ${agent_test_programs})
+add_dependencies(agent_test cvagent fake_plugin vantrelcvicoshwmi)
+
+corvista_test(agent_lifetime LIBRARIES agent_code test_support LABELS threads SOURCES
+  agent/lifetime_test.cpp)
+target_compile_definitions(agent_lifetime_test PRIVATE ${agent_test_programs})
+add_dependencies(agent_lifetime_test fake_plugin vantrelcvicoshwmi)

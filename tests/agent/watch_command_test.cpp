@@ -1,0 +1,112 @@
+// watch, and what signals do to every command.
+#include <gmock/gmock.h>
+#include <signal.h>
+
+#include <nlohmann/json.hpp>
+#include <sstream>
+#include <thread>
+
+#include "tests/agent/cvagent_run.h"
+
+namespace {
+
+using testing::EndsWith;
+using testing::HasSubstr;
+using testing::IsEmpty;
+using testing::StartsWith;
+using Json = nlohmann::ordered_json;
+
+void waitFor(const CvagentRun& cvagent, const std::string& note) {
+    for (int i = 0; i < 1000 && cvagent.diary().find(note) == std::string::npos; ++i) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(10));
+    }
+}
+
+HOST_TEST(WatchCommand, PrintsPublishedAndWithdrawnNodes) {
+    const Finished run = CvagentRun(host).telling("churn")({"watch", "--for", "0.2"});
+    EXPECT_EQ(run.status, 0);
+    const std::string path =
+        "/oshw/root/computer/chassis/planar/disk-controller/hard-drive:sdb  Hard Drive\n";
+    EXPECT_THAT(run.out, HasSubstr("Z  published  " + path));
+    EXPECT_THAT(run.out, HasSubstr("Z  withdrawn  " + path));
+    EXPECT_THAT(run.err, StartsWith("cvagent: watching 1"));
+}
+
+HOST_TEST(WatchCommand, PrintsAlertsWithPathMessageAndCodes) {
+    const Finished run = CvagentRun(host).telling("alert")({"watch", "--for", "0.3"});
+    EXPECT_THAT(run.out,
+                EndsWith("Z  alert      /oshw/root/computer/chassis/network-controller/network-port:eth0  "
+                         "NIC is Offline  (codes 1, 0, 12)\n"));
+}
+
+HOST_TEST(WatchCommand, PrintsOneObjectALine) {
+    const Finished run = CvagentRun(host).telling("churn alert")({"watch", "--json", "--for", "0.3"});
+    ASSERT_EQ(run.status, 0);
+    std::istringstream lines(run.out);
+    std::map<std::string, int> seen;
+    for (std::string line; std::getline(lines, line);) {
+        const Json event = Json::parse(line);
+        ++seen[event["event"]];
+        if (event["event"] == "alert") {
+            EXPECT_EQ(event["message"], "NIC is Offline ");
+            EXPECT_EQ(event["codes"].dump(), R"({"first":1,"second":0,"event":12})");
+        } else {
+            EXPECT_EQ(event["class"], "hard-drive");
+        }
+    }
+    EXPECT_EQ(seen["alert"], 1);
+    EXPECT_GT(seen["published"], 0);
+    EXPECT_EQ(seen["published"], seen["withdrawn"]);
+}
+
+HOST_TEST(WatchCommand, ASignalUnloadsThePluginAndIsNoFailure) {
+    for (const int number : {SIGINT, SIGTERM}) {
+        host.remove("/tmp/diary");
+        CvagentRun cvagent(host);
+        cvagent.telling("churn");
+        RunningProgram watch = cvagent.start({"watch"});
+        ASSERT_TRUE(watch.waitForOutput("withdrawn"));
+        watch.signal(number);
+        const Finished run = watch.wait(std::chrono::seconds(10));
+        EXPECT_EQ(run.status, 0) << number;
+        EXPECT_THAT(cvagent.diary(), EndsWith("\nunload\n"));
+    }
+}
+
+HOST_TEST(Signals, EndOtherCommandsAfterTheUnload) {
+    for (const int number : {SIGINT, SIGTERM, SIGHUP}) {
+        host.remove("/tmp/diary");
+        CvagentRun cvagent(host);
+        cvagent.telling("slow");
+        RunningProgram tree = cvagent.start({"tree"});
+        waitFor(cvagent, "slow");
+        tree.signal(number);
+        const Finished run = tree.wait(std::chrono::seconds(10));
+        EXPECT_EQ(run.status, 128 + number);
+        EXPECT_THAT(run.out, IsEmpty());
+        EXPECT_THAT(cvagent.diary(), EndsWith("\nunload\n"));
+    }
+}
+
+HOST_TEST(Signals, AReaderThatHasSeenEnoughIsNoDrama) {
+    CvagentRun cvagent(host);
+    cvagent.telling("churn");
+    std::string line;
+    for (const std::string& word : cvagent.commandLine({"watch"})) {
+        line += "'" + word + "' ";
+    }
+    const Finished run = host.run({"sh", "-c", line + "| head -n 1"});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.err, StartsWith("cvagent: watching"));
+    EXPECT_THAT(run.err, testing::Not(HasSubstr("cannot write")));
+    waitFor(cvagent, "unload");
+    EXPECT_THAT(cvagent.diary(), EndsWith("\nunload\n"));
+}
+
+HOST_TEST(WatchCommand, ErrorsOfThePluginAreShownAsTheyCome) {
+    const Finished run = CvagentRun(host).telling("errors")({"watch", "--for", "0"});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.err, HasSubstr("first error"));
+}
+
+}  // namespace
