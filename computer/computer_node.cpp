@@ -107,7 +107,8 @@ Error readTimeZoneOffset(const ComputerNode&, PropertyValue& out) {
     tm local{};
     localtime_r(&now, &local);
     constexpr long kSecondsPerMinute = 60;
-    out = PropertyValue(Number(static_cast<double>(local.tm_gmtoff / kSecondsPerMinute)), true);
+    const long minutes = local.tm_gmtoff / kSecondsPerMinute;
+    out = PropertyValue(Number(static_cast<double>(minutes)), true);
     return result(true);
 }
 

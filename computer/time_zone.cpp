@@ -50,11 +50,11 @@ void rewriteClock(const std::string& timezoneLine) {
             return;
         }
     }
-    remove(kClockCopy);
+    unlink(kClockCopy);
 }
 
 bool switchLocalTime(const std::string& zoneFile) {
-    rename(kLocalTime, kOldLocalTime);
+    static_cast<void>(rename(kLocalTime, kOldLocalTime));  // there may be none
     if (symlink(zoneFile.c_str(), kLocalTime) == 0) {
         return true;
     }
@@ -92,7 +92,7 @@ bool setAutoDSTEnabled(bool utc) {
         replaced = replaceFirst(*copy, "HWCLOCK", utc ? "HWCLOCK=\"-u\"\n" : "HWCLOCK=\"--localtime\"\n");
         replaced &= copy->replace(kClockFile) == LineFile::Written::whole;
     }
-    remove(kClockCopy);
+    unlink(kClockCopy);
     return replaced;
 }
 
