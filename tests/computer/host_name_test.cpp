@@ -8,15 +8,7 @@
 #include "mi/os_hw_mi.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
-
-namespace IC {
-
-struct OsHwMITestAccess {
-    static const std::string& hostName(const OsHwMI& mi) { return mi.hostName_; }
-    static const std::string& domainName(const OsHwMI& mi) { return mi.domainName_; }
-};
-
-}  // namespace IC
+#include "tests/support/plugin_access.h"
 
 namespace {
 

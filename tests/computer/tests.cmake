@@ -1,6 +1,8 @@
 corvista_test(computer LIBRARIES plugin_code test_support SOURCES
+  computer/agent_test.cpp
   computer/calendar_test.cpp
   computer/clock_file_test.cpp
+  computer/commands_test.cpp
   computer/computer_node_test.cpp
   computer/computer_start_test.cpp
   computer/failing_calls.cpp
@@ -10,3 +12,6 @@ corvista_test(computer LIBRARIES plugin_code test_support SOURCES
   computer/local_time_test.cpp
   computer/owner_data_test.cpp
   computer/zone_table_test.cpp)
+target_compile_definitions(computer_test PRIVATE
+  CVAGENT_PROGRAM="$<TARGET_FILE:cvagent>" CORVISTA_PLUGIN="$<TARGET_FILE:vantrelcvicoshwmi>")
+add_dependencies(computer_test cvagent vantrelcvicoshwmi)

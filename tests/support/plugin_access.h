@@ -19,6 +19,9 @@ struct OsHwMITestAccess {
         mi.appendNode(node);
         mi.rememberByName(name, node);
     }
+    /// The host's names as they were read last, line breaks included.
+    static const std::string& hostName(const OsHwMI& mi) { return mi.hostName_; }
+    static const std::string& domainName(const OsHwMI& mi) { return mi.domainName_; }
     static std::map<std::string, unsigned int>& current(OsHwMI& mi) { return mi.inventory_->currentStates; }
     static std::map<std::string, unsigned int>& previous(OsHwMI& mi) { return mi.inventory_->previousStates; }
 };
