@@ -1,6 +1,7 @@
 // Every property of the computer through cvagent and the plug-in as they are installed.
 #include <gmock/gmock.h>
 
+#include <cstdlib>
 #include <filesystem>
 
 #include "tests/support/fake_host.h"
@@ -20,6 +21,7 @@ constexpr char kHostsText[] = "127.0.0.1\tlocalhost\n127.0.0.2\talpha.example.or
 class ComputerThroughAgent : public HostFixture {
 protected:
     void setUpHost(FakeHost& host) override {
+        setenv("TZ", "XXX+3:30", 1);
         host.setHostName("alpha");
         host.tool("hostname", "alpha\n");
         host.tool("hostname -s", "alpha\n");
@@ -31,8 +33,7 @@ protected:
 
     static Finished agent(FakeHost& host, std::vector<std::string> words) {
         host.clearCalls();
-        words.insert(words.begin(), {"env", "TZ=XXX+3:30", CVAGENT_PROGRAM, "--host-tools", "native",
-                                     "--plugin", CORVISTA_PLUGIN});
+        words.insert(words.begin(), {CVAGENT_PROGRAM, "--host-tools", "native", "--plugin", CORVISTA_PLUGIN});
         return host.run(words);
     }
     static std::string get(FakeHost& host, const char* property) {
