@@ -48,6 +48,35 @@ struct Heard {
     }
 };
 
+/// An interface that answers late, and not for want of a command.
+class SlowNode : public IC::MutableNode {
+public:
+    explicit SlowNode(std::chrono::milliseconds delay) : MutableNode(300, 1, {1}, 12, 0), delay_(delay) {}
+    IC::Error getProperty(unsigned int, IC::PropertyValue&) const override {
+        asked_ = true;
+        std::this_thread::sleep_for(delay_);
+        return {1, IC::Number(), "late"};
+    }
+    bool asked() const { return asked_; }
+
+private:
+    const std::chrono::milliseconds delay_;
+    mutable std::atomic<bool> asked_{false};
+};
+
+/// What stopping a monitor says that is held up for so long.
+std::vector<std::string> stopHeldUp(std::chrono::milliseconds delay) {
+    QX::setClockSpeed(20);  // a second passes in 50 ms
+    Interfaces interfaces;
+    auto* slow = new SlowNode(delay);
+    IC::OsHwMITestAccess::addInterface(interfaces.mi(), "eth0", slow);
+    interfaces.mi().enableIndications();
+    EXPECT_TRUE(eventually([&] { return slow->asked(); }));
+    LogCapture capture;
+    interfaces.mi().disableIndications();
+    return capture.ownMessages();
+}
+
 HOST_TEST(NetworkMonitor, RaisesEachChangeOnceAndKeepsTheStateAcrossARestart) {
     host.directory("/opt/vantrel/corvista/data");
     QX::setClockSpeed(1000);  // 30 seconds pass in 30 ms
@@ -107,11 +136,24 @@ HOST_TEST(NetworkMonitor, IsAbortedInTheMiddleOfACommandAndReportsNothingOfThatP
     interfaces.mi().disableIndications();
     EXPECT_LT(std::chrono::steady_clock::now() - start, 5s);
     EXPECT_THAT(capture.ownMessages(), Contains("eventThreadNetIndications: Aborting thread..."));
-    EXPECT_THAT(capture.ownMessages(),
-                Contains("eventThreadNetIndications: Waiting for thread 0 seconds so far"));
     EXPECT_THAT(capture.ownMessages(), Contains("eventThreadNetIndicationsThread terminated."));
     EXPECT_TRUE(heard.now().empty());
     EXPECT_EQ(host.read(kFile), "bond0=1\n");
+}
+
+HOST_TEST(NetworkMonitor, IsWaitedForAndTheSecondsAreCounted) {
+    const auto messages = stopHeldUp(180ms);
+    EXPECT_THAT(messages, Contains("eventThreadNetIndications: Waiting for thread 0 seconds so far"));
+    EXPECT_THAT(messages, Contains("eventThreadNetIndications: Waiting for thread 1 seconds so far"));
+    EXPECT_THAT(messages, Contains("eventThreadNetIndicationsThread terminated."));
+}
+
+HOST_TEST(NetworkMonitor, IsWaitedForTenTimesAtTheMost) {
+    const auto messages = stopHeldUp(2000ms);
+    EXPECT_THAT(messages, Contains("eventThreadNetIndications: Waiting for thread 9 seconds so far"));
+    EXPECT_THAT(messages,
+                testing::Not(Contains("eventThreadNetIndications: Waiting for thread 10 seconds so far")));
+    EXPECT_THAT(messages, Contains("eventThreadNetIndications termination failed."));
 }
 
 HOST_TEST(NetworkMonitor, LeavesIndicationsOffWhenItsThreadWillNotStart) {
