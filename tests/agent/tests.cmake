@@ -15,6 +15,7 @@ corvista_test(agent LIBRARIES agent_code test_support util SOURCES
   agent/read_commands_test.cpp
   agent/set_command_test.cpp
   agent/surroundings_test.cpp
+  agent/suse_host_test.cpp
   agent/terminal.cpp
   agent/tree_test.cpp
   agent/value_check_test.cpp
