@@ -142,7 +142,6 @@ private:
     std::vector<Node*> driveNodes_;
     std::vector<Node*> partitionNodes_;
     QX::Event driveMonitorEnded_{true};
-    std::unique_ptr<QX::Thread> driveMonitor_;
     bool driveMonitorRuns_ = false;
     FingerprintPair driveFingerprints_;
     FingerprintPair partitionFingerprints_;
@@ -154,6 +153,8 @@ private:
     std::mutex portWalkGuard_;  ///< one walk over the interfaces at a time; guards the two lists below
     std::vector<std::string> dnsServers_;
     std::vector<std::string> dnsSuffixes_;
+    /// The last member: a monitor that nobody stopped ends before what it uses is gone.
+    std::unique_ptr<QX::Thread> driveMonitor_;
 };
 
 }  // namespace IC
