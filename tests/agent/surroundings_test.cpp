@@ -182,6 +182,22 @@ HOST_TEST(BrokenPlugins, EachHaveAMessageOfTheirOwn) {
     expect(CvagentRun(host).telling("throwstart"), "threw an exception: cannot start");
 }
 
+HOST_TEST(Plugins, AreFoundBesideTheProgram) {
+    const Finished run = host.run({CVAGENT_PROGRAM, "--host-tools", "native", "tree", "--json"});
+    EXPECT_EQ(run.status, 0) << run.err;
+    const std::string directory = std::filesystem::path(CORVISTA_PLUGIN_FILE).parent_path();
+    EXPECT_THAT(run.out, StartsWith("{\n  \"plugin\": \"" + directory + "/libvantrelcvicoshwmi.so.1\",\n"));
+}
+
+HOST_TEST(Plugins, ThatAreNotBesideTheProgramAreMissed) {
+    const std::string program = host.read(CVAGENT_PROGRAM).value_or("");
+    host.file("/opt/bin/cvagent", program, 0755);
+    const Finished run = host.run({"/opt/bin/cvagent", "tree"});
+    EXPECT_EQ(run.status, 1);
+    EXPECT_THAT(run.err, HasSubstr("there is no plug-in file 'libvantrelcvicoshwmi.so.1'"));
+    EXPECT_THAT(run.err, HasSubstr("--plugin FILE"));
+}
+
 HOST_TEST(BrokenPlugins, ThatFailedToStartAreStillUnloaded) {
     CvagentRun cvagent(host);
     cvagent.telling("badstart churn")({"tree"});
