@@ -34,6 +34,10 @@ std::string deviceName(std::string name) {
     return name;
 }
 
+std::string under(const std::string& directory, const std::string& name) {
+    return directory + "/" + name;
+}
+
 std::string readFirstLine(const std::string& path) {
     const std::string content = readFile(path).value_or("");
     return content.substr(0, content.find('\n'));
@@ -42,7 +46,7 @@ std::string readFirstLine(const std::string& path) {
 std::vector<Partition> listPartitions(const std::string& diskDirectory) {
     std::vector<Partition> partitions;
     for (const std::string& name : listDirectory(diskDirectory)) {
-        const std::string directory = diskDirectory + "/" + name;
+        const std::string directory = under(diskDirectory, name);
         Partition partition;
         partition.number = readNumber(directory + "/partition");
         if (partition.number == 0) continue;
@@ -119,7 +123,7 @@ std::vector<Disk> listDisks(const std::string& root) {
     std::vector<Disk> disks;
     for (const std::string& name : listDirectory(root + "/sys/block")) {
         if (kindOf(name).empty()) continue;
-        const std::string directory = root + "/sys/block/" + name;
+        const std::string directory = under(root + "/sys/block", name);
         Disk disk = readDisk(directory, name);
         // One path of a disk with several is hidden behind the disk itself.
         if (disk.sectors == 0 || readNumber(directory + "/hidden") != 0) continue;

@@ -4,8 +4,8 @@ namespace hosttools {
 namespace {
 
 constexpr std::uint64_t kernelSector = 512;  // what sysfs counts in
-constexpr unsigned heads = 255;
-constexpr unsigned sectorsPerTrack = 63;
+constexpr std::uint64_t heads = 255;
+constexpr std::uint64_t sectorsPerTrack = 63;
 
 std::uint64_t sectorCount(const Disk& disk) {
     return disk.sectors / (disk.logicalSize / kernelSector);

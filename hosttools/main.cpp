@@ -10,6 +10,11 @@ constexpr const char* programName = "corvista-hosttools";
 
 constexpr Applet applets[] = {
     {"fdisk", runFdisk, "fdisk -l[su] [DISK]..."},
+    {"ifconfig", runIfconfig,
+     "ifconfig [-a] [INTERFACE [up|down|ADDRESS|netmask MASK|broadcast ADDRESS|pointopoint ADDRESS]...]"},
+    {"route", runRoute,
+     "route [-A inet6] -n\n"
+     "  route add|del -host A|-net A netmask M|default [gw G] [metric N] [[dev] INTERFACE]"},
 };
 
 const Applet* findApplet(std::string_view name) {

@@ -1,11 +1,18 @@
 corvista_test(hosttools LIBRARIES hosttools SOURCES
+  hosttools/addresses_test.cpp
+  hosttools/against_busybox_test.cpp
   hosttools/disks_test.cpp
   hosttools/fdisk_listing_test.cpp
   hosttools/fdisk_tool_test.cpp
   hosttools/files_test.cpp
   hosttools/host_tree.cpp
+  hosttools/ifconfig_listing_test.cpp
+  hosttools/interfaces_test.cpp
+  hosttools/netlink_test.cpp
+  hosttools/network_namespace.cpp
   hosttools/partition_table_test.cpp
   hosttools/process.cpp
+  hosttools/route_listing_test.cpp
   hosttools/text_test.cpp)
 target_compile_definitions(hosttools_test PRIVATE
   HOSTTOOLS_BIN="$<TARGET_FILE_DIR:corvista-hosttools>/bin" HOSTTOOLS_RECORDINGS="${CMAKE_CURRENT_LIST_DIR}")
