@@ -87,7 +87,7 @@ protected:
         host.file(IC::diskSnapshotPath, kLayout);
         IC::myoshwmi.createHardDriveNodes(false);
         IC::myoshwmi.createPartitionNodes(false);
-        shell_stub::clearCommands();
+        clearCommands();
     }
 };
 
@@ -141,7 +141,7 @@ HOST_TEST_F(DriveMonitor, UnloadDuringTheFirstWaitEndsItAtOnceWithoutAComparison
     const auto start = steady_clock::now();
     Access::stopMonitor();
     EXPECT_LT(steady_clock::now() - start, 3s) << "the sleep of five seconds is not waited for";
-    EXPECT_THAT(shell_stub::commands(), IsEmpty());
+    EXPECT_THAT(commands(), IsEmpty());
     EXPECT_TRUE(Access::monitorEndedWithin(0)) << "the completion event is signalled";
     EXPECT_FALSE(Access::monitorRuns());
     EXPECT_THAT(messages(log, true),
@@ -172,7 +172,7 @@ HOST_TEST_F(DriveMonitor, AStopIsSeenWithinOneSlice) {
     EXPECT_TRUE(monitor.isDone());
     EXPECT_LT(steady_clock::now() - start, 3s) << "a slice is half a second here, a wait twelve of them";
     EXPECT_TRUE(ended.wait(10));
-    EXPECT_THAT(shell_stub::commands(), IsEmpty());
+    EXPECT_THAT(commands(), IsEmpty());
 }
 
 HOST_TEST_F(DriveMonitor, UnloadsFlagAloneEndsIt) {
@@ -184,7 +184,7 @@ HOST_TEST_F(DriveMonitor, UnloadsFlagAloneEndsIt) {
     EXPECT_TRUE(ended.wait(100));
     monitor.join();
     EXPECT_TRUE(monitor.isDone());
-    EXPECT_THAT(shell_stub::commands(), IsEmpty());
+    EXPECT_THAT(commands(), IsEmpty());
 }
 
 HOST_TEST_F(DriveMonitor, AStopDuringTheSecondWaitLetsOneComparisonRun) {

@@ -48,13 +48,13 @@ HOST_TEST_F(Drives, ADriveHasPathSizeInThousandsOfBytesAndHealth) {
 
 HOST_TEST_F(Drives, TheHostIsAskedOneCommandAtATimeUnderTheFileLock) {
     std::vector<bool> locked;
-    shell_stub::beforeEach([&](const std::string&) { locked.push_back(shell_stub::fileLockIsHeld()); });
+    shell_stub::beforeEach([&](const std::string&) { locked.push_back(fileLockIsHeld()); });
     build(host, listing("mbr_logical"));
     const std::string disk = "Disk /dev/sda: 80.0 GB, 80026361856 bytes";
-    EXPECT_THAT(shell_stub::commands(), ElementsAre(kListing, pathCommand(disk), sizeCommand(disk),
-                                                    pathCommand("Disk identifier: 0x8f3d0cf1")));
+    EXPECT_THAT(commands(), ElementsAre(kListing, pathCommand(disk), sizeCommand(disk),
+                                        pathCommand("Disk identifier: 0x8f3d0cf1")));
     EXPECT_THAT(locked, ElementsAre(true, true, true, true));
-    EXPECT_FALSE(shell_stub::fileLockIsHeld());
+    EXPECT_FALSE(fileLockIsHeld());
 }
 
 HOST_TEST_F(Drives, OutputIsReadAfterTheLockIsReleased) {
@@ -64,7 +64,7 @@ HOST_TEST_F(Drives, OutputIsReadAfterTheLockIsReleased) {
     while (host.callsOf("cut").empty()) {
         std::this_thread::sleep_for(std::chrono::milliseconds(1));
     }
-    const bool held = shell_stub::fileLockIsHeld();
+    const bool held = fileLockIsHeld();
     const bool stillAtTheFirst = host.callsOf("cut").size() == 1;
     builder.join();
     EXPECT_TRUE(stillAtTheFirst);
@@ -183,7 +183,7 @@ HOST_TEST_F(Drives, ALineGoesToTheShellAsItIs) {
         return std::nullopt;
     });
     build(host, line + "\n");
-    EXPECT_THAT(shell_stub::commands(), ElementsAre(kListing, pathCommand(line), sizeCommand(line)));
+    EXPECT_THAT(commands(), ElementsAre(kListing, pathCommand(line), sizeCommand(line)));
     EXPECT_THAT(drives(), ElementsAre(Seen{101, 1, "/dev/sda", 5}));
 }
 
@@ -196,7 +196,7 @@ HOST_TEST_F(Drives, ALineTooLongForItsCommandIsSkipped) {
     EXPECT_THAT(drives(), ElementsAre(Seen{101, 1, "/dev/sda", 80026361}, Seen{102, 2, "/dev/sdb", 1}));
     EXPECT_THAT(log.messages(6000),
                 ElementsAre("Command too long, not run: " + pathCommand(tooLong), "Command :  failed!!"));
-    EXPECT_THAT(shell_stub::commands(), testing::Not(testing::Contains(pathCommand(tooLong))));
+    EXPECT_THAT(commands(), testing::Not(testing::Contains(pathCommand(tooLong))));
 }
 
 HOST_TEST_F(Drives, AListingThatCannotStartLeavesNoNodes) {
@@ -247,7 +247,7 @@ HOST_TEST_F(Drives, ANodeThatTheAgentRefusesIsLoggedAndGoesWithTheNextUpdate) {
 HOST_TEST_F(Drives, HealthIsAlwaysGoodAndWritesAreOnlyStored) {
     build(host, kOneDrive);
     const auto node = nodesOfType(IC::NodeType::hardDrive).at(0);
-    shell_stub::clearCommands();
+    clearCommands();
     EXPECT_EQ(node->setProperty(123, IC::PropertyValue(IC::Number(12U), true)).getStatus(), 0);
     EXPECT_EQ(node->setProperty(200, IC::PropertyValue("label", true)).getStatus(), 0);
     IC::PropertyValue value;
@@ -257,18 +257,18 @@ HOST_TEST_F(Drives, HealthIsAlwaysGoodAndWritesAreOnlyStored) {
     EXPECT_EQ(node->getProperty(200, value).getStatus(), 0);
     EXPECT_EQ(std::string(value), "label");
     EXPECT_EQ(node->getProperty(999, value).getStatus(), 1);
-    EXPECT_THAT(shell_stub::commands(), IsEmpty());
+    EXPECT_THAT(commands(), IsEmpty());
 }
 
 HOST_TEST_F(Drives, TheSnapshotIsRemovedUnderTheFileLock) {
     host.file(IC::diskSnapshotPath, kOneDrive);
     bool locked = false;
-    shell_stub::beforeEach([&](const std::string&) { locked = shell_stub::fileLockIsHeld(); });
+    shell_stub::beforeEach([&](const std::string&) { locked = fileLockIsHeld(); });
     LogCapture log;
     IC::deleteFdiskTmp();
     EXPECT_FALSE(host.exists(IC::diskSnapshotPath));
     EXPECT_TRUE(locked);
-    EXPECT_THAT(shell_stub::commands(), ElementsAre("rm /tmp/fdisk_tmp 2> /dev/null"));
+    EXPECT_THAT(commands(), ElementsAre("rm /tmp/fdisk_tmp 2> /dev/null"));
     EXPECT_THAT(log.messages(),
                 ElementsAre("deleteFdiskTmp: entry", "Deleting /tmp/fdisk_tmp", "deleteFdiskTmp: exit"));
 }

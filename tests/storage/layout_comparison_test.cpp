@@ -35,7 +35,7 @@ protected:
     /// A pass over this layout; the commands, the diary are those of this pass alone.
     static void pass(FakeHost& host, const std::string& layout) {
         host.tool("fdisk -ls", layout);
-        shell_stub::clearCommands();
+        clearCommands();
         diary().clear();
         IC::myoshwmi.HDDThreadProcess();
     }
@@ -62,7 +62,7 @@ HOST_TEST_F(LayoutComparison, AnUnchangedLayoutTouchesNothing) {
     LogCapture log;
     pass(host, kLayout);
     EXPECT_THAT(diary(), IsEmpty());
-    EXPECT_EQ(shell_stub::commands(), kComparison);
+    EXPECT_EQ(commands(), kComparison);
     EXPECT_THAT(
         log.messages(),
         ElementsAre("Hard Drive ThreadProcess :: Entry", "Hard Drive Check Sum : Entry",
@@ -77,11 +77,11 @@ HOST_TEST_F(LayoutComparison, AnUnchangedLayoutTouchesNothing) {
 
 HOST_TEST_F(LayoutComparison, EveryCommandIsStartedUnderTheFileLock) {
     std::vector<bool> locked;
-    shell_stub::beforeEach([&](const std::string&) { locked.push_back(shell_stub::fileLockIsHeld()); });
+    shell_stub::beforeEach([&](const std::string&) { locked.push_back(fileLockIsHeld()); });
     pass(host, kLayout);
     // The comparison, the listing of the drives with two questions, that of the partitions with one.
     EXPECT_EQ(locked, std::vector<bool>(kComparison.size() + 5, true));
-    EXPECT_FALSE(shell_stub::fileLockIsHeld());
+    EXPECT_FALSE(fileLockIsHeld());
 }
 
 HOST_TEST_F(LayoutComparison, AnAddedPartitionRebuildsThePartitionsAlone) {
@@ -91,7 +91,7 @@ HOST_TEST_F(LayoutComparison, AnAddedPartitionRebuildsThePartitionsAlone) {
     pass(host, kLayout + kSecond);
     EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda1", "published /dev/sda1", "published /dev/sda2"));
     EXPECT_EQ(drives(), drivesBefore);
-    EXPECT_THAT(shell_stub::commands(), Not(Contains("cat /tmp/fdisk_tmp | grep ^Disk")));
+    EXPECT_THAT(commands(), Not(Contains("cat /tmp/fdisk_tmp | grep ^Disk")));
     EXPECT_THAT(log.messages(), Not(Contains("Hard Drive Check Sum found Different")));
     EXPECT_THAT(log.messages(), Contains("Partition Check Sum found Different"));
     pass(host, kLayout + kSecond);
@@ -136,7 +136,7 @@ HOST_TEST_F(LayoutComparison, ASnapshotThatCannotBeTakenSkipsThePass) {
     shell_stub::failWhen([](const std::string& command) { return command == kSnapshot; });
     LogCapture log;
     pass(host, "");
-    EXPECT_THAT(shell_stub::commands(), ElementsAre(kSnapshot));
+    EXPECT_THAT(commands(), ElementsAre(kSnapshot));
     EXPECT_THAT(diary(), IsEmpty());
     EXPECT_THAT(log.messages(),
                 ElementsAre("Hard Drive ThreadProcess :: Entry", "Hard Drive ThreadProcess :: Exit"));
@@ -212,7 +212,7 @@ HOST_TEST_F(LayoutComparison, ASlowFdiskIsWaitedForBeforeAnybodyReads) {
         }
     });
     IC::myoshwmi.HDDThreadProcess();
-    EXPECT_GT(shell_stub::commands().size(), kComparison.size());
+    EXPECT_GT(commands().size(), kComparison.size());
     EXPECT_THAT(torn, IsEmpty());
     EXPECT_EQ(drives().size(), 1U);
     EXPECT_EQ(partitions().size(), 2U);
@@ -233,8 +233,8 @@ HOST_TEST_F(LayoutComparison, TheLockIsFreeWhileFdiskWrites) {
     while (host.callsOf("fdisk").empty()) {
         std::this_thread::sleep_for(std::chrono::milliseconds(1));
     }
-    const bool held = shell_stub::fileLockIsHeld();
-    const bool writing = shell_stub::commands().size() == 1;
+    const bool held = fileLockIsHeld();
+    const bool writing = commands().size() == 1;
     monitor.join();
     EXPECT_TRUE(writing);
     EXPECT_FALSE(held);

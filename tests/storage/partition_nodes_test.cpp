@@ -47,10 +47,10 @@ HOST_TEST_F(Partitions, APartitionHasItsPathTwiceAndItsBlocks) {
 
 HOST_TEST_F(Partitions, TheHostIsAskedOneCommandAtATimeUnderTheFileLock) {
     std::vector<bool> locked;
-    shell_stub::beforeEach([&](const std::string&) { locked.push_back(shell_stub::fileLockIsHeld()); });
+    shell_stub::beforeEach([&](const std::string&) { locked.push_back(fileLockIsHeld()); });
     const std::string plain = "/dev/sda2              14        1288    10241437+  83  Linux";
     build(host, kBoot + "\n" + plain + "\n");
-    EXPECT_THAT(shell_stub::commands(), ElementsAre(kListing, sizeCommand(kBoot), sizeCommand(plain)));
+    EXPECT_THAT(commands(), ElementsAre(kListing, sizeCommand(kBoot), sizeCommand(plain)));
     EXPECT_THAT(locked, ElementsAre(true, true, true));
 }
 
@@ -170,13 +170,13 @@ HOST_TEST_F(Partitions, ALineTooLongForItsCommandIsSkipped) {
     build(host, tooLong + "\n/dev/sda2 1 2 300 83 Linux\n");
     EXPECT_THAT(partitions(), ElementsAre(Seen{102, 1, "/dev/sda2", 300}));
     EXPECT_EQ(log.messages(6000).size(), 2U);
-    EXPECT_THAT(shell_stub::commands(), testing::Not(testing::Contains(sizeCommand(tooLong))));
+    EXPECT_THAT(commands(), testing::Not(testing::Contains(sizeCommand(tooLong))));
 }
 
 HOST_TEST_F(Partitions, HealthIsAlwaysGoodAndWritesAreOnlyStored) {
     build(host, kBoot + "\n");
     const auto node = nodesOfType(IC::NodeType::partition).at(0);
-    shell_stub::clearCommands();
+    clearCommands();
     IC::PropertyValue value;
     EXPECT_EQ(node->getProperty(123, value).getStatus(), 0);
     EXPECT_EQ(value, IC::PropertyValue(IC::Number(1U), true));
@@ -187,7 +187,7 @@ HOST_TEST_F(Partitions, HealthIsAlwaysGoodAndWritesAreOnlyStored) {
     EXPECT_EQ(node->getProperty(112, value).getStatus(), 0);
     EXPECT_EQ(std::string(value), "changed");
     EXPECT_EQ(node->getProperty(37, value).getStatus(), 1);
-    EXPECT_THAT(shell_stub::commands(), IsEmpty());
+    EXPECT_THAT(commands(), IsEmpty());
 }
 
 }  // namespace

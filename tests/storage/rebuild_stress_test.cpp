@@ -21,7 +21,7 @@ const unsigned kRebuilds = 2000 * factor();
 class CannedLayout {
 public:
     CannedLayout() {
-        shell_stub::keepCommands(false);
+        forgetCommands();
         shell_stub::answerWith([this](const std::string& command) { return answer(command); });
     }
     CannedLayout(const CannedLayout&) = delete;

@@ -2,11 +2,13 @@
 
 #include <fstream>
 #include <sstream>
+#include <thread>
 
 #include "mi/globals.h"
 #include "mi/node_types.h"
 #include "storage/disk_partition.h"
 #include "storage/hard_drive_node.h"
+#include "tests/support/command_lines.h"
 
 namespace IC {
 
@@ -60,6 +62,7 @@ void OsHwMITestAccess::stopMonitor() {
 namespace {
 
 bool refusing = false;
+std::unique_ptr<CommandLines> started;
 
 std::string pathOf(const IC::Node& node) {
     IC::PropertyValue path;
@@ -98,6 +101,30 @@ std::string listing(const std::string& name) {
     return text.str();
 }
 
+std::vector<std::string> commands() {
+    return started->all();
+}
+
+void clearCommands() {
+    started->clear();
+}
+
+void forgetCommands() {
+    started.reset();
+}
+
+bool fileLockIsHeld() {
+    bool taken = false;
+    // A thread of its own: nobody may try a lock that he may be holding.
+    std::thread([&taken] {
+        taken = IC::OSHWMI::myfileLock.lock(0);
+        if (taken) {
+            IC::OSHWMI::myfileLock.unlock();
+        }
+    }).join();
+    return !taken;
+}
+
 std::vector<std::string> withoutPropertyLines(const std::vector<std::string>& messages) {
     std::vector<std::string> kept;
     for (const std::string& message : messages) {
@@ -110,6 +137,7 @@ std::vector<std::string> withoutPropertyLines(const std::vector<std::string>& me
 }
 
 void StorageHost::setUpHost(FakeHost&) {
+    started = std::make_unique<CommandLines>();
     IC::OsHwMITestAccess::plantDiskController(kControllerId);
     IC::myoshwmi.setLoadCallBack(
         [](IC::Node* const& node, const void*) -> IC::Error {
@@ -129,6 +157,7 @@ void StorageHost::tearDownHost(FakeHost&) {
     shell_stub::failWhen({});
     shell_stub::beforeEach({});
     IC::myoshwmi.ManagementInterface::unload();
+    started.reset();
 }
 
 std::vector<Seen> StorageHost::drives() {

@@ -9,9 +9,9 @@
 
 #include "mi/fingerprint.h"
 #include "mi/os_hw_mi.h"
-#include "tests/storage/shell_stub.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/shell_stub.h"
 
 namespace IC {
 
@@ -35,6 +35,15 @@ struct OsHwMITestAccess {
 
 /// A listing of tests/storage/listings.
 std::string listing(const std::string& name);
+
+/// The command lines started so far, in order.
+std::vector<std::string> commands();
+void clearCommands();
+/// No command line is kept from here on: thousands of rebuilds start too many.
+void forgetCommands();
+
+/// Whether the plug-in's file lock is held by somebody at this moment.
+bool fileLockIsHeld();
 
 /// The lines of a log without the messages that nodes write when a property is stored or read.
 std::vector<std::string> withoutPropertyLines(const std::vector<std::string>& messages);

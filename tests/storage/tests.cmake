@@ -4,6 +4,5 @@ corvista_test(storage SOURCES
   storage/layout_comparison_test.cpp
   storage/partition_nodes_test.cpp
   storage/rebuild_stress_test.cpp
-  storage/shell_stub.cpp
   storage/storage_host.cpp
   LIBRARIES plugin_code test_support LABELS threads)

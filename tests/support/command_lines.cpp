@@ -7,6 +7,7 @@
 #include <mutex>
 
 #include "tests/support/no_descriptors.h"
+#include "tests/support/shell_stub.h"
 
 namespace {
 
@@ -76,5 +77,5 @@ extern "C" __attribute__((visibility("default"))) FILE* popen(const char* line, 
         errno = EMFILE;
         return nullptr;
     }
-    return next(line, mode);
+    return shell_stub::open(line, mode, next);
 }
