@@ -9,10 +9,14 @@ namespace IC {
 
 namespace {
 
+/// Runs a switch to its end.
+bool flip(const std::string& command) {
+    return HostCommand(command).started();
+}
+
 bool turnOnIPv6() {
     // The tool takes its option after two blanks as well as after one.
-    return HostCommand(formatCommand("esxcfg-vswif -6 true")).started() &&
-           HostCommand(formatCommand("esxcfg-vmknic  -6 true")).started();
+    return flip("esxcfg-vswif -6 true") && flip("esxcfg-vmknic  -6 true");
 }
 
 }  // namespace
