@@ -75,7 +75,9 @@ bool getStaticIPV6GatewaysOnSuSe10(std::string const& ifName, std::vector<std::s
 void deleteStaticIPv6GatewayOnSuSe10(std::string const& ifName, std::vector<std::string> const& gateways) {
     const LogScope scope;
     for (const std::string& gateway : gateways) {
-        HostCommand::fromText("ip -6 route delete default via " + gateway + " dev " + ifName);
+        std::string command = "ip -6 route delete default via ";
+        command.append(gateway).append(" dev ").append(ifName);
+        HostCommand::fromText(command);
     }
 }
 

@@ -38,7 +38,7 @@ std::string activeMember(const std::string& team, const std::string& port) {
     if (!fs::exists(fs::path(kBonding) / team, unreadable)) {
         return "";
     }
-    const std::string line = answer(formatCommand(
+    std::string line = answer(formatCommand(
         "cat /proc/net/bonding/%s 2> /dev/null | grep -i \"Currently Active Slave: %s\" 2> /dev/null",
         team.c_str(), port.c_str()));
     // The search for eth1 also finds eth10.
@@ -53,7 +53,7 @@ parse::BondingMember sectionOf(const std::string& team, const std::string& port)
 }
 
 std::string miiStatus(const std::string& team, const std::string& port) {
-    const std::string status = answer(
+    std::string status = answer(
         formatCommand("cat /proc/net/bonding/%s 2> /dev/null | grep -P \"Slave Interface: %s\\nMII Status\" "
                       "2> /dev/null | grep \"MII Status: \" 2> /dev/null | cut -d' ' -f3 2> /dev/null",
                       team.c_str(), port.c_str()));
@@ -61,7 +61,7 @@ std::string miiStatus(const std::string& team, const std::string& port) {
 }
 
 std::string linkFailures(const std::string& team, const std::string& port, const std::string& status) {
-    const std::string count =
+    std::string count =
         answer(formatCommand("cat /proc/net/bonding/%s 2> /dev/null | grep -P \"Slave Interface: %s\\nMII "
                              "Status: %s\\n\" 2> /dev/null "
                              "| grep \"Link Failure Count: \" 2> /dev/null | cut -d ' ' -f4 2> /dev/null",
