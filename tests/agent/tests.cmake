@@ -16,6 +16,7 @@ corvista_test(agent LIBRARIES agent_code test_support util SOURCES
   agent/set_command_test.cpp
   agent/surroundings_test.cpp
   agent/suse_host_test.cpp
+  agent/team_test.cpp
   agent/terminal.cpp
   agent/tree_test.cpp
   agent/value_check_test.cpp
