@@ -8,7 +8,6 @@
 namespace {
 
 using IC::MutableNode;
-using IC::Number;
 using IC::PropertyValue;
 
 constexpr unsigned int kProperties = 40;  // about what an IP configuration node holds
@@ -30,7 +29,7 @@ void readProperty(benchmark::State& state) {
     const MutableNode& node = sharedNode();
     PropertyValue value;
     unsigned int id = 0;
-    for (auto _ : state) {
+    for ([[maybe_unused]] auto _ : state) {
         node.getProperty(id++ % kProperties, value);
         benchmark::DoNotOptimize(value);
     }
@@ -41,7 +40,7 @@ void writeProperty(benchmark::State& state) {
     MutableNode& node = sharedNode();
     const PropertyValue value("10.0.0.1", true);
     unsigned int id = 0;
-    for (auto _ : state) {
+    for ([[maybe_unused]] auto _ : state) {
         node.setProperty(id++ % kProperties, value);
     }
 }
@@ -49,7 +48,7 @@ BENCHMARK(writeProperty)->ThreadRange(1, 8)->UseRealTime();
 
 void readAllProperties(benchmark::State& state) {
     const MutableNode& node = sharedNode();
-    for (auto _ : state) {
+    for ([[maybe_unused]] auto _ : state) {
         std::map<unsigned int, PropertyValue> values;
         node.getProperties(values);
         benchmark::DoNotOptimize(values);
@@ -69,7 +68,7 @@ void publishAndWithdraw(benchmark::State& state) {
     for (unsigned int id = 1; id <= others; ++id) {
         interface.appendNode(new MutableNode(id, 0, {1}, 11, id));
     }
-    for (auto _ : state) {
+    for ([[maybe_unused]] auto _ : state) {
         auto* const node = new MutableNode(others + 1, 0, {1}, 11, 0);
         interface.addNewNode(node);
         interface.deleteNode(node);
@@ -83,7 +82,7 @@ void holdNode(benchmark::State& state) {
     for (unsigned int id = 1; id <= count; ++id) {
         interface.appendNode(new MutableNode(id, 0, {1}, 11, id));
     }
-    for (auto _ : state) {
+    for ([[maybe_unused]] auto _ : state) {
         benchmark::DoNotOptimize(interface.hold(count / 2));
     }
 }
@@ -101,7 +100,7 @@ void logCallsWithSinksOff(benchmark::State& state) {
     CVLog::CVLogger::setLog(nullptr, 0);
     CVLog::CVLogger::setTrace(nullptr, 0);
     const std::string message = "initialize: entry";
-    for (auto _ : state) {
+    for ([[maybe_unused]] auto _ : state) {
         logBoth(message);
     }
 }
@@ -111,7 +110,7 @@ BENCHMARK(logCallsWithSinksOff);
 void logLineWithSinksOff(benchmark::State& state) {
     CVLog::CVLogger::setLog(nullptr, 0);
     CVLog::CVLogger::setTrace(nullptr, 0);
-    for (auto _ : state) {
+    for ([[maybe_unused]] auto _ : state) {
         CVLog::CVMessageBuffer buffer;
         buffer << "mypopen():  Count value " << 3;
         logBoth(buffer.str());

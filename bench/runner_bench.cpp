@@ -48,7 +48,7 @@ void runnerAgainstBarePopen(benchmark::State& state) {
     double bare = 0;
     double runner = 0;
     bool bareFirst = true;
-    for (auto _ : state) {
+    for ([[maybe_unused]] auto _ : state) {
         if (bareFirst) {
             bare += seconds(runBare, command);
         }

@@ -8,6 +8,7 @@ corvista_test(framework LABELS threads SOURCES
   framework/netinfo_test.cpp
   framework/node_test.cpp
   framework/number_test.cpp
+  framework/property_file_durability_test.cpp
   framework/property_file_test.cpp
   framework/property_value_test.cpp
   framework/slots_test.cpp
