@@ -1,8 +1,6 @@
 // The queries on links of a real kernel, against what `ip -j` tells of the same links.
 #include <gmock/gmock.h>
 
-#include <regex>
-
 #include "network/address_queries.h"
 #include "network/interface_lists.h"
 #include "network/link_queries.h"
@@ -57,10 +55,11 @@ protected:
     static std::vector<std::string> told(FakeHost& host, const std::string& question,
                                          const std::string& key) {
         const std::string json = host.run({"sh", "-c", "ip -j " + question}).out;
-        const std::regex pattern('"' + key + "\":\"?([^\",}]*)");
+        const std::string label = '"' + key + "\":";
         std::vector<std::string> values;
-        for (std::sregex_iterator at(json.begin(), json.end(), pattern), end; at != end; ++at) {
-            values.push_back((*at)[1]);
+        for (auto at = json.find(label); at != json.npos; at = json.find(label, at + 1)) {
+            const auto start = json.find_first_not_of('"', at + label.size());
+            values.push_back(json.substr(start, json.find_first_of("\",}", start) - start));
         }
         return values;
     }
