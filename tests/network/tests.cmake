@@ -25,3 +25,11 @@ corvista_test(network_queries SOURCES
   network/recording.cpp
   network/route_queries_test.cpp
   LIBRARIES plugin_code test_support)
+
+corvista_test(network_nodes SOURCES
+  network/command_count_test.cpp
+  network/ip_config_node_test.cpp
+  network/ipv4_writer_test.cpp
+  network/lan_endpoint_test.cpp
+  network/port_nodes_test.cpp
+  LIBRARIES plugin_code test_support)
