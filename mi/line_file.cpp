@@ -1,7 +1,6 @@
 #include "mi/line_file.h"
 
 #include <fcntl.h>
-#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -35,42 +34,32 @@ public:
 
     bool opened() const { return descriptor_ >= 0; }
 
-    /// Makes room for `size` bytes without touching the content. False when the disk is full; a file system
-    /// that cannot reserve is taken at its word later.
-    bool reserve(std::size_t size) const {
-        struct stat before {};
-        if (size == 0 || fstat(descriptor_, &before) != 0 ||
-            fallocate(descriptor_, 0, 0, static_cast<off_t>(size)) == 0) {
-            return true;
-        }
-        if (!outOfRoom()) {
-            return true;
-        }
-        cutTo(before.st_size);
-        return false;
+    /// Whether there is room for `size` bytes; nothing is changed. A file system that cannot tell is taken at
+    /// its word later.
+    bool hasRoom(std::size_t size) const {
+        return size == 0 || fallocate(descriptor_, FALLOC_FL_KEEP_SIZE, 0, static_cast<off_t>(size)) == 0 ||
+               !outOfRoom();
     }
 
+    /// Empties the file and writes the content: whoever is killed in between leaves the beginning of the new
+    /// content, never the end of the old one.
     bool put(std::string_view content) const {
-        const auto size = static_cast<off_t>(content.size());
+        // What is no regular file has no length to cut.
+        [[maybe_unused]] const int ignored = ftruncate(descriptor_, 0);
         while (!content.empty()) {
             const ssize_t written = ::write(descriptor_, content.data(), content.size());
             if (written < 0 && errno == EINTR) {
                 continue;
             }
             if (written <= 0) {
-                cutTo(size - static_cast<off_t>(content.size()));
                 return false;
             }
             content.remove_prefix(static_cast<std::size_t>(written));
         }
-        cutTo(size);
         return true;
     }
 
 private:
-    /// What is no regular file has no length to cut.
-    void cutTo(off_t size) const { [[maybe_unused]] const int ignored = ftruncate(descriptor_, size); }
-
     int descriptor_;
 };
 
@@ -119,7 +108,7 @@ LineFile::Written LineFile::replace(const std::string& path) const {
     for (const std::string& line : lines_) {
         content += line;
     }
-    if (!noRoom && file.reserve(content.size()) && file.put(content)) {
+    if (!noRoom && file.hasRoom(content.size()) && file.put(content)) {
         return Written::whole;
     }
     log(kError) << "Could not write all of '" << path << "'.";
