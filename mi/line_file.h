@@ -50,9 +50,9 @@ public:
     /// What became of a file that was to be written.
     enum class Written { notOpened, notWhole, whole };
 
-    /// Replaces the content of the file, created when it is missing. The room it takes is reserved first, so
-    /// that a full disk leaves the file as it was; where the file system cannot reserve, a failure half-way
-    /// leaves what was written so far. Both are logged at level 6000.
+    /// Replaces the content of the file, created when it is missing. A full disk is found out first and
+    /// leaves the file as it was; where the file system cannot tell, a failure half-way leaves what was
+    /// written so far. Both are logged at level 6000.
     Written replace(const std::string& path) const;
     /// The same for writers that go on either way.
     /// @return whether the file could be opened for writing
