@@ -25,8 +25,6 @@ enum class Unit {
     bits,
 };
 
-enum class Access { read, write, readWrite };
-
 /// A code of an enumeration and what it means.
 struct Label {
     unsigned int code;
@@ -52,9 +50,9 @@ struct Property {
     const char* meaning;
     Check check = nullptr;          ///< set for what can be written
     const char* accepts = nullptr;  ///< what check lets pass, in words; null: told from the labels
-    Access access = check == nullptr ? Access::read : Access::readWrite;
+    bool writeOnly = false;
 
-    bool readable() const { return access != Access::write; }
+    bool readable() const { return !writeOnly; }
     bool writable() const { return check != nullptr; }
 };
 

@@ -59,7 +59,8 @@ HOST_TEST(SuseHost, EveryPropertyOfEveryNodeReads) {
     for (const Json& node : tree["nodes"]) {
         const Finished run = suse.run({"get", node["path"], "--json"});
         EXPECT_EQ(run.status, 0) << node["path"];
-        for (const auto& [id, property] : Json::parse(run.out)["properties"].items()) {
+        const Json properties = Json::parse(run.out)["properties"];
+        for (const auto& [id, property] : properties.items()) {
             const bool noOwnerYet = node["class"] == "computer" && (id == "115" || id == "116");
             EXPECT_EQ(property.contains("error"), noOwnerYet) << node["path"] << " " << id << " " << property;
             EXPECT_FALSE(std::isdigit(static_cast<unsigned char>(property["name"].get<std::string>()[0])) !=
