@@ -1,6 +1,8 @@
 // The queries on links of a real kernel, against what `ip -j` tells of the same links.
 #include <gmock/gmock.h>
 
+#include <functional>
+
 #include "network/address_queries.h"
 #include "network/interface_lists.h"
 #include "network/link_queries.h"
@@ -39,15 +41,21 @@ protected:
         for (const char* tool : {"ip", "ethtool", "brctl", "busybox"}) {
             host.realTool(tool);
         }
-        // Classic formats, whatever this machine's own tools print.
-        for (const char* tool : {"ifconfig", "route"}) {
-            host.tool(std::string(tool) + " %any",
-                      {.out = "", .action = "busybox " + std::string(tool) + " \"$@\""});
-        }
         host.useKernelNetwork();
         for (const char* command : kWiring) {
             const Finished done = host.run({"sh", "-c", std::string("ip ") + command});
             ASSERT_EQ(done.status, 0) << command << ": " << done.err;
+        }
+    }
+
+    /// Asks with each program that prints the classic formats, whatever this machine's own tools print.
+    static void withEachTool(FakeHost& host, const std::function<void()>& questions) {
+        for (const std::string& program : {std::string("busybox "), buildDirectory() + "/hosttools/bin/"}) {
+            SCOPED_TRACE("asked with " + program);
+            for (const std::string tool : {"ifconfig", "route"}) {
+                host.tool(tool + " %any", {.out = "", .action = program + tool + " \"$@\""});
+            }
+            questions();
         }
     }
 
@@ -76,25 +84,29 @@ std::string dotted(unsigned int prefixLength) {
 }
 
 HOST_TEST_F(KernelNetwork, HardwareAddresses) {
-    for (const std::string name : {"lan0", "lan1", "lan2", "sw0", "br0"}) {
-        std::string address;
-        IC::getHardwareAddress(name, address);
-        EXPECT_EQ(address, toldOnce(host, "link show " + name, "address")) << name;
-        EXPECT_EQ(address.size(), 17U) << name;
-    }
+    withEachTool(host, [&host] {
+        for (const std::string name : {"lan0", "lan1", "lan2", "sw0", "br0"}) {
+            std::string address;
+            IC::getHardwareAddress(name, address);
+            EXPECT_EQ(address, toldOnce(host, "link show " + name, "address")) << name;
+            EXPECT_EQ(address.size(), 17U) << name;
+        }
+    });
 }
 
 HOST_TEST_F(KernelNetwork, IPv4Addresses) {
-    for (const std::string name : {"lan0", "lan1"}) {
-        std::string address;
-        std::string mask;
-        EXPECT_TRUE(IC::getIPv4Details(name, address, mask)) << name;
-        EXPECT_EQ(address, toldOnce(host, "-4 address show dev " + name, "local"));
-        EXPECT_EQ(mask, dotted(static_cast<unsigned int>(
-                            std::stoul(toldOnce(host, "-4 address show dev " + name, "prefixlen")))));
-    }
-    std::string none;
-    EXPECT_FALSE(IC::getIPv4Details("lan2", none, none));
+    withEachTool(host, [&host] {
+        for (const std::string name : {"lan0", "lan1"}) {
+            std::string address;
+            std::string mask;
+            EXPECT_TRUE(IC::getIPv4Details(name, address, mask)) << name;
+            EXPECT_EQ(address, toldOnce(host, "-4 address show dev " + name, "local"));
+            EXPECT_EQ(mask, dotted(static_cast<unsigned int>(
+                                std::stoul(toldOnce(host, "-4 address show dev " + name, "prefixlen")))));
+        }
+        std::string none;
+        EXPECT_FALSE(IC::getIPv4Details("lan2", none, none));
+    });
 }
 
 HOST_TEST_F(KernelNetwork, IPv6Addresses) {
@@ -113,48 +125,55 @@ HOST_TEST_F(KernelNetwork, IPv6Addresses) {
 }
 
 HOST_TEST_F(KernelNetwork, ProtocolsAndKinds) {
-    struct Expected {
-        const char* name;
-        unsigned int code;
-        unsigned int kind;
-    };
-    for (const auto& [name, code, kind] : {Expected{"lan0", 4098, 7}, {"lan1", 4096, 2}, {"lan2", 4097, 5}}) {
-        unsigned int answer = 0;
-        EXPECT_TRUE(IC::getProtocolIIFType(name, answer));
-        EXPECT_EQ(answer, code) << name;
-        EXPECT_TRUE(IC::getIPv6AddressType(name, answer));
-        EXPECT_EQ(answer, kind) << name;
-    }
+    withEachTool(host, [] {
+        struct Expected {
+            const char* name;
+            unsigned int code;
+            unsigned int kind;
+        };
+        for (const auto& [name, code, kind] :
+             {Expected{"lan0", 4098, 7}, {"lan1", 4096, 2}, {"lan2", 4097, 5}}) {
+            unsigned int answer = 0;
+            EXPECT_TRUE(IC::getProtocolIIFType(name, answer));
+            EXPECT_EQ(answer, code) << name;
+            EXPECT_TRUE(IC::getIPv6AddressType(name, answer));
+            EXPECT_EQ(answer, kind) << name;
+        }
+    });
 }
 
 HOST_TEST_F(KernelNetwork, Gateways) {
-    const std::string gateway = toldOnce(host, "-4 route show default", "gateway");
-    const std::string gateway6 = toldOnce(host, "-6 route show default", "gateway");
-    std::string answer;
-    EXPECT_TRUE(IC::getIPV4Gateway("lan0", answer));
-    EXPECT_EQ(answer, gateway);
-    EXPECT_TRUE(IC::getIPV4Gateway("lan1", answer)) << "on-link routes alone: the host's default";
-    EXPECT_EQ(answer, gateway);
-    EXPECT_TRUE(IC::getIPV6Gateway("lan0", answer));
-    EXPECT_EQ(answer, gateway6);
-    EXPECT_FALSE(IC::getIPV6Gateway("lan2", answer));
-    EXPECT_FALSE(IC::getIPV4Gateway("lan2", answer));
+    withEachTool(host, [&host] {
+        const std::string gateway = toldOnce(host, "-4 route show default", "gateway");
+        const std::string gateway6 = toldOnce(host, "-6 route show default", "gateway");
+        std::string answer;
+        EXPECT_TRUE(IC::getIPV4Gateway("lan0", answer));
+        EXPECT_EQ(answer, gateway);
+        EXPECT_TRUE(IC::getIPV4Gateway("lan1", answer)) << "on-link routes alone: the host's default";
+        EXPECT_EQ(answer, gateway);
+        EXPECT_TRUE(IC::getIPV6Gateway("lan0", answer));
+        EXPECT_EQ(answer, gateway6);
+        EXPECT_FALSE(IC::getIPV6Gateway("lan2", answer));
+        EXPECT_FALSE(IC::getIPV4Gateway("lan2", answer));
+    });
 }
 
 HOST_TEST_F(KernelNetwork, Links) {
-    for (const std::string name : {"lan0", "lan1", "lan2", "sw0"}) {
-        const std::string state = toldOnce(host, "link show " + name, "operstate");
-        EXPECT_EQ(IC::isNICUp(name), state == "UP") << name << " is " << state;
-        EXPECT_TRUE(IC::isInterfaceUP(name)) << name;
-        unsigned long long speed = 0;
-        EXPECT_TRUE(IC::getNetworkSpeed(name, speed));
-        EXPECT_EQ(speed, 10'000'000U) << "what the kernel says of every veth";
-        EXPECT_TRUE(IC::getNetworkDuplex(name));
-    }
-    EXPECT_TRUE(IC::isNICUp("lan0"));
-    EXPECT_FALSE(IC::isNICUp("lan2")) << "its other end is down";
-    EXPECT_FALSE(IC::isInterfaceUP("sw2"));
-    EXPECT_FALSE(IC::isNICUp("lan7"));
+    withEachTool(host, [&host] {
+        for (const std::string name : {"lan0", "lan1", "lan2", "sw0"}) {
+            const std::string state = toldOnce(host, "link show " + name, "operstate");
+            EXPECT_EQ(IC::isNICUp(name), state == "UP") << name << " is " << state;
+            EXPECT_TRUE(IC::isInterfaceUP(name)) << name;
+            unsigned long long speed = 0;
+            EXPECT_TRUE(IC::getNetworkSpeed(name, speed));
+            EXPECT_EQ(speed, 10'000'000U) << "what the kernel says of every veth";
+            EXPECT_TRUE(IC::getNetworkDuplex(name));
+        }
+        EXPECT_TRUE(IC::isNICUp("lan0"));
+        EXPECT_FALSE(IC::isNICUp("lan2")) << "its other end is down";
+        EXPECT_FALSE(IC::isInterfaceUP("sw2"));
+        EXPECT_FALSE(IC::isNICUp("lan7"));
+    });
 }
 
 HOST_TEST_F(KernelNetwork, BridgeMembers) {

@@ -33,3 +33,5 @@ corvista_test(network_nodes SOURCES
   network/lan_endpoint_test.cpp
   network/port_nodes_test.cpp
   LIBRARIES plugin_code test_support)
+# The links of a real kernel are asked with our own classic tools too.
+add_dependencies(network_queries_test corvista-hosttools)
