@@ -17,8 +17,10 @@ target_link_libraries(corvista_options INTERFACE Threads::Threads)
 
 if(CORVISTA_SANITIZE)
   add_compile_options(-fsanitize=${CORVISTA_SANITIZE} -fno-omit-frame-pointer -fno-sanitize-recover=all)
-  # Instrumented code misleads these warnings of the optimiser; the plain builds have them.
-  add_compile_options(-Wno-array-bounds -Wno-stringop-overflow -Wno-restrict -Wno-maybe-uninitialized)
+  # Instrumented code misleads these warnings of g++'s optimiser; the plain builds have them. clang++ does not know them.
+  if(CMAKE_CXX_COMPILER_ID STREQUAL "GNU")
+    add_compile_options(-Wno-array-bounds -Wno-stringop-overflow -Wno-restrict -Wno-maybe-uninitialized)
+  endif()
   add_link_options(-fsanitize=${CORVISTA_SANITIZE})
 endif()
 
