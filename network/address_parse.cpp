@@ -1,7 +1,5 @@
 #include "network/address_parse.h"
 
-#include <algorithm>
-
 #include "mi/text.h"
 #include "network/link_parse.h"
 
@@ -46,11 +44,10 @@ std::optional<std::string> gatewayField(const std::string& line) {
     return trimEnd(line.substr(gateway, line.find(' ', gateway) - gateway));
 }
 
-std::string bootProto(const std::string& line) {
-    std::string keyword = trimEnd(line);
-    std::erase(keyword, '\'');
-    std::erase(keyword, '"');
-    return keyword;
+std::string unquoted(const std::string& line) {
+    std::string value = trimEnd(line);
+    std::erase_if(value, [](char letter) { return letter == '\'' || letter == '"'; });
+    return value;
 }
 
 std::string dhcpv6Server(const std::string& line) {

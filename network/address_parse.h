@@ -23,8 +23,8 @@ unsigned int addressKind(const std::string& scope);
 /// The second field of a line of `route -n`: the gateway; nothing in a line of one field.
 std::optional<std::string> gatewayField(const std::string& line);
 
-/// The keyword of a BOOTPROTO value, all its quotes removed.
-std::string bootProto(const std::string& line);
+/// A value of a shell-style file, all its quotes removed.
+std::string unquoted(const std::string& line);
 
 /// The server identity of a lease file's SDUID entry, without the semicolons at its end.
 std::string dhcpv6Server(const std::string& line);

@@ -3,6 +3,7 @@
 #include "mi/command.h"
 #include "mi/log.h"
 #include "network/address_parse.h"
+#include "network/interface_file.h"
 
 namespace IC {
 
@@ -15,12 +16,8 @@ bool checkIsDhcp(const std::string& name) {
 void getBootProto(const std::string& name, std::string& keyword) {
     const LogScope scope("Entering getBootProto", "Exiting getBootProto");
     keyword.clear();
-    const FirstLine answer = firstLine(
-        formatCommand("cat /etc/sysconfig/network/ifcfg-eth-id-`ifconfig %s 2> /dev/null |grep HWaddr "
-                      "|awk '{print $5}'|tr '[A-Z]' '[a-z]'` | grep BOOTPROTO | cut -d '=' -f2 2> /dev/null",
-                      name.c_str()));
-    if (answer.line) {
-        keyword = parse::bootProto(*answer.line);
+    if (const auto value = interfaceFileValue(name, "BOOTPROTO")) {
+        keyword = parse::unquoted(*value);
     }
 }
 

@@ -1,5 +1,6 @@
 #include "network/interface_file.h"
 
+#include "mi/command.h"
 #include "mi/text.h"
 
 namespace IC {
@@ -36,6 +37,14 @@ void InterfaceFile::appendMissing(std::initializer_list<const KeyLine*> keys) {
 
 std::string InterfaceFile::lastLine() const {
     return file_.lines().empty() ? "" : file_.lines().back();
+}
+
+std::optional<std::string> interfaceFileValue(const std::string& ifName, const char* key) {
+    return firstLine(
+               formatCommand("cat /etc/sysconfig/network/ifcfg-eth-id-`ifconfig %s 2> /dev/null |grep HWaddr "
+                             "|awk '{print $5}'|tr '[A-Z]' '[a-z]'` | grep %s | cut -d '=' -f2 2> /dev/null",
+                             ifName.c_str(), key))
+        .line;
 }
 
 }  // namespace IC

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <initializer_list>
+#include <optional>
 #include <string>
 
 #include "mi/line_file.h"
@@ -44,5 +45,11 @@ private:
     std::string path_;
     LineFile file_;
 };
+
+/// What stands behind the '=' in the first line of an interface's file that holds a key, asked of the shell:
+/// the file is found by the interface's hardware address.
+/// @param key looked for anywhere in a line
+/// @return as it was printed, line break included; nothing without such a line
+std::optional<std::string> interfaceFileValue(const std::string& ifName, const char* key);
 
 }  // namespace IC

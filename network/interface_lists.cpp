@@ -1,6 +1,5 @@
 #include "network/interface_lists.h"
 
-#include "mi/command.h"
 #include "mi/log.h"
 #include "network/link_parse.h"
 
@@ -25,15 +24,19 @@ bool getbridgeInterfaces(std::vector<std::string>& members) {
     return any;
 }
 
+HostCommand bondMemberLines(const std::string& bond) {
+    return HostCommand::fromText("cat /proc/net/bonding/" + bond +
+                                 " 2> /dev/null | grep \"Slave Interface:\"");
+}
+
 bool getSlaveInterfaces(const std::string& bond, std::vector<std::string>& members) {
     const LogScope scope("Entering getSlaveInterfaces", "Exiting getSlaveInterfaces");
-    HostCommand slaves =
-        HostCommand::fromText("cat /proc/net/bonding/" + bond + " 2> /dev/null | grep \"Slave Interface:\"");
-    if (!slaves.started()) {
+    HostCommand lines = bondMemberLines(bond);
+    if (!lines.started()) {
         log(kError) << "isNICUp - grepping slave device error";
         return false;
     }
-    while (const auto line = slaves.nextLine()) {
+    while (const auto line = lines.nextLine()) {
         const std::string& member = members.emplace_back(parse::bondMember(*line));
         log(kProgress) << "Slave Found:" << member;
     }

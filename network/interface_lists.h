@@ -4,6 +4,7 @@
 #include <vector>
 
 #include "framework/netinfo/network_info.h"
+#include "mi/command.h"
 
 namespace IC {
 
@@ -17,6 +18,9 @@ bool getNICString(const std::string& line, std::string& name);
 /// @param members is appended to
 /// @return whether the listing had a line
 bool getbridgeInterfaces(std::vector<std::string>& members);
+
+/// The lines of a bond's file below /proc/net/bonding that name its members.
+HostCommand bondMemberLines(const std::string& bond);
 
 /// The members of a bond, in the order of its file below /proc/net/bonding.
 /// @param members is appended to

@@ -1,9 +1,8 @@
 #include "network/ip_facts.h"
 
-#include <algorithm>
-
 #include "mi/command.h"
 #include "mi/text.h"
+#include "network/address_parse.h"
 #include "network/dhcp_queries.h"
 #include "network/ipv6_writer.h"
 #include "network/route_queries.h"
@@ -26,9 +25,7 @@ std::vector<std::string> dhcpServersOf(const std::string& name) {
         "cat /var/lib/dhcpcd/dhcpcd-%s.info 2> /dev/null | grep DHCPSID | cut -d '=' -f2 2> /dev/null",
         name.c_str()));
     if (lease.line) {
-        std::string server = trimEnd(*lease.line);
-        std::erase_if(server, [](char letter) { return letter == '\'' || letter == '"'; });
-        servers.push_back(server);
+        servers.push_back(parse::unquoted(*lease.line));
     }
     if (std::string server; getDHCPv6Servers(name, server)) {
         servers.push_back(server);

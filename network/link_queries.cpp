@@ -5,6 +5,7 @@
 #include "mi/command.h"
 #include "mi/log.h"
 #include "mi/text.h"
+#include "network/interface_lists.h"
 #include "network/link_parse.h"
 
 namespace IC {
@@ -20,12 +21,9 @@ std::optional<std::string> ethtoolLine(const std::optional<std::string>& command
     return answer.line;
 }
 
-HostCommand grepBondFile(const std::string& bond, const char* label) {
-    return HostCommand::fromText("cat /proc/net/bonding/" + bond + " 2> /dev/null | grep \"" + label + "\"");
-}
-
 bool isMiiStatusUp(const std::string& bond) {
-    const FirstLine status = firstLine(grepBondFile(bond, "MII Status:"));
+    const FirstLine status = firstLine(
+        HostCommand::fromText("cat /proc/net/bonding/" + bond + " 2> /dev/null | grep \"MII Status:\""));
     if (!status.started) {
         log(kError) << "isNICUp - cat /proc/net/bonding/bond* error";
     }
@@ -33,13 +31,13 @@ bool isMiiStatusUp(const std::string& bond) {
 }
 
 bool areMembersUp(const std::string& bond) {
-    HostCommand members = grepBondFile(bond, "Slave Interface:");
-    if (!members.started()) {
+    HostCommand lines = bondMemberLines(bond);
+    if (!lines.started()) {
         log(kError) << "isNICUp - grepping slave device error";
         return false;
     }
     bool any = false;
-    while (const auto line = members.nextLine()) {
+    while (const auto line = lines.nextLine()) {
         if (!isNICUp(parse::bondMemberToProbe(*line))) {
             return false;
         }

@@ -31,8 +31,9 @@ bool getIPV4Gateway(const std::string& name, std::string& gateway) {
         }
         while (const auto line = routes.nextLine()) {
             log(kProgress) << "Buff :" << *line;
-            gateway = parse::gatewayField(*line).value_or(gateway);
-            if (!gateway.empty() && gateway != kOnLink) {
+            const auto field = parse::gatewayField(*line);
+            gateway = field.value_or(gateway);
+            if (field && gateway != kOnLink) {
                 return true;
             }
         }

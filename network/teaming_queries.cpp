@@ -7,6 +7,7 @@
 #include "mi/log.h"
 #include "mi/text.h"
 #include "network/bonding_status.h"
+#include "network/interface_file.h"
 
 namespace IC {
 
@@ -26,11 +27,8 @@ std::string behindColon(const std::string& line) {
     return trimStart(trimEnd(line));
 }
 
-std::string interfaceFileValue(const std::string& port, const char* key) {
-    return answer(
-        formatCommand("cat /etc/sysconfig/network/ifcfg-eth-id-`ifconfig %s 2> /dev/null |grep HWaddr "
-                      "|awk '{print $5}'|tr '[A-Z]' '[a-z]'` | grep %s | cut -d '=' -f2 2> /dev/null",
-                      port.c_str(), key));
+std::string roleValue(const std::string& port, const char* key) {
+    return trimEnd(interfaceFileValue(port, key).value_or(""));
 }
 
 std::string activeMember(const std::string& team, const std::string& port) {
@@ -78,13 +76,13 @@ std::string linkFailures(const std::string& team, const std::string& port, const
 
 bool getNICTeams(std::vector<std::string>& teams) {
     const LogScope scope("Entering getNICTeams", "Exiting getNICTeams");
-    std::error_code missing;
-    fs::directory_iterator directory(kBonding, missing);
-    if (missing) {
+    std::error_code failed;
+    fs::directory_iterator entry(kBonding, failed);
+    if (failed) {
         return false;
     }
-    for (const auto& entry : directory) {
-        const std::string name = entry.path().filename();
+    for (; entry != fs::directory_iterator(); entry.increment(failed)) {
+        const std::string name = entry->path().filename();
         if (!name.starts_with('.') && !name.ends_with('~')) {
             teams.push_back(name);
         }
@@ -122,8 +120,8 @@ void getNICTeamingInformation(std::string const& port, unsigned int id, std::str
     const LogScope scope("Entering getNICTeamingInformation", "Exiting getNICTeamingInformation");
     switch (id) {
         case TeamingProperty::role:
-            result = interfaceFileValue(port, "SLAVE");
-            master = interfaceFileValue(port, "MASTER");
+            result = roleValue(port, "SLAVE");
+            master = roleValue(port, "MASTER");
             break;
         case TeamingProperty::activeMember:
             result = activeMember(master, port);

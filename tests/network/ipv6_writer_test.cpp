@@ -164,6 +164,13 @@ HOST_TEST(StaticIPv6Gateways, AreTheNextHopsNoRouterAdvertised) {
     EXPECT_THAT(commands.all(), ElementsAre(kListing));
 }
 
+HOST_TEST(StaticIPv6Gateways, AreAlsoThoseOfLongerNames) {
+    routingTable(host, route("fd00::10", "UG", "eth10"));
+    Lines gateways;
+    EXPECT_TRUE(IC::getStaticIPV6GatewaysOnSuSe10("eth1", gateways));
+    EXPECT_THAT(gateways, ElementsAre("fd00::10"));
+}
+
 HOST_TEST(StaticIPv6Gateways, AreNoneWithoutALineOrATool) {
     routingTable(host, route("::", "U", "eth0"));
     Lines gateways;

@@ -283,17 +283,17 @@ TEST(GatewayField, IsTheSecondBetweenBlanks) {
     }
 }
 
-TEST(BootProtocols, LoseAllQuotes) {
-    EXPECT_EQ(bootProto("'dhcp'\n"), "dhcp");
-    EXPECT_EQ(bootProto("\"static\"\n"), "static");
-    EXPECT_EQ(bootProto("none\n"), "none");
-    EXPECT_EQ(bootProto("'\"d'h\"c\"p'\n\n"), "dhcp");
-    EXPECT_EQ(bootProto("`dhcp`\n"), "`dhcp`");
-    EXPECT_EQ(bootProto(" 'dhcp' \r\n"), " dhcp \r");
-    EXPECT_EQ(bootProto("'\n'"), "\n");
-    EXPECT_EQ(bootProto("''\n"), "");
-    EXPECT_EQ(bootProto("\n"), "");
-    EXPECT_EQ(bootProto(""), "");
+TEST(Unquoted, LosesAllQuotesAndTheLineBreak) {
+    EXPECT_EQ(unquoted("'dhcp'\n"), "dhcp");
+    EXPECT_EQ(unquoted("\"static\"\n"), "static");
+    EXPECT_EQ(unquoted("none\n"), "none");
+    EXPECT_EQ(unquoted("'\"d'h\"c\"p'\n\n"), "dhcp");
+    EXPECT_EQ(unquoted("`dhcp`\n"), "`dhcp`");
+    EXPECT_EQ(unquoted(" 'dhcp' \r\n"), " dhcp \r");
+    EXPECT_EQ(unquoted("'\n'"), "\n");
+    EXPECT_EQ(unquoted("''\n"), "");
+    EXPECT_EQ(unquoted("\n"), "");
+    EXPECT_EQ(unquoted(""), "");
 }
 
 TEST(DhcpV6ServerIdentities, LoseTheSemicolonsAtTheEnd) {

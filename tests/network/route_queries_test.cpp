@@ -67,6 +67,13 @@ HOST_TEST(IPv4Gateway, SeesTheRoutesOfLongerNames) {
     EXPECT_EQ(gateway, "10.10.10.1") << "that of eth10";
 }
 
+HOST_TEST(IPv4Gateway, EmptyFieldOfALineThatWasCutOffEndsTheSearchToo) {
+    host.tool("route -n", "eth0 \n0.0.0.0 192.168.17.1 0.0.0.0 UG 0 0 0 eth0\n");
+    std::string gateway = "before";
+    EXPECT_TRUE(IC::getIPV4Gateway("eth0", gateway));
+    EXPECT_EQ(gateway, "");
+}
+
 HOST_TEST(IPv6Gateway, IsTheNextHopOfTheFirstRouteThatHasOne) {
     host.tool("route -A inet6 -n", recording("route6/two-ports.txt"));
     const CommandLines commands;
