@@ -57,7 +57,7 @@ class Watch:
         self.pid = None
 
     def start(self):
-        line = f"cvagent watch --json --log {LOG} --log-level 3000 > {EVENTS} 2> /run/watch.err"
+        line = f"cvagent watch --json --log {LOG} --log-level 3000 >> {EVENTS} 2> /run/watch.err"
         self.guest.sh(f": > {EVENTS}; : > {LOG}; {line} & echo $! > /run/watch.pid")
         self.pid = int(self.guest.read("/run/watch.pid"))
         self.wait_log("returning from createCurNetNodeMap", 1)

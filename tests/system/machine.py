@@ -8,7 +8,7 @@ import subprocess
 import time
 
 NICS = 5
-SMALL_DISKS = {"sda": 64, "sdb": 24}  # MiB
+DISKS = {"sda": 6144, "sdb": 24}  # MiB; the first has more bytes than 32 bits count
 LONGEST_BOOT = 240  # seconds of real time, on a machine that is busy with other things
 LONGEST_COMMAND = 240
 
@@ -78,7 +78,7 @@ class Machine:
         self.directory = directory
         self.console = os.path.join(directory, "console.log")
         self.events = []
-        for name, megabytes in SMALL_DISKS.items():
+        for name, megabytes in DISKS.items():
             self.make_disk(name, megabytes)
         self.process = subprocess.Popen(self._command(kernel, initramfs), stdin=subprocess.DEVNULL,
                                         stdout=open(os.path.join(directory, "qemu.log"), "wb"),
@@ -106,7 +106,7 @@ class Machine:
         for nic in range(NICS):  # each on a wire of its own, with nobody at the other end
             words += ["-netdev", f"hubport,id=wire{nic},hubid={nic}",
                       "-device", f"e1000,id=nic{nic},netdev=wire{nic},mac={mac(nic)}"]
-        for name in SMALL_DISKS:
+        for name in DISKS:
             words += ["-blockdev", json.dumps(self._block_device(name)),
                       "-device", f"scsi-hd,id={name},bus=scsi.0,drive=drive-{name}"]
         return words

@@ -2,6 +2,8 @@
 
 import argparse
 import os
+import re
+import resource
 import shutil
 import tempfile
 import time
@@ -13,6 +15,8 @@ from machine import Machine, MachineFailure
 from tap import CHECKS, Report
 
 import checks_tree  # noqa: F401  each registers its checks, in this order
+import checks_events  # noqa: F401
+import checks_settings  # noqa: F401
 
 
 class Context:
@@ -23,13 +27,14 @@ class Context:
         self.guest = Guest(machine)
         self.watch = Watch(self.guest)
         self.tree = None
+        self.alone = False
 
 
 def arguments():
     parser = argparse.ArgumentParser(description=__doc__)
     parser.add_argument("--build", required=True, help="build directory of the 32-bit programs")
     parser.add_argument("--cache", required=True, help="where downloaded packages are kept")
-    parser.add_argument("--only", default="", help="run only the checks whose name contains this")
+    parser.add_argument("--only", default="", help="run only the checks whose name matches this pattern")
     return parser.parse_args()
 
 
@@ -38,7 +43,7 @@ def evidence_of(context):
     def collect():
         yield "the guest's console", context.machine.console_tail()
         try:
-            yield "the plug-in's log", context.machine.run(f"tail -n 120 {LOG}", 60).lines()
+            yield "the plug-in's log", context.machine.run(f"tail -n 60 {LOG}", 60).lines()
             yield "standard error of the agent", context.machine.run("tail -n 20 /run/watch.err", 60).lines()
         except (MachineFailure, OSError) as failure:
             yield "the plug-in's log", [f"cannot be read: {failure}"]
@@ -66,7 +71,7 @@ def boot(options, directory):
 def main():
     options = arguments()
     os.makedirs(options.cache, exist_ok=True)
-    checks = [(name, function) for name, function in CHECKS if options.only in name]
+    checks = [(name, function) for name, function in CHECKS if re.search(options.only, name)]
     report = Report()
     start = time.monotonic()
     with tempfile.TemporaryDirectory(prefix="corvista-system-test.") as directory:
@@ -77,7 +82,8 @@ def main():
                 report.run(name, function, context, evidence_of(context))
         finally:
             machine.stop()
-    print(f"# took {time.monotonic() - start:.0f} s")
+    used = resource.getrusage(resource.RUSAGE_CHILDREN)
+    print(f"# took {time.monotonic() - start:.0f} s, {used.ru_utime + used.ru_stime:.0f} s of processor time")
     return report.finish(len(checks))
 
 
