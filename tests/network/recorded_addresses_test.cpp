@@ -114,7 +114,7 @@ constexpr Gateway kGateways[] = {
     {"point-to-point-default", "ppp0", true, "0.0.0.0"},
     {"point-to-point-default", "eth0", true, "0.0.0.0"},
     {"dynamic-flags", "eth0", true, "192.168.17.1"},
-    {"ten-before-one", "eth10", true, "10.10.10.1"},
+    {"ten-before-one", "eth10", true, "10.10.10.7"},
     {"bond", "bond0", true, "10.20.30.1"},
     {"bridge", "br0", true, "192.168.50.1"},
     {"docker", "docker0", true, "192.168.50.1"},
@@ -124,8 +124,8 @@ constexpr Gateway kGateways[] = {
     {"fifteen-characters", "enp0s20f0u4c2i2", true, "169.254.95.118"},
     {"empty-table", "eth0", false, ""},
     {"nothing", "eth0", false, ""},
-    // Names are matched anywhere in the line: eth1 has eth10's gateway, and a VLAN's.
-    {"ten-before-one", "eth1", true, "10.10.10.1"},
+    // Names are matched anywhere in the line: eth1 has a gateway of eth10, and a VLAN's.
+    {"ten-before-one", "eth1", true, "10.10.10.7"},
     {"vlan-only", "eth1", true, "10.10.0.1"},
     {"names-not-numbers", "eth0", true, "gw.example.net"},
     {"only-star", "eth0", true, "*"},
