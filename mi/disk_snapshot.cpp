@@ -1,6 +1,7 @@
 #include "mi/disk_snapshot.h"
 
 #include "mi/globals.h"
+#include "mi/log.h"
 
 namespace IC {
 
@@ -23,6 +24,14 @@ HostCommand startUnderFileLock(const std::optional<std::string>& command) {
 
 bool takeDiskSnapshot() {
     return startUnderFileLock(diskSnapshotCommand).started();
+}
+
+void deleteFdiskTmp() {
+    const LogScope scope;
+    log(kProgress) << "Deleting " << diskSnapshotPath;
+    if (!startUnderFileLock(formatCommand("rm %s 2> /dev/null", diskSnapshotPath)).started()) {
+        log(kError) << "Could not delete " << diskSnapshotPath;
+    }
 }
 
 }  // namespace IC

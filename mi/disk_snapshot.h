@@ -18,4 +18,7 @@ HostCommand startUnderFileLock(const std::optional<std::string>& command);
 /// @return whether fdisk could be started
 bool takeDiskSnapshot();
 
+/// Removes the snapshot; one that is not there is no failure.
+void deleteFdiskTmp();
+
 }  // namespace IC

@@ -10,9 +10,8 @@ namespace IC {
 /// level 6000 and ends the operation; what was done before stays done.
 /// @param domainName may be empty: the command then takes the host name alone, the files "host."
 /// @param operation  only logged
-/// @param ipAddress  the address of the entry; empty: 127.0.0.2. Every line of /etc/hosts that contains it,
-/// or
-///                   127.0.0.2, anywhere gives way to the new entry at the end
+/// @param ipAddress  the address of the entry; empty: 127.0.0.2. Every line of /etc/hosts that contains
+///                   it, or 127.0.0.2, anywhere gives way to the new entry at the end
 void executeDomainandHostnameChanges(std::string hostName, std::string domainName, bool operation,
                                      std::string ipAddress);
 

@@ -1,5 +1,6 @@
 #include "mi/os_hw_mi.h"
 
+#include "mi/disk_snapshot.h"
 #include "mi/globals.h"
 #include "mi/log.h"
 #include "mi/shut_down.h"

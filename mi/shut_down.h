@@ -2,11 +2,7 @@
 
 namespace IC {
 
-// What the plug-in leaves behind on the host is removed by the room that made it.
-
-/// Removes the saved settings of every interface (network/).
+/// Removes the saved settings of every interface. Implemented in network/, whose files they are.
 void deleteSavedConfigurations();
-/// Removes the disk snapshot (storage/).
-void deleteFdiskTmp();
 
 }  // namespace IC

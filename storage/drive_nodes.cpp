@@ -5,8 +5,8 @@
 #include "mi/log.h"
 #include "mi/node_types.h"
 #include "mi/text.h"
-#include "storage/hard_drive_node.h"
 #include "storage/storage_build.h"
+#include "storage/storage_nodes.h"
 
 namespace IC {
 

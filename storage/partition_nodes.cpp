@@ -4,8 +4,8 @@
 #include "mi/log.h"
 #include "mi/node_types.h"
 #include "mi/text.h"
-#include "storage/disk_partition.h"
 #include "storage/storage_build.h"
+#include "storage/storage_nodes.h"
 
 namespace IC {
 

@@ -6,11 +6,11 @@ corvista_test(computer LIBRARIES plugin_code test_support SOURCES
   computer/computer_node_test.cpp
   computer/computer_start_test.cpp
   computer/failing_calls.cpp
-  computer/firmware_version_test.cpp
   computer/host_name_test.cpp
   computer/hosts_file_test.cpp
   computer/local_time_test.cpp
   computer/owner_data_test.cpp
+  computer/system_data_test.cpp
   computer/zone_table_test.cpp)
 target_compile_definitions(computer_test PRIVATE
   CVAGENT_PROGRAM="$<TARGET_FILE:cvagent>" CORVISTA_PLUGIN="$<TARGET_FILE:vantrelcvicoshwmi>")

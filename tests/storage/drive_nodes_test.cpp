@@ -2,8 +2,7 @@
 #include "mi/disk_snapshot.h"
 #include "mi/globals.h"
 #include "mi/node_types.h"
-#include "mi/shut_down.h"
-#include "storage/hard_drive_node.h"
+#include "storage/storage_nodes.h"
 #include "tests/storage/storage_host.h"
 
 namespace {

@@ -2,7 +2,7 @@
 #include "mi/disk_snapshot.h"
 #include "mi/globals.h"
 #include "mi/node_types.h"
-#include "storage/disk_partition.h"
+#include "storage/storage_nodes.h"
 #include "tests/storage/storage_host.h"
 
 namespace {

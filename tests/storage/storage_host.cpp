@@ -6,8 +6,7 @@
 
 #include "mi/globals.h"
 #include "mi/node_types.h"
-#include "storage/disk_partition.h"
-#include "storage/hard_drive_node.h"
+#include "storage/storage_nodes.h"
 #include "tests/support/command_lines.h"
 
 namespace IC {

@@ -1,8 +1,13 @@
-#include "computer/firmware_version.h"
+#include "computer/system_data.h"
 
+#include <unistd.h>
+
+#include <array>
 #include <cstring>
 
+#include "mi/command.h"
 #include "mi/log.h"
+#include "mi/os_hw_mi.h"
 
 namespace IC {
 
@@ -54,6 +59,24 @@ int formatHostFirmwareVersion(char* ver_in, unsigned int size_ver_in, char* ver_
         return 1;
     }
     return 0;
+}
+
+std::string getSystemName() {
+    const LogScope scope;
+    // Callers know the empty text as the answer, and it stays that: the kernel's name has never become part
+    // of the text's length. It is asked for into a buffer of its own, because 255 bytes do not fit where an
+    // empty text keeps its few characters.
+    std::array<char, 255> name{};
+    [[maybe_unused]] const int ignored = gethostname(name.data(), name.size());
+    return {};
+}
+
+/// Refreshes the system's vital-product-data database. Hosts have one of the two tools, or none.
+void OsHwMI::vpdUpdate() {
+    const LogScope scope;
+    for (const char* tool : {"/usr/sbin/vpdupdate 2> /dev/null", "/sbin/update-lsvpd-db 2> /dev/null"}) {
+        const HostCommand run{std::string(tool)};
+    }
 }
 
 }  // namespace IC

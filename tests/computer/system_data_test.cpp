@@ -1,12 +1,11 @@
-// Operations beside the computer node: firmware version, vital product data, system name.
-#include "computer/firmware_version.h"
+// Firmware version, system name, vital product data.
+#include "computer/system_data.h"
 
 #include <gmock/gmock.h>
 
 #include <array>
 #include <cstring>
 
-#include "computer/system_name.h"
 #include "mi/my_process.h"
 #include "mi/os_hw_mi.h"
 #include "tests/computer/failing_calls.h"
