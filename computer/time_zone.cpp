@@ -36,21 +36,24 @@ bool replaceFirst(LineFile& file, const char* key, const std::string& replacemen
 }
 
 /// Writes the changed lines to the copy and the copy back. Each way is left out when a file of its cannot be
-/// opened. A copy that is not whole, for want of room, is never taken back, and a copy that could not be
-/// taken back whole is not removed: it is all there is.
+/// opened. A copy that is not whole, for want of room, is not taken back.
 void rewriteClock(const std::string& timezoneLine) {
     auto written = LineFile::Written::notOpened;
     if (auto clock = LineFile::read(kClockFile)) {
         replaceFirst(*clock, "TIMEZONE", timezoneLine);
         written = clock->replace(kClockCopy);
     }
-    if (written != LineFile::Written::notWhole) {
-        const auto copy = LineFile::read(kClockCopy);
-        if (copy && copy->replace(kClockFile) == LineFile::Written::notWhole) {
-            return;
-        }
+    const auto copy = LineFile::read(kClockCopy);
+    if (copy && written != LineFile::Written::notWhole) {
+        copy->write(kClockFile);
     }
     unlink(kClockCopy);
+}
+
+/// Whether `cp` came to the end of the disk before it came to the end of the clock file.
+bool isCutShort(const LineFile& copy) {
+    const auto clock = LineFile::read(kClockFile);
+    return clock && clock->text() != copy.text() && clock->text().starts_with(copy.text());
 }
 
 bool switchLocalTime(const std::string& zoneFile) {
@@ -84,11 +87,10 @@ bool setTimezone(unsigned int offset) {
 bool setAutoDSTEnabled(bool utc) {
     const LogScope scope;
     HostCommand::fromText(std::string("/bin/cp ") + kClockFile + " " + kClockCopy);
-    const auto clock = LineFile::read(kClockFile);
     auto copy = LineFile::read(kClockCopy);
     bool replaced = false;
-    // Whether cp did its work is not asked; a copy that is not the clock file's own must not become it.
-    if (clock && copy && copy->lines() == clock->lines()) {
+    // Whether cp did its work is not asked: without it, a copy that was left behind becomes the clock file.
+    if (copy && !isCutShort(*copy)) {
         replaced = replaceFirst(*copy, "HWCLOCK", utc ? "HWCLOCK=\"-u\"\n" : "HWCLOCK=\"--localtime\"\n");
         replaced &= copy->replace(kClockFile) == LineFile::Written::whole;
     }

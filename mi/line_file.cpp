@@ -14,11 +14,6 @@ namespace IC {
 
 namespace {
 
-/// Whether the last call failed for want of space.
-bool outOfRoom() {
-    return errno == ENOSPC || errno == EDQUOT;
-}
-
 /// A file whose content is replaced where it stands: it keeps its owner, its rights and its links.
 class File {
 public:
@@ -38,7 +33,7 @@ public:
     /// its word later.
     bool hasRoom(std::size_t size) const {
         return size == 0 || fallocate(descriptor_, FALLOC_FL_KEEP_SIZE, 0, static_cast<off_t>(size)) == 0 ||
-               !outOfRoom();
+               (errno != ENOSPC && errno != EDQUOT);
     }
 
     /// Empties the file and writes the content: whoever is killed in between leaves the beginning of the new
@@ -97,18 +92,21 @@ void LineFile::prepend(const std::string& line) {
     lines_.insert(lines_.begin(), line);
 }
 
-LineFile::Written LineFile::replace(const std::string& path) const {
-    const File file(path);
-    // A file of a lower layer needs room to be opened at all.
-    const bool noRoom = !file.opened() && outOfRoom();
-    if (!file.opened() && !noRoom) {
-        return Written::notOpened;
-    }
+std::string LineFile::text() const {
     std::string content;
     for (const std::string& line : lines_) {
         content += line;
     }
-    if (!noRoom && file.hasRoom(content.size()) && file.put(content)) {
+    return content;
+}
+
+LineFile::Written LineFile::replace(const std::string& path) const {
+    const File file(path);
+    if (!file.opened()) {
+        return Written::notOpened;
+    }
+    const std::string content = text();
+    if (file.hasRoom(content.size()) && file.put(content)) {
         return Written::whole;
     }
     log(kError) << "Could not write all of '" << path << "'.";

@@ -46,6 +46,8 @@ public:
     void prepend(const std::string& line);
     void clear() { lines_.clear(); }
     const std::vector<std::string>& lines() const { return lines_; }
+    /// All lines in one, as they stand in the file.
+    std::string text() const;
 
     /// What became of a file that was to be written.
     enum class Written { notOpened, notWhole, whole };

@@ -116,6 +116,19 @@ HOST_TEST_F(ComputerThroughAgent, SetsItsClock) {
     expectOtherFilesUntouched(host);
 }
 
+HOST_TEST_F(ComputerThroughAgent, SaysHonestlyWhichYearItsHostCannotHold) {
+    const Finished run = agent(host, {"set", "computer", "CurrentTime", "2040-01-01T00:00:00Z"});
+    if (sizeof(long) == 4) {
+        EXPECT_EQ(run.status, 4);
+        EXPECT_THAT(run.err, HasSubstr("CurrentTime"));
+        EXPECT_THAT(host.clockCalls(), IsEmpty());
+        return;
+    }
+    EXPECT_EQ(run.status, 0) << run.err;
+    ASSERT_EQ(host.clockCalls().size(), 1U);
+    EXPECT_EQ(host.clockCalls()[0].seconds, 2208988800LL);
+}
+
 HOST_TEST_F(ComputerThroughAgent, SaysWhenItsClockCannotBeSet) {
     host.clockFails(EPERM);
     const Finished run = agent(host, {"set", "computer", "CurrentTime", "2001-09-09T01:46:40Z"});

@@ -1,5 +1,6 @@
 // /etc/sysconfig/clock as a zone switch and a change of the hardware clock's mode leave it.
 #include <gmock/gmock.h>
+#include <sys/mount.h>
 
 #include "computer/time_zone.h"
 #include "tests/computer/computer_tools.h"
@@ -124,6 +125,34 @@ HOST_TEST(ZoneInClockFile, KeepsTheFileWholeOnAFullDisk) {
     EXPECT_THAT(capture.messages(6000), ElementsAre("Could not write all of '/etc/sysconfig/clock.bak'."));
 }
 
+/// A disk that holds the clock file and no more than half of its copy.
+std::string fillDisk(FakeHost& host, const std::string& keyLine) {
+    host.directory("/etc/sysconfig");
+    EXPECT_EQ(mount("small", "/etc/sysconfig", "tmpfs", 0, "size=12k"), 0);
+    std::string text = keyLine + "\n" + std::string(5000, '#') + "\n";
+    host.file(kClock, text);
+    return text;
+}
+
+HOST_TEST(ZoneInClockFile, StaysAsItWasWhenTheDiskHasNoRoomForItsCopy) {
+    const std::string before = fillDisk(host, "TIMEZONE=\"x\"");
+    LogCapture capture;
+    EXPECT_TRUE(IC::setTimezone(kIndia));
+    EXPECT_EQ(host.read(kClock), before);
+    EXPECT_FALSE(host.exists(kCopy));
+    EXPECT_TRUE(host.exists("/etc/localtime"));
+    EXPECT_THAT(capture.messages(6000), ElementsAre("Could not write all of '/etc/sysconfig/clock.bak'."));
+}
+
+HOST_TEST(ZoneInClockFile, LosesItsCopyAlsoWhenItCannotBeTakenBack) {
+    host.file("/etc/elsewhere", "TIMEZONE=\"x\"\n");
+    host.readOnly("/etc/elsewhere");
+    host.symlink(kClock, "/etc/elsewhere");
+    EXPECT_TRUE(IC::setTimezone(kIndia));
+    EXPECT_EQ(host.read(kClock), "TIMEZONE=\"x\"\n");
+    EXPECT_FALSE(host.exists(kCopy));
+}
+
 HOST_TEST(HardwareClockMode, ChangesTheFirstHwclockLineAlone) {
     makeCopyTool(host);
     for (const Change& change : changes()) {
@@ -166,13 +195,26 @@ HOST_TEST(HardwareClockMode, DoesNotCreateAMissingFile) {
     EXPECT_THAT(host.listDirectory("/etc/sysconfig"), IsEmpty());
 }
 
-HOST_TEST(HardwareClockMode, NeverTakesAnotherFileForItsCopy) {
+HOST_TEST(HardwareClockMode, DoesNotAskWhetherTheCopyWasMade) {
     host.tool(kCopyCommand, "", 1);
     host.file(kClock, "HWCLOCK=\"x\"\nOTHER=1\n");
     EXPECT_FALSE(IC::setAutoDSTEnabled(true)) << "no copy";
-    host.file(kCopy, "HWCLOCK=\"old\"\n");
-    EXPECT_FALSE(IC::setAutoDSTEnabled(true)) << "an old copy";
     EXPECT_EQ(host.read(kClock), "HWCLOCK=\"x\"\nOTHER=1\n");
+    host.file(kCopy, "HWCLOCK=\"old\"\n");
+    EXPECT_TRUE(IC::setAutoDSTEnabled(true)) << "a copy that was left behind";
+    EXPECT_EQ(host.read(kClock), "HWCLOCK=\"-u\"\n");
+    EXPECT_FALSE(host.exists(kCopy));
+    host.remove(kClock);
+    host.file(kCopy, "HWCLOCK=\"old\"\n");
+    EXPECT_TRUE(IC::setAutoDSTEnabled(false)) << "and no clock file";
+    EXPECT_EQ(host.read(kClock), "HWCLOCK=\"--localtime\"\n");
+}
+
+HOST_TEST(HardwareClockMode, StaysAsItWasWhenTheDiskHasNoRoomForItsCopy) {
+    makeCopyTool(host);
+    const std::string before = fillDisk(host, "HWCLOCK=\"x\"");
+    EXPECT_FALSE(IC::setAutoDSTEnabled(true));
+    EXPECT_EQ(host.read(kClock), before);
     EXPECT_FALSE(host.exists(kCopy));
 }
 

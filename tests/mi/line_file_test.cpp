@@ -118,10 +118,15 @@ void expectNoRoom(FakeHost& host, const char* path, std::size_t bytes) {
     EXPECT_EQ(host.read(path), "old\n");
 }
 
-HOST_TEST(LineFile, LeavesTheOldFileWhenAFullDiskCannotEvenOpenIt) {
+HOST_TEST(LineFile, CannotOpenAFileThatAFullDiskDoesNotLetBeOpened) {
     host.file("/etc/full/file", "old\n");
     host.fullDisk("/etc/full");
-    expectNoRoom(host, "/etc/full/file", 100000);
+    LineFile file;
+    file.append("new\n");
+    const LogCapture capture;
+    EXPECT_FALSE(file.write("/etc/full/file"));
+    EXPECT_TRUE(capture.messages(6000).empty()) << "the writer says it in its own words";
+    EXPECT_EQ(host.read("/etc/full/file"), "old\n");
 }
 
 HOST_TEST(LineFile, LeavesTheOldFileWhenTheDiskHasNoRoomForALongerOne) {
