@@ -4,5 +4,6 @@ corvista_test(storage SOURCES
   storage/layout_comparison_test.cpp
   storage/partition_nodes_test.cpp
   storage/rebuild_stress_test.cpp
+  storage/recorded_hosts_test.cpp
   storage/storage_host.cpp
   LIBRARIES plugin_code test_support LABELS threads)
