@@ -7,10 +7,6 @@ ONLINE, OFFLINE = "NIC is Online ", "NIC is Offline "
 OVER, BACK = "NIC has Switched Over ", "NIC has Switched Back "
 
 
-def messages_of(watch, name):
-    return [message for path, message in watch.alerts() if path.split(":", 1)[1] == name]
-
-
 def device_names(events, event, kind):
     return sorted(row["path"].rsplit(":", 1)[1] for row in events if (row["event"], row["class"]) == (event, kind))
 
@@ -129,48 +125,6 @@ def disk_removed(context):
     context.watch.disk_passes(2)
     expect_rebuilt(context, "hard-drive", ["sda", "sdb", "sdc"], ["sda", "sdb"])
     expect_rebuilt(context, "partition", ["sda1", "sda2", "sdc3"], ["sda1", "sda2"])
-
-
-FLAPS, DISK_CHANGES, WARM_UP = 200, 50, 24
-FLAT_MEMORY = 256  # KiB
-
-
-def flap(context, number):
-    """Pulls or plugs eth1's cable and waits until that has been reported."""
-    plugged = number % 2 == 1
-    context.machine.cable(1, plugged)
-    script = (f"i=0; until grep -q '\"path\":\"[^\"]*:eth1\".*{ONLINE if plugged else OFFLINE}' /run/events; do "
-              "sleep 2; i=$((i + 1)); [ $i -lt 60 ] || exit 1; done; grep -c alert /run/events; "
-              "grep -v alert /run/events >> /run/disk-events; : > /run/events; : > /run/plugin.log")
-    expect(context.machine.run(script).status == 0, f"flap {number} was not reported")
-
-
-@check(f"stress: {FLAPS} link changes and {DISK_CHANGES} disk changes are each reported, with flat memory, "
-       "descriptors and threads")
-def stress(context):
-    watch, per_disk_change = context.watch, FLAPS // DISK_CHANGES
-    watch.disk_passes(2)
-    watch.forget_events()
-    context.guest.sh("rm -f /run/disk-events; touch /run/disk-events")
-    for number in range(FLAPS):
-        if number % (2 * per_disk_change) == 0:
-            context.machine.add_disk("sdc", 16)
-        elif number % (2 * per_disk_change) == per_disk_change:
-            context.machine.remove_disk("sdc")
-        flap(context, number)
-        if number % 50 == 49:
-            print(f"# {number + 1} of {FLAPS} link changes", flush=True)
-        if number == WARM_UP:
-            before = watch.usage()
-    after = watch.usage()
-    watch.disk_passes(2)
-    context.guest.sh("cat /run/events >> /run/disk-events")
-    changes = DISK_CHANGES // 2
-    count = int(context.guest.sh("grep -c '\"published\".*hard-drive' /run/disk-events"))
-    expect_equal("drives published", count, changes * 3 + changes * 2)
-    memory = after[0] - before[0]
-    expect(memory <= FLAT_MEMORY, f"resident memory grew by {memory} KiB, from {before[0]}")
-    expect_equal("descriptors, threads", after[1:], before[1:])
 
 
 @check("restart: stopping the agent ends its threads and removes its files")

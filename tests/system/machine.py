@@ -126,7 +126,7 @@ class Machine:
             if "event" in answer:
                 self.events.append(answer)
             elif "error" in answer:
-                raise MachineFailure(f"{command}: {answer['error']['desc']}")
+                raise RuntimeError(f"{command}: {answer['error']['desc']}")
             else:
                 return answer["return"]
 

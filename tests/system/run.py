@@ -6,17 +6,19 @@ import re
 import resource
 import shutil
 import tempfile
+import threading
 import time
 
 import image
 import packages
 from guest import LOG, Guest, Watch
 from machine import Machine, MachineFailure
-from tap import CHECKS, Report
+from tap import CHECKS, Report, block
 
 import checks_tree  # noqa: F401  each registers its checks, in this order
 import checks_events  # noqa: F401
 import checks_settings  # noqa: F401
+import checks_stress  # noqa: F401
 
 
 class Context:
@@ -50,41 +52,57 @@ def evidence_of(context):
     return collect
 
 
-def boot(options, directory):
+class Runner(threading.Thread):
+    """Boots one machine and runs its checks there."""
+
+    def __init__(self, name, checks, report, guest_files, directory):
+        super().__init__(name=name)
+        self.checks, self.report, self.guest_files, self.directory = checks, report, guest_files, directory
+
+    def run(self):
+        os.makedirs(self.directory)
+        start = time.monotonic()
+        machine = Machine(self.directory, *self.guest_files)
+        try:
+            machine.wait_ready()
+            print(f"# the guest for {self.name} is up after {time.monotonic() - start:.0f} s", flush=True)
+            context = Context(machine)
+            for name, function in self.checks:
+                if isinstance(self.report.run(name, function, context, evidence_of(context)), MachineFailure):
+                    break
+        except MachineFailure as failure:
+            print("\n".join(block(f"the guest for {self.name} does not start: {failure}", machine.console_tail())))
+        finally:
+            machine.stop()
+
+
+def build_guest(options, directory):
+    """The kernel and the initramfs that all machines start from."""
     files = packages.fetch(options.cache)
     kernel = image.Kernel(files[0], options.cache)
     initramfs = os.path.join(directory, "initramfs")
     image.build_initramfs(files[1:], kernel, options.build, os.path.join(directory, "root"), initramfs)
     shutil.rmtree(os.path.join(directory, "root"))
-    start = time.monotonic()
-    machine = Machine(directory, kernel.image, initramfs)
-    try:
-        machine.wait_ready()
-    except MachineFailure:
-        print("\n".join("# " + line for line in machine.console_tail()))
-        machine.stop()
-        raise
-    print(f"# the guest is up after {time.monotonic() - start:.1f} s", flush=True)
-    return machine
+    return kernel.image, initramfs
 
 
 def main():
     options = arguments()
     os.makedirs(options.cache, exist_ok=True)
-    checks = [(name, function) for name, function in CHECKS if re.search(options.only, name)]
+    chosen = {machine: [row for row in rows if re.search(options.only, row[0])] for machine, rows in CHECKS.items()}
     report = Report()
     start = time.monotonic()
     with tempfile.TemporaryDirectory(prefix="corvista-system-test.") as directory:
-        machine = boot(options, directory)
-        try:
-            context = Context(machine)
-            for name, function in checks:
-                report.run(name, function, context, evidence_of(context))
-        finally:
-            machine.stop()
+        guest_files = build_guest(options, directory)
+        runners = [Runner(machine, checks, report, guest_files, os.path.join(directory, machine))
+                   for machine, checks in chosen.items() if checks]
+        for runner in runners:
+            runner.start()
+        for runner in runners:
+            runner.join()
     used = resource.getrusage(resource.RUSAGE_CHILDREN)
     print(f"# took {time.monotonic() - start:.0f} s, {used.ru_utime + used.ru_stime:.0f} s of processor time")
-    return report.finish(len(checks))
+    return report.finish(sum(len(checks) for checks in chosen.values()))
 
 
 if __name__ == "__main__":

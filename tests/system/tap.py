@@ -1,15 +1,18 @@
 """The list of checks and their report in TAP."""
 
+import collections
+import threading
 import time
 import traceback
 
-CHECKS = []
+CHECKS = collections.defaultdict(list)  # those of each machine
 
 
-def check(name):
-    """Marks a function as the check of that name; checks run in the order in which they are defined."""
+def check(name, machine="main"):
+    """Marks a function as the check of that name. Those of one machine run in the order in which they are defined;
+    the machines run side by side."""
     def mark(function):
-        CHECKS.append((name, function))
+        CHECKS[machine].append((name, function))
         return function
     return mark
 
@@ -23,40 +26,47 @@ def expect_equal(what, actual, expected):
     expect(actual == expected, f"{what}:\n  is       {actual!r}\n  expected {expected!r}")
 
 
+def block(title, lines):
+    return [f"# --- {title}"] + [f"#   {line}" for line in lines]
+
+
 class Report:
+    """What came out so far; the machines' threads share it."""
+
     def __init__(self):
-        self.number, self.failed = 0, []
+        self.number, self.failed = 0, 0
+        self._guard = threading.Lock()
 
-    def result(self, name, seconds, failure=None):
-        self.number += 1
-        if failure is not None:
-            self.failed.append(name)
-        print(f"{'ok' if failure is None else 'not ok'} {self.number} - {name} # {seconds:.1f} s", flush=True)
-
-    def diagnose(self, title, lines):
-        print(f"# --- {title}")
-        for line in lines:
-            print(f"#   {line}")
+    def _print(self, name, seconds, diagnosis):
+        with self._guard:
+            self.number += 1
+            self.failed += bool(diagnosis)
+            verdict = "not ok" if diagnosis else "ok"
+            print("\n".join([f"{verdict} {self.number} - {name} # {seconds:.1f} s"] + diagnosis), flush=True)
 
     def run(self, name, function, context, evidence):
-        """Runs a check; when it fails, prints why and the evidence: (title, lines) of this moment."""
+        """Runs a check; when it fails, prints why and the evidence: (title, lines) of this moment.
+
+        Returns what the check failed with, or None.
+        """
         start = time.monotonic()
+        raised, diagnosis = None, []
         try:
             function(context)
         except Exception as failure:  # whatever goes wrong, the other checks are still worth running
-            self.result(name, time.monotonic() - start, failure)
+            raised = failure
             text = str(failure) if isinstance(failure, AssertionError) else traceback.format_exc()
-            self.diagnose("what is wrong", text.splitlines())
+            diagnosis += block("what is wrong", text.splitlines())
             for title, lines in evidence():
-                self.diagnose(title, lines)
-        else:
-            self.result(name, time.monotonic() - start)
+                diagnosis += block(title, lines)
+        self._print(name, time.monotonic() - start, diagnosis)
+        return raised
 
     def finish(self, wanted):
         print(f"1..{wanted}")
         missing = wanted - self.number
-        passed = self.number - len(self.failed)
+        passed = self.number - self.failed
         if missing:
             print(f"# {missing} checks were not run")
-        print(f"{passed} passed, {len(self.failed) + missing} failed", flush=True)
+        print(f"{passed} passed, {self.failed + missing} failed", flush=True)
         return 0 if passed == wanted else 1
