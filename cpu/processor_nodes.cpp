@@ -44,7 +44,7 @@ void OsHwMI::createCpuNodeAndMap() {
 
 void OsHwMI::createCpuNodes() {
     const LogScope scope("createCpuNodes", processorsLogSource);
-    if (!inventory_ || planarNode_ == nullptr) {
+    if (planarNode_ == nullptr) {
         return;  // called outside initialize and unload: there is no tree to hang them in
     }
     createCpuNodeAndMap();

@@ -40,6 +40,8 @@ void* NetworkMonitor::run(void*) {
             pass();
         } catch (const std::exception& failure) {
             logInd(kError) << "OsHwMIInd Caught " << failure.what();
+        } catch (...) {
+            logInd(kError) << "OsHwMIInd Caught unknown exception";
         }
         OSHWMI_IND::slaves.clear();
         if (!ending()) {
@@ -64,6 +66,15 @@ void NetworkMonitor::pass() {
 
 void OsHwMI::enableIndications() {
     const LogScope scope("enableIndications", indicationsLogSource);
+    // Made after every global, so gone before them: a library that is closed without an unload has no monitor
+    // left that uses them.
+    static const struct AtTheEnd {
+        ~AtTheEnd() {
+            if (myoshwmi.networkMonitor_ != nullptr) {
+                myoshwmi.disableIndications();
+            }
+        }
+    } atTheEnd;
     try {
         logInd(kProgress) << "Creating NetworkMonitor thread.";
         auto monitor = std::make_unique<NetworkMonitor>(&networkMonitorEnded_);

@@ -49,9 +49,11 @@ OsHwMI::OsHwMI() = default;
 OsHwMI::~OsHwMI() = default;
 
 Error OsHwMI::initialize(unsigned int miId, const Number& ownNodeId, const Number& firstNodeId) {
-    const LogScope scope("initialize");
-    // Also the second time: the builders fill nodes, they must not write what they read back to the host.
+    const LogScope scope;
+    // As at the first start, so also after an unload: the builders fill nodes, they must not write what they
+    // read back to the host; and the drive monitor must run.
     OSHWMI::bInitflag = false;
+    HardDriveNodeUpdate = false;
     {
         const std::lock_guard lock(inventoryGuard_);
         inventory_ = std::make_unique<Inventory>();
@@ -67,22 +69,32 @@ Error OsHwMI::initialize(unsigned int miId, const Number& ownNodeId, const Numbe
 }
 
 Error OsHwMI::unload() {
-    const LogScope scope("unload");
+    const LogScope scope;
     HardDriveNodeUpdate = true;
     guarded("stopHardDriveMonitor", [&] { stopHardDriveMonitor(); });
     guarded("disableIndications", [&] { disableIndications(); });
-    Error result = ManagementInterface::unload();
+    Error result = freeNodes();
     guarded("deleteSavedConfigurations", [] { deleteSavedConfigurations(); });
     guarded("deleteFdiskTmp", [] { deleteFdiskTmp(); });
-    driveNodes_.clear();
-    partitionNodes_.clear();
     const std::lock_guard lock(inventoryGuard_);
     inventory_.reset();
     return result;
 }
 
+Error OsHwMI::freeNodes() {
+    // A walk that a write of the agent has begun still hangs its nodes under those that go here.
+    const std::lock_guard noWalk(portWalkGuard_);
+    driveNodes_.clear();
+    partitionNodes_.clear();
+    for (MutableNode** node : {&osHwNode_, &rootNode_, &computerNode_, &chassisNode_, &planarNode_,
+                               &networkControllerNode_, &diskControllerNode_}) {
+        *node = nullptr;
+    }
+    return ManagementInterface::unload();
+}
+
 void OsHwMI::publishNode(Node* node) {
-    const LogScope scope("publishNode");
+    const LogScope scope;
     const Error result = addNewNode(node);
     if (result.getStatus() != 0) {
         log(kError) << "addNewNode error = " << result;
@@ -123,9 +135,12 @@ std::map<std::string, MutableNode*> OsHwMI::nodesByName() const {
 }
 
 bool OsHwMI::findNetworkPort(std::string name, MutableNode** node) const {
-    const std::map<std::string, MutableNode*> nodes = nodesByName();
-    const auto found = nodes.find(name);
-    if (found == nodes.end()) {
+    const std::lock_guard lock(inventoryGuard_);
+    if (!inventory_) {
+        return false;
+    }
+    const auto found = inventory_->nodesByName.find(name);
+    if (found == inventory_->nodesByName.end()) {
         return false;
     }
     *node = found->second;

@@ -12,6 +12,7 @@
 #include "framework/qx/event.h"
 #include "framework/qx/thread.h"
 #include "mi/fingerprint.h"
+#include "mi/inventory.h"
 
 namespace IC {
 
@@ -85,15 +86,6 @@ public:
 private:
     friend struct OsHwMITestAccess;
 
-    /// Made by initialize and freed by unload.
-    struct Inventory {
-        std::vector<unsigned int> drawnIds;               ///< every id taken from the counter
-        std::map<std::string, MutableNode*> nodesByName;  ///< by interface name, bonds included
-        std::map<std::string, unsigned int>
-            currentStates;  ///< link state by interface; the network monitor's alone
-        std::map<std::string, unsigned int> previousStates;
-        std::map<unsigned int, MutableNode*> processors;  ///< by processor number, from 1
-    };
     struct StorageKind;  // storage/storage_build.h
 
     /// Takes the next node id and remembers it as drawn.
@@ -110,6 +102,7 @@ private:
     /// A copy: the walk over the interfaces and the network monitor run at the same time.
     std::map<std::string, MutableNode*> nodesByName() const;
     void stopHardDriveMonitor();
+    Error freeNodes();
     /// What a bond member's change since the last pass means for the bond (indications/).
     unsigned int memberVerdict(const std::string& member) const;
     void sendAlert(const Alert& alert);
@@ -127,9 +120,9 @@ private:
     std::unique_ptr<MutableNode> buildHardDrive(const std::string& line, unsigned int index, bool update);
     std::unique_ptr<MutableNode> buildPartition(const std::string& line, unsigned int index, bool update);
 
-    mutable std::mutex inventoryGuard_;  ///< guards drawnIds and nodesByName; never held while a command runs
-    std::unique_ptr<Inventory> inventory_;
-    int initializing_ = 0;  ///< 1 once initialize was called
+    mutable std::mutex inventoryGuard_;     ///< guards drawnIds and nodesByName
+    std::unique_ptr<Inventory> inventory_;  ///< from initialize to unload
+    int initializing_ = 0;                  ///< 1 once initialize was called
 
     MutableNode* osHwNode_ = nullptr;
     MutableNode* rootNode_ = nullptr;
@@ -150,7 +143,8 @@ private:
     NetworkMonitor* networkMonitor_ = nullptr;
     std::string hostName_;
     std::string domainName_;
-    std::mutex portWalkGuard_;  ///< one walk over the interfaces at a time; guards the two lists below
+    /// One walk over the interfaces at a time, and none while the nodes are freed; guards the lists below.
+    std::mutex portWalkGuard_;
     std::vector<std::string> dnsServers_;
     std::vector<std::string> dnsSuffixes_;
     /// The last member: a monitor that nobody stopped ends before what it uses is gone.

@@ -27,7 +27,7 @@ MutableNode* OsHwMI::createStaticNode(const MutableNode& parent, unsigned int ty
 }
 
 void OsHwMI::createOsHwNodes() {
-    const LogScope scope("createOsHwNodes");
+    const LogScope scope;
     osHwNode_ = new MutableNode(ownNodeId(), 0, miIds(), NodeType::osHardware, 0);
     appendNode(osHwNode_);
     describe(*osHwNode_, "OsHw Management Interface");
@@ -40,24 +40,24 @@ void OsHwMI::createRootNode() {
 }
 
 void OsHwMI::createChassisNodes() {
-    const LogScope scope("createChassisNodes");
+    const LogScope scope;
     // The chassis keeps the framework's default status and description.
     chassisNode_ = createStaticNode(*computerNode_, NodeType::chassis, 0, nullptr);
 }
 
 void OsHwMI::createPlanarNodes() {
-    const LogScope scope("createPlanarNodes");
+    const LogScope scope;
     planarNode_ = createStaticNode(*chassisNode_, NodeType::planar, 0, "Planar");
 }
 
 void OsHwMI::createNetworkControllerNodes() {
-    const LogScope scope("createNetworkControllerNodes");
+    const LogScope scope;
     networkControllerNode_ =
         createStaticNode(*chassisNode_, NodeType::networkController, 0, "Network Controller");
 }
 
 void OsHwMI::createDiskControllerNodes() {
-    const LogScope scope("createDiskControllerNodes");
+    const LogScope scope;
     diskControllerNode_ = createStaticNode(*planarNode_, NodeType::diskController, 1, "Disk Controller");
     if (!takeDiskSnapshot()) {
         log(kError) << "Command : " << diskSnapshotCommand << " failed!!";

@@ -14,6 +14,9 @@ namespace IC {
 void OsHwMI::createNetworkPortNodes(bool /*update*/) {
     const LogScope scope;
     const std::lock_guard oneWalkAtATime(portWalkGuard_);
+    if (networkControllerNode_ == nullptr) {
+        return;  // an agent that still holds a node writes to it after unload: there is no tree any more
+    }
     const std::vector<ListedInterface> interfaces = PortWalk::list();
     PortWalk walk(trimEnd(hostName_), trimEnd(domainName_));
     dnsServers_ = walk.host().dnsServers;

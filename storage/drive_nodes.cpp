@@ -42,8 +42,8 @@ void fillDrive(HardDriveNode& node, const std::string& sizeInBytes) {
 }  // namespace
 
 void OsHwMI::createHardDriveNodes(bool update) {
+    const LogScope scope;
     static constexpr StorageKind drives = {
-        .builder = "createHardDriveNodes",
         .listing = "cat /tmp/fdisk_tmp | grep ^Disk",
         .withdrawnText = "Delete a Hrad Drive entry: ",
         .publishedText = "Updated Hard Drive Node Published",

@@ -27,8 +27,8 @@ unsigned long long blocks(const std::string& text) {
 }  // namespace
 
 void OsHwMI::createPartitionNodes(bool update) {
+    const LogScope scope;
     static constexpr StorageKind partitions = {
-        .builder = "createPartitionNodes",
         .listing = "cat /tmp/fdisk_tmp | grep ^/dev",
         .withdrawnText = "Delete a Partition entry: ",
         .publishedText = "Partition Node Published",

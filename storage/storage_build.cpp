@@ -18,7 +18,6 @@ std::optional<std::string> askAboutLine(const std::optional<std::string>& comman
 }
 
 void OsHwMI::buildStorageNodes(const StorageKind& kind, bool update) {
-    const LogScope scope(kind.builder);
     std::vector<Node*>& nodes = this->*kind.nodes;
     // The framework owns the nodes and frees one when its last reader has gone; the list is emptied first, so
     // that it never holds a pointer to a node that has been withdrawn.

@@ -11,7 +11,6 @@ namespace IC {
 
 /// What the builders of drives and of partitions differ in; the frame around it is buildStorageNodes.
 struct OsHwMI::StorageKind {
-    const char* builder;        ///< its name in the entry and exit lines
     const char* listing;        ///< the command that prints one line per candidate
     const char* withdrawnText;  ///< logged before the description of a node that goes
     const char* publishedText;

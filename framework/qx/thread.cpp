@@ -48,6 +48,8 @@ void Thread::State::body(Thread& object, void* argument) {
         object.run(argument);
     } catch (const std::exception& error) {
         logEndByException(error.what());
+    } catch (...) {
+        logEndByException("unknown");
     }
     Interruption::setForThisThread(nullptr);
     const std::lock_guard lock(guard);

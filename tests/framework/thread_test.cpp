@@ -195,7 +195,8 @@ TEST(Thread, MayDestroyItselfAtItsEnd) {
     EXPECT_TRUE(soon([&] { return gone.load(); }));
 }
 
-TEST(Thread, AnExceptionEndsItAndIsLogged) {
+/// What a thread logs that ends by an exception.
+void expectEndLogged(const std::function<void()>& work, const std::string& message) {
     class Sink : public CVLog::LogSink {
     public:
         void write(const CVLog::LogRecord& record) override {
@@ -206,12 +207,18 @@ TEST(Thread, AnExceptionEndsItAndIsLogged) {
         std::string message;
     } sink;
     CVLog::CVLogger::setLog(&sink, 0);
-    Worker worker([] { throw std::runtime_error("disk on fire"); });
+    Worker worker(work);
     worker.start(nullptr);
     worker.join();
     CVLog::CVLogger::setLog(nullptr, 0);
     EXPECT_EQ(sink.level, 6000);
-    EXPECT_EQ(sink.message, "thread ended by an exception: disk on fire");
+    EXPECT_EQ(sink.message, message);
+}
+
+TEST(Thread, AnExceptionEndsItAndIsLogged) {
+    expectEndLogged([] { throw std::runtime_error("disk on fire"); },
+                    "thread ended by an exception: disk on fire");
+    expectEndLogged([] { throw 7; }, "thread ended by an exception: unknown");
 }
 
 TEST(Thread, StartTellsWhenTheSystemGivesNone) {

@@ -7,6 +7,7 @@
 #include <mutex>
 #include <thread>
 
+#include "tests/indications/failing_new.h"
 #include "tests/indications/interfaces.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
@@ -167,6 +168,49 @@ HOST_TEST(NetworkMonitor, LeavesIndicationsOffWhenItsThreadWillNotStart) {
     capture.clear();
     interfaces.mi().disableIndications();
     EXPECT_THAT(capture.ownMessages(), ElementsAre("disableIndications: entry", "disableIndications: exit"));
+}
+
+/// What starting the monitor says when it cannot be made.
+std::vector<std::string> startFailing(void (*fail)()) {
+    Interfaces interfaces;
+    LogCapture capture;
+    {
+        const FailingNew none(sizeof(IC::NetworkMonitor), fail);
+        interfaces.mi().enableIndications();
+    }
+    EXPECT_EQ(capture.ownMessages(6000).size(), 1U);
+    return capture.ownMessages();
+}
+
+HOST_TEST(NetworkMonitor, ThatCannotBeMadeIsLoggedWithTheReason) {
+    EXPECT_THAT(startFailing([] { throw std::bad_alloc(); }),
+                ElementsAre("enableIndications: entry", "Creating NetworkMonitor thread.",
+                            "OsHwMIInd Caught std::bad_alloc Type St9bad_alloc", "enableIndications: exit"));
+    EXPECT_THAT(startFailing([] { throw 7; }),
+                ElementsAre("enableIndications: entry", "Creating NetworkMonitor thread.",
+                            "OsHwMIInd Caught unknown exception", "enableIndications: exit"));
+}
+
+IC::Error throwAnything(const std::vector<IC::Alert>&, const void* calls) {
+    if (++*const_cast<std::atomic<int>*>(static_cast<const std::atomic<int>*>(calls)) == 1) {
+        throw 7;
+    }
+    throw std::runtime_error("the agent is broken");
+}
+
+HOST_TEST(NetworkMonitor, GoesOnWhateverAPassThrows) {
+    QX::setClockSpeed(1000);
+    host.file(kFile, "eth0=12\n");
+    Interfaces interfaces;
+    interfaces.add("eth0", 1);
+    std::atomic<int> calls{0};
+    interfaces.mi().registerForAlerts(throwAnything, &calls);
+    LogCapture capture;
+    interfaces.mi().enableIndications();
+    EXPECT_TRUE(eventually([&] { return calls >= 3; }));
+    interfaces.mi().disableIndications();
+    EXPECT_THAT(capture.messages(6000), Contains("OsHwMIInd Caught unknown exception").Times(1));
+    EXPECT_THAT(capture.messages(6000), Contains("OsHwMIInd Caught the agent is broken"));
 }
 
 HOST_TEST(NetworkMonitor, StoppedBeforeItRunsDoesNoPass) {

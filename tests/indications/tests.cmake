@@ -1,5 +1,6 @@
 corvista_test(indications SOURCES
   indications/alerts_test.cpp
+  indications/failing_new.cpp
   indications/link_states_test.cpp
   indications/network_monitor_test.cpp
   indications/state_file_test.cpp

@@ -10,6 +10,7 @@
 #include <sstream>
 
 #include "framework/ic/management_interface.h"
+#include "tests/support/fake_host.h"
 
 namespace {
 
@@ -50,11 +51,39 @@ TEST(Library, NeedsTheFrameworkAndTheLanguageRuntimeAlone) {
     EXPECT_THAT(dynamicSection("NEEDED"), testing::Contains("libvantrelcvframework.so.1"));
 }
 
+using Entry = int (*)(IC::ManagementInterface**, IC::Error**);
+
+std::size_t threads() {
+    const std::filesystem::directory_iterator tasks("/proc/self/task");
+    return static_cast<std::size_t>(std::distance(begin(tasks), end(tasks)));
+}
+
+bool isLoaded() {
+    void* library = dlopen(kPlugin.c_str(), RTLD_NOW | RTLD_NOLOAD);
+    if (library != nullptr) {
+        dlclose(library);
+    }
+    return library != nullptr;
+}
+
+HOST_TEST(Library, ClosedWithoutAnUnloadLeavesNoThreadInCodeThatIsGone) {
+    const std::size_t before = threads();
+    void* library = dlopen(kPlugin.c_str(), RTLD_NOW | RTLD_LOCAL);
+    ASSERT_NE(library, nullptr) << dlerror();
+    IC::ManagementInterface* interface = nullptr;
+    IC::Error* error = nullptr;
+    reinterpret_cast<Entry>(dlsym(library, "OpenMI"))(&interface, &error);
+    interface->initialize(1, IC::Number(1U), IC::Number(2U));
+    EXPECT_EQ(threads(), before + 2) << "the two monitors";
+    dlclose(library);
+    EXPECT_FALSE(isLoaded());
+    EXPECT_EQ(threads(), before);
+}
+
 TEST(Library, HandsOutTheSameTwoAddressesEveryTime) {
     void* library = dlopen(kPlugin.c_str(), RTLD_NOW | RTLD_LOCAL);
     ASSERT_NE(library, nullptr) << dlerror();
-    const auto open =
-        reinterpret_cast<int (*)(IC::ManagementInterface**, IC::Error**)>(dlsym(library, "OpenMI"));
+    const auto open = reinterpret_cast<Entry>(dlsym(library, "OpenMI"));
     ASSERT_NE(open, nullptr);
     std::array<IC::ManagementInterface*, 2> interfaces{};
     std::array<IC::Error*, 2> errors{};

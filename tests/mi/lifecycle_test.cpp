@@ -227,6 +227,15 @@ HOST_TEST(Lifecycle, ActsOnTheHostOnlyAfterTheStart) {
     EXPECT_TRUE(IC::HardDriveNodeUpdate);
 }
 
+HOST_TEST(Lifecycle, StartsAgainAfterAStop) {
+    initialize(IC::myoshwmi);
+    IC::myoshwmi.unload();
+    initialize(IC::myoshwmi);
+    EXPECT_EQ(IC::myoshwmi.holdAll().size(), 7U);
+    EXPECT_FALSE(IC::HardDriveNodeUpdate) << "or the drive monitor would end at once";
+    IC::myoshwmi.unload();
+}
+
 HOST_TEST(Lifecycle, LogsARefusedNodeAndGoesOn) {
     initialize(IC::myoshwmi);
     IC::myoshwmi.setLoadCallBack(refuse, nullptr, nullptr);
@@ -249,9 +258,9 @@ HOST_TEST(Lifecycle, StopsWithoutAStart) {
                                      "deleteFdiskTmp: exit", "unload: exit"));
 }
 
-HOST_TEST(Lifecycle, StopsAtOnce) {
-    initialize(IC::myoshwmi);
+HOST_TEST(Lifecycle, StartsAndStopsAtOnce) {
     const auto start = std::chrono::steady_clock::now();
+    initialize(IC::myoshwmi);
     IC::myoshwmi.unload();
     EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(2));
 }
@@ -270,7 +279,13 @@ HOST_TEST(Lifecycle, LogsEveryLineTwiceInTheOrderOfTheSequences) {
         const bool ofIndications =
             line.source == "OsHwMIInd_ix86" && line.component == "Corvista.IC.MI.OsHwMIInd";
         EXPECT_TRUE(ofMain || ofIndications) << line.source << ' ' << line.component;
+        const std::string subject = line.message.substr(0, line.message.find(": entry"));
+        if (subject != line.message && subject.find(':') == std::string::npos) {
+            EXPECT_EQ(line.function, subject);
+        }
     }
+    EXPECT_THAT(capture.ownMessages(5000), testing::Each(testing::HasSubstr("Cannot read asset dat file.")));
+    EXPECT_EQ(capture.ownMessages(3000).size() + 2, capture.ownMessages().size());
     std::vector<std::string> messages = capture.ownMessages();
     std::erase_if(messages, dependsOnTheMonitor);
     EXPECT_THAT(messages, testing::ElementsAreArray(kWholeLife));

@@ -1,6 +1,9 @@
 // Port nodes and the walk that makes them.
 #include <gmock/gmock.h>
 
+#include <thread>
+
+#include "network/ip_config_node.h"
 #include "network/port_node.h"
 #include "network/port_queries.h"
 #include "tests/network/port_host.h"
@@ -283,6 +286,26 @@ HOST_TEST(PortWalk, SaysWhatItDoes) {
         EXPECT_THAT(messages, Contains(text));
     }
     EXPECT_TRUE(capture.everyLineTwice());
+}
+
+HOST_TEST(PortWalk, MakesNothingOnceTheTreeIsGone) {
+    PortHost plugin(host, "suse-two-nics");
+    const auto held = plugin.build().config("eth0");
+    plugin.mi().unload();
+    held->setProperty(IC::IPConfigNode::reenumeratePorts, number(1));
+    EXPECT_THAT(plugin.mi().holdAll(), IsEmpty());
+    EXPECT_THAT(host.calls(), Not(Contains("ifconfig")));
+}
+
+HOST_TEST(PortWalk, ComesToItsEndBeforeTheTreeGoes) {
+    PortHost plugin(host, "suse-two-nics");
+    std::thread walk([&] { plugin.mi().createNetworkPortNodes(false); });
+    while (host.calls().empty()) {
+        std::this_thread::yield();
+    }
+    plugin.mi().unload();
+    walk.join();
+    EXPECT_THAT(plugin.mi().holdAll(), IsEmpty());
 }
 
 }  // namespace

@@ -13,7 +13,7 @@ namespace IC {
 
 void OsHwMITestAccess::plantDiskController(unsigned int firstNodeId) {
     myoshwmi.ManagementInterface::initialize(7, Number(1U), Number(firstNodeId));
-    myoshwmi.inventory_ = std::make_unique<OsHwMI::Inventory>();
+    myoshwmi.inventory_ = std::make_unique<Inventory>();
     myoshwmi.diskControllerNode_ =
         new MutableNode(myoshwmi.drawNodeId(), 1, myoshwmi.miIds(), NodeType::diskController, 1);
     myoshwmi.appendNode(myoshwmi.diskControllerNode_);

@@ -13,7 +13,7 @@ namespace IC {
 /// What tests see of the plug-in object's insides, and set in the place of its builders.
 struct OsHwMITestAccess {
     /// The containers as initialize makes them, without a tree and without monitors.
-    static void makeInventory(OsHwMI& mi) { mi.inventory_ = std::make_unique<OsHwMI::Inventory>(); }
+    static void makeInventory(OsHwMI& mi) { mi.inventory_ = std::make_unique<Inventory>(); }
     /// Lists a node and remembers it as an interface's.
     static void addInterface(OsHwMI& mi, const std::string& name, MutableNode* node) {
         mi.appendNode(node);
