@@ -15,16 +15,12 @@ struct Digest {
 
 /// The lines of the snapshot that describe one kind of node: how they are digested, and what the log says.
 struct Extract {
-    const char* entry;
-    const char* exit;
     const char* different;
     Digest md5;
     Digest sha1;
 };
 
 constexpr Extract kDrives = {
-    .entry = "Hard Drive Check Sum : Entry",
-    .exit = "Hard Drive Check Sum : Exit",
     .different = "Hard Drive Check Sum found Different",
     .md5 = {"cat /tmp/fdisk_tmp | grep ^Disk |md5sum |awk '{print $1}'",
             "cond ::Hard Drive Check Sum : MD5 :: "},
@@ -32,8 +28,6 @@ constexpr Extract kDrives = {
              "cond ::Hard Drive Check Sum : SHA1 :: "},
 };
 constexpr Extract kPartitions = {
-    .entry = "Partition Check Sum : Entry",
-    .exit = "Partition Check Sum : Exit",
     .different = "Partition Check Sum found Different",
     .md5 = {"cat /tmp/fdisk_tmp | grep ^/dev |md5sum |awk '{print $1}'",
             "cond ::Partition Check Sum : MD5 :: "},
@@ -54,7 +48,6 @@ std::string take(const Digest& digest) {
 }
 
 void takeFingerprints(const Extract& extract, FingerprintPair& pair, bool keepCurrent) {
-    const LogScope scope(extract.entry, extract.exit);
     pair.md5.current = take(extract.md5);
     pair.sha1.current = take(extract.sha1);
     if (!keepCurrent) {
@@ -75,10 +68,12 @@ void rebuildIfDifferent(const Extract& extract, FingerprintPair& pair, Rebuild r
 }  // namespace
 
 void OsHwMI::HardDrive_Checksum(bool keepCurrent) {
+    const LogScope scope("Hard Drive Check Sum : Entry", "Hard Drive Check Sum : Exit");
     takeFingerprints(kDrives, driveFingerprints_, keepCurrent);
 }
 
 void OsHwMI::Partition_Checksum(bool keepCurrent) {
+    const LogScope scope("Partition Check Sum : Entry", "Partition Check Sum : Exit");
     takeFingerprints(kPartitions, partitionFingerprints_, keepCurrent);
 }
 

@@ -145,12 +145,17 @@ HOST_TEST(ZoneInClockFile, StaysAsItWasWhenTheDiskHasNoRoomForItsCopy) {
 }
 
 HOST_TEST(ZoneInClockFile, LosesItsCopyAlsoWhenItCannotBeTakenBack) {
-    host.file("/etc/elsewhere", "TIMEZONE=\"x\"\n");
-    host.readOnly("/etc/elsewhere");
-    host.symlink(kClock, "/etc/elsewhere");
+    host.directory("/etc/sysconfig");
+    host.directory("/etc/disk");
+    ASSERT_EQ(mount("small", "/etc/disk", "tmpfs", 0, "size=4k"), 0);
+    const std::string before = "TIMEZONE=\"x\"\n" + std::string(4080, '#') + "\n";
+    host.file("/etc/disk/clock", before);
+    host.symlink(kClock, "/etc/disk/clock");
+    LogCapture capture;
     EXPECT_TRUE(IC::setTimezone(kIndia));
-    EXPECT_EQ(host.read(kClock), "TIMEZONE=\"x\"\n");
+    EXPECT_EQ(host.read(kClock), before);
     EXPECT_FALSE(host.exists(kCopy));
+    EXPECT_THAT(capture.messages(6000), ElementsAre("Could not write all of '/etc/sysconfig/clock'."));
 }
 
 HOST_TEST(HardwareClockMode, ChangesTheFirstHwclockLineAlone) {

@@ -82,6 +82,7 @@ HOST_TEST_F(Drives, TheFirstBuildLogsEveryStep) {
                             "HardDriveNode::setProperty: entry", "HardDriveNode::setProperty: exit",
                             "Hard Drive Node::Normal /dev/sda", "createHardDriveNodes: exit"));
     EXPECT_EQ(log.messages(3000), log.messages());
+    EXPECT_EQ(log.lines().front().function, "createHardDriveNodes");
     EXPECT_TRUE(log.everyLineTwice());
 }
 

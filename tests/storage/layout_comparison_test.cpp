@@ -72,6 +72,7 @@ HOST_TEST_F(LayoutComparison, AnUnchangedLayoutTouchesNothing) {
                     "cond ::Partition Check Sum : SHA1 :: " + kFirstSha1, "Partition Check Sum : Exit",
                     "Hard Drive ThreadProcess :: Exit"));
     EXPECT_EQ(log.messages(3000), log.messages());
+    EXPECT_EQ(log.lines().back().function, "HDDThreadProcess");
     EXPECT_EQ(drives(), drivesBefore);
 }
 

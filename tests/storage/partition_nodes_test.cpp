@@ -64,6 +64,7 @@ HOST_TEST_F(Partitions, TheFirstBuildLogsEveryStep) {
     EXPECT_EQ(std::ranges::count(log.messages(), "DiskPartition::setProperty: entry"), 3);
     EXPECT_EQ(std::ranges::count(log.messages(), "DiskPartition::setProperty: exit"), 3);
     EXPECT_EQ(log.messages(3000), log.messages());
+    EXPECT_EQ(log.lines().front().function, "createPartitionNodes");
 }
 
 HOST_TEST_F(Partitions, AnUpdateWithdrawsTheOldNodesAndPublishesTheNewOnesOneByOne) {
