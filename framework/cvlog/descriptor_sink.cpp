@@ -13,6 +13,7 @@ namespace {
 
 /// Local time with milliseconds and offset: 2026-11-20T21:03:00.123+0100.
 std::string now() {
+    static_assert(sizeof(time_t) == sizeof(long long), "times after January 2038 need 64 bits");
     timeval time{};
     gettimeofday(&time, nullptr);
     tm local{};

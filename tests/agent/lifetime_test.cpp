@@ -10,6 +10,7 @@
 #include "agent/reading.h"
 #include "agent/surroundings.h"
 #include "agent/tree.h"
+#include "framework/qx/thread.h"
 #include "tests/support/fake_host.h"
 
 namespace {
@@ -57,6 +58,15 @@ HOST_TEST(PluginLifetime, TwoHundredLoadsLeaveNothingBehind) {
 HOST_TEST(PluginLifetime, TwoHundredLoadsOfTheRealPluginLeaveNothingBehind) {
     const cvagent::QuietCommands quiet;
     loadAgainAndAgain(CORVISTA_PLUGIN_FILE, 200);
+    EXPECT_THAT(host.listDirectory("/tmp"), testing::IsEmpty());
+}
+
+HOST_TEST(PluginLifetime, MonitorsStoppedInTheMiddleOfAPassLeaveNothingBehind) {
+    host.tool("fdisk -ls",
+              "Disk /dev/sda: 80.0 GB, 80026361856 bytes\n/dev/sda1  *  1  13  104391  83  Linux\n");
+    QX::setClockSpeed(100000);  // one pass after the other
+    const cvagent::QuietCommands quiet;
+    loadAgainAndAgain(CORVISTA_PLUGIN_FILE, 20);
     EXPECT_THAT(host.listDirectory("/tmp"), testing::IsEmpty());
 }
 
