@@ -1,7 +1,5 @@
 #include "network/bonding_status.h"
 
-#include <strings.h>
-
 #include <algorithm>
 #include <string_view>
 
@@ -14,7 +12,6 @@ namespace {
 constexpr std::string_view kMember = "Slave Interface: ";
 constexpr std::string_view kStatus = "MII Status: ";
 constexpr std::string_view kFailures = "Link Failure Count: ";
-constexpr std::string_view kActive = "Currently Active Slave: ";
 
 /// Takes the first word behind the label, if the line begins with it and the word is not known yet.
 void takeWord(std::string_view line, std::string_view label, std::string& word) {
@@ -38,11 +35,6 @@ std::optional<BondingMember> bondingMember(const std::vector<std::string>& lines
         takeWord(*line, kFailures, member.linkFailures);
     }
     return member;
-}
-
-bool isActiveMember(const std::string& line, const std::string& port) {
-    const auto at = line.size() < kActive.size() ? line.npos : kActive.size();
-    return at != line.npos && strcasecmp(trimEnd(line.substr(at)).c_str(), port.c_str()) == 0;
 }
 
 }  // namespace IC::parse

@@ -17,8 +17,4 @@ struct BondingMember {
 /// @return nothing when the port is no member
 std::optional<BondingMember> bondingMember(const std::vector<std::string>& lines, const std::string& port);
 
-/// Whether a line "Currently Active Slave: eth0" names exactly this port. Case does not count, as in the
-/// search that found the line.
-bool isActiveMember(const std::string& line, const std::string& port);
-
 }  // namespace IC::parse

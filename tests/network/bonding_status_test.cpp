@@ -5,7 +5,6 @@
 namespace {
 
 using IC::parse::bondingMember;
-using IC::parse::isActiveMember;
 using Lines = std::vector<std::string>;
 
 const Lines kTwo = {"MII Status: up\n",
@@ -46,16 +45,6 @@ TEST(BondingStatus, SectionWithoutTheFactsHasEmptyOnes) {
     ASSERT_TRUE(member);
     EXPECT_EQ(member->miiStatus, "");
     EXPECT_EQ(member->linkFailures, "");
-}
-
-TEST(BondingStatus, ActiveMemberIsTheWholeName) {
-    EXPECT_TRUE(isActiveMember("Currently Active Slave: eth1", "eth1"));
-    EXPECT_TRUE(isActiveMember("Currently Active Slave: eth1\n", "eth1"));
-    EXPECT_TRUE(isActiveMember("Currently Active Slave: ETH1", "eth1"));
-    EXPECT_FALSE(isActiveMember("Currently Active Slave: eth10", "eth1"));
-    EXPECT_FALSE(isActiveMember("Currently Active Slave: None", "eth1"));
-    EXPECT_FALSE(isActiveMember("Currently Active Slave: ", "eth1"));
-    EXPECT_FALSE(isActiveMember("", "eth1"));
 }
 
 }  // namespace

@@ -181,10 +181,12 @@ HOST_TEST(ActiveMember, IsTheDriversLine) {
         "cat /proc/net/bonding/bond0 2> /dev/null | grep -i \"Currently Active Slave: eth0\" 2> /dev/null");
 }
 
-HOST_TEST(ActiveMember, Eth1IsNotEth10) {
+HOST_TEST(ActiveMember, Eth1FindsTheLineOfEth10) {
     installBond(host, "bond0", "active-backup-down");
-    EXPECT_EQ(ask("eth1", 194, "bond0"), "");
+    EXPECT_EQ(ask("eth1", 194, "bond0"), "Currently Active Slave: eth10");
     EXPECT_EQ(ask("eth10", 194, "bond0"), "Currently Active Slave: eth10");
+    EXPECT_EQ(ask("ETH10", 194, "bond0"), "Currently Active Slave: eth10") << "case does not count";
+    EXPECT_EQ(ask("eth2", 194, "bond0"), "");
 }
 
 HOST_TEST(ActiveMember, OfATeamWithoutAFileIsNotEvenAskedFor) {
