@@ -3,9 +3,9 @@
 #include "mi/os_hw_mi.h"
 #include "network/ip_origin.h"
 #include "tests/network/killed_writer.h"
-#include "tests/network/plugin_access.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/plugin_access.h"
 
 namespace {
 

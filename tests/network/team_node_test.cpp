@@ -4,9 +4,9 @@
 
 #include "mi/globals.h"
 #include "tests/network/bonding_files.h"
-#include "tests/network/plugin_access.h"
 #include "tests/support/command_lines.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/plugin_access.h"
 
 namespace {
 

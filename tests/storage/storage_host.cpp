@@ -9,55 +9,6 @@
 #include "storage/storage_nodes.h"
 #include "tests/support/command_lines.h"
 
-namespace IC {
-
-void OsHwMITestAccess::plantDiskController(unsigned int firstNodeId) {
-    myoshwmi.ManagementInterface::initialize(7, Number(1U), Number(firstNodeId));
-    myoshwmi.inventory_ = std::make_unique<Inventory>();
-    myoshwmi.diskControllerNode_ =
-        new MutableNode(myoshwmi.drawNodeId(), 1, myoshwmi.miIds(), NodeType::diskController, 1);
-    myoshwmi.appendNode(myoshwmi.diskControllerNode_);
-}
-
-unsigned int OsHwMITestAccess::diskControllerId() {
-    return myoshwmi.diskControllerNode_->getNodeId();
-}
-
-std::vector<unsigned int> OsHwMITestAccess::drawnIds() {
-    return myoshwmi.inventory_->drawnIds;
-}
-
-const std::vector<Node*>& OsHwMITestAccess::drives() {
-    return myoshwmi.driveNodes_;
-}
-
-const std::vector<Node*>& OsHwMITestAccess::partitions() {
-    return myoshwmi.partitionNodes_;
-}
-
-FingerprintPair& OsHwMITestAccess::driveFingerprints() {
-    return myoshwmi.driveFingerprints_;
-}
-
-FingerprintPair& OsHwMITestAccess::partitionFingerprints() {
-    return myoshwmi.partitionFingerprints_;
-}
-
-bool OsHwMITestAccess::monitorRuns() {
-    return myoshwmi.driveMonitorRuns_;
-}
-
-bool OsHwMITestAccess::monitorEndedWithin(unsigned long seconds) {
-    return myoshwmi.driveMonitorEnded_.wait(seconds);
-}
-
-void OsHwMITestAccess::stopMonitor() {
-    HardDriveNodeUpdate = true;
-    myoshwmi.stopHardDriveMonitor();
-}
-
-}  // namespace IC
-
 namespace {
 
 bool refusing = false;

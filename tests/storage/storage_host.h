@@ -7,31 +7,10 @@
 #include <string>
 #include <vector>
 
-#include "mi/fingerprint.h"
-#include "mi/os_hw_mi.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/plugin_access.h"
 #include "tests/support/shell_stub.h"
-
-namespace IC {
-
-/// What the tests of the storage room see of the plug-in object.
-struct OsHwMITestAccess {
-    /// Enough of the tree for drives and partitions: a disk controller with the first node id.
-    static void plantDiskController(unsigned int firstNodeId);
-    static unsigned int diskControllerId();
-    static std::vector<unsigned int> drawnIds();
-    static const std::vector<Node*>& drives();
-    static const std::vector<Node*>& partitions();
-    static FingerprintPair& driveFingerprints();
-    static FingerprintPair& partitionFingerprints();
-    static bool monitorRuns();
-    static bool monitorEndedWithin(unsigned long seconds);
-    /// As unload does it.
-    static void stopMonitor();
-};
-
-}  // namespace IC
 
 /// A listing of tests/storage/listings.
 std::string listing(const std::string& name);
