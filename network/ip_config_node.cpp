@@ -30,8 +30,9 @@ Error readOrigin(const Config& config, PropertyValue& out) {
 }
 
 /// An interface without any address reads as "0.0.0.0", one that carries IPv6 alone as empty.
+/// @param text what was read, even if the other half of address and mask could not be
 std::string orUnset(const Config& config, bool found, const std::string& text) {
-    if (found) {
+    if (found || !text.empty()) {
         return text;
     }
     unsigned int code = 0;

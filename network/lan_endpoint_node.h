@@ -7,8 +7,8 @@
 
 namespace IC {
 
-/// The LAN endpoint of an interface, as OsHwMI::createLANEndPointNodes builds it. Start-up does not: agents
-/// that know endpoints ask for them.
+/// The LAN endpoint of an interface, as OsHwMI::createLANEndPointNodes builds it. Nothing in the plug-in
+/// calls that builder.
 class CLANEndPointNode : public MutableNode {
 public:
     enum PropertyId : unsigned int {

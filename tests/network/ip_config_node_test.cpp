@@ -4,7 +4,9 @@
 #include <gmock/gmock.h>
 
 #include "tests/network/port_host.h"
+#include "tests/support/command_lines.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/shell_stub.h"
 
 namespace {
 
@@ -121,6 +123,34 @@ HOST_TEST(IPConfigNode, WithoutAnyAddressReadsZerosAndIPv6AloneReadsEmpty) {
     EXPECT_EQ(live(*config, 25), text("0.0.0.0"));
     EXPECT_EQ(live(*config, 26), text("0.0.0.0"));
     EXPECT_EQ(live(*config, 28), enumeration(2));
+}
+
+HOST_TEST(IPConfigNode, KeepsAnAddressWhoseMaskCannotBeRead) {
+    PortHost plugin(host, "suse-two-nics");
+    const auto config = plugin.build().config("eth0");
+    shell_stub::answerWith([](const std::string& command) -> std::optional<std::string> {
+        const bool isNone = command.find("cut -d: -f4") != command.npos || command.starts_with("ip -6");
+        return isNone ? std::optional<std::string>("") : std::nullopt;
+    });
+    EXPECT_EQ(live(*config, 25), text("192.0.2.10"));
+    EXPECT_EQ(live(*config, 26), text("0.0.0.0"));
+    shell_stub::answerWith({});
+}
+
+HOST_TEST(IPConfigNode, AsksWithTheseCommands) {
+    PortHost plugin(host, "suse-two-nics");
+    const auto config = plugin.build().config("eth0");
+    const IC::IPConfigNode bond(900, 1, {1}, 29, 1, "bond0");
+    const CommandLines commands;
+    live(*config, 97);
+    live(*config, 98);
+    live(*config, 123);
+    live(bond, 123);
+    live(*config, 186);
+    EXPECT_THAT(commands.all(), ElementsAre("hostname -s 2> /dev/null", "hostname -d 2> /dev/null",
+                                            "ethtool eth0 2> /dev/null | grep \"Link detected\"",
+                                            "ifconfig | grep bond0 2> /dev/null",
+                                            "cat /var/lib/dhcpcd/dhcpcd-eth0.info 2> /dev/null"));
 }
 
 HOST_TEST(IPConfigNode, LeavesTheAddressTypeAloneWhenThereIsNone) {

@@ -4,6 +4,7 @@
 #include <gmock/gmock.h>
 
 #include "tests/network/port_host.h"
+#include "tests/support/command_lines.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"
 
@@ -122,6 +123,51 @@ HOST_TEST(Dispatch, OfOneReenumeratesAndIsNotStored) {
     EXPECT_THAT(capture.ownMessages(), Contains("IPConfigNode::CreateUser :PropertyValue:1"));
 }
 
+HOST_TEST(Dispatch, WritesAddressMaskAndPrefixLengthWhileTheOriginIsFixed) {
+    Writable writable(host);
+    host.file(kFile, "BOOTPROTO=static\n");
+    host.tool("ifconfig eth0 netmask 255.255.0.0", "");
+    const auto node = writable.eth0();
+    EXPECT_EQ(writable.set(*node, 25, text("192.0.2.77")), "BOOTPROTO=static\nIPADDR=192.0.2.77\n");
+    EXPECT_EQ(writable.set(*node, 26, text("255.255.0.0")),
+              "BOOTPROTO=static\nIPADDR=192.0.2.77\nNETMASK=255.255.0.0\n");
+    EXPECT_EQ(writable.set(*node, 102, number(48)),
+              "BOOTPROTO=static\nIPADDR=192.0.2.77\nNETMASK=255.255.0.0\nPREFIXLEN_1=48\n");
+    EXPECT_EQ(PortHost::stored(*node, 25), text("192.0.2.77"));
+    EXPECT_EQ(PortHost::stored(*node, 26), text("255.255.0.0"));
+    EXPECT_EQ(PortHost::stored(*node, 102), number(48));
+    EXPECT_THAT(writable.changes(), ElementsAre("ifconfig eth0 netmask 255.255.0.0"));
+}
+
+HOST_TEST(Dispatch, OfAnOriginWritesTheResolversPolicyAndThenTheFile) {
+    Writable writable(host);
+    const char* policy = "/etc/sysconfig/network/config";
+    const char* file = "/etc/sysconfig/network/ifcfg-eth-id-02:00:5e:00:00:02";
+    host.file(policy, "NETCONFIG_DNS_POLICY=\"auto\"\n");
+    host.file(file, "BOOTPROTO='dhcp'\n");
+    const auto node = writable.eth1();
+    LogCapture capture;
+    EXPECT_EQ(writable.set(*node, 24, origin(3), file), "BOOTPROTO=static\nSTARTMODE='auto'\n");
+    EXPECT_EQ(host.read(policy), "NETCONFIG_DNS_POLICY=\"\"\n");
+    std::vector<std::string> writers = capture.ownMessages();
+    std::erase_if(writers, [](const std::string& message) {
+        return message != "setIPOrigin: entry" && message != "disableNetConfigDNSPolicy: Entering";
+    });
+    EXPECT_THAT(writers, ElementsAre("disableNetConfigDNSPolicy: Entering", "setIPOrigin: entry"));
+    EXPECT_EQ(PortHost::stored(*node, 24), origin(3));
+    // The next call finds the origin fixed.
+    EXPECT_EQ(writable.set(*node, 25, text("192.0.2.78"), file),
+              "BOOTPROTO=static\nSTARTMODE='auto'\nIPADDR=192.0.2.78\n");
+}
+
+HOST_TEST(Dispatch, AlwaysSucceedsWithoutCodeAndText) {
+    Writable writable(host);
+    const IC::Error error = writable.eth0()->setProperty(102, text("many"));
+    EXPECT_EQ(error.getStatus(), 0);
+    EXPECT_TRUE(error.code().empty());
+    EXPECT_EQ(error.text(), "");
+}
+
 HOST_TEST(Dispatch, OfDnsListsWritesTheResolver) {
     Writable writable(host);
     EXPECT_EQ(writable.set(*writable.eth1(), 94, texts({"203.0.113.1"}), "/etc/resolv.conf"),
@@ -192,6 +238,15 @@ HOST_TEST(LinkState, ThatIsNoneIsLoggedAndStored) {
         EXPECT_EQ(PortHost::stored(*writable.eth0(), 123), number(state));
     }
     EXPECT_THAT(writable.changes(), IsEmpty());
+}
+
+HOST_TEST(LinkState, ThatIsNoneRunsAnEmptyCommand) {
+    Writable writable(host);
+    const CommandLines commands;
+    LogCapture capture;
+    writable.set(*writable.eth0(), 123, number(33));
+    EXPECT_EQ(commands.all().back(), "");
+    EXPECT_THAT(capture.ownMessages(), Contains(testing::StartsWith("mypopen():  Count value ")));
 }
 
 HOST_TEST(LinkState, OfABondTakesTheMonitorsReportsWithoutACommand) {
@@ -300,6 +355,15 @@ HOST_TEST(Mask, OnAMissingFileCreatesItAndChangesTheRunningInterface) {
     EXPECT_THAT(capture.ownMessages(4000), ElementsAre("Writing Subnet to File"));
 }
 
+HOST_TEST(Mask, IsWrittenInPlace) {
+    host.file(kFile, "BOOTPROTO=dhcp\nNETMASK='255.0.0.0'\nMTU=1500\n");
+    host.tool("ifconfig eth0 netmask 255.255.0.0", "");
+    const CommandLines commands;
+    IC::setSubnetMask("eth0", "255.255.0.0", kMac);
+    EXPECT_EQ(host.read(kFile), "BOOTPROTO=dhcp\nNETMASK=255.255.0.0\nMTU=1500\n");
+    EXPECT_THAT(commands.all(), ElementsAre("ifconfig eth0 netmask 255.255.0.0"));
+}
+
 HOST_TEST(Mask, ThatCannotBeWrittenStillChangesTheRunningInterface) {
     host.file(kFile, "BOOTPROTO=static\nNETMASK=255.0.0.0\n");
     host.readOnly("/etc");
@@ -341,6 +405,18 @@ HOST_TEST(Gateway, DeletesTheHostRouteAndWritesTwoFiles) {
     EXPECT_EQ(host.read(kRoutes), "default\t192.0.2.2\t-\n# routes\ndefault\tfe80::1\t-\n");
     EXPECT_EQ(capture.ownMessages().front(), "Entering setIPV4Gateway");
     EXPECT_THAT(capture.ownMessages(), Contains("setIPv4GatewayForSuSe10: entry"));
+}
+
+HOST_TEST(Gateway, ThatIsEmptyLeavesTheDefaultRoute) {
+    host.file(kRoutes, "default\t192.0.2.1\t-\n");
+    host.tool("route del -host 192.0.2.10 gw eth0", "");
+    const CommandLines commands;
+    LogCapture capture;
+    IC::setIPV4Gateway("eth0", "192.0.2.10", "");
+    EXPECT_THAT(commands.all(), ElementsAre("route del -host 192.0.2.10 gw  eth0 2> /dev/null"));
+    EXPECT_EQ(host.read("/etc/sysconfig/network/ifroute-eth0"), "192.0.2.10\t\t-\n");
+    EXPECT_EQ(host.read(kRoutes), "default\t192.0.2.1\t-\n");
+    EXPECT_THAT(capture.ownMessages(), Contains("Either NIC or gateway is null"));
 }
 
 HOST_TEST(Gateway, OfARoutesFileWithTwoFamiliesKeepsTheIPv6Line) {

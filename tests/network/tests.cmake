@@ -27,11 +27,15 @@ corvista_test(network_queries SOURCES
   LIBRARIES plugin_code test_support)
 
 corvista_test(network_nodes SOURCES
-  network/command_count_test.cpp
   network/ip_config_node_test.cpp
   network/ipv4_writer_test.cpp
   network/lan_endpoint_test.cpp
+  LIBRARIES plugin_code test_support)
+
+corvista_test(network_ports SOURCES
+  network/command_count_test.cpp
   network/port_nodes_test.cpp
+  network/port_walk_test.cpp
   LIBRARIES plugin_code test_support)
 # The links of a real kernel are asked with our own classic tools too.
 add_dependencies(network_queries_test corvista-hosttools)
