@@ -26,7 +26,7 @@ public:
         wakeOnLanEnabled = 183,     ///< list of numbers: 3 (magic packet); unset when ethtool tells nothing
         portType = 185,             ///< number: code of the first supported link mode (getPortType)
         isTeamMember = 193,         ///< boolean: SLAVE of the interface file is yes
-        isActiveMember = 194,       ///< boolean: the team sends through this port
+        isActiveMember = 194,       ///< boolean: the team sends through this port (or, of eth1, eth10)
         memberLinkStatus = 195,     ///< text: the MII status word, from the team's status file
         memberLinkFailures = 196,   ///< number: link failure count, from the team's status file
         team = 199,                 ///< text: MASTER of the interface file

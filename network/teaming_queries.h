@@ -10,9 +10,10 @@ namespace IC {
 
 /// What getNICTeamingInformation can be asked, by the port's property ids.
 namespace TeamingProperty {
-constexpr unsigned int role = 193;          ///< SLAVE and MASTER of the port's interface file
-constexpr unsigned int activeMember = 194;  ///< not empty when the port is the active member
-constexpr unsigned int miiStatus = 195;     ///< the first word of the member's MII status
+constexpr unsigned int role = 193;  ///< SLAVE and MASTER of the port's interface file
+constexpr unsigned int activeMember =
+    194;                                 ///< not empty when the active member's name begins with the port's
+constexpr unsigned int miiStatus = 195;  ///< the first word of the member's MII status
 constexpr unsigned int linkFailures = 196;  ///< the member's link failure count, decimal
 }  // namespace TeamingProperty
 

@@ -3,6 +3,7 @@
 
 #include <gmock/gmock.h>
 
+#include "network/ip_facts.h"
 #include "tests/network/port_host.h"
 #include "tests/support/command_lines.h"
 #include "tests/support/log_capture.h"
@@ -64,6 +65,23 @@ HOST_TEST(IPConfigNode, OfALeaseSaysSo) {
     EXPECT_EQ(PortHost::stored(*config, 186), flag(true));
     EXPECT_EQ(PortHost::stored(*config, 25), text("0.0.0.0"));
     EXPECT_EQ(PortHost::stored(*config, 26), text("0.0.0.0"));
+}
+
+HOST_TEST(IPConfigNode, ListsTheLeasesServerBeforeTheDHCPv6Server) {
+    host.file("/var/lib/dhcpcd/dhcpcd-eth0.info", "IPADDR='192.0.2.9'\nDHCPSID='192.0.2.1'\n");
+    host.file("/var/lib/dhcpv6/client6.leases", "lease SDUID: 00:01:00:01;\n");
+    EXPECT_THAT(IC::dhcpServersOf("eth0"), ElementsAre("192.0.2.1", "00:01:00:01"));
+    EXPECT_THAT(IC::dhcpServersOf("eth1"), ElementsAre("00:01:00:01"));
+    host.remove("/var/lib/dhcpv6");
+    EXPECT_THAT(IC::dhcpServersOf("eth1"), testing::IsEmpty());
+}
+
+HOST_TEST(IPConfigNode, HasTheFourthGroupOfItsAddressForAnInterfaceId) {
+    EXPECT_EQ(IC::ipv6InterfaceIdOf("2001:db8:1:2:3:4:5:6"), "2");
+    EXPECT_EQ(IC::ipv6InterfaceIdOf("2001:db8::10"), "10");
+    EXPECT_EQ(IC::ipv6InterfaceIdOf("2001:db8:1:2 x:3"), "2") << "cut at the blank";
+    EXPECT_EQ(IC::ipv6InterfaceIdOf("fe80::1"), "");
+    EXPECT_EQ(IC::ipv6InterfaceIdOf(""), "");
 }
 
 HOST_TEST(IPConfigNode, AnswersWhatTheHostSaysNow) {
