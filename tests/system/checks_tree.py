@@ -165,3 +165,13 @@ def partitions(context):
 def processors(context):
     speeds = [int(float(text)) for text in re.findall(r"cpu MHz\s*: (\S+)", context.guest.read("/proc/cpuinfo"))]
     expect_equal("clock speeds", [by_id(node)[80] for node in nodes(context, "processor")], speeds)
+
+
+@check("tree: read through our host-tool adapters it is the same, the time apart")
+def adapters(context):
+    expect_equal("adapters", sorted(context.guest.names("/usr/lib/corvista/hosttools/*")), ["fdisk", "ifconfig", "route"])
+    ours = context.guest.cvagent("--host-tools", "classic", "tree")["nodes"]
+    for mine, native in zip(ours, load_tree(context), strict=True):
+        for node in (mine, native):
+            node["properties"].pop("126", None)
+        expect_equal(native["path"], mine, native)
