@@ -27,7 +27,7 @@ constexpr unsigned int kInterfaceId = 1;
 constexpr unsigned int kOwnNodeId = 1;
 constexpr unsigned int kFirstNodeId = 2;
 
-// The lookup by name has no context argument.
+// Lookups by name and paths of nodes come without a context argument.
 std::atomic<IC::ManagementInterface*> lookedUp{nullptr};
 
 [[noreturn]] void fail(const std::string& text) {
@@ -115,6 +115,7 @@ void Plugin::open() {
 
 void Plugin::start() {
     lookedUp = interface_;
+    IC::Node::setPathSource(pathOfUnseen);
     try {
         guarded("initialize of " + inQuotes(file_), [this] {
             interface_->setLoadCallBack(nodeLoaded, this, findByName);
@@ -125,20 +126,14 @@ void Plugin::start() {
             if (result.getStatus() != 0) {
                 fail("the plug-in " + inQuotes(file_) + " did not initialize: " + errorText(result));
             }
-            // At once: the plug-in's monitors run already, and alerts name nodes by their paths.
+            if (const auto create = symbol<Builder>(library_, kProcessorBuilder)) {
+                create(interface_);
+            }
             setPaths(*interface_);
-            createProcessors();
         });
     } catch (...) {
         stop();
         throw;
-    }
-}
-
-void Plugin::createProcessors() {
-    if (const auto create = symbol<Builder>(library_, kProcessorBuilder)) {
-        create(interface_);
-        setPaths(*interface_);
     }
 }
 
@@ -151,6 +146,7 @@ void Plugin::stop() {
     } catch (...) {
         complain("unload of " + inQuotes(file_) + " threw an unknown exception");
     }
+    IC::Node::setPathSource(nullptr);
     lookedUp = nullptr;
 }
 
@@ -189,6 +185,12 @@ IC::Error Plugin::alertsCame(const std::vector<IC::Alert>& alerts, const void* p
         }
     }
     return {};
+}
+
+std::string Plugin::pathOfUnseen(const IC::Node& node) {
+    const IC::ManagementInterface* interface = lookedUp;
+    const auto* known = dynamic_cast<const IC::MutableNode*>(&node);
+    return interface != nullptr && known != nullptr ? makePath(*interface, *known) : std::string();
 }
 
 IC::Error Plugin::findByName(const std::string& name, IC::Node** node) {

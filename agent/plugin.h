@@ -30,12 +30,12 @@ private:
     static IC::Error nodeLoaded(IC::Node* const& node, const void* plugin);
     static void nodeWithdrawn(const IC::Node& node, const void* plugin);
     static IC::Error alertsCame(const std::vector<IC::Alert>& alerts, const void* plugin);
+    static std::string pathOfUnseen(const IC::Node& node);
     static IC::Error findByName(const std::string& name, IC::Node** node);
 
     void load();
     void open();
     void start();
-    void createProcessors();
     void stop();
     void close();
 

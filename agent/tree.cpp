@@ -72,10 +72,7 @@ void setPaths(const IC::ManagementInterface& interface) {
         return found == byId.end() ? Handle() : found->second;
     };
     for (const Handle& node : nodes) {
-        const std::string path = pathOf(*node, find);
-        if (node->getPath() != path) {
-            node->setPath(path);
-        }
+        node->setPath(pathOf(*node, find));
     }
 }
 

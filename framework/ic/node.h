@@ -29,8 +29,12 @@ public:
     /// "path (type T, id N)", for log lines.
     virtual operator std::string() const = 0;
 
-    /// The node's place in the tree ("/oshw/root/computer"), as the agent set it; "" before that.
+    /// The node's place in the tree ("/oshw/root/computer"), as the agent set it; before that what the path
+    /// source says, "" without one.
     std::string getPath() const;
+    /// The agent's answer for nodes that it has not seen yet: the plug-in's monitors run, and send alerts
+    /// about nodes, before the agent reads the map. It may be called on any thread. Null for none.
+    static void setPathSource(std::string (*source)(const Node& node));
 
 protected:
     void storePath(const std::string& path);

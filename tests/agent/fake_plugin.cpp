@@ -7,6 +7,7 @@
 //   errors                  initialize logs errors
 //   churn                   a thread publishes and withdraws drives until unload
 //   alert                   a thread sends one alert
+//   early                   initialize sends one alert, before the agent has seen any node
 // FAKE_PLUGIN_DIARY names a file that gets a line for each write and for the unload.
 #include <atomic>
 #include <chrono>
@@ -105,7 +106,13 @@ public:
             churn_ = std::thread([this] { churn(); });
         }
         if (told("alert")) {
-            alert_ = std::thread([this] { alert(); });
+            alert_ = std::thread([this] {
+                std::this_thread::sleep_for(std::chrono::milliseconds(50));
+                sendAlert();
+            });
+        }
+        if (told("early")) {
+            sendAlert();
         }
         return told("badstart") ? Error(1, Number(), "no host here") : result;
     }
@@ -183,8 +190,7 @@ private:
         }
     }
 
-    void alert() {
-        std::this_thread::sleep_for(std::chrono::milliseconds(50));
+    void sendAlert() {
         std::string path;
         for (const auto& node : holdAll()) {
             path = node->nodeType() == 12 ? node->getPath() : path;

@@ -29,10 +29,13 @@ public:
     /// Runs cvagent and gives the commands that it ran beside those that only look.
     Finished run(const std::vector<std::string>& words) {
         host_.clearCalls();
+        return host_.run(commandLine(words));
+    }
+    std::vector<std::string> commandLine(const std::vector<std::string>& words) const {
         std::vector<std::string> line = {CVAGENT_PROGRAM, "--host-tools", "native", "--plugin",
                                          CORVISTA_PLUGIN_FILE};
         line.insert(line.end(), words.begin(), words.end());
-        return host_.run(line);
+        return line;
     }
     /// The commands of the last run that change something, in order.
     std::vector<std::string> changes() const {

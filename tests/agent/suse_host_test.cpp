@@ -2,6 +2,7 @@
 #include "tests/agent/suse_host.h"
 
 #include <gmock/gmock.h>
+#include <signal.h>
 
 #include <nlohmann/json.hpp>
 
@@ -265,13 +266,16 @@ HOST_TEST(SuseComputer, TheTimeZoneIsSwitched) {
 HOST_TEST(SuseMonitors, AStateChangeAcrossARestartRaisesOneAlert) {
     SuseHost suse(host);
     host.file("/opt/vantrel/corvista/data/oshwminetind.dat", "eth0=12\n");
-    const Finished first = suse.run({"watch", "--json", "--for", "1"});
+    RunningProgram watch = host.start(suse.commandLine({"watch", "--json"}));
+    ASSERT_TRUE(watch.waitForOutput("}\n"));
+    watch.signal(SIGTERM);
+    const Finished first = watch.wait();
     EXPECT_EQ(first.status, 0);
     const Json alert = Json::parse(first.out);
     EXPECT_EQ(alert["message"], "NIC is Online ");
     EXPECT_EQ(alert["path"], "/oshw/root/computer/chassis/network-controller/network-port:eth0");
     EXPECT_EQ(alert["codes"].dump(), R"({"first":3,"second":0,"event":1})");
-    EXPECT_THAT(suse.run({"watch", "--json", "--for", "0.5"}).out, IsEmpty());
+    EXPECT_THAT(suse.run({"watch", "--json", "--for", "2"}).out, IsEmpty());
 }
 
 }  // namespace

@@ -15,7 +15,6 @@ corvista_test(agent LIBRARIES agent_code test_support util SOURCES
   agent/read_commands_test.cpp
   agent/set_command_test.cpp
   agent/surroundings_test.cpp
-  agent/suse_host_test.cpp
   agent/team_test.cpp
   agent/terminal.cpp
   agent/tree_test.cpp
@@ -23,6 +22,11 @@ corvista_test(agent LIBRARIES agent_code test_support util SOURCES
   agent/watch_command_test.cpp)
 target_compile_definitions(agent_test PRIVATE ${agent_test_programs})
 add_dependencies(agent_test cvagent fake_plugin vantrelcvicoshwmi)
+
+corvista_test(agent_suse_host LIBRARIES test_support SOURCES
+  agent/suse_host_test.cpp)
+target_compile_definitions(agent_suse_host_test PRIVATE ${agent_test_programs})
+add_dependencies(agent_suse_host_test cvagent vantrelcvicoshwmi)
 
 corvista_test(agent_lifetime LIBRARIES agent_code test_support LABELS threads SOURCES
   agent/lifetime_test.cpp)

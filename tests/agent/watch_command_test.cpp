@@ -23,7 +23,7 @@ void waitFor(const CvagentRun& cvagent, const std::string& note) {
 }
 
 HOST_TEST(WatchCommand, PrintsPublishedAndWithdrawnNodes) {
-    const Finished run = CvagentRun(host).telling("churn")({"watch", "--for", "0.2"});
+    const Finished run = CvagentRun(host).telling("churn")({"watch", "--for", "1"});
     EXPECT_EQ(run.status, 0);
     const std::string path =
         "/oshw/root/computer/chassis/planar/disk-controller/hard-drive:sdb  Hard Drive\n";
@@ -33,14 +33,20 @@ HOST_TEST(WatchCommand, PrintsPublishedAndWithdrawnNodes) {
 }
 
 HOST_TEST(WatchCommand, PrintsAlertsWithPathMessageAndCodes) {
-    const Finished run = CvagentRun(host).telling("alert")({"watch", "--for", "0.3"});
+    const Finished run = CvagentRun(host).telling("alert")({"watch", "--for", "2"});
     EXPECT_THAT(run.out,
                 EndsWith("Z  alert      /oshw/root/computer/chassis/network-controller/network-port:eth0  "
                          "NIC is Offline  (codes 1, 0, 12)\n"));
 }
 
+HOST_TEST(WatchCommand, AlertsThatComeWhileThePluginStartsHaveTheirPath) {
+    const Finished run = CvagentRun(host).telling("early")({"watch", "--for", "0"});
+    EXPECT_THAT(run.out,
+                HasSubstr("alert      /oshw/root/computer/chassis/network-controller/network-port:eth0  "));
+}
+
 HOST_TEST(WatchCommand, PrintsOneObjectALine) {
-    const Finished run = CvagentRun(host).telling("churn alert")({"watch", "--json", "--for", "0.3"});
+    const Finished run = CvagentRun(host).telling("churn alert")({"watch", "--json", "--for", "2"});
     ASSERT_EQ(run.status, 0);
     std::istringstream lines(run.out);
     std::map<std::string, int> seen;

@@ -34,6 +34,19 @@ TEST(MutableNode, TakesNewAttributes) {
     EXPECT_EQ(static_cast<std::string>(node), "/oshw/root (type 59, id 7)");
 }
 
+TEST(MutableNode, AsksThePathSourceUntilThePathIsSet) {
+    MutableNode node(7, 2, {}, 59, 0);
+    IC::Node::setPathSource([](const IC::Node& unseen) {
+        return "/node/" + std::to_string(dynamic_cast<const MutableNode&>(unseen).getNodeId());
+    });
+    EXPECT_EQ(node.getPath(), "/node/7");
+    node.setPath("/oshw/root");
+    EXPECT_EQ(node.getPath(), "/oshw/root");
+    IC::Node::setPathSource(nullptr);
+    EXPECT_EQ(node.getPath(), "/oshw/root");
+    EXPECT_EQ(MutableNode(8, 2, {}, 59, 0).getPath(), "");
+}
+
 TEST(MutableNode, AnUnknownPropertyFailsAndLeavesTheValueAlone) {
     const MutableNode node(1, 0, {}, 1, 0);
     PropertyValue value("before", true);
