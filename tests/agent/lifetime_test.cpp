@@ -28,6 +28,14 @@ std::pair<std::size_t, std::size_t> holdings() {
     return {entries("/proc/self/task"), entries("/proc/self/fd")};
 }
 
+/// The holdings, once they are as before: a thread that was joined can be seen for a moment longer.
+std::pair<std::size_t, std::size_t> holdingsBackAt(const std::pair<std::size_t, std::size_t>& before) {
+    for (int i = 0; i < 500 && holdings() != before; ++i) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(10));
+    }
+    return holdings();
+}
+
 /// Counts what it hears.
 class Counter : public cvagent::Listener {
 public:
@@ -47,7 +55,7 @@ void loadAgainAndAgain(const std::string& file, int times) {
         Plugin plugin(file, &counter);
         ASSERT_GE(plugin.interface().holdAll().size(), 7U) << i;
     }
-    EXPECT_EQ(holdings(), before);
+    EXPECT_EQ(holdingsBackAt(before), before);
 }
 
 HOST_TEST(PluginLifetime, TwoHundredLoadsLeaveNothingBehind) {
@@ -72,11 +80,12 @@ HOST_TEST(PluginLifetime, MonitorsStoppedInTheMiddleOfAPassLeaveNothingBehind) {
 
 HOST_TEST(PluginLifetime, TwoHundredFailuresLeaveNothingBehind) {
     setenv("FAKE_PLUGIN", "badstart churn", 1);
+    EXPECT_ANY_THROW(Plugin(FAKE_PLUGIN_FILE, nullptr));  // what the C library keeps from its first use
     const auto before = holdings();
     for (int i = 0; i < 200; ++i) {
         EXPECT_ANY_THROW(Plugin(FAKE_PLUGIN_FILE, nullptr));
     }
-    EXPECT_EQ(holdings(), before);
+    EXPECT_EQ(holdingsBackAt(before), before);
 }
 
 HOST_TEST(PluginLifetime, NodesAreReadWhileTheyComeAndGo) {
