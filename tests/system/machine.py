@@ -9,6 +9,9 @@ import time
 
 NICS = 5
 DISKS = {"sda": 6144, "sdb": 24}  # MiB; the first has more bytes than 32 bits count
+# No network names of udev's, fast start, and nothing random in addresses: translated code is used again.
+KERNEL_OPTIONS = ("console=ttyS0,115200 quiet loglevel=4 panic=-1 net.ifnames=0 clocksource=tsc tsc=reliable "
+                  "random.trust_cpu=on mitigations=off init_on_alloc=0 apparmor=0 audit=0 nokaslr norandmaps")
 LONGEST_BOOT = 240  # seconds of real time, on a machine that is busy with other things
 LONGEST_COMMAND = 240
 
@@ -96,8 +99,7 @@ class Machine:
                  "-icount", "shift=3,sleep=off", "-nodefaults", "-no-user-config", "-display", "none", "-action", "reboot=shutdown",
                  "-rtc", "base=2026-01-01T00:00:00,clock=vm",
                  "-kernel", kernel, "-initrd", initramfs,
-                 "-append", "console=ttyS0,115200 net.ifnames=0 mitigations=off panic=-1 nokaslr norandmaps init_on_alloc=0 apparmor=0 audit=0 quiet loglevel=4 "
-                            "random.trust_cpu=on clocksource=tsc tsc=reliable rdinit=/init",
+                 "-append", KERNEL_OPTIONS,
                  "-serial", "file:" + self.console,
                  "-chardev", f"socket,id=channel,path={self._path('channel')},server=on,wait=off",
                  "-serial", "chardev:channel",

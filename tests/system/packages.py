@@ -81,7 +81,8 @@ class Apt:
 
     def uris(self, *words):
         """(address, file name, size) of what these words of apt-get would download."""
-        nowhere = ["-o", "Dir::Cache::archives=" + os.path.join(self.directory, "none", "")]  # else those here are left out
+        # Packages that are here already would be left out.
+        nowhere = ["-o", "Dir::Cache::archives=" + os.path.join(self.directory, "none", "")]
         lines = self._run("apt-get", *nowhere, "--print-uris", "-y", *words,
                           capture_output=True).stdout.splitlines()
         rows = [line.split() for line in lines if line.startswith("'")]
