@@ -95,8 +95,10 @@ class Machine:
         return os.path.join(self.directory, name)
 
     def _command(self, kernel, initramfs):
-        words = ["qemu-system-i386", "-accel", "tcg", "-smp", "1", "-m", "256", "-cpu", "qemu32",
-                 "-icount", "shift=3,sleep=off", "-nodefaults", "-no-user-config", "-display", "none", "-action", "reboot=shutdown",
+        words = ["setpriv", "--pdeathsig", "TERM",  # whatever ends the test ends the machine, too
+                 "qemu-system-i386", "-accel", "tcg", "-smp", "1", "-m", "256", "-cpu", "qemu32",
+                 "-icount", "shift=3,sleep=off", "-nodefaults", "-no-user-config", "-display", "none",
+                 "-action", "reboot=shutdown",  # a guest that panics ends at once
                  "-rtc", "base=2026-01-01T00:00:00,clock=vm",
                  "-kernel", kernel, "-initrd", initramfs,
                  "-append", KERNEL_OPTIONS,

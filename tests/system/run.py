@@ -56,7 +56,7 @@ class Runner(threading.Thread):
     """Boots one machine and runs its checks there."""
 
     def __init__(self, name, checks, report, guest_files, directory):
-        super().__init__(name=name)
+        super().__init__(name=name, daemon=True)
         self.checks, self.report, self.guest_files, self.directory = checks, report, guest_files, directory
 
     def run(self):
