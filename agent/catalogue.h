@@ -27,8 +27,8 @@ enum class Unit {
 
 /// A code of an enumeration and what it means.
 struct Label {
-    unsigned int code;
     const char* text;
+    unsigned int code;
     bool writable = false;  ///< the code may be written
 };
 

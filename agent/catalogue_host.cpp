@@ -6,7 +6,7 @@ namespace cvagent {
 
 namespace {
 
-constexpr Label kPower[] = {{1, "on", true}, {9, "restart", true}, {12, "halt", true}};
+constexpr Label kPower[] = {{"on", 1, true}, {"restart", 9, true}, {"halt", 12, true}};
 
 constexpr auto kOwnerAccepts = "text of up to 1024 bytes without control characters; \"\" removes it";
 

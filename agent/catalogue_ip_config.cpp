@@ -6,13 +6,13 @@ namespace cvagent {
 
 namespace {
 
-constexpr Label kOrigins[] = {{0, "unknown"}, {1, "DHCP", true}, {2, "BOOTP"}, {3, "static", true}};
-constexpr Label kLeaseOrigins[] = {{1, "DHCP"}, {3, "static"}};
-constexpr Label kStates[] = {{1, "up", true},    {9, "up", true},       {12, "down", true},
-                             {16, "down", true}, {32, "switched over"}, {33, "switched back"}};
-constexpr Label kProtocols[] = {{4096, "IPv4"}, {4097, "IPv6"}, {4098, "IPv4 and IPv6"}};
-constexpr Label kAddressTypes[] = {{2, "IPv4"}, {5, "IPv6"}, {7, "IPv4 and IPv6"}};
-constexpr Label kEnumerate[] = {{1, "now", true}};
+constexpr Label kOrigins[] = {{"unknown", 0}, {"DHCP", 1, true}, {"BOOTP", 2}, {"static", 3, true}};
+constexpr Label kLeaseOrigins[] = {{"DHCP", 1}, {"static", 3}};
+constexpr Label kStates[] = {{"up", 1, true},    {"up", 9, true},       {"down", 12, true},
+                             {"down", 16, true}, {"switched over", 32}, {"switched back", 33}};
+constexpr Label kProtocols[] = {{"IPv4", 4096}, {"IPv6", 4097}, {"IPv4 and IPv6", 4098}};
+constexpr Label kAddressTypes[] = {{"IPv4", 2}, {"IPv6", 5}, {"IPv4 and IPv6", 7}};
+constexpr Label kEnumerate[] = {{"now", 1, true}};
 
 constexpr auto ip = NodeType::ipConfig;
 

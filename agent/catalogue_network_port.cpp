@@ -5,17 +5,17 @@ namespace cvagent {
 
 namespace {
 
-constexpr Label kLinkStates[] = {{1, "up"}, {12, "down"}, {32, "switched over"}, {33, "switched back"}};
+constexpr Label kLinkStates[] = {{"up", 1}, {"down", 12}, {"switched over", 32}, {"switched back", 33}};
 constexpr Label kPortTypes[] = {
-    {0, "unknown"},       {1, "other"},        {50, "10BaseT"},
-    {51, "10-100BaseT"},  {52, "100BaseT"},    {53, "1000BaseT"},
-    {54, "2500BaseT"},    {55, "10GBaseT"},    {56, "10GBase-CX4"},
-    {100, "100Base-FX"},  {101, "100Base-SX"}, {103, "1000Base-LX"},
-    {104, "1000Base-CX"}, {105, "10GBase-SR"}, {106, "10GBase-SW"},
-    {107, "10GBase-LX4"}, {108, "10GBase-LR"}, {109, "10GBase-LW"},
-    {110, "10GBase-ER"},  {111, "10GBase-EW"}, {16000, "vendor reserved"},
+    {"unknown", 0},       {"other", 1},        {"10BaseT", 50},
+    {"10-100BaseT", 51},  {"100BaseT", 52},    {"1000BaseT", 53},
+    {"2500BaseT", 54},    {"10GBaseT", 55},    {"10GBase-CX4", 56},
+    {"100Base-FX", 100},  {"100Base-SX", 101}, {"1000Base-LX", 103},
+    {"1000Base-CX", 104}, {"10GBase-SR", 105}, {"10GBase-SW", 106},
+    {"10GBase-LX4", 107}, {"10GBase-LR", 108}, {"10GBase-LW", 109},
+    {"10GBase-ER", 110},  {"10GBase-EW", 111}, {"vendor reserved", 16000},
 };
-constexpr Label kWake[] = {{3, "magic packet"}};
+constexpr Label kWake[] = {{"magic packet", 3}};
 
 constexpr auto port = NodeType::networkPort;
 

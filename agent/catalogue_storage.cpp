@@ -5,7 +5,7 @@ namespace cvagent {
 
 namespace {
 
-constexpr Label kHealth[] = {{1, "normal"}};
+constexpr Label kHealth[] = {{"normal", 1}};
 
 constexpr Property kRows[] = {
     {NodeType::hardDrive,

@@ -62,7 +62,7 @@ std::string findOnPath(const std::string& name) {
     const std::string path = variable != nullptr ? variable : "";
     for (std::size_t start = 0; start <= path.size();) {
         const std::size_t end = std::min(path.find(':', start), path.size());
-        const std::string candidate = path.substr(start, end - start) + "/" + name;
+        std::string candidate = path.substr(start, end - start) + "/" + name;
         if (end > start && isProgram(candidate)) {
             return candidate;
         }

@@ -71,7 +71,7 @@ Properties storedProperties(const IC::MutableNode& node) {
 }
 
 std::string pathComponent(const IC::MutableNode& node) {
-    const std::string name = className(node.nodeType());
+    std::string name = className(node.nodeType());
     const NodeClass* known = findClass(node.nodeType());
     if (known != nullptr && known->naming == Naming::single) {
         return name;

@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <array>
 #include <cerrno>
+#include <cstdarg>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
@@ -18,6 +19,15 @@ namespace {
 
 constexpr std::size_t kLongestQuote = 60;
 
+__attribute__((format(printf, 1, 2))) std::string formatted(const char* format, ...) {
+    std::array<char, 64> text{};
+    va_list arguments;
+    va_start(arguments, format);
+    const int length = std::vsnprintf(text.data(), text.size(), format, arguments);
+    va_end(arguments);
+    return length < 0 ? std::string() : std::string(text.data());
+}
+
 /// "12.3 GB": a size in steps of 1000 or 1024, with the unit that keeps it short.
 std::string scaled(double size, double step, const std::array<const char*, 6>& units) {
     std::size_t unit = 0;
@@ -25,10 +35,8 @@ std::string scaled(double size, double step, const std::array<const char*, 6>& u
         size /= step;
         ++unit;
     }
-    std::array<char, 64> text{};
-    std::snprintf(text.data(), text.size(), unit == 0 || size >= 1000 ? "%.0f %s" : "%.1f %s", size,
-                  units[unit]);
-    return text.data();
+    const int decimals = unit == 0 || size >= 1000 ? 0 : 1;
+    return formatted("%.*f %s", decimals, size, units[unit]);
 }
 
 std::string speedText(unsigned long long kilobits) {
@@ -40,10 +48,7 @@ std::string speedText(unsigned long long kilobits) {
 
 std::string offsetText(double minutes) {
     const int whole = static_cast<int>(minutes);
-    std::array<char, 32> text{};
-    std::snprintf(text.data(), text.size(), "UTC%c%02d:%02d", whole < 0 ? '-' : '+', std::abs(whole) / 60,
-                  std::abs(whole) % 60);
-    return text.data();
+    return formatted("UTC%c%02d:%02d", whole < 0 ? '-' : '+', std::abs(whole) / 60, std::abs(whole) % 60);
 }
 
 /// What a number comes to in larger units; empty when there is nothing to add.
@@ -143,9 +148,7 @@ std::string printable(const std::string& text) {
         const auto next = i + 1 < text.size() ? static_cast<unsigned char>(text[i + 1]) : 0U;
         const bool secondControlSet = byte == 0xC2 && next >= 0x80 && next < 0xA0;  // U+0080 to U+009F
         if (byte < 0x20 || byte == 0x7F || secondControlSet) {
-            std::array<char, 8> code{};
-            std::snprintf(code.data(), code.size(), "\\x%02x", byte);
-            shown += code.data();
+            shown += formatted("\\x%02x", byte);
         } else {
             shown += text[i];
         }

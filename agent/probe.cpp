@@ -20,6 +20,7 @@ constexpr std::size_t kMostOutput = 1U << 20U;  // a listing of a thousand disks
 
 pid_t spawn(std::vector<std::string>& words, int output) {
     std::vector<char*> arguments;
+    arguments.reserve(words.size() + 1);
     for (std::string& word : words) {
         arguments.push_back(word.data());
     }

@@ -58,7 +58,7 @@ int StopSignals::descriptor() {
 void StopSignals::die() {
     const int signal = received();
     handle(signal, SIG_DFL);
-    std::raise(signal);
+    kill(getpid(), signal);
     std::_Exit(128 + signal);
 }
 

@@ -77,7 +77,9 @@ void prepareSurroundings() {
         }
     }
     setenv("PATH", path.c_str(), 1);
-    std::signal(SIGCHLD, SIG_DFL);
+    struct sigaction standard {};
+    standard.sa_handler = SIG_DFL;
+    sigaction(SIGCHLD, &standard, nullptr);
 }
 
 DataDirectory::DataDirectory() {

@@ -44,6 +44,7 @@ std::vector<unsigned int> allIds(const IC::MutableNode& node) {
 
 std::vector<unsigned int> wantedIds(const IC::MutableNode& node, const std::vector<std::string>& words) {
     std::vector<unsigned int> ids;
+    ids.reserve(words.size());
     for (const std::string& word : words) {
         ids.push_back(idOf(node, word));
     }

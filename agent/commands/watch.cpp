@@ -72,7 +72,7 @@ int millisecondsTo(const std::optional<Clock::time_point>& end) {
         return -1;
     }
     const auto left = std::chrono::ceil<std::chrono::milliseconds>(*end - Clock::now()).count();
-    return static_cast<int>(std::clamp<long long>(left, 0, 3600 * 1000));
+    return static_cast<int>(std::clamp<long long>(left, 0, 3600LL * 1000));
 }
 
 void printAll(EventQueue& queue, bool asJson, const Style& style) {
