@@ -15,20 +15,17 @@ constexpr Label kPortTypes[] = {
     {"10GBase-LX4", 107}, {"10GBase-LR", 108}, {"10GBase-LW", 109},
     {"10GBase-ER", 110},  {"10GBase-EW", 111}, {"vendor reserved", 16000},
 };
+constexpr Label kSpeeds[] = {{"not known", 0}};  // what the plug-in answers when the host tells no speed
 constexpr Label kWake[] = {{"magic packet", 3}};
 
 constexpr auto port = NodeType::networkPort;
 
 constexpr Property kRows[] = {
     {port, 0, "PortNames", Kind::texts, Unit::none, {}, "the interface name, as a list of one"},
-    {port,
-     38,
-     "SupportedSpeed",
-     Kind::number,
-     Unit::megabitsPerSecond,
-     {},
+    {port, 38, "SupportedSpeed", Kind::number, Unit::megabitsPerSecond, kSpeeds,
      "speed of the first link mode that the port supports"},
-    {port, 57, "LinkSpeed", Kind::number, Unit::kilobitsPerSecond, {}, "speed of the link; 0 without one"},
+    {port, 57, "LinkSpeed", Kind::number, Unit::kilobitsPerSecond, kSpeeds,
+     "speed of the link; 0 when the host tells none"},
     {port, 67, "AutoNegotiation", Kind::number, Unit::none, {}, "whether speed and duplex are negotiated"},
     {port, 82, "FullDuplex", Kind::number, Unit::none, {}, "whether the link is full duplex"},
     {port, 108, "InterfaceName", Kind::text, Unit::none, {}, "the interface name"},

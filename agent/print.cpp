@@ -79,7 +79,7 @@ std::string numberText(const std::optional<Property>& property, const IC::Number
     if (!property || number.empty() || number.kind() == IC::Number::boolean) {
         return text;
     }
-    if (!property->labels.empty()) {
+    if (labelOf(*property, number) != nullptr) {
         return withLabel(property, text, number);
     }
     if (property->unit != Unit::none) {

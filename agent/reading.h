@@ -18,6 +18,9 @@ struct Reading {
     bool missing = false;  ///< it failed because the node has no such property
 
     bool failed() const { return !error.empty(); }
+    /// Why there is no value, for people: a property that every node of the class could have is just not
+    /// known here.
+    std::string complaint() const { return missing && row ? "not known" : "not known (" + error + ")"; }
     std::string name() const { return row ? row->name : std::to_string(id); }
 };
 

@@ -64,7 +64,7 @@ std::string listing(const IC::MutableNode& node, const std::vector<Reading>& rea
         const std::string id = std::to_string(reading.id);
         text += "  " + style.faint(std::string(id.size() < 5 ? 5 - id.size() : 0, ' ') + id) + "  " +
                 padded(reading.name(), width) + "  ";
-        text += reading.failed() ? style.bad("not known (" + printable(reading.error) + ")")
+        text += reading.failed() ? style.bad(printable(reading.complaint()))
                                  : valueText(reading.row, reading.value);
         text += "\n";
     }

@@ -83,8 +83,7 @@ IC::Error write(IC::MutableNode& node, const Property& row, const IC::PropertyVa
 }
 
 std::string shown(const Reading& reading) {
-    return reading.failed() ? "not known (" + printable(reading.error) + ")"
-                            : valueText(reading.row, reading.value);
+    return reading.failed() ? printable(reading.complaint()) : valueText(reading.row, reading.value);
 }
 
 std::string report(const IC::MutableNode& node, const Reading& before, const Reading& after,

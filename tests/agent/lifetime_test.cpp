@@ -130,4 +130,28 @@ HOST_TEST(PluginLifetime, HandlesKeepWithdrawnNodesAlive) {
     EXPECT_EQ(drive->getPath(), "/oshw/root/computer/chassis/planar/disk-controller/hard-drive:sdb");
 }
 
+HOST_TEST(PluginLifetime, RebuiltDrivesReplaceTheOldOnes) {
+    const cvagent::QuietCommands quiet;
+    host.file("/proc/cpuinfo", "processor\t: 0\n");
+    host.tool("fdisk -ls",
+              "Disk /dev/sda: 80.0 GB, 80026361856 bytes\n/dev/sda1   1  13  104391  83  Linux\n");
+    QX::setClockSpeed(1000);  // the monitor's two minutes in an eighth of a second
+    Counter counter;
+    Plugin plugin(CORVISTA_PLUGIN_FILE, &counter);
+    for (int i = 0; i < 3000 && counter.published < 2; ++i) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(10));
+    }
+    EXPECT_EQ(counter.published, 2);  // an unchanged layout is built anew once and then left alone
+    EXPECT_EQ(counter.withdrawn, 2);
+    std::vector<std::string> paths;
+    for (const cvagent::Handle& node : plugin.interface().holdAll()) {
+        if (node->getPath().find("disk-controller/") != std::string::npos) {
+            paths.push_back(node->getPath());
+        }
+    }
+    const std::string above = "/oshw/root/computer/chassis/planar/disk-controller/";
+    EXPECT_THAT(paths, testing::ElementsAre(above + "hard-drive:sda", above + "partition:sda1"));
+    QX::setClockSpeed(1);
+}
+
 }  // namespace

@@ -53,6 +53,9 @@ TEST(Print, CodesHaveTheirLabels) {
 TEST(Print, WhatIsNotThereReadsAsSuch) {
     EXPECT_EQ(shown(12, 57, PropertyValue()), "not known");
     EXPECT_EQ(shown(12, 57, {PropertyValue::number, true}), "not known");
+    EXPECT_EQ(shown(12, 57, {Number(0ULL), true}), "0 (not known)");
+    EXPECT_EQ(shown(12, 38, {Number(0U), true}), "0 (not known)");
+    EXPECT_EQ(shown(12, 38, {Number(1000U), true}), "1000 Mbit/s");
     EXPECT_EQ(shown(29, 98, {"", true}), "(empty)");
     EXPECT_EQ(shown(29, 94, {std::vector<std::string>(), true}), "(none)");
 }
