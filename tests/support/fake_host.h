@@ -103,7 +103,7 @@ public:
 
     /// Runs a program (found on PATH, no shell) to its end; killed, and the test failed, after the limit.
     Finished run(const std::vector<std::string>& words,
-                 std::chrono::seconds limit = std::chrono::seconds(30));
+                 std::chrono::seconds limit = std::chrono::seconds(120));
     /// Starts one beside the test.
     RunningProgram start(const std::vector<std::string>& words);
 
