@@ -1,6 +1,7 @@
 corvista_test(indications SOURCES
   indications/alerts_test.cpp
   indications/failing_new.cpp
+  indications/kernel_links_test.cpp
   indications/link_states_test.cpp
   indications/network_monitor_test.cpp
   indications/state_file_test.cpp
