@@ -5,6 +5,7 @@
 #include <chrono>
 #include <cstdio>
 #include <cstdlib>
+#include <sstream>
 #include <string>
 #include <vector>
 
@@ -23,14 +24,13 @@ double seconds(Clock::time_point start) {
 
 /// Links named eth0, eth1, … with an address each.
 void wire(FakeHost& host, int links) {
-    std::string batch = "link add sw type bridge\n";
+    std::ostringstream batch;
     for (int i = 0; i < links; ++i) {
-        const std::string name = "eth" + std::to_string(i);
-        batch += "link add " + name + " type veth peer name p" + std::to_string(i) + "\nlink set " + name +
-                 " up\nlink set p" + std::to_string(i) + " up\naddress add 10." + std::to_string(i / 250) +
-                 '.' + std::to_string(i % 250) + ".1/24 dev " + name + '\n';
+        batch << "link add eth" << i << " type veth peer name p" << i << "\nlink set eth" << i
+              << " up\nlink set p" << i << " up\naddress add 10." << i / 250 << '.' << i % 250
+              << ".1/24 dev eth" << i << '\n';
     }
-    host.file("/tmp/links", batch);
+    host.file("/tmp/links", batch.str());
     host.run({"sh", "-c", "ip -batch /tmp/links; rm /tmp/links"}, std::chrono::seconds(300));
 }
 
@@ -69,7 +69,7 @@ void measure(FakeHost& host, int links) {
     IC::myoshwmi.unload();
     const double bare = runBare(commands);
     std::printf("%5d %8zu %10.2f %10.2f %8.3f\n", links, commands.size(), whole, bare, whole / bare);
-    std::fflush(stdout);
+    static_cast<void>(std::fflush(stdout));
 }
 
 }  // namespace
@@ -77,7 +77,7 @@ void measure(FakeHost& host, int links) {
 int main(int argc, char** argv) {
     std::vector<int> sizes;
     for (int i = 1; i < argc; ++i) {
-        sizes.push_back(std::atoi(argv[i]));
+        sizes.push_back(static_cast<int>(std::strtol(argv[i], nullptr, 10)));
     }
     if (sizes.empty()) {
         sizes = {1, 10, 100};
