@@ -1,12 +1,12 @@
 // The whole plug-in on links of a real kernel whose carrier comes and goes.
 #include <gmock/gmock.h>
 
-#include <mutex>
 #include <thread>
 
 #include "framework/qx/thread.h"
 #include "mi/globals.h"
 #include "mi/os_hw_mi.h"
+#include "tests/indications/heard.h"
 #include "tests/support/fake_host.h"
 
 namespace {
@@ -15,22 +15,6 @@ using namespace std::chrono_literals;
 using testing::ElementsAre;
 
 constexpr char kFile[] = "/opt/vantrel/corvista/data/oshwminetind.dat";
-
-struct Heard {
-    std::mutex guard;
-    std::vector<std::string> messages;
-
-    static IC::Error hear(const std::vector<IC::Alert>& alerts, const void* context) {
-        auto* heard = const_cast<Heard*>(static_cast<const Heard*>(context));
-        const std::lock_guard lock(heard->guard);
-        heard->messages.push_back(alerts.at(0).message());
-        return {};
-    }
-    std::vector<std::string> now() {
-        const std::lock_guard lock(guard);
-        return messages;
-    }
-};
 
 /// Two ports of this host, each wired to an end that a test pulls and plugs.
 class Wired {

@@ -4,10 +4,10 @@
 
 #include <atomic>
 #include <chrono>
-#include <mutex>
 #include <thread>
 
 #include "tests/indications/failing_new.h"
+#include "tests/indications/heard.h"
 #include "tests/indications/interfaces.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
@@ -32,22 +32,6 @@ bool eventually(Condition holds) {
     }
     return false;
 }
-
-struct Heard {
-    std::mutex guard;
-    std::vector<std::string> messages;
-
-    static IC::Error hear(const std::vector<IC::Alert>& alerts, const void* context) {
-        auto* heard = const_cast<Heard*>(static_cast<const Heard*>(context));
-        const std::lock_guard lock(heard->guard);
-        heard->messages.push_back(alerts.at(0).message());
-        return {};
-    }
-    std::vector<std::string> now() {
-        const std::lock_guard lock(guard);
-        return messages;
-    }
-};
 
 /// An interface that answers late, and not for want of a command.
 class SlowNode : public IC::MutableNode {
