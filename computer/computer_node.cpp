@@ -70,7 +70,7 @@ Error writeOwner(ComputerNode& node, const PropertyValue& value) {
 }
 
 void runAndForget(const char* command) {
-    const HostCommand run{std::string(command)};
+    const HostCommand run(command);
 }
 
 /// The result does not tell whether the host is going down: a reader asks whether it still answers.

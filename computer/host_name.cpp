@@ -19,7 +19,7 @@ constexpr char kOwnLoopback[] = "127.0.0.2";
 
 /// The first line a `hostname` command prints, line break included, is kept unless the tool could not tell.
 void updateName(const char* command, std::string& name) {
-    HostCommand asked{std::string(command)};
+    HostCommand asked(command);
     const auto line = asked.nextLine();
     if (line && !contains(*line, "Unknown")) {
         name = *line;

@@ -75,7 +75,7 @@ std::string getSystemName() {
 void OsHwMI::vpdUpdate() {
     const LogScope scope;
     for (const char* tool : {"/usr/sbin/vpdupdate 2> /dev/null", "/sbin/update-lsvpd-db 2> /dev/null"}) {
-        const HostCommand run{std::string(tool)};
+        const HostCommand run(tool);
     }
 }
 

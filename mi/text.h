@@ -1,6 +1,7 @@
 #pragma once
 
 #include <string>
+#include <string_view>
 
 namespace IC {
 
@@ -19,11 +20,8 @@ std::string trimEnd(std::string text, char unwanted = '\n');
 /// `text` without the `unwanted` characters at its start.
 std::string trimStart(std::string text, char unwanted = ' ');
 
-inline bool contains(const std::string& text, const char* part) {
-    return text.find(part) != std::string::npos;
-}
-inline bool contains(const std::string& text, const std::string& part) {
-    return contains(text, part.c_str());
+inline bool contains(std::string_view text, std::string_view part) {
+    return text.find(part) != std::string_view::npos;
 }
 
 }  // namespace IC

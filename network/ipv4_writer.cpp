@@ -47,7 +47,7 @@ std::string statusCommand(const std::string& ifName, unsigned int status) {
 void setIPOrigin(std::string, PropertyValue origin, std::string mac) {
     const LogScope scope;
     // Any answer counts, so on a host with a shell this is always "known".
-    const bool dhcpv6Known = HostCommand(std::string("rpm -qa | grep dhcpv6*")).started();
+    const bool dhcpv6Known = HostCommand("rpm -qa | grep dhcpv6*").started();
     InterfaceFile file(mac);
     log(kProgress) << "File open " << file.path() << " in read mode.";
     KeyLine bootProto{"BOOTPROTO=", bootProtoLine(originCode(origin), dhcpv6Known)};
@@ -134,7 +134,7 @@ void setInterfaceStatus(const std::string& ifName, unsigned int status) {
 
 void restartNetwork() {
     const LogScope scope("restartNetwork Called.", "restartNetwork: exit");
-    if (!HostCommand(std::string("service network restart")).started()) {
+    if (!HostCommand("service network restart").started()) {
         log(kError) << "Can not bring up interface.";
     }
 }

@@ -60,7 +60,7 @@ std::vector<ListedInterface> PortWalk::list() {
     if (vmware) {
         log(kProgress) << "Machine has vmware";
     }
-    HostCommand listing(std::string(vmware ? kListVMware : kListInterfaces));
+    HostCommand listing(vmware ? kListVMware : kListInterfaces);
     std::vector<ListedInterface> found;
     while (const auto line = listing.nextLine()) {
         found.push_back(listedInterface(*line));
