@@ -33,7 +33,7 @@ void primeOwner(MutableNode& computer) {
 }
 
 void primeHostName(MutableNode& computer) {
-    HostCommand command{std::string("hostname 2> /dev/null")};
+    HostCommand command("hostname 2> /dev/null");
     const auto line = command.nextLine();
     if (line && !contains(*line, "Unknown")) {
         computer.setProperty(ComputerProperty::hostName, PropertyValue(trimEnd(*line), true));
@@ -55,12 +55,12 @@ void prime(MutableNode& computer) {
 }  // namespace
 
 void OsHwMI::createComputerNodes() {
-    const LogScope scope("createComputerNodes");
-    auto* computer = makeNode<ComputerNode>(*rootNode_, NodeType::computer, 0);
-    computerNode_ = computer;
+    const LogScope scope;
+    auto* computer = makeNode<ComputerNode>(*tree_.root, NodeType::computer, 0);
+    tree_.computer = computer;
     appendNode(computer);
     prime(*computer);
-    computer->setStatus(1);
+    computer->setStatus(kStatusGood);
     computer->setDescription("Computer");
 }
 

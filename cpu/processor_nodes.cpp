@@ -24,7 +24,7 @@ constexpr std::size_t kLongestLine = 127;
 
 void OsHwMI::createCpuNodeAndMap() {
     const LogScope scope("createCpuNodeAndMap", processorsLogSource);
-    HostCommand command{std::string(kListProcessors)};
+    HostCommand command(kListProcessors);
     if (!command.started()) {
         logCpu(kError) << "createCpuNodeAndMap(): cmd_cpu error";
         return;
@@ -36,7 +36,7 @@ void OsHwMI::createCpuNodeAndMap() {
             logCpu(kError) << "Invalid format: buffer = " << *line;
             continue;
         }
-        auto* processor = makeNode<MutableNode>(*planarNode_, NodeType::processor, number);
+        auto* processor = makeNode<MutableNode>(*tree_.planar, NodeType::processor, number);
         appendNode(processor);
         inventory_->processors.emplace(number++, processor);
     }
@@ -44,7 +44,7 @@ void OsHwMI::createCpuNodeAndMap() {
 
 void OsHwMI::createCpuNodes() {
     const LogScope scope("createCpuNodes", processorsLogSource);
-    if (planarNode_ == nullptr) {
+    if (tree_.planar == nullptr) {
         return;  // called outside initialize and unload: there is no tree to hang them in
     }
     createCpuNodeAndMap();

@@ -17,4 +17,16 @@ struct Inventory {
     std::map<unsigned int, MutableNode*> processors;  ///< by processor number, from 1
 };
 
+/// The nodes of the fixed upper levels, for whoever hangs nodes under them. Null outside initialize and
+/// unload.
+struct StaticTree {
+    MutableNode* osHw = nullptr;
+    MutableNode* root = nullptr;
+    MutableNode* computer = nullptr;
+    MutableNode* chassis = nullptr;
+    MutableNode* planar = nullptr;
+    MutableNode* networkController = nullptr;
+    MutableNode* diskController = nullptr;
+};
+
 }  // namespace IC

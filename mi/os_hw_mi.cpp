@@ -86,10 +86,7 @@ Error OsHwMI::freeNodes() {
     const std::lock_guard noWalk(portWalkGuard_);
     driveNodes_.clear();
     partitionNodes_.clear();
-    for (MutableNode** node : {&osHwNode_, &rootNode_, &computerNode_, &chassisNode_, &planarNode_,
-                               &networkControllerNode_, &diskControllerNode_}) {
-        *node = nullptr;
-    }
+    tree_ = {};
     return ManagementInterface::unload();
 }
 

@@ -124,14 +124,7 @@ private:
     std::unique_ptr<Inventory> inventory_;  ///< from initialize to unload
     int initializing_ = 0;                  ///< 1 once initialize was called
 
-    MutableNode* osHwNode_ = nullptr;
-    MutableNode* rootNode_ = nullptr;
-    MutableNode* computerNode_ = nullptr;
-    MutableNode* chassisNode_ = nullptr;
-    MutableNode* planarNode_ = nullptr;
-    MutableNode* networkControllerNode_ = nullptr;
-    MutableNode* diskControllerNode_ = nullptr;
-
+    StaticTree tree_;
     std::vector<Node*> driveNodes_;
     std::vector<Node*> partitionNodes_;
     QX::Event driveMonitorEnded_{true};

@@ -28,37 +28,36 @@ MutableNode* OsHwMI::createStaticNode(const MutableNode& parent, unsigned int ty
 
 void OsHwMI::createOsHwNodes() {
     const LogScope scope;
-    osHwNode_ = new MutableNode(ownNodeId(), 0, miIds(), NodeType::osHardware, 0);
-    appendNode(osHwNode_);
-    describe(*osHwNode_, "OsHw Management Interface");
+    tree_.osHw = new MutableNode(ownNodeId(), 0, miIds(), NodeType::osHardware, 0);
+    appendNode(tree_.osHw);
+    describe(*tree_.osHw, "OsHw Management Interface");
 }
 
 void OsHwMI::createRootNode() {
-    log(kProgress) << "Node::ROOT: start";
-    rootNode_ = createStaticNode(*osHwNode_, NodeType::root, 0, "ROOT Node");
-    log(kProgress) << "Node::ROOT: end";
+    const LogScope scope("Node::ROOT: start", "Node::ROOT: end");
+    tree_.root = createStaticNode(*tree_.osHw, NodeType::root, 0, "ROOT Node");
 }
 
 void OsHwMI::createChassisNodes() {
     const LogScope scope;
     // The chassis keeps the framework's default status and description.
-    chassisNode_ = createStaticNode(*computerNode_, NodeType::chassis, 0, nullptr);
+    tree_.chassis = createStaticNode(*tree_.computer, NodeType::chassis, 0, nullptr);
 }
 
 void OsHwMI::createPlanarNodes() {
     const LogScope scope;
-    planarNode_ = createStaticNode(*chassisNode_, NodeType::planar, 0, "Planar");
+    tree_.planar = createStaticNode(*tree_.chassis, NodeType::planar, 0, "Planar");
 }
 
 void OsHwMI::createNetworkControllerNodes() {
     const LogScope scope;
-    networkControllerNode_ =
-        createStaticNode(*chassisNode_, NodeType::networkController, 0, "Network Controller");
+    tree_.networkController =
+        createStaticNode(*tree_.chassis, NodeType::networkController, 0, "Network Controller");
 }
 
 void OsHwMI::createDiskControllerNodes() {
     const LogScope scope;
-    diskControllerNode_ = createStaticNode(*planarNode_, NodeType::diskController, 1, "Disk Controller");
+    tree_.diskController = createStaticNode(*tree_.planar, NodeType::diskController, 1, "Disk Controller");
     if (!takeDiskSnapshot()) {
         log(kError) << "Command : " << diskSnapshotCommand << " failed!!";
     }

@@ -77,7 +77,7 @@ void OsHwMI::createLANEndPointNodes() {
     unsigned int configs = 0;
     for (const auto& [name, ofInterface] : *addresses) {
         CLANEndPointNode* endPoint =
-            createLANEndPoint(name, networkControllerNode_->getNodeId(), ++endPoints);
+            createLANEndPoint(name, tree_.networkController->getNodeId(), ++endPoints);
         std::vector<CIPInfo*> infos = ofInterface;
         createIPConfigNodes(&infos, name, endPoint, configs);
     }

@@ -14,7 +14,7 @@ namespace IC {
 void OsHwMI::createNetworkPortNodes(bool /*update*/) {
     const LogScope scope;
     const std::lock_guard oneWalkAtATime(portWalkGuard_);
-    if (networkControllerNode_ == nullptr) {
+    if (tree_.networkController == nullptr) {
         return;  // an agent that still holds a node writes to it after unload: there is no tree any more
     }
     const std::vector<ListedInterface> interfaces = PortWalk::list();
@@ -49,7 +49,7 @@ void OsHwMI::visitInterface(const ListedInterface& interface, const PortWalk& wa
     MutableNode* config = nullptr;
     if (PortWalk::hasIPConfig(name)) {
         // What has no port of its own, a bond or a bridge, hangs under the controller.
-        MutableNode& parent = port != nullptr ? *port : *networkControllerNode_;
+        MutableNode& parent = port != nullptr ? *port : *tree_.networkController;
         config = createIPConfig(interface, parent, walk, ++index, settings);
     }
     if (MutableNode* node = port != nullptr ? port : config) {
@@ -61,7 +61,7 @@ void OsHwMI::visitInterface(const ListedInterface& interface, const PortWalk& wa
 }
 
 MutableNode* OsHwMI::createPort(const std::string& name, unsigned int index) {
-    auto* port = makeNode<NetworkPortNode>(*networkControllerNode_, NodeType::networkPort, index, name);
+    auto* port = makeNode<NetworkPortNode>(*tree_.networkController, NodeType::networkPort, index, name);
     appendNode(port);
     port->setDescription("Network Port");
     port->fill();

@@ -19,7 +19,7 @@ struct OsHwMITestAccess {
     /// The containers as initialize makes them, without a tree and without monitors.
     static void makeInventory(OsHwMI& mi) { mi.inventory_ = std::make_unique<Inventory>(); }
     static std::vector<unsigned int> drawnIds() { return myoshwmi.inventory_->drawnIds; }
-    static MutableNode* computer(OsHwMI& mi) { return mi.computerNode_; }
+    static MutableNode* computer(OsHwMI& mi) { return mi.tree_.computer; }
 
     /// The host's names as they were read last, line breaks included.
     static const std::string& hostName(const OsHwMI& mi) { return mi.hostName_; }
@@ -42,11 +42,11 @@ struct OsHwMITestAccess {
     static void plantDiskController(unsigned int firstNodeId) {
         myoshwmi.ManagementInterface::initialize(7, Number(1U), Number(firstNodeId));
         makeInventory(myoshwmi);
-        myoshwmi.diskControllerNode_ =
+        myoshwmi.tree_.diskController =
             new MutableNode(myoshwmi.drawNodeId(), 1, myoshwmi.miIds(), NodeType::diskController, 1);
-        myoshwmi.appendNode(myoshwmi.diskControllerNode_);
+        myoshwmi.appendNode(myoshwmi.tree_.diskController);
     }
-    static unsigned int diskControllerId() { return myoshwmi.diskControllerNode_->getNodeId(); }
+    static unsigned int diskControllerId() { return myoshwmi.tree_.diskController->getNodeId(); }
     static const std::vector<Node*>& drives() { return myoshwmi.driveNodes_; }
     static const std::vector<Node*>& partitions() { return myoshwmi.partitionNodes_; }
     static FingerprintPair& driveFingerprints() { return myoshwmi.driveFingerprints_; }
