@@ -71,7 +71,10 @@ void HardDriveUpdateMonitor::pass() {
 }
 
 void OsHwMI::startHDDThread() {
-    const LogScope scope("startHDDThread");
+    const LogScope scope;
+    // Also after an earlier start and stop the first pass publishes everything once.
+    driveFingerprints_ = {};
+    partitionFingerprints_ = {};
     try {
         driveMonitor_ = std::make_unique<HardDriveUpdateMonitor>(&driveMonitorEnded_);
         if (driveMonitor_->start(nullptr)) {

@@ -108,6 +108,20 @@ HOST_TEST_F(DriveMonitor, ComparesAfterTwoMinutesAndThenEveryMinute) {
         << "once by the first pass, never again";
 }
 
+HOST_TEST_F(DriveMonitor, StartedAgainPublishesEverythingOnceAgain) {
+    QX::setClockSpeed(1000);
+    for (int start = 0; start < 2; ++start) {
+        diary().clear();
+        IC::HardDriveNodeUpdate = false;
+        const Passes passes;
+        IC::myoshwmi.startHDDThread();
+        ASSERT_TRUE(passes.waitFor(3));
+        Access::stopMonitor();
+        EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "published /dev/sda", "withdrawn /dev/sda1",
+                                         "published /dev/sda1"));
+    }
+}
+
 HOST_TEST_F(DriveMonitor, FollowsTheLayout) {
     QX::setClockSpeed(1000);
     host.toolInTurn("fdisk -ls",
