@@ -77,6 +77,7 @@ void OsHwMI::enableIndications() {
     } atTheEnd;
     try {
         logInd(kProgress) << "Creating NetworkMonitor thread.";
+        networkMonitorEnded_.wait(0);  // an earlier monitor's end is not this one's
         auto monitor = std::make_unique<NetworkMonitor>(&networkMonitorEnded_);
         if (!monitor->start(nullptr)) {
             logInd(kError) << "NetworkMonitor thread failed.";

@@ -147,6 +147,16 @@ HOST_TEST(NetworkMonitor, IsWaitedForTenTimesAtTheMost) {
     EXPECT_THAT(messages, Contains("eventThreadNetIndications termination failed."));
 }
 
+HOST_TEST(NetworkMonitor, StartedAgainIsNotTakenForTheOneThatEnded) {
+    Interfaces interfaces;
+    for (int start = 0; start < 2; ++start) {
+        interfaces.mi().enableIndications();
+        EXPECT_FALSE(IC::OsHwMITestAccess::networkMonitorEnded(interfaces.mi()))
+            << "or the stop would not wait its whole first second";
+        interfaces.mi().disableIndications();
+    }
+}
+
 HOST_TEST(NetworkMonitor, LeavesIndicationsOffWhenItsThreadWillNotStart) {
     Interfaces interfaces;
     LogCapture capture;

@@ -18,6 +18,7 @@ namespace IC {
 struct OsHwMITestAccess {
     /// The containers as initialize makes them, without a tree and without monitors.
     static void makeInventory(OsHwMI& mi) { mi.inventory_ = std::make_unique<Inventory>(); }
+    static bool hasInventory() { return myoshwmi.inventory_ != nullptr; }
     static std::vector<unsigned int> drawnIds() { return myoshwmi.inventory_->drawnIds; }
     static MutableNode* computer(OsHwMI& mi) { return mi.tree_.computer; }
 
@@ -34,6 +35,8 @@ struct OsHwMITestAccess {
         mi.dnsServers_ = std::move(servers);
         mi.dnsSuffixes_ = std::move(suffixes);
     }
+
+    static bool networkMonitorEnded(OsHwMI& mi) { return mi.networkMonitorEnded_.wait(0); }
 
     static std::map<std::string, unsigned int>& current(OsHwMI& mi) { return mi.inventory_->currentStates; }
     static std::map<std::string, unsigned int>& previous(OsHwMI& mi) { return mi.inventory_->previousStates; }
