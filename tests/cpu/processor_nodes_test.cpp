@@ -5,6 +5,7 @@
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"
+#include "tests/support/plugin_access.h"
 
 namespace {
 
@@ -77,6 +78,7 @@ HOST_TEST(Processors, AreOneNodeEachUnderThePlanar) {
         EXPECT_EQ(nodes[i]->getDescription(), "Processor");
         EXPECT_EQ(nodes[i]->getMIIds(), std::vector<unsigned int>{1});
     }
+    EXPECT_THAT(IC::OsHwMITestAccess::drawnIds(), ElementsAre(2, 3, 4, 5, 6, 7, 8, 9, 10, 11));
     EXPECT_THAT(plugin.speeds(), ElementsAre("2394", "2394", "1000", "800"));
     PropertyValue speed;
     EXPECT_EQ(nodes[0]->getProperty(80, speed).getStatus(), 0);

@@ -82,6 +82,22 @@ HOST_TEST(Library, ClosedWithoutAnUnloadLeavesNoThreadInCodeThatIsGone) {
     EXPECT_EQ(threads(), before);
 }
 
+HOST_TEST(Library, OpenedAgainStartsAsItDidTheFirstTime) {
+    for (int time = 0; time < 2; ++time) {
+        void* library = dlopen(kPlugin.c_str(), RTLD_NOW | RTLD_LOCAL);
+        ASSERT_NE(library, nullptr) << dlerror();
+        IC::ManagementInterface* interface = nullptr;
+        IC::Error* error = nullptr;
+        reinterpret_cast<Entry>(dlsym(library, "OpenMI"))(&interface, &error);
+        EXPECT_TRUE(interface->holdAll().empty());
+        EXPECT_EQ(interface->initialize(1, IC::Number(1U), IC::Number(2U)).getStatus(), 0);
+        EXPECT_EQ(interface->holdAll().size(), 7U);
+        EXPECT_EQ(interface->unload().getStatus(), 0);
+        dlclose(library);
+        ASSERT_FALSE(isLoaded());
+    }
+}
+
 TEST(Library, HandsOutTheSameTwoAddressesEveryTime) {
     void* library = dlopen(kPlugin.c_str(), RTLD_NOW | RTLD_LOCAL);
     ASSERT_NE(library, nullptr) << dlerror();

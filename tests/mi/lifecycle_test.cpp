@@ -7,6 +7,7 @@
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"
+#include "tests/support/plugin_access.h"
 
 extern "C" int OpenMI(IC::ManagementInterface** mi, IC::Error** err);
 
@@ -15,6 +16,7 @@ namespace {
 using IC::MutableNode;
 using IC::Number;
 using IC::OsHwMI;
+using Access = IC::OsHwMITestAccess;
 
 IC::Error initialize(OsHwMI& mi) {
     return mi.initialize(1, Number(1U), Number(2U));
@@ -185,6 +187,7 @@ HOST_TEST(Lifecycle, BuildsTheStaticTree) {
     std::vector<IC::Node*> map;
     EXPECT_EQ(IC::myoshwmi.getMap(map).getStatus(), 0);
     EXPECT_EQ(map.size(), std::size(expected));
+    EXPECT_THAT(Access::drawnIds(), testing::ElementsAre(2, 3, 4, 5, 6, 7)) << "the first was given";
     IC::myoshwmi.unload();
 }
 
@@ -225,6 +228,18 @@ HOST_TEST(Lifecycle, ActsOnTheHostOnlyAfterTheStart) {
     EXPECT_FALSE(IC::HardDriveNodeUpdate);
     IC::myoshwmi.unload();
     EXPECT_TRUE(IC::HardDriveNodeUpdate);
+}
+
+HOST_TEST(Lifecycle, FreesAllItKeptAtTheEnd) {
+    EXPECT_FALSE(Access::hasInventory());
+    initialize(IC::myoshwmi);
+    EXPECT_TRUE(Access::hasInventory());
+    const std::weak_ptr<MutableNode> computer = nodesOfType(IC::myoshwmi, 40).front();
+    IC::myoshwmi.unload();
+    EXPECT_FALSE(Access::hasInventory());
+    EXPECT_TRUE(IC::myoshwmi.holdAll().empty());
+    EXPECT_TRUE(computer.expired());
+    EXPECT_EQ(IC::myoshwmi.unload().getStatus(), 0) << "a second stop finds nothing to do";
 }
 
 HOST_TEST(Lifecycle, StartsAgainAfterAStop) {
