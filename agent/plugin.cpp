@@ -139,7 +139,8 @@ void Plugin::start() {
 
 void Plugin::stop() {
     try {
-        interface_->deRegisterForAlerts();
+        // The callback stays until the monitors have ended: a change that they see without one they take for
+        // reported, and it would never be told.
         interface_->unload();
     } catch (const std::exception& exception) {
         complain("unload of " + inQuotes(file_) + " threw an exception: " + exception.what());

@@ -8,6 +8,7 @@
 //   churn                   a thread publishes and withdraws drives until unload
 //   alert                   a thread sends one alert
 //   early                   initialize sends one alert, before the agent has seen any node
+//   late                    unload sends one alert
 // FAKE_PLUGIN_DIARY names a file that gets a line for each write and for the unload.
 #include <atomic>
 #include <chrono>
@@ -123,6 +124,9 @@ public:
             if (thread->joinable()) {
                 thread->join();
             }
+        }
+        if (told("late")) {
+            sendAlert();
         }
         FakeNode::ready = false;
         note("unload");

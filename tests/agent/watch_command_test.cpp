@@ -65,6 +65,12 @@ HOST_TEST(WatchCommand, PrintsOneObjectALine) {
     EXPECT_EQ(seen["published"], seen["withdrawn"]);
 }
 
+HOST_TEST(WatchCommand, ShowsTheChangeThatIsSeenWhileThePluginStops) {
+    const Finished run = CvagentRun(host).telling("late")({"watch", "--for", "0"});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.out, HasSubstr("NIC is Offline"));
+}
+
 HOST_TEST(WatchCommand, ASignalUnloadsThePluginAndIsNoFailure) {
     for (const int number : {SIGINT, SIGTERM}) {
         host.remove("/tmp/diary");
