@@ -11,7 +11,7 @@ class CORVISTA_API DateTime {
 public:
     /// @param text   the time
     /// @param format 3: ISO 8601 ("2026-11-20T21:03:00Z", an offset as +05:30 or +05, or local time without
-    /// one) Date and time stand in the extended form with four digits of year and a capital T; the seconds
+    /// one). Date and time stand in the extended form with four digits of year and a capital T; the seconds
     /// may be left out. Refused are what the clock cannot hold (a fraction, second 60, hour 24) and dates
     /// that do not exist. A local time that the switch to daylight saving skips or repeats means what mktime
     /// makes of it. Throws std::invalid_argument for a text that is no time, or another format.
