@@ -1,6 +1,7 @@
 // Start and stop of the whole plug-in.
 #include <gmock/gmock.h>
 
+#include "mi/disk_snapshot.h"
 #include "mi/globals.h"
 #include "mi/my_process.h"
 #include "mi/os_hw_mi.h"
@@ -8,6 +9,7 @@
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"
 #include "tests/support/plugin_access.h"
+#include "tests/support/shell_stub.h"
 
 extern "C" int OpenMI(IC::ManagementInterface** mi, IC::Error** err);
 
@@ -198,6 +200,19 @@ HOST_TEST(Lifecycle, TakesTheFirstDiskSnapshotAndRemovesItAtTheEnd) {
     EXPECT_EQ(nodesOfType(IC::myoshwmi, 11).size(), 1U);
     IC::myoshwmi.unload();
     EXPECT_FALSE(host.exists("/tmp/fdisk_tmp"));
+}
+
+HOST_TEST(Lifecycle, StartsTheFirstDiskSnapshotUnderTheFileLock) {
+    std::optional<bool> lockWasFree;
+    shell_stub::beforeEach([&](const std::string& command) {
+        if (command == IC::diskSnapshotCommand) {
+            lockWasFree = IC::OSHWMI::myfileLock.lock(0);
+        }
+    });
+    initialize(IC::myoshwmi);
+    EXPECT_EQ(lockWasFree, false);
+    IC::myoshwmi.unload();
+    shell_stub::beforeEach({});
 }
 
 HOST_TEST(Lifecycle, GoesOnWithoutASnapshotWhenTheShellCannotBeStarted) {

@@ -232,6 +232,15 @@ HOST_TEST_F(Drives, ToolsThatAreMissingGiveNoDrives) {
     EXPECT_THAT(log.messages(6000), IsEmpty());
 }
 
+HOST_TEST_F(Drives, EachNodeThatTheAgentRefusesIsLoggedOnceAndTheNextOneIsBuilt) {
+    agentRefuses();
+    LogCapture log;
+    build(host, kOneDrive + "Disk /dev/sdb: 80.0 GB, 80026361856 bytes\n", true);
+    EXPECT_THAT(log.messages(6000),
+                ElementsAre("addNewNode error = the agent is full", "addNewNode error = the agent is full"));
+    EXPECT_EQ(Access::drives().size(), 2U);
+}
+
 HOST_TEST_F(Drives, ANodeThatTheAgentRefusesIsLoggedAndGoesWithTheNextUpdate) {
     agentRefuses();
     LogCapture log;
