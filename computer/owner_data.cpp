@@ -5,18 +5,11 @@
 
 namespace IC {
 
-namespace {
-
-constexpr unsigned long kForReading = 1;
-constexpr unsigned long kForWriting = 3;
-
-}  // namespace
-
 OwnerData::OwnerData(const char* dataDirectory) : path_(std::string(dataDirectory) + "asset.dat") {}
 
 std::string OwnerData::read(const wchar_t* key) const {
     QX::PropertyFile file{QX::File::Path(path_)};
-    file.open(kForReading);
+    file.open(QX::PropertyFile::forReading);
     std::string text = QX::make_string(file.getValue(key));
     file.close();
     return text;
@@ -24,7 +17,7 @@ std::string OwnerData::read(const wchar_t* key) const {
 
 void OwnerData::write(const wchar_t* key, const std::string& text) const {
     QX::PropertyFile file{QX::File::Path(path_)};
-    file.open(kForWriting);
+    file.open(QX::PropertyFile::forWriting);
     file.setValue(key, QX::make_wstring(text));
     file.close();
 }

@@ -15,10 +15,6 @@ namespace IC {
 
 namespace {
 
-// As the files of the agent are read and written.
-constexpr unsigned long kRead = 1;
-constexpr unsigned long kReadAndWrite = 3;
-
 /// The data directory's text carries its slash.
 std::string stateFilePath() {
     const char* directory = QX::CorvistaUtilities::getMoraineDataDir();
@@ -42,7 +38,7 @@ void OsHwMI::writePrevNetNodeMap() {
     const LogScope scope("writePrevNetNodeMap", indicationsLogSource);
     try {
         QX::PropertyFile file{QX::File::Path(stateFilePath())};
-        file.open(kReadAndWrite);
+        file.open(QX::PropertyFile::forWriting);
         // What is not visited stays: an interface that comes back is compared with what it was.
         for (const auto& [name, state] : inventory_->currentStates) {
             file.setValue(QX::make_wstring(name), std::to_wstring(state));
@@ -58,7 +54,7 @@ void OsHwMI::readPrevNetNodeMap() {
     inventory_->previousStates.clear();
     try {
         QX::PropertyFile file{QX::File::Path(stateFilePath())};
-        file.open(kRead);
+        file.open(QX::PropertyFile::forReading);
         for (const std::wstring& key : file.enumerateKeys()) {
             if (const auto state = decimal(QX::make_string(file.getValue(key)))) {
                 inventory_->previousStates[QX::make_string(key)] = *state;

@@ -1,5 +1,6 @@
 #include "framework/qx/property_file.h"
 
+#include <algorithm>
 #include <string_view>
 #include <system_error>
 
@@ -9,9 +10,6 @@
 
 namespace QX {
 namespace {
-
-constexpr unsigned long kReadMode = 1;
-constexpr unsigned long kWriteMode = 3;
 
 std::map<std::wstring, std::wstring> parse(std::string_view content) {
     std::map<std::wstring, std::wstring> values;
@@ -41,12 +39,12 @@ PropertyFile::PropertyFile(const File::Path& path) : path_(path.str()) {}
 PropertyFile::~PropertyFile() = default;
 
 void PropertyFile::open(unsigned long mode) {
-    if (mode != kReadMode && mode != kWriteMode) {
+    if (mode != forReading && mode != forWriting) {
         throw PropertyFileError(path_ + ": no such mode: " + std::to_string(mode));
     }
     try {
         const auto content = readWholeFile(path_);
-        if (!content && mode == kReadMode) {
+        if (!content && mode == forReading) {
             throw PropertyFileError(path_ + ": no such file");
         }
         values_ = parse(content.value_or(""));
@@ -58,7 +56,7 @@ void PropertyFile::open(unsigned long mode) {
 }
 
 void PropertyFile::close() {
-    if (mode_ == kWriteMode && changed_) {
+    if (mode_ == forWriting && changed_) {
         try {
             replaceWholeFile(path_, format(values_));
         } catch (const std::system_error& error) {
@@ -101,7 +99,7 @@ std::vector<std::wstring> PropertyFile::enumerateKeys() const {
 }
 
 void PropertyFile::requireWritable() const {
-    if (mode_ != kWriteMode) {
+    if (mode_ != forWriting) {
         throw PropertyFileError(path_ + ": not open for writing");
     }
 }

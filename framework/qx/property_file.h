@@ -23,6 +23,10 @@ public:
 /// not at all. One object belongs to one thread.
 class CORVISTA_API PropertyFile {
 public:
+    // Modes of open.
+    static constexpr unsigned long forReading = 1;
+    static constexpr unsigned long forWriting = 3;
+
     explicit PropertyFile(const File::Path& path);
     PropertyFile(const PropertyFile&) = delete;
     PropertyFile& operator=(const PropertyFile&) = delete;
