@@ -132,6 +132,7 @@ std::map<std::string, MutableNode*> OsHwMI::nodesByName() const {
 }
 
 bool OsHwMI::findNetworkPort(std::string name, MutableNode** node) const {
+    const LogScope scope;
     const std::lock_guard lock(inventoryGuard_);
     if (!inventory_) {
         return false;

@@ -108,6 +108,7 @@ private:
     void sendAlert(const Alert& alert);
     CLANEndPointNode* createLANEndPoint(const std::string& name, unsigned int parent, unsigned int index);
     // Steps of createNetworkPortNodes (network/).
+    void walkInterfaces();
     void visitInterface(const ListedInterface& interface, const PortWalk& walk,
                         std::map<std::string, std::string> settings, unsigned int& index);
     MutableNode* createPort(const std::string& name, unsigned int index);

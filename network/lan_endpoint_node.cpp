@@ -51,7 +51,8 @@ Error CLANEndPointNode::setProperty(const unsigned int& id, const PropertyValue&
 }
 
 bool getParentLANEndPointNode(std::string name, unsigned int& id) {
-    log(kProgress) << "In getParentLANEndPointNode " << name;
+    const std::string entry = "In getParentLANEndPointNode " + name;
+    const LogScope scope(entry.c_str(), "getParentLANEndPointNode: exit");
     if (m_mapEthernetPorts == nullptr) {
         return false;
     }

@@ -17,6 +17,14 @@ void OsHwMI::createNetworkPortNodes(bool /*update*/) {
     if (tree_.networkController == nullptr) {
         return;  // an agent that still holds a node writes to it after unload: there is no tree any more
     }
+    try {
+        walkInterfaces();
+    } catch (const std::exception& failure) {
+        logPortFailure(failure);
+    }
+}
+
+void OsHwMI::walkInterfaces() {
     const std::vector<ListedInterface> interfaces = PortWalk::list();
     PortWalk walk(trimEnd(hostName_), trimEnd(domainName_));
     dnsServers_ = walk.host().dnsServers;
@@ -33,7 +41,7 @@ void OsHwMI::createNetworkPortNodes(bool /*update*/) {
         try {
             visitInterface(interface, walk, shared, index);
         } catch (const std::exception& failure) {
-            log(kError) << "NetworkPort error " << failure.what();
+            logPortFailure(failure);
         }
     }
 }

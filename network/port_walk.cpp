@@ -51,7 +51,7 @@ PortWalk::~PortWalk() {
     try {
         runToEnd(std::string("rm -rf ") + ifconfigSnapshotPath);
     } catch (const std::exception& failure) {
-        log(kError) << "NetworkPort error " << failure.what();
+        logPortFailure(failure);
     }
 }
 
@@ -76,7 +76,8 @@ bool PortWalk::hasZeroAddress(const std::string& name) const {
     if (interfaces_.getMACAddress(name) != kZeroAddress) {
         return false;
     }
-    log(kProgress) << "Permanent_address compare" << name;
+    log(kProgress) << "Permanent_address compare";
+    log(kProgress) << "Passed over without a hardware address: " << name;
     return true;
 }
 
@@ -88,6 +89,11 @@ bool PortWalk::isPort(const std::string& name) const {
 
 bool PortWalk::hasIPConfig(const std::string& name) {
     return firstLine(formatCommand("ifconfig -a | grep %s 2> /dev/null", name.c_str())).line.has_value();
+}
+
+void logPortFailure(const std::exception& failure, const char* function) {
+    log(kError, function) << "NetworkPort error";
+    log(kError, function) << failure.what();
 }
 
 }  // namespace IC

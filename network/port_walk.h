@@ -1,5 +1,6 @@
 #pragma once
 
+#include <exception>
 #include <string>
 #include <vector>
 
@@ -45,5 +46,8 @@ private:
     CNetworkInfo network_{true};
     CIPInterfaceInfo interfaces_;
 };
+
+/// Logs what went wrong on a walk, which nobody else hears of.
+void logPortFailure(const std::exception& failure, const char* function = __builtin_FUNCTION());
 
 }  // namespace IC

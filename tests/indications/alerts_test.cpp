@@ -129,10 +129,11 @@ HOST_TEST(Alerts, AreNoneForAnUnknownStateWhichIsLogged) {
         LogCapture capture;
         change.check();
         EXPECT_THAT(change.agent.alerts, IsEmpty());
-        EXPECT_THAT(capture.ownMessages(), ElementsAre("checkAndSendNetAlert: entry", "Slaves Map Size : 0",
-                                                       "OsHwMI::checkAndSendNetAlert() entering switch case",
-                                                       "Unknown status: curitr->first= eth0",
-                                                       "Returning from checkAndSendNetAlert"));
+        EXPECT_THAT(
+            capture.ownMessages(),
+            ElementsAre("checkAndSendNetAlert: entry", "Slaves Map Size : 0", "findNetworkPort: entry",
+                        "findNetworkPort: exit", "OsHwMI::checkAndSendNetAlert() entering switch case",
+                        "Unknown status: curitr->first= eth0", "Returning from checkAndSendNetAlert"));
     }
 }
 

@@ -264,8 +264,10 @@ HOST_TEST(LinkState, OfABondTakesTheMonitorsReportsWithoutACommand) {
 
 HOST_TEST(Origin, IsWrittenInPlaceAndTheStartModeAppended) {
     host.file(kFile, "# mine\nBOOTPROTO='dhcp'\nMTU=1500\n");
+    const CommandLines commands;
     LogCapture capture;
     IC::setIPOrigin("eth0", origin(3), kMac);
+    EXPECT_THAT(commands.all(), ElementsAre("rpm -qa | grep dhcpv6*"));
     EXPECT_EQ(host.read(kFile), "# mine\nBOOTPROTO=static\nMTU=1500\nSTARTMODE='auto'\n");
     EXPECT_THAT(host.calls(), ElementsAre("rpm -qa"));
     EXPECT_THAT(capture.ownMessages(3000),

@@ -162,6 +162,7 @@ HOST_TEST(LanEndPoint, IsBuiltOnceMoreUnderThePortItsNameCarries) {
     EXPECT_EQ(plugin.mi().holdAll().back()->getLinkedId(), 4711U);
     EXPECT_EQ(plugin.mi().holdAll().back()->getIndex(), 3U);
     EXPECT_THAT(capture.ownMessages(), Contains("In getParentLANEndPointNode eth0#1"));
+    EXPECT_THAT(capture.ownMessages(), Contains("getParentLANEndPointNode: exit").Times(2));
     EXPECT_THAT(capture.ownMessages(), Contains("OsHwMI::createLANEndPointNodes, Size is: 2"));
 }
 

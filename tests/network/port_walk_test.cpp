@@ -136,11 +136,27 @@ HOST_TEST(PortWalk, LogsAnInterfaceThatFailsAndGoesOn) {
     LogCapture capture;
     plugin.build();
     shell_stub::beforeEach({});
-    EXPECT_THAT(capture.ownMessages(6000), ElementsAre("NetworkPort error out of luck"));
+    EXPECT_THAT(capture.ownMessages(6000), ElementsAre("NetworkPort error", "out of luck"));
     EXPECT_THAT(plugin.names(29), ElementsAre("eth1"));
     EXPECT_FALSE(host.exists(kSnapshot));
     IC::MutableNode* known = nullptr;
     EXPECT_FALSE(plugin.mi().findNetworkPort("eth0", &known)) << "the next walk tries again";
+}
+
+HOST_TEST(PortWalk, ThatFailsAsAWholeIsLoggedAndTheRequestForItIsNotStored) {
+    PortHost plugin(host, "suse-two-nics");
+    const auto config = plugin.build().config("eth0");
+    shell_stub::beforeEach([](const std::string& command) {
+        if (command.starts_with("brctl show")) {
+            throw std::runtime_error("out of luck");
+        }
+    });
+    LogCapture capture;
+    EXPECT_EQ(config->setProperty(74, number(1)).getStatus(), 0);
+    shell_stub::beforeEach({});
+    EXPECT_THAT(capture.ownMessages(6000), ElementsAre("NetworkPort error", "out of luck"));
+    EXPECT_THAT(capture.ownMessages(), Contains("createNetworkPortNodes: exit"));
+    EXPECT_TRUE(PortHost::stored(*config, 74).empty());
 }
 
 HOST_TEST(PortWalk, GivesEveryVLANAPort) {
