@@ -8,6 +8,11 @@
 
 namespace IC {
 
+// What the writers of interface files have in common.
+inline constexpr char kBootProto[] = "BOOTPROTO=";
+inline constexpr char kStaticBootProto[] = "BOOTPROTO=static\n";  ///< of a file that tells no origin
+inline constexpr char kInterfaceFileOpened[] = "File open '/etc/sysconfig/network' in write mode.";  ///< log
+
 /// The one line that a writer of interface files gives a key.
 struct KeyLine {
     /// What a line that holds the key becomes.

@@ -13,9 +13,6 @@ namespace IC {
 
 namespace {
 
-constexpr char kFileOpened[] = "File open '/etc/sysconfig/network' in write mode.";
-constexpr char kStaticBootProto[] = "BOOTPROTO=static\n";
-
 /// The BOOTPROTO line of an origin; "" for one that is not written.
 std::string bootProtoLine(unsigned int origin, bool dhcpv6Known) {
     switch (origin) {
@@ -50,7 +47,7 @@ void setIPOrigin(std::string, PropertyValue origin, std::string mac) {
     const bool dhcpv6Known = HostCommand("rpm -qa | grep dhcpv6*").started();
     InterfaceFile file(mac);
     log(kProgress) << "File open " << file.path() << " in read mode.";
-    KeyLine bootProto{"BOOTPROTO=", bootProtoLine(originCode(origin), dhcpv6Known)};
+    KeyLine bootProto{kBootProto, bootProtoLine(originCode(origin), dhcpv6Known)};
     if (bootProto.line.empty()) {
         bootProto.held = KeyLine::Held::kept;
     }
@@ -62,13 +59,13 @@ void setIPOrigin(std::string, PropertyValue origin, std::string mac) {
     file.appendMissing({&bootProto, &startMode});
     log(kChange) << "IP Origin  = " << origin;
     if (file.write()) {
-        log(kChange) << kFileOpened;
+        log(kChange) << kInterfaceFileOpened;
     }
 }
 
 void setIPv4Address(std::string, std::string address, std::string mac) {
     const LogScope scope("Entering setIPv4Address", "Exiting setIPv4Address");
-    KeyLine bootProto{"BOOTPROTO=", kStaticBootProto, KeyLine::Held::kept};
+    KeyLine bootProto{kBootProto, kStaticBootProto, KeyLine::Held::kept};
     KeyLine ipAddress{"IPADDR=", "IPADDR=" + address + '\n'};
     InterfaceFile file(mac);
     file.replace({&bootProto, &ipAddress});
@@ -78,7 +75,7 @@ void setIPv4Address(std::string, std::string address, std::string mac) {
 
 void setSubnetMask(std::string ifName, std::string mask, std::string mac) {
     const LogScope scope("Entering setSubnetMask", "Exiting setSubnetMask");
-    KeyLine bootProto{"BOOTPROTO=", kStaticBootProto, KeyLine::Held::keptUntouched};
+    KeyLine bootProto{kBootProto, kStaticBootProto, KeyLine::Held::keptUntouched};
     KeyLine netmask{"NETMASK=", "NETMASK=" + mask + '\n'};
     InterfaceFile file(mac);
     file.replace({&bootProto, &netmask});

@@ -12,7 +12,7 @@ void setIPv6Address(std::string, std::string address, std::string mac) {
     const LogScope scope;
     KeyLine label{"LABEL_", "LABEL_1='1'\n"};
     KeyLine secondary{"IPADDR_", "IPADDR_1=" + address + '\n'};
-    KeyLine bootProto{"BOOTPROTO=", "BOOTPROTO=static\n", KeyLine::Held::kept};
+    KeyLine bootProto{kBootProto, kStaticBootProto, KeyLine::Held::kept};
     InterfaceFile file(mac);
     file.replace({&label, &secondary, &bootProto});
     file.appendMissing({&bootProto, &label, &secondary});
@@ -28,7 +28,7 @@ void setIPv6PrefixLength(std::string, unsigned int prefixLength, std::string mac
     file.replace({&length});
     file.appendMissing({&length});
     if (file.write()) {
-        log(kChange) << "File open '/etc/sysconfig/network' in write mode.";
+        log(kChange) << kInterfaceFileOpened;
     }
 }
 
