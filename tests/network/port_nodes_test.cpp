@@ -274,6 +274,22 @@ HOST_TEST(PortWalk, SavesEachInterfacesSettings) {
         "NETMASK=0.0.0.0\nPREFIX=0\n");
 }
 
+HOST_TEST(PortWalk, SavesTheResolverAnewForANewInterfaceAndLeavesTheOldFilesAlone) {
+    PortHost plugin(host, "suse-two-nics");
+    const std::string devices = *host.read("/proc/net/dev");
+    host.file("/proc/net/dev", devices.substr(0, devices.find("  eth1:")));
+    plugin.build();
+    const auto old = host.read("/opt/vantrel/corvista/data/ifcfg-eth0");
+    host.file("/proc/net/dev", devices);
+    host.file("/etc/resolv.conf", "nameserver 203.0.113.1\nsearch a.example\n");
+    plugin.mi().createNetworkPortNodes(true);
+    EXPECT_EQ(host.read("/opt/vantrel/corvista/data/ifcfg-eth0"), old);
+    EXPECT_THAT(*host.read("/opt/vantrel/corvista/data/ifcfg-eth1"),
+                testing::HasSubstr("\nDNSSERVERS=203.0.113.1 \nDNSSUFFIXES=a.example \n"));
+    EXPECT_EQ(PortHost::stored(*plugin.config("eth1"), 94), texts({"203.0.113.1"}));
+    EXPECT_EQ(PortHost::stored(*plugin.config("eth0"), 94), texts({"192.0.2.53", "192.0.2.54"}));
+}
+
 HOST_TEST(PortWalk, SaysWhatItDoes) {
     PortHost plugin(host, "vlans");
     LogCapture capture;

@@ -28,6 +28,7 @@ corvista_test(network_queries SOURCES
 
 corvista_test(network_nodes SOURCES
   network/ip_config_node_test.cpp
+  network/ip_config_writer_test.cpp
   network/ipv4_writer_test.cpp
   network/lan_endpoint_test.cpp
   LIBRARIES plugin_code test_support)
