@@ -2,6 +2,7 @@
 
 #include "mi/globals.h"
 #include "mi/os_hw_mi.h"
+#include "tests/support/command_lines.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"
@@ -16,9 +17,10 @@ using testing::ElementsAre;
 /// One processor's part of /proc/cpuinfo.
 std::string processor(unsigned int number, const std::string& speed) {
     return "processor\t: " + std::to_string(number) +
-           "\nvendor_id\t: GenuineIntel\nmodel name\t: Intel(R) Xeon(R) CPU           E5410  @ 2.33GHz\n"
+           "\nvendor_id\t: GenuineIntel\ncpu family\t: 6\nmodel name\t: Intel(R) Xeon(R) CPU           E5410 "
+           " @ 2.33GHz\n"
            "cpu MHz\t\t: " +
-           speed + "\ncache size\t: 6144 KB\n\n";
+           speed + "\ncache size\t: 6144 KB\ncpu cores\t: 4\n\n";
 }
 
 /// The plug-in with its static tree, on a host without anything.
@@ -99,6 +101,14 @@ HOST_TEST(Processors, StopAtTheEndOfTheMapWhenThereAreMoreSpeeds) {
     Started plugin;
     plugin.mi().createCpuNodes();
     EXPECT_THAT(plugin.speeds(), ElementsAre("1000"));
+}
+
+HOST_TEST(Processors, AreListedByOneCommand) {
+    host.file("/proc/cpuinfo", processor(0, "1000.0"));
+    Started plugin;
+    const CommandLines commands;
+    plugin.mi().createCpuNodes();
+    EXPECT_THAT(commands.all(), ElementsAre("cat /proc/cpuinfo 2> /dev/null |grep processor 2> /dev/null "));
 }
 
 HOST_TEST(Processors, AreNoneWithoutCpuinfo) {

@@ -274,7 +274,7 @@ HOST_TEST(Lifecycle, LogsARefusedNodeAndGoesOn) {
     EXPECT_THAT(capture.ownMessages(),
                 testing::ElementsAre("publishNode: entry", "addNewNode error = the agent is full",
                                      "publishNode: exit"));
-    EXPECT_EQ(capture.messages(6000), std::vector<std::string>{"addNewNode error = the agent is full"});
+    EXPECT_EQ(capture.ownMessages(6000), std::vector<std::string>{"addNewNode error = the agent is full"});
     IC::myoshwmi.unload();
 }
 
