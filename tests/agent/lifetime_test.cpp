@@ -1,4 +1,5 @@
 // Loading and unloading plug-ins again and again, and reading nodes while they come and go.
+#include <dlfcn.h>
 #include <gmock/gmock.h>
 
 #include <atomic>
@@ -56,6 +57,7 @@ void loadAgainAndAgain(const std::string& file, int times) {
         ASSERT_GE(plugin.interface().holdAll().size(), 7U) << i;
     }
     EXPECT_EQ(holdingsBackAt(before), before);
+    EXPECT_EQ(dlopen(file.c_str(), RTLD_LAZY | RTLD_NOLOAD), nullptr) << "still mapped";
 }
 
 HOST_TEST(PluginLifetime, TwoHundredLoadsLeaveNothingBehind) {

@@ -71,6 +71,12 @@ HOST_TEST(CommandLine, WrongUsageEndsWithStatusTwoAndSaysWhereToLook) {
     EXPECT_THAT(cvagent.diary(), IsEmpty());
 }
 
+HOST_TEST(Surroundings, SpeakTheLanguageThatTheParsersRead) {
+    setenv("LC_ALL", "de_DE.UTF-8", 1);
+    cvagent::prepareSurroundings();
+    EXPECT_STREQ(std::getenv("LC_ALL"), "C");
+}
+
 HOST_TEST(DataDirectory, IsMadeForItsOwnerAlone) {
     CvagentRun cvagent(host);
     EXPECT_EQ(cvagent({"tree"}).status, 0);
