@@ -3,6 +3,8 @@
 #include <gtest/gtest.h>
 #include <sys/file.h>
 #include <sys/resource.h>
+#include <sys/stat.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -11,6 +13,20 @@
 #include <thread>
 
 #include "tests/framework/property_file_fixture.h"
+
+namespace {
+
+/// Told of every descriptor that is brought to the disk, just before it is.
+std::function<void(int descriptor)> beforeSync;  // NOLINT(cert-err58-cpp)
+
+}  // namespace
+
+extern "C" __attribute__((visibility("default"))) int fsync(int descriptor) {
+    if (beforeSync) {
+        beforeSync(descriptor);
+    }
+    return static_cast<int>(syscall(SYS_fsync, descriptor));
+}
 
 namespace {
 
@@ -41,6 +57,19 @@ TEST_F(PropertyFileDurability, AFullDiskLeavesTheOldFile) {
     EXPECT_EQ(status, 0);
     EXPECT_EQ(content(), "a=1\n");
     EXPECT_THAT(names(), ElementsAre("asset.dat"));
+}
+
+TEST_F(PropertyFileDurability, TheContentIsOnTheDiskBeforeItsNameAndTheNameBeforeTheEnd) {
+    put("a=1\n");
+    std::vector<std::string> steps;
+    beforeSync = [&](int descriptor) {
+        struct stat status {};
+        fstat(descriptor, &status);
+        steps.push_back((S_ISDIR(status.st_mode) ? "directory with " : "file beside ") + content());
+    };
+    write({{L"a", L"2"}});
+    beforeSync = nullptr;
+    EXPECT_THAT(steps, ElementsAre("file beside a=1\n", "directory with a=2\n"));
 }
 
 TEST_F(PropertyFileDurability, LeftoversOfItsOwnAreCleanedAtTheNextWrite) {

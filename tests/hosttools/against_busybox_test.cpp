@@ -286,19 +286,23 @@ INSTANTIATE_TEST_SUITE_P(
         "route del -host 10.8.8.8 gw junk.. v2", "route del default", "route del default gw 10.7.0.9 v2",
         "route del default gw 10.7.0.8", "route add default gw 10.7.0.9",
         "route add default gw 10.7.0.7 metric 5 dev v2;route del default metric 5",
-        "route add -host 10.9.9.9 dev v2", "route add -host 10.9.9.9 gw 10.7.0.7",
-        "route add -host 10.9.9.9 gw 10.99.0.7", "route add default gw 10.7.0.7 metric 0",
+        "route add default gw 10.7.0.7 metric 5 dev v2", "route add -host 10.9.9.9 dev v2",
+        "route add -host 10.9.9.9 gw 10.7.0.7", "route add -host 10.9.9.9 gw 10.99.0.7",
+        "route add default gw 10.7.0.7 metric 0",
         "route add -net 10.9.0.0 netmask 255.255.0.0 gw 10.7.0.7;route del -net 10.9.0.0 netmask 255.255.0.0",
         "route add -net 10.9.0.0 netmask 255.255.0.0 v2", "route add default v2"));
 
 TEST_F(AgainstBusybox, UnreadableChangesChangeNothing) {
-    setUp("ip link add v0 type veth peer name v1\nip address add 10.0.0.1/24 dev v0");
+    setUp(
+        "ip link add v0 type veth peer name v1\nip address add 10.0.0.1/24 dev v0\n"
+        "ip link set v0 addrgenmode none; ip link set v0 up");
     const std::string state = network().shell("ip address; ip route").output;
     for (const char* words :
          {"ifconfig v0 netmask", "ifconfig v0 broadcast", "ifconfig v0 mtu 1400", "route", "route -e",
           "route add", "route del -host", "route del 10.0.0.5", "route -A inet6 del default",
-          "route -A ipx -n", "route -A", "route change default", "route -n extra", "route add default gw",
-          "route add default metric x v0", "route del default v0 v1"}) {
+          "route -A inet6 add default gw 10.0.0.9", "route -A ipx -n", "route -A", "route change default",
+          "route -n extra", "route add default gw", "route add default metric x v0",
+          "route del default v0 v1"}) {
         const Outcome outcome = network().shell(adapter("") + words);
         EXPECT_EQ(outcome.status, 1) << words;
         EXPECT_EQ(outcome.output, "") << words;

@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 
+#include <algorithm>
 #include <atomic>
 #include <chrono>
 #include <thread>
@@ -83,6 +84,45 @@ HOST_TEST(NetworkMonitor, RaisesEachChangeOnceAndKeepsTheStateAcrossARestart) {
     std::this_thread::sleep_for(200ms);
     EXPECT_THAT(heard.now(), ElementsAre("NIC is Offline ", "NIC is Online "));
     interfaces.mi().disableIndications();
+}
+
+/// How many passes have begun.
+auto passes(const LogCapture& capture) {
+    const auto messages = capture.messages();
+    return std::count(messages.begin(), messages.end(), "OsHwMI::createCurNetNodeMap(): entry");
+}
+
+HOST_TEST(NetworkMonitor, LooksEveryThirtySeconds) {
+    QX::setClockSpeed(20);  // 30 seconds pass in 1.5
+    Interfaces interfaces;
+    LogCapture capture;
+    interfaces.mi().enableIndications();
+    ASSERT_TRUE(eventually([&] { return passes(capture) >= 1; }));
+    const auto first = std::chrono::steady_clock::now();
+    EXPECT_TRUE(eventually([&] { return passes(capture) >= 2; }));
+    EXPECT_GT(std::chrono::steady_clock::now() - first, 500ms);
+    interfaces.mi().disableIndications();
+}
+
+HOST_TEST(NetworkMonitor, TellsOfAnInterfaceAgainWhenItHasLeftItsBond) {
+    host.directory("/opt/vantrel/corvista/data");
+    host.file("/proc/net/bonding/bond0", "Slave Interface: eth0\n");
+    QX::setClockSpeed(1000);
+    Interfaces interfaces;
+    auto& eth0 = interfaces.add("eth0", 1);
+    interfaces.add("bond0", 1);
+    Heard heard;
+    interfaces.mi().registerForAlerts(Heard::hear, &heard);
+    LogCapture capture;
+    interfaces.mi().enableIndications();
+    ASSERT_TRUE(eventually([&] { return host.read(kFile) == "bond0=1\neth0=1\n"; }));
+    host.remove("/proc/net/bonding/bond0");
+    const auto before = passes(capture);
+    ASSERT_TRUE(eventually([&] { return passes(capture) >= before + 2; }));
+    eth0.is(12);
+    EXPECT_TRUE(eventually([&] { return !heard.now().empty(); }));
+    interfaces.mi().disableIndications();
+    EXPECT_THAT(heard.now(), ElementsAre("NIC is Offline "));
 }
 
 HOST_TEST(NetworkMonitor, StopsAtOnceInTheMiddleOfItsWait) {
