@@ -1,5 +1,9 @@
 #include "mi/command.h"
 
+#include <sys/wait.h>
+
+#include <cerrno>
+
 #include "mi/my_process.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
@@ -89,6 +93,12 @@ HOST_TEST(PlainCommand, IsNotCounted) {
     EXPECT_EQ(MyProcess::cnt, before);
     EXPECT_EQ(command.nextLine(), "line\n");
     EXPECT_EQ(command.nextLine(), std::nullopt);
+}
+
+HOST_TEST(PlainCommand, LeavesNoProcessBehind) {
+    { const IC::PlainCommand command(std::string("true")); }
+    EXPECT_EQ(waitpid(-1, nullptr, WNOHANG), -1);
+    EXPECT_EQ(errno, ECHILD);
 }
 
 HOST_TEST(RunToEnd, HasRunWhenItReturns) {

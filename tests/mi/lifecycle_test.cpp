@@ -1,10 +1,14 @@
 // Start and stop of the whole plug-in.
 #include <gmock/gmock.h>
 
+#include <chrono>
+#include <thread>
+
 #include "mi/disk_snapshot.h"
 #include "mi/globals.h"
 #include "mi/my_process.h"
 #include "mi/os_hw_mi.h"
+#include "tests/support/command_lines.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"
@@ -276,6 +280,25 @@ HOST_TEST(Lifecycle, LogsARefusedNodeAndGoesOn) {
                                      "publishNode: exit"));
     EXPECT_EQ(capture.ownMessages(6000), std::vector<std::string>{"addNewNode error = the agent is full"});
     IC::myoshwmi.unload();
+}
+
+HOST_TEST(Lifecycle, WaitsForAWalkThatIsUnderWayBeforeItFreesTheNodes) {
+    host.toolInTurn("brctl show", {{""}, {""}, {"", 0, "", 1000}});  // start-up asks twice
+    initialize(IC::myoshwmi);
+    std::thread walk([] { IC::myoshwmi.createNetworkPortNodes(true); });
+    while (host.callsOf("brctl").size() < 3) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(10));
+    }
+    const auto start = std::chrono::steady_clock::now();
+    IC::myoshwmi.unload();
+    EXPECT_GT(std::chrono::steady_clock::now() - start, std::chrono::milliseconds(500));
+    walk.join();
+}
+
+HOST_TEST(Lifecycle, DeletesTheSnapshotByOneQuietCommand) {
+    const CommandLines commands;
+    IC::deleteFdiskTmp();
+    EXPECT_EQ(commands.all(), std::vector<std::string>{"rm /tmp/fdisk_tmp 2> /dev/null"});
 }
 
 HOST_TEST(Lifecycle, StopsWithoutAStart) {
