@@ -84,6 +84,13 @@ HOST_TEST(IPConfigNode, HasTheFourthGroupOfItsAddressForAnInterfaceId) {
     EXPECT_EQ(IC::ipv6InterfaceIdOf(""), "");
 }
 
+HOST_TEST(IPConfigNode, PrefersTheFirstStaticIPv6GatewayToAnAdvertisedOne) {
+    host.tool("route -A inet6 -n",
+              "::/0 fe80::9 UGDA 1024 0 0 eth0\n::/0 2001:db8::1 UG 1024 0 0 eth0\n"
+              "::/0 2001:db8::2 UG 1024 0 0 eth0\n");
+    EXPECT_EQ(IC::preferredIPv6Gateway("eth0"), "2001:db8::1");
+}
+
 HOST_TEST(IPConfigNode, AnswersWhatTheHostSaysNow) {
     PortHost plugin(host, "suse-two-nics");
     const auto config = plugin.build().config("eth0");

@@ -83,6 +83,13 @@ HOST_TEST(PortNode, ShowsItsPlaceInATeam) {
                  {{193, flag(true)}, {194, flag(false)}, {195, text("up")}, {196, number(3)}});
 }
 
+HOST_TEST(PortNode, IsNoTeamMemberWhenItsFileSaysNo) {
+    PortHost plugin(host, "suse-two-nics");
+    const auto port = plugin.build().port("eth0");
+    host.file("/etc/sysconfig/network/ifcfg-eth-id-02:00:5e:00:00:01", "SLAVE=no\nMASTER=bond0\n");
+    expectLive(*port, {{193, flag(false)}, {199, text("bond0")}});
+}
+
 HOST_TEST(PortNode, AnswersLinkAndTeamFactsLive) {
     PortHost plugin(host, "bond-two-members");
     const auto port = plugin.build().port("eth0");
