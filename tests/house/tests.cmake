@@ -1,3 +1,4 @@
 corvista_test(house SOURCES
   house/house_test.cpp)
-target_compile_definitions(house_test PRIVATE CORVISTA_SOURCE_DIR="${CMAKE_SOURCE_DIR}")
+# Of the file, not of the program: all programs share this one's precompiled headers, and what is defined is part of those.
+set_source_files_properties(house/house_test.cpp PROPERTIES COMPILE_DEFINITIONS CORVISTA_SOURCE_DIR="${CMAKE_SOURCE_DIR}")
