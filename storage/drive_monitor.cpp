@@ -72,6 +72,9 @@ void HardDriveUpdateMonitor::pass() {
 
 void OsHwMI::startHDDThread() {
     const LogScope scope;
+    // An earlier monitor would take what it has just published for known to this one.
+    driveMonitor_.reset();
+    driveMonitorRuns_ = false;
     // Also after an earlier start and stop the first pass publishes everything once.
     driveFingerprints_ = {};
     partitionFingerprints_ = {};

@@ -8,6 +8,25 @@
 
 namespace IC {
 
+namespace {
+
+/// Whether a line did not fit the buffer it was read into: its rest comes next.
+bool isCut(const std::string& line) {
+    return line.size() == kCommandBuffer - 1 && line.back() != '\n';
+}
+
+/// The next line of a listing, without its line break. Of one that is too long the rest is passed over: it
+/// would be taken for a line of its own, and so for a device that the host does not have.
+std::optional<std::string> nextEntry(HostCommand& listing) {
+    const std::optional<std::string> line = listing.nextLine();
+    for (std::optional<std::string> part = line; part && isCut(*part);) {
+        part = listing.nextLine();
+    }
+    return line ? std::optional(trimEnd(*line)) : std::nullopt;
+}
+
+}  // namespace
+
 std::optional<std::string> askAboutLine(const std::optional<std::string>& command) {
     HostCommand answer = startUnderFileLock(command);
     if (!answer.started()) {
@@ -32,9 +51,9 @@ void OsHwMI::buildStorageNodes(const StorageKind& kind, bool update) {
         log(kError) << "fdisk command " << kind.listing << " failed!!";
         return;
     }
-    while (const std::optional<std::string> line = listing.nextLine()) {
+    while (const std::optional<std::string> line = nextEntry(listing)) {
         const auto index = static_cast<unsigned int>(nodes.size() + 1);
-        std::unique_ptr<MutableNode> node = (this->*kind.build)(trimEnd(*line), index, update);
+        std::unique_ptr<MutableNode> node = (this->*kind.build)(*line, index, update);
         if (node) {
             nodes.push_back(node.get());
             handOver(std::move(node), kind, update);

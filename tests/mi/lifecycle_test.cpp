@@ -295,6 +295,28 @@ HOST_TEST(Lifecycle, WaitsForAWalkThatIsUnderWayBeforeItFreesTheNodes) {
     walk.join();
 }
 
+HOST_TEST(Lifecycle, AStopInTheMiddleOfAComparisonWaitsForItAndLeavesNothing) {
+    const std::string layout = "Disk /dev/sda: 80.0 GB, 80026361856 bytes\n/dev/sda1 1 2 300 83 Linux\n";
+    host.toolInTurn("fdisk -ls", {{.out = layout}, {.out = layout, .delayMilliseconds = 500}});
+    const CommandLines commands;
+    QX::setClockSpeed(1000);
+    initialize(IC::myoshwmi);
+    EXPECT_EQ(Access::drives().size(), 1U);
+    EXPECT_EQ(Access::partitions().size(), 1U);
+    while (host.callsOf("fdisk").size() < 2) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(1));
+    }
+    LogCapture capture;
+    IC::myoshwmi.unload();
+    EXPECT_THAT(capture.messages(), testing::Contains("Partition Node Published")) << "it went to its end";
+    EXPECT_EQ(host.callsOf("fdisk").size(), 2U);
+    EXPECT_EQ(commands.all().back(), "rm /tmp/fdisk_tmp 2> /dev/null");
+    EXPECT_FALSE(host.exists("/tmp/fdisk_tmp"));
+    EXPECT_TRUE(IC::myoshwmi.holdAll().empty());
+    EXPECT_TRUE(Access::drives().empty()) << "no pointers to nodes that are gone";
+    EXPECT_TRUE(Access::partitions().empty());
+}
+
 HOST_TEST(Lifecycle, DeletesTheSnapshotByOneQuietCommand) {
     const CommandLines commands;
     IC::deleteFdiskTmp();

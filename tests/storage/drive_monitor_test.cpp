@@ -122,6 +122,20 @@ HOST_TEST_F(DriveMonitor, StartedAgainPublishesEverythingOnceAgain) {
     }
 }
 
+HOST_TEST_F(DriveMonitor, StartedWhileOneRunsTheEarlierOneEndsFirst) {
+    QX::setClockSpeed(1000);
+    host.tool("fdisk -ls", ToolAnswer{.out = kLayout, .delayMilliseconds = 300});
+    const Passes passes;
+    IC::myoshwmi.startHDDThread();
+    ASSERT_TRUE(passes.waitFor(1));
+    IC::myoshwmi.startHDDThread();
+    ASSERT_TRUE(passes.waitFor(3));
+    Access::stopMonitor();
+    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "published /dev/sda", "withdrawn /dev/sda1",
+                                     "published /dev/sda1", "withdrawn /dev/sda", "published /dev/sda",
+                                     "withdrawn /dev/sda1", "published /dev/sda1"));
+}
+
 HOST_TEST_F(DriveMonitor, FollowsTheLayout) {
     QX::setClockSpeed(1000);
     host.toolInTurn("fdisk -ls",
@@ -255,6 +269,15 @@ HOST_TEST_F(DriveMonitor, AMonitorThatCannotBeMadeIsLogged) {
     EXPECT_FALSE(Access::monitorRuns());
     EXPECT_THAT(log.messages(6000), ElementsAre("HardDriveUpdateThread Caught unknown exception"));
     EXPECT_EQ(log.messages().back(), "startHDDThread: exit");
+}
+
+HOST_TEST_F(DriveMonitor, WhereTheNextOneCannotBeMadeThereIsNothingToStop) {
+    IC::myoshwmi.startHDDThread();
+    refusedSize = sizeof(IC::HardDriveUpdateMonitor);
+    IC::myoshwmi.startHDDThread();
+    refusedSize = 0;
+    EXPECT_FALSE(Access::monitorRuns());
+    Access::stopMonitor();
 }
 
 HOST_TEST_F(DriveMonitor, AComparisonThatThrowsIsLoggedAndTheNextOneRuns) {

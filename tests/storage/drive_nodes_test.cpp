@@ -199,6 +199,53 @@ HOST_TEST_F(Drives, ALineTooLongForItsCommandIsSkipped) {
     EXPECT_THAT(commands(), testing::Not(testing::Contains(pathCommand(tooLong))));
 }
 
+HOST_TEST_F(Drives, TheRestOfALineTooLongForTheBufferIsNoDrive) {
+    const std::string start = "Disk /dev/sda: 80.0 GB, 80026361856 ";
+    const std::string full = start + std::string(511 - start.size(), 'x');
+    LogCapture log;
+    build(host, full + " /dev/sdc: 80.0 GB, 1000 bytes\n" + full + "\nDisk /dev/sdb: 80.0 GB, 1000 bytes\n");
+    EXPECT_THAT(drives(), ElementsAre(Seen{101, 1, "/dev/sdb", 1}));
+    const std::string sdb = "Disk /dev/sdb: 80.0 GB, 1000 bytes";
+    EXPECT_THAT(commands(), ElementsAre(kListing, pathCommand(sdb), sizeCommand(sdb)));
+    const std::string refused = "Command too long, not run: " + pathCommand(full);
+    EXPECT_THAT(log.messages(6000),
+                ElementsAre(refused, "Command :  failed!!", refused, "Command :  failed!!"));
+}
+
+HOST_TEST_F(Drives, ALineThatJustFitsTheBufferDoesNotSwallowTheNextOne) {
+    const std::string start = "Disk /dev/sda: 80.0 GB, 80026361856 ";
+    build(host, start + std::string(510 - start.size(), 'x') + "\nDisk /dev/sdb: 80.0 GB, 1000 bytes\n");
+    EXPECT_THAT(drives(), ElementsAre(Seen{101, 1, "/dev/sdb", 1}));
+}
+
+/// sda to sdz, sdaa to sdzz, sdaaa and so on.
+std::string deviceOfNumber(unsigned number) {
+    std::string letters;
+    for (unsigned left = number + 1; left != 0; left = (left - 1) / 26) {
+        letters.insert(letters.begin(), static_cast<char>('a' + (left - 1) % 26));
+    }
+    return "/dev/sd" + letters;
+}
+
+// The listing is more than a pipe holds: it stands still while the questions about its lines are asked.
+HOST_TEST_F(Drives, TwoThousandOfThem) {
+    std::string snapshot;
+    for (unsigned number = 0; number < 2000; ++number) {
+        snapshot += "Disk " + deviceOfNumber(number) + ": 500.1 GB, 500107862016 bytes\n";
+    }
+    shell_stub::answerWith([](const std::string& command) -> std::optional<std::string> {
+        if (!command.starts_with("echo \"Disk ")) return std::nullopt;
+        if (command.ends_with("-f5")) return "500107862016\n";
+        const std::string path = command.substr(sizeof "echo \"Disk " - 1);
+        return path.substr(0, path.find(' ')) + "\n";
+    });
+    build(host, snapshot);
+    const auto found = drives();
+    ASSERT_EQ(found.size(), 2000U);
+    EXPECT_EQ(found.front(), (Seen{101, 1, "/dev/sda", 500107862}));
+    EXPECT_EQ(found.back(), (Seen{2100, 2000, "/dev/sdbxx", 500107862}));
+}
+
 HOST_TEST_F(Drives, AListingThatCannotStartLeavesNoNodes) {
     build(host, kOneDrive);
     shell_stub::failWhen([](const std::string& command) { return command == kListing; });

@@ -56,6 +56,18 @@ HOST_TEST_F(LayoutComparison, TheFirstPassAlwaysRebuildsBothKinds) {
     EXPECT_THAT(log.messages(), Contains("Partition Check Sum found Different"));
 }
 
+HOST_TEST_F(LayoutComparison, ADifferenceIsToldOfWhenItsNodesAreBuilt) {
+    LogCapture log;
+    pass(host, kLayout);
+    std::vector<std::string> steps = log.messages();
+    std::erase_if(steps, [](const std::string& message) {
+        return message.find("create") != 0 && message.find("found Different") == std::string::npos;
+    });
+    EXPECT_THAT(steps, ElementsAre("createHardDriveNodes: entry", "createHardDriveNodes: exit",
+                                   "Hard Drive Check Sum found Different", "createPartitionNodes: entry",
+                                   "createPartitionNodes: exit", "Partition Check Sum found Different"));
+}
+
 HOST_TEST_F(LayoutComparison, AnUnchangedLayoutTouchesNothing) {
     startWith(host, kLayout);
     const auto drivesBefore = drives();

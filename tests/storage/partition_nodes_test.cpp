@@ -174,6 +174,15 @@ HOST_TEST_F(Partitions, ALineTooLongForItsCommandIsSkipped) {
     EXPECT_THAT(commands(), testing::Not(testing::Contains(sizeCommand(tooLong))));
 }
 
+HOST_TEST_F(Partitions, TheRestOfALineTooLongForTheBufferIsNoPartition) {
+    const std::string start = "/dev/sda1 1 2 300 83 ";
+    const std::string full = start + std::string(511 - start.size(), 'x');
+    build(host,
+          full + std::string(100'000, 'y') + " 1 2 300\n" + full + "\n/dev/sda2 1 2 300 83 Linux\n" + full);
+    EXPECT_THAT(partitions(), ElementsAre(Seen{103, 1, "/dev/sda2", 300}));
+    EXPECT_THAT(commands(), ElementsAre(kListing, sizeCommand("/dev/sda2 1 2 300 83 Linux")));
+}
+
 HOST_TEST_F(Partitions, HealthIsAlwaysGoodAndWritesAreOnlyStored) {
     build(host, kBoot + "\n");
     const auto node = nodesOfType(IC::NodeType::partition).at(0);
