@@ -10,7 +10,7 @@ constexpr Label kPower[] = {{"on", 1, true}, {"restart", 9, true}, {"halt", 12, 
 
 constexpr auto kOwnerAccepts = "text of up to 1024 bytes without control characters; \"\" removes it";
 
-constexpr Property kRows[] = {
+constexpr Property kHostRows[] = {
     {NodeType::computer, 108, "HostName", Kind::text, Unit::none, {}, "the host name as the kernel has it"},
     {NodeType::computer,
      115,
@@ -65,7 +65,7 @@ constexpr Property kRows[] = {
 }  // namespace
 
 std::span<const Property> hostProperties() {
-    return kRows;
+    return kHostRows;
 }
 
 }  // namespace cvagent

@@ -16,7 +16,7 @@ constexpr Label kEnumerate[] = {{"now", 1, true}};
 
 constexpr auto ip = NodeType::ipConfig;
 
-constexpr Property kRows[] = {
+constexpr Property kIpConfigRows[] = {
     {ip, 24, "IPOrigin", Kind::enumeration, Unit::none, kOrigins,
      "how the interface is configured to get its address; takes effect when it is next brought up",
      check::enumeration},
@@ -131,7 +131,7 @@ constexpr Property kRows[] = {
 }  // namespace
 
 std::span<const Property> ipConfigProperties() {
-    return kRows;
+    return kIpConfigRows;
 }
 
 }  // namespace cvagent

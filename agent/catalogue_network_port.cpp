@@ -20,7 +20,7 @@ constexpr Label kWake[] = {{"magic packet", 3}};
 
 constexpr auto port = NodeType::networkPort;
 
-constexpr Property kRows[] = {
+constexpr Property kPortRows[] = {
     {port, 0, "PortNames", Kind::texts, Unit::none, {}, "the interface name, as a list of one"},
     {port, 38, "SupportedSpeed", Kind::number, Unit::megabitsPerSecond, kSpeeds,
      "speed of the first link mode that the port supports"},
@@ -53,7 +53,7 @@ constexpr Property kRows[] = {
 }  // namespace
 
 std::span<const Property> networkPortProperties() {
-    return kRows;
+    return kPortRows;
 }
 
 }  // namespace cvagent

@@ -7,7 +7,7 @@ namespace {
 
 constexpr Label kHealth[] = {{"normal", 1}};
 
-constexpr Property kRows[] = {
+constexpr Property kStorageRows[] = {
     {NodeType::hardDrive,
      37,
      "DriveSize",
@@ -32,7 +32,7 @@ constexpr Property kRows[] = {
 }  // namespace
 
 std::span<const Property> storageProperties() {
-    return kRows;
+    return kStorageRows;
 }
 
 }  // namespace cvagent

@@ -146,7 +146,7 @@ Error readUsesDhcp(const Config& config, PropertyValue& out) {
     return {};
 }
 
-constexpr Property<Config> kLive[] = {
+constexpr Property<Config> kConfigProperties[] = {
     {Config::ipOrigin, "IP origin", readOrigin},
     {Config::ipv4Address, "IPv4 address", readIPv4Address},
     {Config::subnetMask, "subnet mask", readSubnetMask},
@@ -163,7 +163,7 @@ constexpr Property<Config> kLive[] = {
     {Config::linkState, "link state", readLinkState},
     {Config::usesDhcp, "uses DHCP", readUsesDhcp},
 };
-static_assert(idsAscend(kLive));
+static_assert(idsAscend(kConfigProperties));
 
 struct Keyword {
     const char* text;
@@ -197,7 +197,7 @@ IPConfigNode::~IPConfigNode() {
 
 Error IPConfigNode::getProperty(unsigned int id, PropertyValue& value) const {
     const LogScope scope("IPConfigNode::getProperty");
-    const auto* live = findProperty(kLive, id);
+    const auto* live = findProperty(kConfigProperties, id);
     return live != nullptr ? live->read(*this, value) : MutableNode::getProperty(id, value);
 }
 

@@ -104,7 +104,7 @@ Error readTeam(const Port& port, PropertyValue& out) {
     return {};
 }
 
-constexpr Property<Port> kLive[] = {
+constexpr Property<Port> kPortProperties[] = {
     {Port::speed, "speed", readSpeed},
     {Port::autoNegotiation, "auto-negotiation", readAutoNegotiation},
     {Port::fullDuplex, "full duplex", readDuplex},
@@ -115,7 +115,7 @@ constexpr Property<Port> kLive[] = {
     {Port::memberLinkFailures, "member link failures", readLinkFailures},
     {Port::team, "team", readTeam},
 };
-static_assert(idsAscend(kLive));
+static_assert(idsAscend(kPortProperties));
 
 }  // namespace
 
@@ -131,7 +131,7 @@ NetworkPortNode::~NetworkPortNode() {
 
 Error NetworkPortNode::getProperty(unsigned int id, PropertyValue& value) const {
     const LogScope scope("NetworkPortNode::getProperty");
-    const auto* live = findProperty(kLive, id);
+    const auto* live = findProperty(kPortProperties, id);
     return live != nullptr ? live->read(*this, value) : MutableNode::getProperty(id, value);
 }
 

@@ -3,37 +3,34 @@
 #include <streambuf>
 
 namespace CVLog {
-namespace {
-
-/// Writes straight into a string, so that text and stream output keep their order.
-class StringAppender : public std::streambuf {
-public:
-    explicit StringAppender(std::string& text) : text_(text) {}
-
-protected:
-    int_type overflow(int_type character) override {
-        if (!traits_type::eq_int_type(character, traits_type::eof())) {
-            text_ += traits_type::to_char_type(character);
-        }
-        return traits_type::not_eof(character);
-    }
-    std::streamsize xsputn(const char* characters, std::streamsize count) override {
-        text_.append(characters, static_cast<std::size_t>(count));
-        return count;
-    }
-
-private:
-    std::string& text_;
-};
-
-}  // namespace
 
 struct CVMessageBuffer::Stream {
+    /// Writes straight into a string, so that text and stream output keep their order.
+    class Appender : public std::streambuf {
+    public:
+        explicit Appender(std::string& text) : text_(text) {}
+
+    protected:
+        int_type overflow(int_type character) override {
+            if (!traits_type::eq_int_type(character, traits_type::eof())) {
+                text_ += traits_type::to_char_type(character);
+            }
+            return traits_type::not_eof(character);
+        }
+        std::streamsize xsputn(const char* characters, std::streamsize count) override {
+            text_.append(characters, static_cast<std::size_t>(count));
+            return count;
+        }
+
+    private:
+        std::string& text_;
+    };
+
     // The classic locale: a log line reads the same whatever the agent has set.
     explicit Stream(std::string& text) : appender(text), stream(&appender) {
         stream.imbue(std::locale::classic());
     }
-    StringAppender appender;
+    Appender appender;
     std::ostream stream;
 };
 

@@ -88,8 +88,8 @@ void killChildrenOf(pid_t thread) {
         listings.pop_back();
         for (const pid_t id : readIds(listing)) {
             Process process(id);
-            const auto current = readIds(listing);  // still the same child, now that we hold it?
-            if (!process.isOpen() || std::find(current.begin(), current.end(), id) == current.end()) {
+            const auto now = readIds(listing);  // still the same child, now that we hold it?
+            if (!process.isOpen() || std::find(now.begin(), now.end(), id) == now.end()) {
                 continue;
             }
             freeze(process);

@@ -4,6 +4,7 @@
 #include <cstdlib>
 #include <filesystem>
 
+#include "tests/computer/computer_host.h"
 #include "tests/support/fake_host.h"
 
 namespace {
@@ -12,9 +13,6 @@ using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::IsEmpty;
 
-constexpr char kAssetFile[] = "/opt/vantrel/corvista/data/asset.dat";
-constexpr char kClock[] = "/etc/sysconfig/clock";
-constexpr char kHosts[] = "/etc/hosts";
 constexpr char kClockText[] = "# the clock\nHWCLOCK=\"-u\"\nTIMEZONE=\"CET\"\n\nDEFAULT_TIMEZONE=\"x\"";
 constexpr char kHostsText[] = "127.0.0.1\tlocalhost\n127.0.0.2\talpha.example.org alpha\n";
 

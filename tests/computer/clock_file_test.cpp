@@ -3,6 +3,7 @@
 #include <sys/mount.h>
 
 #include "computer/time_zone.h"
+#include "tests/computer/computer_host.h"
 #include "tests/computer/computer_tools.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
@@ -12,9 +13,7 @@ namespace {
 using testing::ElementsAre;
 using testing::IsEmpty;
 
-constexpr char kClock[] = "/etc/sysconfig/clock";
 constexpr char kCopy[] = "/etc/sysconfig/clock.bak";
-constexpr unsigned int kIndia = 330;
 constexpr char kCopyCommand[] = "/bin/cp /etc/sysconfig/clock /etc/sysconfig/clock.bak";
 
 struct Change {

@@ -6,6 +6,7 @@
 #include "computer/computer_node.h"
 #include "mi/globals.h"
 #include "mi/os_hw_mi.h"
+#include "tests/computer/computer_host.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 
@@ -14,8 +15,6 @@ namespace {
 using IC::Number;
 using IC::PropertyValue;
 using testing::ElementsAre;
-
-constexpr char kAssetFile[] = "/opt/vantrel/corvista/data/asset.dat";
 
 /// The tree down to the computer.
 class Started {

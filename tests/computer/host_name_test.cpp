@@ -6,6 +6,7 @@
 #include "mi/globals.h"
 #include "mi/my_process.h"
 #include "mi/os_hw_mi.h"
+#include "tests/computer/computer_host.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/plugin_access.h"
@@ -14,9 +15,6 @@ namespace {
 
 using testing::ElementsAre;
 using testing::IsEmpty;
-
-constexpr char kHosts[] = "/etc/hosts";
-constexpr char kHostName[] = "/etc/HOSTNAME";
 
 class Names {
 public:

@@ -3,6 +3,7 @@
 #include <sys/mount.h>
 
 #include "mi/host_name.h"
+#include "tests/computer/computer_host.h"
 #include "tests/computer/computer_tools.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
@@ -11,9 +12,6 @@ namespace {
 
 using testing::ElementsAre;
 using testing::IsEmpty;
-
-constexpr char kHosts[] = "/etc/hosts";
-constexpr char kHostName[] = "/etc/HOSTNAME";
 
 class HostsFile : public HostFixture {
 protected:

@@ -4,6 +4,7 @@
 #include <filesystem>
 
 #include "computer/time_zone.h"
+#include "tests/computer/computer_host.h"
 #include "tests/computer/failing_calls.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
@@ -13,7 +14,6 @@ namespace {
 using testing::ElementsAre;
 using testing::IsEmpty;
 
-constexpr unsigned int kIndia = 330;
 constexpr unsigned int kJapan = 540;
 constexpr char kLink[] = "/etc/localtime";
 constexpr char kOld[] = "/etc/localtime.bak";

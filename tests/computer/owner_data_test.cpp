@@ -4,6 +4,7 @@
 
 #include <cstdlib>
 
+#include "tests/computer/computer_host.h"
 #include "tests/computer/computer_tools.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
@@ -12,8 +13,6 @@ namespace {
 
 using testing::ElementsAre;
 using testing::IsEmpty;
-
-constexpr char kAssetFile[] = "/opt/vantrel/corvista/data/asset.dat";
 
 struct Field {
     unsigned int id;

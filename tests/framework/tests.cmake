@@ -16,3 +16,4 @@ corvista_test(framework LABELS threads SOURCES
   framework/strings_test.cpp
   framework/thread_test.cpp
   LIBRARIES test_support)
+set_source_files_properties(framework/stress_test.cpp PROPERTIES SKIP_UNITY_BUILD_INCLUSION ON)

@@ -6,3 +6,4 @@ corvista_test(indications SOURCES
   indications/network_monitor_test.cpp
   indications/state_file_test.cpp
   LIBRARIES plugin_code test_support LABELS threads)
+set_source_files_properties(indications/network_monitor_test.cpp indications/state_file_test.cpp PROPERTIES SKIP_UNITY_BUILD_INCLUSION ON)

@@ -7,3 +7,4 @@ corvista_test(storage SOURCES
   storage/recorded_hosts_test.cpp
   storage/storage_host.cpp
   LIBRARIES plugin_code test_support LABELS threads)
+set_source_files_properties(storage/layout_comparison_test.cpp storage/partition_nodes_test.cpp PROPERTIES SKIP_UNITY_BUILD_INCLUSION ON)
