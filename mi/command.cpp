@@ -3,6 +3,7 @@
 #include <array>
 #include <cstdarg>
 #include <cstdlib>
+#include <memory>
 
 #include "mi/log.h"
 
@@ -38,8 +39,8 @@ std::optional<std::string> formatCommand(const char* format, ...) {
     if (length < 0) {
         return std::nullopt;
     }
+    const std::unique_ptr<char, void (*)(void*)> owner(text, free);
     std::string command(text, static_cast<std::size_t>(length));
-    free(text);
     return fits(command) ? std::optional(std::move(command)) : std::nullopt;
 }
 

@@ -51,8 +51,12 @@ public:
     ~LogLine();
 
     template <class T>
-    LogLine& operator<<(const T& value) {
-        buffer_ << value;
+    LogLine& operator<<(const T& value) noexcept {
+        try {
+            buffer_ << value;
+        } catch (...) {
+            // What finds no memory is missing in the line: the work itself goes on.
+        }
         return *this;
     }
 

@@ -117,6 +117,7 @@ private:
                                 std::map<std::string, std::string>& settings);
     /// The frame of both storage builders: the old nodes go, each line of the listing may give a new one.
     void buildStorageNodes(const StorageKind& kind, bool update);
+    void withdrawStorageNodes(const StorageKind& kind);
     void handOver(std::unique_ptr<MutableNode> node, const StorageKind& kind, bool update);
     std::unique_ptr<MutableNode> buildHardDrive(const std::string& line, unsigned int index, bool update);
     std::unique_ptr<MutableNode> buildPartition(const std::string& line, unsigned int index, bool update);

@@ -36,16 +36,24 @@ std::optional<std::string> askAboutLine(const std::optional<std::string>& comman
     return trimEnd(answer.nextLine().value_or(""));
 }
 
+void OsHwMI::withdrawStorageNodes(const StorageKind& kind) {
+    std::vector<Node*>& nodes = this->*kind.nodes;
+    while (!nodes.empty()) {
+        Node* const old = nodes.front();
+        log(kProgress) << kind.withdrawnText << old->getDescription();
+        // The framework owns the nodes and frees one when its last reader has gone: the list never holds one
+        // that has been withdrawn, nor loses one that has not, whatever the agent throws.
+        nodes.erase(nodes.begin());
+        deleteNode(old);
+    }
+}
+
 void OsHwMI::buildStorageNodes(const StorageKind& kind, bool update) {
     std::vector<Node*>& nodes = this->*kind.nodes;
-    // The framework owns the nodes and frees one when its last reader has gone; the list is emptied first, so
-    // that it never holds a pointer to a node that has been withdrawn.
-    for (Node* old : std::exchange(nodes, {})) {
-        if (update) {
-            log(kProgress) << kind.withdrawnText << old->getDescription();
-            deleteNode(old);
-        }
+    if (update) {
+        withdrawStorageNodes(kind);
     }
+    nodes.clear();
     HostCommand listing = startUnderFileLock(kind.listing);
     if (!listing.started()) {
         log(kError) << "fdisk command " << kind.listing << " failed!!";
@@ -55,19 +63,28 @@ void OsHwMI::buildStorageNodes(const StorageKind& kind, bool update) {
         const auto index = static_cast<unsigned int>(nodes.size() + 1);
         std::unique_ptr<MutableNode> node = (this->*kind.build)(*line, index, update);
         if (node) {
-            nodes.push_back(node.get());
             handOver(std::move(node), kind, update);
         }
     }
 }
 
 void OsHwMI::handOver(std::unique_ptr<MutableNode> node, const StorageKind& kind, bool update) {
-    if (!update) {
-        appendNode(node.release());
-        return;
+    std::vector<Node*>& nodes = this->*kind.nodes;
+    Node* const built = node.get();
+    nodes.push_back(built);
+    try {
+        if (update) {
+            publishNode(node.release());
+            log(kProgress) << kind.publishedText;
+        } else {
+            appendNode(node.release());
+        }
+    } catch (...) {
+        // It is listed or it is gone already; in no case may a later update meet it.
+        nodes.pop_back();
+        deleteNode(built);
+        throw;
     }
-    publishNode(node.release());
-    log(kProgress) << kind.publishedText;
 }
 
 }  // namespace IC

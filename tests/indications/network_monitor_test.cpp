@@ -7,7 +7,7 @@
 #include <chrono>
 #include <thread>
 
-#include "tests/indications/failing_new.h"
+#include "tests/support/failing_new.h"
 #include "tests/indications/heard.h"
 #include "tests/indications/interfaces.h"
 #include "tests/support/fake_host.h"

@@ -1,9 +1,9 @@
 corvista_test(indications SOURCES
   indications/alerts_test.cpp
-  indications/failing_new.cpp
   indications/kernel_links_test.cpp
   indications/link_states_test.cpp
   indications/network_monitor_test.cpp
   indications/state_file_test.cpp
+  support/failing_new.cpp
   LIBRARIES plugin_code test_support LABELS threads)
 set_source_files_properties(indications/network_monitor_test.cpp indications/state_file_test.cpp PROPERTIES SKIP_UNITY_BUILD_INCLUSION ON)

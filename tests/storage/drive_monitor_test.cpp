@@ -10,30 +10,7 @@
 #include "mi/disk_snapshot.h"
 #include "mi/globals.h"
 #include "tests/storage/storage_host.h"
-
-namespace {
-
-std::atomic<std::size_t> refusedSize{0};  ///< allocations of this size fail; 0 for none
-
-}  // namespace
-
-// GCC takes malloc for a mismatch with the delete below; the two belong together.
-#pragma GCC diagnostic push
-#pragma GCC diagnostic ignored "-Wmismatched-new-delete"
-void* operator new(std::size_t size) {
-    void* memory = size == refusedSize ? nullptr : std::malloc(size);
-    if (memory == nullptr) {
-        throw std::bad_alloc();
-    }
-    return memory;
-}
-void operator delete(void* memory) noexcept {
-    std::free(memory);
-}
-void operator delete(void* memory, std::size_t) noexcept {
-    std::free(memory);
-}
-#pragma GCC diagnostic pop
+#include "tests/support/failing_new.h"
 
 namespace {
 
@@ -261,11 +238,14 @@ HOST_TEST_F(DriveMonitor, AThreadThatCannotStartIsLogged) {
     EXPECT_THAT(log.messages(), IsEmpty()) << "there is nothing to stop";
 }
 
+void startWithoutMemory() {
+    const FailingNew none(sizeof(IC::HardDriveUpdateMonitor), [] { throw std::bad_alloc(); });
+    IC::myoshwmi.startHDDThread();
+}
+
 HOST_TEST_F(DriveMonitor, AMonitorThatCannotBeMadeIsLogged) {
     LogCapture log;
-    refusedSize = sizeof(IC::HardDriveUpdateMonitor);
-    IC::myoshwmi.startHDDThread();
-    refusedSize = 0;
+    startWithoutMemory();
     EXPECT_FALSE(Access::monitorRuns());
     EXPECT_THAT(log.messages(6000), ElementsAre("HardDriveUpdateThread Caught unknown exception"));
     EXPECT_EQ(log.messages().back(), "startHDDThread: exit");
@@ -273,9 +253,7 @@ HOST_TEST_F(DriveMonitor, AMonitorThatCannotBeMadeIsLogged) {
 
 HOST_TEST_F(DriveMonitor, WhereTheNextOneCannotBeMadeThereIsNothingToStop) {
     IC::myoshwmi.startHDDThread();
-    refusedSize = sizeof(IC::HardDriveUpdateMonitor);
-    IC::myoshwmi.startHDDThread();
-    refusedSize = 0;
+    startWithoutMemory();
     EXPECT_FALSE(Access::monitorRuns());
     Access::stopMonitor();
 }
@@ -287,17 +265,21 @@ HOST_TEST_F(DriveMonitor, AComparisonThatThrowsIsLoggedAndTheNextOneRuns) {
         if (command == IC::diskSnapshotCommand && ++snapshots == 1) {
             throw std::runtime_error("out of everything");
         }
+        if (command == IC::diskSnapshotCommand && snapshots == 2) {
+            throw 2;
+        }
         return false;
     });
     LogCapture log;
     IC::myoshwmi.startHDDThread();
     const auto end = steady_clock::now() + 20s;
-    while (snapshots < 3 && steady_clock::now() < end) {
+    while (snapshots < 4 && steady_clock::now() < end) {
         std::this_thread::sleep_for(1ms);
     }
     Access::stopMonitor();
-    EXPECT_GE(snapshots, 3);
-    EXPECT_THAT(log.messages(6000), ElementsAre("HDDThreadProcess failed: out of everything"));
+    EXPECT_GE(snapshots, 4);
+    EXPECT_THAT(log.messages(6000), ElementsAre("HDDThreadProcess failed: out of everything",
+                                                "HDDThreadProcess failed: unknown exception"));
     EXPECT_FALSE(diary().empty());
 }
 

@@ -101,6 +101,7 @@ HOST_TEST_F(Drives, AnUpdateWithdrawsTheOldNodesAndPublishesTheNewOnesOneByOne) 
                             "HardDriveNode::HardDriveNode: exit", "Hard Drive Update created /dev/sdc",
                             "Hard Drive Node::Normal /dev/sdc", "publishNode: entry", "publishNode: exit",
                             "Updated Hard Drive Node Published", "createHardDriveNodes: exit"));
+    EXPECT_EQ(log.messages(3000), log.messages());
     EXPECT_THAT(Access::drawnIds(), ElementsAre(100, 101, 102, 103));
 }
 

@@ -83,6 +83,7 @@ HOST_TEST_F(Partitions, AnUpdateWithdrawsTheOldNodesAndPublishesTheNewOnesOneByO
                     "DiskPartition::DiskPartition: exit", "Partition blocksize : 500",
                     "Partition blocksize in Uint64 : 500", "publishNode: entry", "publishNode: exit",
                     "Partition Node Published", "createPartitionNodes: exit"));
+    EXPECT_EQ(log.messages(3000), log.messages());
 }
 
 HOST_TEST_F(Partitions, TheBootFlagDoesNotMoveTheSize) {
@@ -188,7 +189,10 @@ HOST_TEST_F(Partitions, HealthIsAlwaysGoodAndWritesAreOnlyStored) {
     const auto node = nodesOfType(IC::NodeType::partition).at(0);
     clearCommands();
     IC::PropertyValue value;
+    LogCapture log;
     EXPECT_EQ(node->getProperty(123, value).getStatus(), 0);
+    EXPECT_THAT(log.messages(),
+                ElementsAre("DiskPartition::getProperty: entry", "DiskPartition::getProperty: exit"));
     EXPECT_EQ(value, IC::PropertyValue(IC::Number(1U), true));
     EXPECT_EQ(node->setProperty(123, IC::PropertyValue(IC::Number(12U), true)).getStatus(), 0);
     EXPECT_EQ(node->getProperty(123, value).getStatus(), 0);

@@ -2,9 +2,11 @@ corvista_test(storage SOURCES
   storage/drive_monitor_test.cpp
   storage/drive_nodes_test.cpp
   storage/layout_comparison_test.cpp
+  storage/no_memory_test.cpp
   storage/partition_nodes_test.cpp
   storage/rebuild_stress_test.cpp
   storage/recorded_hosts_test.cpp
   storage/storage_host.cpp
+  support/failing_new.cpp
   LIBRARIES plugin_code test_support LABELS threads)
 set_source_files_properties(storage/layout_comparison_test.cpp storage/partition_nodes_test.cpp PROPERTIES SKIP_UNITY_BUILD_INCLUSION ON)

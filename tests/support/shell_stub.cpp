@@ -2,6 +2,7 @@
 
 #include <dlfcn.h>
 
+#include <memory>
 #include <mutex>
 #include <set>
 #include <utility>
@@ -31,14 +32,14 @@ Canned& canned() {
 }
 
 FILE* openCanned(const std::string& output) {
-    FILE* stream = tmpfile();
+    std::unique_ptr<FILE, int (*)(FILE*)> stream(tmpfile(), fclose);
     if (stream != nullptr) {
-        fwrite(output.data(), 1, output.size(), stream);
-        rewind(stream);
+        fwrite(output.data(), 1, output.size(), stream.get());
+        rewind(stream.get());
         const std::lock_guard lock(canned().guard);
-        canned().streams.insert(stream);
+        canned().streams.insert(stream.get());
     }
-    return stream;
+    return stream.release();
 }
 
 bool takeCanned(FILE* stream) {
