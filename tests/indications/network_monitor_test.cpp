@@ -7,9 +7,9 @@
 #include <chrono>
 #include <thread>
 
-#include "tests/support/failing_new.h"
 #include "tests/indications/heard.h"
 #include "tests/indications/interfaces.h"
+#include "tests/support/failing_new.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_threads.h"
