@@ -8,6 +8,8 @@
 #include <unistd.h>
 
 #include <array>
+#include <cstdio>
+#include <cstdlib>
 #include <fstream>
 
 namespace {
@@ -32,8 +34,9 @@ void enter(pid_t process, const char* kind, int flag) {
 }
 
 bool succeeds(const std::function<bool()>& function) {
+    std::fflush(nullptr);  // or the child prints what waits in the buffers once more
     const pid_t child = fork();
-    if (child == 0) _exit(function() ? 0 : 1);
+    if (child == 0) std::exit(function() ? 0 : 1);
     int status = 1;
     waitpid(child, &status, 0);
     return WIFEXITED(status) && WEXITSTATUS(status) == 0;
