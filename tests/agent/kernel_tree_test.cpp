@@ -1,0 +1,215 @@
+// cvagent and the real plug-in on links of a real kernel: the tree against what `ip -j` and `ethtool` tell.
+#include <gmock/gmock.h>
+
+#include <nlohmann/json.hpp>
+#include <thread>
+
+#include "tests/agent/kernel_told.h"
+#include "tests/support/fake_host.h"
+
+namespace {
+
+using testing::UnorderedElementsAre;
+using Json = nlohmann::json;
+using Lines = std::vector<std::string>;
+
+const Lines kBesideTheCables = {
+    "link add eth2 type veth peer name sw2",  // never brought up
+    "link add br0 type bridge",
+    "link add br1 type bridge",
+    "link set eth4 master br0",
+    "link set eth6 master br0",
+    "link set sw3 master br1",
+    "link set br0 up",
+    "link add link eth0 name ethmac type macvlan mode bridge",
+    "link set ethmac up",
+};
+
+/// Every mix of addresses and routes.
+const Lines kAddressesAndRoutes = {
+    // everything, several of each; the second IPv4 address has a label of its own
+    "address add 10.1.2.3/20 broadcast + dev eth0",
+    "address add 10.1.2.4/20 broadcast + dev eth0",
+    "address add 192.168.7.1/24 broadcast + dev eth0 label eth0:1",
+    "-6 address add 2001:db8:1:9::7/64 dev eth0 nodad valid_lft 3000 preferred_lft 2000",
+    "-6 address add 2001:db8:1:42::3/56 dev eth0 nodad",
+    "-6 address add 2001:db8:1::4/64 dev eth0 nodad",
+    "route add default via 10.1.0.1",
+    "route add 172.16.0.0/12 via 10.1.0.2 metric 5",
+    "-6 route add default via 2001:db8:1:42::1",
+    // on-link routes alone, no broadcast address
+    "address add 10.9.0.1/30 dev eth1",
+    // IPv6 alone, all of it learnt
+    "-6 address add 2001:db8:3:1::1/60 dev eth3 nodad valid_lft 3000 preferred_lft 2000",
+    "-6 address add 2001:db8:3:2::1/62 dev eth3 nodad valid_lft 3000 preferred_lft 2000",
+    "-6 route add 2001:db8:f::/48 via 2001:db8:3:1::ff dev eth3",
+    // a default route of its own behind the first one
+    "address add 10.5.0.2/16 broadcast + dev eth5",
+    "route add default via 10.5.0.1 dev eth5 metric 200",
+    "-6 route add default via fe80::1 dev eth5 metric 2048",
+    // on the links above the ports
+    "address add 10.6.0.1/25 broadcast + dev br0",
+    "-6 address add 2001:db8:6::1/64 dev br0 nodad",
+    "address add 10.1.2.9/32 dev ethmac",
+};
+
+/// The values of a node: property id to value.
+Json values(const Json& node) {
+    Json found = Json::object();
+    for (const auto& [id, property] : node["properties"].items()) {
+        if (property.contains("value")) {
+            found[id] = property["value"];
+        }
+    }
+    return found;
+}
+
+/// A host whose network is the kernel's, in a namespace of its own. The far ends of its cables ("sw0"...)
+/// have names that no tree shows.
+class KernelTree : public HostFixture {
+protected:
+    void setUpHost(FakeHost& host) override {
+        for (const char* tool : {"ip", "ethtool", "brctl", "hostname"}) {
+            host.realTool(tool);
+        }
+        host.useKernelNetwork();
+        host.directory("/opt/vantrel/corvista/data");
+        host.setHostName("linux-k");
+        host.file("/etc/hosts", "127.0.0.1 localhost\n10.1.2.3 linux-k.example.com linux-k\n");
+        host.file("/etc/resolv.conf",
+                  "search example.com example.org\nnameserver 192.0.2.53\nnameserver 2001:db8::53\n");
+    }
+
+    static Finished ip(FakeHost& host, const std::string& words) {
+        return host.run({"sh", "-c", "ip " + words});
+    }
+    static void wire(FakeHost& host, const Lines& commands) {
+        for (const std::string& command : commands) {
+            const Finished done = ip(host, command);
+            ASSERT_EQ(done.status, 0) << command << ": " << done.err;
+        }
+    }
+    /// A cable between two links, the near end up.
+    static Lines cable(const std::string& near, const std::string& far, bool plugged = true) {
+        Lines commands = {"link add " + near + " type veth peer name " + far, "link set " + near + " up"};
+        if (plugged) {
+            commands.push_back("link set " + far + " up");
+        }
+        return commands;
+    }
+    static void wireEverything(FakeHost& host) {
+        for (const std::string number : {"0", "1", "3", "4", "5", "6"}) {
+            wire(host, cable("eth" + number, "sw" + number, number != "1"));
+        }
+        wire(host, kBesideTheCables);
+        wire(host, kAddressesAndRoutes);
+    }
+    static void interfaceFile(FakeHost& host, const std::string& name, const std::string& content) {
+        host.file("/etc/sysconfig/network/ifcfg-eth-id-" + KernelTold(host).hardwareAddress(name), content);
+    }
+
+    static Json cvagent(FakeHost& host, Lines words) {
+        words.insert(words.begin(), {CVAGENT_PROGRAM, "--plugin", CORVISTA_PLUGIN_FILE});
+        words.emplace_back("--json");
+        const Finished run = host.run(words);
+        EXPECT_EQ(run.status, 0) << run.err;
+        EXPECT_EQ(run.err, "");
+        return Json::parse(run.out);
+    }
+    /// The network's nodes of the tree, in the form of KernelTold.
+    static Json shown(FakeHost& host) {
+        Json found = Json::object();
+        const Json tree = cvagent(host, {"tree"});
+        for (const Json& node : tree["nodes"]) {
+            const std::string type = node["class"];
+            if (type != "network-port" && type != "ip-config" && type != "team") {
+                continue;
+            }
+            found[node["path"].get<std::string>()] = {{"description", node["description"]},
+                                                      {"status", node["status"]},
+                                                      {"properties", values(node)}};
+        }
+        return found;
+    }
+    static void expectTreeAsTold(FakeHost& host) {
+        const Json expected = KernelTold(host).nodes();
+        const Json found = shown(host);
+        EXPECT_EQ(found, expected) << "the way from what is told to what is shown: "
+                                   << Json::diff(expected, found).dump(1);
+    }
+    /// The names of the nodes that a tree shows, without the way to them.
+    static Lines names(const Json& nodes) {
+        Lines found;
+        for (const auto& [path, node] : nodes.items()) {
+            found.push_back(path.substr(path.rfind('/') + 1));
+        }
+        return found;
+    }
+};
+
+HOST_TEST_F(KernelTree, EqualsWhatTheToolsTell) {
+    wireEverything(host);
+    interfaceFile(host, "eth0", "BOOTPROTO=static\n");
+    interfaceFile(host, "eth5", "STARTMODE=auto\nBOOTPROTO=dhcp\n");
+    expectTreeAsTold(host);
+    EXPECT_THAT(names(KernelTold(host).nodes()),
+                UnorderedElementsAre("network-port:eth0", "ip-config:eth0", "network-port:eth1",
+                                     "ip-config:eth1", "network-port:eth2", "ip-config:eth2",
+                                     "network-port:eth3", "ip-config:eth3", "network-port:eth5",
+                                     "ip-config:eth5", "ip-config:br0", "ip-config:br1", "ip-config:ethmac"))
+        << "neither a bridge's member nor the far end of a cable";
+}
+
+HOST_TEST_F(KernelTree, ReadsLiveWhatTheToolsTellNow) {
+    wire(host, cable("eth0", "sw0"));
+    wire(host, {"address add 10.1.2.3/20 broadcast + dev eth0", "route add default via 10.1.0.1",
+                "-6 address add 2001:db8:1:42::3/56 dev eth0 nodad", "link set sw0 down"});
+    const KernelTold told(host);
+    ASSERT_EQ(told.liveState("eth0"), 12U) << "its cable is dead";
+    const Json nodes = told.nodes();
+    for (const auto& [path, node] : nodes.items()) {
+        Json expected = node["properties"];
+        expected["123"] = 12;
+        EXPECT_EQ(values(cvagent(host, {"get", path})), expected) << path;
+    }
+    EXPECT_EQ(nodes.size(), 2U);
+}
+
+/// Links that not every kernel has; their test says so and is skipped there.
+bool hasKind(FakeHost& host, const std::string& command) {
+    const Finished done = host.run({"sh", "-c", "ip " + command});
+    EXPECT_TRUE(done.status == 0 || done.err.find("Unknown device type") != std::string::npos) << done.err;
+    return done.status == 0;
+}
+
+HOST_TEST_F(KernelTree, EqualsWhatTheToolsTellOfVLANs) {
+    wire(host, cable("eth0", "sw0"));
+    if (!hasKind(host, "link add link eth0 name eth0.10 type vlan id 10")) {
+        GTEST_SKIP() << "this kernel has no VLANs";
+    }
+    wire(host, {"link add link eth0 name eth0.20 type vlan id 20", "link set eth0.10 up",
+                "address add 10.10.0.1/24 broadcast + dev eth0.10"});
+    expectTreeAsTold(host);
+    EXPECT_THAT(names(KernelTold(host).nodes()),
+                UnorderedElementsAre("network-port:eth0", "ip-config:eth0", "network-port:eth0.10",
+                                     "ip-config:eth0.10", "network-port:eth0.20", "ip-config:eth0.20"));
+}
+
+HOST_TEST_F(KernelTree, EqualsWhatTheToolsTellOfABond) {
+    if (!hasKind(host, "link add bond0 type bond mode active-backup miimon 20")) {
+        GTEST_SKIP() << "this kernel has no bonds";
+    }
+    for (const std::string number : {"0", "1"}) {
+        wire(host, cable("eth" + number, "sw" + number));
+        wire(host, {"link set eth" + number + " down", "link set eth" + number + " master bond0"});
+    }
+    wire(host, {"link set bond0 up", "address add 10.2.0.1/24 broadcast + dev bond0"});
+    interfaceFile(host, "bond0", "SLAVE=yes\nMASTER=bond0\n");
+    std::this_thread::sleep_for(std::chrono::milliseconds(500));  // the driver looks at its members every 20
+    expectTreeAsTold(host);
+    EXPECT_THAT(names(KernelTold(host).nodes()),
+                UnorderedElementsAre("network-port:eth0", "ip-config:eth0", "network-port:eth1",
+                                     "ip-config:eth1", "ip-config:bond0", "team:bond0"));
+}
+
+}  // namespace
