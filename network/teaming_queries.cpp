@@ -17,6 +17,11 @@ namespace fs = std::filesystem;
 
 constexpr char kBonding[] = "/proc/net/bonding";
 
+/// As the commands below name it: a team called "/etc/x" is none of /etc.
+std::string statusFile(const std::string& team) {
+    return std::string(kBonding) + '/' + team;
+}
+
 /// The first line a command prints, without its line break; "" when it prints none.
 std::string answer(const std::optional<std::string>& command) {
     return trimEnd(firstLine(command).line.value_or(""));
@@ -33,7 +38,7 @@ std::string roleValue(const std::string& port, const char* key) {
 
 std::string activeMember(const std::string& team, const std::string& port) {
     std::error_code unreadable;
-    if (!fs::exists(fs::path(kBonding) / team, unreadable)) {
+    if (!fs::exists(statusFile(team), unreadable)) {
         return "";
     }
     // The search for eth1 also finds eth10: while eth10 is active, both ports say so. Readers have always
@@ -46,7 +51,7 @@ std::string activeMember(const std::string& team, const std::string& port) {
 /// The member's section, read without a tool. A `grep` that works line by line, as most do, can never match
 /// the two-line patterns of the commands below.
 parse::BondingMember sectionOf(const std::string& team, const std::string& port) {
-    const LineFile file = LineFile::read(fs::path(kBonding) / team).value_or(LineFile());
+    const LineFile file = LineFile::read(statusFile(team)).value_or(LineFile());
     return parse::bondingMember(file.lines(), port).value_or(parse::BondingMember());
 }
 

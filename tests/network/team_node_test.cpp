@@ -7,6 +7,7 @@
 #include "tests/support/command_lines.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/plugin_access.h"
+#include "tests/support/shell_stub.h"
 
 namespace {
 
@@ -176,6 +177,30 @@ HOST_TEST(TeamNodes, WithoutMembersStoreNone) {
         EXPECT_EQ(properties.count(kMode), isBond0 ? 1U : 0U);
         EXPECT_EQ(get(*node, kMembers), text("untouched"));
     }
+}
+
+HOST_TEST(TeamNodes, ThatCannotBeMadeAreLoggedAndTheOthersMade) {
+    for (const char* name : {"bond0", "bond1"}) {
+        installBond(host, name, "802.3ad");
+    }
+    Plugin plugin(host);
+    std::string broken;
+    shell_stub::beforeEach([&](const std::string& command) {
+        if (broken.empty() && command.find("Bonding Mode: ") != std::string::npos) {
+            broken = command.substr(std::string("cat /proc/net/bonding/").size(), 5);
+            throw std::runtime_error("out of luck");
+        }
+    });
+    LogCapture capture;
+    plugin.mi.createNetworkTeamingNodes();
+    shell_stub::beforeEach({});
+    EXPECT_THAT(capture.messages(6000), ElementsAre("NetworkTeaming node error"));
+    const auto teams = plugin.teams();
+    ASSERT_EQ(teams.size(), 2U);
+    EXPECT_EQ(get(*teams[0], kName), text(broken.c_str()));
+    EXPECT_EQ(stored(*teams[0]).count(kMode), 0U);
+    EXPECT_EQ(stored(*teams[1]).count(kMode), 1U);
+    EXPECT_EQ(teams[1]->getIndex(), 2U);
 }
 
 HOST_TEST(TeamNodes, AreNoneWithoutADriver) {

@@ -217,6 +217,17 @@ HOST_TEST(MemberHealth, IsTheMembersOwnInEveryDriverGeneration) {
     EXPECT_EQ(health("eth3"), "up 12");
 }
 
+HOST_TEST(MemberHealth, IsOfADriversFileWhateverTheTeamIsCalled) {
+    installBond(host, "bond0", "802.3ad");
+    host.file("/etc/bond0", *host.read("/proc/net/bonding/bond0") + "Currently Active Slave: eth1\n");
+    for (const unsigned int id : {194U, 195U, 196U}) {
+        EXPECT_EQ(ask("eth1", id, "/etc/bond0"), "");
+    }
+    const CommandLines commands;
+    ask("eth1", 194, "/etc/bond0");
+    EXPECT_THAT(commands.all(), IsEmpty()) << "the driver has no such file";
+}
+
 HOST_TEST(MemberHealth, IsEmptyForWhoIsNoMember) {
     installBond(host, "bond0", "active-backup-down");
     EXPECT_EQ(health("eth"), " ");
