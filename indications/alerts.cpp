@@ -1,6 +1,7 @@
 // What a pass tells the agent: one alert for each interface whose state is not what it was.
 #include <algorithm>
 
+#include "indications/contained.h"
 #include "indications/globals.h"
 #include "indications/link_state.h"
 #include "mi/log.h"
@@ -80,9 +81,13 @@ void OsHwMI::sendAlert(const Alert& alert) {
     if (handler == nullptr) {
         return;
     }
-    Error result = OSHWMI_IND::myerr;
-    result = handler({alert}, context);
-    logInd(kProgress) << "checkAndSendNetAlert: _alerthandler return code" << result;
+    const char* const function = __func__;  // in the closure it would be another
+    // An alert that went wrong is not sent again, and the next interface's goes out.
+    contained([&] {
+        Error result = OSHWMI_IND::myerr;
+        result = handler({alert}, context);
+        logInd(kProgress, function) << "checkAndSendNetAlert: _alerthandler return code" << result;
+    });
 }
 
 }  // namespace IC

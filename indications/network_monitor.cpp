@@ -1,8 +1,8 @@
 #include "indications/network_monitor.h"
 
 #include <memory>
-#include <typeinfo>
 
+#include "indications/contained.h"
 #include "indications/globals.h"
 #include "mi/globals.h"
 #include "mi/log.h"
@@ -36,13 +36,7 @@ void NetworkMonitor::stop() {
 void* NetworkMonitor::run(void*) {
     logInd(kProgress) << "NetworkMonitor: run entry";
     while (!ending()) {
-        try {
-            pass();
-        } catch (const std::exception& failure) {
-            logInd(kError) << "OsHwMIInd Caught " << failure.what();
-        } catch (...) {
-            logInd(kError) << "OsHwMIInd Caught unknown exception";
-        }
+        contained([this] { pass(); });
         OSHWMI_IND::slaves.clear();
         if (!ending()) {
             wake_.wait(kSecondsBetweenPasses);
@@ -75,21 +69,18 @@ void OsHwMI::enableIndications() {
             }
         }
     } atTheEnd;
-    try {
-        logInd(kProgress) << "Creating NetworkMonitor thread.";
+    const char* const function = __func__;  // in the closure it would be another
+    contained([this, function] {
+        logInd(kProgress, function) << "Creating NetworkMonitor thread.";
         networkMonitorEnded_.wait(0);  // an earlier monitor's end is not this one's
         auto monitor = std::make_unique<NetworkMonitor>(&networkMonitorEnded_);
         if (!monitor->start(nullptr)) {
-            logInd(kError) << "NetworkMonitor thread failed.";
+            logInd(kError, function) << "NetworkMonitor thread failed.";
             return;
         }
         networkMonitor_ = monitor.release();
-        logInd(kProgress) << "NetworkMonitor thread created.";
-    } catch (const std::exception& failure) {
-        logInd(kError) << "OsHwMIInd Caught " << failure.what() << " Type " << typeid(failure).name();
-    } catch (...) {
-        logInd(kError) << "OsHwMIInd Caught unknown exception";
-    }
+        logInd(kProgress, function) << "NetworkMonitor thread created.";
+    });
 }
 
 void OsHwMI::disableIndications() {

@@ -44,7 +44,7 @@ void OsHwMI::writePrevNetNodeMap() {
             file.setValue(QX::make_wstring(name), std::to_wstring(state));
         }
         file.close();
-    } catch (const std::exception&) {
+    } catch (...) {
         logInd(kError) << "OSHWMI_NET_IND_DAT_FILE: Exception in writing file";
     }
 }
@@ -62,7 +62,7 @@ void OsHwMI::readPrevNetNodeMap() {
         }
         file.close();
         OSHWMI_IND::datFileAvailable = true;
-    } catch (const std::exception&) {
+    } catch (...) {
         // The first start of all has no file: an empty map raises no alert.
         logInd(kProgress) << "OSHWMI_NET_IND_DAT_FILE: Not available";
         inventory_->previousStates.clear();

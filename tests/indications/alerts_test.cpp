@@ -31,6 +31,32 @@ struct Agent {
     unsigned char answer = 0;
 };
 
+/// Keeps what a node said when its alert came.
+struct Witness {
+    static IC::Error hear(const std::vector<IC::Alert>&, const void* context) {
+        auto* witness = const_cast<Witness*>(static_cast<const Witness*>(context));
+        witness->status = witness->node.getStatus();
+        witness->node.getProperty(123, witness->state);
+        return {};
+    }
+
+    InterfaceNode& node;
+    unsigned int status = 0;
+    IC::PropertyValue state = {};
+};
+
+/// An agent that throws at every alert: a number, then exceptions.
+struct BrokenAgent {
+    static IC::Error hear(const std::vector<IC::Alert>&, const void* context) {
+        if (++const_cast<BrokenAgent*>(static_cast<const BrokenAgent*>(context))->calls == 1) {
+            throw 7;
+        }
+        throw std::runtime_error("the agent is broken");
+    }
+
+    int calls = 0;
+};
+
 struct Change {
     unsigned int before, now;
     const char* message;
@@ -82,32 +108,49 @@ HOST_TEST(Alerts, TellAPortThatGoesDown) {
 
 HOST_TEST(Alerts, TellASwitchOverAndMarkTheNodeFirst) {
     expectAlert({1, 32, "NIC has Switched Over ", 1, 32, 1, 32});
+    OneChange change(1, 32);
+    Witness witness{change.node};
+    change.interfaces.mi().registerForAlerts(Witness::hear, &witness);
+    change.check();
+    EXPECT_EQ(witness.status, 1U);
+    EXPECT_EQ(witness.state, IC::PropertyValue(IC::Number(32U), true));
 }
 
 HOST_TEST(Alerts, TellASwitchBackUnderTheCodeOfASwitchOver) {
     expectAlert({1, 33, "NIC has Switched Back ", 1, 32, 1, 33});
 }
 
+/// A look that finds nothing to tell says no more than that it looked.
+const std::vector<std::string> kOneLook = {"checkAndSendNetAlert: entry", "Slaves Map Size : 0",
+                                           "Returning from checkAndSendNetAlert"};
+
 HOST_TEST(Alerts, AreNoneWithoutAChange) {
     OneChange change(12, 12);
+    LogCapture capture;
     change.check();
     EXPECT_THAT(change.agent.alerts, IsEmpty());
+    EXPECT_EQ(capture.ownMessages(3000), kOneLook);
 }
 
 HOST_TEST(Alerts, AreNoneForAPortSeenForTheFirstTimeOrGone) {
     OneChange change(1, 1);
     change.interfaces.previous() = {{"gone", 1}};
     change.interfaces.current() = {{"new", 12}};
+    LogCapture capture;
     change.check();
     EXPECT_THAT(change.agent.alerts, IsEmpty());
+    EXPECT_EQ(capture.ownMessages(3000), kOneLook);
 }
 
 HOST_TEST(Alerts, AreNoneForAnInterfaceWithoutANode) {
     OneChange change(1, 1);
     change.interfaces.previous() = {{"eth7", 1}};
     change.interfaces.current() = {{"eth7", 12}};
+    LogCapture capture;
     change.check();
     EXPECT_THAT(change.agent.alerts, IsEmpty());
+    EXPECT_THAT(capture.ownMessages(),
+                testing::Not(testing::Contains(testing::HasSubstr("entering switch case"))));
 }
 
 HOST_TEST(Alerts, AreNoneForAMemberOfABondWhateverItsState) {
@@ -117,7 +160,7 @@ HOST_TEST(Alerts, AreNoneForAMemberOfABondWhateverItsState) {
         LogCapture capture;
         change.check();
         EXPECT_THAT(change.agent.alerts, IsEmpty());
-        EXPECT_THAT(capture.ownMessages(),
+        EXPECT_THAT(capture.ownMessages(3000),
                     ElementsAre("checkAndSendNetAlert: entry", "Slaves Map Size : 2",
                                 "Slaves Found in the Map", "Returning from checkAndSendNetAlert"));
     }
@@ -130,7 +173,7 @@ HOST_TEST(Alerts, AreNoneForAnUnknownStateWhichIsLogged) {
         change.check();
         EXPECT_THAT(change.agent.alerts, IsEmpty());
         EXPECT_THAT(
-            capture.ownMessages(),
+            capture.ownMessages(3000),
             ElementsAre("checkAndSendNetAlert: entry", "Slaves Map Size : 0", "findNetworkPort: entry",
                         "findNetworkPort: exit", "OsHwMI::checkAndSendNetAlert() entering switch case",
                         "Unknown status: curitr->first= eth0", "Returning from checkAndSendNetAlert"));
@@ -159,6 +202,29 @@ HOST_TEST(Alerts, GoOnWhenTheAgentRefusesOne) {
     EXPECT_EQ(change.agent.alerts.size(), 2U);
     EXPECT_THAT(capture.ownMessages(),
                 testing::Contains("checkAndSendNetAlert: _alerthandler return codeagent's answer").Times(2));
+    EXPECT_THAT(capture.ownMessages(6000), IsEmpty());
+    for (const LogLine& line : capture.ownLines()) {
+        const bool ofTheLookUp = line.message.starts_with("findNetworkPort");
+        EXPECT_EQ(line.source, ofTheLookUp ? "OsHwMI_ix86" : "OsHwMIInd_ix86") << line.message;
+        EXPECT_EQ(line.component, ofTheLookUp ? "Corvista.IC.MI.OsHwMI" : "Corvista.IC.MI.OsHwMIInd");
+    }
+    EXPECT_TRUE(capture.everyLineTwice());
+}
+
+HOST_TEST(Alerts, GoOnWhenTheAgentThrows) {
+    OneChange change(12, 1);
+    change.interfaces.add("eth1", 1);
+    change.interfaces.previous()["eth1"] = 1;
+    change.interfaces.current()["eth1"] = 12;
+    BrokenAgent agent;
+    change.interfaces.mi().registerForAlerts(BrokenAgent::hear, &agent);
+    LogCapture capture;
+    change.check();
+    EXPECT_EQ(agent.calls, 2);
+    EXPECT_THAT(capture.ownMessages(6000),
+                ElementsAre("OsHwMIInd Caught unknown exception",
+                            "OsHwMIInd Caught the agent is broken Type St13runtime_error"));
+    EXPECT_THAT(capture.ownMessages(), testing::Not(testing::Contains(testing::HasSubstr("return code"))));
 }
 
 HOST_TEST(Alerts, AreNeitherSentNorLoggedWithoutACallback) {

@@ -2,6 +2,7 @@
 
 #include "indications/globals.h"
 #include "tests/indications/interfaces.h"
+#include "tests/support/command_lines.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"
@@ -56,6 +57,7 @@ HOST_TEST(LinkStates, PassOverANodeThatCannotBeRead) {
     interfaces.add("eth0", 1);
     auto* nameless = new IC::MutableNode(200, 1, {1}, 12, 1);
     IC::OsHwMITestAccess::addInterface(interfaces.mi(), "eth1", nameless);
+    nameless->setProperty(123, {IC::Number(1U), true});
     auto* stateless = new IC::MutableNode(201, 1, {1}, 12, 2);
     stateless->setProperty(108, {"eth2", true});
     IC::OsHwMITestAccess::addInterface(interfaces.mi(), "eth2", stateless);
@@ -63,6 +65,17 @@ HOST_TEST(LinkStates, PassOverANodeThatCannotBeRead) {
     odd.setProperty(123, {"not a number", true});
     interfaces.mi().createCurNetNodeMap();
     EXPECT_THAT(interfaces.current(), ElementsAre(Pair("eth0", 1)));
+}
+
+HOST_TEST(LinkStates, GoByTheNameThatTheNodeItselfGives) {
+    Interfaces interfaces;
+    interfaces.add("bond0", 1).setProperty(108, {"eth5", true});
+    interfaces.add("eth6", 12).setProperty(108, {"teambond6", true});
+    const CommandLines commands;
+    interfaces.mi().createCurNetNodeMap();
+    EXPECT_THAT(interfaces.current(), ElementsAre(Pair("eth5", 1), Pair("teambond6", 12)));
+    EXPECT_THAT(commands.all(), ElementsAre("cat /proc/net/bonding/teambond6 2> /dev/null | grep \"Slave "
+                                            "Interface: \" 2> /dev/null"));
 }
 
 HOST_TEST(LinkStates, OfABondAreItsOwnWhileNoMemberChanges) {
@@ -123,8 +136,9 @@ HOST_TEST(LinkStates, GatherTheMembersOfAllBonds) {
     LogCapture capture;
     bond.interfaces.mi().createCurNetNodeMap();
     EXPECT_THAT(IC::OSHWMI_IND::slaves, ElementsAre("eth0", "eth1", "eth7", "eth8"));
-    EXPECT_THAT(capture.ownMessages(),
+    EXPECT_THAT(capture.ownMessages(3000),
                 testing::IsSupersetOf({"Calling bondedNetNodeStatus() for bonded interface: bond0",
+                                       "bondedNetNodeStatus: entry",
                                        "OsHwMI::bondedNetNodeStatus - slaveInterface is: eth0",
                                        "OsHwMI::bondedNetNodeStatus - slaveInterface is: eth8",
                                        "Returning from bondedNetNodeStatus(). Status: 34"}));

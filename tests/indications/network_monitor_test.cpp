@@ -5,6 +5,8 @@
 #include <algorithm>
 #include <atomic>
 #include <chrono>
+#include <mutex>
+#include <optional>
 #include <thread>
 
 #include "tests/indications/heard.h"
@@ -60,6 +62,7 @@ std::vector<std::string> stopHeldUp(std::chrono::milliseconds delay) {
     EXPECT_TRUE(eventually([&] { return slow->asked(); }));
     LogCapture capture;
     interfaces.mi().disableIndications();
+    EXPECT_EQ(capture.ownMessages(3000), capture.ownMessages());
     return capture.ownMessages();
 }
 
@@ -148,8 +151,8 @@ HOST_TEST(NetworkMonitor, StopsAtOnceInTheMiddleOfItsWait) {
                     "NetworkMonitor::stop: exit", "eventThreadNetIndicationsThread terminated.",
                     "NetworkMonitor::~NetworkMonitor: entry", "NetworkMonitor::~NetworkMonitor: exit",
                     "disableIndications: exit"));
-    EXPECT_THAT(capture.messages(), Contains("NetworkMonitor: run entry"));
-    EXPECT_THAT(capture.messages(), Contains("NetworkMonitor: run exit"));
+    EXPECT_THAT(capture.messages(3000), Contains("NetworkMonitor: run entry"));
+    EXPECT_THAT(capture.messages(3000), Contains("NetworkMonitor: run exit"));
 }
 
 HOST_TEST(NetworkMonitor, IsAbortedInTheMiddleOfACommandAndReportsNothingOfThatPass) {
@@ -231,26 +234,91 @@ HOST_TEST(NetworkMonitor, ThatCannotBeMadeIsLoggedWithTheReason) {
                             "OsHwMIInd Caught unknown exception", "enableIndications: exit"));
 }
 
-IC::Error throwAnything(const std::vector<IC::Alert>&, const void* calls) {
-    if (++*const_cast<std::atomic<int>*>(static_cast<const std::atomic<int>*>(calls)) == 1) {
-        throw 7;
+/// An interface that throws when it is asked: a number, then exceptions.
+class ThrowingNode : public IC::MutableNode {
+public:
+    ThrowingNode() : MutableNode(300, 1, {1}, 12, 0) {}
+    IC::Error getProperty(unsigned int, IC::PropertyValue&) const override {
+        if (++calls_ == 1) {
+            throw 7;
+        }
+        throw std::runtime_error("the host is broken");
     }
-    throw std::runtime_error("the agent is broken");
-}
+    int calls() const { return calls_; }
+
+private:
+    mutable std::atomic<int> calls_{0};
+};
 
 HOST_TEST(NetworkMonitor, GoesOnWhateverAPassThrows) {
     QX::setClockSpeed(1000);
+    Interfaces interfaces;
+    auto* broken = new ThrowingNode;
+    IC::OsHwMITestAccess::addInterface(interfaces.mi(), "eth0", broken);
+    LogCapture capture;
+    interfaces.mi().enableIndications();
+    EXPECT_TRUE(eventually([&] { return broken->calls() >= 3; }));
+    interfaces.mi().disableIndications();
+    EXPECT_THAT(capture.messages(6000), Contains("OsHwMIInd Caught unknown exception").Times(1));
+    EXPECT_THAT(capture.messages(6000),
+                Contains("OsHwMIInd Caught the host is broken Type St13runtime_error"));
+}
+
+/// The state file as it stood when the first alert came.
+struct FileAtTheAlert {
+    const FakeHost& host;
+    std::mutex guard = {};
+    std::optional<std::string> content = {};
+
+    static IC::Error hear(const std::vector<IC::Alert>&, const void* context) {
+        auto* file = const_cast<FileAtTheAlert*>(static_cast<const FileAtTheAlert*>(context));
+        const std::lock_guard lock(file->guard);
+        file->content = file->content ? file->content : file->host.read(kFile);
+        return {};
+    }
+    std::optional<std::string> now() {
+        const std::lock_guard lock(guard);
+        return content;
+    }
+};
+
+HOST_TEST(NetworkMonitor, KeepsANewStateOnlyWhenTheAgentHasBeenTold) {
     host.file(kFile, "eth0=12\n");
     Interfaces interfaces;
     interfaces.add("eth0", 1);
-    std::atomic<int> calls{0};
-    interfaces.mi().registerForAlerts(throwAnything, &calls);
-    LogCapture capture;
+    FileAtTheAlert file{host};
+    interfaces.mi().registerForAlerts(FileAtTheAlert::hear, &file);
     interfaces.mi().enableIndications();
-    EXPECT_TRUE(eventually([&] { return calls >= 3; }));
+    ASSERT_TRUE(eventually([&] { return host.read(kFile) == "eth0=1\n"; }));
     interfaces.mi().disableIndications();
-    EXPECT_THAT(capture.messages(6000), Contains("OsHwMIInd Caught unknown exception").Times(1));
-    EXPECT_THAT(capture.messages(6000), Contains("OsHwMIInd Caught the agent is broken"));
+    EXPECT_EQ(file.now(), "eth0=12\n");
+}
+
+HOST_TEST(NetworkMonitor, TellsAChangeAgainThatItCannotKeep) {
+    host.file(kFile, "eth0=12\n");
+    host.readOnly("/opt/vantrel/corvista/data");
+    QX::setClockSpeed(1000);
+    Interfaces interfaces;
+    interfaces.add("eth0", 1);
+    Heard heard;
+    interfaces.mi().registerForAlerts(Heard::hear, &heard);
+    interfaces.mi().enableIndications();
+    EXPECT_TRUE(eventually([&] { return heard.now().size() >= 2; }));
+    interfaces.mi().disableIndications();
+    EXPECT_THAT(heard.now(), testing::Each("NIC is Online "));
+}
+
+HOST_TEST(NetworkMonitor, WakesWhenItIsAskedToStop) {
+    Interfaces interfaces;
+    QX::Event ended(true);
+    IC::NetworkMonitor monitor(&ended);
+    LogCapture capture;
+    ASSERT_TRUE(monitor.start(nullptr));
+    ASSERT_TRUE(eventually([&] { return !capture.messages(6000).empty(); })) << "the first pass is over";
+    EXPECT_FALSE(monitor.isDone());
+    monitor.stop();
+    EXPECT_TRUE(eventually([&] { return monitor.isDone(); })) << "without an abort";
+    EXPECT_TRUE(ended.wait(5));
 }
 
 HOST_TEST(NetworkMonitor, StoppedBeforeItRunsDoesNoPass) {

@@ -8,6 +8,7 @@
 
 #include "indications/globals.h"
 #include "tests/indications/interfaces.h"
+#include "tests/support/failing_new.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 
@@ -17,6 +18,8 @@ using testing::ElementsAre;
 using testing::IsEmpty;
 using testing::Pair;
 
+/// What an entry of a property file takes of the heap.
+constexpr std::size_t kEntrySize = sizeof(std::_Rb_tree_node<std::pair<const std::wstring, std::wstring>>);
 constexpr char kFile[] = "/opt/vantrel/corvista/data/oshwminetind.dat";
 
 HOST_TEST(StateFile, OfTheFirstPassHoldsOneLineForEachPort) {
@@ -33,7 +36,7 @@ HOST_TEST(StateFile, OfTheFirstPassHoldsOneLineForEachPort) {
     interfaces.mi().createCurNetNodeMap();
     interfaces.mi().writePrevNetNodeMap();
     EXPECT_EQ(host.read(kFile), "eth0=1\neth1=12\n");
-    EXPECT_THAT(capture.ownMessages(),
+    EXPECT_THAT(capture.ownMessages(3000),
                 testing::IsSupersetOf({"readPrevNetNodeMap: entry", "OSHWMI_NET_IND_DAT_FILE: Not available",
                                        "readPrevNetNodeMap: exit", "writePrevNetNodeMap: entry",
                                        "writePrevNetNodeMap: exit"}));
@@ -43,7 +46,8 @@ HOST_TEST(StateFile, OfTheFirstPassHoldsOneLineForEachPort) {
 HOST_TEST(StateFile, IsReadBackAsItWasWritten) {
     host.directory("/opt/vantrel/corvista/data");
     Interfaces interfaces;
-    interfaces.current() = {{"bond0", 32}, {"eth0.10", 1}, {"eth0", 4294967295U}};
+    interfaces.current() = {
+        {"bond0", 32}, {"eth0.10", 1}, {"eth0", 4294967295U}, {"\xc3\xa4=\\", 12}, {"\xff", 33}};
     interfaces.mi().writePrevNetNodeMap();
     interfaces.mi().readPrevNetNodeMap();
     EXPECT_EQ(interfaces.previous(), interfaces.current());
@@ -61,6 +65,7 @@ HOST_TEST(StateFile, KeepsTheKeysOfInterfacesThatHaveDisappeared) {
 HOST_TEST(StateFile, LosesADamagedLineAlone) {
     host.file(kFile, "eth0=1\nrubbish\neth1=twelve\neth2=12x\neth3=\neth4=33\n");
     Interfaces interfaces;
+    interfaces.previous() = {{"eth8", 1}};
     interfaces.mi().readPrevNetNodeMap();
     EXPECT_THAT(interfaces.previous(), ElementsAre(Pair("eth0", 1), Pair("eth4", 33)));
     EXPECT_TRUE(IC::OSHWMI_IND::datFileAvailable);
@@ -73,6 +78,28 @@ HOST_TEST(StateFile, StandsInTheDataDirectoryOfTheAgent) {
     interfaces.current() = {{"eth0", 1}};
     interfaces.mi().writePrevNetNodeMap();
     EXPECT_EQ(host.read("/var/lib/agent/oshwminetind.dat"), "eth0=1\n");
+}
+
+HOST_TEST(StateFile, IsDoneWithoutWhateverReadingAndWritingItThrow) {
+    host.file(kFile, "eth0=12\n");
+    Interfaces interfaces;
+    interfaces.current() = {{"eth0", 1}};
+    interfaces.previous() = {{"eth0", 1}};
+    IC::OSHWMI_IND::datFileAvailable = true;
+    LogCapture capture;
+    {
+        const FailingNew none(kEntrySize, [] { throw 7; });
+        interfaces.mi().readPrevNetNodeMap();
+        interfaces.mi().writePrevNetNodeMap();
+    }
+    EXPECT_THAT(interfaces.previous(), IsEmpty());
+    EXPECT_FALSE(IC::OSHWMI_IND::datFileAvailable);
+    EXPECT_THAT(
+        capture.ownMessages(),
+        ElementsAre("readPrevNetNodeMap: entry", "OSHWMI_NET_IND_DAT_FILE: Not available",
+                    "readPrevNetNodeMap: exit", "writePrevNetNodeMap: entry",
+                    "OSHWMI_NET_IND_DAT_FILE: Exception in writing file", "writePrevNetNodeMap: exit"));
+    EXPECT_EQ(host.read(kFile), "eth0=12\n");
 }
 
 HOST_TEST(StateFile, IsDoneWithoutWhenThereIsNoDataDirectory) {

@@ -1,0 +1,23 @@
+#pragma once
+
+#include <exception>
+#include <typeinfo>
+
+#include "mi/log.h"
+
+namespace IC {
+
+/// Runs work that others have a hand in: what it throws is logged and goes no further.
+template <class Work>
+void contained(Work work, const char* function = __builtin_FUNCTION()) {
+    try {
+        work();
+    } catch (const std::exception& failure) {
+        logInd(kError, function) << "OsHwMIInd Caught " << failure.what() << " Type "
+                                 << typeid(failure).name();
+    } catch (...) {
+        logInd(kError, function) << "OsHwMIInd Caught unknown exception";
+    }
+}
+
+}  // namespace IC
