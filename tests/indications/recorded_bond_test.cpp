@@ -46,26 +46,22 @@ private:
 
 HOST_TEST(RecordedBond, TellsOfItsOwnFailOverAndNothingOfItsMembers) {
     BondHost links(host);
+    links.bond().setStatus(12);
     links.link("eth0", "no");
     EXPECT_THAT(links.told(), ElementsAre("NIC has Switched Over "));
     EXPECT_EQ(host.read(kFile), "bond0=32\neth0=12\neth1=1\n");
+    EXPECT_EQ(links.bond().getStatus(), 1U);
+    EXPECT_EQ(PortHost::stored(links.bond(), 123), number(32));
+    EXPECT_EQ(PortHost::live(links.bond(), 123), number(1)) << "that is for the host to say";
     EXPECT_THAT(links.told(), ElementsAre("NIC is Online ")) << "the bond itself was up all the time";
     EXPECT_THAT(links.told(), IsEmpty());
     links.link("eth0", "yes");
     EXPECT_THAT(links.told(), ElementsAre("NIC has Switched Back "));
     EXPECT_EQ(host.read(kFile), "bond0=33\neth0=1\neth1=1\n");
-}
-
-HOST_TEST(RecordedBond, IsMarkedAndNotTouchedWhenItSwitchesOver) {
-    BondHost links(host);
-    links.bond().setStatus(12);
-    links.link("eth1", "no");
-    EXPECT_THAT(links.told(), ElementsAre("NIC has Switched Over "));
-    EXPECT_EQ(links.bond().getStatus(), 1U);
-    EXPECT_EQ(PortHost::stored(links.bond(), 123), number(32));
-    EXPECT_EQ(PortHost::live(links.bond(), 123), number(1)) << "that is for the host to say";
-    EXPECT_THAT(host.callsOf("ifconfig"), testing::Not(testing::Contains("ifconfig bond0 up")));
-    EXPECT_THAT(host.callsOf("ifconfig"), testing::Not(testing::Contains("ifconfig bond0 down")));
+    for (const std::string& call : host.callsOf("ifconfig")) {
+        EXPECT_TRUE(call == "ifconfig" || call == "ifconfig bond0")
+            << "nothing is taken up or down: " << call;
+    }
 }
 
 }  // namespace
