@@ -92,13 +92,16 @@ int eachMessage(std::string_view datagram, const MessageVisitor& visit, bool& do
     return error;
 }
 
-Netlink::Netlink() : socket_(socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC, NETLINK_ROUTE)) {
+Netlink::Netlink()
+    : socket_(socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC, NETLINK_ROUTE)),
+      problem_(socket_.valid() ? 0 : errno) {
     // Lets a request for addresses name a link.
     const int on = 1;
     setsockopt(socket_.get(), SOL_NETLINK, NETLINK_GET_STRICT_CHK, &on, sizeof on);
 }
 
 int Netlink::ask(std::string_view request, const MessageVisitor& visit) {
+    if (problem_ != 0) return problem_;
     if (send(socket_.get(), request.data(), request.size(), 0) < 0) return errno;
     const auto buffer = std::make_unique_for_overwrite<char[]>(datagramBytes);
     int result = 0;

@@ -64,6 +64,7 @@ private:
     int ask(std::string_view request, const MessageVisitor& visit);
 
     Descriptor socket_;
+    int problem_;  ///< why there is no socket, or 0
 };
 
 }  // namespace hosttools

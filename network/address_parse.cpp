@@ -20,18 +20,8 @@ bool isAutoconfigured(const std::string& line) {
 
 unsigned int addressKind(const std::string& scope) {
     // The word is compared as it came from the pipeline, line break and all, so that every scope gives 5.
-    // Management stations have always been told 5 for an interface with IPv6 alone: neither trim the word
-    // nor turn the comparisons round.
-    if (scope != "Link") {
-        return 5;
-    }
-    if (scope != "Global") {
-        return 6;
-    }
-    if (scope != "Site") {
-        return 8;
-    }
-    return scope == "Host" ? 2 : 3;
+    // Management stations have always been told 5 for an interface with IPv6 alone: do not trim the word.
+    return scope == "Link" ? 6 : 5;
 }
 
 std::optional<std::string> gatewayField(const std::string& line) {

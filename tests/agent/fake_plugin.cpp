@@ -2,7 +2,11 @@
 // throwing, and threads that publish, withdraw and alert. FAKE_PLUGIN, a list of words, tells it what to do
 // besides:
 //   fail, null, throw       OpenMI returns 7, hands out nothing, throws
+//   throwseven              OpenMI throws what is no exception
 //   badstart, throwstart    initialize fails, throws
+//   throwstop, sevenstop    unload throws, throws what is no exception
+//   find                    initialize asks the agent for nodes by name and hands it a node of another make
+//   manyerrors              initialize logs sixty different errors
 //   slow                    initialize takes half a second
 //   errors                  initialize logs errors
 //   churn                   a thread publishes and withdraws drives until unload
@@ -14,6 +18,7 @@
 #include <chrono>
 #include <cstdlib>
 #include <fstream>
+#include <map>
 #include <stdexcept>
 #include <string>
 #include <thread>
@@ -44,7 +49,8 @@ void logError(const std::string& message) {
     CVLog::CVLogger::traceLevelMessage("fake", "fake_plugin", 1, component, 6000, nullptr, 0, 0, message);
 }
 
-/// 900 is slow, 901 fails and logs, 902 throws; 115 writes with an error line, 116 does not write.
+/// 900 is slow, 901 fails and logs, 902 throws, 903 throws what is no exception; 115 writes with an error
+/// line, 116 does not write. Writing "throw" or "seven" throws.
 class FakeNode : public IC::MutableNode {
 public:
     using MutableNode::MutableNode;
@@ -60,6 +66,8 @@ public:
                 return {1, Number(), "the host does not answer"};
             case 902:
                 throw std::runtime_error("thrown by the plug-in");
+            case 903:
+                throw 7;
             default:
                 return MutableNode::getProperty(id, out);
         }
@@ -69,6 +77,12 @@ public:
             return MutableNode::setProperty(id, value);
         }
         note(std::to_string(id) + "=" + static_cast<std::string>(value));
+        if (value == PropertyValue("throw", true)) {
+            throw std::runtime_error("thrown while writing");
+        }
+        if (value == PropertyValue("seven", true)) {
+            throw 7;
+        }
         if (id == 115) {
             logError("the disk is nearly full");
         }
@@ -82,8 +96,26 @@ public:
 };
 std::atomic<bool> FakeNode::ready{false};
 
+/// A node that an agent has not made its own.
+class ForeignNode : public IC::Node {
+public:
+    unsigned int getStatus() const override { return 1; }
+    std::string getDescription() const override { return "foreign"; }
+    Error getProperty(unsigned int, PropertyValue&) const override { return {}; }
+    Error getProperties(std::map<unsigned int, PropertyValue>&) const override { return {}; }
+    Error setProperty(const unsigned int&, const PropertyValue&) override { return {}; }
+    operator std::string() const override { return "foreign"; }
+};
+
 class FakeInterface : public IC::ManagementInterface {
 public:
+    void setLoadCallBack(IC::LoadCallBack load, const void* context, IC::FindCallBack find) override {
+        load_ = load;
+        context_ = context;
+        find_ = find;
+        ManagementInterface::setLoadCallBack(load, context, find);
+    }
+
     Error initialize(unsigned int miId, const Number& ownNodeId, const Number& firstNodeId) override {
         note("initialize " + std::to_string(miId) + " " + ownNodeId.toString() + " " +
              firstNodeId.toString());
@@ -95,6 +127,12 @@ public:
         if (told("slow")) {
             note("slow");
             std::this_thread::sleep_for(std::chrono::milliseconds(500));
+        }
+        if (told("find")) {
+            askTheAgent();
+        }
+        for (int i = 0; told("manyerrors") && i < 60; ++i) {
+            logError("error " + std::to_string(i));
         }
         if (told("errors")) {
             logError("first error");
@@ -130,7 +168,14 @@ public:
         }
         FakeNode::ready = false;
         note("unload");
-        return ManagementInterface::unload();
+        const Error result = ManagementInterface::unload();
+        if (told("throwstop")) {
+            throw std::runtime_error("cannot stop");
+        }
+        if (told("sevenstop")) {
+            throw 7;
+        }
+        return result;
     }
 
     /// What the exported builder makes: one processor.
@@ -185,6 +230,16 @@ private:
         add(ip);
     }
 
+    void askTheAgent() {
+        for (const std::string name : {"hard-drive:sda", "nowhere"}) {
+            IC::Node* node = nullptr;
+            const Error result = find_(name, &node);
+            note(name + ": " + (node != nullptr ? node->getDescription() : result.text()));
+        }
+        ForeignNode foreign;
+        note("foreign: " + load_(&foreign, context_).text());
+    }
+
     void churn() {
         while (running_) {
             FakeNode* drive = makeDrive("/dev/sdb");
@@ -205,6 +260,9 @@ private:
         }
     }
 
+    IC::LoadCallBack load_ = nullptr;
+    const void* context_ = nullptr;
+    IC::FindCallBack find_ = nullptr;
     unsigned int planar_ = 0;
     unsigned int disks_ = 0;
     std::atomic<bool> running_{false};
@@ -220,6 +278,9 @@ Error fakeError;
 extern "C" __attribute__((visibility("default"))) int OpenMI(IC::ManagementInterface** mi, Error** error) {
     if (told("throw")) {
         throw std::runtime_error("not today");
+    }
+    if (told("throwseven")) {
+        throw 7;
     }
     if (told("fail")) {
         fakeError = Error(1, Number(), "not licensed");

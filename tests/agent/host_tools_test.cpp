@@ -1,8 +1,13 @@
 #include "agent/host_tools.h"
 
 #include <gmock/gmock.h>
+#include <sys/resource.h>
+#include <sys/time.h>
+#include <sys/wait.h>
 
+#include <csignal>
 #include <cstdlib>
+#include <nlohmann/json.hpp>
 
 #include "agent/probe.h"
 #include "tests/support/fake_host.h"
@@ -134,6 +139,34 @@ HOST_TEST(Probe, KillsAProgramThatTakesTooLong) {
     EXPECT_FALSE(probe.finish(std::chrono::milliseconds(100)));
 }
 
+HOST_TEST(Probe, KillsAProgramThatNobodyWaitsFor) {
+    const auto start = std::chrono::steady_clock::now();
+    { const cvagent::Probe probe({"/usr/bin/sleep", "60"}); }
+    EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(30));
+    EXPECT_EQ(waitpid(-1, nullptr, WNOHANG), -1) << "a child is left";
+}
+
+HOST_TEST(Probe, GoesOnWaitingAfterASignal) {
+    signal(SIGALRM, [](int) {});
+    const itimerval often{{0, 10000}, {0, 10000}};
+    setitimer(ITIMER_REAL, &often, nullptr);
+    cvagent::Probe probe({"/bin/sh", "-c", "sleep 0.3; echo done"});
+    EXPECT_TRUE(probe.finish(std::chrono::seconds(60)));
+    EXPECT_EQ(probe.output(), "done\n");
+    const itimerval never{};
+    setitimer(ITIMER_REAL, &never, nullptr);
+}
+
+HOST_TEST(Probe, WithoutADescriptorIsNoSuccess) {
+    const rlimit none{0, 1024};
+    setrlimit(RLIMIT_NOFILE, &none);
+    cvagent::Probe probe({"/usr/bin/true"});
+    const rlimit some{1024, 1024};
+    setrlimit(RLIMIT_NOFILE, &some);
+    EXPECT_FALSE(probe.finish(std::chrono::milliseconds(100)));
+    EXPECT_EQ(probe.output(), "");
+}
+
 HOST_TEST(Probe, AMissingProgramIsNoSuccess) {
     cvagent::Probe probe({"/nowhere"});
     EXPECT_FALSE(probe.finish(std::chrono::milliseconds(100)));
@@ -151,6 +184,30 @@ HOST_TEST(Doctor, TellsWhatIsFoundUsedAndMissing) {
                 testing::ContainsRegex("\nbrctl +not found +missing: .*install the package bridge-utils\n"));
     EXPECT_THAT(run.out, testing::HasSubstr("apt-get install bridge-utils ethtool"));
     EXPECT_FALSE(host.exists("/opt/vantrel"));
+}
+
+HOST_TEST(Doctor, TellsWhichAdaptersAreUsed) {
+    const Finished run = host.run({CVAGENT_PROGRAM, "doctor", "--host-tools", "classic"});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.out, testing::ContainsRegex("\nroute +not found +our adapter /.*/route\n"));
+}
+
+HOST_TEST(Doctor, SpeaksJson) {
+    host.tool("ifconfig lo", kModernIfconfig);
+    const Finished run = host.run({CVAGENT_PROGRAM, "doctor", "--host-tools", "native", "--json"});
+    ASSERT_EQ(run.status, 0) << run.err;
+    std::map<std::string, nlohmann::json> tools;
+    for (const auto& tool : nlohmann::json::parse(run.out)) {
+        tools[tool["tool"]] = tool;
+    }
+    EXPECT_EQ(tools["ifconfig"]["host"], "/tools/ifconfig");
+    EXPECT_EQ(tools["ifconfig"]["used"], "/tools/ifconfig");
+    EXPECT_EQ(tools["ifconfig"]["classic"], false);
+    EXPECT_EQ(tools["brctl"]["host"], nullptr);
+    EXPECT_EQ(tools["brctl"]["adapter"], nullptr);
+    EXPECT_EQ(tools["brctl"]["used"], nullptr);
+    EXPECT_EQ(tools["brctl"]["package"], "bridge-utils");
+    EXPECT_NE(tools["brctl"]["purpose"], "");
 }
 
 }  // namespace

@@ -61,6 +61,8 @@ TEST(Json, EveryKindHasItsForm) {
               R"({"name":"5","kind":"numbers","value":[0,12]})");
     EXPECT_EQ(written(PropertyValue()).dump(), R"({"name":"5","kind":"none","value":null})");
     EXPECT_EQ(written({PropertyValue::text, true}).dump(), R"({"name":"5","kind":"text","value":null})");
+    EXPECT_EQ(written({PropertyValue::number, true}).dump(), R"({"name":"5","kind":"number","value":null})");
+    EXPECT_EQ(written({std::vector<Number>{Number(), Number(1U)}, true})["value"].dump(), "[null,1]");
     EXPECT_EQ(written({std::vector<std::string>(), true})["value"].dump(), "[]");
 }
 

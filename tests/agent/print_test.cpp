@@ -65,6 +65,18 @@ TEST(Print, UncataloguedValuesAreShownPlainly) {
     EXPECT_EQ(valueText({}, {std::vector<std::string>{"a", "b"}, true}), "a, b");
 }
 
+TEST(Print, WhatDoesNotFitItsUnitIsShownPlainly) {
+    const PropertyValue large(Number(1e30), true);
+    EXPECT_EQ(shown(11, 37, large), static_cast<std::string>(large));
+}
+
+TEST(Print, ATimeThatHasNoYearIsShownInSeconds) {
+    if (sizeof(std::time_t) < 8) {
+        GTEST_SKIP() << "every time that this system counts has a year";
+    }
+    EXPECT_EQ(cvagent::timeText(std::numeric_limits<std::time_t>::max()), "9223372036854775807 s since 1970");
+}
+
 TEST(Print, NamesFromTheHostCannotSteerTheTerminal) {
     EXPECT_EQ(printable("a\x1b[2Jb\n\x7f"), "a\\x1b[2Jb\\x0a\\x7f");
     EXPECT_EQ(printable("\u009b2J"),

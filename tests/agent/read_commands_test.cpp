@@ -6,6 +6,7 @@
 
 #include "agent/reading.h"
 #include "tests/agent/cvagent_run.h"
+#include "tests/support/no_threads.h"
 
 namespace {
 
@@ -63,6 +64,23 @@ HOST_TEST(TreeCommand, ShowsWhatThePluginReportsWhileItStarts) {
               "cvagent: the plug-in reports: second error [fake] (2 times)\n");
 }
 
+HOST_TEST(TreeCommand, ShowsTheFirstFiftyErrorsAndHowManyMoreThereAre) {
+    const Finished run = CvagentRun(host).telling("manyerrors")({"tree"});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.err, StartsWith("cvagent: the plug-in reports: error 0 [fake]\n"));
+    EXPECT_THAT(run.err, testing::EndsWith("cvagent: the plug-in reports: error 49 [fake]\n"
+                                           "cvagent: the plug-in reports: and 10 more; --log FILE keeps them "
+                                           "all\n"));
+}
+
+HOST_TEST(TreeCommand, AnswersThePluginThatAsksForNodes) {
+    CvagentRun cvagent(host);
+    EXPECT_EQ(cvagent.telling("find")({"tree"}).status, 0);
+    EXPECT_THAT(cvagent.diary(), HasSubstr("\nhard-drive:sda: Hard Drive\n"));
+    EXPECT_THAT(cvagent.diary(), HasSubstr("\nnowhere: there is no node 'nowhere'"));
+    EXPECT_THAT(cvagent.diary(), HasSubstr("\nforeign: not a node of the framework\n"));
+}
+
 HOST_TEST(TreeCommand, HandsThePluginItsNumbers) {
     CvagentRun cvagent(host);
     cvagent({"tree"});
@@ -101,6 +119,12 @@ HOST_TEST(GetCommand, WhatThePluginThrowsIsAFailedRead) {
     EXPECT_EQ(run.status, 1);
     EXPECT_EQ(Json::parse(run.out)["properties"].dump(),
               R"({"902":{"name":"902","kind":"none","error":"the plug-in threw: thrown by the plug-in"}})");
+}
+
+HOST_TEST(GetCommand, WhatIsThrownWithoutATextIsAFailedRead) {
+    const Finished run = CvagentRun(host)({"get", "computer", "903"});
+    EXPECT_EQ(run.status, 1);
+    EXPECT_THAT(run.out, HasSubstr("not known (the plug-in threw an unknown exception)\n"));
 }
 
 HOST_TEST(GetCommand, PrintsOneNodeAsJsonInTheOrderAskedFor) {
@@ -154,6 +178,15 @@ TEST(Reading, ReadsGoSideBySideAndKeepTheirOrder) {
         ids.push_back(static_cast<unsigned int>(reading.value));
     }
     EXPECT_THAT(ids, testing::ElementsAre(7, 3, 5, 1));
+}
+
+TEST(Reading, WithoutMoreThreadsOneReadsAll) {
+    const IC::MutableNode node(1, 0, {1}, 40, 0);
+    const NoThreads none;
+    const auto readings = cvagent::readProperties(node, {7, 3, 5});
+    ASSERT_EQ(readings.size(), 3U);
+    EXPECT_EQ(readings[0].error, "no such property: 7");
+    EXPECT_EQ(readings[2].error, "no such property: 5");
 }
 
 HOST_TEST(PropertiesCommand, ListsAllClassesWithoutThePlugin) {

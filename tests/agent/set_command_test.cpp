@@ -36,6 +36,26 @@ HOST_TEST(SetCommand, AFailedWriteEndsWithStatusOne) {
     EXPECT_EQ(run.err, "cvagent: OwnerName was not changed: the disk is full\n");
 }
 
+HOST_TEST(SetCommand, WhatThePluginThrowsIsAFailedWrite) {
+    CvagentRun cvagent(host);
+    const Finished thrown = cvagent({"set", "computer", "OwnerContact", "throw"});
+    EXPECT_EQ(thrown.status, 1);
+    EXPECT_EQ(thrown.err, "cvagent: OwnerContact was not changed: the plug-in threw: thrown while writing\n");
+    const Finished other = cvagent({"set", "computer", "OwnerContact", "seven"});
+    EXPECT_EQ(other.status, 1);
+    EXPECT_EQ(other.err, "cvagent: OwnerContact was not changed: the plug-in threw an unknown exception\n");
+    EXPECT_THAT(cvagent.diary(), EndsWith("115=seven\nunload\n"));
+}
+
+HOST_TEST(SetCommand, ALongListThatIsRefusedIsCutShortInTheMessage) {
+    std::vector<std::string> words = {"set", "ip-config:eth0", "DNSServers"};
+    words.resize(40, "dns.example.com");
+    const Finished run = CvagentRun(host)(words);
+    EXPECT_EQ(run.status, 4);
+    EXPECT_THAT(run.err, HasSubstr("'dns.example.com' 'dns.example.com' and more"));
+    EXPECT_LT(run.err.size(), 500U);
+}
+
 HOST_TEST(SetCommand, TakesListsAsSeveralWords) {
     CvagentRun cvagent(host);
     const Finished run = cvagent({"set", "ip-config:eth0", "DNSServers", "192.0.2.1", "2001:db8::1"});

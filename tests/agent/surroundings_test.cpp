@@ -1,11 +1,17 @@
 // The command line, the data directory, the log files, broken plug-ins.
+#include <fcntl.h>
 #include <gmock/gmock.h>
+#include <poll.h>
 #include <signal.h>
+#include <sys/mount.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <filesystem>
 #include <set>
 
+#include "agent/signals.h"
 #include "agent/surroundings.h"
 #include "tests/agent/cvagent_run.h"
 #include "tests/agent/terminal.h"
@@ -121,6 +127,34 @@ HOST_TEST(DataDirectory, ThatCannotBeMadeIsNamed) {
     EXPECT_THAT(empty.err, HasSubstr("CORVISTA_DATA_DIR is empty"));
 }
 
+HOST_TEST(QuietCommands, LeaveStandardErrorAloneWhereThereIsNothingToSendItTo) {
+    ASSERT_EQ(umount2("/dev/null", MNT_DETACH), 0);
+    host.remove("/dev/null");
+    const cvagent::QuietCommands quiet;
+    EXPECT_EQ(cvagent::messageDescriptor(), STDERR_FILENO);
+    EXPECT_EQ(open("/dev/null", O_WRONLY | O_CLOEXEC), -1);
+}
+
+HOST_TEST(StopSignals, AreRememberedOnceTheyAreInstalled) {
+    using cvagent::StopSignals;
+    const rlimit none{0, 1024};
+    setrlimit(RLIMIT_NOFILE, &none);
+    StopSignals::install();
+    EXPECT_EQ(StopSignals::descriptor(), -1);
+    const rlimit some{1024, 1024};
+    setrlimit(RLIMIT_NOFILE, &some);
+    StopSignals::install();
+    const int descriptor = StopSignals::descriptor();
+    EXPECT_GE(descriptor, 0);
+    StopSignals::install();
+    EXPECT_EQ(StopSignals::descriptor(), descriptor);
+    EXPECT_EQ(StopSignals::received(), 0);
+    raise(SIGHUP);
+    EXPECT_EQ(StopSignals::received(), SIGHUP);
+    pollfd ready{descriptor, POLLIN, 0};
+    EXPECT_EQ(poll(&ready, 1, 0), 1);
+}
+
 TEST(WithoutRoot, SaysWhatWillBeMissingAndUsesTheHome) {
     const std::filesystem::path home =
         std::filesystem::temp_directory_path() / ("cvagent-home-" + std::to_string(getpid()));
@@ -184,6 +218,7 @@ HOST_TEST(BrokenPlugins, EachHaveAMessageOfTheirOwn) {
     expect(CvagentRun(host).telling("fail"), "refused to start: OpenMI returned 7 (not licensed)");
     expect(CvagentRun(host).telling("null"), "is broken: its OpenMI returned no interface");
     expect(CvagentRun(host).telling("throw"), "threw an exception: not today");
+    expect(CvagentRun(host).telling("throwseven"), "threw an unknown exception");
     expect(CvagentRun(host).telling("badstart"), "did not initialize: no host here");
     expect(CvagentRun(host).telling("throwstart"), "threw an exception: cannot start");
 }
@@ -202,6 +237,17 @@ HOST_TEST(Plugins, ThatAreNotBesideTheProgramAreMissed) {
     EXPECT_EQ(run.status, 1);
     EXPECT_THAT(run.err, HasSubstr("there is no plug-in file 'libvantrelcvicoshwmi.so.1'"));
     EXPECT_THAT(run.err, HasSubstr("--plugin FILE"));
+}
+
+HOST_TEST(BrokenPlugins, ThatCannotStopAreNamedAndTheCommandCounts) {
+    const Finished thrown = CvagentRun(host).telling("throwstop")({"tree"});
+    EXPECT_EQ(thrown.status, 0);
+    EXPECT_THAT(thrown.out, HasSubstr("hard-drive:sda"));
+    EXPECT_THAT(thrown.err, StartsWith("cvagent: unload of '"));
+    EXPECT_THAT(thrown.err, testing::EndsWith(" threw an exception: cannot stop\n"));
+    const Finished seven = CvagentRun(host).telling("sevenstop")({"tree"});
+    EXPECT_EQ(seven.status, 0);
+    EXPECT_THAT(seven.err, testing::EndsWith(" threw an unknown exception\n"));
 }
 
 HOST_TEST(BrokenPlugins, ThatFailedToStartAreStillUnloaded) {

@@ -82,6 +82,8 @@ const std::vector<std::string>& hostileTexts() {
                                                    "\x1b[2J",
                                                    "\xff",
                                                    "\xc0\xaf",
+                                                   "\xc3(",
+                                                   "\xe2\x82(",
                                                    "\xe2\x80\xa8",
                                                    "\u0661\u0669\u0662",
                                                    "\uff11\uff19\uff12",
@@ -319,8 +321,8 @@ TEST(ValueCheck, OwnerTextsAreOneLine) {
          std::string(1024, 'x'), " leading blank", "-x", "[a,b]", "\U0001F600"});
     expectRefused(kComputer, "OwnerName",
                   {"a\nb", "a\r", "a\tb", std::string("a\0b", 3), "\x1b[2J", "\x7f", "\u0085", "\u009b2J",
-                   "\u2028", "\u202e", "\xff", "\xc3", "\xc0\xaf", "\xed\xa0\x80", "\xf4\x90\x80\x80",
-                   std::string(1025, 'x'), std::string(100000, 'x')});
+                   "\u2028", "\u202e", "\xff", "\xc3", "\xc3(", "\xc0\xaf", "\xed\xa0\x80",
+                   "\xf4\x90\x80\x80", std::string(1025, 'x'), std::string(100000, 'x')});
 }
 
 }  // namespace

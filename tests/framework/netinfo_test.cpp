@@ -150,6 +150,15 @@ HOST_TEST(NetworkInfo, LinksThatAreNotEthernetAreNotSeen) {
     EXPECT_THAT(info.getVNICNames(), IsEmpty());
 }
 
+HOST_TEST(NetworkInfo, NoDriverIsAskedForANameThatTheKernelCannotHold) {
+    Link(host, "a-name-of-20-letters").with("ifindex", "7\n").with("iflink", "8\n");
+    const CNetworkInfo info(true);
+    const auto ports = info.getNICInfo()->begin()->second;
+    ASSERT_EQ(ports->size(), 1U);
+    EXPECT_EQ(ports->front()->name, "a-name-of-20-letters");
+    EXPECT_EQ(ports->front()->permanentAddress, kNoAddress);
+}
+
 HOST_TEST(NetworkInfo, VlansAreThoseTheKernelMarks) {
     Link(host, "eth0").withDevice("0000:00:03.0");
     Link(host, "eth0.5").withType("vlan").withDirectory("lower_eth0");

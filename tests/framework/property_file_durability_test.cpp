@@ -8,6 +8,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <csignal>
 #include <random>
 #include <thread>
@@ -19,13 +20,34 @@ namespace {
 /// Told of every descriptor that is brought to the disk, just before it is.
 std::function<void(int descriptor)> beforeSync;  // NOLINT(cert-err58-cpp)
 
+/// What the disk answers for files or for directories; 0: it does its work.
+int fileProblem = 0;
+int directoryProblem = 0;
+int refusedLocks = 0;  ///< how many locks somebody else has before one is to be had
+
+int refuse(int problem) {
+    errno = problem;
+    return -1;
+}
+
 }  // namespace
 
 extern "C" __attribute__((visibility("default"))) int fsync(int descriptor) {
     if (beforeSync) {
         beforeSync(descriptor);
     }
-    return static_cast<int>(syscall(SYS_fsync, descriptor));
+    struct stat status {};
+    fstat(descriptor, &status);
+    const int problem = S_ISDIR(status.st_mode) ? directoryProblem : fileProblem;
+    return problem != 0 ? refuse(problem) : static_cast<int>(syscall(SYS_fsync, descriptor));
+}
+
+extern "C" __attribute__((visibility("default"))) int flock(int descriptor, int operation) noexcept {
+    if (refusedLocks > 0) {
+        --refusedLocks;
+        return refuse(EWOULDBLOCK);
+    }
+    return static_cast<int>(syscall(SYS_flock, descriptor, operation));
 }
 
 namespace {
@@ -34,6 +56,7 @@ namespace fs = std::filesystem;
 using QX::PropertyFile;
 using QX::PropertyFileError;
 using testing::ElementsAre;
+using testing::HasSubstr;
 
 class PropertyFileDurability : public PropertyFileFixture {};
 
@@ -70,6 +93,44 @@ TEST_F(PropertyFileDurability, TheContentIsOnTheDiskBeforeItsNameAndTheNameBefor
     write({{L"a", L"2"}});
     beforeSync = nullptr;
     EXPECT_THAT(steps, ElementsAre("file beside a=1\n", "directory with a=2\n"));
+}
+
+TEST_F(PropertyFileDurability, ADiskThatFailsLeavesTheOldFile) {
+    put("a=1\n");
+    fileProblem = EIO;
+    EXPECT_THAT(textOfFailure([this] { write({{L"a", L"2"}}); }), HasSubstr("cannot bring it to the disk"));
+    fileProblem = 0;
+    EXPECT_EQ(content(), "a=1\n");
+    EXPECT_THAT(names(), ElementsAre("asset.dat"));
+}
+
+TEST_F(PropertyFileDurability, ADirectoryThatDoesNotReachTheDiskIsAFailure) {
+    directoryProblem = EIO;
+    EXPECT_THAT(textOfFailure([this] {
+                    write({{L"a", L"2"}});
+                }),
+                HasSubstr("cannot bring the directory to the disk"));
+    directoryProblem = EINVAL;  // a file system that has nothing to bring
+    EXPECT_EQ(textOfFailure([this] { write({{L"a", L"3"}}); }), "no failure");
+    directoryProblem = 0;
+    EXPECT_EQ(content(), "a=3\n");
+}
+
+TEST_F(PropertyFileDurability, ADirectoryThatTookTheFilesPlaceIsAFailure) {
+    PropertyFile file(path_.string());
+    file.open(3);
+    file.setValue(L"a", L"1");
+    fs::create_directory(path_);
+    EXPECT_THAT(textOfFailure([&] { file.close(); }), HasSubstr("cannot replace"));
+    EXPECT_THAT(names(), ElementsAre("asset.dat"));
+}
+
+TEST_F(PropertyFileDurability, ATemporaryFileThatAnotherWriterSweepsAwayIsMadeAnew) {
+    refusedLocks = 2;
+    write({{L"a", L"1"}});
+    EXPECT_EQ(refusedLocks, 0);
+    EXPECT_EQ(content(), "a=1\n");
+    EXPECT_THAT(names(), ElementsAre("asset.dat"));
 }
 
 TEST_F(PropertyFileDurability, LeftoversOfItsOwnAreCleanedAtTheNextWrite) {

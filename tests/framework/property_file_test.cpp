@@ -236,4 +236,15 @@ TEST_F(PropertyFileTest, TheLocaleDoesNotMatter) {
     EXPECT_EQ(inC, "größe=1234567\n");
 }
 
+TEST_F(PropertyFileTest, AFileBehindAFileCannotBeOpened) {
+    put("a=1\n");
+    PropertyFile file((path_ / "inside").string());
+    EXPECT_THAT(textOfFailure([&] { file.open(1); }), HasSubstr("inside: cannot open"));
+}
+
+TEST_F(PropertyFileTest, AFileThatOpensButDoesNotReadIsAFailure) {
+    PropertyFile file("/proc/self/mem");  // nothing is mapped at its beginning
+    EXPECT_THAT(textOfFailure([&] { file.open(1); }), HasSubstr("/proc/self/mem: cannot read"));
+}
+
 }  // namespace

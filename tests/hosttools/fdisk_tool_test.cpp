@@ -1,6 +1,11 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <sys/resource.h>
+
+#include "hosttools/applet.h"
+#include "tests/hosttools/host_tree.h"
+#include "tests/hosttools/network_namespace.h"
 #include "tests/hosttools/process.h"
 
 namespace {
@@ -33,6 +38,59 @@ TEST(FdiskTool, ADiskThatIsNotThere) {
     EXPECT_EQ(outcome.status, 1);
     EXPECT_THAT(outcome.output, IsEmpty());
     EXPECT_EQ(outcome.errors, "fdisk: /dev/sdnone is not a disk of this host\n");
+}
+
+TEST(FdiskTool, ListsTheDisksThatAreNamedInTheirOrder) {
+    if (!canUnshare()) GTEST_SKIP() << "namespaces are not available";
+    HostTree tree("many");
+    tree.addBytes("dev/sda", "");
+    tree.addBytes("run/lock/none", "");
+    tree.addBytes("dev/null", "");
+    const auto onTheTree = [&] {
+        enterPrivate(
+            {{"/sys", tree.root() + "/sys"}, {"/run", tree.root() + "/run"}, {"/dev", tree.root() + "/dev"}});
+    };
+    const Outcome outcome = run({adapter("fdisk"), "-l", "/dev/sdb", "/dev/sdnone", "/dev/sda"}, onTheTree);
+    EXPECT_EQ(outcome.status, 1);
+    EXPECT_THAT(outcome.errors, HasSubstr("fdisk: /dev/sdnone is not a disk of this host\n"));
+    const std::size_t second = outcome.output.find("Disk /dev/sdb");
+    ASSERT_NE(second, std::string::npos) << outcome.output;
+    EXPECT_GT(outcome.output.find("Disk /dev/sda:"), second);
+    EXPECT_EQ(outcome.output.find("Disk /dev/sdz"), std::string::npos);
+    EXPECT_EQ(run({adapter("fdisk"), "-l", "/dev/sdb"}, onTheTree).status, 0);
+}
+
+/// While it lives, the process can open nothing.
+class NothingToOpen {
+public:
+    NothingToOpen() {
+        getrlimit(RLIMIT_NOFILE, &before_);
+        const rlimit none{0, before_.rlim_max};
+        setrlimit(RLIMIT_NOFILE, &none);
+    }
+    NothingToOpen(const NothingToOpen&) = delete;
+    NothingToOpen& operator=(const NothingToOpen&) = delete;
+    ~NothingToOpen() { setrlimit(RLIMIT_NOFILE, &before_); }
+
+private:
+    rlimit before_{};
+};
+
+std::string complaintOf(int (*tool)(hosttools::Arguments), const std::vector<const char*>& words) {
+    testing::internal::CaptureStderr();
+    {
+        const NothingToOpen none;
+        EXPECT_EQ(tool(words), 1);
+    }
+    return testing::internal::GetCapturedStderr();
+}
+
+TEST(Tools, SayWhyTheyCannotAskTheKernel) {
+    EXPECT_EQ(complaintOf(hosttools::runIfconfig, {}), "ifconfig: netlink: Too many open files\n");
+    EXPECT_EQ(complaintOf(hosttools::runIfconfig, {"lo"}),
+              "ifconfig: lo: error fetching interface information: Too many open files\n");
+    EXPECT_EQ(complaintOf(hosttools::runRoute, {"-n"}),
+              "route: can't open '/proc/net/route': Too many open files\n");
 }
 
 TEST(Program, TellsItsToolsAndVersion) {

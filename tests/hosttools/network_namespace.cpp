@@ -48,10 +48,12 @@ bool canUnshare() {
     return succeeds([] { return unshareAsRoot(CLONE_NEWNET | CLONE_NEWNS); });
 }
 
-void enterPrivateProc(const std::string& directory) {
-    if (!unshareAsRoot(CLONE_NEWNS | CLONE_NEWNET) || mount("", "/", "", MS_REC | MS_PRIVATE, nullptr) != 0 ||
-        mount(directory.c_str(), "/proc", "", MS_BIND, nullptr) != 0) {
+void enterPrivate(const std::map<std::string, std::string>& directories) {
+    if (!unshareAsRoot(CLONE_NEWNS | CLONE_NEWNET) || mount("", "/", "", MS_REC | MS_PRIVATE, nullptr) != 0) {
         _exit(126);
+    }
+    for (const auto& [place, directory] : directories) {
+        if (mount(directory.c_str(), place.c_str(), "", MS_BIND, nullptr) != 0) _exit(126);
     }
 }
 

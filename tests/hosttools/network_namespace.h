@@ -2,6 +2,7 @@
 
 #include <sys/types.h>
 #include <functional>
+#include <map>
 #include <string>
 
 #include "tests/hosttools/process.h"
@@ -9,8 +10,9 @@
 /// @return whether this machine lets the tests make namespaces
 bool canUnshare();
 
-/// In a child: a mount namespace of its own with the directory in the place of /proc.
-void enterPrivateProc(const std::string& directory);
+/// In a child: a mount namespace of its own with directories in the places of the machine's ("/proc" and so
+/// on).
+void enterPrivate(const std::map<std::string, std::string>& directories);
 
 /// A network of its own, kept alive by a process that sleeps in it. Nothing done in it reaches the machine's.
 class NetworkNamespace {

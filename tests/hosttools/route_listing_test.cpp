@@ -110,7 +110,7 @@ std::string inet6Routes() {
 Outcome busyboxWith(const std::string& file, const std::string& content, const Words& words) {
     HostTree tree;
     tree.addBytes("net/" + file, content);
-    return run(words, [&] { enterPrivateProc(tree.root()); });
+    return run(words, [&] { enterPrivate({{"/proc", tree.root()}}); });
 }
 
 TEST(RouteAgainstBusybox, EveryFlag) {

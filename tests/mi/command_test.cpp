@@ -80,6 +80,12 @@ HOST_TEST(HostCommand, NeverRunsACommandOf512Bytes) {
     EXPECT_TRUE(host.listDirectory("/tmp").empty());
 }
 
+HOST_TEST(HostCommand, NeverRunsWhatCannotBeWrittenInTheHostsLetters) {
+    const auto command = formatCommand("echo %ls", L"\u6771");
+    EXPECT_EQ(command, std::nullopt);
+    EXPECT_FALSE(HostCommand(command).started());
+}
+
 HOST_TEST(HostCommand, RunsACommandOf511Bytes) {
     const std::string padding(511 - std::string("echo ").size(), 'x');
     HostCommand command(formatCommand("echo %s", padding.c_str()));

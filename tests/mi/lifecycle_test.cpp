@@ -231,6 +231,30 @@ HOST_TEST(Lifecycle, GoesOnWithoutASnapshotWhenTheShellCannotBeStarted) {
     IC::myoshwmi.unload();
 }
 
+HOST_TEST(Lifecycle, LogsAStepThatThrowsAndGoesOn) {
+    shell_stub::beforeEach([](const std::string& command) {
+        if (command == IC::diskSnapshotCommand) {
+            throw std::runtime_error("out of luck");
+        }
+        if (command == "cat /tmp/fdisk_tmp | grep ^/dev") {
+            throw 7;
+        }
+    });
+    LogCapture capture;
+    initialize(IC::myoshwmi);
+    shell_stub::beforeEach({});
+    EXPECT_THAT(capture.messages(6000), testing::Contains("createDiskControllerNodes failed: out of luck"));
+    EXPECT_THAT(capture.messages(6000), testing::Contains("createPartitionNodes failed: unknown exception"));
+    EXPECT_TRUE(Access::monitorRuns()) << "the last step";
+    IC::myoshwmi.unload();
+}
+
+HOST_TEST(Lifecycle, KnowsNoPortBeforeItsStart) {
+    MutableNode* node = nullptr;
+    EXPECT_FALSE(IC::myoshwmi.findNetworkPort("eth0", &node));
+    EXPECT_EQ(node, nullptr);
+}
+
 HOST_TEST(Lifecycle, KeepsTheBaseResultAndGoesOnWhenTheBaseFails) {
     const IC::Error result = IC::myoshwmi.initialize(1, Number(), Number());
     EXPECT_NE(result.getStatus(), 0);

@@ -2,8 +2,14 @@
 
 #include <sys/mount.h>
 #include <sys/stat.h>
+#include <sys/time.h>
 
+#include <chrono>
+#include <csignal>
 #include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <thread>
 
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
@@ -177,6 +183,33 @@ HOST_TEST(LineFile, EndsALastLineWithoutLineBreak) {
     LineFile none;
     none.endLastLine();
     EXPECT_TRUE(none.lines().empty());
+}
+
+HOST_TEST(LineFile, GoesOnWritingAfterASignal) {
+    ASSERT_EQ(mkfifo("/tmp/pipe", 0600), 0);
+    LineFile file;
+    file.append(std::string(400'000, 'x') + "\n");
+    sigset_t alarms;
+    sigemptyset(&alarms);
+    sigaddset(&alarms, SIGALRM);
+    pthread_sigmask(SIG_BLOCK, &alarms, nullptr);
+    std::size_t read = 0;
+    std::thread reader([&] {
+        std::ifstream in("/tmp/pipe");
+        std::this_thread::sleep_for(std::chrono::milliseconds(200));
+        read = std::string(std::istreambuf_iterator<char>(in), {}).size();
+    });
+    pthread_sigmask(SIG_UNBLOCK, &alarms, nullptr);
+    struct sigaction interrupting {};
+    interrupting.sa_handler = [](int) {};
+    sigaction(SIGALRM, &interrupting, nullptr);
+    const itimerval often{{0, 5000}, {0, 5000}};
+    setitimer(ITIMER_REAL, &often, nullptr);
+    EXPECT_TRUE(file.write("/tmp/pipe"));
+    const itimerval never{};
+    setitimer(ITIMER_REAL, &never, nullptr);
+    reader.join();
+    EXPECT_EQ(read, 400'001U);
 }
 
 }  // namespace

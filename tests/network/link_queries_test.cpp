@@ -6,6 +6,7 @@
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"
+#include "tests/support/shell_stub.h"
 
 namespace {
 
@@ -202,6 +203,18 @@ HOST_TEST(NicUp, TheFirstMemberWithoutALinkEndsTheWalk) {
 HOST_TEST(NicUp, ABondWithoutMembersIsDown) {
     host.file("/proc/net/bonding/bond0", "MII Status: up\n");
     EXPECT_FALSE(IC::isNICUp("bond0"));
+}
+
+HOST_TEST(NicUp, ABondWhoseMembersCannotBeAskedForIsDown) {
+    host.file("/proc/net/bonding/bond0", "MII Status: up\nSlave Interface: eth0\n");
+    host.tool("ethtool eth0", "\tLink detected: yes\n");
+    shell_stub::failWhen(
+        [](const std::string& command) { return command.ends_with("\"Slave Interface:\""); });
+    const LogCapture capture;
+    EXPECT_FALSE(IC::isNICUp("bond0"));
+    shell_stub::failWhen({});
+    EXPECT_THAT(capture.messages(6000), ElementsAre("isNICUp - grepping slave device error"));
+    EXPECT_THAT(host.calls(), IsEmpty());
 }
 
 HOST_TEST(NicUp, ABondWhoseStatusIsDownAsksNobody) {

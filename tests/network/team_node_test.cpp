@@ -147,6 +147,27 @@ HOST_TEST(TeamNodes, AreMadeUnderTheComputer) {
                 ElementsAre(testing::HasSubstr("Bonding Mode: "), testing::HasSubstr("Slave Interface: ")));
 }
 
+HOST_TEST(TeamNodes, ThatFailAreLoggedAndTheNextIsMade) {
+    installBond(host, "bond0", "active-backup");
+    installBond(host, "bond1", "active-backup");
+    Plugin plugin(host);
+    shell_stub::beforeEach([](const std::string& command) {
+        if (command.find("Bonding Mode: ") != std::string::npos &&
+            command.find("bond0") != std::string::npos) {
+            throw std::runtime_error("out of luck");
+        }
+    });
+    const LogCapture capture;
+    plugin.mi.createNetworkTeamingNodes();
+    shell_stub::beforeEach({});
+    EXPECT_THAT(capture.messages(6000), ElementsAre("NetworkTeaming node error"));
+    std::vector<PropertyValue> names;
+    for (const IC::MutableNode* team : plugin.teams()) {
+        names.push_back(stored(*team)[kName]);
+    }
+    EXPECT_THAT(names, testing::Contains(text("bond1")));
+}
+
 HOST_TEST(TeamNodes, AreNumberedInTheOrderOfTheDirectory) {
     for (const char* name : {"bond0", "bond1", "bond2"}) {
         installBond(host, name, "802.3ad");
