@@ -225,12 +225,13 @@ void KernelTold::addAddresses(const std::string& name, Json& properties) const {
     properties["102"] = ipv6.is_null() ? Json(0) : ipv6["prefixlen"];
 }
 
-/// An interface with on-link routes alone shows the host's own way out.
+/// An interface with on-link routes alone shows the host's own way out. The routes of eth0.10 count as
+/// eth0's, too: the plug-in's command looks for the name anywhere in a route's line.
 std::string KernelTold::gateway(const std::string& name) const {
     bool onLink = false;
     std::string wayOut = "0.0.0.0";
     for (const Json& route : routes_) {
-        if (route.value("dev", "") == name) {
+        if (contains(route.value("dev", ""), name)) {
             if (route.contains("gateway")) {
                 return route["gateway"];
             }
@@ -248,7 +249,7 @@ std::string KernelTold::gateway(const std::string& name) const {
 
 std::string KernelTold::gateway6(const std::string& name) const {
     for (const Json& route : routes6_) {
-        if (route.value("dev", "") == name && route.contains("gateway")) {
+        if (contains(route.value("dev", ""), name) && route.contains("gateway")) {
             return route["gateway"];
         }
     }
