@@ -1,9 +1,11 @@
 #include "agent/command_line.h"
 
 #include <CLI/CLI.hpp>
+#include <cmath>
 #include <iostream>
 
 #include "agent/failure.h"
+#include "agent/print.h"
 
 namespace cvagent {
 
@@ -21,6 +23,19 @@ constexpr const char* kFooter =
     "  cvagent COMMAND --help";
 constexpr const char* kNodeHelp =
     "The node: its id, its path, or the last part of its path when only one node has it";
+
+/// Seconds up to a limit; the range check of the parser lets "nan" through.
+CLI::Validator secondsUpTo(double most) {
+    return CLI::Validator(
+        [most](const std::string& text) {
+            double seconds = 0;
+            const bool good = CLI::detail::lexical_cast(text, seconds) && seconds >= 0 && seconds <= most;
+            return good ? std::string()
+                        : inQuotes(text) + " is no number of seconds from 0 to " +
+                              std::to_string(std::lround(most));
+        },
+        "");
+}
 
 void addGlobalOptions(CLI::App& app, Options& options) {
     app.add_option("--plugin", options.plugin, "The plug-in to load; by default the one beside this program")
@@ -43,6 +58,11 @@ void addGlobalOptions(CLI::App& app, Options& options) {
            "each the one that prints the classic format (auto, the default)")
         ->type_name("auto|native|classic")
         ->transform(CLI::CheckedTransformer(choices).description(""));
+    app.add_option("--command-timeout", options.commandSeconds,
+                   "End a command of the plug-in that takes longer, in a write ten times as long; what it "
+                   "would have told reads as an error. 0 waits for ever. Default: 10")
+        ->type_name("SECONDS")
+        ->check(secondsUpTo(1e6));
 }
 
 void addJson(CLI::App& command, Options& options) {
@@ -95,7 +115,7 @@ void addReaders(CLI::App& app, Options& options) {
     CLI::App* watch = app.add_subcommand("watch", "Print alerts, published and withdrawn nodes as they come");
     watch->add_option("--for", options.seconds, "Stop after this time; by default at Ctrl-C")
         ->type_name("SECONDS")
-        ->check(CLI::Range(0.0, 1e9));
+        ->check(secondsUpTo(1e9));
     addJson(*watch, options);
     watch->footer("With --json each event is one object on a line of its own.");
     watch->callback([&options] { options.command = Command::watch; });

@@ -21,6 +21,7 @@ struct Options {
     std::optional<std::string> logFile;
     std::optional<std::string> traceFile;
     std::optional<int> logLevel;
+    double commandSeconds = 10;  ///< how long a command of the plug-in may take; 0 for ever
     HostTools hostTools = HostTools::automatic;
     bool json = false;
     bool yes = false;               ///< power actions need no question

@@ -5,6 +5,9 @@
 #include <exception>
 #include <system_error>
 #include <thread>
+#include <utility>
+
+#include "agent/command_deadline.h"
 
 namespace cvagent {
 
@@ -40,6 +43,7 @@ std::string errorText(const IC::Error& error) {
 
 Reading readProperty(const IC::MutableNode& node, unsigned int id) {
     Reading reading{id, findProperty(node.nodeType(), id), {}, {}, false};
+    const Errand errand(Errand::read);
     try {
         const IC::Error result = node.getProperty(id, reading.value);
         if (result.getStatus() != 0) {
@@ -50,6 +54,13 @@ Reading readProperty(const IC::MutableNode& node, unsigned int id) {
         reading.error = std::string("the plug-in threw: ") + exception.what();
     } catch (...) {
         reading.error = "the plug-in threw an unknown exception";
+    }
+    // Whatever the plug-in made of a command that was cut off, it is not what the host says.
+    if (std::string complaint = errand.complaint(); !complaint.empty()) {
+        reading.value = {};
+        reading.error = std::move(complaint);
+        reading.missing = false;
+        reading.timedOut = true;
     }
     return reading;
 }

@@ -14,8 +14,9 @@ struct Reading {
     unsigned int id = 0;
     std::optional<Property> row;  ///< none: the catalogue does not know the property
     IC::PropertyValue value;
-    std::string error;     ///< empty when the read succeeded
-    bool missing = false;  ///< it failed because the node has no such property
+    std::string error;      ///< empty when the read succeeded
+    bool missing = false;   ///< it failed because the node has no such property
+    bool timedOut = false;  ///< it failed because a command of the host did not end
 
     bool failed() const { return !error.empty(); }
     /// Why there is no value, for people: a property that every node of the class could have is just not

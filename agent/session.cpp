@@ -15,6 +15,7 @@ Session::Session(const Options& options, Listener* listener)
                          data_.path() + "host-tools");
     }
     StopSignals::install();
+    deadline_.emplace(std::chrono::duration<double>(options.commandSeconds));
     try {
         load(listener);
     } catch (const Failure&) {

@@ -1,7 +1,9 @@
 #pragma once
 
+#include <optional>
 #include <string>
 
+#include "agent/command_deadline.h"
 #include "agent/log_output.h"
 #include "agent/options.h"
 #include "agent/plugin.h"
@@ -30,6 +32,7 @@ private:
     DataDirectory data_;
     QuietCommands quiet_;
     LogOutput log_;
+    std::optional<CommandDeadline> deadline_;
     std::unique_ptr<Plugin> plugin_;
 };
 

@@ -72,13 +72,17 @@ std::string listing(const IC::MutableNode& node, const std::vector<Reading>& rea
 }
 
 /// Properties that were asked for by name must all be there. In a listing of everything a host may well not
-/// know some.
+/// know some, but it must have answered.
 ExitStatus verdict(const IC::MutableNode& node, const std::vector<Reading>& readings, bool named) {
     const auto failed = [](const Reading& reading) { return reading.failed(); };
     const auto unknown = [](const Reading& reading) { return reading.missing && !reading.row; };
     if (named && std::any_of(readings.begin(), readings.end(), unknown)) {
         complain("there is no such property; see: cvagent properties " + className(node.nodeType()));
         return ExitStatus::notFound;
+    }
+    const auto timedOut = [](const Reading& reading) { return reading.timedOut; };
+    if (std::any_of(readings.begin(), readings.end(), timedOut)) {
+        return ExitStatus::failed;
     }
     const bool bad = named ? std::any_of(readings.begin(), readings.end(), failed)
                            : !readings.empty() && std::all_of(readings.begin(), readings.end(), failed);

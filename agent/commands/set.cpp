@@ -3,6 +3,7 @@
 #include <cstdio>
 #include <iostream>
 
+#include "agent/command_deadline.h"
 #include "agent/commands/commands.h"
 #include "agent/json.h"
 #include "agent/print.h"
@@ -72,13 +73,26 @@ void confirmPower(const IC::MutableNode& node, const Property& row, const IC::Pr
     }
 }
 
-IC::Error write(IC::MutableNode& node, const Property& row, const IC::PropertyValue& value) {
+IC::Error callSetProperty(IC::MutableNode& node, const Property& row, const IC::PropertyValue& value) {
     try {
         return node.setProperty(row.id, value);
     } catch (const std::exception& exception) {
         return {IC::Error::failure, IC::Number(), std::string("the plug-in threw: ") + exception.what()};
     } catch (...) {
         return {IC::Error::failure, IC::Number(), "the plug-in threw an unknown exception"};
+    }
+}
+
+void write(IC::MutableNode& node, const Property& row, const IC::PropertyValue& value, LogOutput& log) {
+    const Errand errand(Errand::write);
+    const IC::Error result = callSetProperty(node, row, value);
+    log.showErrors();
+    if (const std::string complaint = errand.complaint(); !complaint.empty()) {
+        throw Failure(ExitStatus::failed,
+                      std::string(row.name) + " may be changed only in part: " + complaint);
+    }
+    if (result.getStatus() != 0) {
+        throw Failure(ExitStatus::failed, std::string(row.name) + " was not changed: " + errorText(result));
     }
 }
 
@@ -117,11 +131,7 @@ ExitStatus set(const Options& options) {
     const IC::PropertyValue value = checkedValue(row, options.values);
     confirmPower(*node, row, value, options.yes);
     const Reading before = row.readable() ? readProperty(*node, row.id) : Reading();
-    const IC::Error result = write(*node, row, value);
-    session.log().showErrors();
-    if (result.getStatus() != 0) {
-        throw Failure(ExitStatus::failed, std::string(row.name) + " was not changed: " + errorText(result));
-    }
+    write(*node, row, value, session.log());
     setPaths(session.interface());  // some writes make new nodes
     if (!row.readable()) {
         writeOnly(*node, row, options, style);
@@ -131,7 +141,7 @@ ExitStatus set(const Options& options) {
     print(options.json ? json::change(*node, before, after) : report(*node, before, after, style));
     hintAtDifference(row, value, after);
     session.log().showErrors();
-    return ExitStatus::done;
+    return after.timedOut ? ExitStatus::failed : ExitStatus::done;
 }
 
 }  // namespace cvagent::commands

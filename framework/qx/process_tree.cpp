@@ -7,6 +7,7 @@
 #include <csignal>
 #include <filesystem>
 #include <fstream>
+#include <sstream>
 #include <string>
 #include <thread>
 #include <utility>
@@ -60,13 +61,39 @@ std::vector<fs::path> childListings(pid_t process) {
     return listings;
 }
 
-bool isRunning(pid_t process) {
+/// What the kernel tells of a process.
+struct Status {
+    char state = 'X';                ///< as it is when there is no such process
+    unsigned long long started = 0;  ///< clock ticks since the machine's start
+};
+
+Status statusOf(pid_t process) {
+    constexpr int kFieldsBetween = 18;  // of state and start
     std::ifstream in("/proc/" + std::to_string(process) + "/stat");
     std::string text;
-    std::getline(in, text);
+    std::getline(in, text, '\0');  // the program's name can hold anything else
     const auto afterName = text.rfind(')');
-    return afterName != std::string::npos && afterName + 2 < text.size() &&
-           std::string("RSD").find(text[afterName + 2]) != std::string::npos;
+    std::istringstream fields(afterName == std::string::npos ? "" : text.substr(afterName + 1));
+    Status status;
+    std::string passedOver;
+    fields >> status.state;
+    for (int i = 0; i < kFieldsBetween; ++i) {
+        fields >> passedOver;
+    }
+    fields >> status.started;
+    return status;
+}
+
+bool isRunning(pid_t process) {
+    return std::string("RSD").find(statusOf(process).state) != std::string::npos;
+}
+
+bool hasEnded(const Status& status) {
+    return std::string("ZXx").find(status.state) != std::string::npos;
+}
+
+fs::path listingOf(pid_t thread) {
+    return "/proc/self/task/" + std::to_string(thread) + "/children";
 }
 
 /// Stops a process and waits, though not for ever, until it has: only then is its list of children final.
@@ -78,28 +105,73 @@ void freeze(const Process& process) {
     }
 }
 
+/// Processes that are stopped first, all of them, and killed then.
+class Condemned {
+public:
+    Condemned() = default;
+    Condemned(const Condemned&) = delete;
+    Condemned& operator=(const Condemned&) = delete;
+    ~Condemned() {
+        for (const Process& process : frozen_) {
+            process.send(SIGKILL);
+        }
+    }
+
+    /// Stops a process; its own children are still to be added.
+    /// @param listing where it stands as a child: one that no longer does is another's by now
+    /// @return whether it was stopped
+    bool add(pid_t id, const fs::path& listing) {
+        Process process(id);
+        const auto now = readIds(listing);  // still the same child, now that we hold it?
+        if (!process.isOpen() || std::find(now.begin(), now.end(), id) == now.end()) {
+            return false;
+        }
+        freeze(process);
+        frozen_.push_back(std::move(process));
+        return true;
+    }
+
+    /// The same for all that these listings tell and for their descendants.
+    void addAll(std::vector<fs::path> listings) {
+        while (!listings.empty()) {
+            const fs::path listing = std::move(listings.back());
+            listings.pop_back();
+            for (const pid_t id : readIds(listing)) {
+                if (add(id, listing)) {
+                    std::ranges::move(childListings(id), std::back_inserter(listings));
+                }
+            }
+        }
+    }
+
+private:
+    std::vector<Process> frozen_;
+};
+
 }  // namespace
 
 void killChildrenOf(pid_t thread) {
-    std::vector<fs::path> listings{"/proc/self/task/" + std::to_string(thread) + "/children"};
-    std::vector<Process> frozen;
-    while (!listings.empty()) {
-        const fs::path listing = std::move(listings.back());
-        listings.pop_back();
-        for (const pid_t id : readIds(listing)) {
-            Process process(id);
-            const auto now = readIds(listing);  // still the same child, now that we hold it?
-            if (!process.isOpen() || std::find(now.begin(), now.end(), id) == now.end()) {
-                continue;
-            }
-            freeze(process);
-            std::ranges::move(childListings(id), std::back_inserter(listings));
-            frozen.push_back(std::move(process));
+    Condemned().addAll({listingOf(thread)});
+}
+
+std::vector<ChildProcess> childrenOf(pid_t thread) {
+    std::vector<ChildProcess> children;
+    for (const pid_t id : readIds(listingOf(thread))) {
+        if (const Status status = statusOf(id); !hasEnded(status)) {
+            children.push_back({id, status.started});
         }
     }
-    for (const Process& process : frozen) {
-        process.send(SIGKILL);
+    return children;
+}
+
+bool killChild(pid_t thread, const ChildProcess& child) {
+    Condemned condemned;
+    const Status status = statusOf(child.id);
+    if (hasEnded(status) || status.started != child.started || !condemned.add(child.id, listingOf(thread))) {
+        return false;
     }
+    condemned.addAll(childListings(child.id));
+    return true;
 }
 
 }  // namespace QX

@@ -2,6 +2,11 @@
 
 #include <sys/types.h>
 
+#include <compare>
+#include <vector>
+
+#include "framework/export.h"
+
 namespace QX {
 
 /// Kills the child processes that one thread of this process has started, and all their descendants. A
@@ -9,5 +14,22 @@ namespace QX {
 /// pipe open.
 /// @param thread kernel id of the thread; it must be alive
 void killChildrenOf(pid_t thread);
+
+/// A child process: its number and, since numbers are given out again, when it started.
+struct ChildProcess {
+    pid_t id = 0;
+    unsigned long long started = 0;  ///< clock ticks since the machine's start
+
+    auto operator<=>(const ChildProcess&) const = default;
+};
+
+/// The child processes of one thread of this process that have not ended.
+/// @param thread its kernel id; there are none of a thread that has gone
+CORVISTA_API std::vector<ChildProcess> childrenOf(pid_t thread);
+
+/// Kills one of them with all its descendants, as killChildrenOf does. A descendant that has lost its parent
+/// before is nobody's child here and lives on.
+/// @return false when it had ended before
+CORVISTA_API bool killChild(pid_t thread, const ChildProcess& child);
 
 }  // namespace QX

@@ -1,0 +1,67 @@
+#pragma once
+
+#include <chrono>
+#include <condition_variable>
+#include <mutex>
+#include <string>
+#include <thread>
+
+#include "framework/qx/process_tree.h"
+
+namespace cvagent {
+
+/// While it lives, no command that the plug-in has started runs for ever: one that takes longer than the
+/// deadline is killed with all it has started, so that whoever waits for its output goes on. The plug-in
+/// knows nothing of it. What does not count: the time that this program was stopped or the machine slept.
+///
+/// A process that a command leaves behind in the background is nobody's child any more and lives on. One that
+/// the kernel holds in the middle of a device's answer dies when the device lets it.
+class CommandDeadline {
+public:
+    /// @param longest how long a command may take; 0 for as long as it likes
+    explicit CommandDeadline(std::chrono::duration<double> longest);
+    CommandDeadline(const CommandDeadline&) = delete;
+    CommandDeadline& operator=(const CommandDeadline&) = delete;
+    ~CommandDeadline();
+
+private:
+    using Seconds = std::chrono::duration<double>;
+
+    void watch();
+    bool stoppedWithin(Seconds time);
+    void end(pid_t thread, const QX::ChildProcess& command);
+    Seconds limitOf(pid_t thread) const;
+
+    Seconds longest_;
+    std::mutex guard_;
+    std::condition_variable changed_;
+    bool stopped_ = false;  // guarded by guard_
+    std::thread watcher_;
+};
+
+/// One call into the plug-in, from here to the end of the scope on this thread: it hears of the commands that
+/// were killed because of it. Those of threads without an errand (the start, the monitors) are told to the
+/// user as warnings. One a thread at a time.
+class Errand {
+public:
+    /// A write may take ten times as long: it can restart the network, which waits for addresses, and cut off
+    /// in its middle it leaves the host half changed.
+    enum Kind { read, write };
+
+    explicit Errand(Kind kind);
+    Errand(const Errand&) = delete;
+    Errand& operator=(const Errand&) = delete;
+    ~Errand();
+
+    /// "timed out after 10 s: ethtool eth0" of the first command that was killed; empty when none was.
+    std::string complaint() const;
+
+private:
+    friend class CommandDeadline;
+
+    Kind kind_;
+    pid_t thread_;
+    std::string complaint_;  // guarded by the list of errands
+};
+
+}  // namespace cvagent
