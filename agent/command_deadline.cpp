@@ -18,7 +18,6 @@ namespace cvagent {
 
 namespace {
 
-using Clock = std::chrono::steady_clock;
 using Seconds = std::chrono::duration<double>;
 
 constexpr int kWritePatience = 10;  // times as long as a read
@@ -102,8 +101,8 @@ bool CommandDeadline::stoppedWithin(Seconds time) {
 void CommandDeadline::watch() {
     const Seconds interval = std::clamp(longest_ / kLooks, kFastestLook, kSlowestLook);
     std::map<std::pair<pid_t, QX::ChildProcess>, Seconds> ages;
-    for (Clock::time_point last = Clock::now(); !stoppedWithin(interval);) {
-        const Clock::time_point now = Clock::now();
+    for (auto last = std::chrono::steady_clock::now(); !stoppedWithin(interval);) {
+        const auto now = std::chrono::steady_clock::now();
         const Seconds step = std::min(Seconds(now - last), 2 * interval);
         last = now;
         std::map<std::pair<pid_t, QX::ChildProcess>, Seconds> present;

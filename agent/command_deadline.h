@@ -44,8 +44,8 @@ private:
 /// user as warnings. One a thread at a time.
 class Errand {
 public:
-    /// A write may take ten times as long: it can restart the network, which waits for addresses, and cut off
-    /// in its middle it leaves the host half changed.
+    /// A write may take ten times as long: it brings interfaces up and walks over all of them, and cut off in
+    /// its middle it leaves the host half changed.
     enum Kind { read, write };
 
     explicit Errand(Kind kind);

@@ -12,6 +12,7 @@
 
 #include "agent/failure.h"
 #include "agent/surroundings.h"
+#include "framework/qx/utf8.h"
 
 namespace cvagent {
 
@@ -143,14 +144,15 @@ std::string Style::paint(const std::string& text, const char* code) const {
 
 std::string printable(const std::string& text) {
     std::string shown;
-    for (std::size_t i = 0; i < text.size(); ++i) {
-        const auto byte = static_cast<unsigned char>(text[i]);
-        const auto next = i + 1 < text.size() ? static_cast<unsigned char>(text[i + 1]) : 0U;
-        const bool secondControlSet = byte == 0xC2 && next >= 0x80 && next < 0xA0;  // U+0080 to U+009F
-        if (byte < 0x20 || byte == 0x7F || secondControlSet) {
-            shown += formatted("\\x%02x", byte);
+    for (std::size_t i = 0; i < text.size();) {
+        const QX::Utf8Character next = QX::firstUtf8Character(std::string_view(text).substr(i));
+        const bool isControl = next.code < 0x20 || (next.code >= 0x7F && next.code < 0xA0);
+        if (next.length != 0 && !isControl) {
+            shown.append(text, i, next.length);
+            i += next.length;
         } else {
-            shown += text[i];
+            shown += formatted("\\x%02x", static_cast<unsigned char>(text[i]));
+            ++i;
         }
     }
     return shown;

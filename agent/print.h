@@ -24,7 +24,8 @@ private:
     std::string paint(const std::string& text, const char* code) const;
 };
 
-/// The text with control characters spelt out, so that a name from the host cannot steer the terminal.
+/// The text with control characters, and bytes that are no UTF-8, spelt out, so that a name from the host
+/// cannot steer the terminal.
 std::string printable(const std::string& text);
 /// The same, cut after some 60 characters, for messages that quote what was given.
 std::string inQuotes(const std::string& text);

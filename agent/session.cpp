@@ -9,6 +9,7 @@ namespace cvagent {
 Session::Session(const Options& options, Listener* listener)
     : file_(options.plugin ? *options.plugin : pluginBesideProgram()), log_(options, listener != nullptr) {
     hintAtRoot(data_);
+    hintAtReadOnly(data_);
     prepareSurroundings();
     if (options.hostTools != HostTools::native) {
         putAdaptersFirst(inspectHostTools(options.hostTools, Look::adapters, adapterDirectory()),
@@ -32,6 +33,7 @@ Session::~Session() {
 
 void Session::load(Listener* listener) {
     plugin_ = std::make_unique<Plugin>(file_, listener);
+    hintAtTemporaryFiles();
 }
 
 void Session::goOnUnlessStopped() {

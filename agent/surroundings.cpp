@@ -142,6 +142,38 @@ int messageDescriptor() {
     return keptStandardError;
 }
 
+namespace {
+
+/// Why no file can be written below /tmp, as an errno; 0 when one can.
+int temporaryFileProblem() {
+    std::string name = "/tmp/cvagent-XXXXXX";
+    const int file = mkostemp(name.data(), O_CLOEXEC);
+    if (file < 0) {
+        return errno;
+    }
+    const std::string page(4096, ' ');
+    const int error = write(file, page.data(), page.size()) == static_cast<ssize_t>(page.size()) ? 0 : errno;
+    close(file);
+    unlink(name.c_str());
+    return error;
+}
+
+}  // namespace
+
+void hintAtReadOnly(const DataDirectory& data) {
+    if (access(data.path().c_str(), W_OK) != 0) {
+        complain("cannot write to the data directory " + inQuotes(data.path()) + ": " + std::strerror(errno) +
+                 "; the owner's data cannot be changed, and a change of a link is told again and again");
+    }
+}
+
+void hintAtTemporaryFiles() {
+    if (const int error = temporaryFileProblem(); error != 0) {
+        complain(std::string("cannot write to /tmp: ") + std::strerror(error) +
+                 "; drives, partitions and network ports can be missing");
+    }
+}
+
 void hintAtRoot(const DataDirectory& data) {
     if (geteuid() == 0) {
         return;

@@ -42,4 +42,11 @@ int messageDescriptor();
 /// Without root: tells on standard error what will be missing. With root nothing.
 void hintAtRoot(const DataDirectory& data);
 
+/// Tells on standard error what does not work when nothing can be written to the data directory.
+void hintAtReadOnly(const DataDirectory& data);
+
+/// Tells on standard error what is missing when nothing can be written to /tmp, where the plug-in's commands
+/// keep their listings. To be asked after a start: a listing can be what has filled it.
+void hintAtTemporaryFiles();
+
 }  // namespace cvagent

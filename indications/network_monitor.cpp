@@ -6,6 +6,7 @@
 #include "indications/globals.h"
 #include "mi/globals.h"
 #include "mi/log.h"
+#include "mi/my_process.h"
 #include "mi/os_hw_mi.h"
 
 namespace IC {
@@ -49,10 +50,11 @@ void* NetworkMonitor::run(void*) {
 }
 
 void NetworkMonitor::pass() {
+    const unsigned int before = commandsCutOff();
     myoshwmi.readPrevNetNodeMap();
     myoshwmi.createCurNetNodeMap();
-    if (stopRequested_) {
-        return;  // the commands of this pass may have been killed: what they answered is not the host's state
+    if (stopRequested_ || commandsCutOff() != before) {
+        return;  // what a killed command answered is not the host's state
     }
     myoshwmi.checkAndSendNetAlert();
     myoshwmi.writePrevNetNodeMap();

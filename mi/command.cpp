@@ -19,16 +19,23 @@ bool fits(const std::string& command) {
     return false;
 }
 
-std::optional<std::string> readLine(FILE* pipe, std::size_t longest) {
+}  // namespace
+
+std::optional<std::string> OutputReader::nextLine(FILE* pipe, std::size_t longest) {
     std::array<char, kCommandBuffer> buffer{};
-    const auto size = static_cast<int>(std::min(longest + 1, buffer.size()));
-    if (pipe == nullptr || fgets(buffer.data(), size, pipe) == nullptr) {
+    const auto size = std::min(longest + 1, buffer.size());
+    if (pipe == nullptr || left_ == 0 || fgets(buffer.data(), static_cast<int>(size), pipe) == nullptr) {
         return std::nullopt;
     }
-    return std::string(buffer.data());
+    std::string line(buffer.data());
+    // Without a line break it was a long line, or one that holds a zero and was longer than it looks.
+    const std::size_t read = line.ends_with('\n') ? line.size() : size;
+    left_ -= std::min(left_, read);
+    if (left_ == 0) {
+        log(kError) << "Output too long, the rest is not read: " << command_;
+    }
+    return line;
 }
-
-}  // namespace
 
 std::optional<std::string> formatCommand(const char* format, ...) {
     va_list arguments;
@@ -44,13 +51,13 @@ std::optional<std::string> formatCommand(const char* format, ...) {
     return fits(command) ? std::optional(std::move(command)) : std::nullopt;
 }
 
-HostCommand::HostCommand(const std::optional<std::string>& command) {
+HostCommand::HostCommand(const std::optional<std::string>& command) : reader_(command.value_or("")) {
     if (command) {
         pipe_ = process_.mypopen(command->c_str(), "r");
     }
 }
 
-HostCommand::HostCommand(FromText, const std::string& command) {
+HostCommand::HostCommand(FromText, const std::string& command) : reader_(command) {
     if (fits(command)) {
         pipe_ = process_.mypopen(command, "r");
     }
@@ -61,7 +68,7 @@ HostCommand HostCommand::fromText(const std::string& command) {
 }
 
 std::optional<std::string> HostCommand::nextLine(std::size_t longest) {
-    return readLine(pipe_, longest);
+    return reader_.nextLine(pipe_, longest);
 }
 
 FirstLine firstLine(HostCommand&& command) {
@@ -73,16 +80,14 @@ FirstLine firstLine(const std::optional<std::string>& command) {
 }
 
 PlainCommand::PlainCommand(const std::optional<std::string>& command)
-    : pipe_(command ? popen(command->c_str(), "r") : nullptr) {}
+    : reader_(command.value_or("")), pipe_(command ? popen(command->c_str(), "r") : nullptr) {}
 
 PlainCommand::~PlainCommand() {
-    if (pipe_ != nullptr) {
-        pclose(pipe_);
-    }
+    closePipe(pipe_);
 }
 
 std::optional<std::string> PlainCommand::nextLine() {
-    return readLine(pipe_, kCommandBuffer - 1);
+    return reader_.nextLine(pipe_, kCommandBuffer - 1);
 }
 
 void runToEnd(const std::string& command) {

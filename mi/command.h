@@ -4,6 +4,7 @@
 #include <cstdio>
 #include <optional>
 #include <string>
+#include <utility>
 
 #include "mi/my_process.h"
 
@@ -15,6 +16,20 @@ constexpr std::size_t kCommandBuffer =
 /// The command line a format makes, or nothing when it would not fit its 512 bytes: then it is logged at
 /// level 6000 and never run, since half a command is another command.
 [[gnu::format(printf, 1, 2)]] std::optional<std::string> formatCommand(const char* format, ...);
+
+constexpr std::size_t kMostOutput = 2UL << 20U;  ///< bytes that are read of one command's output
+
+/// The lines of a command's output, as far as anybody wants to know: a tool that has gone mad can print for
+/// ever. The rest is not read, which ends the command.
+class OutputReader {
+public:
+    explicit OutputReader(std::string command) : command_(std::move(command)) {}
+    std::optional<std::string> nextLine(FILE* pipe, std::size_t longest);
+
+private:
+    std::string command_;
+    std::size_t left_ = kMostOutput;
+};
 
 /// One running shell command whose output is read line by line. The output ends, and the command is waited
 /// for, when the object goes.
@@ -37,6 +52,7 @@ private:
     HostCommand(FromText, const std::string& command);
 
     MyProcess process_;
+    OutputReader reader_;
     FILE* pipe_ = nullptr;
 };
 
@@ -60,6 +76,7 @@ public:
     std::optional<std::string> nextLine();
 
 private:
+    OutputReader reader_;
     FILE* pipe_ = nullptr;
 };
 

@@ -1,5 +1,8 @@
 #include "mi/disk_snapshot.h"
 
+#include <sys/statvfs.h>
+#include <unistd.h>
+
 #include "mi/globals.h"
 #include "mi/log.h"
 
@@ -15,6 +18,15 @@ public:
     ~FileLock() { OSHWMI::myfileLock.unlock(); }
 };
 
+/// Whether the snapshot's disk has room left. When it has none, the snapshot may end anywhere.
+bool foundRoom() {
+    struct statvfs disk {};
+    if (statvfs(diskSnapshotPath, &disk) != 0 || disk.f_blocks == 0) {
+        return true;  // not for us to tell
+    }
+    return (geteuid() == 0 ? disk.f_bfree : disk.f_bavail) > 0;
+}
+
 }  // namespace
 
 HostCommand startUnderFileLock(const std::optional<std::string>& command) {
@@ -23,7 +35,9 @@ HostCommand startUnderFileLock(const std::optional<std::string>& command) {
 }
 
 bool takeDiskSnapshot() {
-    return startUnderFileLock(diskSnapshotCommand).started();
+    const unsigned int before = commandsCutOff();
+    const bool started = startUnderFileLock(diskSnapshotCommand).started();
+    return started && commandsCutOff() == before && foundRoom();
 }
 
 void deleteFdiskTmp() {

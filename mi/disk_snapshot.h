@@ -15,7 +15,8 @@ inline constexpr char diskSnapshotCommand[] = "fdisk -ls 2>/dev/null > /tmp/fdis
 HostCommand startUnderFileLock(const std::optional<std::string>& command);
 
 /// Writes the snapshot. It is whole when this returns: leaving waits for fdisk.
-/// @return whether fdisk could be started
+/// @return false when fdisk could not be started, a signal ended it, or its disk is full: it is not whole
+/// then
 bool takeDiskSnapshot();
 
 /// Removes the snapshot; one that is not there is no failure.

@@ -29,4 +29,11 @@ private:
     FILE* pipe_;
 };
 
+/// Ends a command's output and waits for the command; a null pipe is fine.
+void closePipe(FILE* pipe);
+
+/// How many of the calling thread's commands were ended by a signal so far: what they printed is not what
+/// they had to tell. A command whose output was no longer wanted is none of them.
+unsigned int commandsCutOff();
+
 }  // namespace IC

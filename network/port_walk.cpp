@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <set>
 #include <utility>
 
 #include "mi/command.h"
@@ -62,8 +63,11 @@ std::vector<ListedInterface> PortWalk::list() {
     }
     HostCommand listing(vmware ? kListVMware : kListInterfaces);
     std::vector<ListedInterface> found;
+    std::set<std::string> seen;  // a line that comes again would ask the host the same again
     while (const auto line = listing.nextLine()) {
-        found.push_back(listedInterface(*line));
+        if (seen.insert(*line).second) {
+            found.push_back(listedInterface(*line));
+        }
     }
     return found;
 }

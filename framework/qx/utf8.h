@@ -3,6 +3,8 @@
 #include <cstddef>
 #include <string_view>
 
+#include "framework/export.h"
+
 namespace QX {
 
 /// A code that stands for a character: no surrogate, nothing above the last one.
@@ -16,6 +18,6 @@ struct Utf8Character {
 };
 
 /// The character at the start of `text`: no overlong forms, no surrogates, nothing above U+10FFFF.
-Utf8Character firstUtf8Character(std::string_view text);
+CORVISTA_API Utf8Character firstUtf8Character(std::string_view text);
 
 }  // namespace QX

@@ -80,8 +80,9 @@ TEST(Print, ATimeThatHasNoYearIsShownInSeconds) {
 TEST(Print, NamesFromTheHostCannotSteerTheTerminal) {
     EXPECT_EQ(printable("a\x1b[2Jb\n\x7f"), "a\\x1b[2Jb\\x0a\\x7f");
     EXPECT_EQ(printable("\u009b2J"),
-              "\\xc2\x9b"
+              "\\xc2\\x9b"
               "2J");
+    EXPECT_EQ(printable("a\xff\xe2\x82z"), "a\\xff\\xe2\\x82z");
     EXPECT_EQ(printable("J\u00fcrgen"), "J\u00fcrgen");
     EXPECT_EQ(shown(40, 108, {"a\nb", true}), "a\\x0ab");
 }

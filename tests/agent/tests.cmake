@@ -39,3 +39,14 @@ corvista_test(agent_kernel_tree LIBRARIES test_support SOURCES
   agent/kernel_tree_test.cpp)
 target_compile_definitions(agent_kernel_tree_test PRIVATE ${agent_test_programs})
 add_dependencies(agent_kernel_tree_test cvagent vantrelcvicoshwmi corvista-hosttools)
+
+corvista_test(agent_hostile LIBRARIES agent_code test_support LABELS threads SOURCES
+  agent/command_deadline_test.cpp
+  agent/hostile_output_test.cpp
+  agent/hostile_surroundings_test.cpp
+  agent/hostile_test.cpp)
+target_compile_definitions(agent_hostile_test PRIVATE ${agent_test_programs} CLOCK_JUMP_LIBRARY="$<TARGET_FILE:clockjump>")
+add_dependencies(agent_hostile_test cvagent clockjump fake_plugin vantrelcvicoshwmi)
+
+corvista_test(agent_many_interfaces LIBRARIES agent_code plugin_code test_support SOURCES
+  agent/many_interfaces_test.cpp)

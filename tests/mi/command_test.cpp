@@ -93,6 +93,38 @@ HOST_TEST(HostCommand, RunsACommandOf511Bytes) {
     EXPECT_EQ(command.nextLine(), padding + "\n");
 }
 
+HOST_TEST(HostCommand, IsReadAsFarAsASaneOneGoes) {
+    LogCapture capture;
+    HostCommand command(std::string("yes"));
+    std::size_t read = 0;
+    while (const auto line = command.nextLine()) {
+        read += line->size();
+    }
+    EXPECT_EQ(read, IC::kMostOutput);
+    EXPECT_EQ(capture.messages(6000), std::vector<std::string>{"Output too long, the rest is not read: yes"});
+}
+
+HOST_TEST(HostCommand, ZerosAreReadAsFarToo) {
+    IC::PlainCommand command(std::string("cat /dev/zero"));
+    std::size_t lines = 0;
+    while (command.nextLine()) {
+        ++lines;
+    }
+    EXPECT_LE(lines, IC::kMostOutput / IC::kCommandBuffer + 1);
+}
+
+HOST_TEST(CommandsCutOff, AreThoseThatASignalEnded) {
+    const unsigned int before = IC::commandsCutOff();
+    { HostCommand fine(std::string("echo; exit 3")); }
+    { HostCommand unread(std::string("yes")); }
+    { HostCommand stage(std::string("yes | cat")); }
+    EXPECT_EQ(IC::commandsCutOff(), before);
+    { HostCommand killed(std::string("kill -KILL $$")); }
+    { HostCommand toolKilled(std::string("sh -c 'kill -SEGV $$'; exit $?")); }
+    { IC::PlainCommand plain(std::string("kill -TERM $$")); }
+    EXPECT_EQ(IC::commandsCutOff(), before + 3);
+}
+
 HOST_TEST(PlainCommand, IsNotCounted) {
     const int before = MyProcess::cnt;
     IC::PlainCommand command(std::string("echo line"));

@@ -89,6 +89,20 @@ HOST_TEST_F(LayoutComparison, AnUnchangedLayoutTouchesNothing) {
     EXPECT_EQ(drives(), drivesBefore);
 }
 
+HOST_TEST_F(LayoutComparison, ASnapshotThatIsNotWholeTouchesNothing) {
+    startWith(host, kLayout);
+    host.tool("fdisk -ls", ToolAnswer{.out = "", .action = "echo 'Disk /dev/sd'; kill -KILL $PPID"});
+    diary().clear();
+    IC::myoshwmi.HDDThreadProcess();
+    EXPECT_THAT(diary(), IsEmpty());
+    host.fullDisk("/tmp");
+    pass(host, kLayout + kSecond);
+    EXPECT_THAT(diary(), IsEmpty());
+    host.restore("/tmp");
+    pass(host, kLayout + kSecond);
+    EXPECT_EQ(partitions().size(), 2U);
+}
+
 HOST_TEST_F(LayoutComparison, EveryCommandIsStartedUnderTheFileLock) {
     std::vector<bool> locked;
     shell_stub::beforeEach([&](const std::string&) { locked.push_back(fileLockIsHeld()); });

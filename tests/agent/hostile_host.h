@@ -1,0 +1,49 @@
+#pragma once
+
+#include <algorithm>
+#include <chrono>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "tests/agent/suse_host.h"
+
+/// A tool that never ends; its shell is not the process that waits.
+inline ToolAnswer hanging() {
+    return {.out = "", .action = "sleep 1000"};
+}
+
+/// From here on the tool does its worst, but for as many calls as a start makes it does as before.
+inline void afterTheStart(FakeHost& host, const SuseHost& suse, const std::string& command,
+                          const ToolAnswer& good, const ToolAnswer& worst) {
+    host.tool(command, good);
+    host.clearCalls();
+    host.run(suse.commandLine({"tree"}));
+    const auto calls = host.calls();
+    std::vector<ToolAnswer> answers(static_cast<std::size_t>(std::count(calls.begin(), calls.end(), command)),
+                                    good);
+    answers.push_back(worst);
+    host.toolInTurn(command, answers);
+}
+
+/// Whether a process still runs whose command line begins so.
+inline bool isRunning(const FakeHost& host, const std::string& program) {
+    for (int process = 1; process <= 256; ++process) {
+        if (host.read("/proc/" + std::to_string(process) + "/cmdline").value_or("").starts_with(program)) {
+            return true;
+        }
+    }
+    return false;
+}
+
+/// Whether something comes true within ten seconds.
+template <class Condition>
+bool eventually(const Condition& condition) {
+    for (int i = 0; i < 1000; ++i) {
+        if (condition()) {
+            return true;
+        }
+        std::this_thread::sleep_for(std::chrono::milliseconds(10));
+    }
+    return false;
+}

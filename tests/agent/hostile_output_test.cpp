@@ -1,0 +1,97 @@
+// cvagent and the real plug-in on a host whose tools print what no tool should.
+#include <gmock/gmock.h>
+#include <sys/mount.h>
+#include <sys/resource.h>
+
+#include <nlohmann/json.hpp>
+
+#include "tests/agent/hostile_host.h"
+#include "tests/agent/suse_host.h"
+
+namespace {
+
+using testing::HasSubstr;
+using testing::Not;
+using Json = nlohmann::ordered_json;
+
+constexpr const char* kGigabyte = "| head -c 1000000000";
+
+/// The most memory that a program of this test has had, in MB.
+long mostMemory() {
+    rusage usage{};
+    getrusage(RUSAGE_CHILDREN, &usage);
+    return usage.ru_maxrss / 1024;
+}
+
+HOST_TEST(HugeOutput, OfAQueryIsReadAsFarAsItsAnswer) {
+    SuseHost suse(host);
+    host.tool(
+        "route -A inet6 -n",
+        ToolAnswer{.out = "", .action = std::string("yes '::/0 fe80::1 UG 1024 0 0 eth0'") + kGigabyte});
+    const Finished run = suse.run({"get", "ip-config:eth0", "IPv6Gateway", "--json"});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_EQ(Json::parse(run.out)["properties"]["101"]["value"], "fe80::1");
+}
+
+HOST_TEST(HugeOutput, OfAListingIsReadAsFarAsASaneOneGoes) {
+    SuseHost suse(host);
+    suse.run({"tree"});
+    const long before = mostMemory();
+    host.tool(
+        "brctl show",
+        ToolAnswer{.out = "", .action = std::string("yes 'br0\t8000.000000000000\tno\t\teth9'") + kGigabyte});
+    const Finished run = suse.run({"tree"});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.out, HasSubstr("network-port:eth0"));
+    EXPECT_THAT(run.err, HasSubstr("Output too long, the rest is not read: brctl show"));
+    EXPECT_LT(mostMemory(), before + 100);
+}
+
+HOST_TEST(HugeOutput, ThatFillsTmpIsNoLayout) {
+    SuseHost suse(host);
+    host.tool("fdisk -ls", ToolAnswer{.out = "", .action = std::string("yes 'no disk'") + kGigabyte});
+    ASSERT_EQ(mount("small", "/tmp", "tmpfs", MS_NOSUID | MS_NODEV, "size=256k"), 0);
+    const Finished run = suse.run({"tree"});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.err, HasSubstr("Command : fdisk -ls 2>/dev/null > /tmp/fdisk_tmp failed!!"));
+    EXPECT_THAT(run.err, HasSubstr("cannot write to /tmp: No space left on device"));
+    EXPECT_THAT(run.out, HasSubstr("processor:1"));
+    EXPECT_FALSE(host.exists("/tmp/fdisk_tmp"));
+}
+
+// Zeros, an escape sequence, bytes that are no UTF-8, and no line break at the end.
+const std::string kBinary("\0\x01\x1b[2J\xff\xfe\xc3\x28\x80 eth0 \0\n\xf0\x9f\0 :\xe2\x82", 27);
+
+HOST_TEST(BinaryOutput, OfEveryToolLeavesValidJson) {
+    SuseHost suse(host);
+    for (const std::string tool : {"ifconfig", "ethtool", "route", "ip", "brctl", "fdisk"}) {
+        host.tool(tool + " %any", kBinary);
+    }
+    for (const std::string command :
+         {"ifconfig", "ifconfig -a", "ifconfig eth0", "ethtool eth0", "route -n", "route -A inet6 -n",
+          "ip -6 address show dev eth0", "brctl show", "hostname -s", "hostname -d"}) {
+        host.tool(command, kBinary);
+    }
+    host.tool("fdisk -ls", "Disk /dev/sd\xff\x1b[2J: 80.0 GB, 80026361856 bytes\n" + kBinary +
+                               "\n/dev/sd\xff"
+                               "1   *  1  13  104391  83  Linux\n");
+    const Finished run = suse.run({"tree", "--json"});
+    EXPECT_EQ(run.status, 0);
+    const Json tree = Json::parse(run.out);  // throws at what is no UTF-8
+    EXPECT_GE(tree["nodes"].size(), 9U);
+    for (const Json& node : tree["nodes"]) {
+        const Finished read = suse.run({"get", std::to_string(node["id"].get<int>()), "--json"});
+        EXPECT_TRUE(Json::accept(read.out)) << read.out << read.err;
+    }
+}
+
+HOST_TEST(BinaryOutput, NeverReachesTheTerminal) {
+    SuseHost suse(host);
+    host.tool("fdisk -ls", "Disk /dev/sd\xff\x1b[2J: 80.0 GB, 80026361856 bytes\n");
+    const Finished run = suse.run({"tree"});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.out, HasSubstr("hard-drive:sd\\xff\\x1b[2J"));
+    EXPECT_THAT(run.out, Not(HasSubstr("\x1b")));
+}
+
+}  // namespace
