@@ -29,9 +29,7 @@ void fillDrive(HardDriveNode& node, const std::string& sizeInBytes) {
     node.setProperty(HardDriveNode::devicePath, PropertyValue(device, true));
     node.setProperty(HardDriveNode::driveSize, PropertyValue(Number(thousandsOfBytes(sizeInBytes)), true));
     PropertyValue health;
-    if (node.getProperty(HardDriveNode::healthState, health).getStatus() != 0) {
-        return;
-    }
+    node.getProperty(HardDriveNode::healthState, health);
     node.setProperty(HardDriveNode::healthState, health);
     if (health == PropertyValue(Number(1U), true)) {
         log(kProgress) << "Hard Drive Node::Normal " << device;

@@ -5,7 +5,9 @@
 //   throwseven              OpenMI throws what is no exception
 //   badstart, throwstart    initialize fails, throws
 //   throwstop, sevenstop    unload throws, throws what is no exception
-//   find                    initialize asks the agent for nodes by name and hands it a node of another make
+//   find                    initialize asks the agent for nodes by name, hands it a node of another make;
+//   asks once
+//                           more when the library is closed
 //   manyerrors              initialize logs sixty different errors
 //   slow                    initialize takes half a second
 //   errors                  initialize logs errors
@@ -109,6 +111,13 @@ public:
 
 class FakeInterface : public IC::ManagementInterface {
 public:
+    ~FakeInterface() override {
+        IC::Node* node = nullptr;
+        if (told("find") && find_ != nullptr) {
+            note("at the end: " + find_("computer", &node).text());
+        }
+    }
+
     void setLoadCallBack(IC::LoadCallBack load, const void* context, IC::FindCallBack find) override {
         load_ = load;
         context_ = context;

@@ -79,6 +79,7 @@ HOST_TEST(TreeCommand, AnswersThePluginThatAsksForNodes) {
     EXPECT_THAT(cvagent.diary(), HasSubstr("\nhard-drive:sda: Hard Drive\n"));
     EXPECT_THAT(cvagent.diary(), HasSubstr("\nnowhere: there is no node 'nowhere'"));
     EXPECT_THAT(cvagent.diary(), HasSubstr("\nforeign: not a node of the framework\n"));
+    EXPECT_THAT(cvagent.diary(), testing::EndsWith("\nat the end: no plug-in is loaded\n"));
 }
 
 HOST_TEST(TreeCommand, HandsThePluginItsNumbers) {

@@ -173,6 +173,32 @@ TEST(WithoutRoot, SaysWhatWillBeMissingAndUsesTheHome) {
     EXPECT_TRUE(kept);
 }
 
+TEST(WithoutRoot, KeepsTheDataWhereTheUserKeepsState) {
+    const std::filesystem::path state =
+        std::filesystem::temp_directory_path() / ("cvagent-state-" + std::to_string(getpid()));
+    std::filesystem::create_directory(state);
+    std::filesystem::permissions(state, std::filesystem::perms::all);
+    const OnTerminal run = runAsNobody({"/usr/bin/env", "XDG_STATE_HOME=" + state.string(), CVAGENT_PROGRAM,
+                                        "--host-tools", "native", "--plugin", FAKE_PLUGIN_FILE, "tree"},
+                                       "/nonexistent");
+    const bool kept = std::filesystem::is_directory(state / "corvista/data");
+    std::filesystem::remove_all(state);
+    if (run.status == 126) {
+        GTEST_SKIP() << "the build tree is closed to other users";
+    }
+    EXPECT_EQ(run.status, 0) << run.output;
+    EXPECT_TRUE(kept);
+}
+
+TEST(WithoutRoot, WithoutAHomeThereIsNoPlaceForData) {
+    const OnTerminal run = runAsNobody({CVAGENT_PROGRAM, "--plugin", FAKE_PLUGIN_FILE, "tree"}, "");
+    if (run.status == 127) {
+        GTEST_SKIP() << "the build tree is closed to other users";
+    }
+    EXPECT_EQ(run.status, 1);
+    EXPECT_THAT(run.output, HasSubstr("there is no place for data; set CORVISTA_DATA_DIR=DIRECTORY"));
+}
+
 HOST_TEST(Logs, GoToTheFilesNamed) {
     const Finished run =
         CvagentRun(host).telling("errors")({"--log", "/tmp/log", "--trace", "/tmp/trace", "tree"});

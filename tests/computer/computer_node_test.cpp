@@ -10,6 +10,7 @@
 #include "mi/my_process.h"
 #include "tests/computer/computer_tools.h"
 #include "tests/computer/failing_calls.h"
+#include "tests/support/failing_new.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 
@@ -52,6 +53,20 @@ HOST_TEST(Computer, AnswersOtherIdsFromTheFrameworksStore) {
     }
     EXPECT_THAT(host.calls(), IsEmpty());
     EXPECT_THAT(host.clockCalls(), IsEmpty());
+}
+
+HOST_TEST(Computer, AReadThatFindsNoMemoryFails) {
+    const RunningComputer computer;
+    const std::string name = "a-host-whose-name-is-no-short-text";
+    ASSERT_EQ(sethostname(name.data(), name.size()), 0);
+    int failures = 0;
+    for (long allocation = 0, failed = 1; failed != 0; ++allocation) {
+        const FailingOnce once(allocation);
+        EXPECT_NO_THROW(failures += computer.status(IC::ComputerProperty::hostName)) << allocation;
+        failed = once.happened() ? 1 : 0;
+    }
+    EXPECT_GT(failures, 0);
+    EXPECT_EQ(computer.text(IC::ComputerProperty::hostName), name);
 }
 
 HOST_TEST(Computer, LogsEntryAndExitOfEveryReadAndWrite) {

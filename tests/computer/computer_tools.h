@@ -27,6 +27,10 @@ public:
         EXPECT_EQ(node_.getProperty(id, value).getStatus(), 0) << id;
         return value;
     }
+    unsigned char status(unsigned int id) const {
+        IC::PropertyValue value;
+        return node_.getProperty(id, value).getStatus();
+    }
     std::string text(unsigned int id) const { return static_cast<std::string>(read(id)); }
     /// What the framework keeps, without asking the host.
     IC::PropertyValue stored(unsigned int id) const {

@@ -11,7 +11,8 @@ corvista_test(computer LIBRARIES plugin_code test_support SOURCES
   computer/local_time_test.cpp
   computer/owner_data_test.cpp
   computer/system_data_test.cpp
-  computer/zone_table_test.cpp)
+  computer/zone_table_test.cpp
+  support/failing_new.cpp)
 target_compile_definitions(computer_test PRIVATE
   CVAGENT_PROGRAM="$<TARGET_FILE:cvagent>" CORVISTA_PLUGIN="$<TARGET_FILE:vantrelcvicoshwmi>")
 add_dependencies(computer_test cvagent vantrelcvicoshwmi)

@@ -1,8 +1,10 @@
 // The walk over the host's interfaces: what it runs, which interfaces get which nodes.
 #include <gmock/gmock.h>
 
+#include "network/port_walk.h"
 #include "tests/network/port_host.h"
 #include "tests/support/command_lines.h"
+#include "tests/support/failing_new.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/shell_stub.h"
 
@@ -157,6 +159,17 @@ HOST_TEST(PortWalk, ThatFailsAsAWholeIsLoggedAndTheRequestForItIsNotStored) {
     EXPECT_THAT(capture.ownMessages(6000), ElementsAre("NetworkPort error", "out of luck"));
     EXPECT_THAT(capture.ownMessages(), Contains("createNetworkPortNodes: exit"));
     EXPECT_TRUE(PortHost::stored(*config, 74).empty());
+}
+
+HOST_TEST(PortWalk, ThatFindsNoMemoryAtItsEndIsLogged) {
+    const PortHost plugin(host, "suse-two-nics");
+    auto walk = std::make_unique<IC::PortWalk>("host", "example.com");
+    const LogCapture capture;
+    {
+        const FailingOnce once(0);
+        walk.reset();
+    }
+    EXPECT_THAT(capture.messages(6000), ElementsAre("NetworkPort error", "std::bad_alloc"));
 }
 
 HOST_TEST(PortWalk, GivesEveryVLANAPort) {

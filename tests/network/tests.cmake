@@ -37,6 +37,7 @@ corvista_test(network_ports SOURCES
   network/command_count_test.cpp
   network/port_nodes_test.cpp
   network/port_walk_test.cpp
+  support/failing_new.cpp
   LIBRARIES plugin_code test_support)
 # The links of a real kernel are asked with our own classic tools too.
 add_dependencies(network_queries_test corvista-hosttools)
