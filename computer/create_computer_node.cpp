@@ -56,9 +56,9 @@ void prime(MutableNode& computer) {
 
 void OsHwMI::createComputerNodes() {
     const LogScope scope;
-    auto* computer = makeNode<ComputerNode>(*tree_.root, NodeType::computer, 0);
-    tree_.computer = computer;
+    auto* computer = makeNode<ComputerNode>(tree_.root, NodeType::computer, 0);
     appendNode(computer);
+    tree_.computer = computer;
     prime(*computer);
     computer->setStatus(kStatusGood);
     computer->setDescription("Computer");

@@ -36,7 +36,7 @@ void OsHwMI::createCpuNodeAndMap() {
             logCpu(kError) << "Invalid format: buffer = " << *line;
             continue;
         }
-        auto* processor = makeNode<MutableNode>(*tree_.planar, NodeType::processor, number);
+        auto* processor = makeNode<MutableNode>(tree_.planar, NodeType::processor, number);
         appendNode(processor);
         inventory_->processors.emplace(number++, processor);
     }

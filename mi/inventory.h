@@ -18,7 +18,7 @@ struct Inventory {
 };
 
 /// The nodes of the fixed upper levels, for whoever hangs nodes under them. Null outside initialize and
-/// unload.
+/// unload, and where a builder failed.
 struct StaticTree {
     MutableNode* osHw = nullptr;
     MutableNode* root = nullptr;
@@ -28,5 +28,8 @@ struct StaticTree {
     MutableNode* networkController = nullptr;
     MutableNode* diskController = nullptr;
 };
+
+/// The id of a node that another one is to hang under. Throws when there is none.
+unsigned int idOf(const MutableNode* parent);
 
 }  // namespace IC

@@ -50,17 +50,22 @@ OsHwMI::~OsHwMI() = default;
 
 Error OsHwMI::initialize(unsigned int miId, const Number& ownNodeId, const Number& firstNodeId) {
     const LogScope scope;
+    if (inventory_) {
+        stopMonitors();  // an agent that starts twice without a stop: they use what is made anew here
+    }
     // As at the first start, so also after an unload: the builders fill nodes, they must not write what they
     // read back to the host; and the drive monitor must run.
     OSHWMI::bInitflag = false;
     HardDriveNodeUpdate = false;
     {
         const std::lock_guard lock(inventoryGuard_);
-        inventory_ = std::make_unique<Inventory>();
+        inventory_.emplace();
     }
     initializing_ = 1;
     guarded("updateHostAndDomainName", [&] { updateHostAndDomainName(); });
-    OSHWMI::myerr = ManagementInterface::initialize(miId, ownNodeId, firstNodeId);
+    OSHWMI::myerr = {Error::failure, Number(), ""};  // what stays when the base throws
+    guarded("ManagementInterface::initialize",
+            [&] { OSHWMI::myerr = ManagementInterface::initialize(miId, ownNodeId, firstNodeId); });
     for (const Step& step : kStartUp) {
         guarded(step.name, [&] { step.run(*this); });
     }
@@ -71,8 +76,7 @@ Error OsHwMI::initialize(unsigned int miId, const Number& ownNodeId, const Numbe
 Error OsHwMI::unload() {
     const LogScope scope;
     HardDriveNodeUpdate = true;
-    guarded("stopHardDriveMonitor", [&] { stopHardDriveMonitor(); });
-    guarded("disableIndications", [&] { disableIndications(); });
+    stopMonitors();
     Error result = freeNodes();
     guarded("deleteSavedConfigurations", [] { deleteSavedConfigurations(); });
     guarded("deleteFdiskTmp", [] { deleteFdiskTmp(); });
@@ -96,6 +100,11 @@ void OsHwMI::publishNode(Node* node) {
     if (result.getStatus() != 0) {
         log(kError) << "addNewNode error = " << result;
     }
+}
+
+void OsHwMI::stopMonitors() {
+    guarded("stopHardDriveMonitor", [&] { stopHardDriveMonitor(); });
+    guarded("disableIndications", [&] { disableIndications(); });
 }
 
 void OsHwMI::stopHardDriveMonitor() {

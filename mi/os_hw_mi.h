@@ -3,6 +3,7 @@
 #include <map>
 #include <memory>
 #include <mutex>
+#include <optional>
 #include <string>
 #include <utility>
 #include <vector>
@@ -85,22 +86,22 @@ public:
 
 private:
     friend struct OsHwMITestAccess;
-
     struct StorageKind;  // storage/storage_build.h
 
     /// Takes the next node id and remembers it as drawn.
     unsigned int drawNodeId();
     /// Makes a node of the next id under `parent`. The caller lists it (appendNode) or publishes it.
     template <class NodeT, class... More>
-    NodeT* makeNode(const MutableNode& parent, unsigned int type, unsigned int index, More&&... more) {
-        return new NodeT(drawNodeId(), parent.getNodeId(), miIds(), type, index, std::forward<More>(more)...);
+    NodeT* makeNode(const MutableNode* parent, unsigned int type, unsigned int index, More&&... more) {
+        return new NodeT(drawNodeId(), idOf(parent), miIds(), type, index, std::forward<More>(more)...);
     }
-    MutableNode* createStaticNode(const MutableNode& parent, unsigned int type, unsigned int index,
+    MutableNode* createStaticNode(const MutableNode* parent, unsigned int type, unsigned int index,
                                   const char* description);
     /// An interface that is known already keeps its node.
     void rememberByName(const std::string& name, MutableNode* node);
     /// A copy: the walk over the interfaces and the network monitor run at the same time.
     std::map<std::string, MutableNode*> nodesByName() const;
+    void stopMonitors();
     void stopHardDriveMonitor();
     Error freeNodes();
     /// What a bond member's change since the last pass means for the bond (indications/).
@@ -122,9 +123,9 @@ private:
     std::unique_ptr<MutableNode> buildHardDrive(const std::string& line, unsigned int index, bool update);
     std::unique_ptr<MutableNode> buildPartition(const std::string& line, unsigned int index, bool update);
 
-    mutable std::mutex inventoryGuard_;     ///< guards drawnIds and nodesByName
-    std::unique_ptr<Inventory> inventory_;  ///< from initialize to unload
-    int initializing_ = 0;                  ///< 1 once initialize was called
+    mutable std::mutex inventoryGuard_;   ///< guards drawnIds and nodesByName
+    std::optional<Inventory> inventory_;  ///< from initialize to unload
+    int initializing_ = 0;                ///< 1 once initialize was called
 
     StaticTree tree_;
     std::vector<Node*> driveNodes_;

@@ -77,8 +77,7 @@ void OsHwMI::createLANEndPointNodes() {
     unsigned int endPoints = 0;
     unsigned int configs = 0;
     for (const auto& [name, ofInterface] : *addresses) {
-        CLANEndPointNode* endPoint =
-            createLANEndPoint(name, tree_.networkController->getNodeId(), ++endPoints);
+        CLANEndPointNode* endPoint = createLANEndPoint(name, idOf(tree_.networkController), ++endPoints);
         std::vector<CIPInfo*> infos = ofInterface;
         createIPConfigNodes(&infos, name, endPoint, configs);
     }
@@ -104,7 +103,7 @@ void OsHwMI::createIPConfigNodes(std::vector<CIPInfo*>* addresses, std::string n
                                  unsigned int& index) {
     const LogScope scope;
     for (const CIPInfo* address : *addresses) {
-        auto* config = makeNode<IPConfigNode>(*parent, NodeType::ipConfiguration, ++index, name);
+        auto* config = makeNode<IPConfigNode>(parent, NodeType::ipConfiguration, ++index, name);
         appendNode(config);
         config->setDescription("IP Configuration");
         config->setStatus(1);

@@ -69,7 +69,7 @@ void OsHwMI::visitInterface(const ListedInterface& interface, const PortWalk& wa
 }
 
 MutableNode* OsHwMI::createPort(const std::string& name, unsigned int index) {
-    auto* port = makeNode<NetworkPortNode>(*tree_.networkController, NodeType::networkPort, index, name);
+    auto* port = makeNode<NetworkPortNode>(tree_.networkController, NodeType::networkPort, index, name);
     appendNode(port);
     port->setDescription("Network Port");
     port->fill();
@@ -80,7 +80,7 @@ MutableNode* OsHwMI::createIPConfig(const ListedInterface& interface, const Muta
                                     const PortWalk& walk, unsigned int index,
                                     std::map<std::string, std::string>& settings) {
     log(kProgress) << "Creating an IPConfigNode for " << interface.name;
-    auto* config = makeNode<IPConfigNode>(parent, NodeType::ipConfiguration, index, interface.name);
+    auto* config = makeNode<IPConfigNode>(&parent, NodeType::ipConfiguration, index, interface.name);
     appendNode(config);
     log(kProgress) << "Size of Inteface  " << static_cast<unsigned int>(walk.bridgeMemberCount());
     config->setDescription(interface.fromBridgeListing ? "Bridge" : "IP Configuration");

@@ -85,7 +85,7 @@ void OsHwMI::createNetworkTeamingNodes() {
     for (const std::string& team : teams) {
         ++index;
         try {
-            auto* node = makeNode<NetworkTeamingNode>(*tree_.computer, NodeType::networkTeam, index, team);
+            auto* node = makeNode<NetworkTeamingNode>(tree_.computer, NodeType::networkTeam, index, team);
             appendNode(node);
             storeSnapshot(*node);
         } catch (const std::exception&) {

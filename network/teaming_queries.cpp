@@ -1,6 +1,9 @@
 #include "network/teaming_queries.h"
 
-#include <filesystem>
+#include <dirent.h>
+#include <unistd.h>
+
+#include <memory>
 
 #include "mi/command.h"
 #include "mi/line_file.h"
@@ -12,8 +15,6 @@
 namespace IC {
 
 namespace {
-
-namespace fs = std::filesystem;
 
 constexpr char kBonding[] = "/proc/net/bonding";
 
@@ -37,8 +38,7 @@ std::string roleValue(const std::string& port, const char* key) {
 }
 
 std::string activeMember(const std::string& team, const std::string& port) {
-    std::error_code unreadable;
-    if (!fs::exists(statusFile(team), unreadable)) {
+    if (access(statusFile(team).c_str(), F_OK) != 0) {
         return "";
     }
     // The search for eth1 also finds eth10: while eth10 is active, both ports say so. Readers have always
@@ -81,13 +81,12 @@ std::string linkFailures(const std::string& team, const std::string& port, const
 
 bool getNICTeams(std::vector<std::string>& teams) {
     const LogScope scope("Entering getNICTeams", "Exiting getNICTeams");
-    std::error_code failed;
-    fs::directory_iterator entry(kBonding, failed);
-    if (failed) {
+    const std::unique_ptr<DIR, int (*)(DIR*)> directory(opendir(kBonding), closedir);
+    if (directory == nullptr) {
         return false;
     }
-    for (; entry != fs::directory_iterator(); entry.increment(failed)) {
-        const std::string name = entry->path().filename();
+    while (const dirent* entry = readdir(directory.get())) {
+        const std::string name = entry->d_name;
         if (!name.starts_with('.') && !name.ends_with('~')) {
             teams.push_back(name);
         }

@@ -58,7 +58,7 @@ std::unique_ptr<MutableNode> OsHwMI::buildHardDrive(const std::string& line, uns
         return nullptr;
     }
     std::unique_ptr<HardDriveNode> node(
-        makeNode<HardDriveNode>(*tree_.diskController, NodeType::hardDrive, index, device));
+        makeNode<HardDriveNode>(tree_.diskController, NodeType::hardDrive, index, device));
     log(kProgress) << (update ? "Hard Drive Update created " : "New Hard Drive Node created ") << device;
     node->setDescription("Hard Drive");
     node->setStatus(kStatusGood);

@@ -41,7 +41,7 @@ void OsHwMI::createPartitionNodes(bool update) {
 std::unique_ptr<MutableNode> OsHwMI::buildPartition(const std::string& line, unsigned int index, bool) {
     const std::string device = firstToken(line);
     std::unique_ptr<DiskPartition> node(
-        makeNode<DiskPartition>(*tree_.diskController, NodeType::partition, index, device));
+        makeNode<DiskPartition>(tree_.diskController, NodeType::partition, index, device));
     node->setStatus(kStatusGood);
     node->setDescription("Partition");
     node->setProperty(DiskPartition::devicePath, PropertyValue(device, true));

@@ -30,6 +30,15 @@ public:
         : kind_(texts), known_(known), value_(value) {}
     PropertyValue(const std::vector<Number>& value, const bool& known)
         : kind_(numbers), known_(known), value_(value) {}
+    /// Assigned, not initialised: a variant of libstdc++ 12 whose copy finds no memory destroys what it never
+    /// made.
+    PropertyValue(const PropertyValue& other) : kind_(other.kind_), known_(other.known_) {
+        value_ = other.value_;
+    }
+    PropertyValue(PropertyValue&& other) = default;
+    PropertyValue& operator=(const PropertyValue& other) = default;
+    PropertyValue& operator=(PropertyValue&& other) = default;
+    ~PropertyValue() = default;
 
     KindType kind() const { return kind_; }
     bool known() const { return known_; }

@@ -131,11 +131,11 @@ HOST_TEST(LinkStates, OfABondIgnoreCodesThatAreNeitherUpNorDown) {
 
 HOST_TEST(LinkStates, GatherTheMembersOfAllBonds) {
     Bond bond(host, {});
-    host.file("/proc/net/bonding/bond1", "Slave Interface: eth7\nSlave Interface:   eth8\n");
+    host.file("/proc/net/bonding/bond1", "Slave Interface: eth7.100\nSlave Interface:   eth8\n");
     bond.interfaces.add("bond1", 1);
     LogCapture capture;
     bond.interfaces.mi().createCurNetNodeMap();
-    EXPECT_THAT(IC::OSHWMI_IND::slaves, ElementsAre("eth0", "eth1", "eth7", "eth8"));
+    EXPECT_THAT(IC::OSHWMI_IND::slaves, ElementsAre("eth0", "eth1", "eth7.100", "eth8"));
     EXPECT_THAT(capture.ownMessages(3000),
                 testing::IsSupersetOf({"Calling bondedNetNodeStatus() for bonded interface: bond0",
                                        "bondedNetNodeStatus: entry",

@@ -294,6 +294,16 @@ HOST_TEST(Lifecycle, StartsAgainAfterAStop) {
     IC::myoshwmi.unload();
 }
 
+HOST_TEST(Lifecycle, StartedTwiceWithoutAStopHasOnePairOfMonitors) {
+    initialize(IC::myoshwmi);
+    LogCapture capture;
+    initialize(IC::myoshwmi);
+    EXPECT_THAT(capture.ownMessages(), testing::Contains("eventThreadNetIndicationsThread terminated."));
+    EXPECT_THAT(capture.ownMessages(),
+                testing::Contains("disable Hard Drive updates: HardDriveUpdateMonitor terminated."));
+    IC::myoshwmi.unload();
+}
+
 HOST_TEST(Lifecycle, LogsARefusedNodeAndGoesOn) {
     initialize(IC::myoshwmi);
     IC::myoshwmi.setLoadCallBack(refuse, nullptr, nullptr);

@@ -95,6 +95,13 @@ HOST_TEST(BondingMode, IsTheDriversWords) {
     EXPECT_EQ(modeOf("bond3"), "load balancing (round-robin)");
 }
 
+HOST_TEST(BondingMode, LosesTheBlanksBeforeItAlone) {
+    host.file("/proc/net/bonding/bond0", "Bonding Mode:   two  words \n");
+    host.file("/proc/net/bonding/bond1", "Bonding Mode: \n");
+    EXPECT_EQ(modeOf("bond0"), "two  words ");
+    EXPECT_EQ(modeOf("bond1"), "") << "a line all the same";
+}
+
 HOST_TEST(BondingMode, IsEmptyWithoutAFileOrALine) {
     host.file("/proc/net/bonding/bond1", "Ethernet Channel Bonding Driver\nBonding Mode:none\n");
     const CommandLines commands;

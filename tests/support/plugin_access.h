@@ -17,8 +17,8 @@ namespace IC {
 /// is about the one there is, myoshwmi.
 struct OsHwMITestAccess {
     /// The containers as initialize makes them, without a tree and without monitors.
-    static void makeInventory(OsHwMI& mi) { mi.inventory_ = std::make_unique<Inventory>(); }
-    static bool hasInventory() { return myoshwmi.inventory_ != nullptr; }
+    static void makeInventory(OsHwMI& mi) { mi.inventory_.emplace(); }
+    static bool hasInventory() { return myoshwmi.inventory_.has_value(); }
     static std::vector<unsigned int> drawnIds() { return myoshwmi.inventory_->drawnIds; }
     static MutableNode* computer(OsHwMI& mi) { return mi.tree_.computer; }
 
