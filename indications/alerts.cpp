@@ -77,13 +77,14 @@ void OsHwMI::checkAndSendNetAlert() {
 }
 
 void OsHwMI::sendAlert(const Alert& alert) {
-    const auto [handler, context] = alertHandler();
-    if (handler == nullptr) {
+    const auto receiver = alertHandler();
+    if (receiver.first == nullptr) {
         return;
     }
     const char* const function = __func__;  // in the closure it would be another
     // An alert that went wrong is not sent again, and the next interface's goes out.
     contained([&] {
+        const auto [handler, context] = receiver;
         Error result = OSHWMI_IND::myerr;
         result = handler({alert}, context);
         logInd(kProgress, function) << "checkAndSendNetAlert: _alerthandler return code" << result;
