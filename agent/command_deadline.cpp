@@ -3,12 +3,11 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <array>
 #include <charconv>
-#include <cstdio>
 #include <filesystem>
 #include <fstream>
 #include <map>
+#include <sstream>
 #include <system_error>
 #include <vector>
 
@@ -37,9 +36,9 @@ Errands& errands() {
 }
 
 std::string secondsText(Seconds time) {
-    std::array<char, 32> text{};
-    std::snprintf(text.data(), text.size(), "%g s", time.count());
-    return text.data();
+    std::ostringstream text;
+    text << time.count() << " s";
+    return text.str();
 }
 
 /// The command as its author wrote it: the text that the shell was given.

@@ -2,7 +2,7 @@
 
 #include <sys/types.h>
 
-#include <compare>
+#include <tuple>
 #include <vector>
 
 #include "framework/export.h"
@@ -20,7 +20,10 @@ struct ChildProcess {
     pid_t id = 0;
     unsigned long long started = 0;  ///< clock ticks since the machine's start
 
-    auto operator<=>(const ChildProcess&) const = default;
+    bool operator==(const ChildProcess&) const = default;
+    friend bool operator<(const ChildProcess& left, const ChildProcess& right) {
+        return std::tie(left.id, left.started) < std::tie(right.id, right.started);
+    }
 };
 
 /// The child processes of one thread of this process that have not ended.
