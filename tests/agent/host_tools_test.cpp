@@ -11,6 +11,7 @@
 
 #include "agent/probe.h"
 #include "tests/support/fake_host.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
@@ -18,7 +19,6 @@ using cvagent::HostTools;
 using cvagent::inspectHostTools;
 using cvagent::Look;
 using cvagent::ToolReport;
-using testing::ElementsAre;
 using testing::IsEmpty;
 
 constexpr const char* kAdapters = "/opt/adapters";
@@ -59,7 +59,7 @@ HOST_TEST(HostTools, ThatSpeakAnotherFormatAreReplacedOneByOne) {
     host.tool("route -n", kRoute);
     host.tool("fdisk -ls", {"", 1, "fdisk: bad usage\n"});
     const auto reports = inspectHostTools(HostTools::automatic, Look::adapters, kAdapters);
-    EXPECT_THAT(adapted(reports), ElementsAre("ifconfig", "fdisk"));
+    EXPECT_THAT(adapted(reports), TextsAre("ifconfig", "fdisk"));
     EXPECT_EQ(reports[0].used(), "/opt/adapters/ifconfig");
     EXPECT_EQ(reports[1].used(), "/tools/route");
     EXPECT_FALSE(reports[2].classic);
@@ -68,7 +68,7 @@ HOST_TEST(HostTools, ThatSpeakAnotherFormatAreReplacedOneByOne) {
 HOST_TEST(HostTools, ThatAreMissingAreReplaced) {
     installAdapters(host);
     EXPECT_THAT(adapted(inspectHostTools(HostTools::automatic, Look::adapters, kAdapters)),
-                ElementsAre("ifconfig", "route", "fdisk"));
+                TextsAre("ifconfig", "route", "fdisk"));
 }
 
 HOST_TEST(HostTools, WithoutAdaptersTheHostsOwnAreUsed) {
@@ -83,7 +83,7 @@ HOST_TEST(HostTools, AHostWithoutDisksHasAClassicFdisk) {
     installAdapters(host);
     host.tool("fdisk -ls", "");
     EXPECT_THAT(adapted(inspectHostTools(HostTools::automatic, Look::adapters, kAdapters)),
-                ElementsAre("ifconfig", "route"));
+                TextsAre("ifconfig", "route"));
 }
 
 HOST_TEST(HostTools, ForcedChoicesRunNothing) {
@@ -91,7 +91,7 @@ HOST_TEST(HostTools, ForcedChoicesRunNothing) {
     host.tool("ifconfig lo", kClassicIfconfig);
     EXPECT_THAT(adapted(inspectHostTools(HostTools::native, Look::adapters, kAdapters)), IsEmpty());
     EXPECT_THAT(adapted(inspectHostTools(HostTools::classic, Look::adapters, kAdapters)),
-                ElementsAre("ifconfig", "route", "fdisk"));
+                TextsAre("ifconfig", "route", "fdisk"));
     EXPECT_THAT(host.calls(), IsEmpty());
 }
 
@@ -110,7 +110,7 @@ HOST_TEST(HostTools, OnlyTheAdaptersInUseComeFirst) {
     cvagent::putAdaptersFirst(inspectHostTools(HostTools::automatic, Look::adapters, kAdapters),
                               "/tmp/links");
     EXPECT_EQ(std::string(std::getenv("PATH")), "/tmp/links:/tools:/usr/sbin:/usr/bin:/sbin:/bin");
-    EXPECT_THAT(host.listDirectory("/tmp/links"), ElementsAre("fdisk"));
+    EXPECT_THAT(host.listDirectory("/tmp/links"), TextsAre("fdisk"));
 }
 
 HOST_TEST(HostTools, ThePathStaysWhenNoAdapterIsUsed) {

@@ -1,5 +1,6 @@
 // cvagent and the real plug-in together: what is read from a SUSE host, and what each write does to it.
 #include "tests/agent/suse_host.h"
+#include "tests/support/texts_are.h"
 
 #include <gmock/gmock.h>
 #include <signal.h>
@@ -8,7 +9,6 @@
 
 namespace {
 
-using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::IsEmpty;
 using testing::StartsWith;
@@ -51,7 +51,7 @@ HOST_TEST(SuseHost, LeavesNothingButTheStateFileBehind) {
     EXPECT_THAT(host.listDirectory("/tmp"), IsEmpty());
     // A stop in the middle of the monitor's first pass leaves none: what a killed command says is not kept.
     EXPECT_THAT(host.listDirectory("/opt/vantrel/corvista/data"),
-                testing::AnyOf(IsEmpty(), ElementsAre("oshwminetind.dat")));
+                testing::AnyOf(IsEmpty(), TextsAre("oshwminetind.dat")));
     EXPECT_THAT(suse.changes(), IsEmpty());
 }
 
@@ -101,7 +101,7 @@ HOST_TEST(SuseHost, TheMaskIsWrittenAndApplied) {
     EXPECT_EQ(
         suse.read(SuseHost::kInterfaceFile),
         "# made by hand\nBOOTPROTO='static'\nIPADDR=192.0.2.10\nNETMASK=255.255.0.0\nSTARTMODE='onboot'\n");
-    EXPECT_THAT(suse.changes(), ElementsAre("ifconfig eth0 netmask 255.255.0.0"));
+    EXPECT_THAT(suse.changes(), TextsAre("ifconfig eth0 netmask 255.255.0.0"));
 }
 
 HOST_TEST(SuseHost, TheIpv6AddressIsWrittenToTwoFiles) {
@@ -113,7 +113,7 @@ HOST_TEST(SuseHost, TheIpv6AddressIsWrittenToTwoFiles) {
         "# made by hand\nBOOTPROTO='static'\nIPADDR=192.0.2.10\nNETMASK=255.255.255.0\nSTARTMODE='onboot'\n"
         "LABEL_1='1'\nIPADDR_1=2001:db8::20\n");
     EXPECT_EQ(suse.read("/etc/hosts"), "127.0.0.1\tlocalhost\n2001:db8::20\tlinux.example.com\tlinux\n");
-    EXPECT_THAT(suse.changes(), ElementsAre("hostname linux.example.com"));
+    EXPECT_THAT(suse.changes(), TextsAre("hostname linux.example.com"));
 }
 
 HOST_TEST(SuseHost, ThePrefixLengthIsWritten) {
@@ -145,7 +145,7 @@ HOST_TEST(SuseHost, TheHostNameIsSetAndWritten) {
     SuseHost suse(host);
     host.tool("hostname earth.example.com", "");
     write(suse, kIp, "HostName", {"earth"});
-    EXPECT_THAT(suse.changes(), ElementsAre("hostname earth.example.com"));
+    EXPECT_THAT(suse.changes(), TextsAre("hostname earth.example.com"));
     EXPECT_EQ(suse.read("/etc/hosts"), "127.0.0.1\tlocalhost\n192.0.2.10\tearth.example.com\tearth\n");
     EXPECT_EQ(suse.read("/etc/HOSTNAME"), "earth.example.com");
 }
@@ -154,7 +154,7 @@ HOST_TEST(SuseHost, TheDomainNameIsSetAndWritten) {
     SuseHost suse(host);
     host.tool("hostname linux.example.org", "");
     write(suse, kIp, "DomainName", {"example.org"});
-    EXPECT_THAT(suse.changes(), ElementsAre("hostname linux.example.org"));
+    EXPECT_THAT(suse.changes(), TextsAre("hostname linux.example.org"));
     EXPECT_EQ(suse.read("/etc/HOSTNAME"), "linux.example.org");
 }
 
@@ -162,7 +162,7 @@ HOST_TEST(SuseHost, TheIpv4GatewayIsWritten) {
     SuseHost suse(host);
     host.tool("route del -host 192.0.2.10 gw 192.0.2.254 eth0", "");
     write(suse, kIp, "IPv4Gateway", {"192.0.2.254"});
-    EXPECT_THAT(suse.changes(), ElementsAre("route del -host 192.0.2.10 gw 192.0.2.254 eth0"));
+    EXPECT_THAT(suse.changes(), TextsAre("route del -host 192.0.2.10 gw 192.0.2.254 eth0"));
     EXPECT_EQ(suse.read("/etc/sysconfig/network/ifroute-eth0"), "192.0.2.10\t192.0.2.254\t-\n");
     EXPECT_EQ(suse.read("/etc/sysconfig/network/routes"), "default\t192.0.2.254\t-\n");
 }
@@ -183,9 +183,9 @@ HOST_TEST(SuseHost, TheInterfaceIsBroughtUpAndDown) {
     host.tool("ifconfig eth0 up", "");
     host.tool("ifconfig eth0 down", "");
     write(suse, kIp, "InterfaceState", {"12"});
-    EXPECT_THAT(suse.changes(), ElementsAre("ifconfig eth0 down"));
+    EXPECT_THAT(suse.changes(), TextsAre("ifconfig eth0 down"));
     write(suse, kIp, "InterfaceState", {"up"});
-    EXPECT_THAT(suse.changes(), ElementsAre("ifconfig eth0 up"));
+    EXPECT_THAT(suse.changes(), TextsAre("ifconfig eth0 up"));
 }
 
 HOST_TEST(SuseHost, PortsAreEnumeratedAgain) {
@@ -236,9 +236,9 @@ HOST_TEST(SuseComputer, ThePowerActionRunsShutdown) {
     write(suse, "computer", "PowerAction", {"1"});
     EXPECT_THAT(suse.changes(), IsEmpty());
     write(suse, "computer", "PowerAction", {"9", "--yes"});
-    EXPECT_THAT(suse.changes(), ElementsAre("shutdown -r now"));
+    EXPECT_THAT(suse.changes(), TextsAre("shutdown -r now"));
     write(suse, "computer", "PowerAction", {"12", "--yes"});
-    EXPECT_THAT(suse.changes(), ElementsAre("shutdown -h now"));
+    EXPECT_THAT(suse.changes(), TextsAre("shutdown -h now"));
     EXPECT_EQ(suse.run({"set", "computer", "PowerAction", "9"}).status, 2);
     EXPECT_THAT(suse.changes(), IsEmpty());
 }

@@ -1,4 +1,5 @@
 #include "agent/value_check.h"
+#include "tests/support/texts_are.h"
 
 #include <gmock/gmock.h>
 
@@ -6,7 +7,6 @@ namespace {
 
 using cvagent::Property;
 using cvagent::check::Value;
-using testing::ElementsAre;
 
 constexpr unsigned int kComputer = 40;
 constexpr unsigned int kIpConfig = 29;
@@ -215,7 +215,7 @@ TEST(ValueCheck, NameServersAreAddressesOfBothKinds) {
     const Value value = given(kIpConfig, "DNSServers", {"192.0.2.53", "2001:db8::53", "127.0.0.53", "::1"});
     ASSERT_TRUE(value);
     ASSERT_NE(value->asTexts(), nullptr);
-    EXPECT_THAT(*value->asTexts(), ElementsAre("192.0.2.53", "2001:db8::53", "127.0.0.53", "::1"));
+    EXPECT_THAT(*value->asTexts(), TextsAre("192.0.2.53", "2001:db8::53", "127.0.0.53", "::1"));
     expectRefused(kIpConfig, "DNSServers",
                   {"0.0.0.0", "224.0.0.1", "ff02::1", "dns.example.com", "192.0.2.53,192.0.2.54"});
 }
@@ -252,7 +252,7 @@ TEST(ValueCheck, DomainNamesAreLabelsJoinedByDots) {
 TEST(ValueCheck, SuffixesFitASearchLine) {
     const Value value = given(kIpConfig, "DNSSuffixes", {"example.com", "example.org"});
     ASSERT_TRUE(value && value->asTexts() != nullptr);
-    EXPECT_THAT(*value->asTexts(), ElementsAre("example.com", "example.org"));
+    EXPECT_THAT(*value->asTexts(), TextsAre("example.com", "example.org"));
     const std::vector<std::string> fitting(8, std::string(31, 'a') + "." + std::string(30, 'b'));  // 8 * 63
     EXPECT_TRUE(given(kIpConfig, "DNSSuffixes", fitting));
     std::vector<std::string> tooMuch = fitting;

@@ -6,10 +6,10 @@
 
 #include "tests/computer/computer_host.h"
 #include "tests/support/fake_host.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
-using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::IsEmpty;
 
@@ -44,7 +44,7 @@ protected:
         std::vector<std::string> calls = host.calls();
         EXPECT_GE(calls.size(), 3U);
         EXPECT_THAT(std::vector(calls.begin(), calls.begin() + 3),
-                    ElementsAre("hostname -s", "hostname -d", "hostname"));
+                    TextsAre("hostname -s", "hostname -d", "hostname"));
         return {calls.begin() + 3, calls.end()};
     }
     static void expectOtherFilesUntouched(const FakeHost& host, const std::string& changed = "") {
@@ -136,9 +136,9 @@ HOST_TEST_F(ComputerThroughAgent, SaysWhenItsClockCannotBeSet) {
 
 HOST_TEST_F(ComputerThroughAgent, RestartsAndHaltsWhenTheUserIsSure) {
     EXPECT_EQ(agent(host, {"set", "--yes", "computer", "PowerAction", "9"}).status, 0);
-    EXPECT_THAT(furtherCalls(host), ElementsAre("shutdown -r now"));
+    EXPECT_THAT(furtherCalls(host), TextsAre("shutdown -r now"));
     EXPECT_EQ(agent(host, {"set", "--yes", "computer", "PowerAction", "12"}).status, 0);
-    EXPECT_THAT(furtherCalls(host), ElementsAre("shutdown -h now"));
+    EXPECT_THAT(furtherCalls(host), TextsAre("shutdown -h now"));
     EXPECT_EQ(agent(host, {"set", "computer", "PowerAction", "1"}).status, 0);
     EXPECT_THAT(furtherCalls(host), IsEmpty());
     EXPECT_NE(agent(host, {"set", "computer", "PowerAction", "9"}).status, 0);

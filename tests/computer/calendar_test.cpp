@@ -7,6 +7,7 @@
 
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
@@ -87,8 +88,8 @@ HOST_TEST(Calendar, SaysHonestlyWhatATimeOfThisPlatformCannotHold) {
 HOST_TEST(Calendar, LogsEntryAndExit) {
     LogCapture capture;
     IC::ito_time_t(2001, 7, 1, 0, 12, 0, 0, kStandardTime);
-    EXPECT_THAT(capture.messages(3000), testing::ElementsAre("ito_time_t: entry", "to_time_t: entry",
-                                                             "to_time_t: exit", "ito_time_t: exit"));
+    EXPECT_THAT(capture.messages(3000),
+                TextsAre("ito_time_t: entry", "to_time_t: entry", "to_time_t: exit", "ito_time_t: exit"));
     EXPECT_TRUE(capture.everyLineTwice());
 }
 

@@ -7,6 +7,7 @@
 #include "tests/computer/computer_tools.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
@@ -121,7 +122,7 @@ HOST_TEST(ZoneInClockFile, KeepsTheFileWholeOnAFullDisk) {
     EXPECT_TRUE(IC::setTimezone(kIndia));
     EXPECT_EQ(host.read(kClock), "# comment\nTIMEZONE=\"x\"\n");
     EXPECT_FALSE(host.exists(kCopy));
-    EXPECT_THAT(capture.messages(6000), ElementsAre("Could not write all of '/etc/sysconfig/clock.bak'."));
+    EXPECT_THAT(capture.messages(6000), TextsAre("Could not write all of '/etc/sysconfig/clock.bak'."));
 }
 
 /// A disk that holds the clock file and no more than half of its copy.
@@ -140,7 +141,7 @@ HOST_TEST(ZoneInClockFile, StaysAsItWasWhenTheDiskHasNoRoomForItsCopy) {
     EXPECT_EQ(host.read(kClock), before);
     EXPECT_FALSE(host.exists(kCopy));
     EXPECT_TRUE(host.exists("/etc/localtime"));
-    EXPECT_THAT(capture.messages(6000), ElementsAre("Could not write all of '/etc/sysconfig/clock.bak'."));
+    EXPECT_THAT(capture.messages(6000), TextsAre("Could not write all of '/etc/sysconfig/clock.bak'."));
 }
 
 HOST_TEST(ZoneInClockFile, LosesItsCopyAlsoWhenItCannotBeTakenBack) {
@@ -154,7 +155,7 @@ HOST_TEST(ZoneInClockFile, LosesItsCopyAlsoWhenItCannotBeTakenBack) {
     EXPECT_TRUE(IC::setTimezone(kIndia));
     EXPECT_EQ(host.read(kClock), before);
     EXPECT_FALSE(host.exists(kCopy));
-    EXPECT_THAT(capture.messages(6000), ElementsAre("Could not write all of '/etc/sysconfig/clock'."));
+    EXPECT_THAT(capture.messages(6000), TextsAre("Could not write all of '/etc/sysconfig/clock'."));
 }
 
 HOST_TEST(HardwareClockMode, ChangesTheFirstHwclockLineAlone) {
@@ -178,8 +179,8 @@ HOST_TEST(HardwareClockMode, LogsEntryTheOpenPipesAndExit) {
     host.file(kClock, "HWCLOCK=\"-u\"\n");
     LogCapture capture;
     EXPECT_TRUE(IC::setAutoDSTEnabled(true));
-    EXPECT_THAT(capture.messages(), ElementsAre("setAutoDSTEnabled: entry", "mypopen():  Count value 1",
-                                                "setAutoDSTEnabled: exit"));
+    EXPECT_THAT(capture.messages(),
+                TextsAre("setAutoDSTEnabled: entry", "mypopen():  Count value 1", "setAutoDSTEnabled: exit"));
     EXPECT_EQ(capture.messages(3000).size(), 3U);
     EXPECT_TRUE(capture.everyLineTwice());
 }

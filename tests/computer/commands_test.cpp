@@ -9,10 +9,10 @@
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
-using testing::ElementsAre;
 using testing::IsEmpty;
 
 HOST_TEST(ComputerCommands, AreExactlyThese) {
@@ -33,12 +33,12 @@ HOST_TEST(ComputerCommands, AreExactlyThese) {
     IC::setAutoDSTEnabled(true);
     IC::executeDomainandHostnameChanges("alpha", "example.org", true, "");
     IC::executeDomainandHostnameChanges("alpha", "", true, "");
-    EXPECT_THAT(commands.all(),
-                ElementsAre("hostname -s 2> /dev/null", "hostname -d 2> /dev/null", "hostname 2> /dev/null",
-                            "/usr/sbin/vpdupdate 2> /dev/null", "/sbin/update-lsvpd-db 2> /dev/null",
-                            "shutdown -r now", "shutdown -h now",
-                            "/bin/cp /etc/sysconfig/clock /etc/sysconfig/clock.bak",
-                            "hostname alpha.example.org", "hostname alpha"));
+    EXPECT_THAT(
+        commands.all(),
+        TextsAre("hostname -s 2> /dev/null", "hostname -d 2> /dev/null", "hostname 2> /dev/null",
+                 "/usr/sbin/vpdupdate 2> /dev/null", "/sbin/update-lsvpd-db 2> /dev/null", "shutdown -r now",
+                 "shutdown -h now", "/bin/cp /etc/sysconfig/clock /etc/sysconfig/clock.bak",
+                 "hostname alpha.example.org", "hostname alpha"));
 }
 
 HOST_TEST(ComputerCommands, AreNotNeededForAnythingElse) {
@@ -64,7 +64,7 @@ HOST_TEST(ComputerCommands, ThatCannotBeStartedChangeNoName) {
     const NoDescriptors none;
     LogCapture capture;
     IC::executeDomainandHostnameChanges("alpha", "example.org", true, "");
-    EXPECT_THAT(capture.messages(6000), ElementsAre("Could not set HostName !!"));
+    EXPECT_THAT(capture.messages(6000), TextsAre("Could not set HostName !!"));
     EXPECT_EQ(host.read("/etc/hosts"), "127.0.0.2 old\n");
     EXPECT_FALSE(host.exists("/etc/HOSTNAME"));
 }

@@ -13,6 +13,7 @@
 #include "tests/support/failing_new.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
@@ -25,8 +26,8 @@ TEST(Computer, LogsItsBeginningAndItsEnd) {
     LogCapture capture;
     { const IC::ComputerNode node(7, 2, {1, 4}, 40, 0); }
     EXPECT_THAT(capture.messages(3000),
-                ElementsAre("ComputerNode::ComputerNode: entry", "ComputerNode::ComputerNode: exit",
-                            "ComputerNode::~ComputerNode: entry", "ComputerNode::~ComputerNode: exit"));
+                TextsAre("ComputerNode::ComputerNode: entry", "ComputerNode::ComputerNode: exit",
+                         "ComputerNode::~ComputerNode: entry", "ComputerNode::~ComputerNode: exit"));
     EXPECT_TRUE(capture.everyLineTwice());
 }
 
@@ -75,8 +76,8 @@ HOST_TEST(Computer, LogsEntryAndExitOfEveryReadAndWrite) {
     computer.read(200);
     computer.write(1, "x");
     EXPECT_THAT(capture.messages(),
-                ElementsAre("ComputerNode::getProperty: entry", "ComputerNode::getProperty: exit",
-                            "ComputerNode::setProperty: entry", "ComputerNode::setProperty: exit"));
+                TextsAre("ComputerNode::getProperty: entry", "ComputerNode::getProperty: exit",
+                         "ComputerNode::setProperty: entry", "ComputerNode::setProperty: exit"));
     EXPECT_EQ(capture.messages(3000).size(), 4U);
     EXPECT_TRUE(capture.everyLineTwice());
 }
@@ -120,9 +121,9 @@ HOST_TEST(ComputerName, SaysWhenTheKernelDoesNot) {
     EXPECT_EQ(value.kind(), PropertyValue::none);
     EXPECT_THAT(
         capture.messages(),
-        ElementsAre("ComputerNode::getProperty: entry", "ComputerNode::getProperty Name Inside Case",
-                    "ComputerNode::getProperty Name::GetHostname Failed", "ComputerNode::getProperty: exit"));
-    EXPECT_THAT(capture.messages(6000), ElementsAre("ComputerNode::getProperty Name::GetHostname Failed"));
+        TextsAre("ComputerNode::getProperty: entry", "ComputerNode::getProperty Name Inside Case",
+                 "ComputerNode::getProperty Name::GetHostname Failed", "ComputerNode::getProperty: exit"));
+    EXPECT_THAT(capture.messages(6000), TextsAre("ComputerNode::getProperty Name::GetHostname Failed"));
 }
 
 HOST_TEST(ComputerName, IsOnlyStoredWhenWritten) {
@@ -150,7 +151,7 @@ HOST_TEST(ComputerPower, TakesNumbersEnumerationsAndNumericTexts) {
     RunningComputer computer;
     EXPECT_EQ(computer.write(123, PropertyValue(IC::EnumValue(9), true)), 0);
     EXPECT_EQ(computer.write(123, "12"), 0);
-    EXPECT_THAT(host.calls(), ElementsAre("shutdown -r now", "shutdown -h now"));
+    EXPECT_THAT(host.calls(), TextsAre("shutdown -r now", "shutdown -h now"));
 }
 
 HOST_TEST(ComputerPower, RunsNothingForAnyOtherNumber) {
@@ -178,7 +179,7 @@ HOST_TEST(ComputerPower, DoesNotTellWhetherTheCommandSucceeded) {
     EXPECT_EQ(computer.write(123, 9U), 0);
     host.toolMissing("shutdown");
     EXPECT_EQ(computer.write(123, 12U), 0);
-    EXPECT_THAT(host.calls(), ElementsAre("shutdown -r now"));
+    EXPECT_THAT(host.calls(), TextsAre("shutdown -r now"));
 }
 
 HOST_TEST(ComputerPower, IsOnlyStoredBeforeStartUpHasEnded) {
@@ -256,7 +257,7 @@ HOST_TEST(ComputerClock, SaysWhenTheKernelRefuses) {
     EXPECT_EQ(computer.write(126, "2001-09-09T01:46:40Z"), 1);
     EXPECT_EQ(host.clockCalls().size(), 1U);
     EXPECT_THAT(capture.messages(),
-                ElementsAre("ComputerNode::setProperty: entry", "ComputerNode::setProperty: exit"));
+                TextsAre("ComputerNode::setProperty: entry", "ComputerNode::setProperty: exit"));
 }
 
 HOST_TEST(ComputerClock, IsOnlyStoredBeforeStartUpHasEnded) {

@@ -9,12 +9,12 @@
 #include "tests/computer/computer_host.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
 using IC::Number;
 using IC::PropertyValue;
-using testing::ElementsAre;
 
 /// The tree down to the computer.
 class Started {
@@ -62,7 +62,7 @@ HOST_TEST(ComputerStart, FillsTheStore) {
     EXPECT_EQ(started.stored(108), known("alpha.example.org"));
     EXPECT_TRUE(started.stored(108).known());
     EXPECT_EQ(started.stored(200).kind(), PropertyValue::none);
-    EXPECT_THAT(host.calls(), ElementsAre("hostname"));
+    EXPECT_THAT(host.calls(), TextsAre("hostname"));
 }
 
 HOST_TEST(ComputerStart, GivesStatusAndDescription) {
@@ -90,7 +90,7 @@ HOST_TEST(ComputerStart, GoesThroughTheNodesOwnReadsAndWritesInOrder) {
     host.tool("hostname", "alpha\n");
     const Started started;
     EXPECT_THAT(begun(started.log()),
-                ElementsAre("set", "set", "get", "set", "get", "set", "get", "set", "get", "set", "set"));
+                TextsAre("set", "set", "get", "set", "get", "set", "get", "set", "get", "set", "set"));
     EXPECT_EQ(started.log().messages().front(), "createComputerNodes: entry");
     EXPECT_EQ(started.log().messages().back(), "createComputerNodes: exit");
 }

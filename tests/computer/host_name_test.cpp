@@ -10,10 +10,10 @@
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/plugin_access.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
-using testing::ElementsAre;
 using testing::IsEmpty;
 
 class Names {
@@ -34,9 +34,9 @@ HOST_TEST(CachedNames, AreTheFirstLinesAsTheyCame) {
     names.update();
     EXPECT_EQ(names.host(), "alpha\n");
     EXPECT_EQ(names.domain(), "example.org\n");
-    EXPECT_THAT(host.calls(), ElementsAre("hostname -s", "hostname -d"));
+    EXPECT_THAT(host.calls(), TextsAre("hostname -s", "hostname -d"));
     EXPECT_THAT(capture.messages(),
-                ElementsAre("updateHostAndDomainName: entry", "updateHostAndDomainName: exit"));
+                TextsAre("updateHostAndDomainName: entry", "updateHostAndDomainName: exit"));
 }
 
 HOST_TEST(CachedNames, AreEmptyWhenNothingWasPrinted) {
@@ -93,11 +93,11 @@ HOST_TEST(NameChange, RunsOneCommandAndLogsItsInputs) {
     host.file(kHosts, "");
     LogCapture capture;
     IC::executeDomainandHostnameChanges("alpha", "example.org", true, "10.0.0.5");
-    EXPECT_THAT(host.calls(), ElementsAre("hostname alpha.example.org"));
+    EXPECT_THAT(host.calls(), TextsAre("hostname alpha.example.org"));
     EXPECT_THAT(capture.messages(3000),
-                ElementsAre("executeDomainandHostnameChanges: entry", "HostName : alpha",
-                            "DomainName : example.org", "Operation : 1", "IPAddress : 10.0.0.5",
-                            "command: hostname alpha.example.org", "executeDomainandHostnameChanges: exit"));
+                TextsAre("executeDomainandHostnameChanges: entry", "HostName : alpha",
+                         "DomainName : example.org", "Operation : 1", "IPAddress : 10.0.0.5",
+                         "command: hostname alpha.example.org", "executeDomainandHostnameChanges: exit"));
     EXPECT_EQ(capture.messages().size(), 7U);
     EXPECT_TRUE(capture.everyLineTwice());
     EXPECT_EQ(IC::MyProcess::cnt, 0);
@@ -118,7 +118,7 @@ HOST_TEST(NameChange, WithoutADomainSetsTheBareNameAndWritesALoneDot) {
     host.recordOnly("hostname");
     host.file(kHosts, "");
     IC::executeDomainandHostnameChanges("alpha", "", true, "");
-    EXPECT_THAT(host.calls(), ElementsAre("hostname alpha"));
+    EXPECT_THAT(host.calls(), TextsAre("hostname alpha"));
     EXPECT_EQ(host.read(kHosts), "127.0.0.2\talpha.\talpha\n");
     EXPECT_EQ(host.read(kHostName), "alpha.");
 }
@@ -138,7 +138,7 @@ HOST_TEST(NameChange, HandsTheShellEveryNameAsItIs) {
     host.recordOnly("reboot");
     host.file(kHosts, "");
     IC::executeDomainandHostnameChanges("alpha; reboot #", "example.org", true, "");
-    EXPECT_THAT(host.calls(), ElementsAre("hostname alpha", "reboot"));
+    EXPECT_THAT(host.calls(), TextsAre("hostname alpha", "reboot"));
     EXPECT_EQ(host.read(kHosts), "127.0.0.2\talpha; reboot #.example.org\talpha; reboot #\n");
 }
 
@@ -147,7 +147,7 @@ HOST_TEST(NameChange, TakesACommandOf511Bytes) {
     host.file(kHosts, "");
     const std::string name(511 - std::string("hostname .org").size(), 'n');
     IC::executeDomainandHostnameChanges(name, "org", true, "");
-    EXPECT_THAT(host.calls(), ElementsAre("hostname " + name + ".org"));
+    EXPECT_THAT(host.calls(), TextsAre("hostname " + name + ".org"));
     EXPECT_EQ(host.read(kHostName), name + ".org");
 }
 

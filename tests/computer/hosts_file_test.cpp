@@ -7,10 +7,10 @@
 #include "tests/computer/computer_tools.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
-using testing::ElementsAre;
 using testing::IsEmpty;
 
 class HostsFile : public HostFixture {
@@ -30,7 +30,7 @@ HOST_TEST_F(HostsFile, HoldsOneEntryForTheHostAtTheEnd) {
     change();
     EXPECT_EQ(host.read(kHosts), std::string("127.0.0.1\tlocalhost\n::1 localhost\n") + kEntry);
     EXPECT_EQ(host.read(kHostName), "alpha.example.org");
-    EXPECT_THAT(host.calls(), ElementsAre("hostname alpha.example.org"));
+    EXPECT_THAT(host.calls(), TextsAre("hostname alpha.example.org"));
 }
 
 HOST_TEST_F(HostsFile, GivesUpTheLinesOfTheAddressAndOfTheLoopback) {
@@ -91,8 +91,8 @@ HOST_TEST_F(HostsFile, IsTheSameAfterTheSameChange) {
 HOST_TEST_F(HostsFile, StopsTheChangeWhenItIsMissing) {
     LogCapture capture;
     change();
-    EXPECT_THAT(capture.messages(6000), ElementsAre("Can not open '/etc/hosts' in Read mode."));
-    EXPECT_THAT(host.calls(), ElementsAre("hostname alpha.example.org"));
+    EXPECT_THAT(capture.messages(6000), TextsAre("Can not open '/etc/hosts' in Read mode."));
+    EXPECT_THAT(host.calls(), TextsAre("hostname alpha.example.org"));
     EXPECT_FALSE(host.exists(kHosts));
     EXPECT_FALSE(host.exists(kHostName));
     EXPECT_EQ(capture.messages().back(), "executeDomainandHostnameChanges: exit");
@@ -104,7 +104,7 @@ HOST_TEST_F(HostsFile, StopsTheChangeOnAReadOnlyFileSystem) {
     host.readOnly("/etc");
     LogCapture capture;
     change();
-    EXPECT_THAT(capture.messages(6000), ElementsAre("Can not open '/etc/hosts' in write mode."));
+    EXPECT_THAT(capture.messages(6000), TextsAre("Can not open '/etc/hosts' in write mode."));
     EXPECT_EQ(host.read(kHosts), "127.0.0.2 old\n");
     EXPECT_EQ(host.read(kHostName), "old");
 }
@@ -115,7 +115,7 @@ HOST_TEST_F(HostsFile, StaysWholeOnAFullDisk) {
     host.fullDisk("/etc");
     LogCapture capture;
     change();
-    EXPECT_THAT(capture.messages(6000), ElementsAre("Can not open '/etc/hosts' in write mode."));
+    EXPECT_THAT(capture.messages(6000), TextsAre("Can not open '/etc/hosts' in write mode."));
     EXPECT_EQ(host.read(kHosts), "10.0.0.1 a\n127.0.0.2 old\n");
     EXPECT_EQ(host.read(kHostName), "old");
 }
@@ -128,7 +128,7 @@ HOST_TEST_F(HostsFile, StaysWholeWhenTheDiskHasNoRoomForALongerOne) {
     host.symlink(kHosts, "/etc/disk/hosts");
     LogCapture capture;
     change(std::string(20000, '1'));
-    EXPECT_THAT(capture.messages(6000), ElementsAre("Could not write all of '/etc/hosts'."));
+    EXPECT_THAT(capture.messages(6000), TextsAre("Could not write all of '/etc/hosts'."));
     EXPECT_EQ(host.read(kHosts), "10.0.0.1 a\n127.0.0.2 old\n");
     change("10.0.0.5");
     EXPECT_EQ(host.read("/etc/disk/hosts"), "10.0.0.1 a\n10.0.0.5\talpha.example.org\talpha\n");

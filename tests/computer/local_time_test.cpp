@@ -8,10 +8,10 @@
 #include "tests/computer/failing_calls.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
-using testing::ElementsAre;
 using testing::IsEmpty;
 
 constexpr unsigned int kJapan = 540;
@@ -50,8 +50,8 @@ HOST_TEST(ZoneSwitch, NeedsNoOldFile) {
 HOST_TEST(ZoneSwitch, LogsTheZoneBetweenEnterAndExit) {
     LogCapture capture;
     EXPECT_TRUE(IC::setTimezone(kJapan));
-    EXPECT_THAT(capture.messages(), ElementsAre("setTimezone: enter", "tz_file: /usr/share/zoneinfo/Japan",
-                                                "tz_string: JST", "setTimezone: exit"));
+    EXPECT_THAT(capture.messages(), TextsAre("setTimezone: enter", "tz_file: /usr/share/zoneinfo/Japan",
+                                             "tz_string: JST", "setTimezone: exit"));
     EXPECT_EQ(capture.messages(3000).size(), 4U);
     EXPECT_TRUE(capture.everyLineTwice());
 }
@@ -64,7 +64,7 @@ HOST_TEST(ZoneSwitch, TouchesNothingForAnUnknownOffset) {
     for (const unsigned int offset : {345U, 1U, 59U, 61U, 1000U}) {
         capture.clear();
         EXPECT_FALSE(IC::setTimezone(offset));
-        EXPECT_THAT(capture.messages(), ElementsAre("setTimezone: enter"));
+        EXPECT_THAT(capture.messages(), TextsAre("setTimezone: enter"));
     }
     EXPECT_EQ(host.read("/etc/sysconfig/clock"), "TIMEZONE=\"CET\"");
     EXPECT_EQ(host.read("/etc/sysconfig/clock.bak"), "left over");
@@ -89,7 +89,7 @@ HOST_TEST(ZoneSwitch, SaysWhenTheOldFileCannotBePutBack) {
     FailingCalls::symbolicLink = true;
     LogCapture capture;
     EXPECT_FALSE(IC::setTimezone(kIndia));
-    EXPECT_THAT(capture.messages(6000), ElementsAre("rename /etc/localtime.bak to /etc/localtime failed"));
+    EXPECT_THAT(capture.messages(6000), TextsAre("rename /etc/localtime.bak to /etc/localtime failed"));
     EXPECT_EQ(capture.messages().back(), "setTimezone: exit");
 }
 
@@ -101,7 +101,7 @@ HOST_TEST(ZoneSwitch, FailsOnAReadOnlyFileSystem) {
     EXPECT_FALSE(IC::setTimezone(kIndia));
     EXPECT_EQ(host.read(kLink), "old");
     EXPECT_EQ(host.read("/etc/sysconfig/clock"), "TIMEZONE=\"CET\"\n");
-    EXPECT_THAT(capture.messages(6000), ElementsAre("rename /etc/localtime.bak to /etc/localtime failed"));
+    EXPECT_THAT(capture.messages(6000), TextsAre("rename /etc/localtime.bak to /etc/localtime failed"));
 }
 
 }  // namespace

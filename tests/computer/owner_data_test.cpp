@@ -8,10 +8,10 @@
 #include "tests/computer/computer_tools.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
-using testing::ElementsAre;
 using testing::IsEmpty;
 
 struct Field {
@@ -63,9 +63,9 @@ HOST_TEST(Owner, CannotBeReadWithoutTheFile) {
         EXPECT_EQ(value.kind(), IC::PropertyValue::none);
         EXPECT_THAT(
             capture.messages(),
-            ElementsAre("ComputerNode::getProperty: entry",
-                        "ComputerNode::getProperty : OwnerContact/OwnerName - Cannot read asset dat file.",
-                        "ComputerNode::getProperty: exit"));
+            TextsAre("ComputerNode::getProperty: entry",
+                     "ComputerNode::getProperty : OwnerContact/OwnerName - Cannot read asset dat file.",
+                     "ComputerNode::getProperty: exit"));
         EXPECT_EQ(capture.messages(5000).size(), 1U);
     }
     EXPECT_FALSE(host.exists(kAssetFile));
@@ -83,10 +83,10 @@ HOST_TEST(Owner, CannotBeReadOrWrittenWithoutADataDirectory) {
         EXPECT_EQ(value.kind(), IC::PropertyValue::none);
         EXPECT_EQ(computer.write(field.id, "new"), 1);
         EXPECT_THAT(capture.messages(5000),
-                    ElementsAre("ComputerNode::getProperty : OwnerContact/OwnerName - NULL returned by "
-                                "CorvistaUtilities::getMoraineDataDir();",
-                                "ComputerNode::setProperty : OwnerContact/OwnerName - NULL returned by "
-                                "CorvistaUtilities::getMoraineDataDir()"));
+                    TextsAre("ComputerNode::getProperty : OwnerContact/OwnerName - NULL returned by "
+                             "CorvistaUtilities::getMoraineDataDir();",
+                             "ComputerNode::setProperty : OwnerContact/OwnerName - NULL returned by "
+                             "CorvistaUtilities::getMoraineDataDir()"));
         EXPECT_FALSE(computer.stores(field.id));
     }
     EXPECT_EQ(host.read(kAssetFile), "Computer.OwnerName=old\n");
@@ -135,11 +135,10 @@ void expectRefusal(FakeHost& host, const std::string& content) {
     RunningComputer computer;
     LogCapture capture;
     EXPECT_EQ(computer.write(116, std::string(20000, 'n')), 1);
-    EXPECT_THAT(
-        capture.messages(),
-        ElementsAre("ComputerNode::setProperty: entry",
-                    "ComputerNode::setProperty : OwnerContact/OwnerName - Cannot write asset dat file.",
-                    "ComputerNode::setProperty: exit"));
+    EXPECT_THAT(capture.messages(),
+                TextsAre("ComputerNode::setProperty: entry",
+                         "ComputerNode::setProperty : OwnerContact/OwnerName - Cannot write asset dat file.",
+                         "ComputerNode::setProperty: exit"));
     EXPECT_EQ(capture.messages(5000).size(), 1U);
     EXPECT_FALSE(computer.stores(116));
     EXPECT_EQ(host.read(kAssetFile), content);

@@ -11,10 +11,10 @@
 #include "tests/computer/failing_calls.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
-using testing::ElementsAre;
 using testing::IsEmpty;
 
 /// Sixteen bytes that show what was written to them.
@@ -40,7 +40,7 @@ TEST_F(FirmwareVersion, SeparatesTheNineCharacters) {
     EXPECT_EQ(IC::formatHostFirmwareVersion(in, 9, exact.data(), 14), 0);
     EXPECT_STREQ(exact.data(), "12-34.56.78-9");
     EXPECT_THAT(capture.messages(),
-                ElementsAre("formatHostFirmwareVersion: entry", "formatHostFirmwareVersion: exit"));
+                TextsAre("formatHostFirmwareVersion: entry", "formatHostFirmwareVersion: exit"));
 }
 
 TEST_F(FirmwareVersion, WritesFourteenBytesAlsoWhenThirteenWereGranted) {
@@ -52,11 +52,11 @@ TEST_F(FirmwareVersion, RefusesAnInputThatIsNotNineLong) {
     for (const unsigned int size : {0U, 8U, 10U}) {
         capture.clear();
         EXPECT_EQ(format("123456789", size, 14), 1);
-        EXPECT_THAT(capture.messages(), ElementsAre("formatHostFirmwareVersion: entry", "size_ver_in != 9",
-                                                    "formatHostFirmwareVersion: exit"));
+        EXPECT_THAT(capture.messages(), TextsAre("formatHostFirmwareVersion: entry", "size_ver_in != 9",
+                                                 "formatHostFirmwareVersion: exit"));
     }
     EXPECT_EQ(out.all(), std::string(16, '#'));
-    EXPECT_THAT(capture.messages(6000), ElementsAre("size_ver_in != 9"));
+    EXPECT_THAT(capture.messages(6000), TextsAre("size_ver_in != 9"));
 }
 
 TEST_F(FirmwareVersion, RefusesAnOutputShorterThanThirteen) {
@@ -65,20 +65,20 @@ TEST_F(FirmwareVersion, RefusesAnOutputShorterThanThirteen) {
     }
     EXPECT_EQ(out.all(), std::string(16, '#'));
     EXPECT_THAT(capture.messages(6000),
-                ElementsAre("size_ver_out < 13", "size_ver_out < 13", "size_ver_out < 13"));
+                TextsAre("size_ver_out < 13", "size_ver_out < 13", "size_ver_out < 13"));
 }
 
 TEST_F(FirmwareVersion, SaysWhenTheTextCameOutShorter) {
     EXPECT_EQ(format("12345", 9, 14), 1);
-    EXPECT_THAT(capture.messages(), ElementsAre("formatHostFirmwareVersion: entry", "13 != strlen(ver_out)",
-                                                "formatHostFirmwareVersion: exit"));
+    EXPECT_THAT(capture.messages(), TextsAre("formatHostFirmwareVersion: entry", "13 != strlen(ver_out)",
+                                             "formatHostFirmwareVersion: exit"));
     EXPECT_STREQ(out.bytes.data(), "12-34.5");
 }
 
 TEST_F(FirmwareVersion, SaysWhenNoZeroFollowsTheNineCharacters) {
     EXPECT_EQ(format("123456789X", 9, 14), 1);
     EXPECT_EQ(out.all(), "12-34.56.78-9X##");
-    EXPECT_THAT(capture.messages(6000), ElementsAre("13 != strlen(ver_out)"));
+    EXPECT_THAT(capture.messages(6000), TextsAre("13 != strlen(ver_out)"));
 }
 
 HOST_TEST(SystemName, IsEmptyWhateverTheKernelSays) {
@@ -97,8 +97,8 @@ HOST_TEST(VitalProductData, RunsBothToolsAndReadsNeither) {
     LogCapture capture;
     const int before = IC::MyProcess::cnt;
     IC::OsHwMI().vpdUpdate();
-    EXPECT_THAT(host.calls(), ElementsAre("/usr/sbin/vpdupdate", "/sbin/update-lsvpd-db"));
-    EXPECT_THAT(capture.messages(), ElementsAre("vpdUpdate: entry", "vpdUpdate: exit"));
+    EXPECT_THAT(host.calls(), TextsAre("/usr/sbin/vpdupdate", "/sbin/update-lsvpd-db"));
+    EXPECT_THAT(capture.messages(), TextsAre("vpdUpdate: entry", "vpdUpdate: exit"));
     EXPECT_EQ(IC::MyProcess::cnt, before);
 }
 

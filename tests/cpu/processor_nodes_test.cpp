@@ -7,6 +7,7 @@
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"
 #include "tests/support/plugin_access.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
@@ -81,7 +82,7 @@ HOST_TEST(Processors, AreOneNodeEachUnderThePlanar) {
         EXPECT_EQ(nodes[i]->getMIIds(), std::vector<unsigned int>{1});
     }
     EXPECT_THAT(IC::OsHwMITestAccess::drawnIds(), ElementsAre(2, 3, 4, 5, 6, 7, 8, 9, 10, 11));
-    EXPECT_THAT(plugin.speeds(), ElementsAre("2394", "2394", "1000", "800"));
+    EXPECT_THAT(plugin.speeds(), TextsAre("2394", "2394", "1000", "800"));
     PropertyValue speed;
     EXPECT_EQ(nodes[0]->getProperty(80, speed).getStatus(), 0);
     EXPECT_EQ(speed, PropertyValue(Number(2394U), true));
@@ -92,7 +93,7 @@ HOST_TEST(Processors, GoWithoutSpeedWhenTheKernelTellsNone) {
     Started plugin;
     plugin.mi().createCpuNodes();
     ASSERT_EQ(plugin.processors().size(), 2U);
-    EXPECT_THAT(plugin.speeds(), ElementsAre("1200", "none")) << "the first speed is the first processor's";
+    EXPECT_THAT(plugin.speeds(), TextsAre("1200", "none")) << "the first speed is the first processor's";
     EXPECT_EQ(plugin.processors()[1]->getDescription(), "");
 }
 
@@ -100,7 +101,7 @@ HOST_TEST(Processors, StopAtTheEndOfTheMapWhenThereAreMoreSpeeds) {
     host.file("/proc/cpuinfo", processor(0, "1000.0") + "cpu MHz\t\t: 3000.000\n");
     Started plugin;
     plugin.mi().createCpuNodes();
-    EXPECT_THAT(plugin.speeds(), ElementsAre("1000"));
+    EXPECT_THAT(plugin.speeds(), TextsAre("1000"));
 }
 
 HOST_TEST(Processors, AreListedByOneCommand) {
@@ -108,7 +109,7 @@ HOST_TEST(Processors, AreListedByOneCommand) {
     Started plugin;
     const CommandLines commands;
     plugin.mi().createCpuNodes();
-    EXPECT_THAT(commands.all(), ElementsAre("cat /proc/cpuinfo 2> /dev/null |grep processor 2> /dev/null "));
+    EXPECT_THAT(commands.all(), TextsAre("cat /proc/cpuinfo 2> /dev/null |grep processor 2> /dev/null "));
 }
 
 HOST_TEST(Processors, AreNoneWithoutCpuinfo) {
@@ -125,7 +126,7 @@ HOST_TEST(Processors, SkipALineWithoutColon) {
     LogCapture capture;
     plugin.mi().createCpuNodes();
     EXPECT_EQ(plugin.processors().size(), 1U);
-    EXPECT_THAT(capture.ownMessages(6000), ElementsAre("Invalid format: buffer = processor 0\n"));
+    EXPECT_THAT(capture.ownMessages(6000), TextsAre("Invalid format: buffer = processor 0\n"));
 }
 
 HOST_TEST(Processors, ReadLinesOf127Characters) {
@@ -135,7 +136,7 @@ HOST_TEST(Processors, ReadLinesOf127Characters) {
     plugin.mi().createCpuNodes();
     EXPECT_EQ(plugin.processors().size(), 1U);
     EXPECT_THAT(capture.ownMessages(6000),
-                ElementsAre("Invalid format: buffer = " + std::string(150 - (127 - 12), 'x') + "\n"));
+                TextsAre("Invalid format: buffer = " + std::string(150 - (127 - 12), 'x') + "\n"));
 }
 
 HOST_TEST(Processors, BuiltAgainStartFromOne) {
@@ -145,7 +146,7 @@ HOST_TEST(Processors, BuiltAgainStartFromOne) {
     plugin.mi().createCpuNodes();
     ASSERT_EQ(plugin.processors().size(), 2U);
     EXPECT_EQ(plugin.processors()[1]->getIndex(), 1U);
-    EXPECT_THAT(plugin.speeds(), ElementsAre("1000", "1000"));
+    EXPECT_THAT(plugin.speeds(), TextsAre("1000", "1000"));
 }
 
 HOST_TEST(Processors, AreNoneWhenTheShellCannotBeStarted) {
@@ -157,7 +158,7 @@ HOST_TEST(Processors, AreNoneWhenTheShellCannotBeStarted) {
         plugin.mi().createCpuNodes();
     }
     EXPECT_TRUE(plugin.processors().empty());
-    EXPECT_THAT(capture.ownMessages(6000), ElementsAre("createCpuNodeAndMap(): cmd_cpu error"));
+    EXPECT_THAT(capture.ownMessages(6000), TextsAre("createCpuNodeAndMap(): cmd_cpu error"));
 }
 
 HOST_TEST(Processors, AreLeftAloneOutsideStartAndStop) {
@@ -171,8 +172,8 @@ HOST_TEST(Processors, SpeakWithTheirOwnSourceAndComponent) {
     Started plugin;
     LogCapture capture;
     plugin.mi().createCpuNodes();
-    EXPECT_THAT(capture.ownMessages(3000), ElementsAre("createCpuNodes: entry", "createCpuNodeAndMap: entry",
-                                                       "createCpuNodeAndMap: exit", "createCpuNodes: exit"));
+    EXPECT_THAT(capture.ownMessages(3000), TextsAre("createCpuNodes: entry", "createCpuNodeAndMap: entry",
+                                                    "createCpuNodeAndMap: exit", "createCpuNodes: exit"));
     EXPECT_TRUE(capture.everyLineTwice());
     for (const LogLine& line : capture.ownLines()) {
         EXPECT_EQ(line.source, "OsHwMICpu_ix86");

@@ -14,6 +14,7 @@
 
 #include "framework/cvlog/logger.h"
 #include "framework/cvlog/message_buffer.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
@@ -68,8 +69,8 @@ TEST_F(Log, LinesFromTheThresholdUpReachTheirSink) {
         logLine(level, "log");
         traceLine(level, "trace");
     }
-    EXPECT_THAT(log.messages(), ElementsAre("5000 log", "6000 log"));
-    EXPECT_THAT(trace.messages(), ElementsAre("3000 trace", "5000 trace", "6000 trace"));
+    EXPECT_THAT(log.messages(), TextsAre("5000 log", "6000 log"));
+    EXPECT_THAT(trace.messages(), TextsAre("3000 trace", "5000 trace", "6000 trace"));
 }
 
 TEST_F(Log, ASinkSeesAllArguments) {

@@ -14,6 +14,7 @@
 #include <thread>
 
 #include "tests/framework/property_file_fixture.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
@@ -55,7 +56,6 @@ namespace {
 namespace fs = std::filesystem;
 using QX::PropertyFile;
 using QX::PropertyFileError;
-using testing::ElementsAre;
 using testing::HasSubstr;
 
 class PropertyFileDurability : public PropertyFileFixture {};
@@ -79,7 +79,7 @@ TEST_F(PropertyFileDurability, AFullDiskLeavesTheOldFile) {
     ASSERT_EQ(waitpid(child, &status, 0), child);
     EXPECT_EQ(status, 0);
     EXPECT_EQ(content(), "a=1\n");
-    EXPECT_THAT(names(), ElementsAre("asset.dat"));
+    EXPECT_THAT(names(), TextsAre("asset.dat"));
 }
 
 TEST_F(PropertyFileDurability, TheContentIsOnTheDiskBeforeItsNameAndTheNameBeforeTheEnd) {
@@ -92,7 +92,7 @@ TEST_F(PropertyFileDurability, TheContentIsOnTheDiskBeforeItsNameAndTheNameBefor
     };
     write({{L"a", L"2"}});
     beforeSync = nullptr;
-    EXPECT_THAT(steps, ElementsAre("file beside a=1\n", "directory with a=2\n"));
+    EXPECT_THAT(steps, TextsAre("file beside a=1\n", "directory with a=2\n"));
 }
 
 TEST_F(PropertyFileDurability, ADiskThatFailsLeavesTheOldFile) {
@@ -101,7 +101,7 @@ TEST_F(PropertyFileDurability, ADiskThatFailsLeavesTheOldFile) {
     EXPECT_THAT(textOfFailure([this] { write({{L"a", L"2"}}); }), HasSubstr("cannot bring it to the disk"));
     fileProblem = 0;
     EXPECT_EQ(content(), "a=1\n");
-    EXPECT_THAT(names(), ElementsAre("asset.dat"));
+    EXPECT_THAT(names(), TextsAre("asset.dat"));
 }
 
 TEST_F(PropertyFileDurability, ADirectoryThatDoesNotReachTheDiskIsAFailure) {
@@ -122,7 +122,7 @@ TEST_F(PropertyFileDurability, ADirectoryThatTookTheFilesPlaceIsAFailure) {
     file.setValue(L"a", L"1");
     fs::create_directory(path_);
     EXPECT_THAT(textOfFailure([&] { file.close(); }), HasSubstr("cannot replace"));
-    EXPECT_THAT(names(), ElementsAre("asset.dat"));
+    EXPECT_THAT(names(), TextsAre("asset.dat"));
 }
 
 TEST_F(PropertyFileDurability, ATemporaryFileThatAnotherWriterSweepsAwayIsMadeAnew) {
@@ -130,7 +130,7 @@ TEST_F(PropertyFileDurability, ATemporaryFileThatAnotherWriterSweepsAwayIsMadeAn
     write({{L"a", L"1"}});
     EXPECT_EQ(refusedLocks, 0);
     EXPECT_EQ(content(), "a=1\n");
-    EXPECT_THAT(names(), ElementsAre("asset.dat"));
+    EXPECT_THAT(names(), TextsAre("asset.dat"));
 }
 
 TEST_F(PropertyFileDurability, LeftoversOfItsOwnAreCleanedAtTheNextWrite) {
@@ -174,7 +174,7 @@ TEST_F(PropertyFileDurability, ManyWritersLeaveOneWholeFile) {
     }
     const auto values = readAll();
     EXPECT_EQ(values.at(L"a"), values.at(L"b"));
-    EXPECT_THAT(names(), ElementsAre("asset.dat"));
+    EXPECT_THAT(names(), TextsAre("asset.dat"));
 }
 
 /// The child writes one whole content after the other until it is killed.
@@ -213,7 +213,7 @@ TEST_F(PropertyFileDurability, AKillAtAnyMomentLeavesOldOrNewContentNeverAMix) {
     }
     EXPECT_LE(mostLeftovers, 1U);
     write({{L"last", L"one"}});
-    EXPECT_THAT(names(), ElementsAre("asset.dat"));
+    EXPECT_THAT(names(), TextsAre("asset.dat"));
 }
 
 }  // namespace

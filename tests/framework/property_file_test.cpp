@@ -9,6 +9,7 @@
 
 #include "framework/qx/strings.h"
 #include "tests/framework/property_file_fixture.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
@@ -23,7 +24,7 @@ class PropertyFileTest : public PropertyFileFixture {};
 TEST_F(PropertyFileTest, WritesOneKeyALineInOrder) {
     write({{L"Computer.OwnerName", L"Ada"}, {L"Computer.OwnerContact", L"room 12"}});
     EXPECT_EQ(content(), "Computer.OwnerContact=room 12\nComputer.OwnerName=Ada\n");
-    EXPECT_THAT(names(), ElementsAre("asset.dat"));
+    EXPECT_THAT(names(), TextsAre("asset.dat"));
 }
 
 TEST_F(PropertyFileTest, KeepsTheKeysItDoesNotChange) {
@@ -130,7 +131,7 @@ TEST_F(PropertyFileTest, WriteModeCreatesTheFile) {
     file.open(3);
     EXPECT_THAT(names(), ElementsAre());
     file.close();
-    EXPECT_THAT(names(), ElementsAre("asset.dat"));
+    EXPECT_THAT(names(), TextsAre("asset.dat"));
     EXPECT_EQ(content(), "");
 }
 
@@ -214,7 +215,7 @@ TEST_F(PropertyFileTest, ANameWithoutADirectoryIsInTheCurrentOne) {
     file.open(3);
     file.close();
     fs::current_path(before);
-    EXPECT_THAT(names(), ElementsAre("asset.dat"));
+    EXPECT_THAT(names(), TextsAre("asset.dat"));
 }
 
 TEST_F(PropertyFileTest, KeepsTheModeOfTheFile) {

@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include "tests/hosttools/host_tree.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
@@ -56,7 +57,7 @@ TEST(Files, ListsDirectories) {
     HostTree tree;
     tree.addBytes("d/b", "");
     tree.addBytes("d/.hidden", "");
-    EXPECT_THAT(listDirectory(tree.root() + "/d"), testing::ElementsAre("b"));
+    EXPECT_THAT(listDirectory(tree.root() + "/d"), TextsAre("b"));
     EXPECT_THAT(listDirectory(tree.root() + "/missing"), testing::IsEmpty());
 }
 

@@ -4,10 +4,10 @@
 #include "tests/indications/interfaces.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
-using testing::ElementsAre;
 using testing::IsEmpty;
 
 /// The agent: keeps what it is sent.
@@ -91,7 +91,7 @@ void expectAlert(const Change& expected) {
     EXPECT_EQ(alert.firstCode(), expected.firstCode);
     EXPECT_EQ(alert.secondCode(), 0);
     EXPECT_EQ(alert.nodeId(), expected.eventCode);
-    EXPECT_THAT(alert.substitutions(), ElementsAre("/ports/eth0"));
+    EXPECT_THAT(alert.substitutions(), TextsAre("/ports/eth0"));
     IC::PropertyValue state;
     change.node.getProperty(123, state);
     EXPECT_EQ(state, IC::PropertyValue(IC::Number(expected.property), true));
@@ -161,8 +161,8 @@ HOST_TEST(Alerts, AreNoneForAMemberOfABondWhateverItsState) {
         change.check();
         EXPECT_THAT(change.agent.alerts, IsEmpty());
         EXPECT_THAT(capture.ownMessages(3000),
-                    ElementsAre("checkAndSendNetAlert: entry", "Slaves Map Size : 2",
-                                "Slaves Found in the Map", "Returning from checkAndSendNetAlert"));
+                    TextsAre("checkAndSendNetAlert: entry", "Slaves Map Size : 2", "Slaves Found in the Map",
+                             "Returning from checkAndSendNetAlert"));
     }
 }
 
@@ -172,11 +172,10 @@ HOST_TEST(Alerts, AreNoneForAnUnknownStateWhichIsLogged) {
         LogCapture capture;
         change.check();
         EXPECT_THAT(change.agent.alerts, IsEmpty());
-        EXPECT_THAT(
-            capture.ownMessages(3000),
-            ElementsAre("checkAndSendNetAlert: entry", "Slaves Map Size : 0", "findNetworkPort: entry",
-                        "findNetworkPort: exit", "OsHwMI::checkAndSendNetAlert() entering switch case",
-                        "Unknown status: curitr->first= eth0", "Returning from checkAndSendNetAlert"));
+        EXPECT_THAT(capture.ownMessages(3000),
+                    TextsAre("checkAndSendNetAlert: entry", "Slaves Map Size : 0", "findNetworkPort: entry",
+                             "findNetworkPort: exit", "OsHwMI::checkAndSendNetAlert() entering switch case",
+                             "Unknown status: curitr->first= eth0", "Returning from checkAndSendNetAlert"));
     }
 }
 
@@ -188,7 +187,7 @@ HOST_TEST(Alerts, GoOutInTheOrderOfTheNamesOneByOne) {
     change.interfaces.current() = {{"eth0", 1}, {"bond0", 32}, {"eth1", 12}};
     change.check();
     EXPECT_THAT(change.agent.messages(),
-                ElementsAre("NIC has Switched Over ", "NIC is Online ", "NIC is Offline "));
+                TextsAre("NIC has Switched Over ", "NIC is Online ", "NIC is Offline "));
 }
 
 HOST_TEST(Alerts, GoOnWhenTheAgentRefusesOne) {
@@ -222,8 +221,8 @@ HOST_TEST(Alerts, GoOnWhenTheAgentThrows) {
     change.check();
     EXPECT_EQ(agent.calls, 2);
     EXPECT_THAT(capture.ownMessages(6000),
-                ElementsAre("OsHwMIInd Caught unknown exception",
-                            "OsHwMIInd Caught the agent is broken Type St13runtime_error"));
+                TextsAre("OsHwMIInd Caught unknown exception",
+                         "OsHwMIInd Caught the agent is broken Type St13runtime_error"));
     EXPECT_THAT(capture.ownMessages(), testing::Not(testing::Contains(testing::HasSubstr("return code"))));
 }
 

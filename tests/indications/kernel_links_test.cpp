@@ -8,11 +8,11 @@
 #include "mi/os_hw_mi.h"
 #include "tests/indications/heard.h"
 #include "tests/support/fake_host.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
 using namespace std::chrono_literals;
-using testing::ElementsAre;
 
 constexpr char kFile[] = "/opt/vantrel/corvista/data/oshwminetind.dat";
 
@@ -77,15 +77,15 @@ HOST_TEST(KernelLinks, RaiseEachCarrierChangeOnceAndAcrossARestart) {
     ASSERT_TRUE(links.kept("eth0=1\neth1=1\n")) << *host.read(kFile);
     links.pull("0");
     ASSERT_TRUE(links.kept("eth0=12\neth1=1\n"));
-    EXPECT_THAT(links.heard(), ElementsAre("NIC is Offline "));
+    EXPECT_THAT(links.heard(), TextsAre("NIC is Offline "));
     links.plug("0");
     ASSERT_TRUE(links.kept("eth0=1\neth1=1\n"));
-    EXPECT_THAT(links.heard(), ElementsAre("NIC is Offline ", "NIC is Online "));
+    EXPECT_THAT(links.heard(), TextsAre("NIC is Offline ", "NIC is Online "));
     links.stop();
     links.pull("1");
     links.start();
     ASSERT_TRUE(links.kept("eth0=1\neth1=12\n"));
-    EXPECT_THAT(links.heard(), ElementsAre("NIC is Offline ", "NIC is Online ", "NIC is Offline "));
+    EXPECT_THAT(links.heard(), TextsAre("NIC is Offline ", "NIC is Online ", "NIC is Offline "));
     links.stop();
 }
 

@@ -15,12 +15,12 @@
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_threads.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
 using namespace std::chrono_literals;
 using testing::Contains;
-using testing::ElementsAre;
 
 constexpr char kFile[] = "/opt/vantrel/corvista/data/oshwminetind.dat";
 
@@ -78,14 +78,14 @@ HOST_TEST(NetworkMonitor, RaisesEachChangeOnceAndKeepsTheStateAcrossARestart) {
     eth0.is(12);
     ASSERT_TRUE(eventually([&] { return !heard.now().empty(); }));
     std::this_thread::sleep_for(200ms);  // several passes
-    EXPECT_THAT(heard.now(), ElementsAre("NIC is Offline "));
+    EXPECT_THAT(heard.now(), TextsAre("NIC is Offline "));
     interfaces.mi().disableIndications();
     EXPECT_EQ(host.read(kFile), "eth0=12\n");
     eth0.is(1);
     interfaces.mi().enableIndications();
     ASSERT_TRUE(eventually([&] { return heard.now().size() == 2; }));
     std::this_thread::sleep_for(200ms);
-    EXPECT_THAT(heard.now(), ElementsAre("NIC is Offline ", "NIC is Online "));
+    EXPECT_THAT(heard.now(), TextsAre("NIC is Offline ", "NIC is Online "));
     interfaces.mi().disableIndications();
 }
 
@@ -125,7 +125,7 @@ HOST_TEST(NetworkMonitor, TellsOfAnInterfaceAgainWhenItHasLeftItsBond) {
     eth0.is(12);
     EXPECT_TRUE(eventually([&] { return !heard.now().empty(); }));
     interfaces.mi().disableIndications();
-    EXPECT_THAT(heard.now(), ElementsAre("NIC is Offline "));
+    EXPECT_THAT(heard.now(), TextsAre("NIC is Offline "));
 }
 
 HOST_TEST(NetworkMonitor, StopsAtOnceInTheMiddleOfItsWait) {
@@ -144,13 +144,13 @@ HOST_TEST(NetworkMonitor, StopsAtOnceInTheMiddleOfItsWait) {
     });
     EXPECT_THAT(
         messages,
-        ElementsAre("enableIndications: entry", "Creating NetworkMonitor thread.",
-                    "NetworkMonitor::NetworkMonitor: entry", "NetworkMonitor::NetworkMonitor: exit",
-                    "NetworkMonitor thread created.", "enableIndications: exit", "disableIndications: entry",
-                    "eventThreadNetIndications: Stopping thread...", "NetworkMonitor::stop: entry",
-                    "NetworkMonitor::stop: exit", "eventThreadNetIndicationsThread terminated.",
-                    "NetworkMonitor::~NetworkMonitor: entry", "NetworkMonitor::~NetworkMonitor: exit",
-                    "disableIndications: exit"));
+        TextsAre("enableIndications: entry", "Creating NetworkMonitor thread.",
+                 "NetworkMonitor::NetworkMonitor: entry", "NetworkMonitor::NetworkMonitor: exit",
+                 "NetworkMonitor thread created.", "enableIndications: exit", "disableIndications: entry",
+                 "eventThreadNetIndications: Stopping thread...", "NetworkMonitor::stop: entry",
+                 "NetworkMonitor::stop: exit", "eventThreadNetIndicationsThread terminated.",
+                 "NetworkMonitor::~NetworkMonitor: entry", "NetworkMonitor::~NetworkMonitor: exit",
+                 "disableIndications: exit"));
     EXPECT_THAT(capture.messages(3000), Contains("NetworkMonitor: run entry"));
     EXPECT_THAT(capture.messages(3000), Contains("NetworkMonitor: run exit"));
 }
@@ -210,7 +210,7 @@ HOST_TEST(NetworkMonitor, LeavesIndicationsOffWhenItsThreadWillNotStart) {
     EXPECT_THAT(capture.ownMessages(), Contains("NetworkMonitor thread failed."));
     capture.clear();
     interfaces.mi().disableIndications();
-    EXPECT_THAT(capture.ownMessages(), ElementsAre("disableIndications: entry", "disableIndications: exit"));
+    EXPECT_THAT(capture.ownMessages(), TextsAre("disableIndications: entry", "disableIndications: exit"));
 }
 
 /// What starting the monitor says when it cannot be made.
@@ -227,11 +227,11 @@ std::vector<std::string> startFailing(void (*fail)()) {
 
 HOST_TEST(NetworkMonitor, ThatCannotBeMadeIsLoggedWithTheReason) {
     EXPECT_THAT(startFailing([] { throw std::bad_alloc(); }),
-                ElementsAre("enableIndications: entry", "Creating NetworkMonitor thread.",
-                            "OsHwMIInd Caught std::bad_alloc Type St9bad_alloc", "enableIndications: exit"));
+                TextsAre("enableIndications: entry", "Creating NetworkMonitor thread.",
+                         "OsHwMIInd Caught std::bad_alloc Type St9bad_alloc", "enableIndications: exit"));
     EXPECT_THAT(startFailing([] { throw 7; }),
-                ElementsAre("enableIndications: entry", "Creating NetworkMonitor thread.",
-                            "OsHwMIInd Caught unknown exception", "enableIndications: exit"));
+                TextsAre("enableIndications: entry", "Creating NetworkMonitor thread.",
+                         "OsHwMIInd Caught unknown exception", "enableIndications: exit"));
 }
 
 /// An interface that throws when it is asked: a number, then exceptions.
@@ -330,7 +330,7 @@ HOST_TEST(NetworkMonitor, StoppedBeforeItRunsDoesNoPass) {
     EXPECT_EQ(monitor.run(nullptr), nullptr);
     EXPECT_TRUE(monitor.isDone());
     EXPECT_TRUE(ended.wait(0));
-    EXPECT_THAT(capture.ownMessages(), ElementsAre("NetworkMonitor: run entry", "NetworkMonitor: run exit"));
+    EXPECT_THAT(capture.ownMessages(), TextsAre("NetworkMonitor: run entry", "NetworkMonitor: run exit"));
 }
 
 HOST_TEST(NetworkMonitor, RunsCleanBesideReadersAndWriters) {

@@ -5,10 +5,10 @@
 #include "indications/globals.h"
 #include "tests/indications/heard.h"
 #include "tests/network/port_host.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
-using testing::ElementsAre;
 using testing::IsEmpty;
 
 constexpr char kFile[] = "/opt/vantrel/corvista/data/oshwminetind.dat";
@@ -48,15 +48,15 @@ HOST_TEST(RecordedBond, TellsOfItsOwnFailOverAndNothingOfItsMembers) {
     BondHost links(host);
     links.bond().setStatus(12);
     links.link("eth0", "no");
-    EXPECT_THAT(links.told(), ElementsAre("NIC has Switched Over "));
+    EXPECT_THAT(links.told(), TextsAre("NIC has Switched Over "));
     EXPECT_EQ(host.read(kFile), "bond0=32\neth0=12\neth1=1\n");
     EXPECT_EQ(links.bond().getStatus(), 1U);
     EXPECT_EQ(PortHost::stored(links.bond(), 123), number(32));
     EXPECT_EQ(PortHost::live(links.bond(), 123), number(1)) << "that is for the host to say";
-    EXPECT_THAT(links.told(), ElementsAre("NIC is Online ")) << "the bond itself was up all the time";
+    EXPECT_THAT(links.told(), TextsAre("NIC is Online ")) << "the bond itself was up all the time";
     EXPECT_THAT(links.told(), IsEmpty());
     links.link("eth0", "yes");
-    EXPECT_THAT(links.told(), ElementsAre("NIC has Switched Back "));
+    EXPECT_THAT(links.told(), TextsAre("NIC has Switched Back "));
     EXPECT_EQ(host.read(kFile), "bond0=33\neth0=1\neth1=1\n");
     for (const std::string& call : host.callsOf("ifconfig")) {
         EXPECT_TRUE(call == "ifconfig" || call == "ifconfig bond0")

@@ -11,6 +11,7 @@
 #include "tests/support/failing_new.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
@@ -94,11 +95,10 @@ HOST_TEST(StateFile, IsDoneWithoutWhateverReadingAndWritingItThrow) {
     }
     EXPECT_THAT(interfaces.previous(), IsEmpty());
     EXPECT_FALSE(IC::OSHWMI_IND::datFileAvailable);
-    EXPECT_THAT(
-        capture.ownMessages(),
-        ElementsAre("readPrevNetNodeMap: entry", "OSHWMI_NET_IND_DAT_FILE: Not available",
-                    "readPrevNetNodeMap: exit", "writePrevNetNodeMap: entry",
-                    "OSHWMI_NET_IND_DAT_FILE: Exception in writing file", "writePrevNetNodeMap: exit"));
+    EXPECT_THAT(capture.ownMessages(),
+                TextsAre("readPrevNetNodeMap: entry", "OSHWMI_NET_IND_DAT_FILE: Not available",
+                         "readPrevNetNodeMap: exit", "writePrevNetNodeMap: entry",
+                         "OSHWMI_NET_IND_DAT_FILE: Exception in writing file", "writePrevNetNodeMap: exit"));
     EXPECT_EQ(host.read(kFile), "eth0=12\n");
 }
 
@@ -110,7 +110,7 @@ HOST_TEST(StateFile, IsDoneWithoutWhenThereIsNoDataDirectory) {
     interfaces.mi().writePrevNetNodeMap();
     interfaces.mi().readPrevNetNodeMap();
     EXPECT_THAT(capture.ownMessages(5000), testing::SizeIs(2));
-    EXPECT_THAT(capture.ownMessages(6000), ElementsAre("OSHWMI_NET_IND_DAT_FILE: Exception in writing file"));
+    EXPECT_THAT(capture.ownMessages(6000), TextsAre("OSHWMI_NET_IND_DAT_FILE: Exception in writing file"));
     EXPECT_FALSE(IC::OSHWMI_IND::datFileAvailable);
 }
 
@@ -121,7 +121,7 @@ HOST_TEST(StateFile, StaysAsItWasWhenItCannotBeWritten) {
     interfaces.current() = {{"eth0", 1}};
     LogCapture capture;
     interfaces.mi().writePrevNetNodeMap();
-    EXPECT_THAT(capture.ownMessages(6000), ElementsAre("OSHWMI_NET_IND_DAT_FILE: Exception in writing file"));
+    EXPECT_THAT(capture.ownMessages(6000), TextsAre("OSHWMI_NET_IND_DAT_FILE: Exception in writing file"));
     EXPECT_EQ(host.read(kFile), "eth0=12\n");
 }
 

@@ -12,6 +12,7 @@
 
 #include "framework/ic/management_interface.h"
 #include "tests/support/fake_host.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
@@ -39,7 +40,7 @@ TEST(Library, ExportsTheEntryAndTheProcessorBuilderAlone) {
 }
 
 TEST(Library, HasItsSoname) {
-    EXPECT_THAT(dynamicSection("SONAME"), testing::ElementsAre("libvantrelcvicoshwmi.so.1"));
+    EXPECT_THAT(dynamicSection("SONAME"), TextsAre("libvantrelcvicoshwmi.so.1"));
 }
 
 TEST(Library, NeedsTheFrameworkAndTheLanguageRuntimeAlone) {

@@ -14,6 +14,7 @@
 #include "tests/support/no_descriptors.h"
 #include "tests/support/plugin_access.h"
 #include "tests/support/shell_stub.h"
+#include "tests/support/texts_are.h"
 
 extern "C" int OpenMI(IC::ManagementInterface** mi, IC::Error** err);
 
@@ -158,7 +159,7 @@ HOST_TEST(OpenMI, HandsOutThePluginObjectAndItsErrorEachTime) {
         EXPECT_EQ(error, &IC::OSHWMI::myerr);
     }
     EXPECT_THAT(capture.messages(3000),
-                testing::ElementsAre("OpenMI: entry", "OpenMI: exit", "OpenMI: entry", "OpenMI: exit"));
+                TextsAre("OpenMI: entry", "OpenMI: exit", "OpenMI: entry", "OpenMI: exit"));
     EXPECT_EQ(capture.lines().front().function, "OpenMI");
     EXPECT_TRUE(capture.everyLineTwice());
 }
@@ -310,8 +311,7 @@ HOST_TEST(Lifecycle, LogsARefusedNodeAndGoesOn) {
     LogCapture capture;
     IC::myoshwmi.publishNode(new MutableNode(900, 1, {1}, 11, 0));
     EXPECT_THAT(capture.ownMessages(),
-                testing::ElementsAre("publishNode: entry", "addNewNode error = the agent is full",
-                                     "publishNode: exit"));
+                TextsAre("publishNode: entry", "addNewNode error = the agent is full", "publishNode: exit"));
     EXPECT_EQ(capture.ownMessages(6000), std::vector<std::string>{"addNewNode error = the agent is full"});
     IC::myoshwmi.unload();
 }
@@ -360,11 +360,11 @@ HOST_TEST(Lifecycle, DeletesTheSnapshotByOneQuietCommand) {
 HOST_TEST(Lifecycle, StopsWithoutAStart) {
     LogCapture capture;
     EXPECT_EQ(IC::myoshwmi.unload().getStatus(), 0);
-    EXPECT_THAT(capture.messages(),
-                testing::ElementsAre("unload: entry", "disableIndications: entry", "disableIndications: exit",
-                                     "deleteSavedConfigurations: entry", "deleteSavedConfigurations: exit",
-                                     "deleteFdiskTmp: entry", "Deleting /tmp/fdisk_tmp",
-                                     "deleteFdiskTmp: exit", "unload: exit"));
+    EXPECT_THAT(
+        capture.messages(),
+        TextsAre("unload: entry", "disableIndications: entry", "disableIndications: exit",
+                 "deleteSavedConfigurations: entry", "deleteSavedConfigurations: exit",
+                 "deleteFdiskTmp: entry", "Deleting /tmp/fdisk_tmp", "deleteFdiskTmp: exit", "unload: exit"));
 }
 
 HOST_TEST(Lifecycle, StopsWithoutWaitingForASleep) {

@@ -12,10 +12,10 @@
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
-using testing::ElementsAre;
 using testing::IsEmpty;
 
 /// The error with which the next sockets are refused; 0 for none.
@@ -53,7 +53,7 @@ HOST_TEST(IPv6Stack, IsActiveWhenASocketCanBeOpened) {
     EXPECT_TRUE(IC::isIPv6StackActive());
     EXPECT_EQ(lowestFreeDescriptor(), before) << "the socket was left open";
     EXPECT_EQ(sockets.back(), (std::vector<int>{10, 1, 6}));
-    EXPECT_THAT(capture.messages(), ElementsAre("isIPv6StackActive: entry", "isIPv6StackActive: exit"));
+    EXPECT_THAT(capture.messages(), TextsAre("isIPv6StackActive: entry", "isIPv6StackActive: exit"));
 }
 
 HOST_TEST(IPv6Stack, IsActiveAlsoWhenTheKernelHasNone) {
@@ -85,11 +85,11 @@ HOST_TEST(IPv4Details, AreTwoQuestions) {
     EXPECT_EQ(address, "192.168.17.4");
     EXPECT_EQ(mask, "255.255.255.0");
     EXPECT_THAT(commands.all(),
-                ElementsAre("ifconfig eth0 2> /dev/null | grep \"inet addr:\" | tr -s ' ' | cut -d: -f2"
-                            " | cut -d ' ' -f1 2> /dev/null",
-                            "ifconfig eth0 2> /dev/null | grep \"inet addr:\" | tr -s ' ' | cut -d: -f4"
-                            " 2> /dev/null"));
-    EXPECT_THAT(capture.messages(), ElementsAre("getIPv4Details: entry", "getIPv4Details: exit"));
+                TextsAre("ifconfig eth0 2> /dev/null | grep \"inet addr:\" | tr -s ' ' | cut -d: -f2"
+                         " | cut -d ' ' -f1 2> /dev/null",
+                         "ifconfig eth0 2> /dev/null | grep \"inet addr:\" | tr -s ' ' | cut -d: -f4"
+                         " 2> /dev/null"));
+    EXPECT_THAT(capture.messages(), TextsAre("getIPv4Details: entry", "getIPv4Details: exit"));
 }
 
 HOST_TEST(IPv4Details, WithoutAnAddressTheMaskIsNotAskedFor) {
@@ -120,10 +120,10 @@ HOST_TEST(AddressDetails, AreTheThirdFieldOfALine) {
     EXPECT_TRUE(IC::getAddressDetails("    inet6 2001:db8::1/64 scope global \n", address, prefix));
     EXPECT_EQ(address, "2001:db8::1");
     EXPECT_EQ(prefix, 64U);
-    EXPECT_THAT(commands.all(), ElementsAre("echo \"    inet6 2001:db8::1/64 scope global \n\" | tr -s ' '"
-                                            " | cut -d ' ' -f3 2> /dev/null"));
+    EXPECT_THAT(commands.all(), TextsAre("echo \"    inet6 2001:db8::1/64 scope global \n\" | tr -s ' '"
+                                         " | cut -d ' ' -f3 2> /dev/null"));
     // A plain pipe: the count of open pipes is not logged.
-    EXPECT_THAT(capture.messages(), ElementsAre("getAddressDetails: entry", "getAddressDetails: exit"));
+    EXPECT_THAT(capture.messages(), TextsAre("getAddressDetails: entry", "getAddressDetails: exit"));
 }
 
 HOST_TEST(AddressDetails, ALineWithoutASlashIsLoggedAndTheNextOneRead) {
@@ -133,7 +133,7 @@ HOST_TEST(AddressDetails, ALineWithoutASlashIsLoggedAndTheNextOneRead) {
     EXPECT_FALSE(IC::getAddressDetails("    inet6 2001:db8::1 scope global", address, prefix));
     EXPECT_EQ(address, "before");
     EXPECT_EQ(prefix, 7U);
-    EXPECT_THAT(capture.messages(6000), ElementsAre("Invalid format: buffer = 2001:db8::1\n"));
+    EXPECT_THAT(capture.messages(6000), TextsAre("Invalid format: buffer = 2001:db8::1\n"));
     EXPECT_TRUE(IC::getAddressDetails("    inet6 none\n    inet6 2001:db8::2/48\n", address, prefix));
     EXPECT_EQ(address, "2001:db8::2");
     EXPECT_EQ(prefix, 48U);
@@ -160,8 +160,8 @@ HOST_TEST(IPv6Address, IsAskedThroughAPlainPipe) {
     EXPECT_TRUE(IC::getIPv6Address("eth0", address, prefix));
     ASSERT_EQ(commands.all().size(), 2U);
     EXPECT_EQ(commands.all()[0], "ip -6 address show dev eth0 | grep \"global\"");
-    EXPECT_THAT(capture.messages(), ElementsAre("getIPv6Address: entry", "getAddressDetails: entry",
-                                                "getAddressDetails: exit", "getIPv6Address: exit"));
+    EXPECT_THAT(capture.messages(), TextsAre("getIPv6Address: entry", "getAddressDetails: entry",
+                                             "getAddressDetails: exit", "getIPv6Address: exit"));
 }
 
 HOST_TEST(IPv6Address, WithoutAShellIsNone) {
@@ -215,12 +215,11 @@ HOST_TEST(ProtocolCodes, LogTheAddresses) {
     const LogCapture capture;
     unsigned int code = 0;
     IC::getProtocolIIFType("eth0", code);
-    EXPECT_THAT(
-        capture.messages(3000),
-        ElementsAre("getProtocolIIFType: entry", "getIPv6Address: entry", "getAddressDetails: entry",
-                    "getAddressDetails: exit", "getIPv6Address: exit", "getIPv4Details: entry",
-                    "getIPv4Details: exit", "ipv6_addr : 2001:db8:4:1::31", "ipv4_addr : 192.168.17.4",
-                    "protocolIIFType : 4098", "getProtocolIIFType: exit"));
+    EXPECT_THAT(capture.messages(3000),
+                TextsAre("getProtocolIIFType: entry", "getIPv6Address: entry", "getAddressDetails: entry",
+                         "getAddressDetails: exit", "getIPv6Address: exit", "getIPv4Details: entry",
+                         "getIPv4Details: exit", "ipv6_addr : 2001:db8:4:1::31", "ipv4_addr : 192.168.17.4",
+                         "protocolIIFType : 4098", "getProtocolIIFType: exit"));
 }
 
 HOST_TEST(AddressKind, OfIPv6AloneIsAskedForItsScope) {

@@ -6,6 +6,7 @@
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/plugin_access.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
@@ -100,7 +101,7 @@ HOST_TEST(NameServers, LogTheirWay) {
     LogCapture capture;
     IC::executeDNSChanges({}, true);
     EXPECT_THAT(capture.messages(3000),
-                ElementsAre("executeDNSChanges: Entering", "method: 1", "executeDNSChanges: exit"));
+                TextsAre("executeDNSChanges: Entering", "method: 1", "executeDNSChanges: exit"));
     EXPECT_THAT(capture.messages(6000), IsEmpty());
     EXPECT_TRUE(capture.everyLineTwice());
     EXPECT_EQ(capture.lines().front().function, "executeDNSChanges");
@@ -137,14 +138,14 @@ HOST_TEST(SearchSuffixes, LogTheirWay) {
     LogCapture capture;
     IC::executeDNSChanges({}, false);
     EXPECT_THAT(capture.messages(3000),
-                ElementsAre("executeDNSChanges: Entering", "method: 0", "executeDNSChanges: exit"));
+                TextsAre("executeDNSChanges: Entering", "method: 0", "executeDNSChanges: exit"));
 }
 
 HOST_TEST(ResolverFile, IsNotMadeWhenItIsMissing) {
     for (const bool servers : {true, false}) {
         LogCapture capture;
         IC::executeDNSChanges({"10.0.0.1"}, servers);
-        EXPECT_THAT(capture.messages(6000), ElementsAre("Can not open '/etc/resolv.conf' in read mode."));
+        EXPECT_THAT(capture.messages(6000), TextsAre("Can not open '/etc/resolv.conf' in read mode."));
         EXPECT_FALSE(host.exists(kResolver));
     }
 }
@@ -155,7 +156,7 @@ HOST_TEST(ResolverFile, IsTheOldOneWhenItCannotBeWritten) {
     for (const bool servers : {true, false}) {
         LogCapture capture;
         IC::executeDNSChanges({"10.0.0.1"}, servers);
-        EXPECT_THAT(capture.messages(6000), ElementsAre("Can not open '/etc/resolv.conf' in write mode."));
+        EXPECT_THAT(capture.messages(6000), TextsAre("Can not open '/etc/resolv.conf' in write mode."));
         EXPECT_EQ(host.read(kResolver), "nameserver 1.1.1.1\n");
     }
 }
@@ -213,16 +214,16 @@ HOST_TEST(DNSPolicy, IsNotAddedAndTheFileNotTouchedWithoutTheKey) {
     LogCapture capture;
     IC::disableNetConfigDNSPolicy(origin(3));
     EXPECT_EQ(host.read(kNetconfig), "OTHER=1\n");
-    EXPECT_THAT(capture.messages(), ElementsAre("disableNetConfigDNSPolicy: Entering", "bootproto: 3",
-                                                "disableNetConfigDNSPolicy: exit"));
+    EXPECT_THAT(capture.messages(), TextsAre("disableNetConfigDNSPolicy: Entering", "bootproto: 3",
+                                             "disableNetConfigDNSPolicy: exit"));
 }
 
 HOST_TEST(DNSPolicy, MissingFileIsNeitherMadeNorLogged) {
     LogCapture capture;
     IC::disableNetConfigDNSPolicy(origin(3));
     EXPECT_FALSE(host.exists("/etc/sysconfig"));
-    EXPECT_THAT(capture.messages(), ElementsAre("disableNetConfigDNSPolicy: Entering", "bootproto: 3",
-                                                "disableNetConfigDNSPolicy: exit"));
+    EXPECT_THAT(capture.messages(), TextsAre("disableNetConfigDNSPolicy: Entering", "bootproto: 3",
+                                             "disableNetConfigDNSPolicy: exit"));
 }
 
 HOST_TEST(DNSPolicy, UnwritableFileIsSkippedSilently) {
@@ -244,9 +245,9 @@ HOST_TEST(DNSPolicy, LogsTheLineAndBothOrigins) {
     host.file(kNetconfig, "OTHER=1\nNETCONFIG_DNS_POLICY=\"auto\"\n");
     LogCapture capture;
     IC::disableNetConfigDNSPolicy(origin(3));
-    EXPECT_THAT(capture.messages(3000), ElementsAre("disableNetConfigDNSPolicy: Entering", "bootproto: 3",
-                                                    "buffer: NETCONFIG_DNS_POLICY=\"\"\n", "DHCP: 1",
-                                                    "Static: 3", "disableNetConfigDNSPolicy: exit"));
+    EXPECT_THAT(capture.messages(3000), TextsAre("disableNetConfigDNSPolicy: Entering", "bootproto: 3",
+                                                 "buffer: NETCONFIG_DNS_POLICY=\"\"\n", "DHCP: 1",
+                                                 "Static: 3", "disableNetConfigDNSPolicy: exit"));
     for (const LogLine& line : capture.lines()) {
         EXPECT_EQ(line.function, "disableNetConfigDNSPolicy");
     }
@@ -255,28 +256,28 @@ HOST_TEST(DNSPolicy, LogsTheLineAndBothOrigins) {
 HOST_TEST(DNSDetails, AreTheValuesBehindTheKeywords) {
     const Details details = detailsOf(
         host, "domain d\nsearch a.example b.example c.example\nnameserver 10.0.0.1\nnameserver fd00::1");
-    EXPECT_THAT(details.servers, ElementsAre("10.0.0.1", "fd00::1"));
-    EXPECT_THAT(details.suffixes, ElementsAre("a.example", "b.example", "c.example"));
+    EXPECT_THAT(details.servers, TextsAre("10.0.0.1", "fd00::1"));
+    EXPECT_THAT(details.suffixes, TextsAre("a.example", "b.example", "c.example"));
 }
 
 HOST_TEST(DNSDetails, PassOverEveryLineWithANumberSign) {
     const Details details =
         detailsOf(host, "#nameserver 1.1.1.1\nnameserver 2.2.2.2 # main\n search a#b\nsearch c\n");
     EXPECT_THAT(details.servers, IsEmpty());
-    EXPECT_THAT(details.suffixes, ElementsAre("c"));
+    EXPECT_THAT(details.suffixes, TextsAre("c"));
 }
 
 HOST_TEST(DNSDetails, FindTheKeywordAnywhereAndTheServerFirst) {
     const Details details =
         detailsOf(host, "  nameserver 1.1.1.1\noptions search a nameserver 2.2.2.2\nx research b\n");
-    EXPECT_THAT(details.servers, ElementsAre("1.1.1.1", "2.2.2.2"));
-    EXPECT_THAT(details.suffixes, ElementsAre("b"));
+    EXPECT_THAT(details.servers, TextsAre("1.1.1.1", "2.2.2.2"));
+    EXPECT_THAT(details.suffixes, TextsAre("b"));
 }
 
 HOST_TEST(DNSDetails, SplitAtEverySingleBlank) {
     const Details details = detailsOf(host, "nameserver  1.1.1.1\nsearch a b \n");
-    EXPECT_THAT(details.servers, ElementsAre("", "1.1.1.1"));
-    EXPECT_THAT(details.suffixes, ElementsAre("a", "b", ""));
+    EXPECT_THAT(details.servers, TextsAre("", "1.1.1.1"));
+    EXPECT_THAT(details.suffixes, TextsAre("a", "b", ""));
 }
 
 HOST_TEST(DNSDetails, AreNoneBehindABareKeyword) {
@@ -295,11 +296,11 @@ HOST_TEST(DNSDetails, AreAppendedAndLeftAloneWithoutAFile) {
     Lines suffixes{"suffix"};
     LogCapture capture;
     IC::getDNSDetails(servers, suffixes);
-    EXPECT_THAT(capture.messages(), ElementsAre("getDNSDetails: entry", "getDNSDetails: exit"));
+    EXPECT_THAT(capture.messages(), TextsAre("getDNSDetails: entry", "getDNSDetails: exit"));
     host.file(kResolver, "nameserver 1.1.1.1\n");
     IC::getDNSDetails(servers, suffixes);
-    EXPECT_THAT(servers, ElementsAre("first", "1.1.1.1"));
-    EXPECT_THAT(suffixes, ElementsAre("suffix"));
+    EXPECT_THAT(servers, TextsAre("first", "1.1.1.1"));
+    EXPECT_THAT(suffixes, TextsAre("suffix"));
 }
 
 HOST_TEST(DNSDetails, ReadBackWhatTheWritersWrote) {
@@ -308,8 +309,8 @@ HOST_TEST(DNSDetails, ReadBackWhatTheWritersWrote) {
     IC::executeDNSChanges({"a", "b"}, false);
     Details details;
     IC::getDNSDetails(details.servers, details.suffixes);
-    EXPECT_THAT(details.servers, ElementsAre("10.0.0.1", "10.0.0.2"));
-    EXPECT_THAT(details.suffixes, ElementsAre("a", "b"));
+    EXPECT_THAT(details.servers, TextsAre("10.0.0.1", "10.0.0.2"));
+    EXPECT_THAT(details.suffixes, TextsAre("a", "b"));
     IC::executeDNSChanges({}, true);
     IC::executeDNSChanges({}, false);
     Details none;

@@ -4,10 +4,10 @@
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
-using testing::ElementsAre;
 using testing::IsEmpty;
 
 HOST_TEST(Esx, EnablesIPv6ForConsoleAndKernel) {
@@ -16,10 +16,10 @@ HOST_TEST(Esx, EnablesIPv6ForConsoleAndKernel) {
     const CommandLines commands;
     LogCapture capture;
     EXPECT_TRUE(IC::enableIPv6ForESX());
-    EXPECT_THAT(commands.all(), ElementsAre("esxcfg-vswif -6 true", "esxcfg-vmknic  -6 true"));
-    EXPECT_THAT(host.calls(), ElementsAre("esxcfg-vswif -6 true", "esxcfg-vmknic -6 true"));
+    EXPECT_THAT(commands.all(), TextsAre("esxcfg-vswif -6 true", "esxcfg-vmknic  -6 true"));
+    EXPECT_THAT(host.calls(), TextsAre("esxcfg-vswif -6 true", "esxcfg-vmknic -6 true"));
     EXPECT_THAT(capture.messages(3000),
-                ElementsAre("Entering enableIPv6ForESX", "enableIPv6ForESX Returned : 1"));
+                TextsAre("Entering enableIPv6ForESX", "enableIPv6ForESX Returned : 1"));
 }
 
 HOST_TEST(Esx, DoesNotTryTheKernelWhenTheConsoleCouldNotBe) {
@@ -29,9 +29,9 @@ HOST_TEST(Esx, DoesNotTryTheKernelWhenTheConsoleCouldNotBe) {
         const NoDescriptors none;
         EXPECT_FALSE(IC::enableIPv6ForESX());
     }
-    EXPECT_THAT(commands.all(), ElementsAre("esxcfg-vswif -6 true"));
+    EXPECT_THAT(commands.all(), TextsAre("esxcfg-vswif -6 true"));
     EXPECT_THAT(capture.messages(3000),
-                ElementsAre("Entering enableIPv6ForESX", "enableIPv6ForESX Returned : 0"));
+                TextsAre("Entering enableIPv6ForESX", "enableIPv6ForESX Returned : 0"));
 }
 
 HOST_TEST(Esx, ReleaseIsNoneOnAnotherMachine) {
@@ -39,8 +39,8 @@ HOST_TEST(Esx, ReleaseIsNoneOnAnotherMachine) {
     LogCapture capture;
     EXPECT_FALSE(IC::checkESX4_1Release());
     EXPECT_THAT(commands.all(), IsEmpty());
-    EXPECT_THAT(capture.messages(3000), ElementsAre("Entering checkESX4_1Release", "Machine is not vmware",
-                                                    "Exiting checkESX4_1Release"));
+    EXPECT_THAT(capture.messages(3000), TextsAre("Entering checkESX4_1Release", "Machine is not vmware",
+                                                 "Exiting checkESX4_1Release"));
 }
 
 HOST_TEST(Esx, ReleaseIsTakenFromALineWithAFour) {
@@ -48,17 +48,17 @@ HOST_TEST(Esx, ReleaseIsTakenFromALineWithAFour) {
     const CommandLines commands;
     LogCapture capture;
     EXPECT_TRUE(IC::checkESX4_1Release());
-    EXPECT_THAT(commands.all(), ElementsAre("cat /etc/vmware-release | grep 4"));
+    EXPECT_THAT(commands.all(), TextsAre("cat /etc/vmware-release | grep 4"));
     EXPECT_THAT(capture.messages(3000),
-                ElementsAre("Entering checkESX4_1Release", "Exiting checkESX4_1Release"));
+                TextsAre("Entering checkESX4_1Release", "Exiting checkESX4_1Release"));
 }
 
 HOST_TEST(Esx, ReleaseWithoutAFourIsTheOlderOne) {
     host.file("/etc/vmware-release", "VMware ESX Server 3\n");
     LogCapture capture;
     EXPECT_FALSE(IC::checkESX4_1Release());
-    EXPECT_THAT(capture.messages(3000), ElementsAre("Entering checkESX4_1Release", "Machine is ESX 4.0",
-                                                    "Exiting checkESX4_1Release"));
+    EXPECT_THAT(capture.messages(3000),
+                TextsAre("Entering checkESX4_1Release", "Machine is ESX 4.0", "Exiting checkESX4_1Release"));
 }
 
 HOST_TEST(Esx, ReleaseIsNotGuessedWhenItCannotBeRead) {
@@ -69,7 +69,7 @@ HOST_TEST(Esx, ReleaseIsNotGuessedWhenItCannotBeRead) {
         EXPECT_FALSE(IC::checkESX4_1Release());
     }
     EXPECT_THAT(capture.messages(3000),
-                ElementsAre("Entering checkESX4_1Release", "Exiting checkESX4_1Release"));
+                TextsAre("Entering checkESX4_1Release", "Exiting checkESX4_1Release"));
 }
 
 HOST_TEST(Esx, EmptyOperationsDoNothing) {

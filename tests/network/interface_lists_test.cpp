@@ -8,10 +8,10 @@
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
-using testing::ElementsAre;
 using testing::IsEmpty;
 using Names = std::vector<std::string>;
 
@@ -22,8 +22,8 @@ HOST_TEST(NicString, LogsEntryAndExit) {
     EXPECT_EQ(name, "  eth0");
     EXPECT_FALSE(IC::getNICString("br0\t8000.00", name));
     EXPECT_EQ(name, "br0");
-    EXPECT_THAT(capture.messages(), ElementsAre("getNICString: entry", "getNICString: exit",
-                                                "getNICString: entry", "getNICString: exit"));
+    EXPECT_THAT(capture.messages(), TextsAre("getNICString: entry", "getNICString: exit",
+                                             "getNICString: entry", "getNICString: exit"));
 }
 
 HOST_TEST(BridgeInterfaces, AreTheLastColumn) {
@@ -33,11 +33,10 @@ HOST_TEST(BridgeInterfaces, AreTheLastColumn) {
     const LogCapture capture;
     Names members = {"before"};
     EXPECT_TRUE(IC::getbridgeInterfaces(members));
-    EXPECT_THAT(members, ElementsAre("before", "eth0", "eth1"));
-    EXPECT_THAT(commands.all(), ElementsAre("brctl show | awk '{print $NF}' | grep -v interfaces"));
-    EXPECT_THAT(capture.messages(),
-                ElementsAre("getbridgeInterfaces: entry", "getbridgeInterfaces: aftereth0",
-                            "getbridgeInterfaces: aftereth1", "getbridgeInterfaces: exit"));
+    EXPECT_THAT(members, TextsAre("before", "eth0", "eth1"));
+    EXPECT_THAT(commands.all(), TextsAre("brctl show | awk '{print $NF}' | grep -v interfaces"));
+    EXPECT_THAT(capture.messages(), TextsAre("getbridgeInterfaces: entry", "getbridgeInterfaces: aftereth0",
+                                             "getbridgeInterfaces: aftereth1", "getbridgeInterfaces: exit"));
     EXPECT_EQ(capture.messages(3000).size(), 4U);
 }
 
@@ -58,12 +57,12 @@ HOST_TEST(SlaveInterfaces, AreListedInTheOrderOfTheFile) {
     const LogCapture capture;
     Names members = {"before"};
     EXPECT_TRUE(IC::getSlaveInterfaces("bond0", members));
-    EXPECT_THAT(members, ElementsAre("before", "eth1", "eth0"));
+    EXPECT_THAT(members, TextsAre("before", "eth1", "eth0"));
     EXPECT_THAT(commands.all(),
-                ElementsAre("cat /proc/net/bonding/bond0 2> /dev/null | grep \"Slave Interface:\""));
+                TextsAre("cat /proc/net/bonding/bond0 2> /dev/null | grep \"Slave Interface:\""));
     EXPECT_THAT(capture.messages(),
-                ElementsAre("Entering getSlaveInterfaces", "mypopen():  Count value 1", "Slave Found:eth1",
-                            "Slave Found:eth0", "Exiting getSlaveInterfaces"));
+                TextsAre("Entering getSlaveInterfaces", "mypopen():  Count value 1", "Slave Found:eth1",
+                         "Slave Found:eth0", "Exiting getSlaveInterfaces"));
     EXPECT_EQ(capture.messages(3000).size(), 5U);
 }
 
@@ -72,7 +71,7 @@ HOST_TEST(SlaveInterfaces, TakeTheBlankBehindTheLabelForGrantedAndTheProbeDoesNo
     host.tool("ethtool eth0", "\tLink detected: yes\n");
     Names members;
     EXPECT_TRUE(IC::getSlaveInterfaces("bond0", members));
-    EXPECT_THAT(members, ElementsAre("th0"));
+    EXPECT_THAT(members, TextsAre("th0"));
     EXPECT_TRUE(IC::isNICUp("bond0"));
 }
 
@@ -90,7 +89,7 @@ HOST_TEST(SlaveInterfaces, WithoutAShellFails) {
         EXPECT_FALSE(IC::getSlaveInterfaces("bond0", members));
     }
     EXPECT_FALSE(IC::getSlaveInterfaces(std::string(600, 'x'), members));
-    EXPECT_THAT(members, ElementsAre("before"));
+    EXPECT_THAT(members, TextsAre("before"));
     EXPECT_THAT(capture.messages(6000), testing::Contains("isNICUp - grepping slave device error").Times(2));
 }
 
@@ -198,7 +197,7 @@ TEST(PortTypes, NoTextHasTheCode102) {
 TEST(PortTypes, LogEntryAndExit) {
     const LogCapture capture;
     IC::getPortType("Other");
-    EXPECT_THAT(capture.messages(3000), ElementsAre("getPortType: entry", "getPortType: exit"));
+    EXPECT_THAT(capture.messages(3000), TextsAre("getPortType: entry", "getPortType: exit"));
 }
 
 }  // namespace

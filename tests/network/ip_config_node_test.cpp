@@ -8,11 +8,11 @@
 #include "tests/support/command_lines.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/shell_stub.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
 using IC::PropertyValue;
-using testing::ElementsAre;
 
 PropertyValue live(const IC::MutableNode& node, unsigned int id) {
     return PortHost::live(node, id);
@@ -70,8 +70,8 @@ HOST_TEST(IPConfigNode, OfALeaseSaysSo) {
 HOST_TEST(IPConfigNode, ListsTheLeasesServerBeforeTheDHCPv6Server) {
     host.file("/var/lib/dhcpcd/dhcpcd-eth0.info", "IPADDR='192.0.2.9'\nDHCPSID='192.0.2.1'\n");
     host.file("/var/lib/dhcpv6/client6.leases", "lease SDUID: 00:01:00:01;\n");
-    EXPECT_THAT(IC::dhcpServersOf("eth0"), ElementsAre("192.0.2.1", "00:01:00:01"));
-    EXPECT_THAT(IC::dhcpServersOf("eth1"), ElementsAre("00:01:00:01"));
+    EXPECT_THAT(IC::dhcpServersOf("eth0"), TextsAre("192.0.2.1", "00:01:00:01"));
+    EXPECT_THAT(IC::dhcpServersOf("eth1"), TextsAre("00:01:00:01"));
     host.remove("/var/lib/dhcpv6");
     EXPECT_THAT(IC::dhcpServersOf("eth1"), testing::IsEmpty());
 }
@@ -172,10 +172,10 @@ HOST_TEST(IPConfigNode, AsksWithTheseCommands) {
     live(*config, 123);
     live(bond, 123);
     live(*config, 186);
-    EXPECT_THAT(commands.all(), ElementsAre("hostname -s 2> /dev/null", "hostname -d 2> /dev/null",
-                                            "ethtool eth0 2> /dev/null | grep \"Link detected\"",
-                                            "ifconfig | grep bond0 2> /dev/null",
-                                            "cat /var/lib/dhcpcd/dhcpcd-eth0.info 2> /dev/null"));
+    EXPECT_THAT(commands.all(), TextsAre("hostname -s 2> /dev/null", "hostname -d 2> /dev/null",
+                                         "ethtool eth0 2> /dev/null | grep \"Link detected\"",
+                                         "ifconfig | grep bond0 2> /dev/null",
+                                         "cat /var/lib/dhcpcd/dhcpcd-eth0.info 2> /dev/null"));
 }
 
 HOST_TEST(IPConfigNode, LeavesTheAddressTypeAloneWhenThereIsNone) {
@@ -230,7 +230,7 @@ HOST_TEST(IPConfigNode, SaysWhenItIsRead) {
     LogCapture capture;
     live(*config, 108);
     EXPECT_THAT(capture.ownMessages(),
-                ElementsAre("IPConfigNode::getProperty: entry", "IPConfigNode::getProperty: exit"));
+                TextsAre("IPConfigNode::getProperty: entry", "IPConfigNode::getProperty: exit"));
 }
 
 TEST(Origin, OfEveryKeyword) {

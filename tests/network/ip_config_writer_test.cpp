@@ -4,12 +4,12 @@
 #include "tests/network/port_host.h"
 #include "tests/support/command_lines.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
 using IC::PropertyValue;
 using testing::Contains;
-using testing::ElementsAre;
 using testing::IsEmpty;
 using testing::Not;
 
@@ -132,7 +132,7 @@ HOST_TEST(Dispatch, WritesAddressMaskAndPrefixLengthWhileTheOriginIsFixed) {
     EXPECT_EQ(PortHost::stored(*node, 25), text("192.0.2.77"));
     EXPECT_EQ(PortHost::stored(*node, 26), text("255.255.0.0"));
     EXPECT_EQ(PortHost::stored(*node, 102), number(48));
-    EXPECT_THAT(writable.changes(), ElementsAre("ifconfig eth0 netmask 255.255.0.0"));
+    EXPECT_THAT(writable.changes(), TextsAre("ifconfig eth0 netmask 255.255.0.0"));
 }
 
 HOST_TEST(Dispatch, OfAnOriginWritesTheResolversPolicyAndThenTheFile) {
@@ -149,7 +149,7 @@ HOST_TEST(Dispatch, OfAnOriginWritesTheResolversPolicyAndThenTheFile) {
     std::erase_if(writers, [](const std::string& message) {
         return message != "setIPOrigin: entry" && message != "disableNetConfigDNSPolicy: Entering";
     });
-    EXPECT_THAT(writers, ElementsAre("disableNetConfigDNSPolicy: Entering", "setIPOrigin: entry"));
+    EXPECT_THAT(writers, TextsAre("disableNetConfigDNSPolicy: Entering", "setIPOrigin: entry"));
     EXPECT_EQ(PortHost::stored(*node, 24), origin(3));
     // The next call finds the origin fixed.
     EXPECT_EQ(writable.set(*node, 25, text("192.0.2.78"), file),
@@ -198,7 +198,7 @@ HOST_TEST(Dispatch, OfNamesTakesTheNodesAddressAndOtherName) {
               "127.0.0.1\tlocalhost\n192.0.2.10\tweb.example.com\tweb\n");
     EXPECT_EQ(writable.set(*writable.eth0(), 98, text("example.net"), "/etc/hosts"),
               "127.0.0.1\tlocalhost\n192.0.2.10\tlinux-a.example.net\tlinux-a\n");
-    EXPECT_THAT(writable.changes(), ElementsAre("hostname web.example.com", "hostname linux-a.example.net"));
+    EXPECT_THAT(writable.changes(), TextsAre("hostname web.example.com", "hostname linux-a.example.net"));
     EXPECT_THAT(capture.ownMessages(), Contains("HostName :web"));
     EXPECT_THAT(capture.ownMessages(), Contains("DomainName :example.net"));
     EXPECT_THAT(capture.ownMessages(), Contains("Operation : 0").Times(1));
@@ -245,8 +245,8 @@ HOST_TEST(LinkState, IsSetByIfconfig) {
         writable.set(*writable.eth0(), 123, number(state));
         EXPECT_EQ(PortHost::stored(*writable.eth0(), 123), number(state));
     }
-    EXPECT_THAT(writable.changes(), ElementsAre("ifconfig eth0 up", "ifconfig eth0 up", "ifconfig eth0 down",
-                                                "ifconfig eth0 down"));
+    EXPECT_THAT(writable.changes(),
+                TextsAre("ifconfig eth0 up", "ifconfig eth0 up", "ifconfig eth0 down", "ifconfig eth0 down"));
 }
 
 HOST_TEST(LinkState, ThatIsNoneIsLoggedAndStored) {
@@ -255,7 +255,7 @@ HOST_TEST(LinkState, ThatIsNoneIsLoggedAndStored) {
         LogCapture capture;
         writable.set(*writable.eth0(), 123, number(state));
         EXPECT_THAT(capture.ownMessages(6000),
-                    ElementsAre("IPConfigNode::setProperty: Invalid status request."));
+                    TextsAre("IPConfigNode::setProperty: Invalid status request."));
         EXPECT_THAT(capture.ownMessages(3000), Contains("Status Value : " + std::to_string(state)));
         EXPECT_EQ(PortHost::stored(*writable.eth0(), 123), number(state));
     }
@@ -279,7 +279,7 @@ HOST_TEST(LinkState, OfABondTakesTheMonitorsReportsWithoutACommand) {
     EXPECT_THAT(capture.ownMessages(), Contains("Status updation for bonded interface. New status is: 33"));
     EXPECT_THAT(capture.ownMessages(6000), IsEmpty());
     EXPECT_EQ(PortHost::stored(*bond, 123), number(33));
-    EXPECT_THAT(host.callsOf("ifconfig"), ElementsAre("ifconfig bond0", "ifconfig bond0")) << "reads alone";
+    EXPECT_THAT(host.callsOf("ifconfig"), TextsAre("ifconfig bond0", "ifconfig bond0")) << "reads alone";
 }
 
 }  // namespace

@@ -6,12 +6,12 @@
 #include "tests/support/command_lines.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
 using IC::PropertyValue;
 using testing::Contains;
-using testing::ElementsAre;
 using testing::IsEmpty;
 
 constexpr char kMac[] = "02:00:5e:00:00:01";
@@ -29,14 +29,14 @@ HOST_TEST(Origin, IsWrittenInPlaceAndTheStartModeAppended) {
     const CommandLines commands;
     LogCapture capture;
     IC::setIPOrigin("eth0", origin(3), kMac);
-    EXPECT_THAT(commands.all(), ElementsAre("rpm -qa | grep dhcpv6*"));
+    EXPECT_THAT(commands.all(), TextsAre("rpm -qa | grep dhcpv6*"));
     EXPECT_EQ(host.read(kFile), "# mine\nBOOTPROTO=static\nMTU=1500\nSTARTMODE='auto'\n");
-    EXPECT_THAT(host.calls(), ElementsAre("rpm -qa"));
+    EXPECT_THAT(host.calls(), TextsAre("rpm -qa"));
     EXPECT_THAT(capture.ownMessages(3000),
-                ElementsAre("setIPOrigin: entry", std::string("File open ") + kFile + " in read mode.",
-                            "setIPOrigin: exit"));
+                TextsAre("setIPOrigin: entry", std::string("File open ") + kFile + " in read mode.",
+                         "setIPOrigin: exit"));
     EXPECT_THAT(capture.ownMessages(4000),
-                ElementsAre("IP Origin  = 3", "File open '/etc/sysconfig/network' in write mode."));
+                TextsAre("IP Origin  = 3", "File open '/etc/sysconfig/network' in write mode."));
 }
 
 HOST_TEST(Origin, OfDhcpIsWrittenSoWhateverRpmSays) {
@@ -78,7 +78,7 @@ HOST_TEST(Origin, ThatCannotBeWrittenIsPassedOver) {
     IC::setIPOrigin("eth0", origin(3), kMac);
     EXPECT_EQ(host.read(kFile), "BOOTPROTO=dhcp\n");
     EXPECT_THAT(capture.ownMessages(6000), IsEmpty());
-    EXPECT_THAT(capture.ownMessages(4000), ElementsAre("IP Origin  = 3"));
+    EXPECT_THAT(capture.ownMessages(4000), TextsAre("IP Origin  = 3"));
 }
 
 HOST_TEST(Address, IsWrittenAndLeftToTheNextStart) {
@@ -106,7 +106,7 @@ HOST_TEST(Address, ThatCannotBeWrittenIsPassedOver) {
     LogCapture capture;
     IC::setIPv4Address("eth0", "192.0.2.77", kMac);
     EXPECT_EQ(host.read(kFile), "IPADDR=192.0.2.1\n");
-    EXPECT_THAT(capture.ownMessages(), ElementsAre("Entering setIPv4Address", "Exiting setIPv4Address"));
+    EXPECT_THAT(capture.ownMessages(), TextsAre("Entering setIPv4Address", "Exiting setIPv4Address"));
 }
 
 HOST_TEST(Address, OnAMissingFileCreatesIt) {
@@ -123,9 +123,9 @@ HOST_TEST(Mask, OnAMissingFileCreatesItAndChangesTheRunningInterface) {
     LogCapture capture;
     IC::setSubnetMask("eth0", "255.255.255.128", kMac);
     EXPECT_EQ(host.read(kFile), "BOOTPROTO=static\nNETMASK=255.255.255.128\n");
-    EXPECT_THAT(host.calls(), ElementsAre("ifconfig eth0 netmask 255.255.255.128"));
+    EXPECT_THAT(host.calls(), TextsAre("ifconfig eth0 netmask 255.255.255.128"));
     EXPECT_EQ(capture.ownMessages().front(), "Entering setSubnetMask");
-    EXPECT_THAT(capture.ownMessages(4000), ElementsAre("Writing Subnet to File"));
+    EXPECT_THAT(capture.ownMessages(4000), TextsAre("Writing Subnet to File"));
 }
 
 HOST_TEST(Mask, IsWrittenInPlace) {
@@ -134,7 +134,7 @@ HOST_TEST(Mask, IsWrittenInPlace) {
     const CommandLines commands;
     IC::setSubnetMask("eth0", "255.255.0.0", kMac);
     EXPECT_EQ(host.read(kFile), "BOOTPROTO=dhcp\nNETMASK=255.255.0.0\nMTU=1500\n");
-    EXPECT_THAT(commands.all(), ElementsAre("ifconfig eth0 netmask 255.255.0.0"));
+    EXPECT_THAT(commands.all(), TextsAre("ifconfig eth0 netmask 255.255.0.0"));
 }
 
 HOST_TEST(Mask, ThatCannotBeWrittenStillChangesTheRunningInterface) {
@@ -144,8 +144,8 @@ HOST_TEST(Mask, ThatCannotBeWrittenStillChangesTheRunningInterface) {
     LogCapture capture;
     IC::setSubnetMask("eth0", "255.255.0.0", kMac);
     EXPECT_EQ(host.read(kFile), "BOOTPROTO=static\nNETMASK=255.0.0.0\n");
-    EXPECT_THAT(capture.ownMessages(6000), ElementsAre("Failed to open the file for writing"));
-    EXPECT_THAT(host.calls(), ElementsAre("ifconfig eth0 netmask 255.255.0.0"));
+    EXPECT_THAT(capture.ownMessages(6000), TextsAre("Failed to open the file for writing"));
+    EXPECT_THAT(host.calls(), TextsAre("ifconfig eth0 netmask 255.255.0.0"));
 }
 
 HOST_TEST(Mask, SaysWhenNoCommandCanBeStarted) {
@@ -153,7 +153,7 @@ HOST_TEST(Mask, SaysWhenNoCommandCanBeStarted) {
     const NoDescriptors none;
     IC::setSubnetMask("eth0", "255.255.0.0", kMac);
     EXPECT_THAT(capture.ownMessages(6000),
-                ElementsAre("Failed to open the file for writing", "Can not Change Subnet Mask."));
+                TextsAre("Failed to open the file for writing", "Can not Change Subnet Mask."));
 }
 
 HOST_TEST(Mask, OfAnyLengthRunsNoCommandThatDoesNotFit) {
@@ -173,7 +173,7 @@ HOST_TEST(Gateway, DeletesTheHostRouteAndWritesTwoFiles) {
     host.tool("route del -host 192.0.2.10 gw 192.0.2.2 eth0", "");
     LogCapture capture;
     IC::setIPV4Gateway("eth0", "192.0.2.10", "192.0.2.2");
-    EXPECT_THAT(host.calls(), ElementsAre("route del -host 192.0.2.10 gw 192.0.2.2 eth0"));
+    EXPECT_THAT(host.calls(), TextsAre("route del -host 192.0.2.10 gw 192.0.2.2 eth0"));
     EXPECT_EQ(host.read("/etc/sysconfig/network/ifroute-eth0"), "192.0.2.10\t192.0.2.2\t-\n");
     EXPECT_EQ(host.read(kRoutes), "default\t192.0.2.2\t-\n# routes\ndefault\tfe80::1\t-\n");
     EXPECT_EQ(capture.ownMessages().front(), "Entering setIPV4Gateway");
@@ -186,7 +186,7 @@ HOST_TEST(Gateway, ThatIsEmptyLeavesTheDefaultRoute) {
     const CommandLines commands;
     LogCapture capture;
     IC::setIPV4Gateway("eth0", "192.0.2.10", "");
-    EXPECT_THAT(commands.all(), ElementsAre("route del -host 192.0.2.10 gw  eth0 2> /dev/null"));
+    EXPECT_THAT(commands.all(), TextsAre("route del -host 192.0.2.10 gw  eth0 2> /dev/null"));
     EXPECT_EQ(host.read("/etc/sysconfig/network/ifroute-eth0"), "192.0.2.10\t\t-\n");
     EXPECT_EQ(host.read(kRoutes), "default\t192.0.2.1\t-\n");
     EXPECT_THAT(capture.ownMessages(), Contains("Either NIC or gateway is null"));
@@ -252,14 +252,14 @@ HOST_TEST(Utilities, RestartTheNetworkAndLeaveNetworkManagerAlone) {
     LogCapture capture;
     IC::restartNetwork();
     IC::disableNMControlled("eth0");
-    EXPECT_THAT(host.calls(), ElementsAre("service network restart"));
+    EXPECT_THAT(host.calls(), TextsAre("service network restart"));
     EXPECT_THAT(capture.ownMessages(),
                 testing::IsSupersetOf({"restartNetwork Called.", "Entering disableNMControlled\n",
                                        "Exiting disableNMControlled\n"}));
     capture.clear();
     const NoDescriptors none;
     IC::restartNetwork();
-    EXPECT_THAT(capture.ownMessages(6000), ElementsAre("Can not bring up interface."));
+    EXPECT_THAT(capture.ownMessages(6000), TextsAre("Can not bring up interface."));
 }
 
 }  // namespace

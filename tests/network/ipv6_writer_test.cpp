@@ -5,6 +5,7 @@
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
@@ -105,8 +106,8 @@ HOST_TEST(IPv6Address, RunsNoCommandAndLogsTheWriting) {
     IC::setIPv6Address("eth0", "fd00::7", kMac);
     EXPECT_THAT(commands.all(), IsEmpty());
     EXPECT_THAT(capture.messages(),
-                ElementsAre("setIPv6Address: entry", "Writing IP Address", "setIPv6Address: exit"));
-    EXPECT_THAT(capture.messages(4000), ElementsAre("Writing IP Address"));
+                TextsAre("setIPv6Address: entry", "Writing IP Address", "setIPv6Address: exit"));
+    EXPECT_THAT(capture.messages(4000), TextsAre("Writing IP Address"));
     EXPECT_TRUE(capture.everyLineTwice());
 }
 
@@ -117,8 +118,8 @@ HOST_TEST(IPv6Address, LeavesAnUnwritableFileWithoutAWord) {
     IC::setIPv6Address("eth0", "fd00::7", kMac);
     IC::setIPv6PrefixLength("eth0", 64, kMac);
     EXPECT_EQ(host.read(kInterface), "IPADDR_1=fd00::1\n");
-    EXPECT_THAT(capture.messages(), ElementsAre("setIPv6Address: entry", "setIPv6Address: exit",
-                                                "setIPv6PrefixLength: entry", "setIPv6PrefixLength: exit"));
+    EXPECT_THAT(capture.messages(), TextsAre("setIPv6Address: entry", "setIPv6Address: exit",
+                                             "setIPv6PrefixLength: entry", "setIPv6PrefixLength: exit"));
 }
 
 HOST_TEST(IPv6Address, FileIsTheOldOneWhenTheDiskIsFull) {
@@ -148,9 +149,8 @@ HOST_TEST(IPv6PrefixLength, LogsTheWriting) {
     host.file(kInterface, "");
     LogCapture capture;
     IC::setIPv6PrefixLength("eth0", 64, kMac);
-    EXPECT_THAT(capture.messages(3000),
-                ElementsAre("setIPv6PrefixLength: entry", "setIPv6PrefixLength: exit"));
-    EXPECT_THAT(capture.messages(4000), ElementsAre("File open '/etc/sysconfig/network' in write mode."));
+    EXPECT_THAT(capture.messages(3000), TextsAre("setIPv6PrefixLength: entry", "setIPv6PrefixLength: exit"));
+    EXPECT_THAT(capture.messages(4000), TextsAre("File open '/etc/sysconfig/network' in write mode."));
 }
 
 HOST_TEST(StaticIPv6Gateways, AreTheNextHopsNoRouterAdvertised) {
@@ -160,7 +160,7 @@ HOST_TEST(StaticIPv6Gateways, AreTheNextHopsNoRouterAdvertised) {
     const CommandLines commands;
     Lines gateways{"before"};
     EXPECT_TRUE(IC::getStaticIPV6GatewaysOnSuSe10("eth0", gateways));
-    EXPECT_THAT(gateways, ElementsAre("before", "fd00::2", "fd00::4"));
+    EXPECT_THAT(gateways, TextsAre("before", "fd00::2", "fd00::4"));
     EXPECT_THAT(commands.all(), ElementsAre(kListing));
 }
 
@@ -168,7 +168,7 @@ HOST_TEST(StaticIPv6Gateways, AreAlsoThoseOfLongerNames) {
     routingTable(host, route("fd00::10", "UG", "eth10"));
     Lines gateways;
     EXPECT_TRUE(IC::getStaticIPV6GatewaysOnSuSe10("eth1", gateways));
-    EXPECT_THAT(gateways, ElementsAre("fd00::10"));
+    EXPECT_THAT(gateways, TextsAre("fd00::10"));
 }
 
 HOST_TEST(StaticIPv6Gateways, AreNoneWithoutALineOrATool) {
@@ -177,7 +177,7 @@ HOST_TEST(StaticIPv6Gateways, AreNoneWithoutALineOrATool) {
     LogCapture capture;
     EXPECT_FALSE(IC::getStaticIPV6GatewaysOnSuSe10("eth0", gateways));
     EXPECT_THAT(capture.messages(),
-                ElementsAre("getStaticIPV6GatewaysOnSuSe10: entry", "getStaticIPV6GatewaysOnSuSe10: exit"));
+                TextsAre("getStaticIPV6GatewaysOnSuSe10: entry", "getStaticIPV6GatewaysOnSuSe10: exit"));
     host.toolMissing("route");
     EXPECT_FALSE(IC::getStaticIPV6GatewaysOnSuSe10("eth0", gateways));
     const NoDescriptors none;
@@ -236,9 +236,9 @@ HOST_TEST(IPv6Gateway, WithoutAnAddressOrAnInterfaceDoesNothing) {
     EXPECT_THAT(commands.all(), IsEmpty());
     EXPECT_EQ(host.read(kRoutes), "default\tfd00::3\t-\n");
     EXPECT_THAT(capture.messages(),
-                ElementsAre("setIPv6GatewayForSuSe: entry", "Either NIC or gateway is null",
-                            "setIPv6GatewayForSuSe10: exit", "setIPv6GatewayForSuSe: entry",
-                            "Either NIC or gateway is null", "setIPv6GatewayForSuSe10: exit"));
+                TextsAre("setIPv6GatewayForSuSe: entry", "Either NIC or gateway is null",
+                         "setIPv6GatewayForSuSe10: exit", "setIPv6GatewayForSuSe: entry",
+                         "Either NIC or gateway is null", "setIPv6GatewayForSuSe10: exit"));
     EXPECT_EQ(capture.messages(6000).size(), 2U);
 }
 
@@ -249,7 +249,7 @@ HOST_TEST(IPv6Gateway, ThatCannotBeAddedLeavesRoutesAndFileAlone) {
         const NoDescriptors none;
         IC::setIPv6GatewayForSuSe10("eth0", "fd00::1");
     }
-    EXPECT_THAT(capture.messages(6000), ElementsAre("Could not execute 'ip -6 route add default' command"));
+    EXPECT_THAT(capture.messages(6000), TextsAre("Could not execute 'ip -6 route add default' command"));
     EXPECT_THAT(capture.messages(), Not(Contains("deleteStaticIPv6GatewayOnSuSe10: entry")));
     EXPECT_EQ(host.read(kRoutes), "default\tfd00::3\t-\n");
 }
@@ -322,7 +322,7 @@ HOST_TEST(IPv6RoutesFile, IsTheOldOneWhenItCannotBeWrittenButTheRoutesAreChanged
     EXPECT_THAT(commands.all(), ElementsAre(kListing, kAdd, deletion("fd00::3")));
     EXPECT_EQ(host.read(kRoutes), "default\tfd00::3\t-\n");
     EXPECT_THAT(capture.messages(6000),
-                ElementsAre("Can not open '/etc/sysconfig/network/routes' in write mode."));
+                TextsAre("Can not open '/etc/sysconfig/network/routes' in write mode."));
 }
 
 HOST_TEST(IPv6RoutesFile, IsTheOldOneWhenTheDiskIsFull) {

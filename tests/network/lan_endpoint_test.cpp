@@ -12,11 +12,11 @@
 
 #include "tests/network/port_host.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
 using testing::Contains;
-using testing::ElementsAre;
 
 /// While it lives, the kernel has these addresses; without any it does not answer.
 class Addresses {
@@ -122,7 +122,7 @@ HOST_TEST(LanEndPoint, IsNotBuiltWhenTheKernelDoesNotAnswer) {
     LogCapture capture;
     plugin.mi().createLANEndPointNodes();
     EXPECT_THAT(capture.ownMessages(6000),
-                ElementsAre("OsHwMI::createLANEndPointNodes, not able to get IPInfo"));
+                TextsAre("OsHwMI::createLANEndPointNodes, not able to get IPInfo"));
     EXPECT_THAT(plugin.names(73), testing::IsEmpty());
 }
 
@@ -158,7 +158,7 @@ HOST_TEST(LanEndPoint, IsBuiltOnceMoreUnderThePortItsNameCarries) {
     LogCapture capture;
     plugin.mi().createLANEndPointNodes();
     IC::m_mapEthernetPorts = nullptr;
-    EXPECT_THAT(plugin.names(73), ElementsAre("eth0#1", "eth1#1", "eth0#1"));
+    EXPECT_THAT(plugin.names(73), TextsAre("eth0#1", "eth1#1", "eth0#1"));
     EXPECT_EQ(plugin.mi().holdAll().back()->getLinkedId(), 4711U);
     EXPECT_EQ(plugin.mi().holdAll().back()->getIndex(), 3U);
     EXPECT_THAT(capture.ownMessages(), Contains("In getParentLANEndPointNode eth0#1"));
@@ -172,8 +172,8 @@ HOST_TEST(LanEndPoint, PassesEverythingToTheFramework) {
     EXPECT_EQ(node.setProperty(123, number(12)).getStatus(), 0);
     EXPECT_EQ(PortHost::live(node, 123), number(12));
     EXPECT_THAT(capture.ownMessages(),
-                ElementsAre("CLANEndPointNode::setProperty: entry", "CLANEndPointNode::setProperty: exit",
-                            "CLANEndPointNode::getProperty: entry", "CLANEndPointNode::getProperty: exit"));
+                TextsAre("CLANEndPointNode::setProperty: entry", "CLANEndPointNode::setProperty: exit",
+                         "CLANEndPointNode::getProperty: entry", "CLANEndPointNode::getProperty: exit"));
 }
 
 TEST(LanEndPoint, FindsThePortANameIsDerivedFrom) {

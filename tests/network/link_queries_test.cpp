@@ -7,10 +7,10 @@
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"
 #include "tests/support/shell_stub.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
-using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::IsEmpty;
 
@@ -22,12 +22,11 @@ HOST_TEST(LinkQueries, AskEthtoolInTheseWords) {
     IC::getNetworkDuplex("eth0");
     IC::getAutoSense("eth0");
     IC::isNICUp("eth0");
-    EXPECT_THAT(
-        commands.all(),
-        ElementsAre("ethtool eth0 2> /dev/null | grep Speed | tr -s ' ' | cut -d ' ' -f2 2> /dev/null",
-                    "ethtool eth0 2> /dev/null | grep Duplex",
-                    "ethtool eth0 2> /dev/null | grep Auto-negotiation",
-                    "ethtool eth0 2> /dev/null | grep \"Link detected\""));
+    EXPECT_THAT(commands.all(),
+                TextsAre("ethtool eth0 2> /dev/null | grep Speed | tr -s ' ' | cut -d ' ' -f2 2> /dev/null",
+                         "ethtool eth0 2> /dev/null | grep Duplex",
+                         "ethtool eth0 2> /dev/null | grep Auto-negotiation",
+                         "ethtool eth0 2> /dev/null | grep \"Link detected\""));
     EXPECT_EQ(speed, 1'000'000U);
 }
 
@@ -44,10 +43,10 @@ HOST_TEST(LinkQueries, LogEntryAndExit) {
     IC::getHardwareAddress("eth0", address);
     IC::isInterfaceUP("eth0");
     EXPECT_THAT(capture.messages(3000),
-                ElementsAre("getNetworkSpeed: entry", "getNetworkSpeed: exit", "getNetworkDuplex: entry",
-                            "getNetworkDuplex: exit", "getAutoSense: entry", "getAutoSense: exit",
-                            "getHardwareAddress: entry", "getHardwareAddress: exit", "isInterfaceUP: entry",
-                            "isInterfaceUP: exit"));
+                TextsAre("getNetworkSpeed: entry", "getNetworkSpeed: exit", "getNetworkDuplex: entry",
+                         "getNetworkDuplex: exit", "getAutoSense: entry", "getAutoSense: exit",
+                         "getHardwareAddress: entry", "getHardwareAddress: exit", "isInterfaceUP: entry",
+                         "isInterfaceUP: exit"));
     EXPECT_EQ(capture.messages().size(), 10U);
     EXPECT_TRUE(capture.everyLineTwice());
 }
@@ -91,11 +90,10 @@ HOST_TEST(LinkQueries, AShellThatCannotBeStartedIsLogged) {
         EXPECT_FALSE(IC::isInterfaceUP("eth0"));
     }
     EXPECT_EQ(speed, 7U);
-    EXPECT_THAT(
-        capture.messages(6000),
-        ElementsAre("NetworkPort getProperty - ethtool error", "NetworkPort getProperty - ethtool error",
-                    "NetworkPort getProperty - ethtool error", "isNICUp - ethtool error",
-                    "isNICUp - cat /proc/net/bonding/bond* error"));
+    EXPECT_THAT(capture.messages(6000),
+                TextsAre("NetworkPort getProperty - ethtool error", "NetworkPort getProperty - ethtool error",
+                         "NetworkPort getProperty - ethtool error", "isNICUp - ethtool error",
+                         "isNICUp - cat /proc/net/bonding/bond* error"));
 }
 
 HOST_TEST(LinkQueries, NamesThatFillTheCommandBufferAreNotRun) {
@@ -135,7 +133,7 @@ HOST_TEST(HardwareAddress, IsAskedOfIfconfig) {
     EXPECT_EQ(address, "00:1a:64:0b:7c:10");
     EXPECT_THAT(
         commands.all(),
-        ElementsAre(
+        TextsAre(
             "ifconfig eth0 2> /dev/null |grep HWaddr |awk '{print $5}'|tr '[A-Z]' '[a-z]' 2> /dev/null"));
 }
 
@@ -148,9 +146,9 @@ HOST_TEST(HardwareAddress, StaysWithoutAShell) {
     }
     EXPECT_EQ(address, "before");
     EXPECT_THAT(capture.messages(3000),
-                ElementsAre("getHardwareAddress: entry",
-                            "getHardwareAddress: Can not get Hardware Address for SLES machine",
-                            "getHardwareAddress: exit"));
+                TextsAre("getHardwareAddress: entry",
+                         "getHardwareAddress: Can not get Hardware Address for SLES machine",
+                         "getHardwareAddress: exit"));
     EXPECT_THAT(capture.messages(6000), IsEmpty());
 }
 
@@ -161,9 +159,9 @@ HOST_TEST(InterfaceUp, ReadsTheSnapshotWhenThereIsOne) {
     host.file(IC::ifconfigSnapshotPath, "eth1      Link encap:Ethernet\n");
     EXPECT_FALSE(IC::isInterfaceUP("eth0"));
     EXPECT_TRUE(IC::isInterfaceUP("eth1"));
-    EXPECT_THAT(commands.all(), ElementsAre("ifconfig | grep eth0 ", "cat /tmp/CVIfconfig.txt | grep eth0 ",
-                                            "cat /tmp/CVIfconfig.txt | grep eth1 "));
-    EXPECT_THAT(host.calls(), ElementsAre("ifconfig"));
+    EXPECT_THAT(commands.all(), TextsAre("ifconfig | grep eth0 ", "cat /tmp/CVIfconfig.txt | grep eth0 ",
+                                         "cat /tmp/CVIfconfig.txt | grep eth1 "));
+    EXPECT_THAT(host.calls(), TextsAre("ifconfig"));
 }
 
 HOST_TEST(InterfaceUp, TheBlankBehindTheNameIsNothingToTheShell) {
@@ -175,8 +173,8 @@ HOST_TEST(NicUp, LogsWhatEthtoolSays) {
     host.tool("ethtool eth0", "\tLink detected: yes\n");
     const LogCapture capture;
     EXPECT_TRUE(IC::isNICUp("eth0"));
-    EXPECT_THAT(capture.messages(), ElementsAre("isNICUp: entry", "mypopen():  Count value 1",
-                                                "buffer = \tLink detected: yes\n", "isNICUp: exit"));
+    EXPECT_THAT(capture.messages(), TextsAre("isNICUp: entry", "mypopen():  Count value 1",
+                                             "buffer = \tLink detected: yes\n", "isNICUp: exit"));
 }
 
 HOST_TEST(NicUp, ABondAsksItsFileAndThenEachMember) {
@@ -187,17 +185,17 @@ HOST_TEST(NicUp, ABondAsksItsFileAndThenEachMember) {
     EXPECT_TRUE(IC::isNICUp("bond0"));
     // Two blanks: the probe's own and the one in front of the member's name.
     EXPECT_THAT(commands.all(),
-                ElementsAre("cat /proc/net/bonding/bond0 2> /dev/null | grep \"MII Status:\"",
-                            "cat /proc/net/bonding/bond0 2> /dev/null | grep \"Slave Interface:\"",
-                            "ethtool  eth0 2> /dev/null | grep \"Link detected\"",
-                            "ethtool  eth1 2> /dev/null | grep \"Link detected\""));
+                TextsAre("cat /proc/net/bonding/bond0 2> /dev/null | grep \"MII Status:\"",
+                         "cat /proc/net/bonding/bond0 2> /dev/null | grep \"Slave Interface:\"",
+                         "ethtool  eth0 2> /dev/null | grep \"Link detected\"",
+                         "ethtool  eth1 2> /dev/null | grep \"Link detected\""));
 }
 
 HOST_TEST(NicUp, TheFirstMemberWithoutALinkEndsTheWalk) {
     host.file("/proc/net/bonding/bond0", "MII Status: up\nSlave Interface: eth0\nSlave Interface: eth1\n");
     host.tool("ethtool eth0", "\tLink detected: no\n");
     EXPECT_FALSE(IC::isNICUp("bond0"));
-    EXPECT_THAT(host.calls(), ElementsAre("ethtool eth0"));
+    EXPECT_THAT(host.calls(), TextsAre("ethtool eth0"));
 }
 
 HOST_TEST(NicUp, ABondWithoutMembersIsDown) {
@@ -213,7 +211,7 @@ HOST_TEST(NicUp, ABondWhoseMembersCannotBeAskedForIsDown) {
     const LogCapture capture;
     EXPECT_FALSE(IC::isNICUp("bond0"));
     shell_stub::failWhen({});
-    EXPECT_THAT(capture.messages(6000), ElementsAre("isNICUp - grepping slave device error"));
+    EXPECT_THAT(capture.messages(6000), TextsAre("isNICUp - grepping slave device error"));
     EXPECT_THAT(host.calls(), IsEmpty());
 }
 

@@ -8,12 +8,12 @@
 #include "network/port_queries.h"
 #include "tests/network/port_host.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
 using IC::PropertyValue;
 using testing::Contains;
-using testing::ElementsAre;
 using testing::IsEmpty;
 using testing::Not;
 
@@ -121,10 +121,10 @@ HOST_TEST(PortNode, AnswersTheRestFromItsStoreAndChangesNothingOnTheHost) {
     EXPECT_NE(port->getProperty(999, value).getStatus(), 0);
     EXPECT_THAT(host.calls(), IsEmpty());
     EXPECT_THAT(capture.ownMessages(),
-                ElementsAre("NetworkPortNode::setProperty: entry", "NetworkPortNode::setProperty: exit",
-                            "NetworkPortNode::getProperty: entry", "NetworkPortNode::getProperty: exit",
-                            "NetworkPortNode::getProperty: entry", "NetworkPortNode::getProperty: exit",
-                            "NetworkPortNode::getProperty: entry", "NetworkPortNode::getProperty: exit"));
+                TextsAre("NetworkPortNode::setProperty: entry", "NetworkPortNode::setProperty: exit",
+                         "NetworkPortNode::getProperty: entry", "NetworkPortNode::getProperty: exit",
+                         "NetworkPortNode::getProperty: entry", "NetworkPortNode::getProperty: exit",
+                         "NetworkPortNode::getProperty: entry", "NetworkPortNode::getProperty: exit"));
 }
 
 TEST(PortQueries, TakeTheModeInFrontOfTheSlashAndItsDigits) {
@@ -194,7 +194,7 @@ HOST_TEST(PortWalk, HangsWhatHasNoPortUnderTheController) {
     EXPECT_EQ(known, plugin.port("eth0").get());
     LogCapture capture;
     EXPECT_FALSE(plugin.mi().findNetworkPort("eth7", &known));
-    EXPECT_THAT(capture.messages(3000), ElementsAre("findNetworkPort: entry", "findNetworkPort: exit"));
+    EXPECT_THAT(capture.messages(3000), TextsAre("findNetworkPort: entry", "findNetworkPort: exit"));
 }
 
 HOST_TEST(PortWalk, OfAVMwareHostListsNamesOfVAndALetterOrDigitAlone) {
@@ -202,7 +202,7 @@ HOST_TEST(PortWalk, OfAVMwareHostListsNamesOfVAndALetterOrDigitAlone) {
     host.file("/proc/net/dev", "Inter-|\n face |\nvmnic0: 1\nv-x: 1\n vmnic1: 1\n  eth9: 1\n");
     LogCapture capture;
     plugin.build();
-    EXPECT_THAT(plugin.names(12), ElementsAre("vmnic0"));
+    EXPECT_THAT(plugin.names(12), TextsAre("vmnic0"));
     EXPECT_THAT(capture.ownMessages(), Contains("Machine has vmware"));
     EXPECT_THAT(host.calls(), IsEmpty());
 }
@@ -212,8 +212,8 @@ HOST_TEST(PortWalk, PassesOverAZeroHardwareAddress) {
     host.file("/sys/class/net/eth1/address", "00:00:00:00:00:00\n");
     LogCapture capture;
     plugin.build();
-    EXPECT_THAT(plugin.names(12), ElementsAre("eth0"));
-    EXPECT_THAT(plugin.names(29), ElementsAre("eth0"));
+    EXPECT_THAT(plugin.names(12), TextsAre("eth0"));
+    EXPECT_THAT(plugin.names(29), TextsAre("eth0"));
     EXPECT_THAT(capture.ownMessages(), Contains("Permanent_address compare"));
     EXPECT_FALSE(host.exists("/opt/vantrel/corvista/data/ifcfg-eth1"));
 }
@@ -221,8 +221,8 @@ HOST_TEST(PortWalk, PassesOverAZeroHardwareAddress) {
 HOST_TEST(PortWalk, PassesOverTheMembersOfABridgeAndCallsTheBridgeOne) {
     PortHost plugin(host, "bridge-with-members");
     plugin.build();
-    EXPECT_THAT(plugin.names(12), ElementsAre("eth1"));
-    EXPECT_THAT(plugin.names(29), ElementsAre("eth1", "br0"));
+    EXPECT_THAT(plugin.names(12), TextsAre("eth1"));
+    EXPECT_THAT(plugin.names(29), TextsAre("eth1", "br0"));
     EXPECT_EQ(plugin.config("br0")->getDescription(), "Bridge");
     EXPECT_EQ(plugin.config("eth1")->getDescription(), "IP Configuration");
 }
@@ -231,7 +231,7 @@ HOST_TEST(PortWalk, MakesAPortWithoutConfigurationWhenIfconfigListsNone) {
     PortHost plugin(host, "no-network-tools");
     LogCapture capture;
     plugin.build();
-    EXPECT_THAT(plugin.names(12), ElementsAre("eth0"));
+    EXPECT_THAT(plugin.names(12), TextsAre("eth0"));
     EXPECT_THAT(plugin.names(29), IsEmpty());
     EXPECT_THAT(capture.ownMessages(6000), IsEmpty());
 }
@@ -252,7 +252,7 @@ HOST_TEST(PortWalk, AddsTheNewInterfaceAndLeavesTheOldNodesAlone) {
     host.file("/proc/net/dev", devices);
     const std::string before = *host.read("/etc/sysconfig/network/ifcfg-eth-id-02:00:5e:00:00:02");
     plugin.mi().createNetworkPortNodes(true);
-    EXPECT_THAT(plugin.names(12), ElementsAre("eth0", "eth1"));
+    EXPECT_THAT(plugin.names(12), TextsAre("eth0", "eth1"));
     EXPECT_EQ(plugin.port("eth0"), old);
     EXPECT_EQ(plugin.config("eth1")->getIndex(), 1U) << "counted anew in each walk";
     // The host is running by now: filling the new nodes must not write to it.

@@ -7,11 +7,11 @@
 #include "tests/support/failing_new.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/shell_stub.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
 using testing::Contains;
-using testing::ElementsAre;
 using testing::IsEmpty;
 using testing::Not;
 using Lines = std::vector<std::string>;
@@ -138,8 +138,8 @@ HOST_TEST(PortWalk, LogsAnInterfaceThatFailsAndGoesOn) {
     LogCapture capture;
     plugin.build();
     shell_stub::beforeEach({});
-    EXPECT_THAT(capture.ownMessages(6000), ElementsAre("NetworkPort error", "out of luck"));
-    EXPECT_THAT(plugin.names(29), ElementsAre("eth1"));
+    EXPECT_THAT(capture.ownMessages(6000), TextsAre("NetworkPort error", "out of luck"));
+    EXPECT_THAT(plugin.names(29), TextsAre("eth1"));
     EXPECT_FALSE(host.exists(kSnapshot));
     IC::MutableNode* known = nullptr;
     EXPECT_FALSE(plugin.mi().findNetworkPort("eth0", &known)) << "the next walk tries again";
@@ -156,7 +156,7 @@ HOST_TEST(PortWalk, ThatFailsAsAWholeIsLoggedAndTheRequestForItIsNotStored) {
     LogCapture capture;
     EXPECT_EQ(config->setProperty(74, number(1)).getStatus(), 0);
     shell_stub::beforeEach({});
-    EXPECT_THAT(capture.ownMessages(6000), ElementsAre("NetworkPort error", "out of luck"));
+    EXPECT_THAT(capture.ownMessages(6000), TextsAre("NetworkPort error", "out of luck"));
     EXPECT_THAT(capture.ownMessages(), Contains("createNetworkPortNodes: exit"));
     EXPECT_TRUE(PortHost::stored(*config, 74).empty());
 }
@@ -169,13 +169,13 @@ HOST_TEST(PortWalk, ThatFindsNoMemoryAtItsEndIsLogged) {
         const FailingOnce once(0);
         walk.reset();
     }
-    EXPECT_THAT(capture.messages(6000), ElementsAre("NetworkPort error", "std::bad_alloc"));
+    EXPECT_THAT(capture.messages(6000), TextsAre("NetworkPort error", "std::bad_alloc"));
 }
 
 HOST_TEST(PortWalk, GivesEveryVLANAPort) {
     PortHost plugin(host, "vlans");
     plugin.build();
-    EXPECT_THAT(plugin.names(12), ElementsAre("eth0", "eth0.10", "eth0.20"));
+    EXPECT_THAT(plugin.names(12), TextsAre("eth0", "eth0.10", "eth0.20"));
     EXPECT_EQ(plugin.port("eth0.10")->getLinkedId(), plugin.controller());
     EXPECT_EQ(plugin.config("eth0.10")->getLinkedId(), plugin.port("eth0.10")->getNodeId());
 }
@@ -185,7 +185,7 @@ HOST_TEST(PortWalk, KnowsAVMwareNICByItsNameAlone) {
     host.file("/proc/net/dev", std::string(kDevicesHead) + "vmnic0:1\nvswif0:1\n");
     host.remove("/sys/class/net/vmnic0");
     plugin.build();
-    EXPECT_THAT(plugin.names(12), ElementsAre("vmnic0"));
+    EXPECT_THAT(plugin.names(12), TextsAre("vmnic0"));
     EXPECT_EQ(plugin.config("vswif0")->getLinkedId(), plugin.controller()) << "no port";
 }
 

@@ -8,10 +8,10 @@
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
-using testing::ElementsAre;
 using testing::IsEmpty;
 
 HOST_TEST(IPv4Gateway, IsTheFirstOneOfTheInterface) {
@@ -21,12 +21,11 @@ HOST_TEST(IPv4Gateway, IsTheFirstOneOfTheInterface) {
     std::string gateway = "before";
     EXPECT_TRUE(IC::getIPV4Gateway("eth0", gateway));
     EXPECT_EQ(gateway, "192.168.17.1");
-    EXPECT_THAT(commands.all(), ElementsAre("route -n | grep eth0 | tr -s ' ' 2> /dev/null"));
-    EXPECT_THAT(
-        capture.messages(3000),
-        ElementsAre("getIPV4Gateway: entry", "Buff :192.168.17.0 0.0.0.0 255.255.255.0 U 0 0 0 eth0\n",
-                    "Buff :169.254.0.0 0.0.0.0 255.255.0.0 U 0 0 0 eth0\n",
-                    "Buff :0.0.0.0 192.168.17.1 0.0.0.0 UG 0 0 0 eth0\n", "getIPV4Gateway: exit"));
+    EXPECT_THAT(commands.all(), TextsAre("route -n | grep eth0 | tr -s ' ' 2> /dev/null"));
+    EXPECT_THAT(capture.messages(3000),
+                TextsAre("getIPV4Gateway: entry", "Buff :192.168.17.0 0.0.0.0 255.255.255.0 U 0 0 0 eth0\n",
+                         "Buff :169.254.0.0 0.0.0.0 255.255.0.0 U 0 0 0 eth0\n",
+                         "Buff :0.0.0.0 192.168.17.1 0.0.0.0 UG 0 0 0 eth0\n", "getIPV4Gateway: exit"));
 }
 
 HOST_TEST(IPv4Gateway, OfAnInterfaceWithOnLinkRoutesIsTheHostsDefault) {
@@ -37,8 +36,8 @@ HOST_TEST(IPv4Gateway, OfAnInterfaceWithOnLinkRoutesIsTheHostsDefault) {
     EXPECT_TRUE(IC::getIPV4Gateway("eth1", gateway));
     EXPECT_EQ(gateway, "192.168.17.1");
     EXPECT_THAT(commands.all(),
-                ElementsAre("route -n | grep eth1 | tr -s ' ' 2> /dev/null",
-                            "route -n | grep \"^0.0.0.0\" | tr -s ' ' | cut -d ' ' -f2 2> /dev/null"));
+                TextsAre("route -n | grep eth1 | tr -s ' ' 2> /dev/null",
+                         "route -n | grep \"^0.0.0.0\" | tr -s ' ' | cut -d ' ' -f2 2> /dev/null"));
     EXPECT_THAT(capture.messages(3000), testing::Contains("gw :0.0.0.0"));
 }
 
@@ -57,7 +56,7 @@ HOST_TEST(IPv4Gateway, OfAnInterfaceWithoutRoutesIsNone) {
     EXPECT_FALSE(IC::getIPV4Gateway("eth5", gateway));
     EXPECT_EQ(gateway, "");
     EXPECT_EQ(commands.all().size(), 1U) << "the host's default was asked for";
-    EXPECT_THAT(capture.messages(3000), ElementsAre("getIPV4Gateway: entry", "gw :", "getIPV4Gateway: exit"));
+    EXPECT_THAT(capture.messages(3000), TextsAre("getIPV4Gateway: entry", "gw :", "getIPV4Gateway: exit"));
 }
 
 HOST_TEST(IPv4Gateway, SeesTheRoutesOfLongerNames) {
@@ -86,8 +85,8 @@ HOST_TEST(IPv6Gateway, IsTheNextHopOfTheFirstRouteThatHasOne) {
     EXPECT_EQ(
         commands.all()[0],
         "route -A inet6 -n 2> /dev/null | grep eth0 | grep UG | tr -s ' ' | cut -d ' ' -f2 2> /dev/null");
-    EXPECT_THAT(capture.messages(), ElementsAre("getIPV6Gateway: entry", "getIPV6Gateway: exit",
-                                                "getIPV6Gateway: entry", "getIPV6Gateway: exit"));
+    EXPECT_THAT(capture.messages(), TextsAre("getIPV6Gateway: entry", "getIPV6Gateway: exit",
+                                             "getIPV6Gateway: entry", "getIPV6Gateway: exit"));
 }
 
 HOST_TEST(Gateways, WithoutAShellAreNone) {
@@ -100,8 +99,8 @@ HOST_TEST(Gateways, WithoutAShellAreNone) {
         EXPECT_FALSE(IC::getIPV6Gateway("eth0", gateway6));
     }
     EXPECT_EQ(gateway + gateway6, "");
-    EXPECT_THAT(capture.messages(), ElementsAre("getIPV4Gateway: entry", "getIPV4Gateway: exit",
-                                                "getIPV6Gateway: entry", "getIPV6Gateway: exit"));
+    EXPECT_THAT(capture.messages(), TextsAre("getIPV4Gateway: entry", "getIPV4Gateway: exit",
+                                             "getIPV6Gateway: entry", "getIPV6Gateway: exit"));
 }
 
 HOST_TEST(Gateways, OfAnOverlongNameAreNone) {
@@ -145,12 +144,11 @@ HOST_TEST(BootProtocol, IsReadFromTheFileOfTheHardwareAddress) {
     std::string keyword = "before";
     IC::getBootProto("eth0", keyword);
     EXPECT_EQ(keyword, "dhcp");
-    EXPECT_THAT(
-        commands.all(),
-        ElementsAre("cat /etc/sysconfig/network/ifcfg-eth-id-`ifconfig eth0 2> /dev/null |grep HWaddr "
-                    "|awk '{print $5}'|tr '[A-Z]' '[a-z]'` | grep BOOTPROTO | cut -d '=' -f2 "
-                    "2> /dev/null"));
-    EXPECT_THAT(capture.messages(), ElementsAre("Entering getBootProto", "Exiting getBootProto"));
+    EXPECT_THAT(commands.all(),
+                TextsAre("cat /etc/sysconfig/network/ifcfg-eth-id-`ifconfig eth0 2> /dev/null |grep HWaddr "
+                         "|awk '{print $5}'|tr '[A-Z]' '[a-z]'` | grep BOOTPROTO | cut -d '=' -f2 "
+                         "2> /dev/null"));
+    EXPECT_THAT(capture.messages(), TextsAre("Entering getBootProto", "Exiting getBootProto"));
 }
 
 HOST_TEST(BootProtocol, OfAnInterfaceWithoutAFileIsEmpty) {
@@ -190,9 +188,9 @@ HOST_TEST(DhcpV6Servers, AreReadFromEveryLeaseFileWhateverTheInterface) {
     std::string server;
     EXPECT_TRUE(IC::getDHCPv6Servers("eth0", server));
     EXPECT_EQ(server, "00:01:00:06");
-    EXPECT_THAT(commands.all(), ElementsAre("cat /var/lib/dhcpv6/client6.leases* 2> /dev/null | grep SDUID"
-                                            " | cut -d ' ' -f3 2> /dev/null"));
-    EXPECT_THAT(capture.messages(), ElementsAre("getDHCPv6Servers: entry", "getDHCPv6Servers: exit"));
+    EXPECT_THAT(commands.all(), TextsAre("cat /var/lib/dhcpv6/client6.leases* 2> /dev/null | grep SDUID"
+                                         " | cut -d ' ' -f3 2> /dev/null"));
+    EXPECT_THAT(capture.messages(), TextsAre("getDHCPv6Servers: entry", "getDHCPv6Servers: exit"));
 }
 
 }  // namespace

@@ -8,6 +8,7 @@
 #include "tests/network/killed_writer.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
@@ -81,8 +82,7 @@ HOST_TEST(RoutesFile, IsTheNewOnesBeginningWhenAWriteEndsHalfWayOnAFileSystemTha
     LogCapture capture;
     EXPECT_EQ(IC::replaceDefaultRoute(AddressFamily::ipv4, "10.0.0.1"), RoutesRewrite::written);
     EXPECT_EQ(host.read(kRoutes), "default");
-    EXPECT_THAT(capture.messages(6000),
-                testing::ElementsAre("Could not write all of '/etc/sysconfig/network/routes'."));
+    EXPECT_THAT(capture.messages(6000), TextsAre("Could not write all of '/etc/sysconfig/network/routes'."));
     const rlimit unlimited{RLIM_INFINITY, RLIM_INFINITY};
     setrlimit(RLIMIT_FSIZE, &unlimited);
 }

@@ -7,6 +7,7 @@
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
@@ -60,7 +61,7 @@ HOST_TEST(SavedSettings, HoldValuesOfAnyLength) {
 HOST_TEST(SavedSettings, AreNamedAfterTheInterface) {
     host.directory(kData);
     IC::createSettingData("eth0.10", {{"K", "v"}});
-    EXPECT_THAT(host.listDirectory(kData), ElementsAre("ifcfg-eth0.10"));
+    EXPECT_THAT(host.listDirectory(kData), TextsAre("ifcfg-eth0.10"));
 }
 
 HOST_TEST(SavedSettings, GoToTheirOwnPlaceWhateverTheAgentUses) {
@@ -79,9 +80,9 @@ HOST_TEST(SavedSettings, LogTheirWay) {
     LogCapture capture;
     IC::createSettingData("eth0", {{"B", "2\n"}, {"A", "1"}});
     EXPECT_THAT(capture.messages(3000),
-                ElementsAre("createSettingData: entry", std::string("createSettingData: FileName ") + kEth0,
-                            "createSettingData: bufferA=1\n", "createSettingData: bufferB=2\n",
-                            "createSettingData: exit"));
+                TextsAre("createSettingData: entry", std::string("createSettingData: FileName ") + kEth0,
+                         "createSettingData: bufferA=1\n", "createSettingData: bufferB=2\n",
+                         "createSettingData: exit"));
     EXPECT_TRUE(capture.everyLineTwice());
 }
 
@@ -89,9 +90,9 @@ HOST_TEST(SavedSettings, WithoutAPlaceAreLogged) {
     LogCapture capture;
     IC::createSettingData("eth0", {{"K", "v"}});
     EXPECT_THAT(capture.messages(),
-                ElementsAre("createSettingData: entry", std::string("createSettingData: FileName ") + kEth0,
-                            "Can not open Setting File", "createSettingData: exit"));
-    EXPECT_THAT(capture.messages(6000), ElementsAre("Can not open Setting File"));
+                TextsAre("createSettingData: entry", std::string("createSettingData: FileName ") + kEth0,
+                         "Can not open Setting File", "createSettingData: exit"));
+    EXPECT_THAT(capture.messages(6000), TextsAre("Can not open Setting File"));
     EXPECT_FALSE(host.exists("/opt/vantrel"));
 }
 
@@ -100,7 +101,7 @@ HOST_TEST(SavedSettings, AreTheOldOnesWhenTheyCannotBeWritten) {
     host.readOnly(kData);
     LogCapture capture;
     IC::createSettingData("eth0", {{"K", "v"}});
-    EXPECT_THAT(capture.messages(6000), ElementsAre("Can not open Setting File"));
+    EXPECT_THAT(capture.messages(6000), TextsAre("Can not open Setting File"));
     EXPECT_EQ(host.read(kEth0), "K=old\n");
 }
 
@@ -129,10 +130,10 @@ HOST_TEST(SavedSettings, AreAllDeleted) {
     const std::string vlan = std::string(kEth0) + ".10";
     EXPECT_THAT(commands.all(), ElementsAre(kListing, std::string("rm ") + kEth0 + " 2> /dev/null",
                                             "rm " + vlan + " 2> /dev/null"));
-    EXPECT_THAT(host.listDirectory(kData), ElementsAre("asset.dat"));
+    EXPECT_THAT(host.listDirectory(kData), TextsAre("asset.dat"));
     EXPECT_THAT(capture.messages(3000),
-                ElementsAre("deleteSavedConfigurations: entry", std::string("Deleting ") + kEth0,
-                            "Deleting " + vlan, "deleteSavedConfigurations: exit"));
+                TextsAre("deleteSavedConfigurations: entry", std::string("Deleting ") + kEth0,
+                         "Deleting " + vlan, "deleteSavedConfigurations: exit"));
 }
 
 HOST_TEST(SavedSettings, DeleteRunsNoRmWithoutFiles) {
@@ -145,7 +146,7 @@ HOST_TEST(SavedSettings, DeleteRunsNoRmWithoutFiles) {
         IC::deleteSavedConfigurations();
         EXPECT_THAT(commands.all(), ElementsAre(kListing));
         EXPECT_THAT(capture.messages(),
-                    ElementsAre("deleteSavedConfigurations: entry", "deleteSavedConfigurations: exit"));
+                    TextsAre("deleteSavedConfigurations: entry", "deleteSavedConfigurations: exit"));
     }
 }
 
@@ -155,7 +156,7 @@ HOST_TEST(SavedSettings, DeleteGoesOnBehindAFileThatStays) {
     host.readOnly(kEth0);
     LogCapture capture;
     IC::deleteSavedConfigurations();
-    EXPECT_THAT(host.listDirectory(kData), ElementsAre("ifcfg-eth0"));
+    EXPECT_THAT(host.listDirectory(kData), TextsAre("ifcfg-eth0"));
     EXPECT_THAT(capture.messages(6000), IsEmpty());
 }
 
@@ -178,7 +179,7 @@ HOST_TEST(SavedSettings, DeleteGivesUpWhenTheListingCannotBeRun) {
         IC::deleteSavedConfigurations();
     }
     EXPECT_THAT(capture.messages(),
-                ElementsAre("deleteSavedConfigurations: entry", "deleteSavedConfigurations: exit"));
+                TextsAre("deleteSavedConfigurations: entry", "deleteSavedConfigurations: exit"));
     EXPECT_TRUE(host.exists(kEth0));
 }
 

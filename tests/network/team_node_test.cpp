@@ -8,6 +8,7 @@
 #include "tests/support/log_capture.h"
 #include "tests/support/plugin_access.h"
 #include "tests/support/shell_stub.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
@@ -160,7 +161,7 @@ HOST_TEST(TeamNodes, ThatFailAreLoggedAndTheNextIsMade) {
     const LogCapture capture;
     plugin.mi.createNetworkTeamingNodes();
     shell_stub::beforeEach({});
-    EXPECT_THAT(capture.messages(6000), ElementsAre("NetworkTeaming node error"));
+    EXPECT_THAT(capture.messages(6000), TextsAre("NetworkTeaming node error"));
     std::vector<PropertyValue> names;
     for (const IC::MutableNode* team : plugin.teams()) {
         names.push_back(stored(*team)[kName]);
@@ -215,7 +216,7 @@ HOST_TEST(TeamNodes, ThatCannotBeMadeAreLoggedAndTheOthersMade) {
     LogCapture capture;
     plugin.mi.createNetworkTeamingNodes();
     shell_stub::beforeEach({});
-    EXPECT_THAT(capture.messages(6000), ElementsAre("NetworkTeaming node error"));
+    EXPECT_THAT(capture.messages(6000), TextsAre("NetworkTeaming node error"));
     const auto teams = plugin.teams();
     ASSERT_EQ(teams.size(), 2U);
     EXPECT_EQ(get(*teams[0], kName), text(broken.c_str()));
@@ -229,8 +230,8 @@ HOST_TEST(TeamNodes, AreNoneWithoutADriver) {
     LogCapture capture;
     plugin.mi.createNetworkTeamingNodes();
     EXPECT_THAT(plugin.teams(), IsEmpty());
-    EXPECT_THAT(capture.messages(), ElementsAre("createNetworkTeamingNodes: entry", "Entering getNICTeams",
-                                                "Exiting getNICTeams", "createNetworkTeamingNodes: exit"));
+    EXPECT_THAT(capture.messages(), TextsAre("createNetworkTeamingNodes: entry", "Entering getNICTeams",
+                                             "Exiting getNICTeams", "createNetworkTeamingNodes: exit"));
 }
 
 }  // namespace

@@ -11,13 +11,13 @@
 #include "mi/globals.h"
 #include "tests/storage/storage_host.h"
 #include "tests/support/failing_new.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
 using namespace std::chrono_literals;
 using std::chrono::steady_clock;
 using testing::Contains;
-using testing::ElementsAre;
 using testing::IsEmpty;
 using testing::Not;
 using Access = IC::OsHwMITestAccess;
@@ -80,8 +80,8 @@ HOST_TEST_F(DriveMonitor, ComparesAfterTwoMinutesAndThenEveryMinute) {
     EXPECT_GE(times[0] - start, 2s) << "a minute is a second here";
     EXPECT_LT(times[0] - start, 3s);
     EXPECT_GE(times[1] - times[0], 1s);
-    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "published /dev/sda", "withdrawn /dev/sda1",
-                                     "published /dev/sda1"))
+    EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda", "published /dev/sda", "withdrawn /dev/sda1",
+                                  "published /dev/sda1"))
         << "once by the first pass, never again";
 }
 
@@ -94,8 +94,8 @@ HOST_TEST_F(DriveMonitor, StartedAgainPublishesEverythingOnceAgain) {
         IC::myoshwmi.startHDDThread();
         ASSERT_TRUE(passes.waitFor(3));
         Access::stopMonitor();
-        EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "published /dev/sda", "withdrawn /dev/sda1",
-                                         "published /dev/sda1"));
+        EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda", "published /dev/sda", "withdrawn /dev/sda1",
+                                      "published /dev/sda1"));
     }
 }
 
@@ -108,9 +108,9 @@ HOST_TEST_F(DriveMonitor, StartedWhileOneRunsTheEarlierOneEndsFirst) {
     IC::myoshwmi.startHDDThread();
     ASSERT_TRUE(passes.waitFor(3));
     Access::stopMonitor();
-    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "published /dev/sda", "withdrawn /dev/sda1",
-                                     "published /dev/sda1", "withdrawn /dev/sda", "published /dev/sda",
-                                     "withdrawn /dev/sda1", "published /dev/sda1"));
+    EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda", "published /dev/sda", "withdrawn /dev/sda1",
+                                  "published /dev/sda1", "withdrawn /dev/sda", "published /dev/sda",
+                                  "withdrawn /dev/sda1", "published /dev/sda1"));
 }
 
 HOST_TEST_F(DriveMonitor, FollowsTheLayout) {
@@ -123,9 +123,9 @@ HOST_TEST_F(DriveMonitor, FollowsTheLayout) {
     Access::stopMonitor();
     EXPECT_EQ(partitions().size(), 2U);
     EXPECT_EQ(drives().size(), 1U);
-    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "published /dev/sda", "withdrawn /dev/sda1",
-                                     "published /dev/sda1", "withdrawn /dev/sda1", "published /dev/sda1",
-                                     "published /dev/sda2"));
+    EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda", "published /dev/sda", "withdrawn /dev/sda1",
+                                  "published /dev/sda1", "withdrawn /dev/sda1", "published /dev/sda1",
+                                  "published /dev/sda2"));
 }
 
 /// The messages of this thread, or of all others.
@@ -150,16 +150,16 @@ HOST_TEST_F(DriveMonitor, UnloadDuringTheFirstWaitEndsItAtOnceWithoutAComparison
     EXPECT_TRUE(Access::monitorEndedWithin(0)) << "the completion event is signalled";
     EXPECT_FALSE(Access::monitorRuns());
     EXPECT_THAT(messages(log, true),
-                ElementsAre("startHDDThread: entry", "HardDriveUpdateMonitor::const: entry",
-                            "HardDriveUpdateMonitor::Const: exit", "HardDriveUpdateThread thread created.",
-                            "startHDDThread: exit", "HardDriveUpdateMonitor::stop: entry",
-                            "HardDriveUpdateMonitor::stop: exit",
-                            "disable Hard Drive updates: waiting for HardDriveUpdateMonitor Termination ",
-                            "disable Hard Drive updates: HardDriveUpdateMonitor terminated.",
-                            "HardDriveUpdateMonitor::~HardDriveUpdateMonitor: entry",
-                            "HardDriveUpdateMonitor::~HardDriveUpdateMonitor: exit"));
+                TextsAre("startHDDThread: entry", "HardDriveUpdateMonitor::const: entry",
+                         "HardDriveUpdateMonitor::Const: exit", "HardDriveUpdateThread thread created.",
+                         "startHDDThread: exit", "HardDriveUpdateMonitor::stop: entry",
+                         "HardDriveUpdateMonitor::stop: exit",
+                         "disable Hard Drive updates: waiting for HardDriveUpdateMonitor Termination ",
+                         "disable Hard Drive updates: HardDriveUpdateMonitor terminated.",
+                         "HardDriveUpdateMonitor::~HardDriveUpdateMonitor: entry",
+                         "HardDriveUpdateMonitor::~HardDriveUpdateMonitor: exit"));
     EXPECT_THAT(messages(log, false),
-                ElementsAre("HardDriveUpdateMonitor::run: entry", "HardDriveUpdateMonitor::run: exit"));
+                TextsAre("HardDriveUpdateMonitor::run: entry", "HardDriveUpdateMonitor::run: exit"));
 }
 
 HOST_TEST_F(DriveMonitor, AStopIsSeenWithinOneSlice) {
@@ -231,7 +231,7 @@ HOST_TEST_F(DriveMonitor, AThreadThatCannotStartIsLogged) {
     LogCapture log;
     IC::myoshwmi.startHDDThread();
     EXPECT_FALSE(Access::monitorRuns());
-    EXPECT_THAT(log.messages(6000), ElementsAre("HardDriveUpdateThread thread failed."));
+    EXPECT_THAT(log.messages(6000), TextsAre("HardDriveUpdateThread thread failed."));
     EXPECT_EQ(log.messages().back(), "startHDDThread: exit");
     log.clear();
     Access::stopMonitor();
@@ -247,7 +247,7 @@ HOST_TEST_F(DriveMonitor, AMonitorThatCannotBeMadeIsLogged) {
     LogCapture log;
     startWithoutMemory();
     EXPECT_FALSE(Access::monitorRuns());
-    EXPECT_THAT(log.messages(6000), ElementsAre("HardDriveUpdateThread Caught unknown exception"));
+    EXPECT_THAT(log.messages(6000), TextsAre("HardDriveUpdateThread Caught unknown exception"));
     EXPECT_EQ(log.messages().back(), "startHDDThread: exit");
 }
 
@@ -278,8 +278,8 @@ HOST_TEST_F(DriveMonitor, AComparisonThatThrowsIsLoggedAndTheNextOneRuns) {
     }
     Access::stopMonitor();
     EXPECT_GE(snapshots, 4);
-    EXPECT_THAT(log.messages(6000), ElementsAre("HDDThreadProcess failed: out of everything",
-                                                "HDDThreadProcess failed: unknown exception"));
+    EXPECT_THAT(log.messages(6000), TextsAre("HDDThreadProcess failed: out of everything",
+                                             "HDDThreadProcess failed: unknown exception"));
     EXPECT_FALSE(diary().empty());
 }
 

@@ -4,6 +4,7 @@
 #include "mi/node_types.h"
 #include "storage/storage_nodes.h"
 #include "tests/storage/storage_host.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
@@ -74,13 +75,13 @@ HOST_TEST_F(Drives, TheFirstBuildLogsEveryStep) {
     LogCapture log;
     build(host, kOneDrive);
     EXPECT_THAT(log.messages(),
-                ElementsAre("createHardDriveNodes: entry", "HardDriveNode::HardDriveNode: entry",
-                            "HardDriveNode::HardDriveNode: exit", "New Hard Drive Node created /dev/sda",
-                            "HardDriveNode::setProperty: entry", "HardDriveNode::setProperty: exit",
-                            "HardDriveNode::setProperty: entry", "HardDriveNode::setProperty: exit",
-                            "HardDriveNode::getProperty: entry", "HardDriveNode::getProperty: exit",
-                            "HardDriveNode::setProperty: entry", "HardDriveNode::setProperty: exit",
-                            "Hard Drive Node::Normal /dev/sda", "createHardDriveNodes: exit"));
+                TextsAre("createHardDriveNodes: entry", "HardDriveNode::HardDriveNode: entry",
+                         "HardDriveNode::HardDriveNode: exit", "New Hard Drive Node created /dev/sda",
+                         "HardDriveNode::setProperty: entry", "HardDriveNode::setProperty: exit",
+                         "HardDriveNode::setProperty: entry", "HardDriveNode::setProperty: exit",
+                         "HardDriveNode::getProperty: entry", "HardDriveNode::getProperty: exit",
+                         "HardDriveNode::setProperty: entry", "HardDriveNode::setProperty: exit",
+                         "Hard Drive Node::Normal /dev/sda", "createHardDriveNodes: exit"));
     EXPECT_EQ(log.messages(3000), log.messages());
     EXPECT_EQ(log.lines().front().function, "createHardDriveNodes");
     EXPECT_TRUE(log.everyLineTwice());
@@ -91,16 +92,16 @@ HOST_TEST_F(Drives, AnUpdateWithdrawsTheOldNodesAndPublishesTheNewOnesOneByOne) 
     EXPECT_THAT(diary(), IsEmpty()) << "the first nodes are in the map that the agent reads";
     LogCapture log;
     build(host, "Disk /dev/sdc: 1000.2 GB, 1000204886016 bytes\n", true);
-    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "withdrawn /dev/sdb", "published /dev/sdc"));
+    EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda", "withdrawn /dev/sdb", "published /dev/sdc"));
     EXPECT_THAT(drives(), ElementsAre(Seen{103, 1, "/dev/sdc", 1000204886}));
     EXPECT_THAT(withoutPropertyLines(log.messages()),
-                ElementsAre("createHardDriveNodes: entry", "Delete a Hrad Drive entry: Hard Drive",
-                            "HardDriveNode::~HardDriveNode: entry", "HardDriveNode::~HardDriveNode: exit",
-                            "Delete a Hrad Drive entry: Hard Drive", "HardDriveNode::~HardDriveNode: entry",
-                            "HardDriveNode::~HardDriveNode: exit", "HardDriveNode::HardDriveNode: entry",
-                            "HardDriveNode::HardDriveNode: exit", "Hard Drive Update created /dev/sdc",
-                            "Hard Drive Node::Normal /dev/sdc", "publishNode: entry", "publishNode: exit",
-                            "Updated Hard Drive Node Published", "createHardDriveNodes: exit"));
+                TextsAre("createHardDriveNodes: entry", "Delete a Hrad Drive entry: Hard Drive",
+                         "HardDriveNode::~HardDriveNode: entry", "HardDriveNode::~HardDriveNode: exit",
+                         "Delete a Hrad Drive entry: Hard Drive", "HardDriveNode::~HardDriveNode: entry",
+                         "HardDriveNode::~HardDriveNode: exit", "HardDriveNode::HardDriveNode: entry",
+                         "HardDriveNode::HardDriveNode: exit", "Hard Drive Update created /dev/sdc",
+                         "Hard Drive Node::Normal /dev/sdc", "publishNode: entry", "publishNode: exit",
+                         "Updated Hard Drive Node Published", "createHardDriveNodes: exit"));
     EXPECT_EQ(log.messages(3000), log.messages());
     EXPECT_THAT(Access::drawnIds(), ElementsAre(100, 101, 102, 103));
 }
@@ -125,7 +126,7 @@ HOST_TEST_F(Drives, AnEmptySnapshotGivesNoneAndAnUpdateStillWithdraws) {
     build(host, "", true);
     EXPECT_THAT(drives(), IsEmpty());
     EXPECT_THAT(Access::drives(), IsEmpty());
-    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda"));
+    EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda"));
 }
 
 HOST_TEST_F(Drives, AMissingSnapshotGivesNone) {
@@ -196,7 +197,7 @@ HOST_TEST_F(Drives, ALineTooLongForItsCommandIsSkipped) {
     build(host, tooLong + "\n" + fits + "\nDisk /dev/sdb: 80.0 GB, 1000 bytes\n");
     EXPECT_THAT(drives(), ElementsAre(Seen{101, 1, "/dev/sda", 80026361}, Seen{102, 2, "/dev/sdb", 1}));
     EXPECT_THAT(log.messages(6000),
-                ElementsAre("Command too long, not run: " + pathCommand(tooLong), "Command :  failed!!"));
+                TextsAre("Command too long, not run: " + pathCommand(tooLong), "Command :  failed!!"));
     EXPECT_THAT(commands(), testing::Not(testing::Contains(pathCommand(tooLong))));
 }
 
@@ -252,10 +253,10 @@ HOST_TEST_F(Drives, AListingThatCannotStartLeavesNoNodes) {
     shell_stub::failWhen([](const std::string& command) { return command == kListing; });
     LogCapture log;
     build(host, kOneDrive, true);
-    EXPECT_THAT(log.messages(6000), ElementsAre("fdisk command " + kListing + " failed!!"));
+    EXPECT_THAT(log.messages(6000), TextsAre("fdisk command " + kListing + " failed!!"));
     EXPECT_EQ(log.messages().back(), "createHardDriveNodes: exit");
     EXPECT_THAT(drives(), IsEmpty());
-    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda"));
+    EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda"));
 }
 
 HOST_TEST_F(Drives, ALineWhoseCommandCannotStartIsSkipped) {
@@ -268,8 +269,8 @@ HOST_TEST_F(Drives, ALineWhoseCommandCannotStartIsSkipped) {
     build(host, a + "\n" + b + "\n" + c + "\n");
     EXPECT_THAT(drives(), ElementsAre(Seen{102, 1, "/dev/sdc", 3}));
     EXPECT_EQ(Access::drives().size(), 1U);
-    EXPECT_THAT(log.messages(6000), ElementsAre("Command : " + pathCommand(a) + " failed!!",
-                                                "Command : " + sizeCommand(b) + " failed!!"));
+    EXPECT_THAT(log.messages(6000), TextsAre("Command : " + pathCommand(a) + " failed!!",
+                                             "Command : " + sizeCommand(b) + " failed!!"));
 }
 
 HOST_TEST_F(Drives, ToolsThatAreMissingGiveNoDrives) {
@@ -285,7 +286,7 @@ HOST_TEST_F(Drives, EachNodeThatTheAgentRefusesIsLoggedOnceAndTheNextOneIsBuilt)
     LogCapture log;
     build(host, kOneDrive + "Disk /dev/sdb: 80.0 GB, 80026361856 bytes\n", true);
     EXPECT_THAT(log.messages(6000),
-                ElementsAre("addNewNode error = the agent is full", "addNewNode error = the agent is full"));
+                TextsAre("addNewNode error = the agent is full", "addNewNode error = the agent is full"));
     EXPECT_EQ(Access::drives().size(), 2U);
 }
 
@@ -293,7 +294,7 @@ HOST_TEST_F(Drives, ANodeThatTheAgentRefusesIsLoggedAndGoesWithTheNextUpdate) {
     agentRefuses();
     LogCapture log;
     build(host, kOneDrive, true);
-    EXPECT_THAT(log.messages(6000), ElementsAre("addNewNode error = the agent is full"));
+    EXPECT_THAT(log.messages(6000), TextsAre("addNewNode error = the agent is full"));
     EXPECT_THAT(drives(), IsEmpty());
     EXPECT_EQ(Access::drives().size(), 1U);
     build(host, "", true);
@@ -325,9 +326,9 @@ HOST_TEST_F(Drives, TheSnapshotIsRemovedUnderTheFileLock) {
     IC::deleteFdiskTmp();
     EXPECT_FALSE(host.exists(IC::diskSnapshotPath));
     EXPECT_TRUE(locked);
-    EXPECT_THAT(commands(), ElementsAre("rm /tmp/fdisk_tmp 2> /dev/null"));
+    EXPECT_THAT(commands(), TextsAre("rm /tmp/fdisk_tmp 2> /dev/null"));
     EXPECT_THAT(log.messages(),
-                ElementsAre("deleteFdiskTmp: entry", "Deleting /tmp/fdisk_tmp", "deleteFdiskTmp: exit"));
+                TextsAre("deleteFdiskTmp: entry", "Deleting /tmp/fdisk_tmp", "deleteFdiskTmp: exit"));
 }
 
 HOST_TEST_F(Drives, ASnapshotThatCannotBeRemovedIsLogged) {
@@ -336,7 +337,7 @@ HOST_TEST_F(Drives, ASnapshotThatCannotBeRemovedIsLogged) {
     LogCapture log;
     IC::deleteFdiskTmp();
     EXPECT_TRUE(host.exists(IC::diskSnapshotPath));
-    EXPECT_THAT(log.messages(6000), ElementsAre("Could not delete /tmp/fdisk_tmp"));
+    EXPECT_THAT(log.messages(6000), TextsAre("Could not delete /tmp/fdisk_tmp"));
     EXPECT_EQ(log.messages().back(), "deleteFdiskTmp: exit");
 }
 

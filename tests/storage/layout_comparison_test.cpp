@@ -3,6 +3,7 @@
 #include "mi/globals.h"
 #include "mi/node_types.h"
 #include "tests/storage/storage_host.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
@@ -50,8 +51,8 @@ protected:
 HOST_TEST_F(LayoutComparison, TheFirstPassAlwaysRebuildsBothKinds) {
     LogCapture log;
     startWith(host, kLayout);
-    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "published /dev/sda", "withdrawn /dev/sda1",
-                                     "published /dev/sda1"));
+    EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda", "published /dev/sda", "withdrawn /dev/sda1",
+                                  "published /dev/sda1"));
     EXPECT_THAT(log.messages(), Contains("Hard Drive Check Sum found Different"));
     EXPECT_THAT(log.messages(), Contains("Partition Check Sum found Different"));
 }
@@ -63,9 +64,9 @@ HOST_TEST_F(LayoutComparison, ADifferenceIsToldOfWhenItsNodesAreBuilt) {
     std::erase_if(steps, [](const std::string& message) {
         return message.find("create") != 0 && message.find("found Different") == std::string::npos;
     });
-    EXPECT_THAT(steps, ElementsAre("createHardDriveNodes: entry", "createHardDriveNodes: exit",
-                                   "Hard Drive Check Sum found Different", "createPartitionNodes: entry",
-                                   "createPartitionNodes: exit", "Partition Check Sum found Different"));
+    EXPECT_THAT(steps, TextsAre("createHardDriveNodes: entry", "createHardDriveNodes: exit",
+                                "Hard Drive Check Sum found Different", "createPartitionNodes: entry",
+                                "createPartitionNodes: exit", "Partition Check Sum found Different"));
     EXPECT_EQ(log.messages(3000), log.messages());
 }
 
@@ -76,14 +77,13 @@ HOST_TEST_F(LayoutComparison, AnUnchangedLayoutTouchesNothing) {
     pass(host, kLayout);
     EXPECT_THAT(diary(), IsEmpty());
     EXPECT_EQ(commands(), kComparison);
-    EXPECT_THAT(
-        log.messages(),
-        ElementsAre("Hard Drive ThreadProcess :: Entry", "Hard Drive Check Sum : Entry",
-                    "cond ::Hard Drive Check Sum : MD5 :: " + kDiskMd5,
-                    "cond ::Hard Drive Check Sum : SHA1 :: " + kDiskSha1, "Hard Drive Check Sum : Exit",
-                    "Partition Check Sum : Entry", "cond ::Partition Check Sum : MD5 :: " + kFirstMd5,
-                    "cond ::Partition Check Sum : SHA1 :: " + kFirstSha1, "Partition Check Sum : Exit",
-                    "Hard Drive ThreadProcess :: Exit"));
+    EXPECT_THAT(log.messages(),
+                TextsAre("Hard Drive ThreadProcess :: Entry", "Hard Drive Check Sum : Entry",
+                         "cond ::Hard Drive Check Sum : MD5 :: " + kDiskMd5,
+                         "cond ::Hard Drive Check Sum : SHA1 :: " + kDiskSha1, "Hard Drive Check Sum : Exit",
+                         "Partition Check Sum : Entry", "cond ::Partition Check Sum : MD5 :: " + kFirstMd5,
+                         "cond ::Partition Check Sum : SHA1 :: " + kFirstSha1, "Partition Check Sum : Exit",
+                         "Hard Drive ThreadProcess :: Exit"));
     EXPECT_EQ(log.messages(3000), log.messages());
     EXPECT_EQ(log.lines().back().function, "HDDThreadProcess");
     EXPECT_EQ(drives(), drivesBefore);
@@ -117,7 +117,7 @@ HOST_TEST_F(LayoutComparison, AnAddedPartitionRebuildsThePartitionsAlone) {
     const auto drivesBefore = drives();
     LogCapture log;
     pass(host, kLayout + kSecond);
-    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda1", "published /dev/sda1", "published /dev/sda2"));
+    EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda1", "published /dev/sda1", "published /dev/sda2"));
     EXPECT_EQ(drives(), drivesBefore);
     EXPECT_THAT(commands(), Not(Contains("cat /tmp/fdisk_tmp | grep ^Disk")));
     EXPECT_THAT(log.messages(), Not(Contains("Hard Drive Check Sum found Different")));
@@ -131,8 +131,8 @@ HOST_TEST_F(LayoutComparison, ARemovedDiskTakesItsDriveAndItsPartitions) {
     const std::string its = "/dev/sdb1 1 2 300 83 Linux\n";
     startWith(host, kLayout + other + its);
     pass(host, kLayout);
-    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "withdrawn /dev/sdb", "published /dev/sda",
-                                     "withdrawn /dev/sda1", "withdrawn /dev/sdb1", "published /dev/sda1"));
+    EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda", "withdrawn /dev/sdb", "published /dev/sda",
+                                  "withdrawn /dev/sda1", "withdrawn /dev/sdb1", "published /dev/sda1"));
     EXPECT_EQ(drives().size(), 1U);
     EXPECT_EQ(partitions().size(), 1U);
 }
@@ -140,7 +140,7 @@ HOST_TEST_F(LayoutComparison, ARemovedDiskTakesItsDriveAndItsPartitions) {
 HOST_TEST_F(LayoutComparison, ADiskWithoutPartitionsRebuildsTheDrivesAlone) {
     startWith(host, kLayout);
     pass(host, kLayout + "Disk /dev/sdb: 80.0 GB, 1000000 bytes\n");
-    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "published /dev/sda", "published /dev/sdb"));
+    EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda", "published /dev/sda", "published /dev/sdb"));
     EXPECT_EQ(partitions().size(), 1U);
 }
 
@@ -156,7 +156,7 @@ HOST_TEST_F(LayoutComparison, AMissingFdiskLooksLikeAHostWithoutDisks) {
     diary().clear();
     IC::myoshwmi.HDDThreadProcess();
     EXPECT_EQ(host.read(IC::diskSnapshotPath), "");
-    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "withdrawn /dev/sda1"));
+    EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda", "withdrawn /dev/sda1"));
 }
 
 HOST_TEST_F(LayoutComparison, ASnapshotThatCannotBeTakenSkipsThePass) {
@@ -167,10 +167,10 @@ HOST_TEST_F(LayoutComparison, ASnapshotThatCannotBeTakenSkipsThePass) {
     EXPECT_THAT(commands(), ElementsAre(kSnapshot));
     EXPECT_THAT(diary(), IsEmpty());
     EXPECT_THAT(log.messages(),
-                ElementsAre("Hard Drive ThreadProcess :: Entry", "Hard Drive ThreadProcess :: Exit"));
+                TextsAre("Hard Drive ThreadProcess :: Entry", "Hard Drive ThreadProcess :: Exit"));
     shell_stub::failWhen({});
     pass(host, "");
-    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "withdrawn /dev/sda1")) << "retried by the next";
+    EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda", "withdrawn /dev/sda1")) << "retried by the next";
 }
 
 HOST_TEST_F(LayoutComparison, WithoutMd5sumChangesAreFoundBySha1Alone) {
@@ -192,7 +192,7 @@ HOST_TEST_F(LayoutComparison, AFingerprintThatFailsCountsAsAChangeOnce) {
     shell_stub::failWhen([](const std::string& command) { return command == kDriveMd5; });
     LogCapture log;
     pass(host, kLayout);
-    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "published /dev/sda"));
+    EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda", "published /dev/sda"));
     EXPECT_EQ(Access::driveFingerprints().md5.reference, "");
     EXPECT_EQ(Access::driveFingerprints().sha1.reference, kDiskSha1);
     EXPECT_THAT(log.messages(), Not(Contains(testing::HasSubstr("Hard Drive Check Sum : MD5"))));
@@ -201,7 +201,7 @@ HOST_TEST_F(LayoutComparison, AFingerprintThatFailsCountsAsAChangeOnce) {
     EXPECT_THAT(diary(), IsEmpty()) << "the empty value is the reference now";
     shell_stub::failWhen({});
     pass(host, kLayout);
-    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda", "published /dev/sda")) << "and back again once";
+    EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda", "published /dev/sda")) << "and back again once";
 }
 
 HOST_TEST_F(LayoutComparison, ComparedFingerprintsMoveToTheReference) {

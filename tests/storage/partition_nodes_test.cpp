@@ -4,6 +4,7 @@
 #include "mi/node_types.h"
 #include "storage/storage_nodes.h"
 #include "tests/storage/storage_host.h"
+#include "tests/support/texts_are.h"
 
 namespace {
 
@@ -58,9 +59,9 @@ HOST_TEST_F(Partitions, TheFirstBuildLogsEveryStep) {
     LogCapture log;
     build(host, kBoot + "\n");
     EXPECT_THAT(withoutPropertyLines(log.messages()),
-                ElementsAre("createPartitionNodes: entry", "DiskPartition::DiskPartition: entry",
-                            "DiskPartition::DiskPartition: exit", "Partition blocksize : 104391",
-                            "Partition blocksize in Uint64 : 104391", "createPartitionNodes: exit"));
+                TextsAre("createPartitionNodes: entry", "DiskPartition::DiskPartition: entry",
+                         "DiskPartition::DiskPartition: exit", "Partition blocksize : 104391",
+                         "Partition blocksize in Uint64 : 104391", "createPartitionNodes: exit"));
     EXPECT_EQ(std::ranges::count(log.messages(), "DiskPartition::setProperty: entry"), 3);
     EXPECT_EQ(std::ranges::count(log.messages(), "DiskPartition::setProperty: exit"), 3);
     EXPECT_EQ(log.messages(3000), log.messages());
@@ -71,18 +72,18 @@ HOST_TEST_F(Partitions, AnUpdateWithdrawsTheOldNodesAndPublishesTheNewOnesOneByO
     build(host, kBoot + "\n");
     LogCapture log;
     build(host, "/dev/sdb1 1 2 300 83 Linux\n/dev/sdb2 3 4 500 83 Linux\n", true);
-    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda1", "published /dev/sdb1", "published /dev/sdb2"));
+    EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda1", "published /dev/sdb1", "published /dev/sdb2"));
     EXPECT_THAT(partitions(), ElementsAre(Seen{102, 1, "/dev/sdb1", 300}, Seen{103, 2, "/dev/sdb2", 500}));
     EXPECT_THAT(
         withoutPropertyLines(log.messages()),
-        ElementsAre("createPartitionNodes: entry", "Delete a Partition entry: Partition",
-                    "DiskPartition::~DiskPartition: entry", "DiskPartition::~DiskPartition: exit",
-                    "DiskPartition::DiskPartition: entry", "DiskPartition::DiskPartition: exit",
-                    "Partition blocksize : 300", "Partition blocksize in Uint64 : 300", "publishNode: entry",
-                    "publishNode: exit", "Partition Node Published", "DiskPartition::DiskPartition: entry",
-                    "DiskPartition::DiskPartition: exit", "Partition blocksize : 500",
-                    "Partition blocksize in Uint64 : 500", "publishNode: entry", "publishNode: exit",
-                    "Partition Node Published", "createPartitionNodes: exit"));
+        TextsAre("createPartitionNodes: entry", "Delete a Partition entry: Partition",
+                 "DiskPartition::~DiskPartition: entry", "DiskPartition::~DiskPartition: exit",
+                 "DiskPartition::DiskPartition: entry", "DiskPartition::DiskPartition: exit",
+                 "Partition blocksize : 300", "Partition blocksize in Uint64 : 300", "publishNode: entry",
+                 "publishNode: exit", "Partition Node Published", "DiskPartition::DiskPartition: entry",
+                 "DiskPartition::DiskPartition: exit", "Partition blocksize : 500",
+                 "Partition blocksize in Uint64 : 500", "publishNode: entry", "publishNode: exit",
+                 "Partition Node Published", "createPartitionNodes: exit"));
     EXPECT_EQ(log.messages(3000), log.messages());
 }
 
@@ -143,7 +144,7 @@ HOST_TEST_F(Partitions, AnEmptySnapshotGivesNoneAndAnUpdateStillWithdraws) {
     build(host, "", true);
     EXPECT_THAT(partitions(), IsEmpty());
     EXPECT_THAT(Access::partitions(), IsEmpty());
-    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda1"));
+    EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda1"));
 }
 
 HOST_TEST_F(Partitions, AListingThatCannotStartLeavesNoNodes) {
@@ -151,9 +152,9 @@ HOST_TEST_F(Partitions, AListingThatCannotStartLeavesNoNodes) {
     shell_stub::failWhen([](const std::string& command) { return command == kListing; });
     LogCapture log;
     build(host, kBoot + "\n", true);
-    EXPECT_THAT(log.messages(6000), ElementsAre("fdisk command " + kListing + " failed!!"));
+    EXPECT_THAT(log.messages(6000), TextsAre("fdisk command " + kListing + " failed!!"));
     EXPECT_EQ(log.messages().back(), "createPartitionNodes: exit");
-    EXPECT_THAT(diary(), ElementsAre("withdrawn /dev/sda1"));
+    EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda1"));
 }
 
 HOST_TEST_F(Partitions, ALineWhoseCommandCannotStartIsSkipped) {
@@ -161,8 +162,8 @@ HOST_TEST_F(Partitions, ALineWhoseCommandCannotStartIsSkipped) {
     LogCapture log;
     build(host, kBoot + "\n/dev/sda2 1 2 300 83 Linux\n", true);
     EXPECT_THAT(partitions(), ElementsAre(Seen{102, 1, "/dev/sda2", 300}));
-    EXPECT_THAT(diary(), ElementsAre("published /dev/sda2"));
-    EXPECT_THAT(log.messages(6000), ElementsAre("Command : " + sizeCommand(kBoot) + " failed!!"));
+    EXPECT_THAT(diary(), TextsAre("published /dev/sda2"));
+    EXPECT_THAT(log.messages(6000), TextsAre("Command : " + sizeCommand(kBoot) + " failed!!"));
 }
 
 HOST_TEST_F(Partitions, ALineTooLongForItsCommandIsSkipped) {
@@ -192,7 +193,7 @@ HOST_TEST_F(Partitions, HealthIsAlwaysGoodAndWritesAreOnlyStored) {
     LogCapture log;
     EXPECT_EQ(node->getProperty(123, value).getStatus(), 0);
     EXPECT_THAT(log.messages(),
-                ElementsAre("DiskPartition::getProperty: entry", "DiskPartition::getProperty: exit"));
+                TextsAre("DiskPartition::getProperty: entry", "DiskPartition::getProperty: exit"));
     EXPECT_EQ(value, IC::PropertyValue(IC::Number(1U), true));
     EXPECT_EQ(node->setProperty(123, IC::PropertyValue(IC::Number(12U), true)).getStatus(), 0);
     EXPECT_EQ(node->getProperty(123, value).getStatus(), 0);

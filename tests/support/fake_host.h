@@ -10,6 +10,7 @@
 
 #include "tests/support/host_test.h"
 #include "tests/support/program.h"
+#include "tests/support/texts_are.h"
 
 /// What a scripted tool does when it is called.
 struct ToolAnswer {
@@ -36,7 +37,7 @@ struct ClockCall {
 ///         host.file("/proc/net/dev", "...");
 ///         host.tool("route -n", "0.0.0.0 10.0.0.1 0.0.0.0 UG 0 0 0 eth0\n");
 ///         EXPECT_EQ(IC::getIPV4Gateway("eth0"), "10.0.0.1");
-///         EXPECT_THAT(host.calls(), testing::ElementsAre("route -n"));
+///         EXPECT_THAT(host.calls(), TextsAre("route -n"));
 ///     }
 ///
 /// The host starts with empty /etc, /proc/net, /sys, /tmp, /var, /opt; with the shell and the plain text

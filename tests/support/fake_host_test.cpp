@@ -14,8 +14,8 @@
 #include <fstream>
 
 #include "tests/support/shell.h"
+#include "tests/support/texts_are.h"
 
-using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::IsEmpty;
 
@@ -125,7 +125,7 @@ HOST_TEST(FakeHostFiles, AreAsGiven) {
     EXPECT_TRUE(host.exists("/etc/localtime"));
     EXPECT_EQ(host.read("/etc/localtime"), std::nullopt);
     host.directory("/etc/a", 0700);
-    EXPECT_THAT(host.listDirectory("/etc/sysconfig"), ElementsAre("network"));
+    EXPECT_THAT(host.listDirectory("/etc/sysconfig"), TextsAre("network"));
     host.remove("/etc/sysconfig");
     EXPECT_FALSE(host.exists("/etc/sysconfig"));
     EXPECT_EQ(host.read("/etc"), std::nullopt);
@@ -159,7 +159,7 @@ HOST_TEST(FakeHostFiles, FullDiskHasNoSpaceLeft) {
     host.file("/var/lib/state", std::string(10000, 'a'));
     host.fullDisk("/var/lib");
     EXPECT_EQ(host.read("/var/lib/state"), std::string(10000, 'a'));
-    EXPECT_THAT(host.listDirectory("/var/lib"), ElementsAre("state"));
+    EXPECT_THAT(host.listDirectory("/var/lib"), TextsAre("state"));
     EXPECT_FALSE(appendTo("/var/lib/other", "text"));
     EXPECT_EQ(errno, ENOSPC);
     std::ofstream rewritten("/var/lib/state");
@@ -204,8 +204,8 @@ HOST_TEST(FakeHostTools, AnswerTheirExactArguments) {
     EXPECT_EQ(shell("ethtool eth1").status, 71);
     EXPECT_EQ(shell("ethtool -i eth0 2>&1 >/dev/null").out, "a warning\n");
     EXPECT_EQ(shell("hostname").out, "linux-a\n");
-    EXPECT_THAT(host.calls(), ElementsAre("ethtool eth0", "ethtool eth1", "ethtool -i eth0", "hostname"));
-    EXPECT_THAT(host.callsOf("hostname"), ElementsAre("hostname"));
+    EXPECT_THAT(host.calls(), TextsAre("ethtool eth0", "ethtool eth1", "ethtool -i eth0", "hostname"));
+    EXPECT_THAT(host.callsOf("hostname"), TextsAre("hostname"));
     host.clearCalls();
     EXPECT_THAT(host.calls(), IsEmpty());
 }
@@ -218,7 +218,7 @@ HOST_TEST(FakeHostTools, ArgumentsMayHoldAnything) {
     EXPECT_EQ(shell("ip 'a b' '' \"it's\" 100%").out, "odd\n");
     EXPECT_EQ(shell("/usr/sbin/vpdupdate 2> /dev/null").out, "by path\n");
     EXPECT_THAT(host.calls(),
-                ElementsAre("fdisk -ls /dev/sda", "ip 'a b' '' 'it'\\''s' 100%", "/usr/sbin/vpdupdate"));
+                TextsAre("fdisk -ls /dev/sda", "ip 'a b' '' 'it'\\''s' 100%", "/usr/sbin/vpdupdate"));
     EXPECT_THAT(host.callsOf("ip").size(), 1U);
     host.tool("ip " + std::string("'two\nlines'"), "");
     EXPECT_EQ(shell("ip 'two\nlines'").status, 0);
@@ -250,8 +250,8 @@ HOST_TEST(FakeHostTools, RecordersOnlyRecord) {
             "shutdown -r now; service network restart; hwclock --systohc; rpm -qa; reboot; halt -p; poweroff")
             .out,
         "");
-    EXPECT_THAT(host.calls(), ElementsAre("shutdown -r now", "service network restart", "hwclock --systohc",
-                                          "rpm -qa", "reboot", "halt -p", "poweroff"));
+    EXPECT_THAT(host.calls(), TextsAre("shutdown -r now", "service network restart", "hwclock --systohc",
+                                       "rpm -qa", "reboot", "halt -p", "poweroff"));
     host.tool("rpm -qa", "dhcpv6-1.0\n");
     EXPECT_EQ(shell("rpm -qa; rpm -q bash").out, "dhcpv6-1.0\n");
 }
@@ -263,7 +263,7 @@ HOST_TEST(FakeHostTools, MissingToolIsNotFound) {
     host.toolMissing("awk");
     EXPECT_EQ(shell("brctl show 2> /dev/null").status, 127);
     EXPECT_EQ(shell("awk '{print $1}' 2> /dev/null").status, 127);
-    EXPECT_THAT(host.calls(), ElementsAre("brctl show"));
+    EXPECT_THAT(host.calls(), TextsAre("brctl show"));
 }
 
 HOST_TEST(FakeHostTools, RealToolIsTheMachines) {
@@ -286,8 +286,8 @@ HOST_TEST(FakeHostTools, UnrecordedCallMayBeExpected) {
     host.tool("ethtool eth0", "");
     host.expectUnrecorded();
     EXPECT_THAT(shell("ethtool eth1 2>&1").out, HasSubstr("no answer is recorded for: ethtool eth1"));
-    EXPECT_THAT(host.unrecorded(), ElementsAre("ethtool eth1"));
-    EXPECT_THAT(host.calls(), ElementsAre("ethtool eth1"));
+    EXPECT_THAT(host.unrecorded(), TextsAre("ethtool eth1"));
+    EXPECT_THAT(host.calls(), TextsAre("ethtool eth1"));
 }
 
 // --- Clock and programs.
@@ -348,7 +348,7 @@ HOST_TEST(FakeHostPrograms, RunBesideTheTest) {
 
 HOST_TEST(FakeHostNetwork, CanBeTheKernels) {
     host.useKernelNetwork();
-    EXPECT_THAT(host.listDirectory("/sys/class/net"), ElementsAre("lo"));
+    EXPECT_THAT(host.listDirectory("/sys/class/net"), TextsAre("lo"));
     EXPECT_THAT(host.read("/proc/net/dev").value_or(""), HasSubstr("lo:"));
     host.realTool("ip");
     if (shell("ip link add va type veth peer name vb 2>/dev/null").status != 0)

@@ -1,8 +1,7 @@
 #include "tests/support/log_capture.h"
+#include "tests/support/texts_are.h"
 
 #include <gmock/gmock.h>
-
-using testing::ElementsAre;
 
 namespace {
 
@@ -40,8 +39,8 @@ TEST(LogCapture, TellsTheMessagesOfTheLog) {
     toTrace("one");
     toLog("two", 6000);
     toTrace("two", 6000);
-    EXPECT_THAT(capture.messages(), ElementsAre("one", "two"));
-    EXPECT_THAT(capture.messages(6000), ElementsAre("two"));
+    EXPECT_THAT(capture.messages(), TextsAre("one", "two"));
+    EXPECT_THAT(capture.messages(6000), TextsAre("two"));
     EXPECT_TRUE(capture.everyLineTwice());
     capture.clear();
     EXPECT_TRUE(capture.messages().empty());
