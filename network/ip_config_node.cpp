@@ -30,14 +30,15 @@ Error readOrigin(const Config& config, PropertyValue& out) {
 }
 
 /// An interface without any address reads as "0.0.0.0", one that carries IPv6 alone as empty.
-/// @param text what was read, even if the other half of address and mask could not be
+/// @param found whether address and mask were both read
+/// @param text what was read, even if the other half could not be
 std::string orUnset(const Config& config, bool found, const std::string& text) {
-    if (found || !text.empty()) {
+    if (found) {
         return text;
     }
     unsigned int code = 0;
     getProtocolIIFType(config.name(), code);
-    return code == ProtocolCode::ipv4 ? "0.0.0.0" : "";
+    return text.empty() && code == ProtocolCode::ipv4 ? "0.0.0.0" : text;
 }
 
 Error readIPv4Address(const Config& config, PropertyValue& out) {

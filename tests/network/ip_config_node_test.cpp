@@ -157,7 +157,10 @@ HOST_TEST(IPConfigNode, KeepsAnAddressWhoseMaskCannotBeRead) {
         const bool isNone = command.find("cut -d: -f4") != command.npos || command.starts_with("ip -6");
         return isNone ? std::optional<std::string>("") : std::nullopt;
     });
+    const CommandLines commands;
     EXPECT_EQ(live(*config, 25), text("192.0.2.10"));
+    EXPECT_THAT(commands.all(), testing::Contains("ip -6 address show dev eth0 | grep \"global\""))
+        << "what it carries is asked whenever one of the two is missing";
     EXPECT_EQ(live(*config, 26), text("0.0.0.0"));
     shell_stub::answerWith({});
 }
