@@ -1,10 +1,13 @@
 // The walk over the host's interfaces: a port node for each port, an IP configuration below it, its settings
 // saved.
+#include <utility>
+
 #include "mi/log.h"
 #include "mi/node_types.h"
 #include "mi/os_hw_mi.h"
 #include "mi/text.h"
 #include "network/dns.h"
+#include "network/interface_lists.h"
 #include "network/port_node.h"
 #include "network/port_walk.h"
 #include "network/saved_settings.h"
@@ -25,21 +28,26 @@ void OsHwMI::createNetworkPortNodes(bool /*update*/) {
 }
 
 void OsHwMI::walkInterfaces() {
-    const std::vector<ListedInterface> interfaces = PortWalk::list();
-    PortWalk walk(trimEnd(hostName_), trimEnd(domainName_));
-    dnsServers_ = walk.host().dnsServers;
-    dnsSuffixes_ = walk.host().dnsSuffixes;
+    const std::vector<std::string> listing = PortWalk::list();
+    std::vector<std::string> bridgeMembers;
+    getbridgeInterfaces(bridgeMembers);
+    HostFacts host{trimEnd(hostName_), trimEnd(domainName_), {}, {}};
+    getDNSDetails(host.dnsServers, host.dnsSuffixes);
+    dnsServers_ = host.dnsServers;
+    dnsSuffixes_ = host.dnsSuffixes;
     std::string servers;
     std::string suffixes;
     stringFormatForDNSServersAndSuffixes(servers, suffixes);
-    const std::map<std::string, std::string> shared = {{"HOSTNAME", walk.host().hostName},
-                                                       {"DOMAINNAME", walk.host().domainName},
+    const std::map<std::string, std::string> shared = {{"HOSTNAME", host.hostName},
+                                                       {"DOMAINNAME", host.domainName},
                                                        {"DNSSERVERS", servers},
                                                        {"DNSSUFFIXES", suffixes}};
+    PortWalk::logIPv6();
+    const PortWalk walk(std::move(host), std::move(bridgeMembers));
     unsigned int index = 0;
-    for (const ListedInterface& interface : interfaces) {
+    for (const std::string& line : listing) {
         try {
-            visitInterface(interface, walk, shared, index);
+            visitInterface(PortWalk::interfaceOf(line), walk, shared, index);
         } catch (const std::exception& failure) {
             logPortFailure(failure);
         }

@@ -4,13 +4,11 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <set>
 #include <utility>
 
 #include "mi/command.h"
 #include "mi/log.h"
 #include "mi/text.h"
-#include "network/dns.h"
 #include "network/interface_lists.h"
 #include "network/link_queries.h"
 
@@ -31,24 +29,13 @@ bool isVMware() {
     return stat("/etc/vmware-release", &release) == 0;
 }
 
-ListedInterface listedInterface(const std::string& line) {
-    ListedInterface found;
-    getNICString(trimStart(trimStart(line), '\t'), found.name);
-    found.fromBridgeListing = !contains(line, ":");  // only /proc/net/dev prints colons
-    return found;
-}
-
 }  // namespace
 
-PortWalk::PortWalk(std::string hostName, std::string domainName)
-    : host_{std::move(hostName), std::move(domainName), {}, {}} {
-    getbridgeInterfaces(bridgeMembers_);
-    getDNSDetails(host_.dnsServers, host_.dnsSuffixes);
-    log(kProgress) << "IPv6 configured: " << (access("/proc/net/if_inet6", R_OK) == 0);
+IfconfigSnapshot::IfconfigSnapshot() {
     runToEnd(std::string("ifconfig > ") + ifconfigSnapshotPath);
 }
 
-PortWalk::~PortWalk() {
+IfconfigSnapshot::~IfconfigSnapshot() {
     try {
         runToEnd(std::string("rm -rf ") + ifconfigSnapshotPath);
     } catch (const std::exception& failure) {
@@ -56,19 +43,30 @@ PortWalk::~PortWalk() {
     }
 }
 
-std::vector<ListedInterface> PortWalk::list() {
+PortWalk::PortWalk(HostFacts host, std::vector<std::string> bridgeMembers)
+    : host_(std::move(host)), bridgeMembers_(std::move(bridgeMembers)) {}
+
+void PortWalk::logIPv6() {
+    log(kProgress) << "IPv6 configured: " << (access("/proc/net/if_inet6", R_OK) == 0);
+}
+
+std::vector<std::string> PortWalk::list() {
     const bool vmware = isVMware();
     if (vmware) {
         log(kProgress) << "Machine has vmware";
     }
     HostCommand listing(vmware ? kListVMware : kListInterfaces);
-    std::vector<ListedInterface> found;
-    std::set<std::string> seen;  // a line that comes again would ask the host the same again
-    while (const auto line = listing.nextLine()) {
-        if (seen.insert(*line).second) {
-            found.push_back(listedInterface(*line));
-        }
+    std::vector<std::string> lines;
+    while (auto line = listing.nextLine()) {
+        lines.push_back(std::move(*line));
     }
+    return lines;
+}
+
+ListedInterface PortWalk::interfaceOf(const std::string& line) {
+    ListedInterface found;
+    getNICString(trimStart(trimStart(line), '\t'), found.name);
+    found.fromBridgeListing = !contains(line, ":");  // only /proc/net/dev prints colons
     return found;
 }
 

@@ -16,18 +16,26 @@ struct ListedInterface {
     bool fromBridgeListing;  ///< from `brctl show`, as opposed to /proc/net/dev
 };
 
-/// What one walk over the host's interfaces has to hand: read at its start, the same for every interface.
+/// The output of `ifconfig`, kept in ifconfigSnapshotPath for the length of a walk.
+class IfconfigSnapshot {
+public:
+    IfconfigSnapshot();
+    IfconfigSnapshot(const IfconfigSnapshot&) = delete;
+    IfconfigSnapshot& operator=(const IfconfigSnapshot&) = delete;
+    ~IfconfigSnapshot();
+};
+
+/// What one walk over the host's interfaces has to hand: the same for every interface.
 class PortWalk {
 public:
-    /// Reads the bridge members, the resolver, the kernel's ports and VLANs, and keeps the output of
-    /// `ifconfig` for the length of the walk.
-    PortWalk(std::string hostName, std::string domainName);
-    PortWalk(const PortWalk&) = delete;
-    PortWalk& operator=(const PortWalk&) = delete;
-    ~PortWalk();
+    /// Takes the output of `ifconfig` first, then reads the kernel's ports and VLANs.
+    PortWalk(HostFacts host, std::vector<std::string> bridgeMembers);
 
-    /// The interfaces in the order the host lists them, names as they come.
-    static std::vector<ListedInterface> list();
+    /// The lines of the listing of all interfaces, in the order the host prints them.
+    static std::vector<std::string> list();
+    static ListedInterface interfaceOf(const std::string& line);
+    /// Logs whether the kernel has IPv6.
+    static void logIPv6();
 
     bool isBridgeMember(const std::string& name) const;
     /// No hardware address of its own: not an interface anybody can use.
@@ -43,6 +51,7 @@ public:
 private:
     HostFacts host_;
     std::vector<std::string> bridgeMembers_;
+    IfconfigSnapshot snapshot_;
     CNetworkInfo network_{true};
     CIPInterfaceInfo interfaces_;
 };

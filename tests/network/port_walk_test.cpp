@@ -128,6 +128,41 @@ HOST_TEST(PortWalk, KeepsTheListingOfIfconfigWhileItVisits) {
     EXPECT_FALSE(host.exists(kSnapshot));
 }
 
+HOST_TEST(PortWalk, TakesItsStepsInThisOrder) {
+    PortHost plugin(host, "suse-two-nics");
+    LogCapture capture;
+    plugin.build();
+    Lines steps = capture.ownMessages();
+    std::erase_if(steps, [](const std::string& text) {
+        return !text.ends_with(": entry") && !text.starts_with("IPv6 configured: ");
+    });
+    steps.resize(7);
+    EXPECT_THAT(steps, ElementsAre("createNetworkPortNodes: entry", "getbridgeInterfaces: entry",
+                                   "getDNSDetails: entry", "stringFormatForDNSServersAndSuffixes: entry",
+                                   "IPv6 configured: 1", "getNICString: entry", "findNetworkPort: entry"));
+}
+
+HOST_TEST(PortWalk, ReadsTheKernelsPortsBehindTheListingOfIfconfig) {
+    PortHost plugin(host, "suse-two-nics");
+    host.file("/sys/class/net/eth1/type", "772\n");
+    host.tool("ifconfig", ToolAnswer{.out = "", .action = "echo 1 > /sys/class/net/eth1/type"});
+    plugin.build();
+    EXPECT_THAT(plugin.names(12), ElementsAre("eth0", "eth1"));
+}
+
+HOST_TEST(PortWalk, VisitsALineThatComesAgainLikeAnyOther) {
+    PortHost plugin(host, "suse-two-nics");
+    host.file("/proc/net/dev", std::string(kDevicesHead) + "  eth1:1\n  usb0:1\n  eth1:1\n  usb0:1\n");
+    host.file("/sys/class/net/eth1/address", "00:00:00:00:00:00\n");
+    host.toolInTurn("ifconfig -a", {{""}, {"usb0      Link encap:Ethernet\n"}});
+    host.tool("ifconfig usb0", "usb0      Link encap:Ethernet\n");
+    host.tool("ip -6 address show dev usb0", "");
+    const LogCapture capture;
+    plugin.build();
+    EXPECT_THAT(capture.ownMessages(), Contains("Permanent_address compare").Times(2));
+    EXPECT_THAT(plugin.names(29), ElementsAre("usb0")) << "ifconfig lists it the second time it is asked";
+}
+
 HOST_TEST(PortWalk, LogsAnInterfaceThatFailsAndGoesOn) {
     PortHost plugin(host, "suse-two-nics");
     shell_stub::beforeEach([](const std::string& command) {
@@ -163,7 +198,7 @@ HOST_TEST(PortWalk, ThatFailsAsAWholeIsLoggedAndTheRequestForItIsNotStored) {
 
 HOST_TEST(PortWalk, ThatFindsNoMemoryAtItsEndIsLogged) {
     const PortHost plugin(host, "suse-two-nics");
-    auto walk = std::make_unique<IC::PortWalk>("host", "example.com");
+    auto walk = std::make_unique<IC::PortWalk>(IC::HostFacts(), Lines());
     const LogCapture capture;
     {
         const FailingOnce once(0);
