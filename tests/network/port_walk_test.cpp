@@ -137,9 +137,9 @@ HOST_TEST(PortWalk, TakesItsStepsInThisOrder) {
         return !text.ends_with(": entry") && !text.starts_with("IPv6 configured: ");
     });
     steps.resize(7);
-    EXPECT_THAT(steps, ElementsAre("createNetworkPortNodes: entry", "getbridgeInterfaces: entry",
-                                   "getDNSDetails: entry", "stringFormatForDNSServersAndSuffixes: entry",
-                                   "IPv6 configured: 1", "getNICString: entry", "findNetworkPort: entry"));
+    EXPECT_THAT(steps, TextsAre("createNetworkPortNodes: entry", "getbridgeInterfaces: entry",
+                                "getDNSDetails: entry", "stringFormatForDNSServersAndSuffixes: entry",
+                                "IPv6 configured: 1", "getNICString: entry", "findNetworkPort: entry"));
 }
 
 HOST_TEST(PortWalk, ReadsTheKernelsPortsBehindTheListingOfIfconfig) {
@@ -147,7 +147,7 @@ HOST_TEST(PortWalk, ReadsTheKernelsPortsBehindTheListingOfIfconfig) {
     host.file("/sys/class/net/eth1/type", "772\n");
     host.tool("ifconfig", ToolAnswer{.out = "", .action = "echo 1 > /sys/class/net/eth1/type"});
     plugin.build();
-    EXPECT_THAT(plugin.names(12), ElementsAre("eth0", "eth1"));
+    EXPECT_THAT(plugin.names(12), TextsAre("eth0", "eth1"));
 }
 
 HOST_TEST(PortWalk, VisitsALineThatComesAgainLikeAnyOther) {
@@ -160,7 +160,7 @@ HOST_TEST(PortWalk, VisitsALineThatComesAgainLikeAnyOther) {
     const LogCapture capture;
     plugin.build();
     EXPECT_THAT(capture.ownMessages(), Contains("Permanent_address compare").Times(2));
-    EXPECT_THAT(plugin.names(29), ElementsAre("usb0")) << "ifconfig lists it the second time it is asked";
+    EXPECT_THAT(plugin.names(29), TextsAre("usb0")) << "ifconfig lists it the second time it is asked";
 }
 
 HOST_TEST(PortWalk, LogsAnInterfaceThatFailsAndGoesOn) {
