@@ -1,12 +1,13 @@
 #include "framework/qx/process_tree.h"
 
+#include <dirent.h>
 #include <sys/syscall.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <csignal>
-#include <filesystem>
 #include <fstream>
+#include <memory>
 #include <sstream>
 #include <string>
 #include <thread>
@@ -15,8 +16,6 @@
 
 namespace QX {
 namespace {
-
-namespace fs = std::filesystem;
 
 /// A process by a descriptor, so that a signal cannot hit another one that got its number meanwhile.
 class Process {
@@ -41,7 +40,7 @@ private:
     int descriptor_;
 };
 
-std::vector<pid_t> readIds(const fs::path& listing) {
+std::vector<pid_t> readIds(const std::string& listing) {
     std::ifstream in(listing);
     std::vector<pid_t> ids;
     for (pid_t id = 0; in >> id;) {
@@ -51,12 +50,16 @@ std::vector<pid_t> readIds(const fs::path& listing) {
 }
 
 /// The lists of children that the kernel keeps for a process, one a thread.
-std::vector<fs::path> childListings(pid_t process) {
-    std::vector<fs::path> listings;
-    std::error_code ignored;  // a process that has just gone has no children left to find
-    const fs::path tasks = "/proc/" + std::to_string(process) + "/task";
-    for (fs::directory_iterator task(tasks, ignored), end; task != end; task.increment(ignored)) {
-        listings.push_back(task->path() / "children");
+std::vector<std::string> childListings(pid_t process) {
+    std::vector<std::string> listings;
+    const std::string tasks = "/proc/" + std::to_string(process) + "/task/";
+    // Not by the iterators of libstdc++: those end the program when they find no memory.
+    const std::unique_ptr<DIR, int (*)(DIR*)> directory(opendir(tasks.c_str()), closedir);
+    // A process that has just gone has no children left to find.
+    while (const dirent* task = directory != nullptr ? readdir(directory.get()) : nullptr) {
+        if (task->d_name[0] != '.') {
+            listings.push_back(tasks + task->d_name + "/children");
+        }
     }
     return listings;
 }
@@ -92,7 +95,7 @@ bool hasEnded(const Status& status) {
     return std::string("ZXx").find(status.state) != std::string::npos;
 }
 
-fs::path listingOf(pid_t thread) {
+std::string listingOf(pid_t thread) {
     return "/proc/self/task/" + std::to_string(thread) + "/children";
 }
 
@@ -105,7 +108,8 @@ void freeze(const Process& process) {
     }
 }
 
-/// Processes that are stopped first, all of them, and killed then.
+/// Processes that are stopped first, all of them, and killed then. When the search ends half-way they go on
+/// instead: whoever kills a shell alone sets its tools free, and they keep the pipe open.
 class Condemned {
 public:
     Condemned() = default;
@@ -113,28 +117,28 @@ public:
     Condemned& operator=(const Condemned&) = delete;
     ~Condemned() {
         for (const Process& process : frozen_) {
-            process.send(SIGKILL);
+            process.send(complete_ ? SIGKILL : SIGCONT);
         }
     }
 
     /// Stops a process; its own children are still to be added.
     /// @param listing where it stands as a child: one that no longer does is another's by now
     /// @return whether it was stopped
-    bool add(pid_t id, const fs::path& listing) {
+    bool add(pid_t id, const std::string& listing) {
         Process process(id);
         const auto now = readIds(listing);  // still the same child, now that we hold it?
         if (!process.isOpen() || std::find(now.begin(), now.end(), id) == now.end()) {
             return false;
         }
-        freeze(process);
         frozen_.push_back(std::move(process));
+        freeze(frozen_.back());
         return true;
     }
 
     /// The same for all that these listings tell and for their descendants.
-    void addAll(std::vector<fs::path> listings) {
+    void addAll(std::vector<std::string> listings) {
         while (!listings.empty()) {
-            const fs::path listing = std::move(listings.back());
+            const std::string listing = std::move(listings.back());
             listings.pop_back();
             for (const pid_t id : readIds(listing)) {
                 if (add(id, listing)) {
@@ -142,9 +146,11 @@ public:
                 }
             }
         }
+        complete_ = true;
     }
 
 private:
+    bool complete_ = false;
     std::vector<Process> frozen_;
 };
 

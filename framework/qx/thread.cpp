@@ -22,6 +22,15 @@ void logEndByException(const std::string& what) {
                                      "thread ended by an exception: " + what);
 }
 
+/// Whoever stops a thread goes on to free what the thread uses: it must not be kept from waiting for it.
+void killCommandsOf(pid_t thread) noexcept {
+    try {
+        killChildrenOf(thread);
+    } catch (...) {
+        // No memory to look for them: join looks again.
+    }
+}
+
 }  // namespace
 
 /// Shared with the running thread, which outlives an object that is destroyed in its own run.
@@ -105,7 +114,7 @@ void Thread::join() {
         if (!state_->aborted) {
             state_->changed.wait(lock);
         } else if (state_->changed.wait_for(lock, kLookAgain) == std::cv_status::timeout && state_->running) {
-            killChildrenOf(
+            killCommandsOf(
                 state_->kernelId);  // under the lock: the thread cannot end and leave its id to another
         }
     }
@@ -122,7 +131,7 @@ void Thread::abort() {
     state_->aborted = true;
     state_->changed.notify_all();
     state_->interruption.abort();
-    killChildrenOf(state_->kernelId);
+    killCommandsOf(state_->kernelId);
 }
 
 void Thread::sleep(unsigned int milliseconds) {

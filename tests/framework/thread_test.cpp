@@ -15,6 +15,7 @@
 
 #include "framework/cvlog/logger.h"
 #include "framework/qx/event.h"
+#include "tests/support/failing_new.h"
 
 namespace {
 
@@ -301,6 +302,24 @@ TEST(ThreadAbort, EndsAWaitForAnEvent) {
     EXPECT_EQ(answer, 0);
     event.signal();
     EXPECT_TRUE(event.wait(0));  // others wait as ever
+}
+
+TEST(ThreadAbort, ThatFindsNoMemoryForItsSearchIsMadeUpForByTheJoin) {
+    long allocations = 0;
+    for (bool failed = true; failed; ++allocations) {
+        Reader reader;
+        Worker worker([&] { reader.read("echo 1; sleep 600"); });
+        worker.start(nullptr);
+        ASSERT_TRUE(soon([&] { return reader.count() == 1; }));
+        {
+            const FailingOnce once(allocations);
+            EXPECT_NO_THROW(worker.abort()) << allocations;
+            failed = once.happened();
+        }
+        const FailingOnce onceMore(0);
+        EXPECT_NO_THROW(worker.join()) << allocations;
+    }
+    EXPECT_GT(allocations, 1);
 }
 
 TEST(ThreadAbort, RacesWithTheStartOfAWait) {
