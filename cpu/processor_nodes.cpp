@@ -20,6 +20,23 @@ enum ProcessorProperty : unsigned int {
 constexpr char kListProcessors[] = "cat /proc/cpuinfo 2> /dev/null |grep processor 2> /dev/null ";
 constexpr std::size_t kLongestLine = 127;
 
+/// The k-th speed that the kernel tells is the k-th processor's.
+void describeProcessors(const std::map<unsigned int, MutableNode*>& processors) {
+    std::ifstream cpuinfo("/proc/cpuinfo");
+    auto processor = processors.begin();
+    for (std::string line; processor != processors.end() && std::getline(cpuinfo, line);) {
+        if (!contains(line, "cpu MHz")) {
+            continue;
+        }
+        const std::string speed = line.substr(line.find(':') + 1);
+        processor->second->setDescription("Processor");
+        processor->second->setProperty(
+            kClockSpeed,
+            PropertyValue(Number(static_cast<unsigned int>(std::strtoul(speed.c_str(), nullptr, 10))), true));
+        ++processor;
+    }
+}
+
 }  // namespace
 
 void OsHwMI::createCpuNodeAndMap() {
@@ -47,19 +64,11 @@ void OsHwMI::createCpuNodes() {
     if (tree_.planar == nullptr) {
         return;  // called outside initialize and unload: there is no tree to hang them in
     }
-    createCpuNodeAndMap();
-    std::ifstream cpuinfo("/proc/cpuinfo");
-    auto processor = inventory_->processors.begin();
-    for (std::string line; processor != inventory_->processors.end() && std::getline(cpuinfo, line);) {
-        if (!contains(line, "cpu MHz")) {
-            continue;
-        }
-        const std::string speed = line.substr(line.find(':') + 1);
-        processor->second->setDescription("Processor");
-        processor->second->setProperty(
-            kClockSpeed,
-            PropertyValue(Number(static_cast<unsigned int>(std::strtoul(speed.c_str(), nullptr, 10))), true));
-        ++processor;
+    try {
+        createCpuNodeAndMap();
+        describeProcessors(inventory_->processors);
+    } catch (const std::exception& failure) {
+        logCpu(kError) << "createCpuNodes failed: " << failure.what();
     }
 }
 

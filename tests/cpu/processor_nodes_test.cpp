@@ -1,12 +1,17 @@
 #include <gmock/gmock.h>
 
+#include <new>
+
+#include "framework/cvlog/logger.h"
 #include "mi/globals.h"
 #include "mi/os_hw_mi.h"
 #include "tests/support/command_lines.h"
+#include "tests/support/failing_new.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"
 #include "tests/support/plugin_access.h"
+#include "tests/support/shell_stub.h"
 #include "tests/support/texts_are.h"
 
 namespace {
@@ -159,6 +164,53 @@ HOST_TEST(Processors, AreNoneWhenTheShellCannotBeStarted) {
     }
     EXPECT_TRUE(plugin.processors().empty());
     EXPECT_THAT(capture.ownMessages(6000), TextsAre("createCpuNodeAndMap(): cmd_cpu error"));
+}
+
+HOST_TEST(Processors, KeepTheirPlacesWhenTheyCannotBeListedAgain) {
+    host.file("/proc/cpuinfo", processor(0, "1000.0"));
+    Started plugin;
+    plugin.mi().createCpuNodes();
+    host.file("/proc/cpuinfo", processor(0, "2000.0"));
+    shell_stub::failWhen([](const std::string&) { return true; });
+    plugin.mi().createCpuNodes();
+    shell_stub::failWhen({});
+    EXPECT_THAT(plugin.speeds(), ElementsAre("2000")) << "only a listing empties the map";
+}
+
+HOST_TEST(Processors, AnyAllocationMayFail) {
+    host.file("/proc/cpuinfo", processor(0, "1000.0") + processor(1, "2000.0"));
+    Started plugin;
+    shell_stub::answerWith([](const std::string&) { return "processor\t: 0\nprocessor\t: 1\n"; });
+    CVLog::CVLogger::setLog(nullptr, 0);
+    long allocations = 0;
+    for (bool failed = true; failed; ++allocations) {
+        {
+            const FailingOnce once(allocations);
+            EXPECT_NO_THROW(plugin.mi().createCpuNodes()) << allocations;
+            failed = once.happened();
+        }
+        const std::size_t before = plugin.processors().size();
+        plugin.mi().createCpuNodes();
+        const auto speeds = plugin.speeds();
+        ASSERT_EQ(speeds.size(), before + 2);
+        EXPECT_EQ(speeds[before], "1000");
+        EXPECT_EQ(speeds[before + 1], "2000");
+    }
+    EXPECT_GT(allocations, 10);
+    shell_stub::answerWith({});
+}
+
+HOST_TEST(Processors, SayThatThereWasNoMemoryForThem) {
+    host.file("/proc/cpuinfo", processor(0, "1000.0"));
+    Started plugin;
+    LogCapture capture;
+    {
+        const FailingNew none(sizeof(IC::MutableNode), [] { throw std::bad_alloc(); });
+        EXPECT_NO_THROW(plugin.mi().createCpuNodes());
+    }
+    EXPECT_THAT(capture.ownMessages(6000), ElementsAre("createCpuNodes failed: std::bad_alloc"));
+    EXPECT_EQ(capture.ownMessages().back(), "createCpuNodes: exit");
+    EXPECT_TRUE(plugin.processors().empty());
 }
 
 HOST_TEST(Processors, AreLeftAloneOutsideStartAndStop) {
