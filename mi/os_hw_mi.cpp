@@ -69,8 +69,10 @@ Error OsHwMI::initialize(unsigned int miId, const Number& ownNodeId, const Numbe
     for (const Step& step : kStartUp) {
         guarded(step.name, [&] { step.run(*this); });
     }
+    Error result(Error::failure, Number(), "");  // what stays when there is no memory for a copy
+    guarded("initialize", [&] { result = OSHWMI::myerr; });
     OSHWMI::bInitflag = true;
-    return OSHWMI::myerr;
+    return result;
 }
 
 Error OsHwMI::unload() {

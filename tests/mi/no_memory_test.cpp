@@ -42,6 +42,26 @@ HOST_TEST(NoMemory, AnyAllocationOfAStartMayFail) {
     shell_stub::answerWith({});
 }
 
+HOST_TEST(NoMemory, OfAStartWhoseBaseFailsThrowsNothingEither) {
+    shell_stub::answerWith(answer);
+    CVLog::CVLogger::setLog(nullptr, 0);
+    long allocations = 0;
+    for (bool failed = true; failed; ++allocations) {
+        {
+            const FailingOnce once(allocations);
+            EXPECT_NO_THROW({
+                const IC::Error result = IC::myoshwmi.initialize(1, Number(), Number());
+                EXPECT_NE(result.getStatus(), 0) << allocations;
+            }) << allocations;
+            failed = once.happened();
+        }
+        EXPECT_TRUE(IC::OSHWMI::bInitflag) << allocations;
+        IC::myoshwmi.unload();
+    }
+    EXPECT_GT(allocations, 100);
+    shell_stub::answerWith({});
+}
+
 HOST_TEST(NoMemory, ForTheTreeLeavesTheRestOfTheStartToRun) {
     shell_stub::answerWith(answer);
     LogCapture capture;
