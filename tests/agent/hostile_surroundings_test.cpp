@@ -31,6 +31,14 @@ HOST_TEST(FullTmp, IsToldAndTheRestIsShown) {
     EXPECT_THAT(run.out, Not(HasSubstr("hard-drive")));
 }
 
+HOST_TEST(ReadOnlyTmp, IsTold) {
+    SuseHost suse(host);
+    host.readOnly("/tmp");
+    const Finished run = suse.run({"tree"});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.err, HasSubstr("cvagent: cannot write to /tmp: Read-only file system; "));
+}
+
 HOST_TEST(ReadOnlyData, IsToldAndEverythingIsShown) {
     SuseHost suse(host);
     host.directory(kData, 0700);
