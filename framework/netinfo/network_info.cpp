@@ -13,7 +13,9 @@ constexpr const char* kNoAddress = "00:00:00:00:00:00";
 /// A link of its own that a device stands behind, or one end of a pair, which a guest knows as its network
 /// card.
 bool isPhysical(const netinfo::Link& link) {
-    if (link.upper) {
+    // usb0 is a wire to another computer or to this one's service processor. An adapter on the USB bus, which
+    // is a port, is called eth0 like any other.
+    if (link.upper || link.name.starts_with("usb")) {
         return false;
     }
     if (link.hardware) {

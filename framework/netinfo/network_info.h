@@ -22,7 +22,8 @@ public:
     ~CNetworkInfo();
 
     /// Physical ports by controller: Ethernet links with no upper kind of their own (no bond, bridge, VLAN,
-    /// tun/tap, wireless). Paravirtual links (virtio, veth) count. Null when /sys/class/net cannot be read.
+    /// tun/tap, wireless) that are no wires to another computer (usb0). Paravirtual links (virtio, veth)
+    /// count. Null when /sys/class/net cannot be read.
     const EthernetPortsByController* getNICInfo() const;
     /// The names of the virtual NICs: Ethernet links that no hardware stands behind (veth, macvlan, dummy).
     const std::vector<std::string>& getVNICNames() const;

@@ -140,6 +140,15 @@ HOST_TEST(NetworkInfo, LinksThatLeadNowhereAreNoPorts) {
     EXPECT_THAT(info.getVNICNames(), TextsAre("dummy0", "gretap0", "ifb0"));
 }
 
+HOST_TEST(NetworkInfo, AWireToAnotherComputerIsNoPortAndAnAdapterOnTheSameBusIsOne) {
+    Link(host, "usb0").withDevice("1-1:1.0");
+    Link(host, "usb1").withDevice("gadget.0").withType("gadget");
+    Link(host, "eth1").withDevice("1-2:1.0");
+    const CNetworkInfo info(true);
+    EXPECT_THAT(portNames(info), ElementsAre(Pair("1-2:1.0", TextsAre("eth1"))));
+    EXPECT_THAT(*info.getVLANInfo(), IsEmpty());
+}
+
 HOST_TEST(NetworkInfo, LinksThatAreNotEthernetAreNotSeen) {
     Link(host, "lo").with("type", "772\n");
     Link(host, "ib0").with("type", "32\n").withDevice("0000:05:00.0");

@@ -240,6 +240,12 @@ HOST_TEST(PortWalk, SavesWhatAllShareForAnInterfaceWithoutAnyNode) {
 HOST_TEST(PortWalk, GivesAUSBInterfaceAConfigurationUnderTheController) {
     PortHost plugin(host, "suse-two-nics");
     host.file("/proc/net/dev", std::string(kDevicesHead) + "  usb0:1\n");
+    const std::string link = "/sys/class/net/usb0/";
+    host.file(link + "type", "1\n");
+    host.file(link + "flags", "0x1003\n");
+    host.file(link + "uevent", "INTERFACE=usb0\n");
+    host.file(link + "address", "02:00:5e:00:00:09\n");
+    host.symlink(link + "device", "../../../1-1:1.0");
     host.tool("ifconfig -a", "usb0      Link encap:Ethernet\n");
     host.tool("ifconfig usb0", "usb0      Link encap:Ethernet\n");
     host.tool("ip -6 address show dev usb0", "");
