@@ -1,8 +1,11 @@
 // Starts that run out of memory at every place where they ask for some.
 #include <gmock/gmock.h>
 
+#include <chrono>
+#include <filesystem>
 #include <new>
 #include <stdexcept>
+#include <thread>
 
 #include "framework/cvlog/logger.h"
 #include "mi/globals.h"
@@ -10,9 +13,22 @@
 #include "tests/support/failing_new.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/plugin_access.h"
 #include "tests/support/shell_stub.h"
 
 namespace {
+
+std::ptrdiff_t runningThreads() {
+    return std::distance(std::filesystem::directory_iterator("/proc/self/task"), {});
+}
+
+/// Waits until so many threads run: one that was joined is listed a moment longer.
+bool comeTo(std::ptrdiff_t wanted) {
+    for (int tries = 0; tries < 1000 && runningThreads() != wanted; ++tries) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(1));
+    }
+    return runningThreads() == wanted;
+}
 
 using IC::Number;
 using testing::Contains;
@@ -59,6 +75,30 @@ HOST_TEST(NoMemory, OfAStartWhoseBaseFailsThrowsNothingEither) {
         IC::myoshwmi.unload();
     }
     EXPECT_GT(allocations, 100);
+    shell_stub::answerWith({});
+}
+
+HOST_TEST(NoMemory, AnyAllocationOfAStopMayFail) {
+    host.file("/proc/net/bonding/bond0", "");
+    host.file("/opt/vantrel/corvista/data/ifcfg-eth0", "");
+    shell_stub::answerWith(answer);
+    CVLog::CVLogger::setLog(nullptr, 0);
+    std::thread([] {}).join();  // what a sanitizer starts beside the first thread of a process
+    const auto before = runningThreads();
+    long allocations = 0;
+    for (bool failed = true; failed; ++allocations) {
+        IC::myoshwmi.initialize(1, Number(1U), Number(2U));
+        ASSERT_TRUE(comeTo(before + 2)) << "the two monitors";
+        {
+            const FailingOnce once(allocations);
+            EXPECT_NO_THROW(IC::myoshwmi.unload()) << allocations;
+            failed = once.happened();
+        }
+        ASSERT_TRUE(comeTo(before)) << allocations;
+        EXPECT_TRUE(IC::myoshwmi.holdAll().empty());
+        EXPECT_FALSE(IC::OsHwMITestAccess::hasInventory());
+    }
+    EXPECT_GT(allocations, 10);
     shell_stub::answerWith({});
 }
 
