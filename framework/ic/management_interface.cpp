@@ -1,6 +1,7 @@
 #include "framework/ic/management_interface.h"
 
 #include <algorithm>
+#include <exception>
 #include <mutex>
 
 #include "framework/ic/conversion_error.h"
@@ -18,6 +19,17 @@ unsigned int requiredId(const Number& number, const char* what) {
         throw ConversionError(std::string("initialize: no ") + what + " given");
     }
     return number;
+}
+
+/// What the agent throws at a node counts as a refusal of that node alone.
+Error handOver(LoadCallBack load, Node* node, const void* context) {
+    try {
+        return load(node, context);
+    } catch (const std::exception& failure) {
+        return failed(failure.what());
+    } catch (...) {
+        return failed("unknown exception");
+    }
 }
 
 using NodeList = std::vector<std::shared_ptr<MutableNode>>;
@@ -134,7 +146,7 @@ Error ManagementInterface::addNewNode(Node* node) {
     if (load == nullptr) {
         return {};  // the agent finds it in the map
     }
-    Error result = load(node, context);
+    Error result = handOver(load, node, context);
     if (result.getStatus() != Error::success) {
         refuse(handle);
     }

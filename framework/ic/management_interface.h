@@ -46,9 +46,9 @@ public:
     virtual ~ManagementInterface();
     virtual operator std::string() const;
     /// Takes ownership of a node made after start-up, lists it and hands it to the agent's load callback,
-    /// whose result it returns. A node that the agent refuses stays owned but is not listed. A node that is
-    /// owned already is handed over again. Failure for null and for a node that is no MutableNode; it stays
-    /// the caller's.
+    /// whose result it returns; one that throws has refused. A node that the agent refuses stays owned but is
+    /// not listed. A node that is owned already is handed over again. Failure for null and for a node that is
+    /// no MutableNode; it stays the caller's.
     virtual Error addNewNode(Node* node);
     /// Withdraws a node: out of the list at once, freed when the last operation on it has returned.
     /// Failure when the node is not one of this interface's.

@@ -145,6 +145,19 @@ TEST_F(ManagementInterfaceTest, ANodeTheAgentRefusesIsKeptButNotListed) {
     EXPECT_EQ(alive_, 0);
 }
 
+TEST_F(ManagementInterfaceTest, ANodeAtWhichTheAgentThrowsIsRefused) {
+    interface_.setLoadCallBack(
+        [](Node* const&, const void*) -> Error { throw std::runtime_error("the agent is broken"); }, nullptr,
+        nullptr);
+    EXPECT_EQ(interface_.addNewNode(makeNode(2)).text(), "the agent is broken");
+    interface_.setLoadCallBack([](Node* const&, const void*) -> Error { throw 7; }, nullptr, nullptr);
+    EXPECT_EQ(interface_.addNewNode(makeNode(3)).getStatus(), Error::failure);
+    EXPECT_THAT(map(), ElementsAre());
+    EXPECT_EQ(alive_, 2);
+    interface_.unload();
+    EXPECT_EQ(alive_, 0);
+}
+
 TEST_F(ManagementInterfaceTest, ARefusedNodeCanBeDeletedAndTheAgentHearsNothing) {
     connect();
     agent_.answer = Error(1, Number(), "no");

@@ -2,6 +2,7 @@
 #include <gmock/gmock.h>
 
 #include <chrono>
+#include <stdexcept>
 #include <thread>
 
 #include "mi/disk_snapshot.h"
@@ -41,6 +42,10 @@ std::vector<std::shared_ptr<MutableNode>> nodesOfType(const OsHwMI& mi, unsigned
 
 IC::Error refuse(IC::Node* const&, const void*) {
     return {7, Number(), "the agent is full"};
+}
+
+IC::Error throwing(IC::Node* const&, const void*) {
+    throw std::runtime_error("the agent is broken");
 }
 
 /// How far the network monitor is when it is stopped decides whether it is aborted and waited for.
@@ -313,6 +318,22 @@ HOST_TEST(Lifecycle, LogsARefusedNodeAndGoesOn) {
     EXPECT_THAT(capture.ownMessages(),
                 TextsAre("publishNode: entry", "addNewNode error = the agent is full", "publishNode: exit"));
     EXPECT_EQ(capture.ownMessages(6000), std::vector<std::string>{"addNewNode error = the agent is full"});
+    IC::myoshwmi.unload();
+}
+
+HOST_TEST(Lifecycle, LogsANodeAtWhichTheAgentThrowsAndGoesOn) {
+    host.toolInTurn("fdisk -ls",
+                    {{""}, {"Disk /dev/sda: 1 GB, 1000 bytes\nDisk /dev/sdb: 1 GB, 1000 bytes\n"}});
+    initialize(IC::myoshwmi);
+    IC::myoshwmi.setLoadCallBack(throwing, nullptr, nullptr);
+    LogCapture capture;
+    IC::myoshwmi.HDDThreadProcess();
+    EXPECT_THAT(capture.ownMessages(6000), testing::ElementsAre("addNewNode error = the agent is broken",
+                                                                "addNewNode error = the agent is broken"));
+    EXPECT_EQ(Access::drives().size(), 2U) << "they keep their places";
+    capture.clear();
+    IC::myoshwmi.HDDThreadProcess();
+    EXPECT_THAT(capture.ownMessages(6000), testing::IsEmpty()) << "nothing is tried again";
     IC::myoshwmi.unload();
 }
 
