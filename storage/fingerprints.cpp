@@ -1,6 +1,7 @@
 // The fingerprints of the disk snapshot, and what a pass of the drive monitor does with them.
 #include "mi/disk_snapshot.h"
 #include "mi/log.h"
+#include "mi/my_process.h"
 #include "mi/os_hw_mi.h"
 #include "mi/text.h"
 
@@ -55,12 +56,17 @@ void takeFingerprints(const Extract& extract, FingerprintPair& pair, bool keepCu
     }
 }
 
+/// What a killed command printed is not the layout: nodes may be missing, so the next pass builds them again.
 template <class Rebuild>
 void rebuildIfDifferent(const Extract& extract, FingerprintPair& pair, Rebuild rebuild) {
     if (!pair.differs()) {
         return;
     }
+    const unsigned int before = commandsCutOff();
     rebuild();
+    if (commandsCutOff() != before) {
+        return;
+    }
     pair.accept();
     log(kProgress) << extract.different;
 }
@@ -84,8 +90,12 @@ void OsHwMI::HDDThreadProcess() {
     if (!takeDiskSnapshot()) {
         return;
     }
+    const unsigned int before = commandsCutOff();
     HardDrive_Checksum(true);
     Partition_Checksum(true);
+    if (commandsCutOff() != before) {
+        return;
+    }
     rebuildIfDifferent(kDrives, driveFingerprints_, [this] { createHardDriveNodes(true); });
     rebuildIfDifferent(kPartitions, partitionFingerprints_, [this] { createPartitionNodes(true); });
 }

@@ -204,6 +204,35 @@ HOST_TEST_F(LayoutComparison, AFingerprintThatFailsCountsAsAChangeOnce) {
     EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda", "published /dev/sda")) << "and back again once";
 }
 
+const ToolAnswer kKilled{.out = "", .action = "kill -KILL $PPID"};
+
+HOST_TEST_F(LayoutComparison, AFingerprintThatIsCutOffLeavesOutTheRestOfThePass) {
+    startWith(host, kLayout);
+    host.tool("awk %any", kKilled);
+    pass(host, kLayout);
+    EXPECT_THAT(diary(), IsEmpty());
+    EXPECT_EQ(commands(), kComparison);
+    host.remove("/tools/awk");
+    pass(host, kLayout);
+    EXPECT_THAT(diary(), IsEmpty()) << "the references are the old ones";
+}
+
+HOST_TEST_F(LayoutComparison, ARebuildThatIsCutOffIsMadeAgain) {
+    startWith(host, kLayout);
+    const std::string layout = kLayout + "Disk /dev/sdb: 80.0 GB, 1000000 bytes\n" + kSecond;
+    host.tool("cut %any", kKilled);
+    LogCapture log;
+    pass(host, layout);
+    EXPECT_THAT(drives(), IsEmpty());
+    EXPECT_THAT(log.messages(), Not(Contains(testing::EndsWith("found Different"))));
+    host.realTool("cut");
+    pass(host, layout);
+    EXPECT_EQ(drives().size(), 2U);
+    EXPECT_EQ(partitions().at(1).size, 10241437U);
+    pass(host, layout);
+    EXPECT_THAT(diary(), IsEmpty());
+}
+
 HOST_TEST_F(LayoutComparison, ComparedFingerprintsMoveToTheReference) {
     startWith(host, kLayout);
     EXPECT_EQ(Access::driveFingerprints().md5.reference, kDiskMd5);
