@@ -100,12 +100,15 @@ std::string LineFile::text() const {
     return content;
 }
 
-LineFile::Written LineFile::replace(const std::string& path) const {
+LineFile::Written LineFile::replace(const std::string& path, const std::function<void()>& opened) const {
+    const std::string content = text();
     const File file(path);
     if (!file.opened()) {
         return Written::notOpened;
     }
-    const std::string content = text();
+    if (opened) {
+        opened();
+    }
     if (file.hasRoom(content.size()) && file.put(content)) {
         return Written::whole;
     }

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <functional>
 #include <optional>
 #include <string>
 #include <vector>
@@ -55,10 +56,13 @@ public:
     /// Replaces the content of the file, created when it is missing. A full disk is found out first and
     /// leaves the file as it was; where the file system cannot tell, a failure half-way leaves what was
     /// written so far. Both are logged at level 6000.
-    Written replace(const std::string& path) const;
+    /// @param opened called once the file is open for writing, before anything is written
+    Written replace(const std::string& path, const std::function<void()>& opened = {}) const;
     /// The same for writers that go on either way.
     /// @return whether the file could be opened for writing
-    bool write(const std::string& path) const { return replace(path) != Written::notOpened; }
+    bool write(const std::string& path, const std::function<void()>& opened = {}) const {
+        return replace(path, opened) != Written::notOpened;
+    }
 
 private:
     std::vector<std::string> lines_;

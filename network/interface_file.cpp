@@ -1,13 +1,26 @@
 #include "network/interface_file.h"
 
+#include <fstream>
+#include <utility>
+
 #include "mi/command.h"
+#include "mi/log.h"
 #include "mi/text.h"
 
 namespace IC {
 
-InterfaceFile::InterfaceFile(const std::string& mac)
-    : path_("/etc/sysconfig/network/ifcfg-eth-id-" + mac),
-      file_(LineFile::read(path_).value_or(LineFile())) {}
+std::string InterfaceFile::pathOf(const std::string& mac) {
+    return "/etc/sysconfig/network/ifcfg-eth-id-" + mac;
+}
+
+InterfaceFile::InterfaceFile(const std::string& mac) : path_(pathOf(mac)) {
+    if (auto file = LineFile::read(path_)) {
+        file_ = std::move(*file);
+    } else if (std::ifstream(path_).is_open()) {
+        isWhole_ = false;
+        log(kError) << "Could not read all of '" << path_ << "'.";
+    }
+}
 
 void InterfaceFile::replace(std::initializer_list<KeyLine*> keys) {
     file_.rewrite([&](std::string& line) {
@@ -37,6 +50,15 @@ void InterfaceFile::appendMissing(std::initializer_list<const KeyLine*> keys) {
 
 std::string InterfaceFile::lastLine() const {
     return file_.lines().empty() ? "" : file_.lines().back();
+}
+
+bool InterfaceFile::write(const char* opened, const char* function) const {
+    const auto tell = [&] {
+        if (opened != nullptr) {
+            log(kChange, function) << opened;
+        }
+    };
+    return isWhole_ && file_.write(path_, tell);
 }
 
 std::optional<std::string> interfaceFileValue(const std::string& ifName, const char* key) {

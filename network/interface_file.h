@@ -29,26 +29,30 @@ struct KeyLine {
 };
 
 /// The configuration file of an interface, /etc/sysconfig/network/ifcfg-eth-id-<hardware address>: read whole
-/// when the object is made, changed by key, written back whole. A missing file is created from what a writer
-/// appends.
+/// when the object is made, changed by key, written back whole. A file that cannot be opened for reading is
+/// created from what a writer appends; one that can, but not be read to its end, is logged at level 6000 and
+/// never written, for that would lose the rest.
 class InterfaceFile {
 public:
     /// @param mac hardware address as getHardwareAddress gives it
     explicit InterfaceFile(const std::string& mac);
 
-    const std::string& path() const { return path_; }
+    static std::string pathOf(const std::string& mac);
     /// Looks for the keys in every line, in the order given, and marks those seen.
     void replace(std::initializer_list<KeyLine*> keys);
     /// Appends the lines of the keys that were not seen, in the order given.
     void appendMissing(std::initializer_list<const KeyLine*> keys);
     /// The last line as it stands now; "" when there is none.
     std::string lastLine() const;
+    /// @param opened logged once the file is open, before anything is written; null for nothing
+    /// @param function that the line is of; leave it out
     /// @return whether the file could be opened for writing; it is the old one when not
-    bool write() const { return file_.write(path_); }
+    bool write(const char* opened = nullptr, const char* function = __builtin_FUNCTION()) const;
 
 private:
     std::string path_;
     LineFile file_;
+    bool isWhole_ = true;
 };
 
 /// What stands behind the '=' in the first line of an interface's file that holds a key, asked of the shell:

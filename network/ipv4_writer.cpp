@@ -45,8 +45,8 @@ void setIPOrigin(std::string, PropertyValue origin, std::string mac) {
     const LogScope scope;
     // Any answer counts, so on a host with a shell this is always "known".
     const bool dhcpv6Known = HostCommand("rpm -qa | grep dhcpv6*").started();
+    log(kProgress) << "File open " << InterfaceFile::pathOf(mac) << " in read mode.";
     InterfaceFile file(mac);
-    log(kProgress) << "File open " << file.path() << " in read mode.";
     KeyLine bootProto{kBootProto, bootProtoLine(originCode(origin), dhcpv6Known)};
     if (bootProto.line.empty()) {
         bootProto.held = KeyLine::Held::kept;
@@ -58,9 +58,7 @@ void setIPOrigin(std::string, PropertyValue origin, std::string mac) {
     }
     file.appendMissing({&bootProto, &startMode});
     log(kChange) << "IP Origin  = " << origin;
-    if (file.write()) {
-        log(kChange) << kInterfaceFileOpened;
-    }
+    file.write(kInterfaceFileOpened);
 }
 
 void setIPv4Address(std::string, std::string address, std::string mac) {
@@ -80,9 +78,7 @@ void setSubnetMask(std::string ifName, std::string mask, std::string mac) {
     InterfaceFile file(mac);
     file.replace({&bootProto, &netmask});
     file.appendMissing({&bootProto, &netmask});
-    if (file.write()) {
-        log(kChange) << "Writing Subnet to File";
-    } else {
+    if (!file.write("Writing Subnet to File")) {
         log(kError) << "Failed to open the file for writing";
     }
     if (!HostCommand(formatCommand("ifconfig %s netmask %s", ifName.c_str(), mask.c_str())).started()) {

@@ -16,9 +16,7 @@ void setIPv6Address(std::string, std::string address, std::string mac) {
     InterfaceFile file(mac);
     file.replace({&label, &secondary, &bootProto});
     file.appendMissing({&bootProto, &label, &secondary});
-    if (file.write()) {
-        log(kChange) << "Writing IP Address";
-    }
+    file.write("Writing IP Address");
 }
 
 void setIPv6PrefixLength(std::string, unsigned int prefixLength, std::string mac) {
@@ -27,9 +25,7 @@ void setIPv6PrefixLength(std::string, unsigned int prefixLength, std::string mac
     InterfaceFile file(mac);
     file.replace({&length});
     file.appendMissing({&length});
-    if (file.write()) {
-        log(kChange) << kInterfaceFileOpened;
-    }
+    file.write(kInterfaceFileOpened);
 }
 
 void setIPv6Gateway(std::string ifName, std::string gateway, std::string) {

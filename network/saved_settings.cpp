@@ -15,18 +15,20 @@ constexpr char kDirectory[] = "/opt/vantrel/corvista/data";
 
 void createSettingData(std::string name, std::map<std::string, std::string> settings) {
     const LogScope scope;
+    const char* const function = __func__;  // in the closure it would be another
     const std::string path = std::string(kDirectory) + "/ifcfg-" + name;
     log(kProgress) << "createSettingData: FileName " << path;
     LineFile file;
     for (const auto& [key, value] : settings) {
         file.append(key + '=' + trimEnd(value) + '\n');
     }
-    if (!file.write(path)) {
+    const auto tellLines = [&] {
+        for (const std::string& line : file.lines()) {
+            log(kProgress, function) << "createSettingData: buffer" << line;
+        }
+    };
+    if (!file.write(path, tellLines)) {
         log(kError) << "Can not open Setting File";
-        return;
-    }
-    for (const std::string& line : file.lines()) {
-        log(kProgress) << "createSettingData: buffer" << line;
     }
 }
 

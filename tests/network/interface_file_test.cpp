@@ -11,7 +11,7 @@ constexpr char kMac[] = "00:0c:29:00:00:01";
 constexpr char kPath[] = "/etc/sysconfig/network/ifcfg-eth-id-00:0c:29:00:00:01";
 
 HOST_TEST(InterfaceFile, IsNamedAfterTheHardwareAddress) {
-    EXPECT_EQ(InterfaceFile(kMac).path(), kPath);
+    EXPECT_EQ(InterfaceFile::pathOf(kMac), kPath);
 }
 
 HOST_TEST(InterfaceFile, ReplacesEveryLineOfAKeyInPlaceAndAppendsTheMissing) {

@@ -274,12 +274,31 @@ HOST_TEST(LinkState, ThatIsNoneRunsAnEmptyCommand) {
 HOST_TEST(LinkState, OfABondTakesTheMonitorsReportsWithoutACommand) {
     PortHost plugin(host, "bond-two-members");
     const auto bond = plugin.build().config("bond0");
+    const CommandLines commands;
+    for (const unsigned int state : {32U, 33U}) {
+        LogCapture capture;
+        host.clearCalls();
+        EXPECT_EQ(bond->setProperty(123, number(state)).getStatus(), 0);
+        EXPECT_THAT(capture.ownMessages(), Contains("Status updation for bonded interface. New status is: " +
+                                                    std::to_string(state)));
+        EXPECT_THAT(capture.ownMessages(6000), IsEmpty());
+        EXPECT_EQ(PortHost::stored(*bond, 123), number(state));
+        EXPECT_THAT(host.callsOf("ifconfig"), TextsAre("ifconfig bond0", "ifconfig bond0")) << "reads alone";
+    }
+    EXPECT_THAT(commands.all(), Not(Contains(""))) << "not even an empty one";
+}
+
+HOST_TEST(LinkState, OfABondIsSetLikeAnyOther) {
+    PortHost plugin(host, "bond-two-members");
+    const auto bond = plugin.build().config("bond0");
+    host.tool("ifconfig bond0 up", "");
+    host.tool("ifconfig bond0 down", "");
     LogCapture capture;
-    EXPECT_EQ(bond->setProperty(123, number(33)).getStatus(), 0);
-    EXPECT_THAT(capture.ownMessages(), Contains("Status updation for bonded interface. New status is: 33"));
-    EXPECT_THAT(capture.ownMessages(6000), IsEmpty());
-    EXPECT_EQ(PortHost::stored(*bond, 123), number(33));
-    EXPECT_THAT(host.callsOf("ifconfig"), TextsAre("ifconfig bond0", "ifconfig bond0")) << "reads alone";
+    for (const unsigned int state : {9U, 16U, 2U}) {
+        EXPECT_EQ(bond->setProperty(123, number(state)).getStatus(), 0);
+    }
+    EXPECT_THAT(host.calls(), testing::IsSupersetOf({"ifconfig bond0 up", "ifconfig bond0 down"}));
+    EXPECT_THAT(capture.ownMessages(6000), TextsAre("IPConfigNode::setProperty: Invalid status request."));
 }
 
 }  // namespace

@@ -1,9 +1,13 @@
 #include "network/ipv4_writer.h"
 
 #include <gmock/gmock.h>
+#include <sys/mount.h>
+
+#include <new>
 
 #include "tests/network/port_host.h"
 #include "tests/support/command_lines.h"
+#include "tests/support/failing_new.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/no_descriptors.h"
 #include "tests/support/texts_are.h"
@@ -79,6 +83,70 @@ HOST_TEST(Origin, ThatCannotBeWrittenIsPassedOver) {
     EXPECT_EQ(host.read(kFile), "BOOTPROTO=dhcp\n");
     EXPECT_THAT(capture.ownMessages(6000), IsEmpty());
     EXPECT_THAT(capture.ownMessages(4000), TextsAre("IP Origin  = 3"));
+}
+
+HOST_TEST(Origin, OfAFileThatCannotBeReadToItsEndIsNotWritten) {
+    host.directory(kFile);
+    LogCapture capture;
+    IC::setIPOrigin("eth0", origin(3), kMac);
+    EXPECT_THAT(capture.ownMessages(),
+                TextsAre("setIPOrigin: entry", std::string("File open ") + kFile + " in read mode.",
+                         std::string("Could not read all of '") + kFile + "'.", "IP Origin  = 3",
+                         "setIPOrigin: exit"));
+}
+
+/// An interface file that fills its disk: not a line more fits.
+void fillDisk(FakeHost& host) {
+    host.directory("/etc/sysconfig/network");
+    ASSERT_EQ(mount("small", "/etc/sysconfig/network", "tmpfs", 0, "size=16k"), 0);
+    std::string content;
+    while (content.size() < 16384) {
+        content += "#23456789abcdef\n";
+    }
+    host.file(kFile, content);
+}
+
+HOST_TEST(Origin, SaysThatTheFileIsOpenBeforeItWrites) {
+    fillDisk(host);
+    LogCapture capture;
+    IC::setIPOrigin("eth0", origin(3), kMac);
+    EXPECT_THAT(capture.ownMessages(),
+                TextsAre("setIPOrigin: entry", std::string("File open ") + kFile + " in read mode.",
+                         "IP Origin  = 3", "File open '/etc/sysconfig/network' in write mode.",
+                         std::string("Could not write all of '") + kFile + "'.", "setIPOrigin: exit"));
+}
+
+HOST_TEST(Mask, SaysThatTheFileIsOpenBeforeItWrites) {
+    fillDisk(host);
+    host.tool("ifconfig eth0 netmask 255.255.0.0", "");
+    LogCapture capture;
+    IC::setSubnetMask("eth0", "255.255.0.0", kMac);
+    EXPECT_THAT(capture.ownMessages(),
+                TextsAre("Entering setSubnetMask", "Writing Subnet to File",
+                         std::string("Could not write all of '") + kFile + "'.", "Exiting setSubnetMask"));
+    EXPECT_EQ(capture.ownLines().at(2).function, "setSubnetMask");
+}
+
+HOST_TEST(Address, NeverCostsTheRestOfTheFileForWantOfMemory) {
+    const std::string head = "BOOTPROTO=static\nIPADDR=";
+    const std::string rest =
+        "\n# the line in the cellar, behind the second switch\nMTU=1500\nSTARTMODE='auto'\n";
+    long allocations = 0;
+    for (bool failed = true; failed; ++allocations) {
+        host.file(kFile, head + "192.0.2.1" + rest);
+        {
+            const FailingOnce once(allocations);
+            try {
+                IC::setIPv4Address("eth0", "192.0.2.77", kMac);
+            } catch (const std::bad_alloc&) {
+                // The node that called logs it.
+            }
+            failed = once.happened();
+        }
+        EXPECT_THAT(*host.read(kFile), testing::AnyOf(head + "192.0.2.1" + rest, head + "192.0.2.77" + rest))
+            << "allocation " << allocations;
+    }
+    EXPECT_GT(allocations, 10);
 }
 
 HOST_TEST(Address, IsWrittenAndLeftToTheNextStart) {

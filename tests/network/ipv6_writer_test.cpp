@@ -1,5 +1,7 @@
 #include "network/ipv6_writer.h"
 
+#include <sys/mount.h>
+
 #include "tests/network/killed_writer.h"
 #include "tests/support/command_lines.h"
 #include "tests/support/fake_host.h"
@@ -134,6 +136,24 @@ HOST_TEST(IPv6Address, FileIsTheOldOneWhenTheWriterIsKilledBeforeItWrites) {
     host.file(kInterface, "IPADDR_1=fd00::1\n");
     killBeforeItWrites(kInterface, [] { IC::setIPv6Address("eth0", "fd00::7", kMac); });
     EXPECT_EQ(host.read(kInterface), "IPADDR_1=fd00::1\n");
+}
+
+HOST_TEST(IPv6Address, SaysThatTheFileIsOpenBeforeItWrites) {
+    host.directory(kDirectory);
+    ASSERT_EQ(mount("small", kDirectory, "tmpfs", 0, "size=16k"), 0);
+    std::string content;
+    while (content.size() < 16384) {
+        content += "#23456789abcdef\n";
+    }
+    host.file(kInterface, content);
+    LogCapture capture;
+    IC::setIPv6Address("eth0", "fd00::7", kMac);
+    IC::setIPv6PrefixLength("eth0", 64, kMac);
+    const std::string full = std::string("Could not write all of '") + kInterface + "'.";
+    EXPECT_THAT(capture.messages(),
+                TextsAre("setIPv6Address: entry", "Writing IP Address", full, "setIPv6Address: exit",
+                         "setIPv6PrefixLength: entry", "File open '/etc/sysconfig/network' in write mode.",
+                         full, "setIPv6PrefixLength: exit"));
 }
 
 HOST_TEST(IPv6PrefixLength, IsReplacedOrAppendedInDecimal) {

@@ -1,5 +1,7 @@
 #include "network/saved_settings.h"
 
+#include <sys/mount.h>
+
 #include <cstdlib>
 
 #include "tests/network/killed_writer.h"
@@ -112,6 +114,19 @@ HOST_TEST(SavedSettings, AreTheOldOnesWhenTheDiskIsFull) {
     IC::createSettingData("eth0", {{"K", std::string(100000, 'v')}});
     EXPECT_EQ(capture.messages(6000).size(), 1U);
     EXPECT_EQ(host.read(kEth0), "K=old\n");
+}
+
+HOST_TEST(SavedSettings, AreToldBeforeTheyAreWritten) {
+    host.directory(kData);
+    ASSERT_EQ(mount("small", kData, "tmpfs", 0, "size=16k"), 0);
+    LogCapture capture;
+    const std::string value(20000, 'v');
+    IC::createSettingData("eth0", {{"K", value}});
+    EXPECT_THAT(capture.messages(),
+                TextsAre("createSettingData: entry", std::string("createSettingData: FileName ") + kEth0,
+                         "createSettingData: bufferK=" + value + "\n",
+                         std::string("Could not write all of '") + kEth0 + "'.", "createSettingData: exit"));
+    EXPECT_EQ(capture.lines().at(4).function, "createSettingData");
 }
 
 HOST_TEST(SavedSettings, AreTheOldOnesWhenTheWriterIsKilledBeforeItWrites) {

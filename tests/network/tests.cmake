@@ -31,6 +31,7 @@ corvista_test(network_nodes SOURCES
   network/ip_config_writer_test.cpp
   network/ipv4_writer_test.cpp
   network/lan_endpoint_test.cpp
+  support/failing_new.cpp
   LIBRARIES plugin_code test_support)
 
 corvista_test(network_ports SOURCES
