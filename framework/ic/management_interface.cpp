@@ -21,10 +21,11 @@ unsigned int requiredId(const Number& number, const char* what) {
     return number;
 }
 
-/// What the agent throws at a node counts as a refusal of that node alone.
-Error handOver(LoadCallBack load, Node* node, const void* context) {
+/// What the agent throws at a node is a failure with that node alone.
+template <class Call>
+Error tell(const Call& call) {
     try {
-        return load(node, context);
+        return call();
     } catch (const std::exception& failure) {
         return failed(failure.what());
     } catch (...) {
@@ -146,7 +147,7 @@ Error ManagementInterface::addNewNode(Node* node) {
     if (load == nullptr) {
         return {};  // the agent finds it in the map
     }
-    Error result = handOver(load, node, context);
+    Error result = tell([&] { return load(node, context); });
     if (result.getStatus() != Error::success) {
         refuse(handle);
     }
@@ -168,10 +169,14 @@ Error ManagementInterface::deleteNode(Node* node) {
     if (!listed && !refused) {
         return failed("deleteNode: no such node");
     }
+    Error result;
     if (listed && withdrawn != nullptr) {
-        withdrawn(*listed, context);
+        result = tell([&] {
+            withdrawn(*listed, context);
+            return Error();
+        });
     }
-    return {};
+    return result;
 }
 
 Node* ManagementInterface::getNode(unsigned int nodeId) const {

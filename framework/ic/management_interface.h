@@ -51,7 +51,7 @@ public:
     /// no MutableNode; it stays the caller's.
     virtual Error addNewNode(Node* node);
     /// Withdraws a node: out of the list at once, freed when the last operation on it has returned.
-    /// Failure when the node is not one of this interface's.
+    /// Failure when the node is not one of this interface's, or when the agent threw on hearing of it.
     virtual Error deleteNode(Node* node);
     /// The node with that id, or null. See getMap for how long the pointer is good.
     virtual Node* getNode(unsigned int nodeId) const;

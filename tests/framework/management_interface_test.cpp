@@ -219,6 +219,16 @@ TEST_F(ManagementInterfaceTest, ADeletedNodeLeavesTheListAtOnceAndMemoryWithItsL
     EXPECT_EQ(alive_, 1);
 }
 
+TEST_F(ManagementInterfaceTest, ANodeIsWithdrawnAlsoWhenTheAgentThrowsOnHearingOfIt) {
+    interface_.setWithdrawCallBack(
+        [](const Node&, const void*) { throw std::runtime_error("the agent is broken"); }, nullptr);
+    auto* const node = makeNode(2);
+    interface_.appendNode(node);
+    EXPECT_EQ(interface_.deleteNode(node).text(), "the agent is broken");
+    EXPECT_THAT(map(), ElementsAre());
+    EXPECT_EQ(alive_, 0);
+}
+
 TEST_F(ManagementInterfaceTest, CallbacksMayCallBack) {
     connect();
     agent_.interface = &interface_;

@@ -337,6 +337,16 @@ HOST_TEST(Lifecycle, LogsANodeAtWhichTheAgentThrowsAndGoesOn) {
     IC::myoshwmi.unload();
 }
 
+HOST_TEST(Lifecycle, WithdrawsTheNextNodeAlsoWhenTheAgentThrowsAtOne) {
+    host.tool("fdisk -ls", "Disk /dev/sda: 1 GB, 1000 bytes\nDisk /dev/sdb: 1 GB, 1000 bytes\n");
+    initialize(IC::myoshwmi);
+    IC::myoshwmi.setWithdrawCallBack([](const IC::Node&, const void*) { throw 7; }, nullptr);
+    IC::myoshwmi.HDDThreadProcess();
+    EXPECT_EQ(Access::drives().size(), 2U);
+    EXPECT_THAT(nodesOfType(IC::myoshwmi, 11), testing::SizeIs(2)) << "the new ones alone";
+    IC::myoshwmi.unload();
+}
+
 HOST_TEST(Lifecycle, WaitsForAWalkThatIsUnderWayBeforeItFreesTheNodes) {
     host.toolInTurn("brctl show", {{""}, {""}, {"", 0, "", 1000}});  // start-up asks twice
     initialize(IC::myoshwmi);
