@@ -297,6 +297,18 @@ HOST_TEST(PortWalk, SavesTheResolverAnewForANewInterfaceAndLeavesTheOldFilesAlon
     EXPECT_EQ(PortHost::stored(*plugin.config("eth0"), 94), texts({"192.0.2.53", "192.0.2.54"}));
 }
 
+HOST_TEST(PortWalk, KeepsTheSettingsOfAnInterfaceThatIsGoneUntilTheStop) {
+    PortHost plugin(host, "suse-two-nics");
+    plugin.build();
+    const std::string devices = *host.read("/proc/net/dev");
+    const auto old = host.read("/opt/vantrel/corvista/data/ifcfg-eth1");
+    host.file("/proc/net/dev", devices.substr(0, devices.find("  eth1:")));
+    plugin.mi().createNetworkPortNodes(true);
+    EXPECT_EQ(host.read("/opt/vantrel/corvista/data/ifcfg-eth1"), old);
+    plugin.mi().unload();
+    EXPECT_THAT(host.listDirectory("/opt/vantrel/corvista/data"), IsEmpty());
+}
+
 HOST_TEST(PortWalk, SaysWhatItDoes) {
     PortHost plugin(host, "vlans");
     LogCapture capture;
