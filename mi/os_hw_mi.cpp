@@ -64,8 +64,13 @@ Error OsHwMI::initialize(unsigned int miId, const Number& ownNodeId, const Numbe
     initializing_ = 1;
     guarded("updateHostAndDomainName", [&] { updateHostAndDomainName(); });
     OSHWMI::myerr = {Error::failure, Number(), ""};  // what stays when the base throws
-    guarded("ManagementInterface::initialize",
-            [&] { OSHWMI::myerr = ManagementInterface::initialize(miId, ownNodeId, firstNodeId); });
+    const char* const function = __func__;  // in the closure it would be another
+    guarded("ManagementInterface::initialize", [&] {
+        OSHWMI::myerr = ManagementInterface::initialize(miId, ownNodeId, firstNodeId);
+        if (OSHWMI::myerr.getStatus() != 0) {
+            log(kError, function) << "ManagementInterface::initialize failed: " << OSHWMI::myerr;
+        }
+    });
     for (const Step& step : kStartUp) {
         guarded(step.name, [&] { step.run(*this); });
     }

@@ -44,7 +44,9 @@ void OsHwMI::withdrawStorageNodes(const StorageKind& kind) {
         // The framework owns the nodes and frees one when its last reader has gone: the list never holds one
         // that has been withdrawn, nor loses one that has not, whatever the agent throws.
         nodes.erase(nodes.begin());
-        deleteNode(old);
+        if (const Error result = deleteNode(old); result.getStatus() != 0) {
+            log(kError) << "deleteNode error = " << result;
+        }
     }
 }
 

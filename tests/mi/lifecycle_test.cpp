@@ -262,8 +262,11 @@ HOST_TEST(Lifecycle, KnowsNoPortBeforeItsStart) {
 }
 
 HOST_TEST(Lifecycle, KeepsTheBaseResultAndGoesOnWhenTheBaseFails) {
+    LogCapture capture;
     const IC::Error result = IC::myoshwmi.initialize(1, Number(), Number());
     EXPECT_NE(result.getStatus(), 0);
+    EXPECT_THAT(capture.ownMessages(6000),
+                testing::ElementsAre("ManagementInterface::initialize failed: " + result.text()));
     EXPECT_EQ(IC::OSHWMI::myerr.getStatus(), result.getStatus());
     EXPECT_TRUE(IC::OSHWMI::bInitflag);
     EXPECT_EQ(IC::myoshwmi.holdAll().size(), 7U);
@@ -341,7 +344,10 @@ HOST_TEST(Lifecycle, WithdrawsTheNextNodeAlsoWhenTheAgentThrowsAtOne) {
     host.tool("fdisk -ls", "Disk /dev/sda: 1 GB, 1000 bytes\nDisk /dev/sdb: 1 GB, 1000 bytes\n");
     initialize(IC::myoshwmi);
     IC::myoshwmi.setWithdrawCallBack([](const IC::Node&, const void*) { throw 7; }, nullptr);
+    LogCapture capture;
     IC::myoshwmi.HDDThreadProcess();
+    EXPECT_THAT(capture.ownMessages(6000), testing::ElementsAre("deleteNode error = unknown exception",
+                                                                "deleteNode error = unknown exception"));
     EXPECT_EQ(Access::drives().size(), 2U);
     EXPECT_THAT(nodesOfType(IC::myoshwmi, 11), testing::SizeIs(2)) << "the new ones alone";
     IC::myoshwmi.unload();
