@@ -1,4 +1,6 @@
 // The fingerprints of the disk snapshot, and what a pass of the drive monitor does with them.
+#include <unistd.h>
+
 #include "mi/disk_snapshot.h"
 #include "mi/log.h"
 #include "mi/my_process.h"
@@ -56,6 +58,11 @@ void takeFingerprints(const Extract& extract, FingerprintPair& pair, bool keepCu
     }
 }
 
+/// Where the shell cannot write the snapshot, an old one stands there, or none: neither is the layout of now.
+bool isSnapshotWritable() {
+    return access(diskSnapshotPath, W_OK) == 0;
+}
+
 /// What a killed command printed is not the layout: nodes may be missing, so the next pass builds them again.
 template <class Rebuild>
 void rebuildIfDifferent(const Extract& extract, FingerprintPair& pair, Rebuild rebuild) {
@@ -87,7 +94,7 @@ void OsHwMI::Partition_Checksum(bool keepCurrent) {
 // drive and partition published once after start.
 void OsHwMI::HDDThreadProcess() {
     const LogScope scope("Hard Drive ThreadProcess :: Entry", "Hard Drive ThreadProcess :: Exit");
-    if (!takeDiskSnapshot()) {
+    if (!takeDiskSnapshot() || !isSnapshotWritable()) {
         return;
     }
     const unsigned int before = commandsCutOff();

@@ -173,6 +173,21 @@ HOST_TEST_F(LayoutComparison, ASnapshotThatCannotBeTakenSkipsThePass) {
     EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda", "withdrawn /dev/sda1")) << "retried by the next";
 }
 
+HOST_TEST_F(LayoutComparison, ASnapshotThatCannotBeWrittenSkipsThePass) {
+    startWith(host, kLayout);
+    host.remove(IC::diskSnapshotPath);
+    host.readOnly("/tmp");
+    LogCapture log;
+    pass(host, kLayout);
+    EXPECT_THAT(diary(), IsEmpty());
+    EXPECT_EQ(commands(), std::vector<std::string>{kSnapshot});
+    EXPECT_THAT(log.messages(),
+                TextsAre("Hard Drive ThreadProcess :: Entry", "Hard Drive ThreadProcess :: Exit"));
+    host.restore("/tmp");
+    pass(host, kLayout + kSecond);
+    EXPECT_EQ(partitions().size(), 2U) << "retried by the next";
+}
+
 HOST_TEST_F(LayoutComparison, WithoutMd5sumChangesAreFoundBySha1Alone) {
     host.remove("/usr/bin/md5sum");
     LogCapture log;
