@@ -1,5 +1,6 @@
 #include "tests/storage/storage_host.h"
 
+#include <chrono>
 #include <fstream>
 #include <sstream>
 #include <thread>
@@ -73,6 +74,21 @@ bool fileLockIsHeld() {
         }
     }).join();
     return !taken;
+}
+
+bool fileLockIsFreeWhile(FakeHost& host, const std::string& toolRuns) {
+    const auto wait = [] { std::this_thread::sleep_for(std::chrono::milliseconds(1)); };
+    while (host.callsOf(toolRuns).empty()) {
+        wait();
+    }
+    bool held = fileLockIsHeld();  // still, perhaps: the tool may run before its starter does again
+    const auto giveUp = std::chrono::steady_clock::now() + std::chrono::seconds(10);
+    while (held && std::chrono::steady_clock::now() < giveUp) {
+        wait();
+        held = fileLockIsHeld();
+    }
+    host.file("/go-on", "");
+    return !held;
 }
 
 std::vector<std::string> withoutPropertyLines(const std::vector<std::string>& messages) {

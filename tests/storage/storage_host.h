@@ -24,6 +24,12 @@ void forgetCommands();
 /// Whether the plug-in's file lock is held by somebody at this moment.
 bool fileLockIsHeld();
 
+/// What keeps a tool of the fake host running until it may go on.
+inline constexpr char kUntilItMayGoOn[] = "until [ -e /go-on ]; do sleep 0.01; done";
+/// Waits for such a tool to start and lets it go on as soon as nobody holds the plug-in's file lock.
+/// @return false when the lock was held all the time
+bool fileLockIsFreeWhile(FakeHost& host, const std::string& toolRuns);
+
 /// The lines of a log without the messages that nodes write when a property is stored or read.
 std::vector<std::string> withoutPropertyLines(const std::vector<std::string>& messages);
 
