@@ -13,8 +13,6 @@ namespace {
 
 constexpr std::size_t kLongestLabel = 63;
 constexpr std::size_t kLongestDomain = 253;
-// Line files are read 511 characters at a time; a longer search line would come back in pieces.
-constexpr std::size_t kLongestSearchLine = 511 - std::string_view("search\n").size();
 
 bool isDigit(char c) {
     return c >= '0' && c <= '9';
@@ -154,12 +152,7 @@ Value domainName(const Property& /*property*/, Words words) {
 }
 
 Value dnsSuffixes(const Property& /*property*/, Words words) {
-    std::size_t length = 0;
-    for (const std::string& word : words) {
-        length += 1 + word.size();
-    }
-    const auto good = [](const std::string& word) { return isDomain(word); };
-    return length <= kLongestSearchLine ? asList(words, good) : std::nullopt;
+    return asList(words, [](const std::string& word) { return isDomain(word); });
 }
 
 }  // namespace cvagent::check

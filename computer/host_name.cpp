@@ -30,9 +30,9 @@ bool setRunningName(const std::string& hostName, const std::string& domainName) 
     const auto command = domainName.empty()
                              ? formatCommand("hostname %s", hostName.c_str())
                              : formatCommand("hostname %s.%s", hostName.c_str(), domainName.c_str());
-    if (command) {
-        log(kProgress) << "command: " << *command;
-    }
+    // One that is too long to be run is told all the same.
+    const std::string wanted = "hostname " + (domainName.empty() ? hostName : hostName + '.' + domainName);
+    log(kProgress) << "command: " << command.value_or(wanted);
     if (!HostCommand(command).started()) {
         log(kError) << "Could not set HostName !!";
         return false;

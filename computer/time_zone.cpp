@@ -3,7 +3,10 @@
 #include <unistd.h>
 
 #include <cstdio>
+#include <filesystem>
+#include <optional>
 #include <string>
+#include <system_error>
 
 #include "computer/zone_table.h"
 #include "mi/command.h"
@@ -35,6 +38,12 @@ bool replaceFirst(LineFile& file, const char* key, const std::string& replacemen
     return replaced;
 }
 
+/// The copy's lines. A directory in its place has none, and taking that back would empty the clock file.
+std::optional<LineFile> readCopy() {
+    std::error_code unknown;
+    return std::filesystem::is_directory(kClockCopy, unknown) ? std::nullopt : LineFile::read(kClockCopy);
+}
+
 /// Writes the changed lines to the copy and the copy back. Each way is left out when a file of its cannot be
 /// opened. A copy that is not whole, for want of room, is not taken back.
 void rewriteClock(const std::string& timezoneLine) {
@@ -43,7 +52,7 @@ void rewriteClock(const std::string& timezoneLine) {
         replaceFirst(*clock, "TIMEZONE", timezoneLine);
         written = clock->replace(kClockCopy);
     }
-    const auto copy = LineFile::read(kClockCopy);
+    const auto copy = readCopy();
     if (copy && written != LineFile::Written::notWhole) {
         copy->write(kClockFile);
     }
@@ -70,6 +79,7 @@ bool switchLocalTime(const std::string& zoneFile) {
 }  // namespace
 
 bool setTimezone(unsigned int offset) {
+    const Operation operation;
     log(kProgress) << "setTimezone: enter";
     const Zone* zone = findZone(offset);
     if (zone == nullptr) {
@@ -87,7 +97,7 @@ bool setTimezone(unsigned int offset) {
 bool setAutoDSTEnabled(bool utc) {
     const LogScope scope;
     HostCommand::fromText(std::string("/bin/cp ") + kClockFile + " " + kClockCopy);
-    auto copy = LineFile::read(kClockCopy);
+    auto copy = readCopy();
     bool replaced = false;
     // Whether cp did its work is not asked: without it, a copy that was left behind becomes the clock file.
     if (copy && !isCutShort(*copy)) {

@@ -20,6 +20,13 @@ enum ProcessorProperty : unsigned int {
 constexpr char kListProcessors[] = "cat /proc/cpuinfo 2> /dev/null |grep processor 2> /dev/null ";
 constexpr std::size_t kLongestLine = 127;
 
+/// Whether a row that `grep` found is a processor's: the word also stands in the names of models ("Common KVM
+/// processor").
+bool isProcessor(const std::string& row) {
+    const std::string key = row.substr(0, row.find(':'));
+    return key.substr(0, key.find_last_not_of(" \t") + 1) == "processor";
+}
+
 /// The k-th speed that the kernel tells is the k-th processor's.
 void describeProcessors(const std::map<unsigned int, MutableNode*>& processors) {
     std::ifstream cpuinfo("/proc/cpuinfo");
@@ -51,6 +58,9 @@ void OsHwMI::createCpuNodeAndMap() {
     while (const auto line = command.nextLine(kLongestLine)) {
         if (!contains(*line, ":")) {
             logCpu(kError) << "Invalid format: buffer = " << *line;
+            continue;
+        }
+        if (!isProcessor(*line)) {
             continue;
         }
         auto* processor = makeNode<MutableNode>(tree_.planar, NodeType::processor, number);

@@ -81,13 +81,12 @@ void OsHwMI::sendAlert(const Alert& alert) {
     if (receiver.first == nullptr) {
         return;
     }
-    const char* const function = __func__;  // in the closure it would be another
     // An alert that went wrong is not sent again, and the next interface's goes out.
     contained([&] {
         const auto [handler, context] = receiver;
         Error result = OSHWMI_IND::myerr;
         result = handler({alert}, context);
-        logInd(kProgress, function) << "checkAndSendNetAlert: _alerthandler return code" << result;
+        logInd(kProgress) << "checkAndSendNetAlert: _alerthandler return code" << result;
     });
 }
 

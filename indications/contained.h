@@ -9,14 +9,13 @@ namespace IC {
 
 /// Runs work that others have a hand in: what it throws is logged and goes no further.
 template <class Work>
-void contained(Work work, const char* function = __builtin_FUNCTION()) {
+void contained(Work work) {
     try {
         work();
     } catch (const std::exception& failure) {
-        logInd(kError, function) << "OsHwMIInd Caught " << failure.what() << " Type "
-                                 << typeid(failure).name();
+        logInd(kError) << "OsHwMIInd Caught " << failure.what() << " Type " << typeid(failure).name();
     } catch (...) {
-        logInd(kError, function) << "OsHwMIInd Caught unknown exception";
+        logInd(kError) << "OsHwMIInd Caught unknown exception";
     }
 }
 

@@ -76,6 +76,7 @@ void OsHwMI::createCurNetNodeMap() {
 }
 
 unsigned int OsHwMI::bondedNetNodeStatus(const std::string& bond) {
+    const Operation operation;
     logInd(kProgress) << "bondedNetNodeStatus: entry";
     HostCommand command(formatCommand(
         "cat /proc/net/bonding/%s 2> /dev/null | grep \"Slave Interface: \" 2> /dev/null", bond.c_str()));

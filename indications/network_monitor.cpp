@@ -35,7 +35,7 @@ void NetworkMonitor::stop() {
 }
 
 void* NetworkMonitor::run(void*) {
-    logInd(kProgress) << "NetworkMonitor: run entry";
+    const LogScope scope("NetworkMonitor: run entry", "NetworkMonitor: run exit", indicationsLogSource);
     while (!ending()) {
         contained([this] { pass(); });
         OSHWMI_IND::slaves.clear();
@@ -45,7 +45,6 @@ void* NetworkMonitor::run(void*) {
     }
     done_ = true;
     ended_->signal();
-    logInd(kProgress) << "NetworkMonitor: run exit";
     return nullptr;
 }
 
@@ -71,17 +70,16 @@ void OsHwMI::enableIndications() {
             }
         }
     } atTheEnd;
-    const char* const function = __func__;  // in the closure it would be another
-    contained([this, function] {
-        logInd(kProgress, function) << "Creating NetworkMonitor thread.";
+    contained([this] {
+        logInd(kProgress) << "Creating NetworkMonitor thread.";
         networkMonitorEnded_.wait(0);  // an earlier monitor's end is not this one's
         auto monitor = std::make_unique<NetworkMonitor>(&networkMonitorEnded_);
         if (!monitor->start(nullptr)) {
-            logInd(kError, function) << "NetworkMonitor thread failed.";
+            logInd(kError) << "NetworkMonitor thread failed.";
             return;
         }
         networkMonitor_ = monitor.release();
-        logInd(kProgress, function) << "NetworkMonitor thread created.";
+        logInd(kProgress) << "NetworkMonitor thread created.";
     });
 }
 

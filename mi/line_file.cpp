@@ -4,8 +4,10 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <filesystem>
 #include <fstream>
 #include <string_view>
+#include <system_error>
 #include <utility>
 
 #include "mi/log.h"
@@ -58,12 +60,12 @@ private:
     int descriptor_;
 };
 
-}  // namespace
-
-bool LineFile::isTooLong(const std::string& line) {
-    const std::size_t length = line.ends_with('\n') ? line.size() - 1 : line.size();
-    return length > longestLine;
+bool isDirectory(const std::string& path) {
+    std::error_code unknown;
+    return std::filesystem::is_directory(path, unknown);
 }
+
+}  // namespace
 
 std::optional<LineFile> LineFile::read(const std::string& path) {
     std::ifstream in(path);
@@ -74,7 +76,7 @@ std::optional<LineFile> LineFile::read(const std::string& path) {
     for (std::string line; std::getline(in, line);) {
         file.lines_.push_back(in.eof() ? line : line + '\n');
     }
-    return in.bad() ? std::nullopt : std::optional(std::move(file));
+    return in.bad() && !isDirectory(path) ? std::nullopt : std::optional(std::move(file));
 }
 
 void LineFile::endLastLine() {

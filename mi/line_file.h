@@ -1,6 +1,5 @@
 #pragma once
 
-#include <cstddef>
 #include <functional>
 #include <optional>
 #include <string>
@@ -16,14 +15,10 @@ public:
     /// What becomes of a line.
     enum class Fate { keep, drop };
 
-    /// Rules see no line longer than this (characters, without the line break): such a line is kept as it is,
-    /// for a tool's own line buffer would tear it in two and half of it could be taken for a key.
-    static constexpr std::size_t longestLine = 512;
-    static bool isTooLong(const std::string& line);
-
     LineFile() = default;  ///< no lines
-    /// The lines of a file; nothing when it cannot be opened for reading, or not read to its end: rewriting
-    /// it would lose the rest.
+    /// The lines of a file, however long; nothing when it cannot be opened for reading, or not read to its
+    /// end: rewriting it would lose the rest. A directory opens and has no lines: what is in its way is told
+    /// by whoever then writes.
     static std::optional<LineFile> read(const std::string& path);
 
     /// Calls `rule(std::string& line)` for every line in order. The line carries its line break, which the
@@ -32,7 +27,7 @@ public:
     void rewrite(Rule rule) {
         std::vector<std::string> kept;
         for (std::string& line : lines_) {
-            if (isTooLong(line) || rule(line) == Fate::keep) {
+            if (rule(line) == Fate::keep) {
                 kept.push_back(std::move(line));
             }
         }

@@ -4,6 +4,24 @@
 
 namespace IC {
 
+namespace {
+
+thread_local const char* operation = nullptr;  // null outside all operations
+
+}  // namespace
+
+Operation::Operation(const char* function) : outer_(operation) {
+    operation = function;
+}
+
+Operation::~Operation() {
+    operation = outer_;
+}
+
+const char* Operation::nameOr(const char* function) {
+    return operation != nullptr ? operation : function;
+}
+
 LogLine::~LogLine() {
     try {
         const std::string message = buffer_.str();
@@ -21,13 +39,14 @@ LogScope::LogScope(const char* name, const LogSource& source, const char* functi
       exitEnd_(": exit"),
       source_(source),
       function_(function),
-      line_(line) {
+      line_(line),
+      operation_(function) {
     LogLine(source_, kProgress, function_, line_) << exit_ << ": entry";
 }
 
 LogScope::LogScope(const char* entry, const char* exit, const LogSource& source, const char* function,
                    int line)
-    : exit_(exit), exitEnd_(""), source_(source), function_(function), line_(line) {
+    : exit_(exit), exitEnd_(""), source_(source), function_(function), line_(line), operation_(function) {
     LogLine(source_, kProgress, function_, line_) << entry;
 }
 

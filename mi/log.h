@@ -68,15 +68,32 @@ private:
     CVLog::CVMessageBuffer buffer_;
 };
 
+/// Names the operation that runs on this thread until the scope is left: its log lines carry that name,
+/// whichever helper, template or closure writes them, for that is the name readers of the log look up. A
+/// LogScope does it by itself; an operation without one that logs needs this.
+class Operation {
+public:
+    explicit Operation(const char* function = __builtin_FUNCTION());
+    Operation(const Operation&) = delete;
+    Operation& operator=(const Operation&) = delete;
+    ~Operation();
+
+    /// The innermost operation of this thread; `function` outside all of them.
+    static const char* nameOr(const char* function);
+
+private:
+    const char* outer_;
+};
+
 // A line of each source. The last two arguments are the caller's function name and line: leave them out.
 inline LogLine log(int level, const char* function = __builtin_FUNCTION(), int line = __builtin_LINE()) {
-    return {mainLogSource, level, function, line};
+    return {mainLogSource, level, Operation::nameOr(function), line};
 }
 inline LogLine logInd(int level, const char* function = __builtin_FUNCTION(), int line = __builtin_LINE()) {
-    return {indicationsLogSource, level, function, line};
+    return {indicationsLogSource, level, Operation::nameOr(function), line};
 }
 inline LogLine logCpu(int level, const char* function = __builtin_FUNCTION(), int line = __builtin_LINE()) {
-    return {processorsLogSource, level, function, line};
+    return {processorsLogSource, level, Operation::nameOr(function), line};
 }
 
 /// Writes "<name>: entry" now and "<name>: exit" when the scope is left. Without a name it takes the
@@ -99,6 +116,7 @@ private:
     const LogSource& source_;
     const char* function_;
     int line_;
+    Operation operation_;
 };
 
 }  // namespace IC

@@ -52,6 +52,7 @@ FILE* MyProcess::mypopen(const char* command, const char* mode) {
 }
 
 FILE* MyProcess::mypopen(std::string command, const char* mode) {
+    const Operation operation;
     mypopen(command.c_str(), mode);
     log(kProgress) << "mypopen():  Count value " << cnt.load();
     return pipe_;

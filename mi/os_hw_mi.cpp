@@ -64,11 +64,10 @@ Error OsHwMI::initialize(unsigned int miId, const Number& ownNodeId, const Numbe
     initializing_ = 1;
     guarded("updateHostAndDomainName", [&] { updateHostAndDomainName(); });
     OSHWMI::myerr = {Error::failure, Number(), ""};  // what stays when the base throws
-    const char* const function = __func__;           // in the closure it would be another
     guarded("ManagementInterface::initialize", [&] {
         OSHWMI::myerr = ManagementInterface::initialize(miId, ownNodeId, firstNodeId);
         if (OSHWMI::myerr.getStatus() != 0) {
-            log(kError, function) << "ManagementInterface::initialize failed: " << OSHWMI::myerr;
+            log(kError) << "ManagementInterface::initialize failed: " << OSHWMI::myerr;
         }
     });
     for (const Step& step : kStartUp) {

@@ -20,6 +20,12 @@ std::string trimEnd(std::string text, char unwanted = '\n');
 /// `text` without the `unwanted` characters at its start.
 std::string trimStart(std::string text, char unwanted = ' ');
 
+/// A number as "%d" prints it: what an int does not hold comes out negative, as the readers of these files
+/// have always found it.
+inline std::string signedDecimal(unsigned int number) {
+    return std::to_string(static_cast<int>(number));
+}
+
 inline bool contains(std::string_view text, std::string_view part) {
     return text.find(part) != std::string_view::npos;
 }

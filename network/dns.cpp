@@ -111,7 +111,6 @@ void executeDNSChanges(std::vector<std::string> values, bool servers) {
 }
 
 void disableNetConfigDNSPolicy(PropertyValue origin) {
-    const char* const function = __func__;  // in the closure it would be another
     const LogScope scope("disableNetConfigDNSPolicy: Entering", "disableNetConfigDNSPolicy: exit");
     const unsigned int code = originCode(origin);
     log(kProgress) << "bootproto: " << code;
@@ -123,9 +122,9 @@ void disableNetConfigDNSPolicy(PropertyValue origin) {
     file->rewrite([&](std::string& line) {
         if (contains(line, kPolicy)) {
             setPolicy(line, code);
-            log(kProgress, function) << "buffer: " << line;
-            log(kProgress, function) << "DHCP: " << EnumValue(IPOrigin::dhcp);
-            log(kProgress, function) << "Static: " << EnumValue(IPOrigin::fixed);
+            log(kProgress) << "buffer: " << line;
+            log(kProgress) << "DHCP: " << EnumValue(IPOrigin::dhcp);
+            log(kProgress) << "Static: " << EnumValue(IPOrigin::fixed);
             found = true;
         }
         return Fate::keep;

@@ -22,6 +22,7 @@ bool turnOnIPv6() {
 }  // namespace
 
 bool enableIPv6ForESX() {
+    const Operation operation;
     log(kProgress) << "Entering enableIPv6ForESX";
     const bool enabled = turnOnIPv6();
     log(kProgress) << "enableIPv6ForESX Returned : " << enabled;

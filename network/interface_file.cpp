@@ -52,10 +52,10 @@ std::string InterfaceFile::lastLine() const {
     return file_.lines().empty() ? "" : file_.lines().back();
 }
 
-bool InterfaceFile::write(const char* opened, const char* function) const {
+bool InterfaceFile::write(const char* opened) const {
     const auto tell = [&] {
         if (opened != nullptr) {
-            log(kChange, function) << opened;
+            log(kChange) << opened;
         }
     };
     return isWhole_ && file_.write(path_, tell);

@@ -45,9 +45,8 @@ public:
     /// The last line as it stands now; "" when there is none.
     std::string lastLine() const;
     /// @param opened logged once the file is open, before anything is written; null for nothing
-    /// @param function that the line is of; leave it out
     /// @return whether the file could be opened for writing; it is the old one when not
-    bool write(const char* opened = nullptr, const char* function = __builtin_FUNCTION()) const;
+    bool write(const char* opened = nullptr) const;
 
 private:
     std::string path_;

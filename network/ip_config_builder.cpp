@@ -1,5 +1,6 @@
 #include "network/ip_config_builder.h"
 
+#include "mi/text.h"
 #include "network/address_queries.h"
 #include "network/dhcp_queries.h"
 #include "network/ip_facts.h"
@@ -64,7 +65,7 @@ void fillIPv6(Config& node, Settings& settings) {
     getIPv6AddressType(node.name(), kind);
     node.setProperty(Config::ipv6AddressType, {EnumValue(kind), true});
     settings.emplace("IPV6ADDR", address);
-    settings.emplace("PREFIX", std::to_string(prefixLength));
+    settings.emplace("PREFIX", signedDecimal(prefixLength));
 }
 
 void fillNames(Config& node, const HostFacts& host) {

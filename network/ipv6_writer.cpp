@@ -21,7 +21,7 @@ void setIPv6Address(std::string, std::string address, std::string mac) {
 
 void setIPv6PrefixLength(std::string, unsigned int prefixLength, std::string mac) {
     const LogScope scope;
-    KeyLine length{"PREFIXLEN_", "PREFIXLEN_1=" + std::to_string(prefixLength) + '\n'};
+    KeyLine length{"PREFIXLEN_", "PREFIXLEN_1=" + signedDecimal(prefixLength) + '\n'};
     InterfaceFile file(mac);
     file.replace({&length});
     file.appendMissing({&length});

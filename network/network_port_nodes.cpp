@@ -42,12 +42,13 @@ void OsHwMI::walkInterfaces() {
                                                        {"DOMAINNAME", host.domainName},
                                                        {"DNSSERVERS", servers},
                                                        {"DNSSUFFIXES", suffixes}};
+    const std::set<std::string> bridges = PortWalk::bridgesOf(listing);
     PortWalk::logIPv6();
     const PortWalk walk(std::move(host), std::move(bridgeMembers));
     unsigned int index = 0;
     for (const std::string& line : listing) {
         try {
-            visitInterface(PortWalk::interfaceOf(line), walk, shared, index);
+            visitInterface(PortWalk::interfaceOf(line, bridges), walk, shared, index);
         } catch (const std::exception& failure) {
             logPortFailure(failure);
         }
@@ -91,7 +92,7 @@ MutableNode* OsHwMI::createIPConfig(const ListedInterface& interface, const Muta
     auto* config = makeNode<IPConfigNode>(&parent, NodeType::ipConfiguration, index, interface.name);
     appendNode(config);
     log(kProgress) << "Size of Inteface  " << static_cast<unsigned int>(walk.bridgeMemberCount());
-    config->setDescription(interface.fromBridgeListing ? "Bridge" : "IP Configuration");
+    config->setDescription(interface.isBridge ? "Bridge" : "IP Configuration");
     fillIPConfig(*config, walk.host(), settings);
     return config;
 }

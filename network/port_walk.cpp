@@ -24,6 +24,16 @@ constexpr char kListInterfaces[] =
     "/dev/null; cat /tmp/__tmp; rm /tmp/__tmp";
 constexpr char kZeroAddress[] = "00:00:00:00:00:00";
 
+/// Only /proc/net/dev prints colons; in the name of an interface there is none.
+bool isOfBridgeListing(const std::string& line) {
+    return !contains(line, ":");
+}
+
+/// What stands before the first blank or tab.
+std::string firstColumn(const std::string& line) {
+    return line.substr(0, line.find_first_of(" \t\n"));
+}
+
 bool isVMware() {
     struct stat release {};
     return stat("/etc/vmware-release", &release) == 0;
@@ -63,10 +73,25 @@ std::vector<std::string> PortWalk::list() {
     return lines;
 }
 
-ListedInterface PortWalk::interfaceOf(const std::string& line) {
+std::set<std::string> PortWalk::bridgesOf(const std::vector<std::string>& listing) {
+    std::set<std::string> bridges;
+    for (const std::string& line : listing) {
+        // The row of a bridge's second member and of those behind it has no name in front.
+        if (std::string name = firstColumn(line); isOfBridgeListing(line) && !name.empty()) {
+            bridges.insert(std::move(name));
+        }
+    }
+    return bridges;
+}
+
+ListedInterface PortWalk::interfaceOf(const std::string& line, const std::set<std::string>& bridges) {
     ListedInterface found;
     getNICString(trimStart(trimStart(line), '\t'), found.name);
-    found.fromBridgeListing = !contains(line, ":");  // only /proc/net/dev prints colons
+    if (isOfBridgeListing(line)) {
+        // A bridge whose name has no "br" in it came with its whole row.
+        found.name = firstColumn(found.name);
+    }
+    found.isBridge = bridges.contains(found.name);
     return found;
 }
 
@@ -93,9 +118,9 @@ bool PortWalk::hasIPConfig(const std::string& name) {
     return firstLine(formatCommand("ifconfig -a | grep %s 2> /dev/null", name.c_str())).line.has_value();
 }
 
-void logPortFailure(const std::exception& failure, const char* function) {
-    log(kError, function) << "NetworkPort error";
-    log(kError, function) << failure.what();
+void logPortFailure(const std::exception& failure) {
+    log(kError) << "NetworkPort error";
+    log(kError) << failure.what();
 }
 
 }  // namespace IC

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <exception>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -13,7 +14,7 @@ namespace IC {
 /// A line of the interface listing.
 struct ListedInterface {
     std::string name;
-    bool fromBridgeListing;  ///< from `brctl show`, as opposed to /proc/net/dev
+    bool isBridge;  ///< names a row of `brctl show`, wherever it was listed first
 };
 
 /// The output of `ifconfig`, kept in ifconfigSnapshotPath for the length of a walk.
@@ -33,7 +34,9 @@ public:
 
     /// The lines of the listing of all interfaces, in the order the host prints them.
     static std::vector<std::string> list();
-    static ListedInterface interfaceOf(const std::string& line);
+    /// The names in the first column of the bridges' rows.
+    static std::set<std::string> bridgesOf(const std::vector<std::string>& listing);
+    static ListedInterface interfaceOf(const std::string& line, const std::set<std::string>& bridges);
     /// Logs whether the kernel has IPv6.
     static void logIPv6();
 
@@ -57,6 +60,6 @@ private:
 };
 
 /// Logs what went wrong on a walk, which nobody else hears of.
-void logPortFailure(const std::exception& failure, const char* function = __builtin_FUNCTION());
+void logPortFailure(const std::exception& failure);
 
 }  // namespace IC

@@ -16,12 +16,6 @@ bool isComment(const std::string& line) {
     return contains(line, "#");
 }
 
-/// Whether the file is worth keeping for this line. One that is too long to be looked into counts, so that it
-/// is never thrown away with the comments.
-bool isWorthKeeping(const std::string& line) {
-    return LineFile::isTooLong(line) || !isComment(line);
-}
-
 }  // namespace
 
 RoutesRewrite replaceDefaultRoute(AddressFamily family, const std::string& gateway) {
@@ -30,7 +24,7 @@ RoutesRewrite replaceDefaultRoute(AddressFamily family, const std::string& gatew
         return RoutesRewrite::notRead;
     }
     const bool isIPv6 = family == AddressFamily::ipv6;
-    if (std::ranges::any_of(file->lines(), isWorthKeeping)) {
+    if (!std::ranges::all_of(file->lines(), isComment)) {
         file->rewrite([&](const std::string& line) {
             const bool stays = isComment(line) || isIPv6GatewayAddressPresent(line) != isIPv6;
             return stays ? LineFile::Fate::keep : LineFile::Fate::drop;

@@ -11,12 +11,27 @@ namespace {
 
 constexpr char kDirectory[] = "/opt/vantrel/corvista/data";
 
+std::string pathOf(const std::string& name) {
+    return std::string(kDirectory) + "/ifcfg-" + name;
+}
+
+/// Whether a file of this name would be somewhere else.
+bool leadsAway(const std::string& name) {
+    return contains(name, "/") || contains(name, "..");
+}
+
+/// Whether a line that `ls` printed is one of our files. Of a directory it lists what is in there, and a name
+/// with a line break comes as two lines: none of that may be removed from wherever the agent stands.
+bool isSavedFile(const std::string& path) {
+    const std::string start = pathOf("");
+    return path.starts_with(start) && !contains(path.substr(start.size()), "/");
+}
+
 }  // namespace
 
 void createSettingData(std::string name, std::map<std::string, std::string> settings) {
     const LogScope scope;
-    const char* const function = __func__;  // in the closure it would be another
-    const std::string path = std::string(kDirectory) + "/ifcfg-" + name;
+    const std::string path = pathOf(name);
     log(kProgress) << "createSettingData: FileName " << path;
     LineFile file;
     for (const auto& [key, value] : settings) {
@@ -24,10 +39,10 @@ void createSettingData(std::string name, std::map<std::string, std::string> sett
     }
     const auto tellLines = [&] {
         for (const std::string& line : file.lines()) {
-            log(kProgress, function) << "createSettingData: buffer" << line;
+            log(kProgress) << "createSettingData: buffer" << line;
         }
     };
-    if (!file.write(path, tellLines)) {
+    if (leadsAway(name) || !file.write(path, tellLines)) {
         log(kError) << "Can not open Setting File";
     }
 }
@@ -37,6 +52,9 @@ void deleteSavedConfigurations() {
     HostCommand listing(formatCommand("ls %s/ifcfg-* 2> /dev/null", kDirectory));
     while (const auto line = listing.nextLine()) {
         const std::string path = trimEnd(*line);
+        if (!isSavedFile(path)) {
+            continue;
+        }
         log(kProgress) << "Deleting " << path;
         if (!HostCommand(formatCommand("rm %s 2> /dev/null", path.c_str())).started()) {
             log(kProgress) << "Could not delete " << path;

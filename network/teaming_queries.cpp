@@ -3,6 +3,7 @@
 #include <dirent.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <memory>
 
 #include "mi/command.h"
@@ -31,6 +32,14 @@ std::string answer(const std::optional<std::string>& command) {
 /// What stands behind the colon of a line that `cut` has opened.
 std::string behindColon(const std::string& line) {
     return trimStart(trimEnd(line));
+}
+
+/// The name of the team in a MASTER value: in its file it may stand in quotes, and blanks around it are
+/// nothing to the shell that reads the file.
+std::string teamOf(const std::string& master) {
+    constexpr char kAround[] = " \t'\"";
+    const auto first = std::min(master.find_first_not_of(kAround), master.size());
+    return master.substr(first, master.find_last_not_of(kAround) + 1 - first);
 }
 
 std::string roleValue(const std::string& port, const char* key) {
@@ -128,15 +137,15 @@ void getNICTeamingInformation(std::string const& port, unsigned int id, std::str
             master = roleValue(port, "MASTER");
             break;
         case TeamingProperty::activeMember:
-            result = activeMember(master, port);
+            result = activeMember(teamOf(master), port);
             break;
         case TeamingProperty::miiStatus:
-            result = miiStatus(master, port);
+            result = miiStatus(teamOf(master), port);
             break;
         case TeamingProperty::linkFailures: {
             std::string status;
             getNICTeamingInformation(port, TeamingProperty::miiStatus, status, master);
-            result = linkFailures(master, port, status);
+            result = linkFailures(teamOf(master), port, status);
             break;
         }
         default:

@@ -14,6 +14,7 @@ constexpr unsigned int kSliceMilliseconds = 5000;
 }  // namespace
 
 HardDriveUpdateMonitor::HardDriveUpdateMonitor(QX::Event* completed) : completed_(completed) {
+    const Operation operation;
     log(kProgress) << "HardDriveUpdateMonitor::const: entry";
     log(kProgress) << "HardDriveUpdateMonitor::Const: exit";
 }

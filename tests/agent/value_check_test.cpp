@@ -249,15 +249,11 @@ TEST(ValueCheck, DomainNamesAreLabelsJoinedByDots) {
                    std::string(64, 'd') + ".com"});
 }
 
-TEST(ValueCheck, SuffixesFitASearchLine) {
+TEST(ValueCheck, SuffixesAreDomainsHoweverMany) {
     const Value value = given(kIpConfig, "DNSSuffixes", {"example.com", "example.org"});
     ASSERT_TRUE(value && value->asTexts() != nullptr);
     EXPECT_THAT(*value->asTexts(), TextsAre("example.com", "example.org"));
-    const std::vector<std::string> fitting(8, std::string(31, 'a') + "." + std::string(30, 'b'));  // 8 * 63
-    EXPECT_TRUE(given(kIpConfig, "DNSSuffixes", fitting));
-    std::vector<std::string> tooMuch = fitting;
-    tooMuch.back() += "b";
-    EXPECT_FALSE(given(kIpConfig, "DNSSuffixes", tooMuch));
+    EXPECT_TRUE(given(kIpConfig, "DNSSuffixes", std::vector<std::string>(50, "example.com")));
 }
 
 TEST(ValueCheck, CodesComeAsTheKindThePluginCompares) {

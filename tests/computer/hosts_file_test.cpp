@@ -70,14 +70,19 @@ HOST_TEST_F(HostsFile, EndsALastLineBeforeTheEntry) {
     EXPECT_EQ(host.read(kHosts), std::string("10.0.0.1 last\n") + kEntry);
 }
 
-HOST_TEST_F(HostsFile, ReadsLinesOfUpTo512Characters) {
-    host.file(kHosts, lineOf(511, "127.0.0.2 ") + "\n" + lineOf(512, "127.0.0.2 ") + "\r\n");
+HOST_TEST_F(HostsFile, GivesUpALineOfAnyLength) {
+    const std::string atItsEnd = lineOf(5000, "10.0.0.1 ") + " # once 127.0.0.2\n";
+    host.file(kHosts, lineOf(513, "127.0.0.2 ") + "\n" + atItsEnd + lineOf(513, "10.0.0.1 ") + "\n");
     change();
-    EXPECT_EQ(host.read(kHosts), lineOf(512, "127.0.0.2 ") + "\r\n" + kEntry) << "the CR is the 513th";
-    host.file(kHosts, lineOf(511, "127.0.0.2 ") + "\n" + lineOf(512, "127.0.0.2 ") + "\n" +
-                          lineOf(513, "127.0.0.2 ") + "\n");
+    EXPECT_EQ(host.read(kHosts), lineOf(513, "10.0.0.1 ") + "\n" + kEntry);
+}
+
+HOST_TEST_F(HostsFile, WithADirectoryInItsPlaceCannotBeOpenedForWriting) {
+    host.directory(kHosts);
+    LogCapture capture;
     change();
-    EXPECT_EQ(host.read(kHosts), lineOf(513, "127.0.0.2 ") + "\n" + kEntry);
+    EXPECT_THAT(capture.messages(6000), TextsAre("Can not open '/etc/hosts' in write mode."));
+    EXPECT_FALSE(host.exists(kHostName));
 }
 
 HOST_TEST_F(HostsFile, IsTheSameAfterTheSameChange) {

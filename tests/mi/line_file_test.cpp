@@ -78,11 +78,21 @@ HOST_TEST(LineFile, DropsALine) {
     EXPECT_EQ(file->lines(), (std::vector<std::string>{"a\n", "c\n"}));
 }
 
-HOST_TEST(LineFile, ShowsARuleLinesOf511And512CharactersAndKeepsALongerOneUntouched) {
-    host.file("/etc/file",
-              ofLength(511, "KEY=") + "\n" + ofLength(512, "KEY=") + "\n" + ofLength(513, "KEY=") + "\n");
+HOST_TEST(LineFile, ShowsARuleTheWholeOfEveryLine) {
+    const std::string content =
+        ofLength(512, "KEY=") + "\n" + ofLength(513, "KEY=") + "\n" + ofLength(100000, "KEY=");
+    host.file("/etc/file", content);
+    auto file = LineFile::read("/etc/file");
+    ASSERT_TRUE(file);
+    std::string seen;
+    file->rewrite([&](const std::string& line) {
+        seen += line;
+        return Fate::keep;
+    });
+    EXPECT_TRUE(seen == content);
+    EXPECT_EQ(file->lines().size(), 3U);
     editKey("/etc/file");
-    EXPECT_EQ(host.read("/etc/file"), "KEY=new\nKEY=new\n" + ofLength(513, "KEY=") + "\n");
+    EXPECT_EQ(host.read("/etc/file"), "KEY=new\nKEY=new\nKEY=new");
 }
 
 HOST_TEST(LineFile, AppendsBehindALastLineWithoutLineBreak) {
@@ -168,8 +178,16 @@ HOST_TEST(LineFile, KeepsTheFilesRightsAndLinksAndCutsALongerOne) {
 }
 
 HOST_TEST(LineFile, DoesNotTakeWhatCannotBeReadForAnEmptyFile) {
-    host.directory("/etc/file");
+    host.symlink("/etc/file", "/proc/self/mem");  // opens, and its first byte is no memory
     EXPECT_FALSE(LineFile::read("/etc/file"));
+}
+
+HOST_TEST(LineFile, FindsNoLinesInADirectoryAndCannotOpenItForWriting) {
+    host.directory("/etc/file");
+    const auto file = LineFile::read("/etc/file");
+    ASSERT_TRUE(file);
+    EXPECT_TRUE(file->lines().empty());
+    EXPECT_EQ(file->replace("/etc/file"), LineFile::Written::notOpened);
 }
 
 HOST_TEST(LineFile, EndsALastLineWithoutLineBreak) {

@@ -1,6 +1,7 @@
 #include "network/interface_file.h"
 
 #include "tests/support/fake_host.h"
+#include "tests/support/log_capture.h"
 
 namespace {
 
@@ -68,16 +69,23 @@ HOST_TEST(InterfaceFile, AppendsNothingForAKeyWithoutALine) {
     EXPECT_EQ(host.read(kPath), "");
 }
 
-HOST_TEST(InterfaceFile, DoesNotSeeAKeyInALineThatIsTooLong) {
-    const std::string tooLong = "A=" + std::string(511, 'x') + "\n";
-    host.file(kPath, tooLong + "# end\n");
+HOST_TEST(InterfaceFile, SeesAKeyWhereverItStandsInALongLine) {
+    host.file(kPath, std::string(5000, 'x') + "A=1\n# end\n");
     KeyLine a{"A=", "A=new\n"};
     InterfaceFile file(kMac);
     file.replace({&a});
-    EXPECT_FALSE(a.seen);
-    file.appendMissing({&a});
+    EXPECT_TRUE(a.seen);
     file.write();
-    EXPECT_EQ(host.read(kPath), tooLong + "# end\nA=new\n");
+    EXPECT_EQ(host.read(kPath), "A=new\n# end\n");
+}
+
+HOST_TEST(InterfaceFile, WithADirectoryInItsPlaceIsNotWrittenAndTellsNothingItself) {
+    host.directory(kPath);
+    const LogCapture capture;
+    InterfaceFile file(kMac);
+    EXPECT_EQ(file.lastLine(), "");
+    EXPECT_FALSE(file.write("opened"));
+    EXPECT_TRUE(capture.messages().empty()) << "the writer says what it makes of it";
 }
 
 }  // namespace

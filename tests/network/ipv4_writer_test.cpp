@@ -86,7 +86,7 @@ HOST_TEST(Origin, ThatCannotBeWrittenIsPassedOver) {
 }
 
 HOST_TEST(Origin, OfAFileThatCannotBeReadToItsEndIsNotWritten) {
-    host.directory(kFile);
+    host.symlink(kFile, "/proc/self/mem");
     LogCapture capture;
     IC::setIPOrigin("eth0", origin(3), kMac);
     EXPECT_THAT(capture.ownMessages(),

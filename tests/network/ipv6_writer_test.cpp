@@ -93,12 +93,12 @@ HOST_TEST(IPv6Address, MakesAMissingFile) {
     EXPECT_EQ(host.read(kInterface), "BOOTPROTO=static\nLABEL_1='1'\nIPADDR_1=fd00::7\n");
 }
 
-HOST_TEST(IPv6Address, KeepsALineThatIsTooLongAndDoesNotTakeItForTheKey) {
-    const std::string longest = "IPADDR_1=" + std::string(502, 'x') + "\n";
-    const std::string tooLong = "IPADDR_1=" + std::string(504, 'x') + "\n";
+HOST_TEST(IPv6Address, ReplacesALineOfAnyLength) {
     const std::string head = "BOOTPROTO=static\nLABEL_1='1'\n";
-    EXPECT_EQ(afterAddress(host, head + longest), head + "IPADDR_1=fd00::7\n");
-    EXPECT_EQ(afterAddress(host, head + tooLong), head + tooLong + "IPADDR_1=fd00::7\n");
+    EXPECT_EQ(afterAddress(host, head + "IPADDR_1=" + std::string(5000, 'x') + "\n"),
+              head + "IPADDR_1=fd00::7\n");
+    const std::string keyAtTheEnd = std::string(600, '#') + "IPADDR_1=\n";
+    EXPECT_EQ(afterAddress(host, head + keyAtTheEnd), head + "IPADDR_1=fd00::7\n");
 }
 
 HOST_TEST(IPv6Address, RunsNoCommandAndLogsTheWriting) {
@@ -315,11 +315,21 @@ HOST_TEST(IPv6RoutesFile, AnEmptyLineCountsAsARoute) {
     EXPECT_EQ(afterGateway(host, "# one\n\n"), "# one\n\ndefault\tfd00::1\t-\n");
 }
 
-HOST_TEST(IPv6RoutesFile, KeepsALineThatIsTooLongWhateverItHolds) {
-    const std::string comment = "#" + std::string(600, 'c') + "\n";
-    const std::string longRoute = "fd00::/64 " + std::string(600, 'r') + "\n";
-    EXPECT_EQ(afterGateway(host, comment), comment + "default\tfd00::1\t-\n");
-    EXPECT_EQ(afterGateway(host, "# one\n" + longRoute), "# one\n" + longRoute + "default\tfd00::1\t-\n");
+HOST_TEST(IPv6RoutesFile, LooksIntoTheWholeOfALine) {
+    const std::string comment = std::string(600, ' ') + "#c\n";
+    const std::string ipv6 = "default " + std::string(600, ' ') + "fd00::9 -\n";
+    const std::string ipv4 = "default " + std::string(600, ' ') + "10.0.0.9 -\n";
+    EXPECT_EQ(afterGateway(host, comment), "default\tfd00::1\t-\n");
+    EXPECT_EQ(afterGateway(host, comment + ipv6 + ipv4), comment + ipv4 + "default\tfd00::1\t-\n");
+}
+
+HOST_TEST(IPv6RoutesFile, WithADirectoryInItsPlaceCannotBeOpenedForWriting) {
+    host.directory("/etc/sysconfig/network/routes");
+    routingTable(host, route("fd00::1", "UG", "eth0"));
+    LogCapture capture;
+    IC::setIPv6GatewayForSuSe10("eth0", "fd00::1");
+    EXPECT_THAT(capture.messages(6000),
+                TextsAre("Can not open '/etc/sysconfig/network/routes' in write mode."));
 }
 
 HOST_TEST(IPv6RoutesFile, IsNotMadeWhenItIsMissing) {

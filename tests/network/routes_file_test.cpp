@@ -43,13 +43,18 @@ HOST_TEST(RoutesFile, OfCommentsAloneBecomesTheRouteAlone) {
     EXPECT_EQ(rewritten(host, AddressFamily::ipv6, "# a\n# b: c\n"), "default\tfd00::1\t-\n");
 }
 
-HOST_TEST(RoutesFile, NeverLosesALineThatIsTooLong) {
-    const std::string tooLong = std::string(513, 'x') + "\n";
-    for (const AddressFamily family : {AddressFamily::ipv4, AddressFamily::ipv6}) {
-        EXPECT_NE(rewritten(host, family, tooLong).find(tooLong), std::string::npos);
-        EXPECT_NE(rewritten(host, family, "#" + tooLong).find("#" + tooLong), std::string::npos);
-    }
-    EXPECT_EQ(rewritten(host, AddressFamily::ipv4, std::string(512, 'x') + "\n"), "default\t10.0.0.1\t-\n");
+HOST_TEST(RoutesFile, LooksIntoTheWholeOfALine) {
+    const std::string padding(600, 'x');
+    EXPECT_EQ(rewritten(host, AddressFamily::ipv4, padding + "\n"), "default\t10.0.0.1\t-\n");
+    EXPECT_EQ(rewritten(host, AddressFamily::ipv4, padding + ":\n"),
+              "default\t10.0.0.1\t-\n" + padding + ":\n");
+    EXPECT_EQ(rewritten(host, AddressFamily::ipv6, padding + ":\n"), "default\tfd00::1\t-\n");
+    EXPECT_EQ(rewritten(host, AddressFamily::ipv6, padding + "#\n"), "default\tfd00::1\t-\n");
+}
+
+HOST_TEST(RoutesFile, WithADirectoryInItsPlaceIsReadAndNotWritten) {
+    host.directory(kRoutes);
+    EXPECT_EQ(IC::replaceDefaultRoute(AddressFamily::ipv6, "fd00::1"), RoutesRewrite::notWritten);
 }
 
 HOST_TEST(RoutesFile, IsNotMade) {

@@ -1,6 +1,7 @@
 #include "network/saved_settings.h"
 
 #include <sys/mount.h>
+#include <unistd.h>
 
 #include <cstdlib>
 
@@ -175,9 +176,52 @@ HOST_TEST(SavedSettings, DeleteGoesOnBehindAFileThatStays) {
     EXPECT_THAT(capture.messages(6000), IsEmpty());
 }
 
+HOST_TEST(SavedSettings, DeleteRemovesNothingOfTheDirectoryItStandsIn) {
+    host.directory("/var/mine");
+    for (const char* name : {"no", "x", "veth1", "inside"}) {
+        host.file(std::string("/var/mine/") + name, "");
+    }
+    ASSERT_EQ(chdir("/var/mine"), 0);
+    host.file(std::string(kData) + "/ifcfg-eth9/no", "");     // listed as "no"
+    host.file(std::string(kData) + "/ifcfg-dir/inside", "");  // and its directory as "...ifcfg-dir:"
+    host.file(std::string(kData) + "/ifcfg-a\nx", "");        // listed as "...ifcfg-a" and "x"
+    host.file(std::string(kData) + "/ifcfg-a", "");
+    const CommandLines commands;
+    IC::deleteSavedConfigurations();
+    EXPECT_THAT(host.listDirectory("/var/mine"), TextsAre("inside", "no", "veth1", "x"));
+    EXPECT_THAT(host.listDirectory(kData), TextsAre("ifcfg-a\nx", "ifcfg-dir", "ifcfg-eth9"));
+    for (const std::string& command : commands.all()) {
+        EXPECT_TRUE(command == kListing || command.starts_with("rm /opt/vantrel/corvista/data/ifcfg-"))
+            << command;
+    }
+}
+
+HOST_TEST(SavedSettings, DeleteTakesALineForAFileOfOursOnlyWhenItIsOne) {
+    const std::string data = kData;
+    host.tool("ls %any", "no\n\n*\n/etc/passwd\n" + data + "\n" + data + "/asset.dat\n" + data +
+                             "/ifcfg-../asset.dat\n" + data + "/ifcfg-/../../x\n" + data + "/xifcfg-a\n ." +
+                             data + "/ifcfg-b\n" + data + "/ifcfg-eth0\n");
+    const CommandLines commands;
+    IC::deleteSavedConfigurations();
+    EXPECT_THAT(commands.all(), ElementsAre(kListing, std::string("rm ") + kEth0 + " 2> /dev/null"));
+}
+
+HOST_TEST(SavedSettings, AreNotWrittenOutsideTheirPlace) {
+    host.directory(std::string(kData) + "/ifcfg-x");
+    const auto before = host.listDirectory("/opt/vantrel/corvista");
+    for (const std::string name : {"x/eth0", "x/../../asset.dat", "../eth0", "..", "/etc/passwd"}) {
+        LogCapture capture;
+        IC::createSettingData(name, {{"K", "v"}});
+        EXPECT_THAT(capture.messages(6000), TextsAre("Can not open Setting File")) << name;
+    }
+    EXPECT_THAT(host.listDirectory(kData), TextsAre("ifcfg-x"));
+    EXPECT_THAT(host.listDirectory(std::string(kData) + "/ifcfg-x"), IsEmpty());
+    EXPECT_EQ(host.listDirectory("/opt/vantrel/corvista"), before);
+}
+
 HOST_TEST(SavedSettings, DeleteLogsAnRmThatCannotBeRun) {
     // Fits the listing's line, but not a command together with `rm`.
-    const std::string tooLong = std::string(kData) + "/" + std::string(500 - sizeof(kData), 'x');
+    const std::string tooLong = std::string(kData) + "/ifcfg-" + std::string(494 - sizeof(kData), 'x');
     host.tool("ls %any", tooLong + "\n" + kEth0 + "\n");
     host.file(kEth0, "");
     LogCapture capture;
