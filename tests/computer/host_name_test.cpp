@@ -14,6 +14,7 @@
 
 namespace {
 
+using testing::Contains;
 using testing::IsEmpty;
 
 class Names {
@@ -158,6 +159,9 @@ HOST_TEST(NameChange, StopsBeforeTheFilesWhenTheCommandIsTooLong) {
         LogCapture capture;
         IC::executeDomainandHostnameChanges(std::string(length - std::string("hostname ").size(), 'n'), "",
                                             true, "");
+        EXPECT_THAT(
+            capture.messages(3000),
+            Contains("command: hostname " + std::string(length - std::string("hostname ").size(), 'n')));
         EXPECT_EQ(capture.messages(6000).size(), 2U);
         EXPECT_EQ(capture.messages(6000).back(), "Could not set HostName !!");
         EXPECT_EQ(capture.messages().back(), "executeDomainandHostnameChanges: exit");
@@ -165,6 +169,13 @@ HOST_TEST(NameChange, StopsBeforeTheFilesWhenTheCommandIsTooLong) {
     EXPECT_THAT(host.calls(), IsEmpty());
     EXPECT_EQ(host.read(kHosts), "127.0.0.2 old\n");
     EXPECT_FALSE(host.exists(kHostName));
+}
+
+HOST_TEST(NameChange, TellsTheCommandWithADomainThatMakesItTooLong) {
+    LogCapture capture;
+    const std::string domain(600, 'd');
+    IC::executeDomainandHostnameChanges("alpha", domain, true, "");
+    EXPECT_THAT(capture.messages(3000), Contains("command: hostname alpha." + domain));
 }
 
 HOST_TEST(NameChange, DoesNotAskWhetherTheCommandSucceeded) {

@@ -134,6 +134,20 @@ HOST_TEST(Processors, SkipALineWithoutColon) {
     EXPECT_THAT(capture.ownMessages(6000), TextsAre("Invalid format: buffer = processor 0\n"));
 }
 
+HOST_TEST(Processors, AreTheRowsWhoseKeyIsTheWordAlone) {
+    host.file("/proc/cpuinfo",
+              "processor\t: 0\nmodel name\t: Common KVM processor\ncpu MHz\t\t: 1000.0\n"
+              "processor: 1\nmodel name\t: a processor: really\ncpu MHz\t\t: 2000.0\n"
+              "processor \t \t: 2\nprocessors\t: 3\nprocessor 4\t: x\n processor\t: 5\ncoprocessor\t: 6\n"
+              ": processor\n");
+    Started plugin;
+    LogCapture capture;
+    plugin.mi().createCpuNodes();
+    EXPECT_EQ(plugin.processors().size(), 3U);
+    EXPECT_THAT(plugin.speeds(), TextsAre("1000", "2000", "none"));
+    EXPECT_TRUE(capture.ownMessages(6000).empty()) << "they have a colon";
+}
+
 HOST_TEST(Processors, ReadLinesOf127Characters) {
     host.file("/proc/cpuinfo", "processor\t: " + std::string(150, 'x') + "\n");
     Started plugin;

@@ -92,7 +92,7 @@ HOST_TEST(LineFile, ShowsARuleTheWholeOfEveryLine) {
     EXPECT_TRUE(seen == content);
     EXPECT_EQ(file->lines().size(), 3U);
     editKey("/etc/file");
-    EXPECT_EQ(host.read("/etc/file"), "KEY=new\nKEY=new\nKEY=new");
+    EXPECT_EQ(host.read("/etc/file"), "KEY=new\nKEY=new\nKEY=new\n");
 }
 
 HOST_TEST(LineFile, AppendsBehindALastLineWithoutLineBreak) {

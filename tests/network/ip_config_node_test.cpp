@@ -138,6 +138,12 @@ HOST_TEST(IPConfigNode, PrefersAGatewaySetByHandToAnAdvertisedOne) {
     EXPECT_EQ(live(*plugin.build().config("eth0"), 101), text("2001:db8:6::1"));
 }
 
+HOST_TEST(IPConfigNode, OnAHostWithoutADefaultRouteShowsTheOnLinkMarkAsItsGateway) {
+    PortHost plugin(host, "suse-two-nics");
+    host.tool("route -n", "192.0.2.0 0.0.0.0 255.255.255.0 U 0 0 0 eth0\n");
+    EXPECT_EQ(live(*plugin.build().config("eth0"), 100), text("0.0.0.0"));
+}
+
 HOST_TEST(IPConfigNode, WithoutAnyAddressReadsZerosAndIPv6AloneReadsEmpty) {
     PortHost plugin(host, "ipv6-only");
     const auto config = plugin.build().config("eth0");

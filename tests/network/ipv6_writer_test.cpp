@@ -163,6 +163,10 @@ HOST_TEST(IPv6PrefixLength, IsReplacedOrAppendedInDecimal) {
     host.remove(kInterface);
     IC::setIPv6PrefixLength("eth0", 0, kMac);
     EXPECT_EQ(host.read(kInterface), "PREFIXLEN_1=0\n");
+    IC::setIPv6PrefixLength("eth0", 2147483647, kMac);
+    EXPECT_EQ(host.read(kInterface), "PREFIXLEN_1=2147483647\n");
+    IC::setIPv6PrefixLength("eth0", 4294967295, kMac);
+    EXPECT_EQ(host.read(kInterface), "PREFIXLEN_1=-1\n") << "as %d prints it";
 }
 
 HOST_TEST(IPv6PrefixLength, LogsTheWriting) {

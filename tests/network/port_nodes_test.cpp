@@ -83,6 +83,18 @@ HOST_TEST(PortNode, ShowsItsPlaceInATeam) {
                  {{193, flag(true)}, {194, flag(false)}, {195, text("up")}, {196, number(3)}});
 }
 
+HOST_TEST(PortNode, ShowsItsTeamAsItStandsInItsFileAndFindsItWithoutTheQuotes) {
+    PortHost plugin(host, "bond-two-members");
+    host.file("/etc/sysconfig/network/ifcfg-eth-id-02:00:5e:00:01:01", "SLAVE=yes\nMASTER=\"bond0\" \n");
+    plugin.build();
+    expectStored(*plugin.port("eth0"), {{193, flag(true)},
+                                        {199, text("\"bond0\" ")},
+                                        {194, flag(true)},
+                                        {195, text("up")},
+                                        {196, number(0)}});
+    expectLive(*plugin.port("eth0"), {{199, text("\"bond0\" ")}, {194, flag(true)}, {195, text("up")}});
+}
+
 HOST_TEST(PortNode, IsNoTeamMemberWhenItsFileSaysNo) {
     PortHost plugin(host, "suse-two-nics");
     const auto port = plugin.build().port("eth0");
@@ -279,6 +291,14 @@ HOST_TEST(PortWalk, SavesEachInterfacesSettings) {
         "BOOTPROTO=dhcp\nCONFIG_NAME=eth1\nDNSSERVERS=192.0.2.53 192.0.2.54 \nDNSSUFFIXES=example.com \n"
         "DOMAINNAME=example.com\nGATEWAY=\nHOSTNAME=linux-a\nIPV6ADDR=\nIPV6GATEWAY=\nIPv4ADDR=0.0.0.0\n"
         "NETMASK=0.0.0.0\nPREFIX=0\n");
+}
+
+HOST_TEST(PortWalk, SavesAPrefixLengthThatNoIntHoldsAsANegativeNumber) {
+    PortHost plugin(host, "suse-two-nics");
+    host.tool("ip -6 address show dev eth0", "    inet6 2001:db8::10/-1 scope global \n");
+    plugin.build();
+    EXPECT_THAT(*host.read("/opt/vantrel/corvista/data/ifcfg-eth0"), testing::HasSubstr("\nPREFIX=-1\n"));
+    EXPECT_EQ(PortHost::stored(*plugin.config("eth0"), 102), number(4294967295));
 }
 
 HOST_TEST(PortWalk, SavesTheResolverAnewForANewInterfaceAndLeavesTheOldFilesAlone) {

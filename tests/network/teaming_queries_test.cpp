@@ -8,8 +8,10 @@
 
 namespace {
 
+using testing::Each;
 using testing::ElementsAre;
 using testing::IsEmpty;
+using testing::StartsWith;
 using testing::UnorderedElementsAre;
 using Lines = std::vector<std::string>;
 
@@ -280,6 +282,22 @@ HOST_TEST(MemberHealth, IsReadFromTheFileWhenTheShellHasNoTools) {
     installBond(host, "bond0", "active-backup-down");
     host.toolMissing("grep");
     EXPECT_EQ(health("eth1"), "down 1");
+}
+
+HOST_TEST(TeamingInformation, TakesTheTeamOutOfItsQuotesAndBlanksInCommandsAndPaths) {
+    installBond(host, "bond0", "active-backup");
+    for (const char* master : {"'bond0'", "\"bond0\"", " bond0 ", " \" bond0\" ", "\t'bond0'\t"}) {
+        const CommandLines commands;
+        EXPECT_EQ(ask("eth0", 194, master), "Currently Active Slave: eth0") << master;
+        EXPECT_EQ(ask("eth1", 195, master), "up") << master << ", read straight from the file";
+        EXPECT_EQ(ask("eth1", 196, master), "3") << master;
+        EXPECT_THAT(commands.all(), Each(StartsWith("cat /proc/net/bonding/bond0 2> /dev/null | grep ")));
+        EXPECT_EQ(commands.all().size(), 4U);
+    }
+    EXPECT_EQ(ask("eth0", 194, "'bond0'x"), "") << "inside of it they stay";
+    for (const char* nobody : {"''", "\"", "  "}) {
+        EXPECT_EQ(ask("eth0", 194, nobody) + ask("eth0", 195, nobody) + ask("eth0", 196, nobody), "");
+    }
 }
 
 HOST_TEST(TeamingInformation, KnowsNoOtherQuestion) {

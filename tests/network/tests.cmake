@@ -35,6 +35,7 @@ corvista_test(network_nodes SOURCES
   LIBRARIES plugin_code test_support)
 
 corvista_test(network_ports SOURCES
+  network/bridge_rows_test.cpp
   network/command_count_test.cpp
   network/port_nodes_test.cpp
   network/port_walk_test.cpp
