@@ -3,7 +3,9 @@ corvista_test(mi SOURCES
   mi/library_test.cpp
   mi/lifecycle_test.cpp
   mi/line_file_test.cpp
+  mi/log_names_test.cpp
   mi/no_memory_test.cpp
+  mi/operation_names.cpp
   mi/text_test.cpp
   support/failing_new.cpp
   LIBRARIES plugin_code test_support LABELS threads)

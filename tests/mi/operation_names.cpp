@@ -1,0 +1,142 @@
+#include "tests/mi/operation_names.h"
+
+#include <fstream>
+#include <regex>
+#include <sstream>
+#include <vector>
+
+namespace {
+
+namespace fs = std::filesystem;
+using Names = std::map<std::string, std::set<std::string>>;
+
+// What the rooms' operations are made of: nobody outside calls it, and no log line carries its name.
+const std::set<std::string> kHelpers = {
+    "mi/command.h",
+    "mi/line_file.h",
+    "mi/log.h",
+    "mi/property_table.h",
+    "mi/text.h",
+    "indications/contained.h",
+    "network/port_walk.h",
+    "network/routes_file.h",
+    "network/interface_file.h",
+    "network/ip_facts.h",
+    "storage/storage_build.h",
+};
+
+std::string sourceOf(const std::string& room) {
+    if (room == "indications") {
+        return "OsHwMIInd_ix86";
+    }
+    return room == "cpu" ? "OsHwMICpu_ix86" : "OsHwMI_ix86";
+}
+
+/// The code of a header. A comment that names a room ("// cpu/ ...") heads the members that are implemented
+/// there and becomes a statement of its own.
+std::string codeOf(const fs::path& header) {
+    std::ifstream in(header);
+    std::string code;
+    const std::regex heading(R"re(^\s*// ([a-z]+)/.*)re");
+    const std::regex noise(R"re("(\\.|[^"\\])*"|'(\\.|[^'\\])'|//.*|^\s*#.*|__attribute__\(\(.*?\)\)\)?)re");
+    for (std::string line; std::getline(in, line);) {
+        std::smatch room;
+        if (std::regex_match(line, room, heading)) {
+            code += ";room " + room[1].str() + ";\n";
+        } else {
+            code += std::regex_replace(line, noise, "") + '\n';
+        }
+    }
+    return code;
+}
+
+/// One header read from its start to its end.
+class Reader {
+public:
+    Reader(const fs::path& header, std::string room, Names& names)
+        : code_(codeOf(header)), room_(std::move(room)), names_(names) {}
+
+    void read() {
+        for (; at_ < code_.size(); ++at_) {
+            const char letter = code_[at_];
+            if (letter == '{') {
+                open();
+            } else if (letter == '}') {
+                isPublic_.pop_back();
+                statement_.clear();
+            } else if (letter == ';') {
+                end();
+            } else if (letter == ':' && isAccess()) {
+                statement_.clear();
+            } else {
+                statement_ += letter;
+            }
+        }
+    }
+
+private:
+    /// Scopes are gone into; a body is passed over, and so is what initializes a variable.
+    void open() {
+        static const std::regex scope(
+            R"re(^\s*(template <.*>\s*)?(namespace|class|struct|extern)\b[^(=]*$)re");
+        if (std::regex_search(statement_, scope)) {
+            isPublic_.push_back(isPublic_.back() && statement_.find("class ") == std::string::npos);
+            statement_.clear();
+            return;
+        }
+        end();
+        for (int depth = 0; at_ < code_.size(); ++at_) {
+            depth += code_[at_] == '{' ? 1 : code_[at_] == '}' ? -1 : 0;
+            if (depth == 0) {
+                return;
+            }
+        }
+    }
+
+    /// "public:" and the like; the colons of "QX::Event" and of a base class are no ends.
+    bool isAccess() {
+        static const std::regex access(R"re(^\s*(public|protected|private)$)re");
+        std::smatch match;
+        if (!std::regex_match(statement_, match, access)) {
+            statement_ += ':';
+            return false;
+        }
+        isPublic_.back() = isPublic_[isPublic_.size() - 2] && match[1] != "private";
+        return true;
+    }
+
+    void end() {
+        static const std::regex room(R"re(^\s*room ([a-z]+)$)re");
+        static const std::regex declared(R"re((~?[A-Za-z_]\w*)\s*\()re");
+        std::smatch match;
+        if (std::regex_match(statement_, match, room)) {
+            room_ = match[1];
+        } else if (isPublic_.back() && std::regex_search(statement_, match, declared)) {
+            names_[match[1]].insert(sourceOf(room_));
+        }
+        statement_.clear();
+    }
+
+    std::string code_;
+    std::string room_;
+    Names& names_;
+    std::size_t at_ = 0;
+    std::string statement_;
+    std::vector<bool> isPublic_{true};
+};
+
+}  // namespace
+
+Names operationNames(const fs::path& tree) {
+    Names names;
+    for (const char* room : {"mi", "computer", "storage", "network", "indications", "cpu"}) {
+        for (const auto& entry : fs::directory_iterator(tree / room)) {
+            const std::string name = fs::relative(entry.path(), tree);
+            if (name.ends_with(".h") && !kHelpers.contains(name)) {
+                Reader(entry.path(), room, names).read();
+            }
+        }
+    }
+    names["OpenMI"] = {"OsHwMI_ix86"};  // the entry has no header: the agent looks it up by its name
+    return names;
+}
