@@ -76,9 +76,9 @@ std::vector<std::string> PortWalk::list() {
 std::set<std::string> PortWalk::bridgesOf(const std::vector<std::string>& listing) {
     std::set<std::string> bridges;
     for (const std::string& line : listing) {
-        // The row of a bridge's second member and of those behind it has no name in front.
-        if (std::string name = firstColumn(line); isOfBridgeListing(line) && !name.empty()) {
-            bridges.insert(std::move(name));
+        if (isOfBridgeListing(line)) {
+            // "" in the rows of a bridge's second member and of those behind it: nobody's name.
+            bridges.insert(firstColumn(line));
         }
     }
     return bridges;

@@ -61,6 +61,13 @@ TEST(Strreplace, AcceptsAnEmptyText) {
     EXPECT_EQ(buffer.data[1], '\0');
 }
 
+TEST(SignedDecimal, PrintsWhatNoIntHoldsAsANegativeNumber) {
+    EXPECT_EQ(IC::signedDecimal(64), "64");
+    EXPECT_EQ(IC::signedDecimal(2147483647), "2147483647");
+    EXPECT_EQ(IC::signedDecimal(2147483648), "-2147483648");
+    EXPECT_EQ(IC::signedDecimal(4294967295), "-1");
+}
+
 TEST(Trim, CutsOnlyTheNamedCharacterAndOnlyAtItsEnd) {
     EXPECT_EQ(IC::trimEnd("\neth0 \n\n"), "\neth0 ");
     EXPECT_EQ(IC::trimEnd("\n\n"), "");
