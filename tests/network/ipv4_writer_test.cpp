@@ -95,6 +95,18 @@ HOST_TEST(Origin, OfAFileThatCannotBeReadToItsEndIsNotWritten) {
                          "setIPOrigin: exit"));
 }
 
+HOST_TEST(InterfaceFileWriters, WithADirectoryInItsPlaceTellOfTheWritingAlone) {
+    host.directory(kFile);
+    host.tool("ifconfig eth0 netmask 255.255.0.0", "");
+    LogCapture capture;
+    IC::setIPOrigin("eth0", origin(3), kMac);
+    IC::setIPv4Address("eth0", "192.0.2.7", kMac);
+    IC::setSubnetMask("eth0", "255.255.0.0", kMac);
+    EXPECT_THAT(capture.ownMessages(6000), TextsAre("Failed to open the file for writing"));
+    EXPECT_THAT(capture.ownMessages(4000), TextsAre("IP Origin  = 3"));
+    EXPECT_THAT(host.callsOf("ifconfig"), TextsAre("ifconfig eth0 netmask 255.255.0.0"));
+}
+
 /// An interface file that fills its disk: not a line more fits.
 void fillDisk(FakeHost& host) {
     host.directory("/etc/sysconfig/network");
