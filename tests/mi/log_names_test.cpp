@@ -250,7 +250,7 @@ IC::Error breakDown(const std::vector<IC::Alert>&, const void*) {
     throw std::runtime_error("broken");
 }
 
-/// The monitors' passes, on this thread: their own wait for their next.
+/// The monitors' passes, on this thread.
 void pass(IC::OsHwMI& mi, IC::Error (*handler)(const std::vector<IC::Alert>&, const void*),
           unsigned int before) {
     mi.registerForAlerts(handler, nullptr);
@@ -295,6 +295,7 @@ HOST_TEST(LogNames, AreTheOperationsNamesInAWholeStartReadWritePassAndStop) {
     callUtilities(mi);
     unsigned int kind = 0;
     IC::getIPv6AddressType("v6", kind);
+    mi.disableIndications();  // from here on the passes are this thread's
     pass(mi, refuse, 12);
     failing = Failing::echo;
     mi.createHardDriveNodes(true);
