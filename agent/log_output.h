@@ -18,7 +18,8 @@ public:
     LogOutput& operator=(const LogOutput&) = delete;
     ~LogOutput();
 
-    /// The messages of level 6000 and up since the last call, unless they were shown already.
+    /// The messages of level 6000 and up since the last call, unless they were shown already. A name that the
+    /// plug-in refused to put into a command is among them once, with what to do about it.
     std::vector<std::string> takeErrors();
     /// Prints what takeErrors returns to standard error.
     void showErrors();

@@ -13,14 +13,14 @@ namespace {
 
 using Clock = std::chrono::steady_clock;
 
-constexpr std::array kCommands{
+const std::array<IC::Command, 2> kCommands{
     "echo eth0 2> /dev/null",
     "cat /proc/net/dev 2> /dev/null | grep lo 2> /dev/null | tr -s ' ' 2> /dev/null | cut -d ' ' -f2 2> "
     "/dev/null",
 };
 
-void runBare(const char* command) {
-    FILE* const pipe = popen(command, "r");
+void runBare(const IC::Command& command) {
+    FILE* const pipe = popen(command.toRun(), "r");
     std::array<char, 512> line{};
     while (fgets(line.data(), line.size(), pipe) != nullptr) {
         benchmark::DoNotOptimize(line);
@@ -28,14 +28,14 @@ void runBare(const char* command) {
     pclose(pipe);
 }
 
-void runWithRunner(const char* command) {
-    IC::HostCommand running(IC::formatCommand("%s", command));
+void runWithRunner(const IC::Command& command) {
+    IC::HostCommand running(command);
     while (auto line = running.nextLine()) {
         benchmark::DoNotOptimize(line);
     }
 }
 
-double seconds(void (*run)(const char*), const char* command) {
+double seconds(void (*run)(const IC::Command&), const IC::Command& command) {
     const auto start = Clock::now();
     run(command);
     return std::chrono::duration<double>(Clock::now() - start).count();
@@ -44,7 +44,7 @@ double seconds(void (*run)(const char*), const char* command) {
 void runnerAgainstBarePopen(benchmark::State& state) {
     CVLog::CVLogger::setLog(nullptr, 0);
     CVLog::CVLogger::setTrace(nullptr, 0);
-    const char* const command = kCommands.at(static_cast<std::size_t>(state.range(0)));
+    const IC::Command& command = kCommands.at(static_cast<std::size_t>(state.range(0)));
     double bare = 0;
     double runner = 0;
     bool bareFirst = true;
@@ -58,7 +58,7 @@ void runnerAgainstBarePopen(benchmark::State& state) {
         }
         bareFirst = !bareFirst;
     }
-    state.SetLabel(command);
+    state.SetLabel(command.shown());
     state.counters["bare_us"] = benchmark::Counter(bare * 1e6, benchmark::Counter::kAvgIterations);
     state.counters["runner_us"] = benchmark::Counter(runner * 1e6, benchmark::Counter::kAvgIterations);
     state.counters["ratio"] = runner / bare;

@@ -69,7 +69,7 @@ Error writeOwner(ComputerNode& node, const PropertyValue& value) {
     return node.MutableNode::setProperty(id, value);
 }
 
-void runAndForget(const char* command) {
+void runAndForget(const Command& command) {
     const HostCommand run(command);
 }
 

@@ -18,7 +18,7 @@ constexpr char kHostNameFile[] = "/etc/HOSTNAME";
 constexpr char kOwnLoopback[] = "127.0.0.2";
 
 /// The first line a `hostname` command prints, line break included, is kept unless the tool could not tell.
-void updateName(const char* command, std::string& name) {
+void updateName(const Command& command, std::string& name) {
     HostCommand asked(command);
     const auto line = asked.nextLine();
     if (line && !contains(*line, "Unknown")) {
@@ -27,12 +27,9 @@ void updateName(const char* command, std::string& name) {
 }
 
 bool setRunningName(const std::string& hostName, const std::string& domainName) {
-    const auto command = domainName.empty()
-                             ? formatCommand("hostname %s", hostName.c_str())
-                             : formatCommand("hostname %s.%s", hostName.c_str(), domainName.c_str());
-    // One that is too long to be run is told all the same.
-    const std::string wanted = "hostname " + (domainName.empty() ? hostName : hostName + '.' + domainName);
-    log(kProgress) << "command: " << command.value_or(wanted);
+    const auto command = domainName.empty() ? formatCommand("hostname %s", hostName)
+                                            : formatCommand("hostname %s.%s", hostName, domainName);
+    log(kProgress) << "command: " << command.shown();
     if (!HostCommand(command).started()) {
         log(kError) << "Could not set HostName !!";
         return false;

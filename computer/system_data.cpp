@@ -74,7 +74,8 @@ std::string getSystemName() {
 /// Refreshes the system's vital-product-data database. Hosts have one of the two tools, or none.
 void OsHwMI::vpdUpdate() {
     const LogScope scope;
-    for (const char* tool : {"/usr/sbin/vpdupdate 2> /dev/null", "/sbin/update-lsvpd-db 2> /dev/null"}) {
+    for (const Command& tool :
+         {Command("/usr/sbin/vpdupdate 2> /dev/null"), Command("/sbin/update-lsvpd-db 2> /dev/null")}) {
         const HostCommand run(tool);
     }
 }

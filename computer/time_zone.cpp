@@ -96,7 +96,7 @@ bool setTimezone(unsigned int offset) {
 
 bool setAutoDSTEnabled(bool utc) {
     const LogScope scope;
-    HostCommand::fromText(std::string("/bin/cp ") + kClockFile + " " + kClockCopy);
+    HostCommand::fromText(textCommand("/bin/cp %s %s", kClockFile, kClockCopy));
     auto copy = readCopy();
     bool replaced = false;
     // Whether cp did its work is not asked: without it, a copy that was left behind becomes the clock file.

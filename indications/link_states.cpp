@@ -79,7 +79,7 @@ unsigned int OsHwMI::bondedNetNodeStatus(const std::string& bond) {
     const Operation operation;
     logInd(kProgress) << "bondedNetNodeStatus: entry";
     HostCommand command(formatCommand(
-        "cat /proc/net/bonding/%s 2> /dev/null | grep \"Slave Interface: \" 2> /dev/null", bond.c_str()));
+        "cat /proc/net/bonding/%s 2> /dev/null | grep \"Slave Interface: \" 2> /dev/null", bond));
     if (!command.started()) {
         logInd(kError) << "OsHwMI::bondedNetNodeStatus - grepping slave device error";
         return LinkState::noVerdict;

@@ -1,25 +1,96 @@
 #include "mi/command.h"
 
-#include <array>
-#include <cstdarg>
+#include <algorithm>
 #include <cstdlib>
-#include <memory>
 
 #include "mi/log.h"
+#include "mi/text.h"
 
 namespace IC {
 
 namespace {
 
-bool fits(const std::string& command) {
-    if (command.size() < kCommandBuffer) {
-        return true;
+using Place = TextSlot::Place;
+
+/// What is judged of a text: the blanks around it only part words, the line breaks at its end only end a
+/// line.
+std::string_view judged(std::string_view text) {
+    text = text.substr(0, text.find_last_not_of('\n') + 1);
+    text = text.substr(0, text.find_last_not_of(' ') + 1);
+    return text.substr(std::min(text.find_first_not_of(' '), text.size()));
+}
+
+bool isBetween(char letter, char first, char last) {
+    return letter >= first && letter <= last;
+}
+
+bool isMeant(char letter, Place place) {
+    constexpr std::string_view kMarks = "._:@%+=,/-";
+    constexpr std::string_view kNotQuoted = "\"$`\\\x7f";
+    const bool above127 = (static_cast<unsigned char>(letter) & 0x80U) != 0;
+    if (place == Place::quoted) {
+        const bool shows = above127 || letter >= ' ' || letter == '\t' || letter == '\n';
+        return shows && kNotQuoted.find(letter) == kNotQuoted.npos;
     }
-    log(kError) << "Command too long, not run: " << command;
-    return false;
+    return above127 || isBetween(letter, 'a', 'z') || isBetween(letter, 'A', 'Z') ||
+           isBetween(letter, '0', '9') || kMarks.find(letter) != kMarks.npos;
+}
+
+/// The first letter that makes more of a text than a text; nothing when it may enter.
+std::optional<char> firstWrong(std::string_view text, Place place) {
+    if (place != Place::quoted && text.starts_with('-')) {
+        return '-';  // an option
+    }
+    const auto* const wrong =
+        std::find_if(text.begin(), text.end(), [place](char letter) { return !isMeant(letter, place); });
+    return wrong == text.end() ? std::nullopt : std::optional(*wrong);
+}
+
+std::string_view entering(std::string_view text, Place place) {
+    return place == Place::bare ? text.substr(0, text.find_last_not_of('\n') + 1) : text;
 }
 
 }  // namespace
+
+Command::Command(std::string_view format, Slots slots, Texts texts, Length length, const char* function)
+    : made_("") {
+    std::size_t from = 0;
+    std::optional<std::pair<std::string_view, char>> wrong;
+    for (std::size_t i = 0; i < slots.size(); ++i) {
+        const auto [at, place] = slots[i];
+        made_->append(format, from, at - from).append(entering(texts[i], place));
+        from = at + std::string_view("%s").size();
+        const std::string_view text = judged(texts[i]);
+        if (const auto letter = firstWrong(text, place); letter && !wrong) {
+            wrong.emplace(text, *letter);
+        }
+    }
+    made_->append(format, from);
+    if (wrong) {
+        refused_ = true;
+        // People look for the text, and cvagent reads it from here: up to the next quote it is one.
+        log(kError, function) << "Command refused for its text \"" << printable(wrong->first, '"')
+                              << "\" (the \"" << printable({&wrong->second, 1}, '"')
+                              << "\"), not run: " << shown();
+    } else if (length == Length::ofBuffer && made_->size() >= kCommandBuffer) {
+        refused_ = true;
+        log(kError, function) << "Command too long, not run: " << shown();
+    }
+}
+
+const char* Command::toRun() const {
+    if (!made_) {
+        return fixed_;
+    }
+    return refused_ ? nullptr : made_->c_str();
+}
+
+std::string Command::shown() const {
+    if (!made_) {
+        return fixed_;
+    }
+    return refused_ ? printable(*made_) : *made_;
+}
 
 std::optional<std::string> OutputReader::nextLine(FILE* pipe, std::size_t longest) {
     std::array<char, kCommandBuffer> buffer{};
@@ -37,33 +108,19 @@ std::optional<std::string> OutputReader::nextLine(FILE* pipe, std::size_t longes
     return line;
 }
 
-std::optional<std::string> formatCommand(const char* format, ...) {
-    va_list arguments;
-    va_start(arguments, format);
-    char* text = nullptr;
-    const int length = vasprintf(&text, format, arguments);
-    va_end(arguments);
-    if (length < 0) {
-        return std::nullopt;
-    }
-    const std::unique_ptr<char, void (*)(void*)> owner(text, free);
-    std::string command(text, static_cast<std::size_t>(length));
-    return fits(command) ? std::optional(std::move(command)) : std::nullopt;
-}
+HostCommand::HostCommand(const Command& command)
+    : reader_(command.shown()), pipe_(process_.mypopen(command.toRun(), "r")) {}
 
-HostCommand::HostCommand(const std::optional<std::string>& command) : reader_(command.value_or("")) {
-    if (command) {
-        pipe_ = process_.mypopen(command->c_str(), "r");
+HostCommand::HostCommand(FromText, const Command& command) : reader_(command.shown()) {
+    if (const char* const text = command.toRun()) {
+        pipe_ = process_.mypopen(std::string(text), "r");
+    } else {
+        pipe_ = process_.mypopen(nullptr, "r");
+        MyProcess::logOpenPipes();
     }
 }
 
-HostCommand::HostCommand(FromText, const std::string& command) : reader_(command) {
-    if (fits(command)) {
-        pipe_ = process_.mypopen(command, "r");
-    }
-}
-
-HostCommand HostCommand::fromText(const std::string& command) {
+HostCommand HostCommand::fromText(const Command& command) {
     return {FromText{}, command};
 }
 
@@ -75,12 +132,12 @@ FirstLine firstLine(HostCommand&& command) {
     return {command.started(), command.nextLine()};
 }
 
-FirstLine firstLine(const std::optional<std::string>& command) {
+FirstLine firstLine(const Command& command) {
     return firstLine(HostCommand(command));
 }
 
-PlainCommand::PlainCommand(const std::optional<std::string>& command)
-    : reader_(command.value_or("")), pipe_(command ? popen(command->c_str(), "r") : nullptr) {}
+PlainCommand::PlainCommand(const Command& command)
+    : reader_(command.shown()), pipe_(command.toRun() != nullptr ? popen(command.toRun(), "r") : nullptr) {}
 
 PlainCommand::~PlainCommand() {
     closePipe(pipe_);
@@ -90,9 +147,9 @@ std::optional<std::string> PlainCommand::nextLine() {
     return reader_.nextLine(pipe_, kCommandBuffer - 1);
 }
 
-void runToEnd(const std::string& command) {
-    if (fits(command)) {
-        [[maybe_unused]] const int status = system(command.c_str());
+void runToEnd(const Command& command) {
+    if (const char* const text = command.toRun()) {
+        [[maybe_unused]] const int status = system(text);
     }
 }
 

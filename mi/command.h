@@ -1,11 +1,15 @@
 #pragma once
 
+#include <array>
 #include <cstddef>
 #include <cstdio>
 #include <optional>
+#include <span>
 #include <string>
+#include <string_view>
 #include <utility>
 
+#include "mi/command_format.h"
 #include "mi/my_process.h"
 
 namespace IC {
@@ -13,11 +17,55 @@ namespace IC {
 constexpr std::size_t kCommandBuffer =
     512;  ///< bytes of a command line and of a line read, the final zero included
 
-/// The command line a format makes, or nothing when it would not fit its 512 bytes: then it is logged at
-/// level 6000 and never run, since half a command is another command.
-[[gnu::format(printf, 1, 2)]] std::optional<std::string> formatCommand(const char* format, ...);
+/// A command that may be run: one that stands in the source as it is, or one whose texts the gate has judged.
+/// Nothing else can be made into one.
+///
+/// The gate: no text of the host or of a caller reaches the shell that the shell could read as anything but
+/// that text. Judged is the text without line breaks at its end and without blanks at both ends. Bare it may
+/// hold letters, digits, bytes above 127 and ._:@%+=,/- and not begin with "-"; between double quotes
+/// anything but control characters (tabs and line breaks are fine), ", $, ` and \. The empty text passes. A
+/// text enters as it came, but where it stands bare before more of the command the line breaks at its end are
+/// cut.
+class Command {
+public:
+    enum class Length { ofBuffer, any };
 
-constexpr std::size_t kMostOutput = 2UL << 20U;  ///< bytes that are read of one command's output
+    template <std::size_t size>
+    consteval Command(const char (&text)[size]) : fixed_(text) {}
+    template <std::size_t count>
+    Command(const CommandFormat<count>& format, const std::array<std::string_view, count>& texts,
+            Length length, const char* function)
+        : Command(format.format(), format.slots(), texts, length, function) {}
+
+    /// Null when it was refused; then it counts as a command that could not be started.
+    const char* toRun() const;
+    /// For messages: one that was refused with its control characters spelt out.
+    std::string shown() const;
+
+private:
+    using Slots = std::span<const TextSlot>;
+    using Texts = std::span<const std::string_view>;
+    Command(std::string_view format, Slots slots, Texts texts, Length length, const char* function);
+
+    const char* fixed_ = nullptr;
+    std::optional<std::string> made_;
+    bool refused_ = false;
+};
+
+/// The command that a format of the source makes with these texts. One that the gate refuses, or that would
+/// not fit its 512 bytes, is named at level 6000 and never run: half a command is another command.
+template <class... Texts>
+Command formatCommand(CommandFormat<sizeof...(Texts)> format, const Texts&... texts) {
+    return {format, std::array<std::string_view, sizeof...(Texts)>{texts...}, Command::Length::ofBuffer,
+            __func__};
+}
+/// The same for a command that is handed over as a string: it may be as long as it likes.
+template <class... Texts>
+Command textCommand(CommandFormat<sizeof...(Texts)> format, const Texts&... texts) {
+    return {format, std::array<std::string_view, sizeof...(Texts)>{texts...}, Command::Length::any, __func__};
+}
+
+constexpr std::size_t kMostOutput = 64UL << 20U;  ///< bytes that are read of one command's output
 
 /// The lines of a command's output, as far as anybody wants to know: a tool that has gone mad can print for
 /// ever. The rest is not read, which ends the command.
@@ -35,10 +83,9 @@ private:
 /// for, when the object goes.
 class HostCommand {
 public:
-    /// @param command what formatCommand gave; nothing counts as a command that could not be started
-    explicit HostCommand(const std::optional<std::string>& command);
-    /// Runs a text that was put together from pieces; the number of open pipes is logged.
-    static HostCommand fromText(const std::string& command);
+    explicit HostCommand(const Command& command);
+    /// Runs a command that is handed over as a string; the number of open pipes is logged.
+    static HostCommand fromText(const Command& command);
     HostCommand(const HostCommand&) = delete;
     HostCommand& operator=(const HostCommand&) = delete;
 
@@ -49,7 +96,7 @@ public:
 
 private:
     struct FromText {};
-    HostCommand(FromText, const std::string& command);
+    HostCommand(FromText, const Command& command);
 
     MyProcess process_;
     OutputReader reader_;
@@ -62,12 +109,12 @@ struct FirstLine {
     std::optional<std::string> line;  ///< as it came, its line break included; nothing when none was printed
 };
 FirstLine firstLine(HostCommand&& command);
-FirstLine firstLine(const std::optional<std::string>& command);
+FirstLine firstLine(const Command& command);
 
 /// A command read through a plain pipe: not counted among the open pipes.
 class PlainCommand {
 public:
-    explicit PlainCommand(const std::optional<std::string>& command);
+    explicit PlainCommand(const Command& command);
     PlainCommand(const PlainCommand&) = delete;
     PlainCommand& operator=(const PlainCommand&) = delete;
     ~PlainCommand();
@@ -81,6 +128,6 @@ private:
 };
 
 /// Runs a command to its end, for what it does. Its exit status is not examined.
-void runToEnd(const std::string& command);
+void runToEnd(const Command& command);
 
 }  // namespace IC

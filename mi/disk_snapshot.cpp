@@ -29,7 +29,7 @@ bool foundRoom() {
 
 }  // namespace
 
-HostCommand startUnderFileLock(const std::optional<std::string>& command) {
+HostCommand startUnderFileLock(const Command& command) {
     const FileLock lock;
     return HostCommand(command);
 }

@@ -12,7 +12,7 @@ inline constexpr char diskSnapshotCommand[] = "fdisk -ls 2>/dev/null > /tmp/fdis
 
 /// Starts a command that touches the disk snapshot while it holds the file lock. The output is read after the
 /// lock has been released.
-HostCommand startUnderFileLock(const std::optional<std::string>& command);
+HostCommand startUnderFileLock(const Command& command);
 
 /// Writes the snapshot. It is whole when this returns: leaving waits for fdisk.
 /// @return false when fdisk could not be started, a signal ended it, or its disk is full: it is not whole

@@ -46,7 +46,7 @@ MyProcess::~MyProcess() {
 }
 
 FILE* MyProcess::mypopen(const char* command, const char* mode) {
-    pipe_ = popen(command, mode);
+    pipe_ = command != nullptr ? popen(command, mode) : nullptr;
     ++cnt;
     return pipe_;
 }
@@ -54,8 +54,12 @@ FILE* MyProcess::mypopen(const char* command, const char* mode) {
 FILE* MyProcess::mypopen(std::string command, const char* mode) {
     const Operation operation;
     mypopen(command.c_str(), mode);
-    log(kProgress) << "mypopen():  Count value " << cnt.load();
+    logOpenPipes();
     return pipe_;
+}
+
+void MyProcess::logOpenPipes() {
+    log(kProgress, "mypopen") << "mypopen():  Count value " << cnt.load();
 }
 
 }  // namespace IC

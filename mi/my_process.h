@@ -19,11 +19,15 @@ public:
     ~MyProcess();
 
     /// Runs the command in the shell.
+    /// @param command null for one that was refused: it counts as one that could not be started
     /// @param mode "r" to read its output
     /// @return the pipe, owned by this object; null when the shell could not be started
     FILE* mypopen(const char* command, const char* mode);
     /// The same; the number of open pipes is logged.
     FILE* mypopen(std::string command, const char* mode);
+
+    /// The line of a command that was handed over as a string.
+    static void logOpenPipes();
 
 private:
     FILE* pipe_;

@@ -40,4 +40,18 @@ std::string trimStart(std::string text, char unwanted) {
     return text;
 }
 
+std::string printable(std::string_view text, char also) {
+    constexpr char kHex[] = "0123456789abcdef";
+    std::string shown;
+    for (const char letter : text) {
+        const auto byte = static_cast<unsigned char>(letter);
+        if (byte >= ' ' && byte != 0x7fU && letter != also) {
+            shown += letter;
+        } else {
+            shown.append("\\x").append({kHex[byte / 16U], kHex[byte % 16U]});
+        }
+    }
+    return shown;
+}
+
 }  // namespace IC

@@ -23,7 +23,7 @@ bool scopeKind(const std::string& name, unsigned int& kind) {
     const FirstLine scope =
         firstLine(formatCommand("ifconfig %s 2> /dev/null | grep \"Scope:\" | tr -s ' ' | cut -d ' ' -f5"
                                 " | cut -d ':' -f2 2> /dev/null",
-                                name.c_str()));
+                                name));
     if (!scope.line) {
         return false;
     }
@@ -53,14 +53,13 @@ bool getIPv4Details(const std::string& name, std::string& address, std::string& 
     const FirstLine first =
         firstLine(formatCommand("ifconfig %s 2> /dev/null | grep \"inet addr:\" | tr -s ' ' | cut -d: -f2"
                                 " | cut -d ' ' -f1 2> /dev/null",
-                                name.c_str()));
+                                name));
     if (!first.line) {
         return false;
     }
     address = trimEnd(*first.line);
-    const FirstLine second = firstLine(
-        formatCommand("ifconfig %s 2> /dev/null | grep \"inet addr:\" | tr -s ' ' | cut -d: -f4 2> /dev/null",
-                      name.c_str()));
+    const FirstLine second = firstLine(formatCommand(
+        "ifconfig %s 2> /dev/null | grep \"inet addr:\" | tr -s ' ' | cut -d: -f4 2> /dev/null", name));
     if (!second.line) {
         return false;
     }
@@ -70,8 +69,7 @@ bool getIPv4Details(const std::string& name, std::string& address, std::string& 
 
 bool getAddressDetails(const std::string& line, std::string& address, unsigned int& prefixLength) {
     const LogScope scope;
-    const std::string quoted = '"' + line + '"';
-    PlainCommand fields(formatCommand("echo %s | tr -s ' ' | cut -d ' ' -f3 2> /dev/null", quoted.c_str()));
+    PlainCommand fields(formatCommand("echo \"%s\" | tr -s ' ' | cut -d ' ' -f3 2> /dev/null", line));
     while (const auto buffer = fields.nextLine()) {
         if (auto found = parse::addressAndPrefix(*buffer)) {
             address = std::move(found->address);
@@ -89,7 +87,7 @@ bool getIPv6Address(const std::string& name, std::string& address, unsigned int&
     std::string autoconfigured;
     unsigned int autoconfiguredPrefix = 0;
     bool parsed = false;
-    PlainCommand listing(formatCommand("ip -6 address show dev %s | grep \"global\"", name.c_str()));
+    PlainCommand listing(formatCommand("ip -6 address show dev %s | grep \"global\"", name));
     while (const auto line = listing.nextLine()) {
         if (!parse::isAutoconfigured(*line)) {
             return getAddressDetails(*line, address, prefixLength);

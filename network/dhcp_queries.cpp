@@ -9,8 +9,7 @@ namespace IC {
 
 bool checkIsDhcp(const std::string& name) {
     const LogScope scope("NetworkPortNode::checkIsDhcp ");
-    return firstLine(formatCommand("cat /var/lib/dhcpcd/dhcpcd-%s.info 2> /dev/null", name.c_str()))
-        .line.has_value();
+    return firstLine(formatCommand("cat /var/lib/dhcpcd/dhcpcd-%s.info 2> /dev/null", name)).line.has_value();
 }
 
 void getBootProto(const std::string& name, std::string& keyword) {

@@ -10,7 +10,7 @@ namespace IC {
 namespace {
 
 /// Runs a switch to its end.
-bool flip(const std::string& command) {
+bool flip(const Command& command) {
     return HostCommand(command).started();
 }
 

@@ -65,7 +65,7 @@ std::optional<std::string> interfaceFileValue(const std::string& ifName, const c
     return firstLine(
                formatCommand("cat /etc/sysconfig/network/ifcfg-eth-id-`ifconfig %s 2> /dev/null |grep HWaddr "
                              "|awk '{print $5}'|tr '[A-Z]' '[a-z]'` | grep %s | cut -d '=' -f2 2> /dev/null",
-                             ifName.c_str(), key))
+                             ifName, key))
         .line;
 }
 

@@ -25,8 +25,8 @@ bool getbridgeInterfaces(std::vector<std::string>& members) {
 }
 
 HostCommand bondMemberLines(const std::string& bond) {
-    return HostCommand::fromText("cat /proc/net/bonding/" + bond +
-                                 " 2> /dev/null | grep \"Slave Interface:\"");
+    return HostCommand::fromText(
+        textCommand("cat /proc/net/bonding/%s 2> /dev/null | grep \"Slave Interface:\"", bond));
 }
 
 bool getSlaveInterfaces(const std::string& bond, std::vector<std::string>& members) {

@@ -132,7 +132,8 @@ Error readIPv6Gateway(const Config& config, PropertyValue& out) {
 }
 
 bool isListed(const std::string& bond) {
-    return firstLine(HostCommand::fromText("ifconfig | grep " + bond + " 2> /dev/null")).line.has_value();
+    return firstLine(HostCommand::fromText(textCommand("ifconfig | grep %s 2> /dev/null", bond)))
+        .line.has_value();
 }
 
 Error readLinkState(const Config& config, PropertyValue& out) {

@@ -23,7 +23,7 @@ std::vector<std::string> dhcpServersOf(const std::string& name) {
     std::vector<std::string> servers;
     const FirstLine lease = firstLine(formatCommand(
         "cat /var/lib/dhcpcd/dhcpcd-%s.info 2> /dev/null | grep DHCPSID | cut -d '=' -f2 2> /dev/null",
-        name.c_str()));
+        name));
     if (lease.line) {
         servers.push_back(parse::unquoted(*lease.line));
     }
@@ -34,7 +34,7 @@ std::vector<std::string> dhcpServersOf(const std::string& name) {
 }
 
 std::string ipv6InterfaceIdOf(const std::string& address) {
-    const FirstLine group = firstLine(formatCommand("echo %s | cut -d: -f4 2> /dev/null", address.c_str()));
+    const FirstLine group = firstLine(formatCommand("echo %s | cut -d: -f4 2> /dev/null", address));
     const std::string text = trimEnd(group.line.value_or(""));
     return text.substr(0, text.find(' '));
 }

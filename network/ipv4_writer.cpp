@@ -26,14 +26,14 @@ std::string bootProtoLine(unsigned int origin, bool dhcpv6Known) {
 }
 
 /// The command that takes an interface to a status; "" for a status that is none.
-std::string statusCommand(const std::string& ifName, unsigned int status) {
+Command statusCommand(const std::string& ifName, unsigned int status) {
     switch (status) {
         case 1:
         case 9:
-            return "ifconfig " + ifName + " up";
+            return textCommand("ifconfig %s up", ifName);
         case 12:
         case 16:
-            return "ifconfig " + ifName + " down";
+            return textCommand("ifconfig %s down", ifName);
         default:
             return "";
     }
@@ -81,15 +81,14 @@ void setSubnetMask(std::string ifName, std::string mask, std::string mac) {
     if (!file.write("Writing Subnet to File")) {
         log(kError) << "Failed to open the file for writing";
     }
-    if (!HostCommand(formatCommand("ifconfig %s netmask %s", ifName.c_str(), mask.c_str())).started()) {
+    if (!HostCommand(formatCommand("ifconfig %s netmask %s", ifName, mask)).started()) {
         log(kError) << "Can not Change Subnet Mask.";
     }
 }
 
 void setIPV4Gateway(std::string ifName, std::string ipAddress, std::string gateway) {
     const LogScope scope("Entering setIPV4Gateway", "Exiting setIPV4Gateway");
-    if (!HostCommand(formatCommand("route del -host %s gw %s %s 2> /dev/null", ipAddress.c_str(),
-                                   gateway.c_str(), ifName.c_str()))
+    if (!HostCommand(formatCommand("route del -host %s gw %s %s 2> /dev/null", ipAddress, gateway, ifName))
              .started()) {
         return;
     }
@@ -118,8 +117,8 @@ void setInterfaceStatus(const std::string& ifName, unsigned int status) {
         log(kProgress) << "Status updation for bonded interface. New status is: " << status;
         return;
     }
-    const std::string command = statusCommand(ifName, status);
-    if (command.empty()) {
+    const Command command = statusCommand(ifName, status);
+    if (command.shown().empty()) {
         log(kError) << "IPConfigNode::setProperty: Invalid status request.";
     }
     HostCommand::fromText(command);  // an empty command is run as well: it changes nothing

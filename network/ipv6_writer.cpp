@@ -42,9 +42,9 @@ void setIPv6GatewayForSuSe10(std::string const& ifName, std::string const& gatew
     std::vector<std::string> gateways;
     getStaticIPV6GatewaysOnSuSe10(ifName, gateways);
     const bool isPresent = std::erase(gateways, gateway) > 0;
-    if (!isPresent && !HostCommand(formatCommand("ip -6 route add default via %s dev %s 2> /dev/null",
-                                                 gateway.c_str(), ifName.c_str()))
-                           .started()) {
+    if (!isPresent &&
+        !HostCommand(formatCommand("ip -6 route add default via %s dev %s 2> /dev/null", gateway, ifName))
+             .started()) {
         log(kError) << "Could not execute 'ip -6 route add default' command";
         return;
     }
@@ -59,7 +59,7 @@ bool getStaticIPV6GatewaysOnSuSe10(std::string const& ifName, std::vector<std::s
     HostCommand routes(
         formatCommand("route -A inet6 -n 2> /dev/null | grep %s | grep UG | grep -v UGDA"
                       " | tr -s ' ' | cut -d ' ' -f2 2> /dev/null",
-                      ifName.c_str()));
+                      ifName));
     bool any = false;
     while (const auto line = routes.nextLine()) {
         gateways.push_back(trimEnd(*line));
@@ -71,9 +71,7 @@ bool getStaticIPV6GatewaysOnSuSe10(std::string const& ifName, std::vector<std::s
 void deleteStaticIPv6GatewayOnSuSe10(std::string const& ifName, std::vector<std::string> const& gateways) {
     const LogScope scope;
     for (const std::string& gateway : gateways) {
-        std::string command = "ip -6 route delete default via ";
-        command.append(gateway).append(" dev ").append(ifName);
-        HostCommand::fromText(command);
+        HostCommand::fromText(textCommand("ip -6 route delete default via %s dev %s", gateway, ifName));
     }
 }
 

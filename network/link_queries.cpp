@@ -13,7 +13,7 @@ namespace IC {
 namespace {
 
 /// First line of an `ethtool` pipeline, which all report a shell that cannot be started in the same words.
-std::optional<std::string> ethtoolLine(const std::optional<std::string>& command) {
+std::optional<std::string> ethtoolLine(const Command& command) {
     const FirstLine answer = firstLine(command);
     if (!answer.started) {
         log(kError) << "NetworkPort getProperty - ethtool error";
@@ -22,8 +22,8 @@ std::optional<std::string> ethtoolLine(const std::optional<std::string>& command
 }
 
 bool isMiiStatusUp(const std::string& bond) {
-    const FirstLine status = firstLine(
-        HostCommand::fromText("cat /proc/net/bonding/" + bond + " 2> /dev/null | grep \"MII Status:\""));
+    const FirstLine status = firstLine(HostCommand::fromText(
+        textCommand("cat /proc/net/bonding/%s 2> /dev/null | grep \"MII Status:\"", bond)));
     if (!status.started) {
         log(kError) << "isNICUp - cat /proc/net/bonding/bond* error";
     }
@@ -51,7 +51,7 @@ bool areMembersUp(const std::string& bond) {
 bool getNetworkSpeed(const std::string& name, unsigned long long& speed) {
     const LogScope scope;
     const auto line = ethtoolLine(formatCommand(
-        "ethtool %s 2> /dev/null | grep Speed | tr -s ' ' | cut -d ' ' -f2 2> /dev/null", name.c_str()));
+        "ethtool %s 2> /dev/null | grep Speed | tr -s ' ' | cut -d ' ' -f2 2> /dev/null", name));
     if (line) {
         speed = parse::networkSpeed(*line);
     }
@@ -60,14 +60,13 @@ bool getNetworkSpeed(const std::string& name, unsigned long long& speed) {
 
 bool getNetworkDuplex(const std::string& name) {
     const LogScope scope;
-    const auto line = ethtoolLine(formatCommand("ethtool %s 2> /dev/null | grep Duplex", name.c_str()));
+    const auto line = ethtoolLine(formatCommand("ethtool %s 2> /dev/null | grep Duplex", name));
     return line && parse::isFullDuplex(*line);
 }
 
 bool getAutoSense(const std::string& name) {
     const LogScope scope;
-    const auto line =
-        ethtoolLine(formatCommand("ethtool %s 2> /dev/null | grep Auto-negotiation", name.c_str()));
+    const auto line = ethtoolLine(formatCommand("ethtool %s 2> /dev/null | grep Auto-negotiation", name));
     return line && parse::isAutoSense(*line);
 }
 
@@ -76,7 +75,7 @@ void getHardwareAddress(std::string name, std::string& address) {
     const FirstLine answer =
         firstLine(formatCommand("ifconfig %s 2> /dev/null |grep HWaddr |awk '{print $5}'"
                                 "|tr '[A-Z]' '[a-z]' 2> /dev/null",
-                                name.c_str()));
+                                name));
     if (!answer.started) {
         log(kProgress) << "getHardwareAddress: Can not get Hardware Address for SLES machine";
         return;
@@ -88,10 +87,9 @@ bool isInterfaceUP(std::string name) {
     const LogScope scope;
     // The blank at the end is nothing to the shell: the name is looked for anywhere in the lines, and eth1
     // finds eth10. A bond's aliases (bond0:1) are found by their bond's name this way.
-    name += ' ';
     const auto command = access(ifconfigSnapshotPath, R_OK) == 0
-                             ? formatCommand("cat %s | grep %s", ifconfigSnapshotPath, name.c_str())
-                             : formatCommand("ifconfig | grep %s", name.c_str());
+                             ? formatCommand("cat %s | grep %s ", ifconfigSnapshotPath, name)
+                             : formatCommand("ifconfig | grep %s ", name);
     return firstLine(command).line.has_value();
 }
 
@@ -100,8 +98,8 @@ bool isNICUp(std::string name) {
     if (contains(name, "bond")) {
         return isMiiStatusUp(name) && areMembersUp(name);
     }
-    const FirstLine answer =
-        firstLine(HostCommand::fromText("ethtool " + name + " 2> /dev/null" + " | grep \"Link detected\""));
+    const FirstLine answer = firstLine(
+        HostCommand::fromText(textCommand("ethtool %s 2> /dev/null | grep \"Link detected\"", name)));
     if (!answer.started) {
         log(kError) << "isNICUp - ethtool error";
     }

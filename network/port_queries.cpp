@@ -21,15 +21,14 @@ unsigned int parse::baseTSpeed(const std::string& mode) {
 
 std::string getSupportedLinkMode(const std::string& name) {
     const LogScope scope;
-    const FirstLine answer = firstLine(
-        formatCommand("ethtool %s 2> /dev/null | grep \"Supported link modes\" | tr -s ' ' | cut -d ' ' -f4",
-                      name.c_str()));
+    const FirstLine answer = firstLine(formatCommand(
+        "ethtool %s 2> /dev/null | grep \"Supported link modes\" | tr -s ' ' | cut -d ' ' -f4", name));
     return parse::linkMode(answer.line.value_or(""));
 }
 
 WakeOnLan getWakeOnLan(const std::string& name) {
     const LogScope scope;
-    HostCommand command(formatCommand("ethtool %s 2> /dev/null | grep \"Wake-on\"", name.c_str()));
+    HostCommand command(formatCommand("ethtool %s 2> /dev/null | grep \"Wake-on\"", name));
     WakeOnLan found;
     while (const auto line = command.nextLine()) {
         (contains(*line, "Supports Wake-on") ? found.supported : found.enabled) = true;

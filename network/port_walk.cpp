@@ -42,12 +42,12 @@ bool isVMware() {
 }  // namespace
 
 IfconfigSnapshot::IfconfigSnapshot() {
-    runToEnd(std::string("ifconfig > ") + ifconfigSnapshotPath);
+    runToEnd(formatCommand("ifconfig > %s", ifconfigSnapshotPath));
 }
 
 IfconfigSnapshot::~IfconfigSnapshot() {
     try {
-        runToEnd(std::string("rm -rf ") + ifconfigSnapshotPath);
+        runToEnd(formatCommand("rm -rf %s", ifconfigSnapshotPath));
     } catch (const std::exception& failure) {
         logPortFailure(failure);
     }
@@ -65,7 +65,7 @@ std::vector<std::string> PortWalk::list() {
     if (vmware) {
         log(kProgress) << "Machine has vmware";
     }
-    HostCommand listing(vmware ? kListVMware : kListInterfaces);
+    HostCommand listing(vmware ? Command(kListVMware) : Command(kListInterfaces));
     std::vector<std::string> lines;
     while (auto line = listing.nextLine()) {
         lines.push_back(std::move(*line));
@@ -115,7 +115,7 @@ bool PortWalk::isPort(const std::string& name) const {
 }
 
 bool PortWalk::hasIPConfig(const std::string& name) {
-    return firstLine(formatCommand("ifconfig -a | grep %s 2> /dev/null", name.c_str())).line.has_value();
+    return firstLine(formatCommand("ifconfig -a | grep %s 2> /dev/null", name)).line.has_value();
 }
 
 void logPortFailure(const std::exception& failure) {

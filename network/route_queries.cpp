@@ -11,7 +11,7 @@ namespace {
 
 constexpr char kOnLink[] = "0.0.0.0";  ///< what `route -n` prints for a route without a gateway
 
-bool firstLineInto(const std::optional<std::string>& command, std::string& text) {
+bool firstLineInto(const Command& command, std::string& text) {
     const FirstLine answer = firstLine(command);
     if (answer.line) {
         text = trimEnd(*answer.line);
@@ -25,7 +25,7 @@ bool getIPV4Gateway(const std::string& name, std::string& gateway) {
     const LogScope scope;
     gateway.clear();
     {
-        HostCommand routes(formatCommand("route -n | grep %s | tr -s ' ' 2> /dev/null", name.c_str()));
+        HostCommand routes(formatCommand("route -n | grep %s | tr -s ' ' 2> /dev/null", name));
         if (!routes.started()) {
             return false;
         }
@@ -51,7 +51,7 @@ bool getIPV6Gateway(const std::string& name, std::string& gateway) {
     gateway.clear();
     return firstLineInto(formatCommand("route -A inet6 -n 2> /dev/null | grep %s | grep UG | tr -s ' '"
                                        " | cut -d ' ' -f2 2> /dev/null",
-                                       name.c_str()),
+                                       name),
                          gateway);
 }
 

@@ -56,7 +56,7 @@ void deleteSavedConfigurations() {
             continue;
         }
         log(kProgress) << "Deleting " << path;
-        if (!HostCommand(formatCommand("rm %s 2> /dev/null", path.c_str())).started()) {
+        if (!HostCommand(formatCommand("rm %s 2> /dev/null", path)).started()) {
             log(kProgress) << "Could not delete " << path;
         }
     }

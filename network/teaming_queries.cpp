@@ -25,7 +25,7 @@ std::string statusFile(const std::string& team) {
 }
 
 /// The first line a command prints, without its line break; "" when it prints none.
-std::string answer(const std::optional<std::string>& command) {
+std::string answer(const Command& command) {
     return trimEnd(firstLine(command).line.value_or(""));
 }
 
@@ -53,8 +53,8 @@ std::string activeMember(const std::string& team, const std::string& port) {
     // The search for eth1 also finds eth10: while eth10 is active, both ports say so. Readers have always
     // been told this.
     return answer(formatCommand(
-        "cat /proc/net/bonding/%s 2> /dev/null | grep -i \"Currently Active Slave: %s\" 2> /dev/null",
-        team.c_str(), port.c_str()));
+        "cat /proc/net/bonding/%s 2> /dev/null | grep -i \"Currently Active Slave: %s\" 2> /dev/null", team,
+        port));
 }
 
 /// The member's section, read without a tool. A `grep` that works line by line, as most do, can never match
@@ -68,7 +68,7 @@ std::string miiStatus(const std::string& team, const std::string& port) {
     std::string status = answer(
         formatCommand("cat /proc/net/bonding/%s 2> /dev/null | grep -P \"Slave Interface: %s\\nMII Status\" "
                       "2> /dev/null | grep \"MII Status: \" 2> /dev/null | cut -d' ' -f3 2> /dev/null",
-                      team.c_str(), port.c_str()));
+                      team, port));
     return status.empty() ? sectionOf(team, port).miiStatus : status;
 }
 
@@ -77,7 +77,7 @@ std::string linkFailures(const std::string& team, const std::string& port, const
         answer(formatCommand("cat /proc/net/bonding/%s 2> /dev/null | grep -P \"Slave Interface: %s\\nMII "
                              "Status: %s\\n\" 2> /dev/null "
                              "| grep \"Link Failure Count: \" 2> /dev/null | cut -d ' ' -f4 2> /dev/null",
-                             team.c_str(), port.c_str(), status.c_str()));
+                             team, port, status));
     if (!count.empty()) {
         return count;
     }
@@ -108,7 +108,7 @@ bool getBondingMode(std::string team, std::string& mode) {
     mode.clear();
     const FirstLine first = firstLine(formatCommand(
         "cat /proc/net/bonding/%s 2> /dev/null | grep \"Bonding Mode: \" | cut -d ':' -f2 2> /dev/null",
-        team.c_str()));
+        team));
     if (first.line) {
         mode = behindColon(*first.line);
     }
@@ -119,7 +119,7 @@ bool getBondingMembers(std::string team, std::vector<std::string>& members) {
     const LogScope scope("Entering getBondingMembers", "Exiting getBondingMembers");
     HostCommand listing(formatCommand(
         "cat /proc/net/bonding/%s 2> /dev/null | grep \"Slave Interface: \" | cut -d ':' -f2 2> /dev/null",
-        team.c_str()));
+        team));
     bool any = false;
     while (const auto line = listing.nextLine()) {
         members.push_back(behindColon(*line));

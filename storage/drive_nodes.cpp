@@ -52,7 +52,7 @@ void OsHwMI::createHardDriveNodes(bool update) {
 
 std::unique_ptr<MutableNode> OsHwMI::buildHardDrive(const std::string& line, unsigned int index,
                                                     bool update) {
-    const auto answer = askAboutLine(formatCommand("echo \"%s\" | cut -d \" \" -f2", line.c_str()));
+    const auto answer = askAboutLine(formatCommand("echo \"%s\" | cut -d \" \" -f2", line));
     const std::string device = trimEnd(answer.value_or(""), ':');
     if (!isDrive(device)) {
         return nullptr;
@@ -62,7 +62,7 @@ std::unique_ptr<MutableNode> OsHwMI::buildHardDrive(const std::string& line, uns
     log(kProgress) << (update ? "Hard Drive Update created " : "New Hard Drive Node created ") << device;
     node->setDescription("Hard Drive");
     node->setStatus(kStatusGood);
-    const auto size = askAboutLine(formatCommand("echo \"%s\" | cut -d \" \" -f5", line.c_str()));
+    const auto size = askAboutLine(formatCommand("echo \"%s\" | cut -d \" \" -f5", line));
     if (!size) {
         return nullptr;
     }

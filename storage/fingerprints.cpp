@@ -12,7 +12,7 @@ namespace IC {
 namespace {
 
 struct Digest {
-    const char* command;
+    Command command;
     const char* logged;
 };
 

@@ -46,8 +46,7 @@ std::unique_ptr<MutableNode> OsHwMI::buildPartition(const std::string& line, uns
     node->setDescription("Partition");
     node->setProperty(DiskPartition::devicePath, PropertyValue(device, true));
     node->setProperty(DiskPartition::partitionName, PropertyValue(device, true));
-    const auto answer =
-        askAboutLine(formatCommand("echo \"%s\" |  tr -s '*' ' '  | cut -d ' ' -f4", line.c_str()));
+    const auto answer = askAboutLine(formatCommand("echo \"%s\" |  tr -s '*' ' '  | cut -d ' ' -f4", line));
     if (!answer) {
         return nullptr;
     }

@@ -27,10 +27,10 @@ std::optional<std::string> nextEntry(HostCommand& listing) {
 
 }  // namespace
 
-std::optional<std::string> askAboutLine(const std::optional<std::string>& command) {
+std::optional<std::string> askAboutLine(const Command& command) {
     HostCommand answer = startUnderFileLock(command);
     if (!answer.started()) {
-        log(kError) << "Command : " << command.value_or("") << " failed!!";
+        log(kError) << "Command : " << command.shown() << " failed!!";
         return std::nullopt;
     }
     return trimEnd(answer.nextLine().value_or(""));
@@ -58,7 +58,7 @@ void OsHwMI::buildStorageNodes(const StorageKind& kind, bool update) {
     nodes.clear();
     HostCommand listing = startUnderFileLock(kind.listing);
     if (!listing.started()) {
-        log(kError) << "fdisk command " << kind.listing << " failed!!";
+        log(kError) << "fdisk command " << kind.listing.shown() << " failed!!";
         return;
     }
     while (const std::optional<std::string> line = nextEntry(listing)) {

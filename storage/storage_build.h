@@ -5,13 +5,14 @@
 #include <string>
 #include <vector>
 
+#include "mi/command.h"
 #include "mi/os_hw_mi.h"
 
 namespace IC {
 
 /// What the builders of drives and of partitions differ in; the frame around it is buildStorageNodes.
 struct OsHwMI::StorageKind {
-    const char* listing;        ///< the command that prints one line per candidate
+    Command listing;            ///< the command that prints one line per candidate
     const char* withdrawnText;  ///< logged before the description of a node that goes
     const char* publishedText;
     std::vector<Node*> OsHwMI::*nodes;
@@ -21,6 +22,6 @@ struct OsHwMI::StorageKind {
 
 /// The first line that a command about one line of the listing prints, without its line break, "" when it
 /// prints none. Nothing when it could not be started: that is logged, and the line it is about is skipped.
-std::optional<std::string> askAboutLine(const std::optional<std::string>& command);
+std::optional<std::string> askAboutLine(const Command& command);
 
 }  // namespace IC

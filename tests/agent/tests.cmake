@@ -44,7 +44,8 @@ corvista_test(agent_hostile LIBRARIES agent_code test_support LABELS threads SOU
   agent/command_deadline_test.cpp
   agent/hostile_output_test.cpp
   agent/hostile_surroundings_test.cpp
-  agent/hostile_test.cpp)
+  agent/hostile_test.cpp
+  agent/refused_name_test.cpp)
 target_compile_definitions(agent_hostile_test PRIVATE ${agent_test_programs} CLOCK_JUMP_LIBRARY="$<TARGET_FILE:clockjump>")
 add_dependencies(agent_hostile_test cvagent clockjump fake_plugin vantrelcvicoshwmi)
 

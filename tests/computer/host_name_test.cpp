@@ -124,23 +124,28 @@ HOST_TEST(NameChange, WithoutADomainSetsTheBareNameAndWritesALoneDot) {
     EXPECT_EQ(host.read(kHostName), "alpha.");
 }
 
-HOST_TEST(NameChange, CutsLineBreaksForTheFilesAlone) {
+HOST_TEST(NameChange, CutsLineBreaks) {
     host.recordOnly("hostname");
     host.file(kHosts, "");
     IC::executeDomainandHostnameChanges("alpha\n\n", "example.org\n", true, "");
-    EXPECT_EQ(host.callsOf("hostname").front(), "hostname alpha")
-        << "the shell ends a command at a line break";
+    EXPECT_THAT(host.calls(), TextsAre("hostname alpha.example.org"));
     EXPECT_EQ(host.read(kHosts), "127.0.0.2\talpha.example.org\talpha\n");
     EXPECT_EQ(host.read(kHostName), "alpha.example.org");
 }
 
-HOST_TEST(NameChange, HandsTheShellEveryNameAsItIs) {
+HOST_TEST(NameChange, StopsBeforeTheFilesWhenANameIsMoreThanAName) {
     host.recordOnly("hostname");
     host.recordOnly("reboot");
     host.file(kHosts, "");
+    LogCapture capture;
     IC::executeDomainandHostnameChanges("alpha; reboot #", "example.org", true, "");
-    EXPECT_THAT(host.calls(), TextsAre("hostname alpha", "reboot"));
-    EXPECT_EQ(host.read(kHosts), "127.0.0.2\talpha; reboot #.example.org\talpha; reboot #\n");
+    IC::executeDomainandHostnameChanges("alpha", "`reboot`", true, "");
+    EXPECT_THAT(host.calls(), IsEmpty());
+    EXPECT_EQ(host.read(kHosts), "");
+    EXPECT_EQ(capture.messages()[5],
+              "Command refused for its text \"alpha; reboot #\" (the \";\"), not run: "
+              "hostname alpha; reboot #.example.org");
+    EXPECT_EQ(capture.messages(6000).back(), "Could not set HostName !!");
 }
 
 HOST_TEST(NameChange, TakesACommandOf511Bytes) {

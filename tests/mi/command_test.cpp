@@ -46,7 +46,7 @@ HOST_TEST(MyProcess, LeavesTheCountRaisedWhenTheCommandCouldNotBeStarted) {
 }
 
 HOST_TEST(HostCommand, GivesLinesAsTheyComeAndNothingAtTheEnd) {
-    HostCommand command(formatCommand("printf 'one\\n\\n%s'", "three"));
+    HostCommand command("printf 'one\\n\\nthree'");
     ASSERT_TRUE(command.started());
     EXPECT_EQ(command.nextLine(), "one\n");
     EXPECT_EQ(command.nextLine(), "\n");
@@ -55,16 +55,16 @@ HOST_TEST(HostCommand, GivesLinesAsTheyComeAndNothingAtTheEnd) {
 }
 
 HOST_TEST(HostCommand, GivesALongLineInPiecesOf511Characters) {
-    HostCommand command(std::string("printf '%0600d\\n' 0"));
+    HostCommand command("printf '%0600d\\n' 0");
     EXPECT_EQ(command.nextLine(), std::string(511, '0'));
     EXPECT_EQ(command.nextLine(), std::string(89, '0') + "\n");
-    HostCommand narrow(std::string("printf '%0200d\\n' 0"));
+    HostCommand narrow("printf '%0200d\\n' 0");
     EXPECT_EQ(narrow.nextLine(127), std::string(127, '0'));
 }
 
 HOST_TEST(HostCommand, YieldsNoLineForAMissingTool) {
     host.toolMissing("ethtool");
-    HostCommand command(std::string("ethtool eth0 2> /dev/null"));
+    HostCommand command("ethtool eth0 2> /dev/null");
     EXPECT_TRUE(command.started());
     EXPECT_EQ(command.nextLine(), std::nullopt);
 }
@@ -72,40 +72,35 @@ HOST_TEST(HostCommand, YieldsNoLineForAMissingTool) {
 HOST_TEST(HostCommand, NeverRunsACommandOf512Bytes) {
     const std::string name(512 - std::string("touch /tmp/").size(), 'x');
     LogCapture capture;
-    HostCommand command(formatCommand("touch /tmp/%s", name.c_str()));
+    HostCommand command(formatCommand("touch /tmp/%s", name));
     EXPECT_FALSE(command.started());
     EXPECT_EQ(command.nextLine(), std::nullopt);
-    EXPECT_FALSE(HostCommand::fromText("touch /tmp/" + name).started());
-    EXPECT_EQ(capture.messages(6000).size(), 2U);
+    EXPECT_EQ(capture.messages(6000).size(), 1U);
     EXPECT_TRUE(host.listDirectory("/tmp").empty());
-}
-
-HOST_TEST(HostCommand, NeverRunsWhatCannotBeWrittenInTheHostsLetters) {
-    const auto command = formatCommand("echo %ls", L"\u6771");
-    EXPECT_EQ(command, std::nullopt);
-    EXPECT_FALSE(HostCommand(command).started());
 }
 
 HOST_TEST(HostCommand, RunsACommandOf511Bytes) {
     const std::string padding(511 - std::string("echo ").size(), 'x');
-    HostCommand command(formatCommand("echo %s", padding.c_str()));
+    HostCommand command(formatCommand("echo %s", padding));
     ASSERT_TRUE(command.started());
     EXPECT_EQ(command.nextLine(), padding + "\n");
 }
 
 HOST_TEST(HostCommand, IsReadAsFarAsASaneOneGoes) {
+    EXPECT_EQ(IC::kMostOutput, 64U * 1024 * 1024);
     LogCapture capture;
-    HostCommand command(std::string("yes"));
+    HostCommand command("yes $(printf %0255d 0)");
     std::size_t read = 0;
     while (const auto line = command.nextLine()) {
         read += line->size();
     }
     EXPECT_EQ(read, IC::kMostOutput);
-    EXPECT_EQ(capture.messages(6000), std::vector<std::string>{"Output too long, the rest is not read: yes"});
+    EXPECT_EQ(capture.messages(6000),
+              std::vector<std::string>{"Output too long, the rest is not read: yes $(printf %0255d 0)"});
 }
 
 HOST_TEST(HostCommand, ZerosAreReadAsFarToo) {
-    IC::PlainCommand command(std::string("cat /dev/zero"));
+    IC::PlainCommand command("cat /dev/zero");
     std::size_t lines = 0;
     while (command.nextLine()) {
         ++lines;
@@ -115,26 +110,26 @@ HOST_TEST(HostCommand, ZerosAreReadAsFarToo) {
 
 HOST_TEST(CommandsCutOff, AreThoseThatASignalEnded) {
     const unsigned int before = IC::commandsCutOff();
-    { HostCommand fine(std::string("echo; exit 3")); }
-    { HostCommand unread(std::string("yes")); }
-    { HostCommand stage(std::string("yes | cat")); }
+    { HostCommand fine("echo; exit 3"); }
+    { HostCommand unread("yes"); }
+    { HostCommand stage("yes | cat"); }
     EXPECT_EQ(IC::commandsCutOff(), before);
-    { HostCommand killed(std::string("kill -KILL $$")); }
-    { HostCommand toolKilled(std::string("sh -c 'kill -SEGV $$'; exit $?")); }
-    { IC::PlainCommand plain(std::string("kill -TERM $$")); }
+    { HostCommand killed("kill -KILL $$"); }
+    { HostCommand toolKilled("sh -c 'kill -SEGV $$'; exit $?"); }
+    { IC::PlainCommand plain("kill -TERM $$"); }
     EXPECT_EQ(IC::commandsCutOff(), before + 3);
 }
 
 HOST_TEST(PlainCommand, IsNotCounted) {
     const int before = MyProcess::cnt;
-    IC::PlainCommand command(std::string("echo line"));
+    IC::PlainCommand command("echo line");
     EXPECT_EQ(MyProcess::cnt, before);
     EXPECT_EQ(command.nextLine(), "line\n");
     EXPECT_EQ(command.nextLine(), std::nullopt);
 }
 
 HOST_TEST(PlainCommand, LeavesNoProcessBehind) {
-    { const IC::PlainCommand command(std::string("true")); }
+    { const IC::PlainCommand command("true"); }
     EXPECT_EQ(waitpid(-1, nullptr, WNOHANG), -1);
     EXPECT_EQ(errno, ECHILD);
 }

@@ -1,4 +1,5 @@
 corvista_test(mi SOURCES
+  mi/command_gate_test.cpp
   mi/command_test.cpp
   mi/library_test.cpp
   mi/lifecycle_test.cpp
@@ -7,7 +8,9 @@ corvista_test(mi SOURCES
   mi/no_memory_test.cpp
   mi/operation_names.cpp
   mi/text_test.cpp
+  mi/texts_in_commands_test.cpp
   support/failing_new.cpp
+  support/text_takers.cpp
   LIBRARIES plugin_code test_support LABELS threads)
 target_compile_definitions(mi_test PRIVATE CORVISTA_PLUGIN="$<TARGET_FILE:vantrelcvicoshwmi>")
 add_dependencies(mi_test vantrelcvicoshwmi)

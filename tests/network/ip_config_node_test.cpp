@@ -79,7 +79,8 @@ HOST_TEST(IPConfigNode, ListsTheLeasesServerBeforeTheDHCPv6Server) {
 HOST_TEST(IPConfigNode, HasTheFourthGroupOfItsAddressForAnInterfaceId) {
     EXPECT_EQ(IC::ipv6InterfaceIdOf("2001:db8:1:2:3:4:5:6"), "2");
     EXPECT_EQ(IC::ipv6InterfaceIdOf("2001:db8::10"), "10");
-    EXPECT_EQ(IC::ipv6InterfaceIdOf("2001:db8:1:2 x:3"), "2") << "cut at the blank";
+    EXPECT_EQ(IC::ipv6InterfaceIdOf("2001:db8:1:2 x:3"), "") << "no blank enters the command";
+    EXPECT_EQ(IC::ipv6InterfaceIdOf("2001:db8:1:2 "), "2") << "cut at the blank";
     EXPECT_EQ(IC::ipv6InterfaceIdOf("fe80::1"), "");
     EXPECT_EQ(IC::ipv6InterfaceIdOf(""), "");
 }

@@ -172,7 +172,7 @@ HOST_TEST_F(Drives, EveryColonBehindTheDeviceGoes) {
 }
 
 HOST_TEST_F(Drives, ALineGoesToTheShellAsItIs) {
-    const std::string line = "Disk /dev/sda: 'x'  `y` ; | & 42";
+    const std::string line = "Disk /dev/sda: 'x'  *? ; | & #\t\xff 42";
     shell_stub::answerWith([&](const std::string& command) -> std::optional<std::string> {
         if (command == pathCommand(line)) return "/dev/sda:\n";
         if (command == sizeCommand(line)) return "5000\n";
@@ -183,6 +183,16 @@ HOST_TEST_F(Drives, ALineGoesToTheShellAsItIs) {
     EXPECT_THAT(drives(), ElementsAre(Seen{101, 1, "/dev/sda", 5}));
 }
 
+HOST_TEST_F(Drives, ALineThatTheShellWouldReadAnythingIntoIsSkipped) {
+    const std::string line = "Disk /dev/sda`y`: 80.0 GB, 1000 bytes";
+    LogCapture log;
+    build(host, line + "\nDisk /dev/sdb: 80.0 GB, 1000 bytes\n");
+    EXPECT_THAT(drives(), ElementsAre(Seen{101, 1, "/dev/sdb", 1}));
+    EXPECT_THAT(log.messages(6000), TextsAre("Command refused for its text \"" + line +
+                                                 "\" (the \"`\"), not run: " + pathCommand(line),
+                                             "Command : " + pathCommand(line) + " failed!!"));
+}
+
 HOST_TEST_F(Drives, ALineTooLongForItsCommandIsSkipped) {
     const std::string start = "Disk /dev/sda: 80.0 GB, 80026361856 ";
     const std::string fits = start + std::string(511 - pathCommand(start).size(), 'x');
@@ -190,8 +200,8 @@ HOST_TEST_F(Drives, ALineTooLongForItsCommandIsSkipped) {
     LogCapture log;
     build(host, tooLong + "\n" + fits + "\nDisk /dev/sdb: 80.0 GB, 1000 bytes\n");
     EXPECT_THAT(drives(), ElementsAre(Seen{101, 1, "/dev/sda", 80026361}, Seen{102, 2, "/dev/sdb", 1}));
-    EXPECT_THAT(log.messages(6000),
-                TextsAre("Command too long, not run: " + pathCommand(tooLong), "Command :  failed!!"));
+    EXPECT_THAT(log.messages(6000), TextsAre("Command too long, not run: " + pathCommand(tooLong),
+                                             "Command : " + pathCommand(tooLong) + " failed!!"));
     EXPECT_THAT(commands(), testing::Not(testing::Contains(pathCommand(tooLong))));
 }
 
@@ -204,8 +214,8 @@ HOST_TEST_F(Drives, TheRestOfALineTooLongForTheBufferIsNoDrive) {
     const std::string sdb = "Disk /dev/sdb: 80.0 GB, 1000 bytes";
     EXPECT_THAT(commands(), ElementsAre(kListing, pathCommand(sdb), sizeCommand(sdb)));
     const std::string refused = "Command too long, not run: " + pathCommand(full);
-    EXPECT_THAT(log.messages(6000),
-                ElementsAre(refused, "Command :  failed!!", refused, "Command :  failed!!"));
+    const std::string failed = "Command : " + pathCommand(full) + " failed!!";
+    EXPECT_THAT(log.messages(6000), ElementsAre(refused, failed, refused, failed));
 }
 
 HOST_TEST_F(Drives, ALineThatJustFitsTheBufferDoesNotSwallowTheNextOne) {
