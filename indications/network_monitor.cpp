@@ -6,7 +6,6 @@
 #include "indications/globals.h"
 #include "mi/globals.h"
 #include "mi/log.h"
-#include "mi/my_process.h"
 #include "mi/os_hw_mi.h"
 
 namespace IC {
@@ -50,11 +49,10 @@ void* NetworkMonitor::run(void*) {
 }
 
 void NetworkMonitor::pass() {
-    const unsigned int before = commandsCutOff();
     myoshwmi.readPrevNetNodeMap();
     myoshwmi.createCurNetNodeMap();
-    if (stopRequested_ || commandsCutOff() != before) {
-        return;  // what a killed command answered is not the host's state
+    if (stopRequested_) {
+        return;  // the stop may have ended commands: what they answered is not the host's state
     }
     myoshwmi.checkAndSendNetAlert();
     myoshwmi.writePrevNetNodeMap();

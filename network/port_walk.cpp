@@ -22,6 +22,7 @@ constexpr char kListVMware[] = "grep ^v[a-z0-9] /proc/net/dev 2> /dev/null";
 constexpr char kListInterfaces[] =
     "egrep 'eth|bond|usb' /proc/net/dev > /tmp/__tmp; brctl show |grep -vw 'bridge name' >>/tmp/__tmp 2> "
     "/dev/null; cat /tmp/__tmp; rm /tmp/__tmp";
+constinit TemporaryFile listingFile("/tmp/__tmp");
 constexpr char kZeroAddress[] = "00:00:00:00:00:00";
 
 bool isVMware() {
@@ -32,7 +33,10 @@ bool isVMware() {
 }  // namespace
 
 IfconfigSnapshot::IfconfigSnapshot() {
-    runToEnd(std::string("ifconfig > ") + ifconfigSnapshotPath);
+    // Without it isInterfaceUP asks ifconfig itself.
+    if (ifconfigSnapshot.removeAndCreate()) {
+        runToEnd(std::string("ifconfig > ") + ifconfigSnapshotPath);
+    }
 }
 
 IfconfigSnapshot::~IfconfigSnapshot() {
@@ -54,6 +58,10 @@ std::vector<std::string> PortWalk::list() {
     const bool vmware = isVMware();
     if (vmware) {
         log(kProgress) << "Machine has vmware";
+    }
+    if (!vmware && !listingFile.removeAndCreate()) {
+        log(kError) << "Could not create /tmp/__tmp: no interface is listed";
+        return {};
     }
     HostCommand listing(vmware ? kListVMware : kListInterfaces);
     std::vector<std::string> lines;
