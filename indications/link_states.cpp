@@ -78,7 +78,8 @@ void OsHwMI::createCurNetNodeMap() {
         const std::string& name = now ? now->name : key;
         if (commandsCutOff() != before) {
             state = stateOf(inventory_->previousStates, name);
-            logInd(kError) << "Link state of " << name << " not told, a command was ended: it stays as it was";
+            logInd(kError) << "Link state of " << name
+                           << " not told, a command was ended: it stays as it was";
         }
         if (state) {
             inventory_->currentStates[name] = *state;

@@ -8,6 +8,7 @@
 #include <functional>
 
 #include "tests/support/fake_host.h"
+#include "tests/support/world.h"
 
 namespace {
 
@@ -69,6 +70,18 @@ HOST_TEST(TemporaryFile, OfAStrangerIsNotReadAndDoesNotStopRoot) {
     EXPECT_TRUE(file.removeAndCreate());
     EXPECT_TRUE(file.isOurs());
     EXPECT_EQ(host.read(kPath), "");
+}
+
+HOST_TEST(TemporaryFile, OfAnotherUserThatCannotBeRemovedIsNotUsed) {
+    host.file(kPath, "somebody's", 0666);
+    if (seteuid(fake_host::stranger) != 0) {
+        GTEST_SKIP() << "the tests do not run as root: there is no other user";
+    }
+    IC::TemporaryFile file(kPath);
+    EXPECT_FALSE(file.removeAndCreate()) << "the directory is sticky";
+    EXPECT_FALSE(file.isOurs());
+    EXPECT_EQ(seteuid(0), 0);
+    EXPECT_EQ(host.read(kPath), "somebody's");
 }
 
 HOST_TEST(TemporaryFile, IsPrivateWhateverTheUmask) {
