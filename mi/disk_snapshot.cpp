@@ -1,7 +1,6 @@
 #include "mi/disk_snapshot.h"
 
 #include <fcntl.h>
-#include <sys/stat.h>
 #include <sys/statvfs.h>
 #include <unistd.h>
 
@@ -32,12 +31,11 @@ bool hasRoom(int file) {
 
 /// Whether a text ends where a line does. One that is empty may have found no room.
 bool endsWhole(int file) {
-    struct stat status {};
-    if (fstat(file, &status) != 0 || status.st_size == 0) {
+    if (lseek(file, -1, SEEK_END) < 0) {
         return hasRoom(file);
     }
     char last = '\0';
-    return pread(file, &last, 1, status.st_size - 1) == 1 && last == '\n';
+    return read(file, &last, 1) == 1 && last == '\n';
 }
 
 bool isWhole() {
