@@ -66,6 +66,7 @@ void OsHwMI::createCurNetNodeMap() {
     const LogScope scope("OsHwMI::createCurNetNodeMap(): entry", "returning from createCurNetNodeMap",
                          indicationsLogSource);
     inventory_->currentStates.clear();
+    OSHWMI_IND::untold.clear();
     for (const auto& [key, node] : nodesByName()) {
         const unsigned int before = commandsCutOff();
         const auto now = readState(*node);
@@ -78,8 +79,7 @@ void OsHwMI::createCurNetNodeMap() {
         const std::string& name = now ? now->name : key;
         if (commandsCutOff() != before) {
             state = stateOf(inventory_->previousStates, name);
-            logInd(kError) << "Link state of " << name
-                           << " not told, a command was ended: it stays as it was";
+            OSHWMI_IND::untold.push_back(name);
         }
         if (state) {
             inventory_->currentStates[name] = *state;

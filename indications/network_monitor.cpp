@@ -54,6 +54,9 @@ void NetworkMonitor::pass() {
     if (stopRequested_) {
         return;  // the stop may have ended commands: what they answered is not the host's state
     }
+    for (const std::string& name : OSHWMI_IND::untold) {
+        logInd(kError) << "Link state of " << name << " not told, a command was ended: it stays as it was";
+    }
     myoshwmi.checkAndSendNetAlert();
     myoshwmi.writePrevNetNodeMap();
 }

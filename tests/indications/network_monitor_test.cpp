@@ -173,6 +173,7 @@ HOST_TEST(NetworkMonitor, IsAbortedInTheMiddleOfACommandAndReportsNothingOfThatP
     EXPECT_THAT(capture.ownMessages(), Contains("eventThreadNetIndications: Aborting thread..."));
     EXPECT_THAT(capture.ownMessages(), Contains("eventThreadNetIndicationsThread terminated."));
     EXPECT_TRUE(heard.now().empty());
+    EXPECT_THAT(capture.messages(6000), testing::IsEmpty()) << "the stop itself ended the command";
     EXPECT_EQ(host.read(kFile), "bond0=1\neth1=1\n");
 }
 
@@ -183,10 +184,13 @@ HOST_TEST(NetworkMonitor, TellsOfTheOthersWhileOneHangs) {
     interfaces.add("eth1", 12);
     Heard heard;
     interfaces.mi().registerForAlerts(Heard::hear, &heard);
+    LogCapture capture;
     interfaces.mi().enableIndications();
     ASSERT_TRUE(eventually([&] { return host.read(kFile) == "eth0=1\neth1=12\n"; }));
     interfaces.mi().disableIndications();
     EXPECT_THAT(heard.now(), TextsAre("NIC is Offline "));
+    EXPECT_THAT(capture.messages(6000),
+                TextsAre("Link state of eth0 not told, a command was ended: it stays as it was"));
 }
 
 HOST_TEST(NetworkMonitor, IsWaitedForAndTheSecondsAreCounted) {
