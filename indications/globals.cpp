@@ -10,6 +10,7 @@ const LogSource indicationsLogSource{"OsHwMIInd_ix86", &OSHWMI_IND::loggerOsHwMI
 
 Error OSHWMI_IND::myerr;
 std::vector<std::string> OSHWMI_IND::slaves;
+std::vector<std::string> OSHWMI_IND::untold;
 std::atomic<bool> OSHWMI_IND::datFileAvailable{false};
 
 }  // namespace IC

@@ -12,6 +12,8 @@ namespace IC::OSHWMI_IND {
 extern Error myerr;
 /// Member ports of all bonds, as one pass of the network monitor finds them. The monitor thread's alone.
 extern std::vector<std::string> slaves;
+/// The interfaces of this pass about which a command was ended by force. The monitor thread's alone.
+extern std::vector<std::string> untold;
 /// Whether the last read of the state file found one.
 extern std::atomic<bool> datFileAvailable;
 /// The logger component of the indications.

@@ -34,6 +34,12 @@ std::optional<NamedState> readState(const MutableNode& node) {
     }
 }
 
+std::optional<unsigned int> stateOf(const std::map<std::string, unsigned int>& states,
+                                    const std::string& name) {
+    const auto found = states.find(name);
+    return found == states.end() ? std::nullopt : std::optional(found->second);
+}
+
 /// The member's name in a line "Slave Interface: eth0".
 std::string slaveName(std::string line) {
     constexpr char label[] = "Slave Interface:";
@@ -60,18 +66,24 @@ void OsHwMI::createCurNetNodeMap() {
     const LogScope scope("OsHwMI::createCurNetNodeMap(): entry", "returning from createCurNetNodeMap",
                          indicationsLogSource);
     inventory_->currentStates.clear();
+    OSHWMI_IND::untold.clear();
     for (const auto& [key, node] : nodesByName()) {
+        const unsigned int before = commandsCutOff();
         const auto now = readState(*node);
-        if (!now) {
-            continue;
-        }
-        unsigned int state = now->state;
-        if (contains(now->name, "bond")) {
+        std::optional<unsigned int> state = now ? std::optional(now->state) : std::nullopt;
+        if (now && contains(now->name, "bond")) {
             logInd(kProgress) << "Calling bondedNetNodeStatus() for bonded interface: " << now->name;
             const unsigned int failOver = bondedNetNodeStatus(now->name);
             state = failOver == LinkState::noVerdict ? state : failOver;
         }
-        inventory_->currentStates[now->name] = state;
+        const std::string& name = now ? now->name : key;
+        if (commandsCutOff() != before) {
+            state = stateOf(inventory_->previousStates, name);
+            OSHWMI_IND::untold.push_back(name);
+        }
+        if (state) {
+            inventory_->currentStates[name] = *state;
+        }
     }
 }
 

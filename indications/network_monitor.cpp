@@ -6,7 +6,6 @@
 #include "indications/globals.h"
 #include "mi/globals.h"
 #include "mi/log.h"
-#include "mi/my_process.h"
 #include "mi/os_hw_mi.h"
 
 namespace IC {
@@ -49,11 +48,13 @@ void* NetworkMonitor::run(void*) {
 }
 
 void NetworkMonitor::pass() {
-    const unsigned int before = commandsCutOff();
     myoshwmi.readPrevNetNodeMap();
     myoshwmi.createCurNetNodeMap();
-    if (stopRequested_ || commandsCutOff() != before) {
-        return;  // what a killed command answered is not the host's state
+    if (stopRequested_) {
+        return;  // the stop may have ended commands: what they answered is not the host's state
+    }
+    for (const std::string& name : OSHWMI_IND::untold) {
+        logInd(kError) << "Link state of " << name << " not told, a command was ended: it stays as it was";
     }
     myoshwmi.checkAndSendNetAlert();
     myoshwmi.writePrevNetNodeMap();

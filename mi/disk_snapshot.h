@@ -14,10 +14,14 @@ inline constexpr char diskSnapshotCommand[] = "fdisk -ls 2>/dev/null > /tmp/fdis
 /// lock has been released.
 HostCommand startUnderFileLock(const Command& command);
 
-/// Writes the snapshot. It is whole when this returns: leaving waits for fdisk.
-/// @return false when fdisk could not be started, a signal ended it, or its disk is full: it is not whole
-/// then
+/// Writes the snapshot, in a file of its own. Leaving waits for fdisk.
+/// @return whether it is whole, that is, ends with a line break, or is empty on a disk with room. False also
+/// when its file could not be made, fdisk could not be started or was ended by force
 bool takeDiskSnapshot();
+
+/// Whether the snapshot may be read. When it may not, a command that would read it is not run and counts as
+/// one that printed nothing.
+bool isDiskSnapshotOurs();
 
 /// Removes the snapshot; one that is not there is no failure.
 void deleteFdiskTmp();

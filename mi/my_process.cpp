@@ -12,22 +12,13 @@ namespace {
 
 thread_local unsigned int cutOff = 0;
 
-/// A shell tells of a tool's death by a signal with a status above 128.
-int signalOf(int status) {
-    constexpr int kSignalStatus = 128;
-    if (WIFSIGNALED(status)) {
-        return WTERMSIG(status);
-    }
-    const int exited = WIFEXITED(status) ? WEXITSTATUS(status) - kSignalStatus : 0;
-    return exited > 0 && exited < NSIG ? exited : 0;
-}
-
 }  // namespace
 
 void closePipe(FILE* pipe) {
     const int status = pipe != nullptr ? pclose(pipe) : 0;
-    const int signal = status == -1 ? 0 : signalOf(status);
-    if (signal != 0 && signal != SIGPIPE) {
+    // All that is asked of an end. What a shell tells of its tools by its own status is not: tools exit with
+    // numbers of their own, those of signals among them.
+    if (status != -1 && WIFSIGNALED(status) && WTERMSIG(status) == SIGKILL) {
         ++cutOff;
     }
 }

@@ -36,8 +36,8 @@ private:
 /// Ends a command's output and waits for the command; a null pipe is fine.
 void closePipe(FILE* pipe);
 
-/// How many of the calling thread's commands were ended by a signal so far: what they printed is not what
-/// they had to tell. A command whose output was no longer wanted is none of them.
+/// How many of the calling thread's commands were ended by force so far, that is, by a SIGKILL that hit the
+/// shell itself, as an agent's deadline and an abort send it: what they printed is not what they had to tell.
 unsigned int commandsCutOff();
 
 }  // namespace IC

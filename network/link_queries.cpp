@@ -87,7 +87,7 @@ bool isInterfaceUP(std::string name) {
     const LogScope scope;
     // The blank at the end is nothing to the shell: the name is looked for anywhere in the lines, and eth1
     // finds eth10. A bond's aliases (bond0:1) are found by their bond's name this way.
-    const auto command = access(ifconfigSnapshotPath, R_OK) == 0
+    const auto command = ifconfigSnapshot.isOurs() && access(ifconfigSnapshotPath, R_OK) == 0
                              ? formatCommand("cat %s | grep %s ", ifconfigSnapshotPath, name)
                              : formatCommand("ifconfig | grep %s ", name);
     return firstLine(command).line.has_value();

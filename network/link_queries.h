@@ -2,6 +2,8 @@
 
 #include <string>
 
+#include "mi/temporary_file.h"
+
 namespace IC {
 
 // What one interface's link says, asked anew at each call. A tool that is missing, refuses or prints nothing
@@ -9,6 +11,7 @@ namespace IC {
 
 /// Where the port builder keeps the output of `ifconfig` while it walks the interfaces.
 inline constexpr char ifconfigSnapshotPath[] = "/tmp/CVIfconfig.txt";
+inline constinit TemporaryFile ifconfigSnapshot(ifconfigSnapshotPath);
 
 /// Speed from `ethtool`.
 /// @param speed receives kilobits a second, 0 for a speed the driver does not know; untouched on failure
@@ -27,7 +30,7 @@ bool getAutoSense(const std::string& name);
 void getHardwareAddress(std::string name, std::string& address);
 
 /// Whether `ifconfig` lists an interface whose line holds the name: eth1 is up when only eth10 is. Read from
-/// the snapshot when there is one.
+/// the snapshot when there is one of ours.
 bool isInterfaceUP(std::string name);
 
 /// Whether `ethtool` detects a link. A bond (a name with "bond" in it) is up when its MII status is and it

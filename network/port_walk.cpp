@@ -22,6 +22,7 @@ constexpr char kListVMware[] = "grep ^v[a-z0-9] /proc/net/dev 2> /dev/null";
 constexpr char kListInterfaces[] =
     "egrep 'eth|bond|usb' /proc/net/dev > /tmp/__tmp; brctl show |grep -vw 'bridge name' >>/tmp/__tmp 2> "
     "/dev/null; cat /tmp/__tmp; rm /tmp/__tmp";
+constinit TemporaryFile listingFile("/tmp/__tmp");
 constexpr char kZeroAddress[] = "00:00:00:00:00:00";
 
 /// Only /proc/net/dev prints colons; in the name of an interface there is none.
@@ -42,7 +43,10 @@ bool isVMware() {
 }  // namespace
 
 IfconfigSnapshot::IfconfigSnapshot() {
-    runToEnd(formatCommand("ifconfig > %s", ifconfigSnapshotPath));
+    // Without it isInterfaceUP asks ifconfig itself.
+    if (ifconfigSnapshot.removeAndCreate()) {
+        runToEnd(formatCommand("ifconfig > %s", ifconfigSnapshotPath));
+    }
 }
 
 IfconfigSnapshot::~IfconfigSnapshot() {
@@ -64,6 +68,10 @@ std::vector<std::string> PortWalk::list() {
     const bool vmware = isVMware();
     if (vmware) {
         log(kProgress) << "Machine has vmware";
+    }
+    if (!vmware && !listingFile.removeAndCreate()) {
+        log(kError) << "Could not create /tmp/__tmp: no interface is listed";
+        return {};
     }
     HostCommand listing(vmware ? Command(kListVMware) : Command(kListInterfaces));
     std::vector<std::string> lines;

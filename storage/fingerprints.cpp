@@ -1,6 +1,4 @@
 // The fingerprints of the disk snapshot, and what a pass of the drive monitor does with them.
-#include <unistd.h>
-
 #include "mi/disk_snapshot.h"
 #include "mi/log.h"
 #include "mi/my_process.h"
@@ -41,11 +39,14 @@ constexpr Extract kPartitions = {
 /// The digest, or "" when its command fails: an empty value differs from any earlier one, so that the nodes
 /// are built anew rather than kept on no evidence.
 std::string take(const Digest& digest) {
-    HostCommand answer = startUnderFileLock(digest.command);
-    if (!answer.started()) {
-        return {};
+    std::string value;
+    if (isDiskSnapshotOurs()) {
+        HostCommand answer = startUnderFileLock(digest.command);
+        if (!answer.started()) {
+            return {};
+        }
+        value = trimEnd(answer.nextLine().value_or(""));
     }
-    std::string value = trimEnd(answer.nextLine().value_or(""));
     log(kProgress) << digest.logged << value;
     return value;
 }
@@ -58,12 +59,8 @@ void takeFingerprints(const Extract& extract, FingerprintPair& pair, bool keepCu
     }
 }
 
-/// Where the shell cannot write the snapshot, an old one stands there, or none: neither is the layout of now.
-bool isSnapshotWritable() {
-    return access(diskSnapshotPath, W_OK) == 0;
-}
-
-/// What a killed command printed is not the layout: nodes may be missing, so the next pass builds them again.
+/// What a command ended by force printed is not the layout: nodes may be missing, so the next pass builds
+/// them again.
 template <class Rebuild>
 void rebuildIfDifferent(const Extract& extract, FingerprintPair& pair, Rebuild rebuild) {
     if (!pair.differs()) {
@@ -94,15 +91,11 @@ void OsHwMI::Partition_Checksum(bool keepCurrent) {
 // drive and partition published once after start.
 void OsHwMI::HDDThreadProcess() {
     const LogScope scope("Hard Drive ThreadProcess :: Entry", "Hard Drive ThreadProcess :: Exit");
-    if (!takeDiskSnapshot() || !isSnapshotWritable()) {
-        return;
+    if (!takeDiskSnapshot()) {
+        return;  // an old one, half of one or none: none is the layout of now
     }
-    const unsigned int before = commandsCutOff();
     HardDrive_Checksum(true);
     Partition_Checksum(true);
-    if (commandsCutOff() != before) {
-        return;
-    }
     rebuildIfDifferent(kDrives, driveFingerprints_, [this] { createHardDriveNodes(true); });
     rebuildIfDifferent(kPartitions, partitionFingerprints_, [this] { createPartitionNodes(true); });
 }

@@ -56,6 +56,9 @@ void OsHwMI::buildStorageNodes(const StorageKind& kind, bool update) {
         withdrawStorageNodes(kind);
     }
     nodes.clear();
+    if (!isDiskSnapshotOurs()) {
+        return;  // as if the listing had printed nothing
+    }
     HostCommand listing = startUnderFileLock(kind.listing);
     if (!listing.started()) {
         log(kError) << "fdisk command " << kind.listing.shown() << " failed!!";

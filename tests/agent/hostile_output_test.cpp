@@ -63,7 +63,8 @@ HOST_TEST(HugeOutput, OfAListingIsReadAsFarAsASaneOneGoes) {
 
 HOST_TEST(HugeOutput, ThatFillsTmpIsNoLayout) {
     SuseHost suse(host);
-    host.tool("fdisk -ls", ToolAnswer{.out = "", .action = std::string("yes 'no disk'") + kGigabyte});
+    // 13 bytes a line: no number of full pages ends with one.
+    host.tool("fdisk -ls", ToolAnswer{.out = "", .action = std::string("yes 'no disk here'") + kGigabyte});
     ASSERT_EQ(mount("small", "/tmp", "tmpfs", MS_NOSUID | MS_NODEV, "size=256k"), 0);
     const Finished run = suse.run({"tree"});
     EXPECT_EQ(run.status, 0);

@@ -4,6 +4,7 @@
 #include <vector>
 
 #include "framework/ic/mutable_node.h"
+#include "mi/command.h"
 #include "mi/globals.h"
 #include "tests/support/plugin_access.h"
 
@@ -19,6 +20,19 @@ public:
     void is(unsigned int state) { MutableNode::setProperty(123, {IC::Number(state), true}); }
 };
 
+/// An interface that is asked by a command; somebody ends that by force when `hangs`.
+class AskedNode : public InterfaceNode {
+public:
+    using InterfaceNode::InterfaceNode;
+    IC::Error getProperty(unsigned int id, IC::PropertyValue& value) const override {
+        if (hangs && id == 123) {
+            const IC::HostCommand command("kill -KILL $$");
+        }
+        return MutableNode::getProperty(id, value);
+    }
+    bool hangs = false;
+};
+
 /// The plug-in object with interfaces of the test's own and no monitor.
 class Interfaces {
 public:
@@ -27,8 +41,9 @@ public:
     Interfaces& operator=(const Interfaces&) = delete;
     ~Interfaces() { mi_.unload(); }
 
-    InterfaceNode& add(const std::string& name, unsigned int state) {
-        auto* node = new InterfaceNode(++lastId_, name, state);
+    template <class NodeT = InterfaceNode>
+    NodeT& add(const std::string& name, unsigned int state) {
+        auto* node = new NodeT(++lastId_, name, state);
         IC::OsHwMITestAccess::addInterface(mi_, name, node);
         return *node;
     }

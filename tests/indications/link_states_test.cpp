@@ -68,6 +68,31 @@ HOST_TEST(LinkStates, PassOverANodeThatCannotBeRead) {
     EXPECT_THAT(interfaces.current(), ElementsAre(Pair("eth0", 1)));
 }
 
+HOST_TEST(LinkStates, StayAsTheyWereWhereACommandWasEnded) {
+    Interfaces interfaces;
+    interfaces.add("eth0", 12);
+    interfaces.add<AskedNode>("eth1", 12).hangs = true;
+    interfaces.add<AskedNode>("eth2", 12).hangs = true;
+    interfaces.add<AskedNode>("eth3", 12);
+    interfaces.previous() = {{"eth0", 1}, {"eth1", 1}, {"eth3", 1}};
+    interfaces.mi().createCurNetNodeMap();
+    EXPECT_THAT(interfaces.current(), ElementsAre(Pair("eth0", 12), Pair("eth1", 1), Pair("eth3", 12)))
+        << "eth2 has none yet";
+    EXPECT_THAT(IC::OSHWMI_IND::untold, TextsAre("eth1", "eth2"));
+    interfaces.mi().createCurNetNodeMap();
+    EXPECT_THAT(IC::OSHWMI_IND::untold, TextsAre("eth1", "eth2")) << "those of the last pass alone";
+}
+
+HOST_TEST(LinkStates, OfANodeThatCannotBeReadStayToo) {
+    Interfaces interfaces;
+    auto& odd = interfaces.add<AskedNode>("eth0", 1);
+    odd.setProperty(123, {"not a number", true});
+    odd.hangs = true;
+    interfaces.previous() = {{"eth0", 12}};
+    interfaces.mi().createCurNetNodeMap();
+    EXPECT_THAT(interfaces.current(), ElementsAre(Pair("eth0", 12)));
+}
+
 HOST_TEST(LinkStates, GoByTheNameThatTheNodeItselfGives) {
     Interfaces interfaces;
     interfaces.add("bond0", 1).setProperty(108, {"eth5", true});
@@ -156,6 +181,27 @@ HOST_TEST(LinkStates, GiveNoVerdictWhenTheMembersCannotBeAsked) {
     EXPECT_EQ(bond.interfaces.mi().bondedNetNodeStatus("bond0"), 34U);
     EXPECT_THAT(capture.ownMessages(6000),
                 TextsAre("OsHwMI::bondedNetNodeStatus - grepping slave device error"));
+}
+
+HOST_TEST(LinkStates, OfABondStayWhenACommandOfAMemberWasEnded) {
+    Bond bond(host, {{"eth0", 1}, {"eth1", 1}, {"eth5", 1}, {"bond0", 33}});
+    host.file("/proc/net/bonding/bond0", "Slave Interface: eth5\nSlave Interface: eth0\n");
+    auto& member = bond.interfaces.add<AskedNode>("eth5", 12);
+    member.hangs = true;
+    bond.eth0.is(12);
+    EXPECT_EQ(bond.state(), 33U);
+    EXPECT_THAT(bond.interfaces.current(),
+                ElementsAre(Pair("bond0", 33), Pair("eth0", 12), Pair("eth1", 1), Pair("eth5", 1)));
+    member.hangs = false;
+    EXPECT_EQ(bond.state(), 32U);
+}
+
+HOST_TEST(LinkStates, OfABondStayWhenItsMembersAreNotTold) {
+    Bond bond(host, {{"eth0", 1}, {"eth1", 1}, {"bond0", 32}});
+    host.tool("grep %any", ToolAnswer{.out = "",
+                                      .action = "read -r _ _ _ shell _ < /proc/$PPID/stat; "
+                                                "kill -KILL $shell"});
+    EXPECT_EQ(bond.state(), 32U);
 }
 
 HOST_TEST(LinkStates, OfABondWithoutAStatusFileAreItsOwn) {

@@ -156,11 +156,12 @@ HOST_TEST(NetworkMonitor, StopsAtOnceInTheMiddleOfItsWait) {
 }
 
 HOST_TEST(NetworkMonitor, IsAbortedInTheMiddleOfACommandAndReportsNothingOfThatPass) {
-    host.file(kFile, "bond0=1\n");
+    host.file(kFile, "bond0=1\neth1=1\n");
     host.file("/proc/net/bonding/bond0", "Slave Interface: eth0\n");
     host.tool("grep %any", ToolAnswer{"", 0, "", 20000});  // a tool that hangs
     Interfaces interfaces;
     interfaces.add("bond0", 12);
+    interfaces.add("eth1", 12);
     Heard heard;
     interfaces.mi().registerForAlerts(Heard::hear, &heard);
     LogCapture capture;
@@ -172,7 +173,24 @@ HOST_TEST(NetworkMonitor, IsAbortedInTheMiddleOfACommandAndReportsNothingOfThatP
     EXPECT_THAT(capture.ownMessages(), Contains("eventThreadNetIndications: Aborting thread..."));
     EXPECT_THAT(capture.ownMessages(), Contains("eventThreadNetIndicationsThread terminated."));
     EXPECT_TRUE(heard.now().empty());
-    EXPECT_EQ(host.read(kFile), "bond0=1\n");
+    EXPECT_THAT(capture.messages(6000), testing::IsEmpty()) << "the stop itself ended the command";
+    EXPECT_EQ(host.read(kFile), "bond0=1\neth1=1\n");
+}
+
+HOST_TEST(NetworkMonitor, TellsOfTheOthersWhileOneHangs) {
+    host.file(kFile, "eth0=1\neth1=1\n");
+    Interfaces interfaces;
+    interfaces.add<AskedNode>("eth0", 12).hangs = true;
+    interfaces.add("eth1", 12);
+    Heard heard;
+    interfaces.mi().registerForAlerts(Heard::hear, &heard);
+    LogCapture capture;
+    interfaces.mi().enableIndications();
+    ASSERT_TRUE(eventually([&] { return host.read(kFile) == "eth0=1\neth1=12\n"; }));
+    interfaces.mi().disableIndications();
+    EXPECT_THAT(heard.now(), TextsAre("NIC is Offline "));
+    EXPECT_THAT(capture.messages(6000),
+                TextsAre("Link state of eth0 not told, a command was ended: it stays as it was"));
 }
 
 HOST_TEST(NetworkMonitor, IsWaitedForAndTheSecondsAreCounted) {

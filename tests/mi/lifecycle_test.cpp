@@ -237,6 +237,28 @@ HOST_TEST(Lifecycle, GoesOnWithoutASnapshotWhenTheShellCannotBeStarted) {
     IC::myoshwmi.unload();
 }
 
+HOST_TEST(Lifecycle, TellsOfASnapshotThatHasNoPlaceAndGoesOnWithout) {
+    host.file(std::string(IC::diskSnapshotPath) + "/in-the-way", "");
+    const CommandLines commands;
+    LogCapture capture;
+    initialize(IC::myoshwmi);
+    EXPECT_THAT(capture.messages(6000),
+                testing::Contains("Command : fdisk -ls 2>/dev/null > /tmp/fdisk_tmp failed!!"));
+    EXPECT_THAT(commands.all(), testing::Not(testing::Contains(testing::HasSubstr("fdisk"))));
+    EXPECT_TRUE(nodesOfType(IC::myoshwmi, 11).empty());
+    EXPECT_EQ(nodesOfType(IC::myoshwmi, 50).size(), 1U);
+    IC::myoshwmi.unload();
+}
+
+HOST_TEST(Lifecycle, DoesNotAskHowFdiskEnded) {
+    host.tool("fdisk -ls", "Disk /dev/sda: 80.0 GB, 80026361856 bytes\n", 130);
+    LogCapture capture;
+    initialize(IC::myoshwmi);
+    EXPECT_THAT(capture.messages(6000), testing::Not(testing::Contains(testing::HasSubstr("failed!!"))));
+    EXPECT_EQ(nodesOfType(IC::myoshwmi, 11).size(), 1U);
+    IC::myoshwmi.unload();
+}
+
 HOST_TEST(Lifecycle, LogsAStepThatThrowsAndGoesOn) {
     shell_stub::beforeEach([](const std::string& command) {
         if (command == IC::diskSnapshotCommand) {

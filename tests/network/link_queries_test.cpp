@@ -1,6 +1,10 @@
 #include "network/link_queries.h"
 
 #include <gmock/gmock.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <functional>
 
 #include "tests/support/command_lines.h"
 #include "tests/support/fake_host.h"
@@ -167,6 +171,32 @@ HOST_TEST(InterfaceUp, ReadsTheSnapshotWhenThereIsOne) {
     EXPECT_THAT(commands.all(), TextsAre("ifconfig | grep eth0 ", "cat /tmp/CVIfconfig.txt | grep eth0 ",
                                          "cat /tmp/CVIfconfig.txt | grep eth1 "));
     EXPECT_THAT(host.calls(), TextsAre("ifconfig"));
+}
+
+HOST_TEST(InterfaceUp, AsksIfconfigItselfWhereTheSnapshotIsNotOurs) {
+    const std::string lies = "eth0      Link encap:Ethernet\n";
+    host.file("/etc/elsewhere", lies);
+    const std::function<bool()> places[] = {
+        [&] { return host.symlink(IC::ifconfigSnapshotPath, "/etc/elsewhere"), true; },
+        [] { return mkfifo(IC::ifconfigSnapshotPath, 0600) == 0; },
+        [] { return link("/etc/elsewhere", IC::ifconfigSnapshotPath) == 0; },
+        [&] { return host.file(IC::ifconfigSnapshotPath, lies, 0666), true; },
+        [&] {
+            host.file(IC::ifconfigSnapshotPath, lies);
+            return host.giveToStranger(IC::ifconfigSnapshotPath);
+        },
+    };
+    host.tool("ifconfig", "eth1      Link encap:Ethernet\n");
+    for (std::size_t place = 0; place < std::size(places); ++place) {
+        SCOPED_TRACE(place);
+        host.remove(IC::ifconfigSnapshotPath);
+        if (!places[place]()) {
+            GTEST_SKIP() << "the tests do not run as root: there is no stranger";
+        }
+        const CommandLines commands;
+        EXPECT_FALSE(IC::isInterfaceUP("eth0"));
+        EXPECT_THAT(commands.all(), TextsAre("ifconfig | grep eth0 "));
+    }
 }
 
 HOST_TEST(InterfaceUp, TheBlankBehindTheNameIsNothingToTheShell) {

@@ -1,6 +1,11 @@
 // The walk over the host's interfaces: what it runs, which interfaces get which nodes.
 #include <gmock/gmock.h>
+#include <sys/stat.h>
+#include <unistd.h>
 
+#include <functional>
+
+#include "network/link_queries.h"
 #include "network/port_walk.h"
 #include "tests/network/port_host.h"
 #include "tests/support/command_lines.h"
@@ -14,9 +19,11 @@ namespace {
 using testing::Contains;
 using testing::IsEmpty;
 using testing::Not;
+using testing::SizeIs;
 using Lines = std::vector<std::string>;
 
 constexpr char kSnapshot[] = "/tmp/CVIfconfig.txt";
+constexpr char kListingFile[] = "/tmp/__tmp";
 constexpr char kListing[] =
     "egrep 'eth|bond|usb' /proc/net/dev > /tmp/__tmp; brctl show |grep -vw 'bridge name' >>/tmp/__tmp 2> "
     "/dev/null; cat /tmp/__tmp; rm /tmp/__tmp";
@@ -126,6 +133,62 @@ HOST_TEST(PortWalk, KeepsTheListingOfIfconfigWhileItVisits) {
     shell_stub::beforeEach({});
     EXPECT_EQ(seen, "not yet, eth0 ");
     EXPECT_FALSE(host.exists(kSnapshot));
+}
+
+// Whoever can write into /tmp was there first.
+HOST_TEST(PortWalk, MakesWayForItsFilesWhateverStandsThere) {
+    PortHost plugin(host, "suse-two-nics");
+    host.file("/etc/secret", "root's");
+    const std::function<void(const char*)> places[] = {
+        [&](const char* path) { host.symlink(path, "/etc/secret"); },
+        [](const char* path) { EXPECT_EQ(mkfifo(path, 0666), 0); },
+        [](const char* path) { EXPECT_EQ(link("/etc/secret", path), 0); },
+        [&](const char* path) { host.directory(path); },
+        [&](const char* path) {
+            host.file(path, "  eth9:1 1\n", 0444);
+            [[maybe_unused]] const bool isHis = host.giveToStranger(path);
+        },
+    };
+    for (const auto& prepare : places) {
+        for (const char* path : {kSnapshot, kListingFile}) {
+            prepare(path);
+        }
+        EXPECT_THAT(IC::PortWalk::list(), SizeIs(2));
+        {
+            const IC::IfconfigSnapshot snapshot;
+            EXPECT_TRUE(host.read(kSnapshot).value_or("").starts_with("eth0 "));
+        }
+        EXPECT_FALSE(host.exists(kSnapshot));
+        EXPECT_FALSE(host.exists(kListingFile));
+        EXPECT_EQ(host.read("/etc/secret"), "root's");
+    }
+}
+
+HOST_TEST(PortWalk, ListsNoInterfaceFromWhatAnEarlierRunLeft) {
+    PortHost plugin(host, "suse-two-nics");
+    host.file(kListingFile, "  eth1:1 1\n");
+    host.file(kSnapshot, "eth9      Link encap:Ethernet\n");
+    host.readOnly("/tmp");
+    const CommandLines commands;
+    LogCapture capture;
+    plugin.build();
+    EXPECT_THAT(plugin.names(12), IsEmpty());
+    EXPECT_THAT(commands.all(), Not(Contains(kListing)));
+    EXPECT_THAT(commands.all(), Not(Contains("ifconfig > /tmp/CVIfconfig.txt")));
+    EXPECT_THAT(capture.ownMessages(6000), TextsAre("Could not create /tmp/__tmp: no interface is listed"));
+    EXPECT_FALSE(IC::isInterfaceUP("eth9")) << "there is none";
+    EXPECT_EQ(commands.all().back(), "ifconfig | grep eth9 ");
+}
+
+HOST_TEST(PortWalk, GoesOnWithoutASnapshotThatHasNoPlace) {
+    PortHost plugin(host, "suse-two-nics");
+    host.file(std::string(kSnapshot) + "/in-the-way", "");
+    const CommandLines commands;
+    plugin.build();
+    EXPECT_THAT(plugin.names(29), TextsAre("eth0", "eth1"));
+    EXPECT_EQ(plugin.config("eth0")->getStatus(), 1U);
+    EXPECT_THAT(commands.all(), Contains("ifconfig | grep eth0 "));
+    EXPECT_THAT(commands.all(), Not(Contains("ifconfig > /tmp/CVIfconfig.txt")));
 }
 
 HOST_TEST(PortWalk, TakesItsStepsInThisOrder) {

@@ -1,4 +1,12 @@
 // A pass of the drive monitor: snapshot, fingerprints, comparison, and what is built anew.
+#include <sys/mount.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <chrono>
+#include <functional>
+#include <thread>
+
 #include "mi/disk_snapshot.h"
 #include "mi/globals.h"
 #include "mi/node_types.h"
@@ -27,6 +35,9 @@ const std::string kDiskMd5 = "e63cb20a64a37eea14605a6b34421272";
 const std::string kDiskSha1 = "f8ed562930176188860b15a5e93af7042f17d042";
 const std::string kFirstMd5 = "2ed0b4a29505d32d645577847dbbe12b";
 const std::string kFirstSha1 = "fd1f5f57717ef5ece8cd45e1e7c3b9f1b847df6c";
+
+/// What a tool does to the shell that runs its pipeline.
+const std::string kKillTheShell = "read -r _ _ _ shell _ < /proc/$PPID/stat; kill -KILL $shell";
 
 const std::vector<std::string> kComparison = {kSnapshot, kDriveMd5, kDriveSha1, kPartitionMd5,
                                               kPartitionSha1};
@@ -91,16 +102,109 @@ HOST_TEST_F(LayoutComparison, AnUnchangedLayoutTouchesNothing) {
 
 HOST_TEST_F(LayoutComparison, ASnapshotThatIsNotWholeTouchesNothing) {
     startWith(host, kLayout);
-    host.tool("fdisk -ls", ToolAnswer{.out = "", .action = "echo 'Disk /dev/sd'; kill -KILL $PPID"});
-    diary().clear();
+    LogCapture log;
+    pass(host, "Disk /dev/sdb: 80");
+    EXPECT_THAT(diary(), IsEmpty());
+    pass(host, kDisk + "Disk /dev/sdb: 80.0 GB, 1000000 byt");
+    EXPECT_THAT(diary(), IsEmpty());
+    EXPECT_THAT(commands(), ElementsAre(kSnapshot));
+    host.tool("fdisk -ls", ToolAnswer{.out = "", .action = "echo 'Disk /dev/sdb: 8'; " + kKillTheShell});
     IC::myoshwmi.HDDThreadProcess();
     EXPECT_THAT(diary(), IsEmpty());
+    EXPECT_THAT(log.messages(6000), IsEmpty());
     host.fullDisk("/tmp");
     pass(host, kLayout + kSecond);
     EXPECT_THAT(diary(), IsEmpty());
     host.restore("/tmp");
     pass(host, kLayout + kSecond);
     EXPECT_EQ(partitions().size(), 2U);
+}
+
+HOST_TEST_F(LayoutComparison, ASnapshotThatIsWholeCountsHoweverItsToolEnded) {
+    startWith(host, kLayout);
+    for (const int status : {1, 130, 137, 192}) {
+        const std::string layout = kLayout + "Disk /dev/sdb: 80.0 GB, " + std::to_string(status) + " bytes\n";
+        host.tool("fdisk -ls", layout, status);
+        diary().clear();
+        IC::myoshwmi.HDDThreadProcess();
+        EXPECT_THAT(diary(), Contains("published /dev/sdb")) << status;
+    }
+}
+
+HOST_TEST_F(LayoutComparison, AFullDiskDoesNotMatterToASnapshotThatIsWhole) {
+    startWith(host, kLayout);
+    ASSERT_EQ(mount("small", "/tmp", "tmpfs", MS_NOSUID | MS_NODEV, "size=64k"), 0);
+    const std::string listing = "printf '" + kLayout + kSecond + "'";
+    host.tool("fdisk -ls", ToolAnswer{.out = "", .action = listing + "; cat /dev/zero > /tmp/full"});
+    IC::myoshwmi.HDDThreadProcess();
+    EXPECT_EQ(partitions().size(), 2U);
+    EXPECT_NE(host.read("/tmp/full"), "");
+}
+
+// Whoever can write into /tmp was there first.
+HOST_TEST_F(LayoutComparison, WhatStandsInThePlaceOfTheSnapshotMakesWay) {
+    const std::string other = "Disk /dev/sdx: 80.0 GB, 1000000 bytes\n";
+    const std::function<void()> places[] = {
+        [&] { host.symlink(IC::diskSnapshotPath, "/etc/secret"); },
+        [] { EXPECT_EQ(mkfifo(IC::diskSnapshotPath, 0666), 0); },
+        [] { EXPECT_EQ(link("/etc/secret", IC::diskSnapshotPath), 0); },
+        [&] { host.directory(IC::diskSnapshotPath); },
+        [&] {
+            host.file(IC::diskSnapshotPath, other, 0444);
+            [[maybe_unused]] const bool isHis = host.giveToStranger(IC::diskSnapshotPath);
+        },
+    };
+    host.file("/etc/secret", "root's");
+    startWith(host, kLayout);
+    for (std::size_t place = 0; place < std::size(places); ++place) {
+        SCOPED_TRACE(place);
+        host.remove(IC::diskSnapshotPath);
+        places[place]();
+        pass(host, kLayout + (place % 2 == 0 ? kSecond : ""));
+        EXPECT_EQ(host.read("/etc/secret"), "root's");
+        EXPECT_EQ(drives().size(), 1U);
+        EXPECT_EQ(partitions().size(), place % 2 == 0 ? 2U : 1U);
+    }
+}
+
+HOST_TEST_F(LayoutComparison, ADirectoryInThePlaceOfTheSnapshotWithdrawsNothing) {
+    startWith(host, kLayout);
+    host.remove(IC::diskSnapshotPath);
+    host.file(std::string(IC::diskSnapshotPath) + "/in-the-way", "");
+    LogCapture log;
+    pass(host, kLayout);
+    EXPECT_THAT(commands(), IsEmpty());
+    EXPECT_THAT(diary(), IsEmpty());
+    EXPECT_THAT(log.messages(),
+                TextsAre("Hard Drive ThreadProcess :: Entry", "Hard Drive ThreadProcess :: Exit"));
+}
+
+HOST_TEST_F(LayoutComparison, ASnapshotThatIsNotOursIsNotRead) {
+    host.file("/etc/secret", kLayout);
+    host.symlink(IC::diskSnapshotPath, "/etc/secret");
+    LogCapture log;
+    IC::myoshwmi.HardDrive_Checksum(true);
+    EXPECT_THAT(log.messages(),
+                TextsAre("Hard Drive Check Sum : Entry", "cond ::Hard Drive Check Sum : MD5 :: ",
+                         "cond ::Hard Drive Check Sum : SHA1 :: ", "Hard Drive Check Sum : Exit"));
+    IC::myoshwmi.createHardDriveNodes(false);
+    IC::myoshwmi.createPartitionNodes(false);
+    EXPECT_THAT(commands(), IsEmpty());
+    EXPECT_THAT(drives(), IsEmpty());
+    EXPECT_THAT(partitions(), IsEmpty());
+    EXPECT_THAT(log.messages(6000), IsEmpty()) << "as if the commands had printed nothing";
+}
+
+HOST_TEST_F(LayoutComparison, TheSnapshotIsMadeAnewUnderTheFileLock) {
+    host.tool("fdisk -ls", kLayout);
+    host.file(IC::diskSnapshotPath, "the last one");
+    ASSERT_TRUE(IC::OSHWMI::myfileLock.lock(0));
+    std::thread monitor([] { IC::myoshwmi.HDDThreadProcess(); });
+    std::this_thread::sleep_for(std::chrono::milliseconds(50));
+    EXPECT_EQ(host.read(IC::diskSnapshotPath), "the last one");
+    IC::OSHWMI::myfileLock.unlock();
+    monitor.join();
+    EXPECT_EQ(host.read(IC::diskSnapshotPath), kLayout);
 }
 
 HOST_TEST_F(LayoutComparison, EveryCommandIsStartedUnderTheFileLock) {
@@ -180,7 +284,7 @@ HOST_TEST_F(LayoutComparison, ASnapshotThatCannotBeWrittenSkipsThePass) {
     LogCapture log;
     pass(host, kLayout);
     EXPECT_THAT(diary(), IsEmpty());
-    EXPECT_EQ(commands(), std::vector<std::string>{kSnapshot});
+    EXPECT_THAT(commands(), IsEmpty()) << "it has no file to write";
     EXPECT_THAT(log.messages(),
                 TextsAre("Hard Drive ThreadProcess :: Entry", "Hard Drive ThreadProcess :: Exit"));
     host.restore("/tmp");
@@ -219,23 +323,25 @@ HOST_TEST_F(LayoutComparison, AFingerprintThatFailsCountsAsAChangeOnce) {
     EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda", "published /dev/sda")) << "and back again once";
 }
 
-const ToolAnswer kKilled{.out = "", .action = "kill -KILL $PPID"};
-
-HOST_TEST_F(LayoutComparison, AFingerprintThatIsCutOffLeavesOutTheRestOfThePass) {
+HOST_TEST_F(LayoutComparison, AFingerprintThatIsCutOffFailsLikeAnyOther) {
     startWith(host, kLayout);
-    host.tool("awk %any", kKilled);
-    pass(host, kLayout);
-    EXPECT_THAT(diary(), IsEmpty());
-    EXPECT_EQ(commands(), kComparison);
-    host.remove("/tools/awk");
-    pass(host, kLayout);
-    EXPECT_THAT(diary(), IsEmpty()) << "the references are the old ones";
+    for (const std::string& end : {kKillTheShell, std::string("kill -KILL $PPID")}) {
+        host.tool("awk %any", ToolAnswer{.out = "", .action = end});
+        pass(host, kLayout);
+        EXPECT_EQ(diary().size(), 4U) << "both kinds are built anew";
+        EXPECT_EQ(Access::driveFingerprints().md5.reference, "");
+        pass(host, kLayout);
+        EXPECT_THAT(diary(), IsEmpty()) << "nothing known is the reference now";
+        host.remove("/tools/awk");
+        pass(host, kLayout);
+        EXPECT_EQ(diary().size(), 4U);
+    }
 }
 
 HOST_TEST_F(LayoutComparison, ARebuildThatIsCutOffIsMadeAgain) {
     startWith(host, kLayout);
     const std::string layout = kLayout + "Disk /dev/sdb: 80.0 GB, 1000000 bytes\n" + kSecond;
-    host.tool("cut %any", kKilled);
+    host.tool("cut %any", ToolAnswer{.out = "", .action = kKillTheShell});
     LogCapture log;
     pass(host, layout);
     EXPECT_THAT(drives(), IsEmpty());

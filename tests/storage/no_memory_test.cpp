@@ -1,6 +1,7 @@
 // Rebuilds that run out of memory at every place where they ask for some: nothing is lost, nothing is left.
 #include <new>
 
+#include "mi/disk_snapshot.h"
 #include "mi/globals.h"
 #include "mi/node_types.h"
 #include "tests/storage/storage_host.h"
@@ -29,6 +30,7 @@ class NoMemory : public StorageHost {};
 
 HOST_TEST_F(NoMemory, AnyAllocationOfARebuildMayFail) {
     forgetCommands();
+    host.file(IC::diskSnapshotPath, "");
     shell_stub::answerWith(answer);
     const auto rebuild = [] {
         IC::myoshwmi.createHardDriveNodes(true);

@@ -70,6 +70,7 @@ class RebuildStress : public StorageHost {};
 
 HOST_TEST_F(RebuildStress, EightReadersNeverSeeANodeThatIsNotWhole) {
     CannedLayout layout;
+    host.file(IC::diskSnapshotPath, "");
     std::atomic<bool> over{false};
     std::atomic<unsigned> torn{0};
     std::atomic<unsigned long> reads{0};

@@ -16,6 +16,7 @@
 #include "tests/support/mounts.h"
 #include "tests/support/system_call.h"
 #include "tests/support/tool_files.h"
+#include "tests/support/world.h"
 
 namespace fs = std::filesystem;
 using namespace fake_host;
@@ -76,6 +77,10 @@ void FakeHost::directory(const std::string& path, mode_t mode) {
 void FakeHost::symlink(const std::string& path, const std::string& target) {
     makeParents(path);
     must(::symlink(target.c_str(), path.c_str()), "link " + path);
+}
+
+bool FakeHost::giveToStranger(const std::string& path) {
+    return lchown(path.c_str(), stranger, stranger) == 0;
 }
 
 void FakeHost::remove(const std::string& path) {

@@ -56,6 +56,8 @@ public:
     void file(const std::string& path, const std::string& content, mode_t mode = 0644);
     void directory(const std::string& path, mode_t mode = 0755);
     void symlink(const std::string& path, const std::string& target);
+    /// Makes another user of the host its owner. False where nobody can: the tests do not run as root.
+    [[nodiscard]] bool giveToStranger(const std::string& path);
     void remove(const std::string& path);  ///< a file or a whole directory; fine when there is none
     std::optional<std::string> read(const std::string& path) const;  ///< nothing when it cannot be read
     bool exists(const std::string& path) const;                      ///< a dangling link exists

@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 #include <net/if.h>
+#include <sys/stat.h>
 #include <sys/syscall.h>
 #include <sys/time.h>
 #include <sys/timex.h>
@@ -130,6 +131,20 @@ HOST_TEST(FakeHostFiles, AreAsGiven) {
     EXPECT_FALSE(host.exists("/etc/sysconfig"));
     EXPECT_EQ(host.read("/etc"), std::nullopt);
     EXPECT_THAT(host.listDirectory("/none"), IsEmpty());
+}
+
+HOST_TEST(FakeHostFiles, CanBeAnotherUsers) {
+    host.file("/tmp/a", "");
+    host.symlink("/tmp/link", "a");
+    if (!host.giveToStranger("/tmp/link")) {
+        GTEST_SKIP() << "only root can map a second user";
+    }
+    struct stat found {};
+    ASSERT_EQ(lstat("/tmp/link", &found), 0);
+    EXPECT_EQ(found.st_uid, 12345U);
+    EXPECT_EQ(found.st_gid, 12345U);
+    ASSERT_EQ(stat("/tmp/link", &found), 0);
+    EXPECT_EQ(found.st_uid, 0U);
 }
 
 HOST_TEST(FakeHostFiles, ProcIsTheTests) {

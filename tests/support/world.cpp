@@ -39,11 +39,48 @@ void put(const char* path, const std::string& text) {
     must(written, std::string("write ") + path);
 }
 
-void becomeRoot(const Owner& owner) {
-    put("/proc/self/setgroups", "deny");
-    put("/proc/self/uid_map", "0 " + std::to_string(owner.user) + " 1");
-    put("/proc/self/gid_map", "0 " + std::to_string(owner.group) + " 1");
+/// Makes the owner root in there, and if he is root here also lets the stranger be.
+void mapUsers(const std::string& process, const Owner& owner, bool withStranger) {
+    const std::string other = std::to_string(stranger);
+    const std::string more = withStranger ? "\n" + other + " " + other + " 1" : "";
+    put((process + "/setgroups").c_str(), "deny");
+    put((process + "/uid_map").c_str(), "0 " + std::to_string(owner.user) + " 1" + more);
+    put((process + "/gid_map").c_str(), "0 " + std::to_string(owner.group) + " 1" + more);
 }
+
+/// What a new process and its starter agree on: who writes down the users. Only root may write two, and only
+/// from outside.
+class Handshake {
+public:
+    Handshake() { must(pipe2(ends_, O_CLOEXEC), "make a pipe"); }
+    ~Handshake() {
+        close(ends_[0]);
+        close(ends_[1]);
+    }
+    Handshake(const Handshake&) = delete;
+    Handshake& operator=(const Handshake&) = delete;
+
+    void mapFromOutside(pid_t process, const Owner& owner) const {
+        bool mapped = false;
+        try {
+            if (owner.user == 0) {
+                mapUsers("/proc/" + std::to_string(process), owner, true);
+                mapped = true;
+            }
+        } catch (const std::exception&) {
+            // A root without that right here; the process maps itself alone.
+        }
+        must(write(ends_[1], &mapped, sizeof mapped), "tell who maps the users");
+    }
+    void mapFromInside(const Owner& owner) const {
+        bool mapped = false;
+        must(read(ends_[0], &mapped, sizeof mapped), "hear who maps the users");
+        if (!mapped) mapUsers("/proc/self", owner, false);
+    }
+
+private:
+    int ends_[2];
+};
 
 void dropDangerousCapabilities() {
     __user_cap_header_struct header{_LINUX_CAPABILITY_VERSION_3, 0};
@@ -91,13 +128,14 @@ int waitForBody(pid_t body, const ProcessNumbers& numbers) {
     return status;
 }
 
-[[noreturn]] void runInit(int report, const std::function<void()>& body, const Owner* mapped) {
+[[noreturn]] void runInit(int report, const std::function<void()>& body, const Owner& owner,
+                          const Handshake* mapping) {
     try {
         prctl(PR_SET_PDEATHSIG, SIGKILL);
-        if (mapped) becomeRoot(*mapped);
+        if (mapping) mapping->mapFromInside(owner);
         ProcessNumbers numbers;
         buildRoot();
-        if (!mapped) dropDangerousCapabilities();
+        if (!mapping) dropDangerousCapabilities();
         must(sethostname("localhost", 9), "set the host name");
         pid_t child = must(fork(), "start the body");
         if (child == 0) {
@@ -130,12 +168,14 @@ pid_t startWorld(int report, const std::function<void()>& body) {
     prepareRoot();
     pid_t init = -1;
     if (userNamespaceWanted()) {
+        const Handshake mapping;
         init = cloneInto(namespaces | CLONE_NEWUSER);
-        if (init == 0) runInit(report, body, &owner);
+        if (init == 0) runInit(report, body, owner, &mapping);
+        if (init > 0) mapping.mapFromOutside(init, owner);
     }
     if (init < 0 && owner.user == 0) {
         init = cloneInto(namespaces);
-        if (init == 0) runInit(report, body, nullptr);
+        if (init == 0) runInit(report, body, owner, nullptr);
     }
     return must(init,
                 "create the namespaces of a fake host (as a user this needs unprivileged user namespaces: "

@@ -10,6 +10,9 @@ namespace fake_host {
 /// children. The numbers are given out anew from the start long before this one is reached.
 inline constexpr int highestProcess = 256;
 
+/// The number of an ordinary user of a fake host.
+inline constexpr unsigned int stranger = 12345;
+
 /// Starts a process in new user, mount, UTS, network, IPC and PID namespaces over a fresh root directory; it
 /// runs `body` in a child of its own and leaves by _exit when that has ended, which ends everything else in
 /// there. `report` receives a Report::problem when the root cannot be built, else the child's wait status.
