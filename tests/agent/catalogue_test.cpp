@@ -1,4 +1,4 @@
-#include "agent/catalogue.h"
+#include "agent/core/catalogue.h"
 
 #include <gmock/gmock.h>
 

@@ -1,4 +1,4 @@
-#include "agent/command_deadline.h"
+#include "agent/core/command_deadline.h"
 
 #include <gmock/gmock.h>
 #include <sys/wait.h>
@@ -7,7 +7,7 @@
 #include <csignal>
 #include <filesystem>
 
-#include "agent/options.h"
+#include "agent/cli/options.h"
 #include "tests/agent/hostile_host.h"
 #include "tests/support/shell.h"
 

@@ -1,4 +1,4 @@
-#include "agent/host_tools.h"
+#include "agent/core/host_tools.h"
 
 #include <gmock/gmock.h>
 #include <sys/resource.h>
@@ -9,7 +9,7 @@
 #include <cstdlib>
 #include <nlohmann/json.hpp>
 
-#include "agent/probe.h"
+#include "agent/core/probe.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/texts_are.h"
 

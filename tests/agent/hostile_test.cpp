@@ -4,9 +4,9 @@
 
 #include <nlohmann/json.hpp>
 
-#include "agent/command_deadline.h"
-#include "agent/plugin.h"
-#include "agent/surroundings.h"
+#include "agent/core/command_deadline.h"
+#include "agent/core/plugin.h"
+#include "agent/core/surroundings.h"
 #include "framework/qx/thread.h"
 #include "tests/agent/hostile_host.h"
 #include "tests/agent/suse_host.h"

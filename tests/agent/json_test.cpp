@@ -1,4 +1,4 @@
-#include "agent/json.h"
+#include "agent/cli/json.h"
 
 #include <gmock/gmock.h>
 

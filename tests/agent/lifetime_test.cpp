@@ -6,11 +6,11 @@
 #include <filesystem>
 #include <thread>
 
-#include "agent/log_output.h"
-#include "agent/plugin.h"
-#include "agent/reading.h"
-#include "agent/surroundings.h"
-#include "agent/tree.h"
+#include "agent/core/log_output.h"
+#include "agent/core/plugin.h"
+#include "agent/core/reading.h"
+#include "agent/core/surroundings.h"
+#include "agent/core/tree.h"
 #include "framework/qx/thread.h"
 #include "tests/support/fake_host.h"
 

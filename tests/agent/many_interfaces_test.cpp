@@ -6,8 +6,8 @@
 #include <nlohmann/json.hpp>
 #include <set>
 
-#include "agent/json.h"
-#include "agent/tree.h"
+#include "agent/cli/json.h"
+#include "agent/core/tree.h"
 #include "mi/globals.h"
 #include "mi/os_hw_mi.h"
 #include "tests/indications/heard.h"

@@ -1,4 +1,4 @@
-#include "agent/print.h"
+#include "agent/cli/print.h"
 
 #include <gmock/gmock.h>
 

@@ -4,7 +4,7 @@
 #include <barrier>
 #include <nlohmann/json.hpp>
 
-#include "agent/reading.h"
+#include "agent/core/reading.h"
 #include "tests/agent/cvagent_run.h"
 #include "tests/support/no_threads.h"
 

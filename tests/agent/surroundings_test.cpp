@@ -11,8 +11,8 @@
 #include <filesystem>
 #include <set>
 
-#include "agent/signals.h"
-#include "agent/surroundings.h"
+#include "agent/core/signals.h"
+#include "agent/core/surroundings.h"
 #include "tests/agent/cvagent_run.h"
 #include "tests/agent/terminal.h"
 

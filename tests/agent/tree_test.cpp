@@ -1,8 +1,8 @@
-#include "agent/tree.h"
+#include "agent/core/tree.h"
 
 #include <gmock/gmock.h>
 
-#include "agent/failure.h"
+#include "agent/cli/failure.h"
 #include "tests/agent/node_list.h"
 
 namespace {

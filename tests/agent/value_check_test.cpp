@@ -1,4 +1,4 @@
-#include "agent/value_check.h"
+#include "agent/core/value_check.h"
 #include "tests/support/texts_are.h"
 
 #include <gmock/gmock.h>

@@ -1,0 +1,193 @@
+#include "agent/cli/command_line.h"
+
+#include <CLI/CLI.hpp>
+#include <cmath>
+#include <iostream>
+
+#include "agent/cli/failure.h"
+#include "agent/cli/print.h"
+
+namespace cvagent {
+
+namespace {
+
+constexpr const char* kDescription =
+    "Shows and changes what the Corvista OS/hardware plug-in knows of this host.\n";
+constexpr const char* kFooter =
+    "\nExit status: 0 done, 1 the plug-in or the host failed, 2 wrong usage, 3 no such node or property,\n"
+    "4 value refused, 5 another agent holds the data directory.\n"
+    "\nExamples:\n"
+    "  cvagent tree\n"
+    "  cvagent get network-port:eth0 LinkSpeed LinkState\n"
+    "  cvagent set ip-config:eth0 DNSServers 192.0.2.53 2001:db8::53\n"
+    "  cvagent COMMAND --help";
+constexpr const char* kNodeHelp =
+    "The node: its id, its path, or the last part of its path when only one node has it";
+
+/// Seconds up to a limit; the range check of the parser lets "nan" through.
+CLI::Validator secondsUpTo(double most) {
+    return CLI::Validator(
+        [most](const std::string& text) {
+            double seconds = 0;
+            const bool good = CLI::detail::lexical_cast(text, seconds) && seconds >= 0 && seconds <= most;
+            return good ? std::string()
+                        : inQuotes(text) + " is no number of seconds from 0 to " +
+                              std::to_string(std::lround(most));
+        },
+        "");
+}
+
+void addGlobalOptions(CLI::App& app, Options& options) {
+    app.add_option("--plugin", options.plugin, "The plug-in to load; by default the one beside this program")
+        ->type_name("FILE");
+    app.add_option("--log", options.logFile, "Append the plug-in's log lines to this file")
+        ->type_name("FILE");
+    app.add_option(
+           "--log-level", options.logLevel,
+           "Lowest level of the lines that are logged (3000 progress, 4000 changes, 5000, 6000 errors); "
+           "without --log they go to standard error. Default: 6000")
+        ->type_name("N")
+        ->check(CLI::Range(0, 1000000));
+    app.add_option("--trace", options.traceFile, "Append every line, whatever its level, to this file")
+        ->type_name("FILE");
+    const std::map<std::string, HostTools> choices{
+        {"auto", HostTools::automatic}, {"native", HostTools::native}, {"classic", HostTools::classic}};
+    app.add_option(
+           "--host-tools", options.hostTools,
+           "Tools the plug-in's commands find: the host's own (native), our adapters (classic), or of "
+           "each the one that prints the classic format (auto, the default)")
+        ->type_name("auto|native|classic")
+        ->transform(CLI::CheckedTransformer(choices).description(""));
+    app.add_option("--command-timeout", options.commandSeconds,
+                   "End a command of the plug-in that takes longer, in a write ten times as long; what it "
+                   "would have told reads as an error. 0 waits for ever. Default: 10")
+        ->type_name("SECONDS")
+        ->check(secondsUpTo(1e6));
+}
+
+void addJson(CLI::App& command, Options& options) {
+    command.add_flag("--json", options.json, "Print JSON");
+}
+
+// The parser would take a word in brackets apart ("[a,b]"); a mark in front keeps it whole.
+constexpr char kMark = '\x01';
+
+std::vector<std::string> marked(int count, const char* const* words) {
+    std::vector<std::string> all;
+    for (int i = count - 1; i > 0; --i) {  // the parser takes them from the back
+        const std::string word = words[i];
+        all.push_back(word.starts_with('[') || word.starts_with(kMark) ? kMark + word : word);
+    }
+    return all;
+}
+
+void unmark(std::string& word) {
+    if (word.starts_with(kMark)) {
+        word.erase(0, 1);
+    }
+}
+
+void unmark(Options& options) {
+    for (std::vector<std::string>* list : {&options.values, &options.properties}) {
+        for (std::string& word : *list) {
+            unmark(word);
+        }
+    }
+    for (std::string* word : {&options.node, &options.property, &options.nodeClass}) {
+        unmark(*word);
+    }
+}
+
+void addReaders(CLI::App& app, Options& options) {
+    CLI::App* tree = app.add_subcommand("tree", "Print the nodes as a tree");
+    addJson(*tree, options);
+    tree->footer("With --json every node is printed with its stored properties.");
+    tree->callback([&options] { options.command = Command::tree; });
+
+    CLI::App* get = app.add_subcommand("get", "Read a node's properties now");
+    get->add_option("NODE", options.node, kNodeHelp)->required()->type_name("");
+    get->add_option("PROPERTY", options.properties,
+                    "Numbers or names of properties; all known ones when none is named")
+        ->type_name("");
+    addJson(*get, options);
+    get->callback([&options] { options.command = Command::get; });
+
+    CLI::App* watch = app.add_subcommand("watch", "Print alerts, published and withdrawn nodes as they come");
+    watch->add_option("--for", options.seconds, "Stop after this time; by default at Ctrl-C")
+        ->type_name("SECONDS")
+        ->check(secondsUpTo(1e9));
+    addJson(*watch, options);
+    watch->footer("With --json each event is one object on a line of its own.");
+    watch->callback([&options] { options.command = Command::watch; });
+}
+
+void addSet(CLI::App& app, Options& options) {
+    CLI::App* set =
+        app.add_subcommand("set", "Change a property of this host, then print what it was and is");
+    set->add_option("NODE", options.node, kNodeHelp)->required()->type_name("");
+    set->add_option("PROPERTY", options.property, "Number or name of the property")
+        ->required()
+        ->type_name("");
+    set->add_option("VALUE", options.values, "The new value; several for a list, \"\" empties it")
+        ->required()
+        ->type_name("");
+    set->add_flag("-y,--yes", options.yes, "Do not ask before the host is restarted or halted");
+    addJson(*set, options);
+    set->footer(
+        "What a property accepts is told by: cvagent properties CLASS.\n"
+        "Put -- in front of values that begin with a minus and are no numbers.");
+    set->callback([&options] { options.command = Command::set; });
+}
+
+void addOffline(CLI::App& app, Options& options) {
+    CLI::App* properties = app.add_subcommand("properties", "Print the catalogue of properties");
+    properties->add_option("CLASS", options.nodeClass, "Only this class of nodes, such as network-port")
+        ->type_name("");
+    addJson(*properties, options);
+    properties->callback([&options] { options.command = Command::properties; });
+
+    CLI::App* doctor =
+        app.add_subcommand("doctor", "Tell which of the host's tools are found, used and missing");
+    addJson(*doctor, options);
+    doctor->callback([&options] { options.command = Command::doctor; });
+}
+
+/// The subcommand that was being read, for the hint.
+std::string helpCommand(const CLI::App& app) {
+    const auto given = app.get_subcommands();
+    return given.empty() ? "cvagent --help" : "cvagent " + given.front()->get_name() + " --help";
+}
+
+}  // namespace
+
+std::optional<Options> parseCommandLine(int count, const char* const* words, int& status) {
+    Options options;
+    CLI::App app{kDescription, "cvagent"};
+    app.footer(kFooter);
+    app.set_version_flag("--version", "cvagent " CORVISTA_VERSION);
+    app.require_subcommand(1);
+    app.fallthrough();
+    addGlobalOptions(app, options);
+    app.add_flag("--json", options.json)->group("");  // accepted in front of the command, too
+    addReaders(app, options);
+    addSet(app, options);
+    addOffline(app, options);
+    try {
+        app.parse(marked(count, words));
+        unmark(options);
+        return options;
+    } catch (const CLI::Success& help) {
+        status = app.exit(help);
+    } catch (const CLI::RequiredError& error) {
+        const bool noCommand = app.get_subcommands().empty();
+        std::cerr << "cvagent: " << (noCommand ? "which command? Try: cvagent tree" : error.what())
+                  << "\nSee: " << helpCommand(app) << '\n';
+        status = static_cast<int>(ExitStatus::usage);
+    } catch (const CLI::ParseError& error) {
+        std::cerr << "cvagent: " << error.what() << "\nSee: " << helpCommand(app) << '\n';
+        status = static_cast<int>(ExitStatus::usage);
+    }
+    return std::nullopt;
+}
+
+}  // namespace cvagent

@@ -1,0 +1,70 @@
+#include <set>
+
+#include "agent/cli/commands/commands.h"
+#include "agent/cli/json.h"
+#include "agent/cli/print.h"
+#include "agent/core/host_tools.h"
+#include "agent/core/surroundings.h"
+
+namespace cvagent::commands {
+
+namespace {
+
+std::string found(const ToolReport& report) {
+    if (report.native.empty()) {
+        return "not found";
+    }
+    return report.native + (report.classic ? "" : " (not the classic format)");
+}
+
+std::string outcome(const ToolReport& report, const Style& style) {
+    if (report.useAdapter) {
+        return style.good("our adapter ") + report.adapter;
+    }
+    if (report.missing()) {
+        return style.bad("missing: ") + report.purpose + "; install the package " +
+               style.strong(report.package);
+    }
+    return report.classic ? style.good("the host's own")
+                          : style.bad("the host's own, not understood: ") + report.purpose;
+}
+
+std::string advice(const std::vector<ToolReport>& reports) {
+    std::set<std::string> packages;
+    for (const ToolReport& report : reports) {
+        if (report.missing()) {
+            packages.insert(report.package);
+        }
+    }
+    std::string text;
+    for (const std::string& package : packages) {
+        text += " " + package;
+    }
+    return text.empty() ? "Nothing is missing.\n"
+                        : "To install what is missing: apt-get install" + text + "\n";
+}
+
+std::string table(const std::vector<ToolReport>& reports, const Style& style) {
+    std::size_t width = 0;
+    for (const ToolReport& report : reports) {
+        width = std::max(width, found(report).size());
+    }
+    std::string text = style.strong(padded("TOOL", 10) + padded("FOUND", width + 2) + "USED") + "\n";
+    for (const ToolReport& report : reports) {
+        text += padded(report.tool, 10) + padded(found(report), width + 2) + outcome(report, style) + "\n";
+    }
+    return text + "\n" + advice(reports);
+}
+
+}  // namespace
+
+ExitStatus doctor(const Options& options) {
+    const Style style = Style::detect();
+    prepareSurroundings();
+    const std::vector<ToolReport> reports =
+        inspectHostTools(options.hostTools, Look::everything, adapterDirectory());
+    print(options.json ? json::tools(reports) : table(reports, style));
+    return ExitStatus::done;
+}
+
+}  // namespace cvagent::commands

@@ -1,0 +1,191 @@
+#include "agent/cli/json.h"
+
+#include <nlohmann/json.hpp>
+
+#include "agent/cli/print.h"
+
+namespace cvagent::json {
+
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+std::string document(const Json& json, int indent) {
+    return json.dump(indent, ' ', false, Json::error_handler_t::replace) + "\n";
+}
+
+Json numberValue(const IC::Number& number) {
+    if (number.empty()) {
+        return nullptr;
+    }
+    const std::string text = number.toString();
+    switch (number.kind()) {
+        case IC::Number::boolean:
+            return text == "true";
+        case IC::Number::real:
+            return number.toDouble();
+        case IC::Number::scaled:
+            if (text.find('.') != std::string::npos) {
+                return number.toDouble();
+            }
+            return std::stoll(text);
+        default:
+            return number.toUnsigned64();
+    }
+}
+
+Json plainValue(const IC::PropertyValue& value) {
+    if (const IC::Number* number = value.asNumber()) {
+        return numberValue(*number);
+    }
+    if (const IC::EnumValue* code = value.asEnum()) {
+        return code->code();
+    }
+    if (const std::string* text = value.asText()) {
+        return *text;
+    }
+    if (const auto* texts = value.asTexts()) {
+        return *texts;
+    }
+    if (const auto* numbers = value.asNumbers()) {
+        Json list = Json::array();
+        for (const IC::Number& number : *numbers) {
+            list.push_back(numberValue(number));
+        }
+        return list;
+    }
+    return nullptr;
+}
+
+const char* kindOf(const IC::PropertyValue& value) {
+    switch (value.kind()) {
+        case IC::PropertyValue::number:
+            return "number";
+        case IC::PropertyValue::text:
+            return "text";
+        case IC::PropertyValue::enumeration:
+            return "enum";
+        case IC::PropertyValue::texts:
+            return "texts";
+        case IC::PropertyValue::numbers:
+            return "numbers";
+        case IC::PropertyValue::none:
+            break;
+    }
+    return "none";
+}
+
+/// A failed read has the kind the catalogue promises, since it brought no value.
+Json readingObject(const Reading& reading) {
+    Json object{{"name", reading.name()}};
+    if (reading.failed()) {
+        object["kind"] = reading.row ? kindName(reading.row->kind) : "none";
+        object["error"] = reading.error;
+    } else {
+        object["kind"] = kindOf(reading.value);
+        object["value"] = plainValue(reading.value);
+    }
+    return object;
+}
+
+Json nodeObject(const IC::MutableNode& node, const std::vector<Reading>& readings) {
+    Json properties = Json::object();
+    for (const Reading& reading : readings) {
+        properties[std::to_string(reading.id)] = readingObject(reading);
+    }
+    return {{"id", node.getNodeId()},
+            {"parent", node.getLinkedId()},
+            {"type", node.nodeType()},
+            {"class", className(node.nodeType())},
+            {"index", node.getIndex()},
+            {"path", node.getPath()},
+            {"description", node.getDescription()},
+            {"status", node.getStatus()},
+            {"properties", std::move(properties)}};
+}
+
+Json labelList(const Property& row) {
+    Json list = Json::array();
+    for (const Label& label : row.labels) {
+        list.push_back({{"value", label.code}, {"label", label.text}});
+    }
+    return list;
+}
+
+}  // namespace
+
+std::string tree(const std::string& plugin, const std::vector<Handle>& nodes) {
+    Json list = Json::array();
+    for (const Handle& node : nodes) {
+        list.push_back(nodeObject(*node, storedReadings(*node)));
+    }
+    return document({{"plugin", plugin}, {"nodes", std::move(list)}}, 2);
+}
+
+std::string node(const IC::MutableNode& node, const std::vector<Reading>& readings) {
+    return document(nodeObject(node, readings), 2);
+}
+
+std::string change(const IC::MutableNode& node, const Reading& before, const Reading& after) {
+    return document({{"id", node.getNodeId()},
+                     {"path", node.getPath()},
+                     {"property",
+                      {{"id", after.id},
+                       {"name", after.name()},
+                       {"old", readingObject(before)},
+                       {"new", readingObject(after)}}}},
+                    2);
+}
+
+std::string event(const Event& event) {
+    Json object{{"time", timeText(event.time)}, {"event", eventName(event.kind)}};
+    if (event.kind == Event::Kind::alert) {
+        object["path"] = event.path;
+        object["message"] = event.message;
+        object["codes"] = {
+            {"first", event.firstCode}, {"second", event.secondCode}, {"event", event.eventCode}};
+    } else {
+        object["id"] = event.nodeId;
+        object["class"] = event.nodeClass;
+        object["path"] = event.path;
+        object["description"] = event.message;
+    }
+    return document(object, -1);
+}
+
+std::string catalogue(const std::vector<Property>& rows) {
+    Json list = Json::array();
+    for (const Property& row : rows) {
+        const auto type = static_cast<unsigned int>(row.type);
+        Json object{{"class", className(type)},
+                    {"type", type},
+                    {"id", row.id},
+                    {"name", row.name},
+                    {"kind", kindName(row.kind)},
+                    {"unit", unitName(row.unit)},
+                    {"readable", row.readable()},
+                    {"writable", row.writable()}};
+        object["values"] = labelList(row);
+        object["accepts"] = row.writable() ? Json(acceptedText(row)) : Json(nullptr);
+        object["meaning"] = row.meaning;
+        list.push_back(std::move(object));
+    }
+    return document(list, 2);
+}
+
+std::string tools(const std::vector<ToolReport>& reports) {
+    Json list = Json::array();
+    for (const ToolReport& report : reports) {
+        const auto orNull = [](const std::string& text) { return text.empty() ? Json(nullptr) : Json(text); };
+        list.push_back({{"tool", report.tool},
+                        {"host", orNull(report.native)},
+                        {"classic", report.classic},
+                        {"adapter", orNull(report.adapter)},
+                        {"used", orNull(report.used())},
+                        {"package", report.package},
+                        {"purpose", report.purpose}});
+    }
+    return document(list, 2);
+}
+
+}  // namespace cvagent::json

@@ -1,0 +1,28 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "agent/core/event.h"
+#include "agent/core/host_tools.h"
+#include "agent/core/reading.h"
+
+/// The program's JSON. Text that is no UTF-8 has its damaged bytes replaced. Each function returns a whole
+/// document with a line break at its end.
+namespace cvagent::json {
+
+/// {"plugin": FILE, "nodes": [NODE...]} with the stored properties of each node.
+std::string tree(const std::string& plugin, const std::vector<Handle>& nodes);
+/// {"id", "parent", "type", "class", "index", "path", "description", "status", "properties": {"108": {"name",
+/// "kind", "value"}}}; a property whose read failed has "error" in place of "value".
+std::string node(const IC::MutableNode& node, const std::vector<Reading>& readings);
+/// {"id", "path", "property": {"id", "name", "old", "new"}}, both as in a node.
+std::string change(const IC::MutableNode& node, const Reading& before, const Reading& after);
+/// One line: {"time", "event", "path", ...}.
+std::string event(const Event& event);
+/// [{"class", "type", "id", "name", "kind", "unit", "readable", "writable", "values", "accepts", "meaning"}]
+std::string catalogue(const std::vector<Property>& rows);
+/// [{"tool", "host", "classic", "adapter", "used", "package", "purpose"}]
+std::string tools(const std::vector<ToolReport>& reports);
+
+}  // namespace cvagent::json

@@ -1,0 +1,237 @@
+#include "agent/cli/print.h"
+
+#include <unistd.h>
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <cstdarg>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+
+#include "agent/cli/failure.h"
+#include "agent/core/surroundings.h"
+#include "framework/qx/utf8.h"
+
+namespace cvagent {
+
+namespace {
+
+constexpr std::size_t kLongestQuote = 60;
+
+__attribute__((format(printf, 1, 2))) std::string formatted(const char* format, ...) {
+    std::array<char, 64> text{};
+    va_list arguments;
+    va_start(arguments, format);
+    const int length = std::vsnprintf(text.data(), text.size(), format, arguments);
+    va_end(arguments);
+    return length < 0 ? std::string() : std::string(text.data());
+}
+
+/// "12.3 GB": a size in steps of 1000 or 1024, with the unit that keeps it short.
+std::string scaled(double size, double step, const std::array<const char*, 6>& units) {
+    std::size_t unit = 0;
+    while (size >= step && unit + 1 < units.size()) {
+        size /= step;
+        ++unit;
+    }
+    const int decimals = unit == 0 || size >= 1000 ? 0 : 1;
+    return formatted("%.*f %s", decimals, size, units[unit]);
+}
+
+std::string speedText(unsigned long long kilobits) {
+    std::string text = scaled(static_cast<double>(kilobits) * 1000, 1000,
+                              {"bit/s", "kbit/s", "Mbit/s", "Gbit/s", "Tbit/s", "Pbit/s"});
+    const std::size_t fraction = text.find(".0 ");
+    return fraction == std::string::npos ? text : text.erase(fraction, 2);
+}
+
+std::string offsetText(double minutes) {
+    const int whole = static_cast<int>(minutes);
+    return formatted("UTC%c%02d:%02d", whole < 0 ? '-' : '+', std::abs(whole) / 60, std::abs(whole) % 60);
+}
+
+/// What a number comes to in larger units; empty when there is nothing to add.
+std::string inLargerUnits(Unit unit, const IC::Number& number) {
+    switch (unit) {
+        case Unit::thousandBytes:
+            return sizeText(number.toUnsigned64() * 1000);
+        case Unit::kibibytes:
+            return sizeText(number.toUnsigned64() * 1024);
+        case Unit::kilobitsPerSecond:
+            return speedText(number.toUnsigned64());
+        case Unit::secondsSinceEpoch:
+            return timeText(static_cast<std::time_t>(number.toDouble()));
+        case Unit::minutes:
+            return offsetText(number.toDouble());
+        default:
+            return {};
+    }
+}
+
+std::string withLabel(const std::optional<Property>& property, const std::string& code, unsigned int number) {
+    const char* label = property ? labelOf(*property, number) : nullptr;
+    return label == nullptr ? code : code + " (" + label + ")";
+}
+
+std::string numberText(const std::optional<Property>& property, const IC::Number& number) {
+    std::string text = number.toString();
+    if (!property || number.empty() || number.kind() == IC::Number::boolean) {
+        return text;
+    }
+    if (labelOf(*property, number) != nullptr) {
+        return withLabel(property, text, number);
+    }
+    if (property->unit != Unit::none) {
+        text += std::string(" ") + unitName(property->unit);
+    }
+    const std::string larger = inLargerUnits(property->unit, number);
+    return larger.empty() ? text : text + ", " + larger;
+}
+
+template <class List, class ToText>
+std::string joined(const List& list, ToText toText) {
+    std::string text;
+    for (const auto& item : list) {
+        text += (text.empty() ? "" : ", ") + toText(item);
+    }
+    return text;
+}
+
+std::string plainText(const std::optional<Property>& property, const IC::PropertyValue& value) {
+    if (const IC::Number* number = value.asNumber()) {
+        return numberText(property, *number);
+    }
+    if (const IC::EnumValue* code = value.asEnum()) {
+        return withLabel(property, std::to_string(code->code()), code->code());
+    }
+    if (const auto* texts = value.asTexts()) {
+        return joined(*texts, [](const std::string& text) { return text; });
+    }
+    if (const auto* numbers = value.asNumbers()) {
+        return joined(*numbers, [&](const IC::Number& number) { return numberText(property, number); });
+    }
+    return static_cast<std::string>(value);
+}
+
+bool isUtf8Locale() {
+    for (const char* name : {"LC_ALL", "LC_CTYPE", "LANG"}) {
+        const char* value = std::getenv(name);
+        if (value != nullptr && *value != '\0') {
+            const std::string locale = value;
+            return locale.find("UTF-8") != std::string::npos || locale.find("utf8") != std::string::npos;
+        }
+    }
+    return false;
+}
+
+}  // namespace
+
+Style Style::detect() {
+    const char* noColour = std::getenv("NO_COLOR");
+    const char* terminal = std::getenv("TERM");
+    const bool dumb = terminal == nullptr || std::strcmp(terminal, "dumb") == 0;
+    Style style;
+    style.colour = isatty(STDOUT_FILENO) == 1 && !dumb && (noColour == nullptr || *noColour == '\0');
+    style.lines = isUtf8Locale();
+    return style;
+}
+
+std::string Style::paint(const std::string& text, const char* code) const {
+    return colour && !text.empty() ? std::string("\x1b[") + code + "m" + text + "\x1b[0m" : text;
+}
+
+std::string printable(const std::string& text) {
+    std::string shown;
+    for (std::size_t i = 0; i < text.size();) {
+        const QX::Utf8Character next = QX::firstUtf8Character(std::string_view(text).substr(i));
+        const bool isControl = next.code < 0x20 || (next.code >= 0x7F && next.code < 0xA0);
+        if (next.length != 0 && !isControl) {
+            shown.append(text, i, next.length);
+            i += next.length;
+        } else {
+            shown += formatted("\\x%02x", static_cast<unsigned char>(text[i]));
+            ++i;
+        }
+    }
+    return shown;
+}
+
+std::string inQuotes(const std::string& text) {
+    if (text.size() <= kLongestQuote) {
+        return "'" + printable(text) + "'";
+    }
+    std::size_t length = kLongestQuote;
+    while (length > 0 && (static_cast<unsigned char>(text[length]) & 0xC0U) == 0x80U) {
+        --length;  // no half characters
+    }
+    return "'" + printable(text.substr(0, length)) + "...' (" + std::to_string(text.size()) + " bytes)";
+}
+
+void print(const std::string& text) {
+    const bool written = std::fwrite(text.data(), 1, text.size(), stdout) == text.size();
+    if (!written || std::fflush(stdout) != 0) {
+        // A reader that has seen enough (head, less) needs no message.
+        throw Failure(
+            ExitStatus::failed,
+            errno == EPIPE ? "" : std::string("cannot write to standard output: ") + std::strerror(errno));
+    }
+}
+
+void complain(const std::string& text) {
+    std::string shown = "cvagent: ";
+    for (std::size_t start = 0; start <= text.size();) {
+        const std::size_t end = std::min(text.find('\n', start), text.size());
+        shown += printable(text.substr(start, end - start)) + "\n";
+        start = end + 1;
+    }
+    [[maybe_unused]] const ssize_t written = write(messageDescriptor(), shown.data(), shown.size());
+}
+
+void ask(const std::string& question) {
+    [[maybe_unused]] const ssize_t written = write(messageDescriptor(), question.data(), question.size());
+}
+
+std::string valueText(const std::optional<Property>& property, const IC::PropertyValue& value) {
+    if (value.empty()) {
+        return "not known";
+    }
+    std::string text;
+    try {
+        text = plainText(property, value);
+    } catch (const IC::ConversionError&) {  // a number that does not fit what it counts
+        text = static_cast<std::string>(value);
+    }
+    if (text.empty()) {
+        return value.kind() == IC::PropertyValue::text ? "(empty)" : "(none)";
+    }
+    return printable(text);
+}
+
+std::string sizeText(unsigned long long bytes) {
+    const auto size = static_cast<double>(bytes);
+    if (size < 1000) {
+        return scaled(size, 1000, {"B", "kB", "MB", "GB", "TB", "PB"});
+    }
+    return scaled(size, 1000, {"B", "kB", "MB", "GB", "TB", "PB"}) + " (" +
+           scaled(size, 1024, {"B", "KiB", "MiB", "GiB", "TiB", "PiB"}) + ")";
+}
+
+std::string timeText(std::time_t time) {
+    std::tm fields{};
+    std::array<char, 40> text{};
+    if (gmtime_r(&time, &fields) == nullptr ||
+        std::strftime(text.data(), text.size(), "%Y-%m-%dT%H:%M:%SZ", &fields) == 0) {
+        return std::to_string(time) + " s since 1970";
+    }
+    return text.data();
+}
+
+std::string padded(const std::string& text, std::size_t width) {
+    const auto isStart = [](char c) { return (static_cast<unsigned char>(c) & 0xC0U) != 0x80U; };
+    const auto length = static_cast<std::size_t>(std::count_if(text.begin(), text.end(), isStart));
+    return text + std::string(length < width ? width - length : 0, ' ');
+}
+
+}  // namespace cvagent

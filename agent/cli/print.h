@@ -1,0 +1,52 @@
+#pragma once
+
+#include <ctime>
+#include <optional>
+#include <string>
+
+#include "agent/core/catalogue.h"
+
+namespace cvagent {
+
+/// What the terminal behind standard output can show.
+struct Style {
+    bool colour = false;
+    bool lines = false;  ///< line-drawing characters; else ASCII
+
+    /// Looks at standard output and the locale the program was started with.
+    static Style detect();
+    std::string strong(const std::string& text) const { return paint(text, "1"); }
+    std::string faint(const std::string& text) const { return paint(text, "2"); }
+    std::string bad(const std::string& text) const { return paint(text, "31"); }
+    std::string good(const std::string& text) const { return paint(text, "32"); }
+
+private:
+    std::string paint(const std::string& text, const char* code) const;
+};
+
+/// The text with control characters, and bytes that are no UTF-8, spelt out, so that a name from the host
+/// cannot steer the terminal.
+std::string printable(const std::string& text);
+/// The same, cut after some 60 characters, for messages that quote what was given.
+std::string inQuotes(const std::string& text);
+
+/// Writes text to standard output. Throws Failure when it cannot be written.
+void print(const std::string& text);
+/// One message of the program to the standard error it was started with.
+void complain(const std::string& text);
+/// A question, in the same place; the answer is typed behind it.
+void ask(const std::string& question);
+
+/// A value for people: with its unit, its label, a size in GB and GiB.
+/// @param property its row of the catalogue; none for a property that is not in it
+std::string valueText(const std::optional<Property>& property, const IC::PropertyValue& value);
+
+/// "80.0 GB (74.5 GiB)"
+std::string sizeText(unsigned long long bytes);
+/// "2026-11-20T21:03:00Z"
+std::string timeText(std::time_t time);
+
+/// Text filled up with blanks to a width; characters beyond ASCII count as one each.
+std::string padded(const std::string& text, std::size_t width);
+
+}  // namespace cvagent

@@ -1,0 +1,45 @@
+#include "agent/cli/session.h"
+
+#include "agent/cli/failure.h"
+#include "agent/core/host_tools.h"
+#include "agent/core/signals.h"
+
+namespace cvagent {
+
+Session::Session(const Options& options, Listener* listener)
+    : file_(options.plugin ? *options.plugin : pluginBesideProgram()), log_(options, listener != nullptr) {
+    hintAtRoot(data_);
+    hintAtReadOnly(data_);
+    prepareSurroundings();
+    if (options.hostTools != HostTools::native) {
+        putAdaptersFirst(inspectHostTools(options.hostTools, Look::adapters, adapterDirectory()),
+                         data_.path() + "host-tools");
+    }
+    StopSignals::install();
+    deadline_.emplace(std::chrono::duration<double>(options.commandSeconds));
+    try {
+        load(listener);
+    } catch (const Failure&) {
+        log_.showErrors();
+        throw;
+    }
+    log_.showErrors();
+}
+
+Session::~Session() {
+    plugin_.reset();
+    log_.showErrors();
+}
+
+void Session::load(Listener* listener) {
+    plugin_ = std::make_unique<Plugin>(file_, listener);
+    hintAtTemporaryFiles();
+}
+
+void Session::goOnUnlessStopped() {
+    if (StopSignals::received() != 0) {
+        throw Interrupted();
+    }
+}
+
+}  // namespace cvagent

@@ -1,0 +1,80 @@
+#pragma once
+
+#include <optional>
+#include <span>
+#include <string>
+#include <vector>
+
+#include "agent/core/node_classes.h"
+#include "framework/ic/property_value.h"
+
+namespace cvagent {
+
+enum class Kind { number, enumeration, text, texts, numbers };
+
+/// What a number counts; decides how it is shown to people.
+enum class Unit {
+    none,
+    thousandBytes,
+    kibibytes,
+    kilobitsPerSecond,
+    megabitsPerSecond,
+    megahertz,
+    secondsSinceEpoch,
+    minutes,
+    bits,
+};
+
+/// A code of an enumeration and what it means.
+struct Label {
+    const char* text;
+    unsigned int code;
+    bool writable = false;  ///< the code may be written
+};
+
+struct Property;
+
+/// Makes the value for the plug-in out of the words of the command line; nothing when the property does not
+/// accept them.
+using Check = std::optional<IC::PropertyValue> (*)(const Property& property,
+                                                   std::span<const std::string> words);
+
+/// One row of the catalogue: a property of a class of nodes.
+struct Property {
+    NodeType type;
+    unsigned int id;
+    const char* name;
+    Kind kind;
+    Unit unit;
+    std::span<const Label> labels;  ///< empty when the codes have no meaning of their own
+    const char* meaning;
+    Check check = nullptr;          ///< set for what can be written
+    const char* accepts = nullptr;  ///< what check lets pass, in words; null: told from the labels
+    bool writeOnly = false;
+
+    bool readable() const { return !writeOnly; }
+    bool writable() const { return check != nullptr; }
+};
+
+/// The rows of one class, ids ascending.
+std::vector<Property> propertiesOf(unsigned int nodeType);
+/// The row with that id; nothing when the class has none.
+std::optional<Property> findProperty(unsigned int nodeType, unsigned int id);
+/// The row a person means by a number or a name, upper or lower case.
+std::optional<Property> findProperty(unsigned int nodeType, const std::string& text);
+
+const char* kindName(Kind kind);
+/// "" for Unit::none.
+const char* unitName(Unit unit);
+/// The meaning of a code; null when it has none.
+const char* labelOf(const Property& property, unsigned int code);
+/// What the property accepts, for a message.
+std::string acceptedText(const Property& property);
+
+// The parts of the catalogue.
+std::span<const Property> hostProperties();
+std::span<const Property> storageProperties();
+std::span<const Property> networkPortProperties();
+std::span<const Property> ipConfigProperties();
+
+}  // namespace cvagent

@@ -1,0 +1,162 @@
+#include "agent/core/command_deadline.h"
+
+#include <unistd.h>
+
+#include <algorithm>
+#include <charconv>
+#include <filesystem>
+#include <fstream>
+#include <map>
+#include <sstream>
+#include <system_error>
+#include <vector>
+
+#include "agent/cli/print.h"
+
+namespace cvagent {
+
+namespace {
+
+using Seconds = std::chrono::duration<double>;
+
+constexpr int kWritePatience = 10;  // times as long as a read
+constexpr int kLooks = 8;           // a deadline, but at least one a second
+constexpr Seconds kSlowestLook{1};
+constexpr Seconds kFastestLook{0.01};
+
+/// The calls into the plug-in that are under way, by their threads.
+struct Errands {
+    std::mutex guard;
+    std::map<pid_t, Errand*> all;  // guarded by guard
+};
+
+Errands& errands() {
+    static Errands list;
+    return list;
+}
+
+std::string secondsText(Seconds time) {
+    std::ostringstream text;
+    text << time.count() << " s";
+    return text.str();
+}
+
+/// The command as its author wrote it: the text that the shell was given.
+std::string commandText(pid_t process) {
+    std::ifstream in("/proc/" + std::to_string(process) + "/cmdline");
+    std::string text;
+    std::vector<std::string> words;
+    for (std::string word; std::getline(in, word, '\0');) {
+        text += (words.empty() ? "" : " ") + word;
+        words.push_back(word);
+    }
+    return words.size() > 2 && words[1] == "-c" ? words.back() : text;
+}
+
+std::vector<pid_t> threads() {
+    std::vector<pid_t> ids;
+    std::error_code ignored;  // a thread that ends meanwhile has no commands
+    for (std::filesystem::directory_iterator task("/proc/self/task", ignored), end; task != end;
+         task.increment(ignored)) {
+        const std::string name = task->path().filename();
+        pid_t id = 0;
+        std::from_chars(name.data(), name.data() + name.size(), id);
+        ids.push_back(id);
+    }
+    return ids;
+}
+
+}  // namespace
+
+CommandDeadline::CommandDeadline(Seconds longest) : longest_(longest) {
+    if (longest_ <= Seconds::zero()) {
+        return;
+    }
+    try {
+        watcher_ = std::thread([this] { watch(); });
+    } catch (const std::system_error&) {
+        complain("the system gives no more threads: commands that hang are waited for");
+    }
+}
+
+CommandDeadline::~CommandDeadline() {
+    {
+        const std::lock_guard lock(guard_);
+        stopped_ = true;
+    }
+    changed_.notify_all();
+    if (watcher_.joinable()) {
+        watcher_.join();
+    }
+}
+
+bool CommandDeadline::stoppedWithin(Seconds time) {
+    std::unique_lock lock(guard_);
+    return changed_.wait_for(lock, time, [this] { return stopped_; });
+}
+
+/// A command's time is counted from look to look, and a look that comes late counts as one: while this
+/// program did not run, its commands may not have run either.
+void CommandDeadline::watch() {
+    const Seconds interval = std::clamp(longest_ / kLooks, kFastestLook, kSlowestLook);
+    std::map<std::pair<pid_t, QX::ChildProcess>, Seconds> ages;
+    for (auto last = std::chrono::steady_clock::now(); !stoppedWithin(interval);) {
+        const auto now = std::chrono::steady_clock::now();
+        const Seconds step = std::min(Seconds(now - last), 2 * interval);
+        last = now;
+        std::map<std::pair<pid_t, QX::ChildProcess>, Seconds> present;
+        for (const pid_t thread : threads()) {
+            for (const QX::ChildProcess& command : QX::childrenOf(thread)) {
+                const auto known = ages.find({thread, command});
+                Seconds age = known == ages.end() ? Seconds::zero() : known->second + step;
+                if (age >= limitOf(thread)) {
+                    end(thread, command);
+                    age = Seconds::zero();
+                }
+                present[{thread, command}] = age;
+            }
+        }
+        ages = std::move(present);
+    }
+}
+
+Seconds CommandDeadline::limitOf(pid_t thread) const {
+    const std::lock_guard lock(errands().guard);
+    const auto errand = errands().all.find(thread);
+    const bool writes = errand != errands().all.end() && errand->second->kind_ == Errand::write;
+    return writes ? longest_ * kWritePatience : longest_;
+}
+
+/// The errand that waits for the command goes on only after it has been told why.
+void CommandDeadline::end(pid_t thread, const QX::ChildProcess& command) {
+    const Seconds limit = limitOf(thread);
+    const std::lock_guard lock(errands().guard);
+    const std::string text = commandText(command.id);
+    if (!QX::killChild(thread, command)) {
+        return;
+    }
+    const auto errand = errands().all.find(thread);
+    if (errand == errands().all.end()) {
+        complain("a command of the plug-in was ended after " + secondsText(limit) +
+                 "; what it would have told is missing: " + text);
+    } else if (errand->second->complaint_.empty()) {
+        errand->second->complaint_ = "timed out after " + secondsText(limit) + ": " + text;
+    }
+}
+
+Errand::Errand(Kind kind) : kind_(kind), thread_(gettid()) {
+    const std::lock_guard lock(errands().guard);
+    errands().all[thread_] = this;
+}
+
+Errand::~Errand() {
+    const std::lock_guard lock(errands().guard);
+    errands().all.erase(thread_);
+}
+
+std::string Errand::complaint() const {
+    const std::lock_guard lock(errands().guard);
+    return complaint_;
+}
+
+}  // namespace cvagent

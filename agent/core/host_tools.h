@@ -1,0 +1,42 @@
+#pragma once
+
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "agent/cli/options.h"
+
+namespace cvagent {
+
+/// What is known of one tool that the plug-in's commands run.
+struct ToolReport {
+    std::string tool;
+    std::string package;  ///< the Debian package to install for the host's own
+    std::string purpose;  ///< what is not known without it
+    std::string native;   ///< path of the host's own; empty when it is missing
+    bool classic = true;  ///< the host's own prints the classic format
+    std::string adapter;  ///< path of our adapter; empty when there is none
+    bool useAdapter = false;
+
+    bool missing() const { return native.empty() && !useAdapter; }
+    /// What the plug-in's commands will run; empty when there is nothing.
+    std::string used() const { return useAdapter ? adapter : native; }
+};
+
+/// Which tools to look at: those that adapters exist for, which is quick, or all.
+enum class Look { adapters, everything };
+
+/// Looks for the tools on PATH. Those that there are adapters for are run once, side by side, to see which
+/// format they print; they are asked for what changes nothing. Forced choices run nothing.
+/// @param adapters where the adapters are; nothing when there are none
+std::vector<ToolReport> inspectHostTools(HostTools choice, Look look,
+                                         const std::optional<std::string>& adapters);
+
+/// Puts the adapters that are to be used in front of PATH.
+/// @param linkDirectory where links to some of the adapters are put when not all of them are used
+void putAdaptersFirst(const std::vector<ToolReport>& reports, const std::string& linkDirectory);
+
+/// Where the adapters are, in the build tree or installed; nothing when they are not.
+std::optional<std::string> adapterDirectory();
+
+}  // namespace cvagent

@@ -1,0 +1,40 @@
+#pragma once
+
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "agent/core/catalogue.h"
+#include "framework/ic/error.h"
+
+namespace cvagent {
+
+/// What reading one property gave.
+struct Reading {
+    unsigned int id = 0;
+    std::optional<Property> row;  ///< none: the catalogue does not know the property
+    IC::PropertyValue value;
+    std::string error;      ///< empty when the read succeeded
+    bool missing = false;   ///< it failed because the node has no such property
+    bool timedOut = false;  ///< it failed because a command of the host did not end
+
+    bool failed() const { return !error.empty(); }
+    /// Why there is no value, for people: a property that every node of the class could have is just not
+    /// known here.
+    std::string complaint() const { return missing && row ? "not known" : "not known (" + error + ")"; }
+    std::string name() const { return row ? row->name : std::to_string(id); }
+};
+
+/// Reads properties through the plug-in, several at a time: most of a read is waiting for the host's tools.
+/// Never throws for what a read does.
+/// @return one reading an id, in the order of the ids
+std::vector<Reading> readProperties(const IC::MutableNode& node, const std::vector<unsigned int>& ids);
+Reading readProperty(const IC::MutableNode& node, unsigned int id);
+
+/// The stored properties as readings; nothing is asked of the host.
+std::vector<Reading> storedReadings(const IC::MutableNode& node);
+
+/// The text of an error for people; never empty.
+std::string errorText(const IC::Error& error);
+
+}  // namespace cvagent

@@ -1,0 +1,133 @@
+#include "agent/core/tree.h"
+
+#include <algorithm>
+#include <charconv>
+#include <functional>
+#include <optional>
+#include <set>
+
+#include "agent/cli/failure.h"
+
+namespace cvagent {
+
+namespace {
+
+using Finder = std::function<Handle(unsigned int)>;
+
+constexpr int kDeepest = 64;  // parents that form a circle end here
+
+std::string pathOf(const IC::MutableNode& node, const Finder& parentOf, int depth = 0) {
+    const Handle parent = depth < kDeepest ? parentOf(node.getLinkedId()) : nullptr;
+    const std::string above = parent ? pathOf(*parent, parentOf, depth + 1) : std::string();
+    return above + "/" + pathComponent(node);
+}
+
+std::optional<unsigned int> asId(const std::string& text) {
+    unsigned int id = 0;
+    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), id);
+    const bool whole = error == std::errc() && end == text.data() + text.size() && !text.empty();
+    return whole ? std::optional(id) : std::nullopt;
+}
+
+/// Whether a person's word means the node: its whole path or the last part of it.
+bool isMeant(const IC::MutableNode& node, const std::string& text) {
+    return text.starts_with('/') ? node.getPath() == text : pathComponent(node) == text;
+}
+
+/// Whether the word is the name in the last part of the path: "eth0" of "network-port:eth0".
+bool isNamed(const IC::MutableNode& node, const std::string& text) {
+    return pathComponent(node).ends_with(":" + text);
+}
+
+std::vector<Handle> matching(const IC::ManagementInterface& interface, const std::string& text,
+                             bool (*matches)(const IC::MutableNode&, const std::string&)) {
+    std::vector<Handle> found = interface.holdAll();
+    std::erase_if(found, [&](const Handle& node) { return !matches(*node, text); });
+    return found;
+}
+
+[[noreturn]] void failAmbiguous(const std::string& text, const std::vector<Handle>& candidates) {
+    std::string message = "'" + text + "' is the name of " + std::to_string(candidates.size()) +
+                          " nodes; give the id or the path of one of them:";
+    for (const Handle& node : candidates) {
+        message += "\n  " + std::to_string(node->getNodeId()) + "  " + node->getPath();
+    }
+    throw Failure(ExitStatus::notFound, message);
+}
+
+}  // namespace
+
+std::string makePath(const IC::ManagementInterface& interface, const IC::MutableNode& node) {
+    return pathOf(node, [&interface](unsigned int id) { return interface.hold(id); });
+}
+
+void setPaths(const IC::ManagementInterface& interface) {
+    const std::vector<Handle> nodes = interface.holdAll();
+    std::map<unsigned int, Handle> byId;
+    for (const Handle& node : nodes) {
+        byId.emplace(node->getNodeId(), node);
+    }
+    const Finder find = [&byId](unsigned int id) {
+        const auto found = byId.find(id);
+        return found == byId.end() ? Handle() : found->second;
+    };
+    for (const Handle& node : nodes) {
+        node->setPath(pathOf(*node, find));
+    }
+}
+
+Handle findNode(const IC::ManagementInterface& interface, const std::string& text) {
+    if (const std::optional<unsigned int> id = asId(text)) {
+        if (Handle node = interface.hold(*id)) {
+            return node;
+        }
+        throw Failure(ExitStatus::notFound, "there is no node with the id " + text + "; see: cvagent tree");
+    }
+    std::vector<Handle> found = matching(interface, text, isMeant);
+    if (found.empty() && !text.empty()) {
+        found = matching(interface, text, isNamed);
+    }
+    if (found.size() > 1) {
+        failAmbiguous(text, found);
+    }
+    if (found.empty()) {
+        throw Failure(ExitStatus::notFound, "there is no node '" + text + "'; see: cvagent tree");
+    }
+    return found.front();
+}
+
+std::vector<Placed> drawingOrder(const std::vector<Handle>& nodes) {
+    std::set<unsigned int> ids;
+    for (const Handle& node : nodes) {
+        ids.insert(node->getNodeId());
+    }
+    std::map<unsigned int, std::vector<Handle>> children;  // of parent 0: the nodes at the top
+    for (const Handle& node : nodes) {
+        const unsigned int parent = node->getLinkedId();
+        const bool hangs = ids.contains(parent) && parent != node->getNodeId();
+        children[hangs ? parent : 0].push_back(node);
+    }
+    std::vector<Placed> order;
+    const std::function<void(unsigned int, const std::vector<bool>&)> place =
+        [&](unsigned int parent, const std::vector<bool>& above) {
+            const std::vector<Handle> siblings = std::move(children[parent]);  // a circle is walked once
+            children[parent].clear();
+            for (const Handle& node : siblings) {
+                std::vector<bool> last = above;
+                last.push_back(node == siblings.back());
+                order.push_back({node, last});
+                if (node->getNodeId() != 0) {
+                    place(node->getNodeId(), last);
+                }
+            }
+        };
+    place(0, {});
+    for (const auto& [parent, circle] : children) {
+        if (!circle.empty()) {
+            place(parent, {});
+        }
+    }
+    return order;
+}
+
+}  // namespace cvagent
