@@ -2,6 +2,7 @@
 
 #include <CLI/CLI.hpp>
 #include <cmath>
+#include <filesystem>
 #include <iostream>
 
 #include "agent/cli/failure.h"
@@ -38,8 +39,11 @@ CLI::Validator secondsUpTo(double most) {
 }
 
 void addGlobalOptions(CLI::App& app, Options& options) {
-    app.add_option("--plugin", options.plugin, "The plug-in to load; by default the one beside this program")
-        ->type_name("FILE");
+    app.add_option("--plugin", options.plugins,
+                   "The plug-in to load; by default the one beside this program. Several may be given")
+        ->type_name("FILE")
+        ->expected(1)
+        ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
     app.add_option("--log", options.logFile, "Append the plug-in's log lines to this file")
         ->type_name("FILE");
     app.add_option(
@@ -116,6 +120,16 @@ void addReaders(CLI::App& app, Options& options) {
     watch->add_option("--for", options.seconds, "Stop after this time; by default at Ctrl-C")
         ->type_name("SECONDS")
         ->check(secondsUpTo(1e9));
+    watch
+        ->add_option("--exec", options.program,
+                     "Run this program on each alert, one at a time, with the event as JSON on its standard "
+                     "input")
+        ->type_name("PROGRAM");
+    watch
+        ->add_option("--exec-timeout", options.programSeconds,
+                     "End the program, with what it has started, when it takes longer. Default: 30")
+        ->type_name("SECONDS")
+        ->check(secondsUpTo(86400));
     addJson(*watch, options);
     watch->footer("With --json each event is one object on a line of its own.");
     watch->callback([&options] { options.command = Command::watch; });
@@ -175,6 +189,9 @@ std::optional<Options> parseCommandLine(int count, const char* const* words, int
     try {
         app.parse(marked(count, words));
         unmark(options);
+        if (!options.program.empty()) {
+            options.program = std::filesystem::absolute(options.program);
+        }
         return options;
     } catch (const CLI::Success& help) {
         status = app.exit(help);

@@ -3,6 +3,8 @@
 #include <stdexcept>
 #include <string>
 
+#include "agent/core/problem.h"
+
 namespace cvagent {
 
 /// How the program ends; scripts rely on the numbers.
@@ -19,6 +21,8 @@ enum class ExitStatus {
 class Failure : public std::runtime_error {
 public:
     Failure(ExitStatus status, const std::string& text) : std::runtime_error(text), status_(status) {}
+    /// What the agent could not do, with the command line's advice.
+    explicit Failure(const Problem& problem);
     ExitStatus status() const { return status_; }
 
 private:

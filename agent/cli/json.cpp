@@ -112,14 +112,28 @@ Json labelList(const Property& row) {
     return list;
 }
 
+void addProperty(Json& object, const Event& event) {
+    if (!event.propertyName.empty()) {
+        object["property"] = {{"id", event.property},
+                              {"name", event.propertyName},
+                              {"before", event.before},
+                              {"after", event.after}};
+    }
+}
+
 }  // namespace
 
-std::string tree(const std::string& plugin, const std::vector<Handle>& nodes) {
+std::string tree(const std::vector<std::string>& plugins, const std::vector<Handle>& nodes) {
     Json list = Json::array();
     for (const Handle& node : nodes) {
         list.push_back(nodeObject(*node, storedReadings(*node)));
     }
-    return document({{"plugin", plugin}, {"nodes", std::move(list)}}, 2);
+    Json whole{{"plugin", plugins.front()}};
+    if (plugins.size() > 1) {
+        whole["plugins"] = plugins;
+    }
+    whole["nodes"] = std::move(list);
+    return document(whole, 2);
 }
 
 std::string node(const IC::MutableNode& node, const std::vector<Reading>& readings) {
@@ -144,11 +158,19 @@ std::string event(const Event& event) {
         object["message"] = event.message;
         object["codes"] = {
             {"first", event.firstCode}, {"second", event.secondCode}, {"event", event.eventCode}};
+        if (event.nodeId != 0) {
+            object["id"] = event.nodeId;
+            object["class"] = event.nodeClass;
+        }
     } else {
         object["id"] = event.nodeId;
         object["class"] = event.nodeClass;
         object["path"] = event.path;
         object["description"] = event.message;
+    }
+    addProperty(object, event);
+    if (event.number != 0) {
+        object["number"] = event.number;
     }
     return document(object, -1);
 }

@@ -11,14 +11,16 @@
 /// document with a line break at its end.
 namespace cvagent::json {
 
-/// {"plugin": FILE, "nodes": [NODE...]} with the stored properties of each node.
-std::string tree(const std::string& plugin, const std::vector<Handle>& nodes);
+/// {"plugin": FILE, "nodes": [NODE...]} with the stored properties of each node; of several plug-ins
+/// "plugins": [FILE...] stands behind the first one.
+std::string tree(const std::vector<std::string>& plugins, const std::vector<Handle>& nodes);
 /// {"id", "parent", "type", "class", "index", "path", "description", "status", "properties": {"108": {"name",
 /// "kind", "value"}}}; a property whose read failed has "error" in place of "value".
 std::string node(const IC::MutableNode& node, const std::vector<Reading>& readings);
 /// {"id", "path", "property": {"id", "name", "old", "new"}}, both as in a node.
 std::string change(const IC::MutableNode& node, const Reading& before, const Reading& after);
-/// One line: {"time", "event", "path", ...}.
+/// One line: {"time", "event", "path", ...}; with "number" when the agent has given one, and "property":
+/// {"id", "name", "before", "after"} when the event is about one.
 std::string event(const Event& event);
 /// [{"class", "type", "id", "name", "kind", "unit", "readable", "writable", "values", "accepts", "meaning"}]
 std::string catalogue(const std::vector<Property>& rows);

@@ -3,6 +3,7 @@
 #include "agent/cli/command_line.h"
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/print.h"
+#include "agent/cli/session.h"
 #include "agent/core/signals.h"
 
 namespace {
@@ -11,32 +12,50 @@ using cvagent::Command;
 using cvagent::ExitStatus;
 using cvagent::Options;
 
-ExitStatus run(const Options& options) {
-    switch (options.command) {
+using Question = ExitStatus (*)(cvagent::Session& session, const Options& options);
+
+/// What needs an agent; null for what does not.
+Question questionOf(Command command) {
+    switch (command) {
         case Command::tree:
-            return cvagent::commands::tree(options);
+            return cvagent::commands::tree;
         case Command::get:
-            return cvagent::commands::get(options);
+            return cvagent::commands::get;
         case Command::set:
-            return cvagent::commands::set(options);
+            return cvagent::commands::set;
         case Command::watch:
-            return cvagent::commands::watch(options);
+            return cvagent::commands::watch;
         case Command::properties:
-            return cvagent::commands::properties(options);
         case Command::doctor:
-            return cvagent::commands::doctor(options);
+            break;
     }
-    return ExitStatus::usage;
+    return nullptr;
+}
+
+ExitStatus run(const Options& options) {
+    if (const Question ask = questionOf(options.command)) {
+        cvagent::Session session(options);
+        cvagent::goOnUnlessStopped();
+        return session.statusAfter(ask(session, options));
+    }
+    return options.command == Command::doctor ? cvagent::commands::doctor(options)
+                                              : cvagent::commands::properties(options);
+}
+
+int endWith(const cvagent::Failure& failure) {
+    if (*failure.what() != '\0') {
+        cvagent::complain(failure.what());
+    }
+    return static_cast<int>(failure.status());
 }
 
 int runGuarded(const Options& options) {
     try {
         return static_cast<int>(run(options));
     } catch (const cvagent::Failure& failure) {
-        if (*failure.what() != '\0') {
-            cvagent::complain(failure.what());
-        }
-        return static_cast<int>(failure.status());
+        return endWith(failure);
+    } catch (const cvagent::Problem& problem) {
+        return endWith(cvagent::Failure(problem));
     } catch (const cvagent::Interrupted&) {
         cvagent::StopSignals::die();
     } catch (const std::exception& exception) {

@@ -4,20 +4,16 @@
 #include <string>
 #include <vector>
 
+#include "agent/core/host_tools.h"
+
 namespace cvagent {
 
 enum class Command { tree, get, set, watch, properties, doctor };
 
-/// Which tools the plug-in's commands find: the host's own, the adapters, or of each the one that speaks the
-/// classic format.
-enum class HostTools { automatic, native, classic };
-
-constexpr int kErrorLevel = 6000;  ///< log lines from here up are errors
-
 /// What the command line asks for.
 struct Options {
     Command command = Command::tree;
-    std::optional<std::string> plugin;  ///< none: looked for beside the program
+    std::vector<std::string> plugins;  ///< none: looked for beside the program
     std::optional<std::string> logFile;
     std::optional<std::string> traceFile;
     std::optional<int> logLevel;
@@ -26,6 +22,8 @@ struct Options {
     bool json = false;
     bool yes = false;               ///< power actions need no question
     std::optional<double> seconds;  ///< how long to watch; none: until a signal comes
+    std::string program;            ///< whole path of what is run on each alert; "" for nothing
+    double programSeconds = 30;     ///< how long it may take
     std::string node;
     std::vector<std::string> properties;
     std::string property;

@@ -12,13 +12,10 @@
 
 #include "agent/cli/failure.h"
 #include "agent/core/surroundings.h"
-#include "framework/qx/utf8.h"
 
 namespace cvagent {
 
 namespace {
-
-constexpr std::size_t kLongestQuote = 60;
 
 __attribute__((format(printf, 1, 2))) std::string formatted(const char* format, ...) {
     std::array<char, 64> text{};
@@ -142,33 +139,6 @@ std::string Style::paint(const std::string& text, const char* code) const {
     return colour && !text.empty() ? std::string("\x1b[") + code + "m" + text + "\x1b[0m" : text;
 }
 
-std::string printable(const std::string& text) {
-    std::string shown;
-    for (std::size_t i = 0; i < text.size();) {
-        const QX::Utf8Character next = QX::firstUtf8Character(std::string_view(text).substr(i));
-        const bool isControl = next.code < 0x20 || (next.code >= 0x7F && next.code < 0xA0);
-        if (next.length != 0 && !isControl) {
-            shown.append(text, i, next.length);
-            i += next.length;
-        } else {
-            shown += formatted("\\x%02x", static_cast<unsigned char>(text[i]));
-            ++i;
-        }
-    }
-    return shown;
-}
-
-std::string inQuotes(const std::string& text) {
-    if (text.size() <= kLongestQuote) {
-        return "'" + printable(text) + "'";
-    }
-    std::size_t length = kLongestQuote;
-    while (length > 0 && (static_cast<unsigned char>(text[length]) & 0xC0U) == 0x80U) {
-        --length;  // no half characters
-    }
-    return "'" + printable(text.substr(0, length)) + "...' (" + std::to_string(text.size()) + " bytes)";
-}
-
 void print(const std::string& text) {
     const bool written = std::fwrite(text.data(), 1, text.size(), stdout) == text.size();
     if (!written || std::fflush(stdout) != 0) {
@@ -216,16 +186,6 @@ std::string sizeText(unsigned long long bytes) {
     }
     return scaled(size, 1000, {"B", "kB", "MB", "GB", "TB", "PB"}) + " (" +
            scaled(size, 1024, {"B", "KiB", "MiB", "GiB", "TiB", "PiB"}) + ")";
-}
-
-std::string timeText(std::time_t time) {
-    std::tm fields{};
-    std::array<char, 40> text{};
-    if (gmtime_r(&time, &fields) == nullptr ||
-        std::strftime(text.data(), text.size(), "%Y-%m-%dT%H:%M:%SZ", &fields) == 0) {
-        return std::to_string(time) + " s since 1970";
-    }
-    return text.data();
 }
 
 std::string padded(const std::string& text, std::size_t width) {

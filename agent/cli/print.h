@@ -1,10 +1,10 @@
 #pragma once
 
-#include <ctime>
 #include <optional>
 #include <string>
 
 #include "agent/core/catalogue.h"
+#include "agent/core/text.h"
 
 namespace cvagent {
 
@@ -24,12 +24,6 @@ private:
     std::string paint(const std::string& text, const char* code) const;
 };
 
-/// The text with control characters, and bytes that are no UTF-8, spelt out, so that a name from the host
-/// cannot steer the terminal.
-std::string printable(const std::string& text);
-/// The same, cut after some 60 characters, for messages that quote what was given.
-std::string inQuotes(const std::string& text);
-
 /// Writes text to standard output. Throws Failure when it cannot be written.
 void print(const std::string& text);
 /// One message of the program to the standard error it was started with.
@@ -43,9 +37,6 @@ std::string valueText(const std::optional<Property>& property, const IC::Propert
 
 /// "80.0 GB (74.5 GiB)"
 std::string sizeText(unsigned long long bytes);
-/// "2026-11-20T21:03:00Z"
-std::string timeText(std::time_t time);
-
 /// Text filled up with blanks to a width; characters beyond ASCII count as one each.
 std::string padded(const std::string& text, std::size_t width);
 

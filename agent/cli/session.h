@@ -1,39 +1,48 @@
 #pragma once
 
-#include <optional>
-#include <string>
+#include <memory>
 
 #include "agent/cli/options.h"
-#include "agent/core/command_deadline.h"
-#include "agent/core/log_output.h"
-#include "agent/core/plugin.h"
-#include "agent/core/surroundings.h"
+#include "agent/cli/print.h"
+#include "agent/core/agent.h"
 
 namespace cvagent {
 
-/// A plug-in at work: surroundings, locked data directory, log, loaded library. Handles of nodes must be gone
-/// before it is.
+/// The agent as the command line needs it: built from the options, with its errors and warnings on standard
+/// error. Making it prepares the whole process, so it is made in main, before any thread.
 class Session {
 public:
-    /// @param listener as for Plugin
-    explicit Session(const Options& options, Listener* listener = nullptr);
+    explicit Session(const Options& options);
+    Session(const Session&) = delete;
+    Session& operator=(const Session&) = delete;
+    /// As end().
     ~Session();
 
-    IC::ManagementInterface& interface() { return plugin_->interface(); }
-    const std::string& pluginFile() const { return file_; }
-    LogOutput& log() { return log_; }
-    /// Throws Interrupted when a stop signal has come.
-    static void goOnUnlessStopped();
+    Agent& agent() { return *agent_; }
+    /// Prints what the plug-in has reported because of a call, and then what it reported by itself.
+    void showErrors(const Request& request);
+    /// Stops the agent and shows what it reports on its way.
+    void end();
+    /// What the command's own status comes to when a plug-in is missing.
+    ExitStatus statusAfter(ExitStatus own) const;
+    /// What the terminal could show before the process was prepared.
+    const Style& style() const { return style_; }
 
 private:
-    void load(Listener* listener);
+    AgentSettings settings(const Options& options) const;
+    void start(const Options& options);
 
-    std::string file_;
-    DataDirectory data_;
-    QuietCommands quiet_;
-    LogOutput log_;
-    std::optional<CommandDeadline> deadline_;
-    std::unique_ptr<Plugin> plugin_;
+    Style style_ = Style::detect();
+    std::shared_ptr<DataDirectory> data_;
+    std::shared_ptr<ErrorLines> errors_ = std::make_shared<ErrorLines>();
+    std::unique_ptr<QuietCommands> quiet_;
+    std::unique_ptr<Agent> agent_;
+    bool pluginMissing_ = false;
 };
+
+/// A request of whoever typed the command: he waits for as long as it takes.
+Request ownRequest();
+/// Throws Interrupted when a stop signal has come.
+void goOnUnlessStopped();
 
 }  // namespace cvagent

@@ -3,18 +3,95 @@
 #include <strings.h>
 #include <algorithm>
 #include <charconv>
+#include <stdexcept>
 
+#include "agent/core/oshw/tables.h"
 #include "agent/core/value_check.h"
 
 namespace cvagent {
 
+namespace {
+
+using Tables = std::vector<const CatalogueTable*>;
+
+Tables& tables() {
+    static Tables all{&oshw::table()};
+    return all;
+}
+
+[[noreturn]] void refuse(const CatalogueTable& table, const std::string& what) {
+    throw std::logic_error("the catalogue of " + std::string(table.owner) + " has " + what +
+                           ", which is there already");
+}
+
+}  // namespace
+
+void addToCatalogue(const CatalogueTable& table) {
+    for (const NodeClass& row : table.classes) {
+        if (findClass(static_cast<unsigned int>(row.type)) != nullptr || findClass(row.name) != nullptr) {
+            refuse(table, std::string("the class ") + row.name);
+        }
+    }
+    for (const auto part : table.properties) {
+        for (const Property& row : part) {
+            if (findProperty(static_cast<unsigned int>(row.type), row.id)) {
+                refuse(table, std::string("the property ") + row.name);
+            }
+        }
+    }
+    tables().push_back(&table);
+}
+
+std::vector<NodeClass> nodeClasses() {
+    std::vector<NodeClass> all;
+    for (const CatalogueTable* table : tables()) {
+        all.insert(all.end(), table->classes.begin(), table->classes.end());
+    }
+    return all;
+}
+
+const NodeClass* findClass(unsigned int nodeType) {
+    for (const CatalogueTable* table : tables()) {
+        for (const NodeClass& row : table->classes) {
+            if (static_cast<unsigned int>(row.type) == nodeType) {
+                return &row;
+            }
+        }
+    }
+    return nullptr;
+}
+
+const NodeClass* findClass(const std::string& name) {
+    for (const CatalogueTable* table : tables()) {
+        for (const NodeClass& row : table->classes) {
+            if (row.name == name) {
+                return &row;
+            }
+        }
+    }
+    return nullptr;
+}
+
+const AlertRow* findAlert(const std::string& message) {
+    const std::string text = message.substr(0, message.find_last_not_of(' ') + 1);
+    for (const CatalogueTable* table : tables()) {
+        for (const AlertRow& row : table->alerts) {
+            if (row.message == text) {
+                return &row;
+            }
+        }
+    }
+    return nullptr;
+}
+
 std::vector<Property> propertiesOf(unsigned int nodeType) {
     std::vector<Property> rows;
-    for (const auto part :
-         {hostProperties(), storageProperties(), networkPortProperties(), ipConfigProperties()}) {
-        std::copy_if(part.begin(), part.end(), std::back_inserter(rows), [nodeType](const Property& row) {
-            return static_cast<unsigned int>(row.type) == nodeType;
-        });
+    for (const CatalogueTable* table : tables()) {
+        for (const auto part : table->properties) {
+            std::copy_if(part.begin(), part.end(), std::back_inserter(rows), [nodeType](const Property& row) {
+                return static_cast<unsigned int>(row.type) == nodeType;
+            });
+        }
     }
     return rows;
 }

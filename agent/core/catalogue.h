@@ -71,10 +71,24 @@ const char* labelOf(const Property& property, unsigned int code);
 /// What the property accepts, for a message.
 std::string acceptedText(const Property& property);
 
-// The parts of the catalogue.
-std::span<const Property> hostProperties();
-std::span<const Property> storageProperties();
-std::span<const Property> networkPortProperties();
-std::span<const Property> ipConfigProperties();
+/// What an alert's text says of a property of its node.
+struct AlertRow {
+    const char* message;  ///< without blanks at its end
+    unsigned int property;
+    unsigned int after;
+};
+/// Null for an alert that says nothing of the kind.
+const AlertRow* findAlert(const std::string& message);
+
+/// What one plug-in brings to the catalogue; it stands in a folder of its own.
+struct CatalogueTable {
+    const char* owner;
+    std::span<const NodeClass> classes;
+    std::vector<std::span<const Property>> properties;
+    std::span<const AlertRow> alerts;
+};
+/// Adds a plug-in's table to the catalogue. To be called before the first agent is made; the table is used
+/// until the program ends. Throws std::logic_error when another table has such a class or property already.
+void addToCatalogue(const CatalogueTable& table);
 
 }  // namespace cvagent

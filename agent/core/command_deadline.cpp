@@ -11,8 +11,6 @@
 #include <system_error>
 #include <vector>
 
-#include "agent/cli/print.h"
-
 namespace cvagent {
 
 namespace {
@@ -68,14 +66,15 @@ std::vector<pid_t> threads() {
 
 }  // namespace
 
-CommandDeadline::CommandDeadline(Seconds longest) : longest_(longest) {
+CommandDeadline::CommandDeadline(Seconds longest, std::function<void(const std::string&)> tell)
+    : longest_(longest), tell_(std::move(tell)) {
     if (longest_ <= Seconds::zero()) {
         return;
     }
     try {
         watcher_ = std::thread([this] { watch(); });
     } catch (const std::system_error&) {
-        complain("the system gives no more threads: commands that hang are waited for");
+        tell_("the system gives no more threads: commands that hang are waited for");
     }
 }
 
@@ -123,8 +122,18 @@ void CommandDeadline::watch() {
 Seconds CommandDeadline::limitOf(pid_t thread) const {
     const std::lock_guard lock(errands().guard);
     const auto errand = errands().all.find(thread);
-    const bool writes = errand != errands().all.end() && errand->second->kind_ == Errand::write;
-    return writes ? longest_ * kWritePatience : longest_;
+    if (errand == errands().all.end()) {
+        return longest_;
+    }
+    switch (errand->second->kind_) {
+        case Errand::write:
+            return longest_ * kWritePatience;
+        case Errand::ours:
+            return Seconds::max();
+        case Errand::read:
+            break;
+    }
+    return longest_;
 }
 
 /// The errand that waits for the command goes on only after it has been told why.
@@ -137,8 +146,8 @@ void CommandDeadline::end(pid_t thread, const QX::ChildProcess& command) {
     }
     const auto errand = errands().all.find(thread);
     if (errand == errands().all.end()) {
-        complain("a command of the plug-in was ended after " + secondsText(limit) +
-                 "; what it would have told is missing: " + text);
+        tell_("a command of the plug-in was ended after " + secondsText(limit) +
+              "; what it would have told is missing: " + text);
     } else if (errand->second->complaint_.empty()) {
         errand->second->complaint_ = "timed out after " + secondsText(limit) + ": " + text;
     }

@@ -2,6 +2,7 @@
 
 #include <chrono>
 #include <condition_variable>
+#include <functional>
 #include <mutex>
 #include <string>
 #include <thread>
@@ -19,7 +20,8 @@ namespace cvagent {
 class CommandDeadline {
 public:
     /// @param longest how long a command may take; 0 for as long as it likes
-    explicit CommandDeadline(std::chrono::duration<double> longest);
+    /// @param tell hears of commands that were ended and that nobody had asked for; any thread
+    CommandDeadline(std::chrono::duration<double> longest, std::function<void(const std::string&)> tell);
     CommandDeadline(const CommandDeadline&) = delete;
     CommandDeadline& operator=(const CommandDeadline&) = delete;
     ~CommandDeadline();
@@ -33,6 +35,7 @@ private:
     Seconds limitOf(pid_t thread) const;
 
     Seconds longest_;
+    std::function<void(const std::string&)> tell_;
     std::mutex guard_;
     std::condition_variable changed_;
     bool stopped_ = false;  // guarded by guard_
@@ -46,7 +49,8 @@ class Errand {
 public:
     /// A write may take ten times as long: it brings interfaces up and walks over all of them, and cut off in
     /// its middle it leaves the host half changed.
-    enum Kind { read, write };
+    /// What the agent itself starts has a deadline of its own.
+    enum Kind { read, write, ours };
 
     explicit Errand(Kind kind);
     Errand(const Errand&) = delete;

@@ -1,8 +1,30 @@
 #include "agent/core/event.h"
 
-#include "agent/core/node_classes.h"
+#include <algorithm>
+
+#include "agent/core/catalogue.h"
 
 namespace cvagent {
+
+namespace {
+
+/// The state that an alert tells, and the one that the node stores.
+void tellState(Event& event, const IC::MutableNode& node) {
+    const AlertRow* row = findAlert(event.message);
+    const auto property = row != nullptr ? findProperty(node.nodeType(), row->property) : std::nullopt;
+    if (!property) {
+        return;
+    }
+    event.property = property->id;
+    event.propertyName = property->name;
+    event.after = std::to_string(row->after);
+    const Properties stored = storedProperties(node);
+    if (const auto known = stored.find(property->id); known != stored.end()) {
+        event.before = static_cast<std::string>(known->second);
+    }
+}
+
+}  // namespace
 
 const char* eventName(Event::Kind kind) {
     switch (kind) {
@@ -10,6 +32,8 @@ const char* eventName(Event::Kind kind) {
             return "published";
         case Event::Kind::withdrawn:
             return "withdrawn";
+        case Event::Kind::written:
+            return "written";
         case Event::Kind::alert:
             break;
     }
@@ -29,7 +53,7 @@ Event nodeEvent(Event::Kind kind, const IC::Node& node) {
     return event;
 }
 
-Event alertEvent(const IC::Alert& alert) {
+Event alertEvent(const IC::Alert& alert, const std::vector<Handle>& nodes) {
     Event event;
     event.time = std::time(nullptr);
     event.message = alert.message();
@@ -38,6 +62,14 @@ Event alertEvent(const IC::Alert& alert) {
     event.eventCode = alert.nodeId();  // the number that receivers key on
     if (!alert.substitutions().empty()) {
         event.path = alert.substitutions().front();
+    }
+    const auto node = std::find_if(nodes.begin(), nodes.end(), [&event](const Handle& candidate) {
+        return candidate->getPath() == event.path;
+    });
+    if (node != nodes.end()) {
+        event.nodeId = (*node)->getNodeId();
+        event.nodeClass = className((*node)->nodeType());
+        tellState(event, **node);
     }
     return event;
 }

@@ -1,34 +1,45 @@
 #pragma once
 
+#include <cstdint>
 #include <ctime>
 #include <string>
+#include <vector>
 
+#include "agent/core/node_classes.h"
 #include "framework/ic/alert.h"
 #include "framework/ic/node.h"
 
 namespace cvagent {
 
-/// Something the plug-in told the agent by itself. It holds texts and no node, so it outlives the plug-in.
+/// Something that happened in the tree: the plug-in told it by itself, or a write brought it about. It holds
+/// texts and no node, so it outlives the plug-in.
 struct Event {
-    enum class Kind { published, withdrawn, alert };
+    enum class Kind { published, withdrawn, alert, written };
 
+    std::uint64_t number = 0;  ///< given by the agent in the order of events, from 1; 0: not yet
     Kind kind = Kind::alert;
     std::time_t time = 0;
     std::string path;     ///< of the node concerned
     std::string message;  ///< an alert's text, else the node's description
-    // of published and withdrawn nodes
+    // of the node; an alert about a node that is not listed has none
     unsigned int nodeId = 0;
     std::string nodeClass;
+    // of written properties, and of alerts about one
+    unsigned int property = 0;
+    std::string propertyName;  ///< empty: the event is about no property
+    std::string before;        ///< the value as text; empty when it is not known
+    std::string after;
     // of alerts
     unsigned int firstCode = 0;
     unsigned int secondCode = 0;
     unsigned int eventCode = 0;
 };
 
-/// "published", "withdrawn" or "alert".
+/// "published", "withdrawn", "alert" or "written".
 const char* eventName(Event::Kind kind);
 Event nodeEvent(Event::Kind kind, const IC::Node& node);
-Event alertEvent(const IC::Alert& alert);
+/// @param nodes the listed ones, to find the one that the alert is about
+Event alertEvent(const IC::Alert& alert, const std::vector<Handle>& nodes = {});
 
 /// Hears of events. Called on the plug-in's threads, several at once.
 class Listener {

@@ -4,9 +4,11 @@
 #include <string>
 #include <vector>
 
-#include "agent/cli/options.h"
-
 namespace cvagent {
+
+/// Which tools the plug-in's commands find: the host's own, the adapters, or of each the one that speaks the
+/// classic format.
+enum class HostTools { automatic, native, classic };
 
 /// What is known of one tool that the plug-in's commands run.
 struct ToolReport {

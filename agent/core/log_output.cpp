@@ -12,9 +12,8 @@
 #include <string_view>
 #include <utility>
 
-#include "agent/cli/failure.h"
-#include "agent/cli/print.h"
-#include "agent/core/surroundings.h"
+#include "agent/core/problem.h"
+#include "agent/core/text.h"
 #include "framework/cvlog/logger.h"
 
 namespace cvagent {
@@ -22,14 +21,13 @@ namespace cvagent {
 namespace {
 
 constexpr std::size_t kMostNames = 1000;  // that are remembered as told
-constexpr std::size_t kMostErrors = 50;   // of one call; a plug-in in trouble can report thousands
 
 /// Log files hold the host's settings: only their owner reads them.
 int openLog(const std::string& file) {
     const int descriptor = open(file.c_str(), O_WRONLY | O_APPEND | O_CREAT | O_CLOEXEC, 0600);
     if (descriptor < 0) {
-        throw Failure(ExitStatus::failed, "cannot write to '" + printable(file) +
-                                              "': " + std::strerror(errno) + "; name another file or none");
+        throw Problem(Problem::failed, "cannot write to '" + printable(file) + "': " + std::strerror(errno),
+                      Problem::logFile);
     }
     return descriptor;
 }
@@ -54,18 +52,16 @@ std::string advice(const std::string& refused) {
 
 }  // namespace
 
-/// Writes lines to a descriptor and keeps the errors.
+/// Writes lines to a descriptor and hands errors to whom they belong.
 class LogOutput::Sink : public CVLog::LogSink {
 public:
-    /// @param file none: standard error when `show`, else nowhere
-    /// @param advises of lines that were not asked for: a name that is refused is told once, with what to do
-    Sink(const std::optional<std::string>& file, bool show, int lowest, bool advises)
-        : lowest_(lowest), seen_(show && !file), advises_(advises && !file) {
+    /// @param descriptor where lines go without a file; -1 for nowhere
+    Sink(const std::optional<std::string>& file, int descriptor, int lowest) : lowest_(lowest) {
         if (file) {
             own_ = openLog(*file);
         }
-        if (file || show) {
-            lines_.emplace(file ? own_ : messageDescriptor());
+        if (file || descriptor >= 0) {
+            lines_.emplace(file ? own_ : descriptor);
         }
     }
     Sink(const Sink&) = delete;
@@ -74,6 +70,12 @@ public:
         if (own_ >= 0) {
             close(own_);
         }
+    }
+
+    void keepErrors(std::shared_ptr<ErrorLines> unowned, const LogSettings& settings) {
+        unowned_ = std::move(unowned);
+        seen_ = settings.seen && !settings.file;
+        advises_ = settings.advises && !settings.file;
     }
 
     void write(const CVLog::LogRecord& record) override {
@@ -89,26 +91,12 @@ public:
         }
     }
 
-    std::vector<std::string> takeErrors() {
-        const std::lock_guard lock(guard_);
-        std::vector<std::string> texts;
-        for (const auto& [text, count] : errors_) {
-            texts.push_back(count == 1 ? text : text + " (" + std::to_string(count) + " times)");
-        }
-        if (lost_ > 0) {
-            texts.push_back("and " + std::to_string(lost_) + " more; --log FILE keeps them all");
-        }
-        errors_.clear();
-        lost_ = 0;
-        return texts;
-    }
-
     int threshold() const { return std::min(lowest_, kErrorLevel); }
 
 private:
     /// Hundreds of commands can name one interface: it is told once.
     void advise(const CVLog::LogRecord& record, const std::string& refused) {
-        if (!isNew(refused)) {
+        if (!unowned_ || !isNew(refused)) {
             return;
         }
         const std::string text = advice(refused);
@@ -126,35 +114,28 @@ private:
     }
 
     void keep(const std::string& text) {
-        const std::lock_guard lock(guard_);
-        const auto known = std::find_if(errors_.begin(), errors_.end(),
-                                        [&text](const auto& error) { return error.first == text; });
-        if (known != errors_.end()) {
-            ++known->second;
-        } else if (errors_.size() < kMostErrors) {
-            errors_.emplace_back(text, 1);
-        } else {
-            ++lost_;
+        if (unowned_) {
+            ErrorLines* const owner = ErrorScope::owner();
+            (owner != nullptr ? *owner : *unowned_).add(text);
         }
     }
 
     int lowest_;
-    bool seen_;     ///< what lines_ gets, the user sees
-    bool advises_;  ///< what lines_ gets, the user has not asked for
     int own_ = -1;
     std::optional<CVLog::DescriptorSink> lines_;
+    std::shared_ptr<ErrorLines> unowned_;  ///< none: errors are not kept
+    bool seen_ = false;                    ///< what lines_ gets, the user sees
+    bool advises_ = false;                 ///< what lines_ gets, the user has not asked for
     std::mutex guard_;
-    std::vector<std::pair<std::string, std::size_t>> errors_;  // text and how often; guarded by guard_
-    std::size_t lost_ = 0;                                     // guarded by guard_
-    std::set<std::string> told_;                               // refused names; guarded by guard_
+    std::set<std::string> told_;  // refused names; guarded by guard_
 };
 
-LogOutput::LogOutput(const Options& options, bool live)
-    : log_(std::make_unique<Sink>(options.logFile, live || options.logLevel,
-                                  options.logLevel.value_or(kErrorLevel), live && !options.logLevel)) {
+LogOutput::LogOutput(const LogSettings& settings, std::shared_ptr<ErrorLines> unowned)
+    : log_(std::make_unique<Sink>(settings.file, settings.descriptor, settings.lowest)) {
+    log_->keepErrors(std::move(unowned), settings);
     CVLog::CVLogger::setLog(log_.get(), log_->threshold());
-    if (options.traceFile) {
-        trace_ = std::make_unique<Sink>(options.traceFile, false, 0, false);
+    if (settings.traceFile) {
+        trace_ = std::make_unique<Sink>(settings.traceFile, -1, 0);
         CVLog::CVLogger::setTrace(trace_.get(), 0);
     }
 }
@@ -162,16 +143,6 @@ LogOutput::LogOutput(const Options& options, bool live)
 LogOutput::~LogOutput() {
     CVLog::CVLogger::setLog(nullptr, 0);
     CVLog::CVLogger::setTrace(nullptr, 0);
-}
-
-std::vector<std::string> LogOutput::takeErrors() {
-    return log_->takeErrors();
-}
-
-void LogOutput::showErrors() {
-    for (const std::string& error : takeErrors()) {
-        complain("the plug-in reports: " + error);
-    }
 }
 
 }  // namespace cvagent

@@ -1,28 +1,39 @@
 #pragma once
 
 #include <memory>
+#include <optional>
 #include <string>
-#include <vector>
 
-#include "agent/cli/options.h"
+#include "agent/core/error_lines.h"
 
 namespace cvagent {
 
-/// Where the plug-in's log and trace lines go while this object lives, and what it reported as errors.
+constexpr int kErrorLevel = 6000;  ///< log lines from here up are errors
+
+/// Where the plug-in's lines go.
+struct LogSettings {
+    std::optional<std::string> file;
+    std::optional<std::string> traceFile;  ///< gets every line, whatever its level
+    int lowest = kErrorLevel;              ///< level of the lines that are logged
+    /// Where lines go as they come when no file is named; -1: nowhere.
+    int descriptor = -1;
+    /// Who asks reads the descriptor: the errors that went there are not kept for him as well.
+    bool seen = false;
+    /// Of lines that were not asked for: a name that the plug-in refuses is shown once, with what to do.
+    bool advises = false;
+};
+
+/// Where the plug-ins' log and trace lines go while this object lives. An error that is reported on the
+/// thread of a call belongs to that call; the others, those of starts, monitors and stops, belong to
+/// nobody's.
+/// A name that the plug-in refuses to put into a command is among the errors once, with what to do about it.
 class LogOutput {
 public:
-    /// @param live lines that no file was named for go to standard error as they come, not only the errors of
-    ///             a call after it. Throws Failure when a file cannot be opened.
-    LogOutput(const Options& options, bool live);
+    /// @param unowned takes the errors that belong to no call. Throws Problem when a file cannot be opened.
+    LogOutput(const LogSettings& settings, std::shared_ptr<ErrorLines> unowned);
     LogOutput(const LogOutput&) = delete;
     LogOutput& operator=(const LogOutput&) = delete;
     ~LogOutput();
-
-    /// The messages of level 6000 and up since the last call, unless they were shown already. A name that the
-    /// plug-in refused to put into a command is among them once, with what to do about it.
-    std::vector<std::string> takeErrors();
-    /// Prints what takeErrors returns to standard error.
-    void showErrors();
 
 private:
     class Sink;

@@ -2,28 +2,13 @@
 
 #include <algorithm>
 
+#include "agent/core/catalogue.h"
+
 namespace cvagent {
 
 namespace {
 
 using Naming = NodeClass::Naming;
-
-constexpr NodeClass kClasses[] = {
-    {NodeType::osHardware, "oshw", Naming::single, 0},
-    {NodeType::root, "root", Naming::single, 0},
-    {NodeType::computer, "computer", Naming::single, 0},
-    {NodeType::chassis, "chassis", Naming::single, 0},
-    {NodeType::planar, "planar", Naming::single, 0},
-    {NodeType::networkController, "network-controller", Naming::single, 0},
-    {NodeType::diskController, "disk-controller", Naming::single, 0},
-    {NodeType::hardDrive, "hard-drive", Naming::byProperty, 89},
-    {NodeType::partition, "partition", Naming::byProperty, 89},
-    {NodeType::networkPort, "network-port", Naming::byProperty, 108},
-    {NodeType::ipConfig, "ip-config", Naming::byProperty, 108},
-    {NodeType::lanEndpoint, "lan-endpoint", Naming::byProperty, 108},
-    {NodeType::team, "team", Naming::byProperty, 197},
-    {NodeType::processor, "processor", Naming::byIndex, 0},
-};
 
 constexpr const char* kDevices = "/dev/";
 
@@ -41,23 +26,6 @@ std::string storedName(const IC::MutableNode& node, unsigned int property) {
 }
 
 }  // namespace
-
-std::span<const NodeClass> nodeClasses() {
-    return kClasses;
-}
-
-const NodeClass* findClass(unsigned int nodeType) {
-    const auto* found = std::find_if(
-        std::begin(kClasses), std::end(kClasses),
-        [nodeType](const NodeClass& row) { return static_cast<unsigned int>(row.type) == nodeType; });
-    return found == std::end(kClasses) ? nullptr : found;
-}
-
-const NodeClass* findClass(const std::string& name) {
-    const auto* found = std::find_if(std::begin(kClasses), std::end(kClasses),
-                                     [&name](const NodeClass& row) { return row.name == name; });
-    return found == std::end(kClasses) ? nullptr : found;
-}
 
 std::string className(unsigned int nodeType) {
     const NodeClass* known = findClass(nodeType);

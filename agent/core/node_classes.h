@@ -2,19 +2,21 @@
 
 #include <map>
 #include <memory>
-#include <span>
 #include <string>
+#include <vector>
 
 #include "framework/ic/mutable_node.h"
 
 namespace cvagent {
 
-/// A handle: the node lives at least as long, whatever the plug-in withdraws meanwhile. All of them are
-/// dropped before the plug-in is unloaded, for the node's code goes with it.
+/// A handle: the node lives at least as long, whatever the plug-in withdraws meanwhile. One that a management
+/// interface gives must go before the plug-in, for the node's code goes with it; one inside a NodeRef keeps
+/// the plug-in, too.
 using Handle = std::shared_ptr<IC::MutableNode>;
 using Properties = std::map<unsigned int, IC::PropertyValue>;
 
-// The node classes, by the type number the plug-in gives them.
+// The node classes, by the type number the plug-in gives them. The numbers are one list for all plug-ins; a
+// further one has classes of its own, written NodeType{301}.
 enum class NodeType : unsigned int {
     chassis = 1,
     processor = 4,
@@ -40,7 +42,7 @@ struct NodeClass {
 };
 
 /// All classes, in the order in which the tree and the catalogue show them.
-std::span<const NodeClass> nodeClasses();
+std::vector<NodeClass> nodeClasses();
 /// Null for a type number that is none of ours.
 const NodeClass* findClass(unsigned int nodeType);
 const NodeClass* findClass(const std::string& name);

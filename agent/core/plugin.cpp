@@ -2,14 +2,13 @@
 
 #include <dlfcn.h>
 
-#include <atomic>
 #include <exception>
 #include <filesystem>
 
-#include "agent/cli/failure.h"
-#include "agent/cli/print.h"
+#include "agent/core/problem.h"
 #include "agent/core/program_path.h"
 #include "agent/core/reading.h"
+#include "agent/core/text.h"
 #include "agent/core/tree.h"
 
 namespace cvagent {
@@ -22,16 +21,8 @@ constexpr const char* kProcessorBuilder = "_ZN2IC6OsHwMI14createCpuNodesEv";
 using OpenMi = int (*)(IC::ManagementInterface**, IC::Error**);
 using Builder = void (*)(IC::ManagementInterface*);
 
-// What initialize takes: the id of the interface, of its own node, and the first of the other nodes.
-constexpr unsigned int kInterfaceId = 1;
-constexpr unsigned int kOwnNodeId = 1;
-constexpr unsigned int kFirstNodeId = 2;
-
-// Lookups by name and paths of nodes come without a context argument.
-std::atomic<IC::ManagementInterface*> lookedUp{nullptr};
-
-[[noreturn]] void fail(const std::string& text) {
-    throw Failure(ExitStatus::failed, text);
+[[noreturn]] void fail(const std::string& text, Problem::Subject subject = Problem::none) {
+    throw Problem(Problem::failed, text, subject);
 }
 
 template <class Function>
@@ -44,7 +35,7 @@ template <class Call>
 void guarded(const std::string& what, const Call& call) {
     try {
         call();
-    } catch (const Failure&) {
+    } catch (const Problem&) {
         throw;
     } catch (const std::exception& exception) {
         fail(what + " threw an exception: " + exception.what());
@@ -59,7 +50,10 @@ std::string pluginBesideProgram() {
     return besideProgram({"..", "../" CORVISTA_LIBDIR, "../lib"}, kLibrary).value_or(kLibrary);
 }
 
-Plugin::Plugin(const std::string& file, Listener* listener) : file_(file), listener_(listener) {
+void tellNobody(const std::string& /*text*/) {}
+
+Plugin::Plugin(const std::string& file, Listener* listener, Tell tell)
+    : file_(file), listener_(listener), tell_(std::move(tell)) {
     try {
         load();
         open();
@@ -78,7 +72,7 @@ Plugin::~Plugin() {
 void Plugin::load() {
     std::error_code ignored;
     if (!std::filesystem::exists(file_, ignored)) {
-        fail("there is no plug-in file " + inQuotes(file_) + "; name the right one with --plugin FILE");
+        fail("there is no plug-in file " + inQuotes(file_), Problem::pluginFile);
     }
     // Without a slash the loader would look at its own places.
     const std::string path = file_.find('/') == std::string::npos ? "./" + file_ : file_;
@@ -86,16 +80,15 @@ void Plugin::load() {
     if (library_ == nullptr) {
         const char* reason = dlerror();
         fail("cannot load the plug-in " + inQuotes(file_) + ": " +
-             (reason != nullptr ? reason : "unknown reason") +
-             "\nName another one with --plugin FILE, or build and install this one again");
+                 (reason != nullptr ? reason : "unknown reason"),
+             Problem::pluginLoad);
     }
 }
 
 void Plugin::open() {
     const auto openMi = symbol<OpenMi>(library_, "OpenMI");
     if (openMi == nullptr) {
-        fail(inQuotes(file_) +
-             " is a library but no plug-in: it has no OpenMI; name another one with --plugin FILE");
+        fail(inQuotes(file_) + " is a library but no plug-in: it has no OpenMI", Problem::pluginEntry);
     }
     IC::Error* error = nullptr;
     guarded("OpenMI of " + inQuotes(file_), [&] {
@@ -114,21 +107,22 @@ void Plugin::open() {
 }
 
 void Plugin::start() {
-    lookedUp = interface_;
-    IC::Node::setPathSource(pathOfUnseen);
+    running_.emplace(*interface_);
     try {
         guarded("initialize of " + inQuotes(file_), [this] {
-            interface_->setLoadCallBack(nodeLoaded, this, findByName);
+            const IdRange ids = running_->ids();
+            interface_->setLoadCallBack(nodeLoaded, this, running_->finder());
             interface_->setWithdrawCallBack(nodeWithdrawn, this);
             interface_->registerForAlerts(alertsCame, this);
             const IC::Error result =
-                interface_->initialize(kInterfaceId, IC::Number(kOwnNodeId), IC::Number(kFirstNodeId));
+                interface_->initialize(ids.interfaceId, IC::Number(ids.ownNode), IC::Number(ids.firstNode));
             if (result.getStatus() != 0) {
                 fail("the plug-in " + inQuotes(file_) + " did not initialize: " + errorText(result));
             }
             if (const auto create = symbol<Builder>(library_, kProcessorBuilder)) {
                 create(interface_);
             }
+            checkIds();
             setPaths(*interface_);
         });
     } catch (...) {
@@ -137,18 +131,32 @@ void Plugin::start() {
     }
 }
 
+void Plugin::checkIds() const {
+    for (const Handle& node : interface_->holdAll()) {
+        if (!isOwnId(*node)) {
+            fail("the plug-in " + inQuotes(file_) +
+                 " gives its nodes ids of other plug-ins: " + std::to_string(node->getNodeId()));
+        }
+    }
+}
+
+bool Plugin::isOwnId(const IC::MutableNode& node) const {
+    const IdRange ids = running_->ids();
+    return node.getNodeId() >= ids.ownNode && node.getNodeId() <= ids.last;
+}
+
 void Plugin::stop() {
+    const std::string what = "unload of " + inQuotes(file_);
     try {
         // The callback stays until the monitors have ended: a change that they see without one they take for
         // reported, and it would never be told.
         interface_->unload();
     } catch (const std::exception& exception) {
-        complain("unload of " + inQuotes(file_) + " threw an exception: " + exception.what());
+        tell_(what + " threw an exception: " + exception.what());
     } catch (...) {
-        complain("unload of " + inQuotes(file_) + " threw an unknown exception");
+        tell_(what + " threw an unknown exception");
     }
-    IC::Node::setPathSource(nullptr);
-    lookedUp = nullptr;
+    running_.reset();
 }
 
 void Plugin::close() {
@@ -163,6 +171,9 @@ IC::Error Plugin::nodeLoaded(IC::Node* const& node, const void* plugin) {
     auto* known = dynamic_cast<IC::MutableNode*>(node);
     if (known == nullptr) {
         return {IC::Error::failure, IC::Number(), "not a node of the framework"};
+    }
+    if (!self->isOwnId(*known)) {
+        return {IC::Error::failure, IC::Number(), "the id of another plug-in's node"};
     }
     known->setPath(makePath(*self->interface_, *known));
     if (self->listener_ != nullptr) {
@@ -182,29 +193,10 @@ IC::Error Plugin::alertsCame(const std::vector<IC::Alert>& alerts, const void* p
     const auto* self = static_cast<const Plugin*>(plugin);
     for (const IC::Alert& alert : alerts) {
         if (self->listener_ != nullptr) {
-            self->listener_->hear(alertEvent(alert));
+            self->listener_->hear(alertEvent(alert, self->interface_->holdAll()));
         }
     }
     return {};
-}
-
-std::string Plugin::pathOfUnseen(const IC::Node& node) {
-    const IC::ManagementInterface* interface = lookedUp;
-    const auto* known = dynamic_cast<const IC::MutableNode*>(&node);
-    return interface != nullptr && known != nullptr ? makePath(*interface, *known) : std::string();
-}
-
-IC::Error Plugin::findByName(const std::string& name, IC::Node** node) {
-    try {
-        IC::ManagementInterface* interface = lookedUp;
-        if (interface == nullptr) {
-            return {IC::Error::failure, IC::Number(), "no plug-in is loaded"};
-        }
-        *node = findNode(*interface, name).get();
-        return {};
-    } catch (const Failure& failure) {
-        return {IC::Error::failure, IC::Number(), failure.what()};
-    }
 }
 
 }  // namespace cvagent

@@ -1,8 +1,11 @@
 #pragma once
 
+#include <functional>
+#include <optional>
 #include <string>
 
 #include "agent/core/event.h"
+#include "agent/core/running_plugins.h"
 #include "framework/ic/management_interface.h"
 
 namespace cvagent {
@@ -11,38 +14,46 @@ namespace cvagent {
 /// it is at neither place.
 std::string pluginBesideProgram();
 
+/// Hears of what belongs to no call: a message for whoever looks after the agent.
+using Tell = std::function<void(const std::string& text)>;
+void tellNobody(const std::string& text);
+
 /// A loaded and initialized plug-in. It knows the plug-in by OpenMI and by the exported builder of processor
 /// nodes alone. Handles of nodes must be gone before the object is.
 class Plugin {
 public:
     /// Loads the library, hands over the callbacks, initializes it, gives every node its path.
     /// @param listener hears of alerts, published and withdrawn nodes; null for none. Outlives the object.
-    /// Throws Failure, with a text of its own for each way in which a file can be no plug-in.
-    Plugin(const std::string& file, Listener* listener);
+    /// @param tell     hears of a stop that went wrong
+    /// Throws Problem, with a text of its own for each way in which a file can be no plug-in.
+    Plugin(const std::string& file, Listener* listener, Tell tell = tellNobody);
     Plugin(const Plugin&) = delete;
     Plugin& operator=(const Plugin&) = delete;
     /// Unloads the plug-in and closes the library.
     ~Plugin();
 
-    IC::ManagementInterface& interface() { return *interface_; }
+    IC::ManagementInterface& interface() const { return *interface_; }
+    const std::string& file() const { return file_; }
 
 private:
     static IC::Error nodeLoaded(IC::Node* const& node, const void* plugin);
     static void nodeWithdrawn(const IC::Node& node, const void* plugin);
     static IC::Error alertsCame(const std::vector<IC::Alert>& alerts, const void* plugin);
-    static std::string pathOfUnseen(const IC::Node& node);
-    static IC::Error findByName(const std::string& name, IC::Node** node);
 
     void load();
     void open();
     void start();
+    void checkIds() const;
+    bool isOwnId(const IC::MutableNode& node) const;
     void stop();
     void close();
 
     std::string file_;
     Listener* listener_;
+    Tell tell_;
     void* library_ = nullptr;
     IC::ManagementInterface* interface_ = nullptr;
+    std::optional<RunningPlugin> running_;
 };
 
 }  // namespace cvagent

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <optional>
 #include <string>
 #include <vector>
@@ -16,7 +17,11 @@ struct Reading {
     IC::PropertyValue value;
     std::string error;      ///< empty when the read succeeded
     bool missing = false;   ///< it failed because the node has no such property
-    bool timedOut = false;  ///< it failed because a command of the host did not end
+    bool timedOut = false;  ///< it failed because a command of the host did not end in time
+    /// The value is the last one that is known, and the host may have another one by now.
+    bool stale = false;
+    /// When the value was what the host said; nothing when it is not known.
+    std::optional<std::chrono::steady_clock::time_point> asOf{};
 
     bool failed() const { return !error.empty(); }
     /// Why there is no value, for people: a property that every node of the class could have is just not
@@ -25,10 +30,7 @@ struct Reading {
     std::string name() const { return row ? row->name : std::to_string(id); }
 };
 
-/// Reads properties through the plug-in, several at a time: most of a read is waiting for the host's tools.
-/// Never throws for what a read does.
-/// @return one reading an id, in the order of the ids
-std::vector<Reading> readProperties(const IC::MutableNode& node, const std::vector<unsigned int>& ids);
+/// Reads one property through the plug-in, on the calling thread. Never throws for what a read does.
 Reading readProperty(const IC::MutableNode& node, unsigned int id);
 
 /// The stored properties as readings; nothing is asked of the host.

@@ -6,7 +6,7 @@
 #include <optional>
 #include <set>
 
-#include "agent/cli/failure.h"
+#include "agent/core/problem.h"
 
 namespace cvagent {
 
@@ -39,11 +39,18 @@ bool isNamed(const IC::MutableNode& node, const std::string& text) {
     return pathComponent(node).ends_with(":" + text);
 }
 
-std::vector<Handle> matching(const IC::ManagementInterface& interface, const std::string& text,
+std::vector<Handle> matching(const std::vector<Handle>& nodes, const std::string& text,
                              bool (*matches)(const IC::MutableNode&, const std::string&)) {
-    std::vector<Handle> found = interface.holdAll();
-    std::erase_if(found, [&](const Handle& node) { return !matches(*node, text); });
+    std::vector<Handle> found;
+    std::copy_if(nodes.begin(), nodes.end(), std::back_inserter(found),
+                 [&](const Handle& node) { return matches(*node, text); });
     return found;
+}
+
+Handle withId(const std::vector<Handle>& nodes, unsigned int id) {
+    const auto found = std::find_if(nodes.begin(), nodes.end(),
+                                    [id](const Handle& node) { return node->getNodeId() == id; });
+    return found == nodes.end() ? nullptr : *found;
 }
 
 [[noreturn]] void failAmbiguous(const std::string& text, const std::vector<Handle>& candidates) {
@@ -52,7 +59,7 @@ std::vector<Handle> matching(const IC::ManagementInterface& interface, const std
     for (const Handle& node : candidates) {
         message += "\n  " + std::to_string(node->getNodeId()) + "  " + node->getPath();
     }
-    throw Failure(ExitStatus::notFound, message);
+    throw Problem(Problem::ambiguous, message);
 }
 
 }  // namespace
@@ -76,24 +83,28 @@ void setPaths(const IC::ManagementInterface& interface) {
     }
 }
 
-Handle findNode(const IC::ManagementInterface& interface, const std::string& text) {
+Handle findNode(const std::vector<Handle>& nodes, const std::string& text) {
     if (const std::optional<unsigned int> id = asId(text)) {
-        if (Handle node = interface.hold(*id)) {
+        if (Handle node = withId(nodes, *id)) {
             return node;
         }
-        throw Failure(ExitStatus::notFound, "there is no node with the id " + text + "; see: cvagent tree");
+        throw Problem(Problem::notFound, "there is no node with the id " + text, Problem::node);
     }
-    std::vector<Handle> found = matching(interface, text, isMeant);
+    std::vector<Handle> found = matching(nodes, text, isMeant);
     if (found.empty() && !text.empty()) {
-        found = matching(interface, text, isNamed);
+        found = matching(nodes, text, isNamed);
     }
     if (found.size() > 1) {
         failAmbiguous(text, found);
     }
     if (found.empty()) {
-        throw Failure(ExitStatus::notFound, "there is no node '" + text + "'; see: cvagent tree");
+        throw Problem(Problem::notFound, "there is no node '" + text + "'", Problem::node);
     }
     return found.front();
+}
+
+Handle findNode(const IC::ManagementInterface& interface, const std::string& text) {
+    return findNode(interface.holdAll(), text);
 }
 
 std::vector<Placed> drawingOrder(const std::vector<Handle>& nodes) {

@@ -13,8 +13,9 @@ std::string makePath(const IC::ManagementInterface& interface, const IC::Mutable
 /// Gives every listed node its path.
 void setPaths(const IC::ManagementInterface& interface);
 
-/// The node a person means by an id, a path or the last part of one. Throws Failure (notFound) that lists the
-/// candidates when there is none or more than one.
+/// The node a person means by an id, a path or the last part of one. Throws Problem: notFound, or ambiguous,
+/// which lists the candidates.
+Handle findNode(const std::vector<Handle>& nodes, const std::string& text);
 Handle findNode(const IC::ManagementInterface& interface, const std::string& text);
 
 /// A node with its place in the drawing.

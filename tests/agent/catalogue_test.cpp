@@ -1,4 +1,4 @@
-#include "agent/core/catalogue.h"
+#include "agent/core/oshw/tables.h"
 
 #include <gmock/gmock.h>
 
@@ -84,8 +84,8 @@ TEST(Catalogue, NamesAreUniqueInEveryClassAndNoNumbers) {
 
 TEST(Catalogue, EveryRowBelongsToAClass) {
     std::size_t rows = 0;
-    for (const auto part : {cvagent::hostProperties(), cvagent::storageProperties(),
-                            cvagent::networkPortProperties(), cvagent::ipConfigProperties()}) {
+    for (const auto part : {cvagent::oshw::hostProperties(), cvagent::oshw::storageProperties(),
+                            cvagent::oshw::networkPortProperties(), cvagent::oshw::ipConfigProperties()}) {
         rows += part.size();
     }
     EXPECT_EQ(allRows().size(), rows);

@@ -8,6 +8,8 @@
 #include <filesystem>
 
 #include "agent/cli/options.h"
+#include "agent/cli/print.h"
+#include "agent/core/plugin.h"
 #include "tests/agent/hostile_host.h"
 #include "tests/support/shell.h"
 
@@ -21,7 +23,7 @@ using testing::IsEmpty;
 constexpr int kKilled = 128 + SIGKILL;
 
 HOST_TEST(CommandDeadline, EndsAPipelineThatHangsAndTellsItsReader) {
-    const CommandDeadline deadline(0.3s);
+    const CommandDeadline deadline(0.3s, cvagent::complain);
     const Errand errand(Errand::read);
     const auto start = std::chrono::steady_clock::now();
     EXPECT_EQ(shell("sleep 1000 | cat").status, kKilled);
@@ -31,7 +33,7 @@ HOST_TEST(CommandDeadline, EndsAPipelineThatHangsAndTellsItsReader) {
 }
 
 HOST_TEST(CommandDeadline, GivesEveryCommandTheWholeTime) {
-    const CommandDeadline deadline(1s);
+    const CommandDeadline deadline(1s, cvagent::complain);
     const Errand errand(Errand::read);
     for (int i = 0; i < 3; ++i) {
         EXPECT_EQ(shell("sleep 0.4; true").status, 0);
@@ -40,7 +42,7 @@ HOST_TEST(CommandDeadline, GivesEveryCommandTheWholeTime) {
 }
 
 HOST_TEST(CommandDeadline, TellsNobodyElse) {
-    const CommandDeadline deadline(0.5s);
+    const CommandDeadline deadline(0.5s, cvagent::complain);
     std::string other = "not asked";
     std::thread quick([&other] {
         const Errand errand(Errand::read);
@@ -57,7 +59,7 @@ HOST_TEST(CommandDeadline, TellsNobodyElse) {
 }
 
 HOST_TEST(CommandDeadline, AWriteMayTakeTenTimesAsLong) {
-    const CommandDeadline deadline(0.1s);
+    const CommandDeadline deadline(0.1s, cvagent::complain);
     const Errand errand(Errand::write);
     EXPECT_EQ(shell("sleep 0.4; true").status, 0);
     EXPECT_THAT(errand.complaint(), IsEmpty());
@@ -68,7 +70,7 @@ HOST_TEST(CommandDeadline, AWriteMayTakeTenTimesAsLong) {
 HOST_TEST(CommandDeadline, WarnsTheUserOfWhatHasNoReader) {
     testing::internal::CaptureStderr();
     {
-        const CommandDeadline deadline(0.2s);
+        const CommandDeadline deadline(0.2s, cvagent::complain);
         shell("sleep 1000");
     }
     EXPECT_EQ(testing::internal::GetCapturedStderr(),
@@ -77,7 +79,7 @@ HOST_TEST(CommandDeadline, WarnsTheUserOfWhatHasNoReader) {
 }
 
 HOST_TEST(CommandDeadline, ZeroIsNone) {
-    const CommandDeadline deadline(0s);
+    const CommandDeadline deadline(0s, cvagent::complain);
     EXPECT_EQ(shell("sleep 0.2; true").status, 0);
 }
 
@@ -91,7 +93,7 @@ HOST_TEST(CommandDeadline, ACommandThatHasEndedIsNotKilled) {
     }
     testing::internal::CaptureStderr();
     {
-        const CommandDeadline deadline(0.1s);
+        const CommandDeadline deadline(0.1s, cvagent::complain);
         std::this_thread::sleep_for(0.3s);  // nobody has taken its status yet
     }
     EXPECT_THAT(testing::internal::GetCapturedStderr(), IsEmpty());
@@ -103,7 +105,7 @@ HOST_TEST(CommandDeadline, TheTimeThatTheProgramWasStoppedDoesNotCount) {
     const pid_t program = fork();
     if (program == 0) {
         setpgid(0, 0);
-        const CommandDeadline deadline(1s);
+        const CommandDeadline deadline(1s, cvagent::complain);
         _exit(shell("while [ ! -e /go ]; do sleep 0.02; done").status == 0 ? 0 : 1);
     }
     std::this_thread::sleep_for(0.3s);

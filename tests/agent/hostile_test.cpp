@@ -108,7 +108,7 @@ HOST_TEST(HangingTool, TheMonitorsGoOnAndTellNoLies) {
     host.directory("/opt/vantrel/corvista/data");
     const cvagent::QuietCommands quiet;
     Alerts alerts;
-    const cvagent::CommandDeadline deadline(0.5s);
+    const cvagent::CommandDeadline deadline(0.5s, cvagent::tellNobody);
     QX::setClockSpeed(1000);  // a pass every 30 ms
     cvagent::Plugin plugin(CORVISTA_PLUGIN_FILE, &alerts);
     ASSERT_TRUE(eventually([&] { return host.exists("/opt/vantrel/corvista/data/oshwminetind.dat"); }));

@@ -74,7 +74,7 @@ HOST_TEST(AThousandInterfaces, AreShownFoundAndWatched) {
     const auto nodes = mi.holdAll();
     EXPECT_EQ(cvagent::drawingOrder(nodes).size(), nodes.size());
     std::set<std::string> paths;
-    const Json tree = Json::parse(cvagent::json::tree("plug-in", nodes));
+    const Json tree = Json::parse(cvagent::json::tree({"plug-in"}, nodes));
     for (const Json& node : tree["nodes"]) {
         paths.insert(node["path"]);
     }

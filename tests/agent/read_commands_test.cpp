@@ -4,7 +4,7 @@
 #include <barrier>
 #include <nlohmann/json.hpp>
 
-#include "agent/core/reading.h"
+#include "agent/core/reader.h"
 #include "tests/agent/cvagent_run.h"
 #include "tests/support/no_threads.h"
 
@@ -157,9 +157,6 @@ HOST_TEST(GetCommand, WhatIsNotThereEndsWithStatusThree) {
 }
 
 TEST(Reading, ReadsGoSideBySideAndKeepTheirOrder) {
-    if (std::thread::hardware_concurrency() < 2) {
-        GTEST_SKIP() << "one processor reads one after the other";
-    }
     /// Answers only when two reads are under way at once.
     class Pair : public IC::MutableNode {
     public:
@@ -173,18 +170,25 @@ TEST(Reading, ReadsGoSideBySideAndKeepTheirOrder) {
     private:
         mutable std::barrier<> both_{2};
     };
-    const Pair node(1, 0, {1}, 40, 0);
+    const auto node = std::make_shared<Pair>(1U, 0U, std::vector<unsigned int>{1}, 40U, 0U);
+    cvagent::Pool pool;
+    cvagent::Facts facts;
     std::vector<unsigned int> ids;
-    for (const cvagent::Reading& reading : cvagent::readProperties(node, {7, 3, 5, 1})) {
+    for (const cvagent::Reading& reading :
+         cvagent::Reader(pool, facts)
+             .read(node, {7, 3, 5, 1}, cvagent::Freshness::now, cvagent::Request("test"))) {
         ids.push_back(static_cast<unsigned int>(reading.value));
     }
     EXPECT_THAT(ids, testing::ElementsAre(7, 3, 5, 1));
 }
 
 TEST(Reading, WithoutMoreThreadsOneReadsAll) {
-    const IC::MutableNode node(1, 0, {1}, 40, 0);
+    const auto node = std::make_shared<IC::MutableNode>(1U, 0U, std::vector<unsigned int>{1}, 40U, 0U);
+    cvagent::Pool pool;
+    cvagent::Facts facts;
     const NoThreads none;
-    const auto readings = cvagent::readProperties(node, {7, 3, 5});
+    const auto readings =
+        cvagent::Reader(pool, facts).read(node, {7, 3, 5}, cvagent::Freshness::now, cvagent::Request("test"));
     ASSERT_EQ(readings.size(), 3U);
     EXPECT_EQ(readings[0].error, "no such property: 7");
     EXPECT_EQ(readings[2].error, "no such property: 5");

@@ -7,7 +7,7 @@ set(agent_test_programs
   FAKE_PLUGIN_FILE="$<TARGET_FILE:fake_plugin>"
   FRAMEWORK_FILE="$<TARGET_FILE:corvista_framework>")
 
-corvista_test(agent LIBRARIES agent_code test_support util SOURCES
+corvista_test(agent LIBRARIES agent_cli agent_core test_support util SOURCES
   agent/catalogue_test.cpp
   agent/host_tools_test.cpp
   agent/json_test.cpp
@@ -28,7 +28,7 @@ corvista_test(agent_suse_host LIBRARIES test_support SOURCES
 target_compile_definitions(agent_suse_host_test PRIVATE ${agent_test_programs})
 add_dependencies(agent_suse_host_test cvagent vantrelcvicoshwmi)
 
-corvista_test(agent_lifetime LIBRARIES agent_code test_support LABELS threads SOURCES
+corvista_test(agent_lifetime LIBRARIES agent_cli agent_core test_support LABELS threads SOURCES
   agent/lifetime_test.cpp)
 target_compile_definitions(agent_lifetime_test PRIVATE ${agent_test_programs})
 add_dependencies(agent_lifetime_test fake_plugin vantrelcvicoshwmi)
@@ -40,7 +40,7 @@ corvista_test(agent_kernel_tree LIBRARIES test_support SOURCES
 target_compile_definitions(agent_kernel_tree_test PRIVATE ${agent_test_programs})
 add_dependencies(agent_kernel_tree_test cvagent vantrelcvicoshwmi corvista-hosttools)
 
-corvista_test(agent_hostile LIBRARIES agent_code test_support LABELS threads SOURCES
+corvista_test(agent_hostile LIBRARIES agent_cli agent_core test_support LABELS threads SOURCES
   agent/command_deadline_test.cpp
   agent/hostile_output_test.cpp
   agent/hostile_surroundings_test.cpp
@@ -49,5 +49,5 @@ corvista_test(agent_hostile LIBRARIES agent_code test_support LABELS threads SOU
 target_compile_definitions(agent_hostile_test PRIVATE ${agent_test_programs} CLOCK_JUMP_LIBRARY="$<TARGET_FILE:clockjump>")
 add_dependencies(agent_hostile_test cvagent clockjump fake_plugin vantrelcvicoshwmi)
 
-corvista_test(agent_many_interfaces LIBRARIES agent_code plugin_code test_support SOURCES
+corvista_test(agent_many_interfaces LIBRARIES agent_cli agent_core plugin_code test_support SOURCES
   agent/many_interfaces_test.cpp)

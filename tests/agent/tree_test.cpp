@@ -2,15 +2,14 @@
 
 #include <gmock/gmock.h>
 
-#include "agent/cli/failure.h"
+#include "agent/core/problem.h"
 #include "tests/agent/node_list.h"
 
 namespace {
 
 using cvagent::drawingOrder;
-using cvagent::ExitStatus;
-using cvagent::Failure;
 using cvagent::findNode;
+using cvagent::Problem;
 using cvagent::setPaths;
 using testing::ElementsAre;
 using testing::HasSubstr;
@@ -36,14 +35,15 @@ protected:
         setPaths(list);
         return list.hold(id)->getPath();
     }
-    /// What a lookup that must fail says.
+    Problem::Kind kind = Problem::failed;
+    /// What a lookup that must fail says; `kind` is why it failed.
     std::string complaint(const std::string& text) {
         setPaths(list);
         try {
             findNode(list, text);
-        } catch (const Failure& failure) {
-            EXPECT_EQ(failure.status(), ExitStatus::notFound);
-            return failure.what();
+        } catch (const Problem& problem) {
+            kind = problem.kind();
+            return problem.what();
         }
         return "found";
     }
@@ -115,6 +115,7 @@ TEST_F(Tree, AnAmbiguousNameListsTheCandidates) {
     const unsigned int port = addNamed(12, network, 108, "eth0");
     const unsigned int ip = addNamed(29, port, 108, "eth0");
     const std::string text = complaint("eth0");
+    EXPECT_EQ(kind, Problem::ambiguous);
     EXPECT_THAT(text, HasSubstr("2 nodes"));
     EXPECT_THAT(text, HasSubstr(std::to_string(port) + "  " + path(port) + "\n"));
     EXPECT_THAT(text, HasSubstr(std::to_string(ip) + "  " + path(ip)));
@@ -125,6 +126,7 @@ TEST_F(Tree, WhatIsNotThereIsNotFound) {
     for (const std::string text : {"999", "", "/", "/oshw/", "oshw/root", "eth0", "computer:", "Computer",
                                    "-1", "99999999999999999999", " 1", "1 ", "/computer"}) {
         EXPECT_THAT(complaint(text), HasSubstr("there is no node")) << text;
+        EXPECT_EQ(kind, Problem::notFound) << text;
     }
 }
 

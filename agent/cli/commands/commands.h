@@ -2,15 +2,17 @@
 
 #include "agent/cli/failure.h"
 #include "agent/cli/options.h"
+#include "agent/cli/session.h"
 
-/// The commands. Each prints its answer to standard output and returns the exit status; Failure and
+/// The commands. Each prints its answer to standard output and returns the exit status; Failure, Problem and
 /// Interrupted are thrown for whatever ends a command early.
 namespace cvagent::commands {
 
-ExitStatus tree(const Options& options);
-ExitStatus get(const Options& options);
-ExitStatus set(const Options& options);
-ExitStatus watch(const Options& options);
+ExitStatus tree(Session& session, const Options& options);
+ExitStatus get(Session& session, const Options& options);
+ExitStatus set(Session& session, const Options& options);
+ExitStatus watch(Session& session, const Options& options);
+// These need no agent.
 ExitStatus properties(const Options& options);
 ExitStatus doctor(const Options& options);
 

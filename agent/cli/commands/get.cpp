@@ -1,55 +1,13 @@
 #include <algorithm>
-#include <set>
 
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/json.h"
 #include "agent/cli/print.h"
-#include "agent/cli/session.h"
-#include "agent/core/tree.h"
+#include "agent/core/operations.h"
 
 namespace cvagent::commands {
 
 namespace {
-
-/// The id behind a word; a number need not be in the catalogue.
-unsigned int idOf(const IC::MutableNode& node, const std::string& word) {
-    if (const auto row = findProperty(node.nodeType(), word)) {
-        if (!row->readable()) {
-            throw Failure(ExitStatus::notFound, std::string(row->name) + " can be written but not read");
-        }
-        return row->id;
-    }
-    const std::string digits = "0123456789";
-    if (!word.empty() && word.size() < 10 && word.find_first_not_of(digits) == std::string::npos) {
-        return static_cast<unsigned int>(std::stoul(word));
-    }
-    const std::string nodeClass = className(node.nodeType());
-    throw Failure(ExitStatus::notFound, "a " + nodeClass + " has no property " + inQuotes(word) +
-                                            "; see: cvagent properties " + nodeClass);
-}
-
-/// What the catalogue knows of the class and whatever else the node has stored.
-std::vector<unsigned int> allIds(const IC::MutableNode& node) {
-    std::set<unsigned int> ids;
-    for (const Property& row : propertiesOf(node.nodeType())) {
-        if (row.readable()) {
-            ids.insert(row.id);
-        }
-    }
-    for (const auto& [id, value] : storedProperties(node)) {
-        ids.insert(id);
-    }
-    return {ids.begin(), ids.end()};
-}
-
-std::vector<unsigned int> wantedIds(const IC::MutableNode& node, const std::vector<std::string>& words) {
-    std::vector<unsigned int> ids;
-    ids.reserve(words.size());
-    for (const std::string& word : words) {
-        ids.push_back(idOf(node, word));
-    }
-    return words.empty() ? allIds(node) : ids;
-}
 
 std::string listing(const IC::MutableNode& node, const std::vector<Reading>& readings, const Style& style) {
     std::size_t width = 0;
@@ -91,15 +49,14 @@ ExitStatus verdict(const IC::MutableNode& node, const std::vector<Reading>& read
 
 }  // namespace
 
-ExitStatus get(const Options& options) {
-    const Style style = Style::detect();
-    Session session(options);
-    Session::goOnUnlessStopped();
-    const Handle node = findNode(session.interface(), options.node);
-    const std::vector<Reading> readings = readProperties(*node, wantedIds(*node, options.properties));
-    Session::goOnUnlessStopped();
-    print(options.json ? json::node(*node, readings) : listing(*node, readings, style));
-    session.log().showErrors();
+ExitStatus get(Session& session, const Options& options) {
+    const NodeRef node = session.agent().find(options.node);
+    const Request request = ownRequest();
+    const std::vector<Reading> readings =
+        session.agent().read(node, readableIds(*node, options.properties), Freshness::now, request);
+    goOnUnlessStopped();
+    print(options.json ? json::node(*node, readings) : listing(*node, readings, session.style()));
+    session.showErrors(request);
     return verdict(*node, readings, !options.properties.empty());
 }
 

@@ -10,7 +10,7 @@ namespace {
 
 std::vector<NodeClass> wantedClasses(const std::string& name) {
     if (name.empty()) {
-        return {nodeClasses().begin(), nodeClasses().end()};
+        return nodeClasses();
     }
     if (const NodeClass* known = findClass(name)) {
         return {*known};

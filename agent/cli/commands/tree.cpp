@@ -3,7 +3,6 @@
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/json.h"
 #include "agent/cli/print.h"
-#include "agent/cli/session.h"
 #include "agent/core/tree.h"
 
 namespace cvagent::commands {
@@ -83,12 +82,9 @@ std::string drawing(const std::vector<Handle>& nodes, const Style& style) {
 
 }  // namespace
 
-ExitStatus tree(const Options& options) {
-    const Style style = Style::detect();
-    Session session(options);
-    Session::goOnUnlessStopped();
-    const std::vector<Handle> nodes = session.interface().holdAll();
-    print(options.json ? json::tree(session.pluginFile(), nodes) : drawing(nodes, style));
+ExitStatus tree(Session& session, const Options& options) {
+    const std::vector<Handle> nodes = handlesOf(session.agent().nodes());
+    print(options.json ? json::tree(session.agent().plugins(), nodes) : drawing(nodes, session.style()));
     return ExitStatus::done;
 }
 

@@ -1,18 +1,14 @@
 #include <poll.h>
-#include <sys/eventfd.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
 #include <chrono>
-#include <deque>
-#include <mutex>
-#include <utility>
+#include <optional>
 
 #include "agent/cli/commands/commands.h"
+#include "agent/cli/event_program.h"
 #include "agent/cli/json.h"
 #include "agent/cli/print.h"
-#include "agent/cli/session.h"
 #include "agent/core/signals.h"
 
 namespace cvagent::commands {
@@ -21,35 +17,11 @@ namespace {
 
 using Clock = std::chrono::steady_clock;
 
-/// Events on their way from the plug-in's threads to the one that prints.
-class EventQueue : public Listener {
-public:
-    EventQueue() : ready_(eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)) {}
-    EventQueue(const EventQueue&) = delete;
-    EventQueue& operator=(const EventQueue&) = delete;
-    ~EventQueue() override { close(ready_); }
-
-    void hear(const Event& event) override {
-        {
-            const std::lock_guard lock(guard_);
-            events_.push_back(event);
-        }
-        eventfd_write(ready_, 1);
-    }
-    /// Everything heard since the last call.
-    std::deque<Event> take() {
-        eventfd_t count = 0;
-        eventfd_read(ready_, &count);
-        const std::lock_guard lock(guard_);
-        return std::exchange(events_, {});
-    }
-    int descriptor() const { return ready_; }
-
-private:
-    int ready_;
-    std::mutex guard_;
-    std::deque<Event> events_;  // guarded by guard_
-};
+/// "LinkState: 1 -> 12"; what is not known is left out.
+std::string changeText(const Event& event) {
+    const std::string before = event.before.empty() ? "" : printable(event.before) + " -> ";
+    return event.propertyName + ": " + before + (event.after.empty() ? "not known" : printable(event.after));
+}
 
 std::string line(const Event& event, const Style& style) {
     std::string text = style.faint(timeText(event.time)) + "  ";
@@ -61,7 +33,9 @@ std::string line(const Event& event, const Style& style) {
                 std::to_string(event.firstCode) + ", " + std::to_string(event.secondCode) + ", " +
                 std::to_string(event.eventCode) + ")";
     } else {
-        text += padded(eventName(event.kind), 11) + style.strong(path) + "  " + printable(event.message);
+        const bool isWrite = event.kind == Event::Kind::written;
+        text += padded(eventName(event.kind), 11) + style.strong(path) + "  " +
+                (isWrite ? changeText(event) : printable(event.message));
     }
     return text + "\n";
 }
@@ -75,39 +49,45 @@ int millisecondsTo(const std::optional<Clock::time_point>& end) {
     return static_cast<int>(std::clamp<long long>(left, 0, 3600LL * 1000));
 }
 
-void printAll(EventQueue& queue, bool asJson, const Style& style) {
-    for (const Event& event : queue.take()) {
+void printAll(Subscription& events, bool asJson, const Style& style) {
+    const Subscription::Taken taken = events.take();
+    if (taken.dropped > 0) {
+        complain(std::to_string(taken.dropped) + " events came faster than they could be printed");
+    }
+    for (const Event& event : taken.events) {
         print(asJson ? json::event(event) : line(event, style));
     }
 }
 
-void follow(EventQueue& queue, const Options& options, const Style& style) {
+void follow(Subscription& events, const Options& options, const Style& style) {
     std::optional<Clock::time_point> end;
     if (options.seconds) {
         end = Clock::now() +
               std::chrono::duration_cast<Clock::duration>(std::chrono::duration<double>(*options.seconds));
     }
     while (StopSignals::received() == 0 && (!end || Clock::now() < *end)) {
-        pollfd ready[] = {{queue.descriptor(), POLLIN, 0}, {StopSignals::descriptor(), POLLIN, 0}};
+        pollfd ready[] = {{events.descriptor(), POLLIN, 0}, {StopSignals::descriptor(), POLLIN, 0}};
         if (poll(ready, 2, millisecondsTo(end)) < 0 && errno != EINTR) {
             throw Failure(ExitStatus::failed, "cannot wait for events");
         }
-        printAll(queue, options.json, style);
+        printAll(events, options.json, style);
     }
 }
 
 }  // namespace
 
-ExitStatus watch(const Options& options) {
-    const Style style = Style::detect();
-    EventQueue queue;
-    {
-        Session session(options, &queue);
-        complain("watching " + std::to_string(session.interface().holdAll().size()) + " nodes" +
-                 (options.seconds ? "" : "; Ctrl-C ends it"));
-        follow(queue, options, style);
+ExitStatus watch(Session& session, const Options& options) {
+    const auto events = session.agent().subscribe(0);
+    std::optional<EventProgram> program;
+    if (!options.program.empty()) {
+        program.emplace(options.program, EventProgram::Seconds(options.programSeconds),
+                        session.agent().subscribe(0, Event::Kind::alert));
     }
-    printAll(queue, options.json, style);  // what came while the plug-in was stopped
+    complain("watching " + std::to_string(session.agent().nodes().size()) + " nodes" +
+             (options.seconds ? "" : "; Ctrl-C ends it"));
+    follow(*events, options, session.style());
+    session.end();
+    printAll(*events, options.json, session.style());  // what came while the plug-ins were stopped
     return ExitStatus::done;
 }
 

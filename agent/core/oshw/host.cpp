@@ -1,8 +1,8 @@
 // The computer and its processors.
-#include "agent/core/catalogue.h"
+#include "agent/core/oshw/tables.h"
 #include "agent/core/value_check.h"
 
-namespace cvagent {
+namespace cvagent::oshw {
 
 namespace {
 
@@ -68,4 +68,4 @@ std::span<const Property> hostProperties() {
     return kHostRows;
 }
 
-}  // namespace cvagent
+}  // namespace cvagent::oshw

@@ -1,7 +1,7 @@
 // Network ports, LAN endpoints and teams.
-#include "agent/core/catalogue.h"
+#include "agent/core/oshw/tables.h"
 
-namespace cvagent {
+namespace cvagent::oshw {
 
 namespace {
 
@@ -56,4 +56,4 @@ std::span<const Property> networkPortProperties() {
     return kPortRows;
 }
 
-}  // namespace cvagent
+}  // namespace cvagent::oshw

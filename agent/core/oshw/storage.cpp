@@ -1,7 +1,7 @@
 // Drives and partitions.
-#include "agent/core/catalogue.h"
+#include "agent/core/oshw/tables.h"
 
-namespace cvagent {
+namespace cvagent::oshw {
 
 namespace {
 
@@ -35,4 +35,4 @@ std::span<const Property> storageProperties() {
     return kStorageRows;
 }
 
-}  // namespace cvagent
+}  // namespace cvagent::oshw

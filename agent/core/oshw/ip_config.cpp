@@ -1,8 +1,8 @@
 // IP configurations: what can be changed on the host's interfaces.
-#include "agent/core/catalogue.h"
+#include "agent/core/oshw/tables.h"
 #include "agent/core/value_check.h"
 
-namespace cvagent {
+namespace cvagent::oshw {
 
 namespace {
 
@@ -134,4 +134,4 @@ std::span<const Property> ipConfigProperties() {
     return kIpConfigRows;
 }
 
-}  // namespace cvagent
+}  // namespace cvagent::oshw

@@ -1,0 +1,117 @@
+#include "agent/core/agent.h"
+
+#include <utility>
+
+#include "agent/core/announcer.h"
+#include "agent/core/command_deadline.h"
+#include "agent/core/tree.h"
+
+namespace cvagent {
+
+/// In the order in which things are made; what comes later uses what comes before.
+struct Agent::Engine {
+    explicit Engine(const AgentSettings& settings);
+
+    std::vector<Handle> handles() const;
+    void load(const std::string& file);
+    void refresh();
+
+    std::shared_ptr<DataDirectory> data;
+    Tell tell;
+    LogOutput log;
+    CommandDeadline deadline;
+    EventLog events;
+    Facts facts;
+    Announcer announcer{events, facts};
+    std::vector<std::unique_ptr<Plugin>> plugins;
+    std::vector<FailedPlugin> failed;
+    Pool pool;
+    Reader reader{pool, facts};
+    Writer writer{pool, facts, announcer, [this] { refresh(); }};
+};
+
+Agent::Engine::Engine(const AgentSettings& settings)
+    : data(settings.data ? settings.data : std::make_shared<DataDirectory>()),
+      tell(settings.tell),
+      log(settings.log, settings.errors ? settings.errors : std::make_shared<ErrorLines>()),
+      deadline(settings.commandTime, settings.tell) {
+    for (const std::string& file : settings.plugins) {
+        load(file);
+    }
+    if (plugins.empty() && !failed.empty()) {
+        throw Problem(failed.front().problem);
+    }
+}
+
+void Agent::Engine::load(const std::string& file) {
+    try {
+        plugins.push_back(std::make_unique<Plugin>(file, &announcer, tell));
+        announcer.takeStock(plugins.back()->interface().holdAll());
+    } catch (const Problem& problem) {
+        failed.push_back({file, problem});
+    }
+}
+
+std::vector<Handle> Agent::Engine::handles() const {
+    std::vector<Handle> all;
+    for (const auto& plugin : plugins) {
+        const std::vector<Handle> nodes = plugin->interface().holdAll();
+        all.insert(all.end(), nodes.begin(), nodes.end());
+    }
+    return all;
+}
+
+void Agent::Engine::refresh() {
+    for (const auto& plugin : plugins) {
+        setPaths(plugin->interface());
+        announcer.announceNew(plugin->interface());
+    }
+}
+
+Agent::Agent(const AgentSettings& settings) : engine_(std::make_shared<Engine>(settings)) {}
+
+Agent::~Agent() = default;
+
+const std::vector<Agent::FailedPlugin>& Agent::failedPlugins() const {
+    return engine_->failed;
+}
+
+std::vector<std::string> Agent::plugins() const {
+    std::vector<std::string> files;
+    for (const auto& plugin : engine_->plugins) {
+        files.push_back(plugin->file());
+    }
+    return files;
+}
+
+std::vector<NodeRef> Agent::nodes() const {
+    std::vector<NodeRef> all;
+    for (const Handle& node : engine_->handles()) {
+        all.push_back(NodeRef(engine_, node));
+    }
+    return all;
+}
+
+NodeRef Agent::find(const std::string& text) const {
+    return {engine_, findNode(engine_->handles(), text)};
+}
+
+std::vector<Reading> Agent::read(const NodeRef& node, const std::vector<unsigned int>& ids,
+                                 Freshness freshness, const Request& request) const {
+    return engine_->reader.read(node.node_, ids, freshness, request);
+}
+
+WriteResult Agent::write(const NodeRef& node, const Property& row, const IC::PropertyValue& value,
+                         const Request& request) const {
+    return engine_->writer.write(node.node_, row, value, request);
+}
+
+std::shared_ptr<Subscription> Agent::subscribe(std::uint64_t after, std::optional<Event::Kind> only) const {
+    return engine_->events.subscribe(after, EventLog::kMost, only);
+}
+
+EventLog::Since Agent::events(std::uint64_t after) const {
+    return engine_->events.since(after);
+}
+
+}  // namespace cvagent

@@ -1,0 +1,75 @@
+#pragma once
+
+#include <chrono>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "agent/core/event_log.h"
+#include "agent/core/log_output.h"
+#include "agent/core/node_ref.h"
+#include "agent/core/plugin.h"
+#include "agent/core/problem.h"
+#include "agent/core/reader.h"
+#include "agent/core/surroundings.h"
+#include "agent/core/writer.h"
+
+namespace cvagent {
+
+/// What an agent is made of.
+struct AgentSettings {
+    std::vector<std::string> plugins;  ///< files; each brings its nodes into the one tree
+    LogSettings log;
+    /// How long a command of a plug-in may take, in a write ten times as long; 0 for ever.
+    std::chrono::duration<double> commandTime{10};
+    /// Held by the agent from now on; null: it takes the one of this process's surroundings.
+    std::shared_ptr<DataDirectory> data;
+    /// Hears of what belongs to no call. Any thread.
+    Tell tell = tellNobody;
+    /// Errors of plug-ins that belong to no call: start, monitors, stop. Null: the agent makes its own.
+    std::shared_ptr<ErrorLines> errors;
+};
+
+/// Plug-ins at work: the one agent behind every front end. It owns data directory, log, deadline of commands,
+/// threads and plug-ins, and changes nothing of the process: that is main's, before any thread. All
+/// operations may be called from many threads at once.
+class Agent {
+public:
+    /// Loads every plug-in. One that fails costs nothing of the others; when all fail, the first one's
+    /// Problem is thrown.
+    explicit Agent(const AgentSettings& settings);
+    Agent(const Agent&) = delete;
+    Agent& operator=(const Agent&) = delete;
+    /// The plug-ins are stopped when the last NodeRef has gone, too.
+    ~Agent();
+
+    struct FailedPlugin {
+        std::string file;
+        Problem problem;
+    };
+    /// The plug-ins that could not be loaded or started.
+    const std::vector<FailedPlugin>& failedPlugins() const;
+    /// The files of the plug-ins at work.
+    std::vector<std::string> plugins() const;
+
+    std::vector<NodeRef> nodes() const;
+    /// The node a person means by an id, a path or the last part of one. Throws Problem: notFound, ambiguous.
+    NodeRef find(const std::string& text) const;
+
+    /// See Reader::read.
+    std::vector<Reading> read(const NodeRef& node, const std::vector<unsigned int>& ids, Freshness freshness,
+                              const Request& request) const;
+    /// See Writer::write. What may be written is judged before: see operations.h.
+    WriteResult write(const NodeRef& node, const Property& row, const IC::PropertyValue& value,
+                      const Request& request) const;
+
+    /// See EventLog. A subscription outlives the agent: the last events come while the plug-ins stop.
+    std::shared_ptr<Subscription> subscribe(std::uint64_t after, std::optional<Event::Kind> only = {}) const;
+    EventLog::Since events(std::uint64_t after) const;
+
+private:
+    struct Engine;
+    std::shared_ptr<Engine> engine_;  // NodeRefs hold it, too
+};
+
+}  // namespace cvagent

@@ -1,0 +1,79 @@
+#pragma once
+
+#include <cstdint>
+#include <deque>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <vector>
+
+#include "agent/core/event.h"
+
+namespace cvagent {
+
+/// What one subscriber has not taken yet. It may outlive the agent. Any thread.
+class Subscription {
+public:
+    struct Taken {
+        std::deque<Event> events;
+        std::uint64_t dropped = 0;  ///< events lost since the last call, older than those that are here
+    };
+
+    /// @param most events that are kept for the subscriber; the oldest goes first
+    /// @param only the one kind that he wants; nothing for all
+    explicit Subscription(std::size_t most, std::optional<Event::Kind> only = std::nullopt);
+    Subscription(const Subscription&) = delete;
+    Subscription& operator=(const Subscription&) = delete;
+    ~Subscription();
+
+    /// Everything since the last call.
+    Taken take();
+    /// Readable when there is something to take. Only take() reads it.
+    int descriptor() const { return ready_; }
+
+private:
+    friend class EventLog;
+    void put(const Event& event);
+
+    const std::size_t most_;
+    const std::optional<Event::Kind> only_;
+    int ready_;
+    std::mutex guard_;
+    std::deque<Event> events_;   // guarded by guard_
+    std::uint64_t dropped_ = 0;  // guarded by guard_
+};
+
+/// Numbers events, keeps the last of them and hands them to subscribers. Nobody who does not take his events
+/// holds up the others or the plug-in. Any thread.
+class EventLog : public Listener {
+public:
+    static constexpr std::size_t kMost = 4096;  ///< a thousand nodes that come, go and change
+
+    struct Since {
+        std::vector<Event> events;
+        std::uint64_t missing = 0;  ///< events after that number which are kept no more
+    };
+
+    /// @param most how many past events are kept
+    explicit EventLog(std::size_t most = kMost) : most_(most) {}
+
+    void hear(const Event& event) override;
+    /// The events after a number, the oldest first; 0 asks for all that are kept.
+    Since since(std::uint64_t number) const;
+    /// The number of the last event.
+    std::uint64_t last() const;
+    /// A queue of the events after a number, those that have happened included.
+    std::shared_ptr<Subscription> subscribe(std::uint64_t after, std::size_t most = kMost,
+                                            std::optional<Event::Kind> only = std::nullopt);
+
+private:
+    Since sinceLocked(std::uint64_t number) const;
+
+    const std::size_t most_;
+    mutable std::mutex guard_;  // guards everything below
+    std::uint64_t last_ = 0;
+    std::deque<Event> kept_;
+    std::vector<std::weak_ptr<Subscription>> subscribers_;
+};
+
+}  // namespace cvagent

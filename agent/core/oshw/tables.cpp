@@ -1,0 +1,48 @@
+#include "agent/core/oshw/tables.h"
+
+namespace cvagent::oshw {
+
+namespace {
+
+using Naming = NodeClass::Naming;
+
+constexpr NodeClass kClasses[] = {
+    {NodeType::osHardware, "oshw", Naming::single, 0},
+    {NodeType::root, "root", Naming::single, 0},
+    {NodeType::computer, "computer", Naming::single, 0},
+    {NodeType::chassis, "chassis", Naming::single, 0},
+    {NodeType::planar, "planar", Naming::single, 0},
+    {NodeType::networkController, "network-controller", Naming::single, 0},
+    {NodeType::diskController, "disk-controller", Naming::single, 0},
+    {NodeType::hardDrive, "hard-drive", Naming::byProperty, 89},
+    {NodeType::partition, "partition", Naming::byProperty, 89},
+    {NodeType::networkPort, "network-port", Naming::byProperty, 108},
+    {NodeType::ipConfig, "ip-config", Naming::byProperty, 108},
+    {NodeType::lanEndpoint, "lan-endpoint", Naming::byProperty, 108},
+    {NodeType::team, "team", Naming::byProperty, 197},
+    {NodeType::processor, "processor", Naming::byIndex, 0},
+};
+
+// An interface's states, as its state property has them. The two alerts of a bond's member carry the same
+// codes; only their texts differ.
+constexpr unsigned int kState = 123;
+
+constexpr AlertRow kAlerts[] = {
+    {"NIC is Online", kState, 1},
+    {"NIC is Offline", kState, 12},
+    {"NIC has Switched Over", kState, 32},
+    {"NIC has Switched Back", kState, 33},
+};
+
+}  // namespace
+
+const CatalogueTable& table() {
+    static const CatalogueTable all{
+        "the OS/hardware plug-in",
+        kClasses,
+        {hostProperties(), storageProperties(), networkPortProperties(), ipConfigProperties()},
+        kAlerts};
+    return all;
+}
+
+}  // namespace cvagent::oshw

@@ -1,0 +1,77 @@
+#include "agent/core/reader.h"
+
+#include <condition_variable>
+#include <mutex>
+#include <utility>
+
+namespace cvagent {
+
+namespace {
+
+/// The readings of one call, as they come in. The work holds it, too: some may come when nobody waits any
+/// more.
+class Answers {
+public:
+    explicit Answers(std::size_t count) : readings_(count), left_(count) {}
+
+    void put(std::size_t place, Reading reading) {
+        {
+            const std::lock_guard lock(guard_);
+            readings_[place] = std::move(reading);
+            --left_;
+        }
+        changed_.notify_one();
+    }
+    /// What has come until the deadline; nothing at a place means that it has not.
+    std::vector<std::optional<Reading>> takeAt(Request::Clock::time_point deadline) {
+        std::unique_lock lock(guard_);
+        waitFor(changed_, lock, deadline, [this] { return left_ == 0; });
+        return readings_;
+    }
+
+private:
+    std::mutex guard_;
+    std::condition_variable changed_;
+    std::vector<std::optional<Reading>> readings_;  // guarded by guard_
+    std::size_t left_;                              // guarded by guard_
+};
+
+}  // namespace
+
+std::vector<Reading> Reader::read(const Handle& node, const std::vector<unsigned int>& ids,
+                                  Freshness freshness, const Request& request) {
+    if (freshness == Freshness::now) {
+        return readNow(node, ids, request);
+    }
+    std::vector<Reading> readings;
+    readings.reserve(ids.size());
+    for (const unsigned int id : ids) {
+        readings.push_back(facts_.known(*node, id));
+    }
+    return readings;
+}
+
+std::vector<Reading> Reader::readNow(const Handle& node, const std::vector<unsigned int>& ids,
+                                     const Request& request) {
+    const auto answers = std::make_shared<Answers>(ids.size());
+    for (std::size_t i = 0; i < ids.size(); ++i) {
+        pool_.submit(node->getNodeId(), answers.get(),
+                     [held = node, id = ids[i], i, answers, request, this]() mutable {
+                         const ErrorScope scope(request.errors());
+                         const auto begun = Facts::Clock::now();
+                         Reading reading = readProperty(*held, id);
+                         facts_.judge(*held, reading, begun);
+                         held.reset();  // whoever has his answer may end the agent and know that it has ended
+                         answers->put(i, std::move(reading));
+                     });
+    }
+    auto come = answers->takeAt(request.deadline());
+    pool_.drop(answers.get());
+    std::vector<Reading> readings;
+    for (std::size_t i = 0; i < ids.size(); ++i) {
+        readings.push_back(come[i] ? *std::move(come[i]) : facts_.overdue(*node, ids[i]));
+    }
+    return readings;
+}
+
+}  // namespace cvagent

@@ -1,0 +1,38 @@
+#pragma once
+
+#include <memory>
+#include <vector>
+
+#include "agent/core/facts.h"
+#include "agent/core/pool.h"
+#include "agent/core/request.h"
+
+namespace cvagent {
+
+/// What a read is content with.
+enum class Freshness {
+    known,  ///< what is known, with its age; nothing is asked of the host
+    now,    ///< what is so now
+};
+
+/// Reads properties side by side on the pool: most of a read is waiting for the host's tools. Any thread.
+class Reader {
+public:
+    /// Both outlive the reader; work that still hangs when a caller has gone reaches them through its node.
+    Reader(Pool& pool, Facts& facts) : pool_(pool), facts_(facts) {}
+
+    /// @param node kept by the work until it is done
+    /// @return one reading an id, in the order of the ids. What the host does not tell until the request's
+    ///         deadline is the last known value, stale. Never throws for what a read does.
+    std::vector<Reading> read(const Handle& node, const std::vector<unsigned int>& ids, Freshness freshness,
+                              const Request& request);
+
+private:
+    std::vector<Reading> readNow(const Handle& node, const std::vector<unsigned int>& ids,
+                                 const Request& request);
+
+    Pool& pool_;
+    Facts& facts_;
+};
+
+}  // namespace cvagent

@@ -1,0 +1,46 @@
+#pragma once
+
+#include <chrono>
+#include <memory>
+#include <string>
+
+#include "agent/core/error_lines.h"
+
+namespace cvagent {
+
+/// Who asks, until when he waits, and the place for the errors of his call. It travels with each call; the
+/// agent keeps nothing of it but what a thread needs that still hangs when the caller has gone.
+class Request {
+public:
+    using Clock = std::chrono::steady_clock;
+
+    /// @param caller for the record: a user, a connection
+    /// @param deadline when the caller wants an answer, whatever it is; the default waits for as long as it
+    ///                 takes
+    explicit Request(std::string caller, Clock::time_point deadline = Clock::time_point::max())
+        : caller_(std::move(caller)), deadline_(deadline) {}
+
+    const std::string& caller() const { return caller_; }
+    Clock::time_point deadline() const { return deadline_; }
+    /// What the plug-in reported because of this call, and of no other.
+    ErrorLines& errors() const { return *errors_; }
+
+private:
+    std::string caller_;
+    Clock::time_point deadline_;
+    std::shared_ptr<ErrorLines> errors_ = std::make_shared<ErrorLines>();
+};
+
+/// Waits on a condition until a request's deadline.
+/// @return whether it came true
+template <class Condition, class Lock, class Predicate>
+bool waitFor(Condition& changed, Lock& lock, Request::Clock::time_point deadline,
+             const Predicate& predicate) {
+    if (deadline == Request::Clock::time_point::max()) {  // would overflow on its way to the kernel
+        changed.wait(lock, predicate);
+        return true;
+    }
+    return changed.wait_until(lock, deadline, predicate);
+}
+
+}  // namespace cvagent

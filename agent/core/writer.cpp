@@ -1,0 +1,137 @@
+#include "agent/core/writer.h"
+
+#include "agent/core/command_deadline.h"
+
+namespace cvagent {
+
+namespace {
+
+constexpr unsigned int kWrites = 0;  // the pool's lane; no node has this id
+
+IC::Error callSetProperty(IC::MutableNode& node, unsigned int id, const IC::PropertyValue& value) {
+    try {
+        return node.setProperty(id, value);
+    } catch (const std::exception& exception) {
+        return {IC::Error::failure, IC::Number(), std::string("the plug-in threw: ") + exception.what()};
+    } catch (...) {
+        return {IC::Error::failure, IC::Number(), "the plug-in threw an unknown exception"};
+    }
+}
+
+std::optional<Problem> setGuarded(IC::MutableNode& node, const Property& row,
+                                  const IC::PropertyValue& value) {
+    const Errand errand(Errand::write);
+    const IC::Error result = callSetProperty(node, row.id, value);
+    if (const std::string complaint = errand.complaint(); !complaint.empty()) {
+        return Problem(Problem::timedOut,
+                       std::string(row.name) + " may be changed only in part: " + complaint);
+    }
+    if (result.getStatus() != 0) {
+        return Problem(Problem::failed, std::string(row.name) + " was not changed: " + errorText(result));
+    }
+    return std::nullopt;
+}
+
+/// A code that was written is an order, the one that is read a state: only equal ones tell something.
+WriteResult::Outcome compare(const Property& row, const IC::PropertyValue& written, const Reading& after) {
+    if (after.failed() || after.value.kind() != written.kind()) {
+        return WriteResult::notKnown;
+    }
+    if (static_cast<std::string>(after.value) == static_cast<std::string>(written)) {
+        return WriteResult::applied;
+    }
+    return row.labels.empty() ? WriteResult::differs : WriteResult::notKnown;
+}
+
+}  // namespace
+
+struct Writer::Job {
+    Handle node;
+    Property row;
+    IC::PropertyValue value;
+};
+
+/// The right to write; given back with the object, on whichever thread that is.
+class Writer::Turn {
+public:
+    Turn(Writer& writer, Request::Clock::time_point deadline) : writer_(writer) {
+        std::unique_lock lock(writer_.guard_);
+        if (!waitFor(writer_.turnOver_, lock, deadline, [this] { return !writer_.busy_; })) {
+            throw Problem(Problem::busy, "another write is at work");
+        }
+        writer_.busy_ = true;
+    }
+    Turn(const Turn&) = delete;
+    Turn& operator=(const Turn&) = delete;
+    ~Turn() {
+        const std::lock_guard lock(writer_.guard_);
+        writer_.busy_ = false;
+        writer_.turnOver_.notify_one();
+    }
+
+private:
+    Writer& writer_;
+};
+
+/// Where the result of a write goes, whether somebody still waits for it or not.
+struct Writer::Pending {
+    std::mutex guard;
+    std::condition_variable come;
+    std::optional<WriteResult> result;  // guarded by guard
+};
+
+WriteResult Writer::write(const Handle& node, const Property& row, const IC::PropertyValue& value,
+                          const Request& request) {
+    auto turn = std::make_shared<Turn>(*this, request.deadline());
+    const auto pending = std::make_shared<Pending>();
+    pool_.submit(kWrites, this,
+                 [job = Job{node, row, value}, turn = std::move(turn), pending, request, this]() mutable {
+                     const ErrorScope scope(request.errors());
+                     WriteResult result = perform(job);
+                     turn.reset();
+                     job.node.reset();  // as in a read
+                     const std::lock_guard lock(pending->guard);
+                     pending->result = std::move(result);
+                     pending->come.notify_one();
+                 });
+    std::unique_lock lock(pending->guard);
+    if (waitFor(pending->come, lock, request.deadline(),
+                [&pending] { return pending->result.has_value(); })) {
+        return *std::move(pending->result);
+    }
+    WriteResult result;
+    result.before = result.after = facts_.overdue(*node, row.id);
+    result.problem = Problem(Problem::timedOut,
+                             std::string(row.name) + " may be changed later or in part: no answer in time");
+    return result;
+}
+
+WriteResult Writer::perform(const Job& job) {
+    const Property& row = job.row;
+    WriteResult result;
+    result.before.id = row.id;
+    if (row.readable()) {
+        result.before = readHere(*job.node, row.id);
+    }
+    result.problem = setGuarded(*job.node, row, job.value);
+    if (result.problem && result.problem->kind() == Problem::failed) {
+        return result;
+    }
+    refresh_();
+    result.after = {row.id, row, {}, result.problem ? "cut off" : "can only be written"};
+    if (!result.problem && row.readable()) {
+        result.after = readHere(*job.node, row.id);
+        result.outcome = compare(row, job.value, result.after);
+    }
+    announcer_.announceWrite(*job.node, result.before, result.after);
+    return result;
+}
+
+Reading Writer::readHere(const IC::MutableNode& node, unsigned int id) {
+    const auto begun = Facts::Clock::now();
+    Reading reading = readProperty(node, id);
+    facts_.judge(node, reading, begun);
+    return reading;
+}
+
+}  // namespace cvagent

@@ -1,0 +1,64 @@
+#pragma once
+
+#include <condition_variable>
+#include <functional>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <string>
+
+#include "agent/core/announcer.h"
+#include "agent/core/pool.h"
+#include "agent/core/problem.h"
+#include "agent/core/request.h"
+
+namespace cvagent {
+
+/// What a write came to.
+struct WriteResult {
+    enum Outcome {
+        applied,   ///< the host has the value that was written
+        differs,   ///< the host has another value; not every write shows at once
+        notKnown,  ///< nothing can be compared, or nobody knows
+    };
+
+    Reading before;  ///< of a property that can only be written: nothing was read
+    Reading after;
+    Outcome outcome = notKnown;
+    std::optional<Problem> problem;  ///< why it failed, or was cut off; nothing when the plug-in took it
+};
+
+/// Writes properties, one at a time: each write reads files of the host, changes them and puts them back, and
+/// two at once would lose lines. Reads go on beside it. Any thread.
+class Writer {
+public:
+    /// All outlive the writer. @param refresh what to do after each write, before its event is told
+    Writer(Pool& pool, Facts& facts, Announcer& announcer, std::function<void()> refresh)
+        : pool_(pool), facts_(facts), announcer_(announcer), refresh_(std::move(refresh)) {}
+    Writer(const Writer&) = delete;
+    Writer& operator=(const Writer&) = delete;
+
+    /// @param node kept until the write is done. A write that hangs at its caller's deadline goes on, and no
+    ///             other one begins before its end.
+    /// Throws Problem (busy) when another write is at work until the deadline.
+    WriteResult write(const Handle& node, const Property& row, const IC::PropertyValue& value,
+                      const Request& request);
+
+private:
+    struct Job;
+    struct Pending;
+    class Turn;
+
+    WriteResult perform(const Job& job);
+    Reading readHere(const IC::MutableNode& node, unsigned int id);
+
+    Pool& pool_;
+    Facts& facts_;
+    Announcer& announcer_;
+    std::function<void()> refresh_;
+    std::mutex guard_;
+    std::condition_variable turnOver_;
+    bool busy_ = false;  // guarded by guard_
+};
+
+}  // namespace cvagent
