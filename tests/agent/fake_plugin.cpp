@@ -15,7 +15,12 @@
 //   alert                   a thread sends one alert
 //   early                   initialize sends one alert, before the agent has seen any node
 //   late                    unload sends one alert
+//   chatter                 the thread of churn reports an error each time
+//   foreignids              initialize numbers its nodes from 1, whatever the agent says
+// FAKE_PLUGIN_HOLD names a file: while it is there, what waits for it hangs.
 // FAKE_PLUGIN_DIARY names a file that gets a line for each write and for the unload.
+#include <unistd.h>
+
 #include <atomic>
 #include <chrono>
 #include <cstdlib>
@@ -51,8 +56,18 @@ void logError(const std::string& message) {
     CVLog::CVLogger::traceLevelMessage("fake", "fake_plugin", 1, component, 6000, nullptr, 0, 0, message);
 }
 
-/// 900 is slow, 901 fails and logs, 902 throws, 903 throws what is no exception; 115 writes with an error
-/// line, 116 does not write. Writing "throw" or "seven" throws.
+void waitWhileHeld() {
+    const char* file = std::getenv("FAKE_PLUGIN_HOLD");
+    while (file != nullptr && access(file, F_OK) == 0) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(1));
+    }
+}
+
+void appearBelow(unsigned int parent);
+
+/// 900 is slow, 901 fails and logs, 902 throws, 903 throws what is no exception, 904 hangs while it is held,
+/// 910 to 919 log an error of their own; 115 writes with an error line, 116 does not write, 74 makes a node.
+/// Writing "throw" or "seven" throws, writing "hold" hangs while it is held.
 class FakeNode : public IC::MutableNode {
 public:
     using MutableNode::MutableNode;
@@ -70,7 +85,14 @@ public:
                 throw std::runtime_error("thrown by the plug-in");
             case 903:
                 throw 7;
+            case 904:
+                waitWhileHeld();
+                out = PropertyValue(Number(++answers_), true);
+                return {};
             default:
+                if (id >= 910 && id < 920) {
+                    logError("read of " + std::to_string(id));
+                }
                 return MutableNode::getProperty(id, out);
         }
     }
@@ -85,6 +107,12 @@ public:
         if (value == PropertyValue("seven", true)) {
             throw 7;
         }
+        if (value == PropertyValue("hold", true)) {
+            waitWhileHeld();
+        }
+        if (id == 74) {
+            appearBelow(getNodeId());
+        }
         if (id == 115) {
             logError("the disk is nearly full");
         }
@@ -95,6 +123,9 @@ public:
     }
 
     static std::atomic<bool> ready;
+
+private:
+    mutable std::atomic<unsigned int> answers_{0};
 };
 std::atomic<bool> FakeNode::ready{false};
 
@@ -128,7 +159,9 @@ public:
     Error initialize(unsigned int miId, const Number& ownNodeId, const Number& firstNodeId) override {
         note("initialize " + std::to_string(miId) + " " + ownNodeId.toString() + " " +
              firstNodeId.toString());
-        const Error result = ManagementInterface::initialize(miId, ownNodeId, firstNodeId);
+        const Error result = told("foreignids")
+                                 ? ManagementInterface::initialize(miId, Number(1U), Number(2U))
+                                 : ManagementInterface::initialize(miId, ownNodeId, firstNodeId);
         if (told("throwstart")) {
             throw std::runtime_error("cannot start");
         }
@@ -185,6 +218,13 @@ public:
             throw 7;
         }
         return result;
+    }
+
+    /// As a writer makes nodes: the agent is not told.
+    void appear(unsigned int parent) {
+        auto* port = make(parent, 12, 2, "Network Port");
+        port->MutableNode::setProperty(108, PropertyValue("eth1", true));
+        appendNode(port);
     }
 
     /// What the exported builder makes: one processor.
@@ -253,6 +293,9 @@ private:
         while (running_) {
             FakeNode* drive = makeDrive("/dev/sdb");
             addNewNode(drive);
+            if (told("chatter")) {
+                logError("the monitor's own");
+            }
             std::this_thread::sleep_for(std::chrono::milliseconds(1));
             deleteNode(drive);
         }
@@ -280,6 +323,11 @@ private:
 };
 
 FakeInterface fakeInterface;
+
+void appearBelow(unsigned int parent) {
+    fakeInterface.appear(parent);
+}
+
 Error fakeError;
 
 }  // namespace

@@ -1,7 +1,12 @@
 add_library(fake_plugin MODULE agent/fake_plugin.cpp)
 target_link_libraries(fake_plugin PRIVATE corvista_framework corvista_options)
 
+# A second front end, to show what one costs.
+add_executable(tiny_front_end agent/tiny_front_end.cpp)
+target_link_libraries(tiny_front_end PRIVATE agent_core corvista_framework corvista_options)
+
 set(agent_test_programs
+  TINY_FRONT_END="$<TARGET_FILE:tiny_front_end>"
   CVAGENT_PROGRAM="$<TARGET_FILE:cvagent>"
   CORVISTA_PLUGIN_FILE="$<TARGET_FILE:vantrelcvicoshwmi>"
   FAKE_PLUGIN_FILE="$<TARGET_FILE:fake_plugin>"
@@ -9,6 +14,8 @@ set(agent_test_programs
 
 corvista_test(agent LIBRARIES agent_cli agent_core test_support util SOURCES
   agent/catalogue_test.cpp
+  agent/core_parts_test.cpp
+  agent/event_program_test.cpp
   agent/host_tools_test.cpp
   agent/json_test.cpp
   agent/print_test.cpp
@@ -17,16 +24,22 @@ corvista_test(agent LIBRARIES agent_cli agent_core test_support util SOURCES
   agent/surroundings_test.cpp
   agent/team_test.cpp
   agent/terminal.cpp
+  agent/tiny_front_end_test.cpp
   agent/tree_test.cpp
   agent/value_check_test.cpp
   agent/watch_command_test.cpp)
 target_compile_definitions(agent_test PRIVATE ${agent_test_programs})
-add_dependencies(agent_test cvagent fake_plugin vantrelcvicoshwmi)
+add_dependencies(agent_test cvagent fake_plugin tiny_front_end vantrelcvicoshwmi)
 
 corvista_test(agent_suse_host LIBRARIES test_support SOURCES
   agent/suse_host_test.cpp)
 target_compile_definitions(agent_suse_host_test PRIVATE ${agent_test_programs})
 add_dependencies(agent_suse_host_test cvagent vantrelcvicoshwmi)
+
+corvista_test(agent_core LIBRARIES agent_core test_support LABELS threads SOURCES
+  agent/agent_test.cpp)
+target_compile_definitions(agent_core_test PRIVATE ${agent_test_programs})
+add_dependencies(agent_core_test fake_plugin vantrelcvicoshwmi)
 
 corvista_test(agent_lifetime LIBRARIES agent_cli agent_core test_support LABELS threads SOURCES
   agent/lifetime_test.cpp)

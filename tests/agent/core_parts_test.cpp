@@ -1,0 +1,349 @@
+// What the agent is put together from, each part by itself.
+#include <gmock/gmock.h>
+#include <poll.h>
+
+#include <barrier>
+#include <latch>
+#include <thread>
+#include <type_traits>
+
+#include "agent/cli/failure.h"
+#include "agent/core/agent.h"
+#include "agent/core/announcer.h"
+#include "agent/core/operations.h"
+#include "tests/agent/node_list.h"
+
+namespace {
+
+using namespace std::chrono_literals;
+using cvagent::Agent;
+using cvagent::ErrorLines;
+using cvagent::ErrorScope;
+using cvagent::Event;
+using cvagent::EventLog;
+using cvagent::Facts;
+using cvagent::Handle;
+using cvagent::NodeRef;
+using cvagent::Pool;
+using cvagent::Problem;
+using cvagent::Reading;
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+// The rules of lifetime that a compiler can check: only the agent makes a NodeRef, there is no empty one, a
+// temporary one gives nothing away, and there is one agent behind all that refer to it.
+static_assert(!std::is_default_constructible_v<NodeRef>);
+static_assert(!std::is_constructible_v<NodeRef, Handle>);
+static_assert(!std::is_constructible_v<NodeRef, std::shared_ptr<void>, Handle>);
+static_assert(!std::is_convertible_v<NodeRef, Handle>);
+static_assert(std::is_copy_constructible_v<NodeRef> && std::is_nothrow_move_constructible_v<NodeRef>);
+static_assert(!std::is_copy_constructible_v<Agent> && !std::is_move_constructible_v<Agent>);
+template <class Reference>
+concept GivesItsNode = requires(Reference&& node) {
+    *std::forward<Reference>(node);
+};
+template <class Reference>
+concept PointsToItsNode = requires(Reference&& node) {
+    std::forward<Reference>(node).operator->();
+};
+static_assert(GivesItsNode<const NodeRef&> && PointsToItsNode<const NodeRef&>);
+static_assert(!GivesItsNode<NodeRef> && !PointsToItsNode<NodeRef>);
+static_assert(std::is_same_v<decltype(*std::declval<const NodeRef&>()), const IC::MutableNode&>);
+
+Event eventOf(Event::Kind kind, unsigned int node = 7) {
+    Event event;
+    event.kind = kind;
+    event.nodeId = node;
+    return event;
+}
+
+std::vector<std::uint64_t> numbersOf(const auto& events) {
+    std::vector<std::uint64_t> numbers;
+    for (const Event& event : events) {
+        numbers.push_back(event.number);
+    }
+    return numbers;
+}
+
+TEST(EventLog, NumbersEventsAndKeepsTheLastOnes) {
+    EventLog log(3);
+    for (int i = 0; i < 5; ++i) {
+        log.hear(eventOf(Event::Kind::alert));
+    }
+    EXPECT_EQ(log.last(), 5U);
+    EXPECT_THAT(numbersOf(log.since(0).events), ElementsAre(3, 4, 5));
+    EXPECT_EQ(log.since(0).missing, 2U);
+    EXPECT_EQ(log.since(1).missing, 1U);
+    EXPECT_EQ(log.since(2).missing, 0U);
+    EXPECT_THAT(numbersOf(log.since(4).events), ElementsAre(5));
+    EXPECT_THAT(log.since(5).events, IsEmpty());
+    EXPECT_EQ(log.since(99).missing, 0U);
+    EXPECT_THAT(log.since(99).events, IsEmpty());
+}
+
+TEST(EventLog, ASlowSubscriberLosesTheOldestAndIsToldHowMany) {
+    EventLog log;
+    const auto slow = log.subscribe(0, 2);
+    const auto quick = log.subscribe(0);
+    for (int i = 0; i < 5; ++i) {
+        log.hear(eventOf(Event::Kind::alert));
+    }
+    const auto taken = slow->take();
+    EXPECT_THAT(numbersOf(taken.events), ElementsAre(4, 5));
+    EXPECT_EQ(taken.dropped, 3U);
+    EXPECT_EQ(slow->take().dropped, 0U);
+    EXPECT_THAT(numbersOf(quick->take().events), ElementsAre(1, 2, 3, 4, 5));
+}
+
+TEST(EventLog, ASubscriberGetsWhatHasHappenedAndWhatComes) {
+    auto log = std::make_unique<EventLog>(2);
+    for (int i = 0; i < 3; ++i) {
+        log->hear(eventOf(Event::Kind::published));
+    }
+    const auto all = log->subscribe(0);
+    const auto later = log->subscribe(2);
+    const auto alerts = log->subscribe(0, 10, Event::Kind::alert);
+    log->hear(eventOf(Event::Kind::alert));
+    log.reset();  // the queues stay
+    const auto taken = all->take();
+    EXPECT_EQ(taken.dropped, 1U);
+    EXPECT_THAT(numbersOf(taken.events), ElementsAre(2, 3, 4));
+    EXPECT_THAT(numbersOf(later->take().events), ElementsAre(3, 4));
+    EXPECT_THAT(numbersOf(alerts->take().events), ElementsAre(4));
+}
+
+TEST(EventLog, TheDescriptorTellsWhenThereIsSomething) {
+    EventLog log;
+    const auto queue = log.subscribe(0);
+    pollfd ready{queue->descriptor(), POLLIN, 0};
+    EXPECT_EQ(poll(&ready, 1, 0), 0);
+    log.hear(eventOf(Event::Kind::alert));
+    EXPECT_EQ(poll(&ready, 1, 0), 1);
+    queue->take();
+    EXPECT_EQ(poll(&ready, 1, 0), 0);
+}
+
+TEST(ErrorLines, AreTheThreadsOwnersAndCounted) {
+    ErrorLines outer;
+    ErrorLines inner;
+    EXPECT_EQ(ErrorScope::owner(), nullptr);
+    {
+        const ErrorScope scope(outer);
+        {
+            const ErrorScope nested(inner);
+            EXPECT_EQ(ErrorScope::owner(), &inner);
+            std::thread([] { EXPECT_EQ(ErrorScope::owner(), nullptr); }).join();
+        }
+        EXPECT_EQ(ErrorScope::owner(), &outer);
+    }
+    EXPECT_EQ(ErrorScope::owner(), nullptr);
+    for (int i = 0; i < 62; ++i) {
+        outer.add(i < 2 ? "twice" : "error " + std::to_string(i));
+    }
+    const auto taken = outer.take();
+    EXPECT_EQ(taken.texts.size(), 50U);
+    EXPECT_EQ(taken.texts.front(), "twice (2 times)");
+    EXPECT_EQ(taken.lost, 11U);
+    EXPECT_THAT(outer.take().texts, IsEmpty());
+}
+
+/// Work that waits until it is let go.
+class Held {
+public:
+    void submitTo(Pool& pool, unsigned int lane, int count) {
+        for (int i = 0; i < count; ++i) {
+            pool.submit(lane, this, [this] {
+                ++begun;
+                go_.wait();
+            });
+        }
+    }
+    void waitFor(int count) const {
+        while (begun < count) {
+            std::this_thread::yield();
+        }
+    }
+    void release() { go_.count_down(); }
+    std::atomic<int> begun{0};
+
+private:
+    std::latch go_{1};
+};
+
+TEST(Pool, ALaneThatHangsLeavesTheOthersTheirThreads) {
+    Held stuck;
+    Pool pool(4, 2);
+    stuck.submitTo(pool, 7, 10);
+    stuck.waitFor(2);
+    std::latch done(1);
+    pool.submit(8, nullptr, [&done] { done.count_down(); });
+    done.wait();
+    EXPECT_EQ(stuck.begun, 2);
+    stuck.release();
+    stuck.waitFor(10);
+}
+
+TEST(Pool, WhatWasNotBegunCanBeTakenBack) {
+    Held stuck;
+    {
+        Pool pool(1, 1);
+        stuck.submitTo(pool, 7, 3);
+        stuck.waitFor(1);
+        pool.drop(&stuck);
+        std::latch done(1);
+        pool.submit(8, nullptr, [&done] { done.count_down(); });
+        stuck.release();
+        done.wait();
+    }
+    EXPECT_EQ(stuck.begun, 1);
+}
+
+TEST(Pool, MayBeEndedByItsOwnWork) {
+    auto pool = std::make_shared<Pool>(2, 2);
+    Pool& same = *pool;
+    std::latch done(1);
+    const std::shared_ptr<void> last(nullptr, [&done](void*) { done.count_down(); });
+    same.submit(1, nullptr, [held = std::move(pool), last] {});
+    const_cast<std::shared_ptr<void>&>(last).reset();
+    done.wait();
+}
+
+TEST(Facts, KeepTheLastValueOfWhatWasCutOff) {
+    IC::MutableNode node(7, 0, {1}, 40, 0);
+    Facts facts;
+    facts.meet(7);
+    EXPECT_TRUE(facts.known(node, 5).failed());
+    const auto begun = Facts::Clock::now();
+    Reading good{5, {}, IC::PropertyValue("old", true), {}};
+    facts.judge(node, good, begun);
+    EXPECT_EQ(good.asOf, begun);
+    EXPECT_FALSE(good.stale);
+    Reading cut{5, {}, {}, "timed out", false, true};
+    facts.judge(node, cut, Facts::Clock::now());
+    EXPECT_EQ(static_cast<std::string>(cut.value), "old");
+    EXPECT_TRUE(cut.stale);
+    EXPECT_EQ(cut.asOf, begun);
+    EXPECT_TRUE(facts.known(node, 5).stale);
+    EXPECT_FALSE(facts.known(node, 5).failed());
+    Reading again{5, {}, IC::PropertyValue("new", true), {}};
+    facts.judge(node, again, Facts::Clock::now());
+    EXPECT_EQ(static_cast<std::string>(facts.known(node, 5).value), "new");
+    EXPECT_FALSE(facts.known(node, 5).stale);
+}
+
+TEST(Facts, AnOlderAnswerThatComesLateChangesNothing) {
+    const IC::MutableNode node(7, 0, {1}, 40, 0);
+    Facts facts;
+    facts.meet(7);
+    const auto earlier = Facts::Clock::now();
+    Reading young{5, {}, IC::PropertyValue("young", true), {}};
+    facts.judge(node, young, earlier + 1s);
+    Reading old{5, {}, IC::PropertyValue("old", true), {}};
+    facts.judge(node, old, earlier);
+    EXPECT_EQ(static_cast<std::string>(facts.known(node, 5).value), "young");
+}
+
+TEST(Facts, WhatTheNodeStoresIsKnownFromTheStartOn) {
+    IC::MutableNode node(7, 0, {1}, 40, 0);
+    node.setProperty(5, IC::PropertyValue("stored", true));
+    Facts facts;
+    const auto before = Facts::Clock::now();
+    facts.meet(7);
+    EXPECT_EQ(static_cast<std::string>(facts.known(node, 5).value), "stored");
+    EXPECT_GE(facts.known(node, 5).asOf, before);
+    EXPECT_TRUE(facts.overdue(node, 5).stale);
+    EXPECT_EQ(static_cast<std::string>(facts.overdue(node, 5).value), "stored");
+    EXPECT_FALSE(facts.overdue(node, 6).stale);
+    facts.forget(7);
+    EXPECT_EQ(facts.known(node, 5).asOf, std::nullopt);
+}
+
+/// An interface as plug-ins build theirs.
+class Ports : public NodeList {
+public:
+    IC::MutableNode* addPort(const char* name) {
+        const Handle node = hold(add(12, 0));
+        node->MutableNode::setProperty(123, IC::PropertyValue(IC::Number(1U), true));
+        node->setPath(std::string("/network-port:") + name);
+        return node.get();
+    }
+};
+
+TEST(Announcer, TellsOfANodeOnceWhoeverSeesItFirst) {
+    Ports ports;
+    EventLog log;
+    Facts facts;
+    cvagent::Announcer announcer(log, facts);
+    ports.addPort("eth0");
+    announcer.takeStock(ports.holdAll());
+    announcer.announceNew(ports);
+    EXPECT_EQ(log.last(), 0U);
+    const IC::MutableNode* const made = ports.addPort("eth1");
+    announcer.announceNew(ports);
+    announcer.announceNew(ports);
+    announcer.hear(cvagent::nodeEvent(Event::Kind::published, *made));
+    ASSERT_EQ(log.last(), 1U);
+    EXPECT_EQ(log.since(0).events.front().path, "/network-port:eth1");
+    announcer.hear(cvagent::nodeEvent(Event::Kind::withdrawn, *made));
+    EXPECT_EQ(log.last(), 2U);
+}
+
+TEST(Announcer, AnAlertTellsTheStateBeforeAndAfter) {
+    Ports ports;
+    EventLog log;
+    Facts facts;
+    cvagent::Announcer announcer(log, facts);
+    ports.addPort("eth0");
+    announcer.takeStock(ports.holdAll());
+    for (const auto& [code, message] : std::vector<std::pair<unsigned int, std::string>>{
+             {12, "NIC is Offline "}, {1, "NIC is Online "}, {32, "NIC has Switched Over "}}) {
+        announcer.hear(
+            cvagent::alertEvent(IC::Alert(1, 0, {"/network-port:eth0"}, code, message), ports.holdAll()));
+    }
+    announcer.hear(
+        cvagent::alertEvent(IC::Alert(1, 0, {"/nowhere"}, 12, "NIC is Offline "), ports.holdAll()));
+    std::vector<std::string> changes;
+    for (const Event& event : log.since(0).events) {
+        changes.push_back(event.nodeClass + " " + event.propertyName + " " + event.before + " " +
+                          event.after);
+    }
+    EXPECT_THAT(changes, ElementsAre("network-port LinkState 1 12", "network-port LinkState 12 1",
+                                     "network-port LinkState 1 32", "   "));
+}
+
+TEST(Problems, HaveTheirExitStatusAndAdviceAtTheEdgeAlone) {
+    using cvagent::ExitStatus;
+    using cvagent::Failure;
+    const auto statusOf = [](Problem::Kind kind) { return Failure(Problem(kind, "x")).status(); };
+    EXPECT_EQ(statusOf(Problem::notFound), ExitStatus::notFound);
+    EXPECT_EQ(statusOf(Problem::ambiguous), ExitStatus::notFound);
+    EXPECT_EQ(statusOf(Problem::refused), ExitStatus::refused);
+    EXPECT_EQ(statusOf(Problem::busy), ExitStatus::busy);
+    EXPECT_EQ(statusOf(Problem::timedOut), ExitStatus::failed);
+    EXPECT_EQ(statusOf(Problem::failed), ExitStatus::failed);
+    const IC::MutableNode node(7, 0, {1}, 40, 0);
+    try {
+        cvagent::writableRow(node, "NoSuch");
+        FAIL();
+    } catch (const Problem& problem) {
+        EXPECT_STREQ(problem.what(), "a computer has no property 'NoSuch'");
+        EXPECT_STREQ(Failure(problem).what(),
+                     "a computer has no property 'NoSuch'; see: cvagent properties computer");
+    }
+}
+
+TEST(Catalogue, ATableThatCollidesIsRefused) {
+    static constexpr cvagent::NodeClass kSameNumber[] = {
+        {cvagent::NodeType::computer, "sensor", cvagent::NodeClass::Naming::single, 0}};
+    static constexpr cvagent::NodeClass kSameName[] = {
+        {cvagent::NodeType{301}, "computer", cvagent::NodeClass::Naming::single, 0}};
+    static constexpr cvagent::Property kSameProperty[] = {
+        {cvagent::NodeType::computer, 108, "Other", cvagent::Kind::text, cvagent::Unit::none, {}, ""}};
+    const std::size_t before = cvagent::nodeClasses().size();
+    EXPECT_THROW(cvagent::addToCatalogue({"a", kSameNumber, {}, {}}), std::logic_error);
+    EXPECT_THROW(cvagent::addToCatalogue({"a", kSameName, {}, {}}), std::logic_error);
+    EXPECT_THROW(cvagent::addToCatalogue({"a", {}, {kSameProperty}, {}}), std::logic_error);
+    EXPECT_EQ(cvagent::nodeClasses().size(), before);
+}
+
+}  // namespace

@@ -1,0 +1,117 @@
+// watch --exec: the administrator's program on each alert; and several plug-ins on the command line.
+#include <gmock/gmock.h>
+#include <signal.h>
+
+#include <nlohmann/json.hpp>
+#include <sstream>
+
+#include "tests/agent/cvagent_run.h"
+#include "tests/agent/hostile_host.h"
+
+namespace {
+
+using testing::HasSubstr;
+using testing::Not;
+using Json = nlohmann::ordered_json;
+
+constexpr const char* kProgram = "/opt/on-alert";
+
+/// The program, with what it does before it ends.
+void install(FakeHost& host, const std::string& script) {
+    host.file(kProgram, "#!/bin/sh\n" + script, 0755);
+}
+
+HOST_TEST(EventProgram, GetsTheEventAsJson) {
+    install(host, "pwd > /var/where\ncat > /var/event\necho printed\n");
+    const Finished run =
+        CvagentRun(host).telling("alert churn")({"watch", "--for", "0.5", "--exec", kProgram});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_EQ(host.read("/var/where"), "/\n");
+    const Json event = Json::parse(*host.read("/var/event"));
+    EXPECT_EQ(event["event"], "alert");
+    EXPECT_EQ(event["message"], "NIC is Offline ");
+    EXPECT_EQ(event["class"], "network-port");
+    EXPECT_EQ(event["property"].dump(), R"({"id":123,"name":"LinkState","before":"12","after":"12"})");
+    EXPECT_GT(event["number"], 0);
+    EXPECT_THAT(run.err, HasSubstr("printed\n"));
+    EXPECT_THAT(run.out, Not(HasSubstr("printed")));
+}
+
+HOST_TEST(EventProgram, HasDefaultSignalsAndOnlyTheStandardDescriptors) {
+    install(host,
+            "exec 3>&- 4>&-\nls /proc/self/fd > /var/descriptors\n"
+            "grep -E '^Sig(Blk|Ign)' /proc/self/status > /var/signals\n");
+    const Finished run = host.run({"sh", "-c", [&] {
+                                       std::string line = "trap '' INT USR1; exec";
+                                       CvagentRun cvagent(host);
+                                       for (const std::string& word : cvagent.telling("early").commandLine(
+                                                {"watch", "--for", "0", "--exec", kProgram})) {
+                                           line += " '" + word + "'";
+                                       }
+                                       return line;
+                                   }()});
+    EXPECT_EQ(run.status, 0) << run.err;
+    EXPECT_EQ(host.read("/var/descriptors"), "0\n1\n2\n3\n");  // 3 is the listed directory
+    std::istringstream signals(*host.read("/var/signals"));
+    std::string blocked;
+    std::string ignored;
+    signals >> blocked >> blocked >> ignored >> ignored;
+    EXPECT_EQ(blocked, "0000000000000000");
+    constexpr unsigned long long kLibrarysOwn = 0x180000000;  // posix_spawn of glibc leaves them ignored
+    EXPECT_EQ(std::stoull(ignored, nullptr, 16) & ~kLibrarysOwn, 0U);
+}
+
+HOST_TEST(EventProgram, ThatFailsIsToldAndStopsNothing) {
+    install(host, "exit 3\n");
+    const Finished run = CvagentRun(host).telling("early late")({"watch", "--for", "0", "--exec", kProgram});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.err, HasSubstr("cvagent: '/opt/on-alert' for event 1 failed with status 3\n"));
+    EXPECT_THAT(run.err, HasSubstr("cvagent: '/opt/on-alert' for event 2 failed with status 3\n"));
+}
+
+HOST_TEST(EventProgram, ThatIsNoneIsWrongUsage) {
+    const Finished run = CvagentRun(host)({"watch", "--for", "0", "--exec", "/nowhere"});
+    EXPECT_EQ(run.status, 2);
+    EXPECT_THAT(run.err, HasSubstr("cannot run '/nowhere': No such file or directory"));
+    host.file("/opt/text", "no program\n", 0755);
+    const Finished text = CvagentRun(host).telling("early")({"watch", "--for", "0", "--exec", "/opt/text"});
+    EXPECT_EQ(text.status, 0);
+    EXPECT_THAT(text.err, HasSubstr("cannot run '/opt/text' for event 1: Exec format error"));
+}
+
+HOST_TEST(EventProgram, ThatHangsIsKilledWithItsDescendants) {
+    install(host, "trap '' TERM\nsleep 1000 &\n(sleep 1001 &)\necho $$ > /var/process\nsleep 1002\n");
+    const Finished run = CvagentRun(host).telling("early late")(
+        {"watch", "--for", "0.3", "--exec", kProgram, "--exec-timeout", "0.2"});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.err, HasSubstr("for event 1 took too long and was ended\n"));
+    EXPECT_THAT(run.err, HasSubstr("for event 2 took too long and was ended\n"));
+    EXPECT_TRUE(eventually([&] { return !isRunning(host, "sleep"); }));
+}
+
+HOST_TEST(EventProgram, ASignalEndsItAtOnce) {
+    install(host, "sleep 1000\n");
+    CvagentRun cvagent(host);
+    RunningProgram watch = cvagent.telling("early").start({"watch", "--exec", kProgram});
+    ASSERT_TRUE(watch.waitForOutput("NIC is Offline"));
+    watch.signal(SIGTERM);
+    const Finished run = watch.wait(std::chrono::seconds(10));
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(cvagent.diary(), testing::EndsWith("unload\n"));
+}
+
+HOST_TEST(SeveralPlugins, MakeOneTreeAndOneThatFailsIsTold) {
+    CvagentRun cvagent(host);
+    const Finished both = cvagent({"--plugin", CORVISTA_PLUGIN_FILE, "tree", "--json"});
+    EXPECT_EQ(both.status, 0) << both.err;
+    const Json tree = Json::parse(both.out);
+    EXPECT_EQ(tree["plugin"], FAKE_PLUGIN_FILE);
+    EXPECT_EQ(tree["plugins"].size(), 2U);
+    const Finished one = cvagent({"--plugin", "/nowhere.so", "get", "computer", "HostName"});
+    EXPECT_EQ(one.status, 1);
+    EXPECT_THAT(one.out, HasSubstr("HostName  fake\n"));
+    EXPECT_EQ(one.err,
+              "cvagent: there is no plug-in file '/nowhere.so'; name the right one with --plugin FILE\n");
+}
+
+}  // namespace
