@@ -8,6 +8,12 @@
 
 namespace cvagent {
 
+namespace {
+
+constexpr std::chrono::seconds kPatience{10};  // a hung command is ended by then
+
+}  // namespace
+
 /// In the order in which things are made; what comes later uses what comes before.
 struct Agent::Engine {
     explicit Engine(const AgentSettings& settings);
@@ -70,7 +76,9 @@ void Agent::Engine::refresh() {
 
 Agent::Agent(const AgentSettings& settings) : engine_(std::make_shared<Engine>(settings)) {}
 
-Agent::~Agent() = default;
+Agent::~Agent() {
+    engine_->pool.settle(kPatience);
+}
 
 const std::vector<Agent::FailedPlugin>& Agent::failedPlugins() const {
     return engine_->failed;

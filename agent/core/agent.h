@@ -40,7 +40,8 @@ public:
     explicit Agent(const AgentSettings& settings);
     Agent(const Agent&) = delete;
     Agent& operator=(const Agent&) = delete;
-    /// The plug-ins are stopped when the last NodeRef has gone, too.
+    /// Waits a while for calls whose callers have gone. The plug-ins are stopped when the last NodeRef has
+    /// gone, too; a call that hangs for ever has one, and a program that has such a call ends by _exit.
     ~Agent();
 
     struct FailedPlugin {

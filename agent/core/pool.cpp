@@ -34,6 +34,7 @@ struct Pool::State {
     std::size_t perLane = 0;
     std::mutex guard;  // guards everything below
     std::condition_variable changed;
+    std::condition_variable done;  // some work is
     bool stopped = false;
     std::deque<Work> queue;
     std::map<unsigned int, std::size_t> running;  // by lane
@@ -52,6 +53,7 @@ struct Pool::State {
             running.erase(lane);
         }
         changed.notify_all();  // work of that lane may go on
+        done.notify_all();
     }
     void serve();
 };
@@ -126,6 +128,12 @@ void Pool::drop(const void* batch) {
     const auto first = std::stable_partition(state_->queue.begin(), state_->queue.end(), isKept);
     dropped.assign(std::make_move_iterator(first), std::make_move_iterator(state_->queue.end()));
     state_->queue.erase(first, state_->queue.end());
+}
+
+bool Pool::settle(std::chrono::milliseconds longest) {
+    std::unique_lock lock(state_->guard);
+    return state_->done.wait_for(lock, longest,
+                                 [this] { return state_->queue.empty() && state_->running.empty(); });
 }
 
 }  // namespace cvagent

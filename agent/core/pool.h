@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <functional>
 #include <memory>
 
@@ -24,6 +25,9 @@ public:
     void submit(unsigned int lane, const void* batch, std::function<void()> work);
     /// Takes out the batch's work that was not begun.
     void drop(const void* batch);
+    /// Waits until nothing is left to do.
+    /// @return false when some work takes longer
+    bool settle(std::chrono::milliseconds longest);
 
 private:
     struct State;

@@ -198,6 +198,17 @@ TEST(Pool, WhatWasNotBegunCanBeTakenBack) {
     EXPECT_EQ(stuck.begun, 1);
 }
 
+TEST(Pool, TellsWhenAllIsDone) {
+    Held stuck;
+    Pool pool(1, 1);
+    EXPECT_TRUE(pool.settle(0ms));
+    stuck.submitTo(pool, 7, 2);
+    EXPECT_FALSE(pool.settle(1ms));
+    stuck.release();
+    EXPECT_TRUE(pool.settle(10s));
+    EXPECT_EQ(stuck.begun, 2);
+}
+
 TEST(Pool, MayBeEndedByItsOwnWork) {
     auto pool = std::make_shared<Pool>(2, 2);
     Pool& same = *pool;
