@@ -285,10 +285,10 @@ constexpr int kRounds = 20;  // each takes four times as long
 constexpr int kRounds = 100;
 #endif
 
-/// CORVISTA_ROUNDS asks for more rounds. The file is long, so that what a writer holds of it is soon not what
+/// CORVISTA_TEST_ROUNDS asks for more rounds. The file is long, so that what a writer holds of it is soon not what
 /// stands there.
 HOST_TEST(AgentWrites, TwoWritersOfOneFileLoseNothing) {
-    const char* const asked = std::getenv("CORVISTA_ROUNDS");
+    const char* const asked = std::getenv("CORVISTA_TEST_ROUNDS");
     const int rounds = asked != nullptr ? std::atoi(asked) : kRounds;
     SuseHost suse(host);
     std::string before = suse.read(SuseHost::kInterfaceFile);
