@@ -9,6 +9,12 @@ namespace cvagent {
 
 namespace {
 
+void hint(const std::string& text, const std::string& advice = "") {
+    if (!text.empty()) {
+        complain(text + advice);
+    }
+}
+
 void show(ErrorLines& errors) {
     const ErrorLines::Taken taken = errors.take();
     for (const std::string& text : taken.texts) {
@@ -24,8 +30,8 @@ void show(ErrorLines& errors) {
 
 Session::Session(const Options& options) : data_(std::make_shared<DataDirectory>()) {
     quiet_ = std::make_unique<QuietCommands>();
-    hintAtRoot(*data_);
-    hintAtReadOnly(*data_);
+    hint(hintAtRoot(*data_), "\nTo see everything run: sudo cvagent");
+    hint(hintAtReadOnly(*data_));
     prepareSurroundings();
     if (options.hostTools != HostTools::native) {
         putAdaptersFirst(inspectHostTools(options.hostTools, Look::adapters, adapterDirectory()),
@@ -51,7 +57,7 @@ void Session::start(const Options& options) {
         complain(Failure(failed.problem).what());
         pluginMissing_ = true;
     }
-    hintAtTemporaryFiles();
+    hint(hintAtTemporaryFiles());
 }
 
 AgentSettings Session::settings(const Options& options) const {

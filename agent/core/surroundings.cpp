@@ -11,8 +11,8 @@
 #include <cstdlib>
 #include <cstring>
 
-#include "agent/cli/failure.h"
-#include "agent/cli/print.h"
+#include "agent/core/problem.h"
+#include "agent/core/text.h"
 #include "framework/qx/corvista_utilities.h"
 
 namespace cvagent {
@@ -60,9 +60,9 @@ std::string userDirectory() {
 }
 
 [[noreturn]] void failToOpen(const std::string& path, int error) {
-    throw Failure(ExitStatus::failed, "cannot use the data directory " + inQuotes(path) + ": " +
-                                          std::strerror(error) + "\nRun as root, or name another one with " +
-                                          kDataVariable + "=DIRECTORY");
+    throw Problem(Problem::failed, "cannot use the data directory " + inQuotes(path) + ": " +
+                                       std::strerror(error) + "\nRun as root, or name another one with " +
+                                       kDataVariable + "=DIRECTORY");
 }
 
 }  // namespace
@@ -85,13 +85,14 @@ void prepareSurroundings() {
 DataDirectory::DataDirectory() {
     const char* chosen = std::getenv(kDataVariable);
     if (chosen != nullptr && *chosen == '\0') {
-        throw Failure(ExitStatus::usage,
-                      std::string(kDataVariable) + " is empty; set it to a directory or unset it");
+        throw Problem(Problem::refused,
+                      std::string(kDataVariable) + " is empty; set it to a directory or unset it",
+                      Problem::environment);
     }
     path_ = chosen == nullptr && geteuid() != 0 ? userDirectory() : standardDirectory();
     if (path_.empty()) {
-        throw Failure(ExitStatus::failed, std::string("there is no place for data; set ") + kDataVariable +
-                                              "=DIRECTORY or run as root");
+        throw Problem(Problem::failed, std::string("there is no place for data; set ") + kDataVariable +
+                                           "=DIRECTORY or run as root");
     }
     if (chosen == nullptr && geteuid() != 0) {
         setenv(kDataVariable, path_.c_str(), 1);
@@ -106,9 +107,9 @@ DataDirectory::DataDirectory() {
         if (error != EWOULDBLOCK) {
             failToOpen(path_, error);
         }
-        throw Failure(ExitStatus::busy, "another agent holds the data directory " + inQuotes(path_) +
-                                            "\nStop it first, or give this one a directory of its own with " +
-                                            kDataVariable + "=DIRECTORY");
+        throw Problem(Problem::busy, "another agent holds the data directory " + inQuotes(path_) +
+                                         "\nStop it first, or give this one a directory of its own with " +
+                                         kDataVariable + "=DIRECTORY");
     }
 }
 
@@ -160,28 +161,29 @@ int temporaryFileProblem() {
 
 }  // namespace
 
-void hintAtReadOnly(const DataDirectory& data) {
-    if (access(data.path().c_str(), W_OK) != 0) {
-        complain("cannot write to the data directory " + inQuotes(data.path()) + ": " + std::strerror(errno) +
-                 "; the owner's data cannot be changed, and a change of a link is told again and again");
+std::string hintAtReadOnly(const DataDirectory& data) {
+    if (access(data.path().c_str(), W_OK) == 0) {
+        return {};
     }
+    return "cannot write to the data directory " + inQuotes(data.path()) + ": " + std::strerror(errno) +
+           "; the owner's data cannot be changed, and a change of a link is told again and again";
 }
 
-void hintAtTemporaryFiles() {
-    if (const int error = temporaryFileProblem(); error != 0) {
-        complain(std::string("cannot write to /tmp: ") + std::strerror(error) +
-                 "; drives, partitions and network ports can be missing");
-    }
+std::string hintAtTemporaryFiles() {
+    const int error = temporaryFileProblem();
+    return error == 0 ? std::string()
+                      : std::string("cannot write to /tmp: ") + std::strerror(error) +
+                            "; drives, partitions and network ports can be missing";
 }
 
-void hintAtRoot(const DataDirectory& data) {
+std::string hintAtRoot(const DataDirectory& data) {
     if (geteuid() == 0) {
-        return;
+        return {};
     }
-    complain(
-        "without root some facts will be missing: partition tables of disks, Wake-on-LAN of network ports, "
-        "files that only root reads. Nothing of the host can be changed. Data is kept in " +
-        data.path() + "\nTo see everything run: sudo cvagent");
+    return "without root some facts will be missing: partition tables of disks, Wake-on-LAN of network "
+           "ports, "
+           "files that only root reads. Nothing of the host can be changed. Data is kept in " +
+           data.path();
 }
 
 }  // namespace cvagent

@@ -8,7 +8,7 @@ namespace cvagent {
 /// directories behind what is there, children that can be waited for.
 void prepareSurroundings();
 
-/// The agent's data directory, made (mode 0700) and locked for this process. Throws Failure (busy) when
+/// The agent's data directory, made (mode 0700) and locked for this process. Throws Problem (busy) when
 /// another agent holds it.
 class DataDirectory {
 public:
@@ -39,14 +39,16 @@ public:
 /// Where the program's own messages go.
 int messageDescriptor();
 
-/// Without root: tells on standard error what will be missing. With root nothing.
-void hintAtRoot(const DataDirectory& data);
+// What the user is told of the surroundings; "" when there is nothing to tell.
 
-/// Tells on standard error what does not work when nothing can be written to the data directory.
-void hintAtReadOnly(const DataDirectory& data);
+/// What will be missing without root.
+std::string hintAtRoot(const DataDirectory& data);
 
-/// Tells on standard error what is missing when nothing can be written to /tmp, where the plug-in's commands
-/// keep their listings. To be asked after a start: a listing can be what has filled it.
-void hintAtTemporaryFiles();
+/// What does not work when nothing can be written to the data directory.
+std::string hintAtReadOnly(const DataDirectory& data);
+
+/// What is missing when nothing can be written to /tmp, where the plug-in's commands keep their listings. To
+/// be asked after a start: a listing can be what has filled it.
+std::string hintAtTemporaryFiles();
 
 }  // namespace cvagent
