@@ -1,6 +1,5 @@
 #include "agent/cli/session.h"
 
-#include "agent/cli/failure.h"
 #include "agent/core/host_tools.h"
 #include "agent/core/signals.h"
 #include "agent/core/surroundings.h"

@@ -2,6 +2,7 @@
 
 #include <memory>
 
+#include "agent/cli/failure.h"
 #include "agent/cli/options.h"
 #include "agent/cli/print.h"
 #include "agent/core/agent.h"

@@ -64,7 +64,7 @@ std::optional<IC::PropertyValue> Facts::note(unsigned int node, unsigned int id,
         return std::nullopt;
     }
     const auto [fact, isNew] = facts_.try_emplace({node, id});
-    const auto before = isNew ? std::nullopt : std::optional(fact->second.value);
+    auto before = isNew ? std::nullopt : std::optional(fact->second.value);
     fact->second = {value, Clock::now(), false};
     return before;
 }

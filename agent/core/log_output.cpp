@@ -133,11 +133,11 @@ private:
 LogOutput::LogOutput(const LogSettings& settings, std::shared_ptr<ErrorLines> unowned)
     : log_(std::make_unique<Sink>(settings.file, settings.descriptor, settings.lowest)) {
     log_->keepErrors(std::move(unowned), settings);
-    CVLog::CVLogger::setLog(log_.get(), log_->threshold());
     if (settings.traceFile) {
         trace_ = std::make_unique<Sink>(settings.traceFile, -1, 0);
         CVLog::CVLogger::setTrace(trace_.get(), 0);
     }
+    CVLog::CVLogger::setLog(log_.get(), log_->threshold());  // nothing can fail any more
 }
 
 LogOutput::~LogOutput() {
