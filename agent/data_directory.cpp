@@ -50,7 +50,7 @@ public:
                 step(reached_ + "/" + name);
             }
         }
-        judge(reached_ + "/", look(reached_ + "/"), true);
+        judge(reached_.empty() ? "/" : reached_, look(reached_ + "/"), true);
         return reached_ + "/";
     }
 
@@ -117,8 +117,9 @@ private:
     }
     [[noreturn]] void refuse(const std::string& place, const std::string& reason) const {
         throw Failure(ExitStatus::failed,
-                      "the data directory " + inQuotes(whole_) + " is not safe: " + inQuotes(place) + " " + reason +
-                          "\nMake all of the way to it yours or root's and writable by nobody else" + otherwise_);
+                      "the data directory " + inQuotes(whole_) + " is not safe: " + inQuotes(place) + " " +
+                          reason + "\nMake all of the way to it yours or root's and writable by nobody else" +
+                          otherwise_);
     }
 
     std::string otherwise_;
@@ -181,8 +182,8 @@ void HeldDirectory::hold(const std::string& otherwise) const {
     if (error != EWOULDBLOCK) {
         failWith(error);
     }
-    throw Failure(ExitStatus::busy,
-                  "another agent holds the data directory " + inQuotes(path_) + "\nStop it first" + otherwise);
+    throw Failure(ExitStatus::busy, "another agent holds the data directory " + inQuotes(path_) +
+                                        "\nStop it first" + otherwise);
 }
 
 HeldDirectory::~HeldDirectory() {
@@ -206,11 +207,12 @@ DataDirectory::DataDirectory() {
     // Root is held to the standard directory anyway, for the settings that are saved there.
     const bool hasChoice = chosen != nullptr || isUsers;
     try {
-        own_.emplace(path, hasChoice ? std::string(", or name another one with ") + kDataVariable + "=DIRECTORY" : "");
+        own_.emplace(
+            path, hasChoice ? std::string(", or name another one with ") + kDataVariable + "=DIRECTORY" : "");
     } catch (const std::system_error& error) {
-        throw Failure(ExitStatus::failed, "cannot use the data directory " + inQuotes(path) + ": " +
-                                              error.code().message() + "\nRun as root, or name another one with " +
-                                              kDataVariable + "=DIRECTORY");
+        throw Failure(ExitStatus::failed,
+                      "cannot use the data directory " + inQuotes(path) + ": " + error.code().message() +
+                          "\nRun as root, or name another one with " + kDataVariable + "=DIRECTORY");
     }
     if (hasChoice) {
         setenv(kDataVariable, own_->path().c_str(), 1);
@@ -229,7 +231,8 @@ void DataDirectory::holdSettings() {
         return;
     }
     try {
-        settings_.emplace(kSettings, std::string("; settings of interfaces are saved there whatever ") + kDataVariable + " is");
+        settings_.emplace(kSettings, std::string("; settings of interfaces are saved there whatever ") +
+                                         kDataVariable + " is");
     } catch (const std::system_error&) {
         // Where it cannot be made, no agent saves or removes anything.
     }

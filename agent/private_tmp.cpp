@@ -24,7 +24,8 @@ constexpr const char* kContent = "mode=1777,size=32m";
 /// What stays reachable: names relative to /tmp and what lies there now, so too.
 using Places = std::map<std::string, std::string>;
 
-/// The last mount at a directory is the one in sight. A unit's own /tmp is a directory of the host's, mounted.
+/// The last mount at a directory is the one in sight. A unit's own /tmp is a directory of the host's,
+/// mounted.
 bool isPrivateAlready(const std::string& tmp) {
     std::ifstream table("/proc/self/mountinfo");
     std::string root;
@@ -50,7 +51,8 @@ void keep(Places& places, const fs::path& tmp, const fs::path& path) {
         return;
     }
     for (const fs::path& name : {path, target}) {
-        const fs::path stays = fs::is_directory(target) || name.parent_path() == tmp ? name : name.parent_path();
+        const fs::path stays =
+            fs::is_directory(target) || name.parent_path() == tmp ? name : name.parent_path();
         const fs::path source = fs::canonical(stays, missing);
         if (const std::string place = below(tmp, stays); !place.empty() && !missing) {
             places[place] = below(tmp, source).empty() ? source.string() : below(tmp, source);
@@ -95,6 +97,20 @@ bool leaveTheMountsOfTheHost() {
     return unshare(CLONE_NEWNS) == 0 && mount(nullptr, "/", nullptr, MS_REC | MS_SLAVE, nullptr) == 0;
 }
 
+/// Covers /tmp with an empty one that holds the places; when one of them fails, it is taken away again.
+void cover(const std::string& tmp, const Places& places) {
+    const int covered = open(tmp.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC);  // of our own mounts by now
+    if (covered < 0) {
+        return;
+    }
+    if (mount("cvagent", tmp.c_str(), "tmpfs", MS_NOSUID | MS_NODEV, kContent) == 0 &&
+        (fchdir(covered) != 0 || !bindAll(places, tmp))) {
+        umount2(tmp.c_str(), MNT_DETACH);
+    }
+    close(covered);
+    [[maybe_unused]] const int done = chdir("/");
+}
+
 }  // namespace
 
 void makeTmpPrivate(const std::vector<std::string>& kept) {
@@ -107,18 +123,9 @@ void makeTmpPrivate(const std::vector<std::string>& kept) {
     for (const std::string& path : kept) {
         keep(places, tmp, path);
     }
-    const int covered = open(tmp.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC);
-    if (covered < 0) {
-        return;
+    if (leaveTheMountsOfTheHost()) {
+        cover(tmp, places);
     }
-    if (leaveTheMountsOfTheHost() &&
-        mount("cvagent", tmp.c_str(), "tmpfs", MS_NOSUID | MS_NODEV, kContent) == 0) {
-        if (fchdir(covered) != 0 || !bindAll(places, tmp)) {
-            umount2(tmp.c_str(), MNT_DETACH);
-        }
-        [[maybe_unused]] const int done = chdir("/");
-    }
-    close(covered);
 }
 
 }  // namespace cvagent

@@ -26,23 +26,28 @@ constexpr const char* kDataVariable = "CORVISTA_DATA_DIR";
 
 std::atomic<int> keptStandardError{STDERR_FILENO};
 
-/// The file as it is named from the directory the program was started in. The way to it is resolved, so that
-/// the name holds wherever the links on it lie.
-std::string fromHere(const std::string& file) {
+/// The path as it is meant in the directory the program was started in.
+fs::path fromHere(const std::string& path) {
     std::error_code error;
-    const fs::path whole = fs::absolute(file, error);
+    fs::path whole = fs::absolute(path, error);
     if (error) {
         throw Failure(ExitStatus::failed, "cannot tell the current directory (" + error.message() +
-                                              "); give the whole path of " + inQuotes(file));
+                                              "); give the whole path of " + inQuotes(path));
     }
-    const fs::path directory = fs::canonical(whole.parent_path(), error);
-    return error ? whole.string() : (directory / whole.filename()).string();
+    return whole;
+}
+
+/// So that the name holds wherever the links on the way to the file lie.
+std::string withoutLinks(const fs::path& file) {
+    std::error_code error;
+    const fs::path directory = fs::canonical(file.parent_path(), error);
+    return error ? file : directory / file.filename();
 }
 
 void resolveNames(Options& options) {
     for (std::optional<std::string>* file : {&options.plugin, &options.logFile, &options.traceFile}) {
         if (*file && !(*file)->empty()) {
-            *file = fromHere(**file);
+            *file = withoutLinks(fromHere(**file));
         }
     }
     const char* data = std::getenv(kDataVariable);
@@ -80,7 +85,8 @@ void prepareSurroundings(Options& options) {
     umask(S_IWGRP | S_IWOTH);
     resolveNames(options);
     if (chdir("/") != 0) {
-        throw Failure(ExitStatus::failed, std::string("cannot enter the directory '/': ") + std::strerror(errno));
+        throw Failure(ExitStatus::failed,
+                      std::string("cannot enter the directory '/': ") + std::strerror(errno));
     }
     forbidCoreDumps();
     Style::detect();  // before the locale goes
