@@ -129,16 +129,20 @@ private:
     int links_ = 0;
 };
 
-/// @return a descriptor; -1 with errno, EROFS when there is no lock file and none can be made
+/// @return a descriptor; -1 where there is no lock file and none can be made, for nothing can be written
 int openLock(const std::string& path) {
     constexpr int kAlways = O_NOFOLLOW | O_CLOEXEC | O_NONBLOCK | O_NOCTTY;
-    const int lock = open(path.c_str(), O_RDWR | O_CREAT | kAlways, 0600);
-    if (lock >= 0 || errno != EROFS) {
-        return lock;
+    int lock = open(path.c_str(), O_RDWR | O_CREAT | kAlways, 0600);
+    if (lock < 0 && errno == EROFS) {
+        lock = open(path.c_str(), O_RDONLY | kAlways);
+        if (lock < 0 && errno == ENOENT) {
+            return -1;
+        }
     }
-    const int old = open(path.c_str(), O_RDONLY | kAlways);
-    errno = old < 0 && errno == ENOENT ? EROFS : errno;
-    return old;
+    if (lock < 0) {
+        failWith(errno);
+    }
+    return lock;
 }
 
 std::string standardDirectory() {
@@ -160,9 +164,6 @@ std::string userDirectory() {
 
 HeldDirectory::HeldDirectory(const std::string& path, const std::string& otherwise)
     : path_(Way(path, otherwise).walk()), lock_(openLock(path_ + kLockFile)) {
-    if (lock_ < 0 && errno != EROFS) {
-        failWith(errno);
-    }
     if (lock_ >= 0) {
         hold(otherwise);
     }

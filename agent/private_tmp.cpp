@@ -52,7 +52,7 @@ void keep(Places& places, const fs::path& tmp, const fs::path& path) {
     }
     for (const fs::path& name : {path, target}) {
         const fs::path stays =
-            fs::is_directory(target) || name.parent_path() == tmp ? name : name.parent_path();
+            fs::is_directory(target, missing) || name.parent_path() == tmp ? name : name.parent_path();
         const fs::path source = fs::canonical(stays, missing);
         if (const std::string place = below(tmp, stays); !place.empty() && !missing) {
             places[place] = below(tmp, source).empty() ? source.string() : below(tmp, source);
@@ -83,7 +83,8 @@ bool bindAll(const Places& places, const std::string& tmp) {
             continue;  // came with the directory above it
         }
         const std::string target = tmp + "/" + place;
-        if (!makeMountPoint(target, fs::is_directory(source)) ||
+        std::error_code missing;
+        if (!makeMountPoint(target, fs::is_directory(source, missing)) ||
             mount(source.c_str(), target.c_str(), nullptr, MS_BIND | MS_REC, nullptr) != 0) {
             return false;
         }

@@ -2,11 +2,14 @@
 // descriptors.
 #include <gmock/gmock.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
+#include <cstdlib>
 #include <filesystem>
 #include <set>
 #include <sstream>
 
+#include "agent/environment.h"
 #include "tests/agent/cvagent_run.h"
 #include "tests/agent/from_directory.h"
 #include "tests/agent/suse_host.h"
@@ -143,6 +146,23 @@ HOST_TEST(CallersPath, LeadsRootToNoProgramOfAStranger) {
     EXPECT_EQ(run.status, 0) << run.err;
     EXPECT_EQ(told(host), "/tools:/usr/bin:/usr/local/sbin:/usr/sbin:/sbin:/bin\n");
     EXPECT_FALSE(host.exists("/var/attacked"));
+}
+
+// With the machine's own users, for a fake host has only one. In a child, whose environment nobody misses.
+TEST(CallersPathOfUsers, LeadsRootToNoDirectoryOfSomebodyElse) {
+    if (geteuid() != 0) {
+        GTEST_SKIP() << "needs somebody else";
+    }
+    const std::string way = "/tmp/cvagent-path-" + std::to_string(getpid());
+    std::filesystem::create_directories(way + "/bin");
+    ASSERT_EQ(chown(way.c_str(), 65533, 65533), 0);
+    const auto reduced = [&way] {
+        setenv("PATH", (way + "/bin:" + way + ":/usr/bin").c_str(), 1);
+        cvagent::reduceEnvironment();
+        _exit(std::string(std::getenv("PATH")) == "/usr/bin:/usr/local/sbin:/usr/sbin:/sbin:/bin" ? 0 : 1);
+    };
+    EXPECT_EXIT(reduced(), testing::ExitedWithCode(0), "");
+    std::filesystem::remove_all(way);
 }
 
 HOST_TEST(CallersMask, OpensAndClosesNothing) {
