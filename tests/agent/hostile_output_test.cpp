@@ -56,7 +56,8 @@ HOST_TEST(HugeOutput, OfAListingIsReadAsFarAsASaneOneGoes) {
 HOST_TEST(HugeOutput, ThatFillsTmpIsNoLayout) {
     SuseHost suse(host);
     host.tool("fdisk -ls", ToolAnswer{.out = "", .action = std::string("yes 'no disk'") + kGigabyte});
-    ASSERT_EQ(mount("small", "/tmp", "tmpfs", MS_NOSUID | MS_NODEV, "size=256k"), 0);
+    host.mountOver("/tmp",
+                   [] { ASSERT_EQ(mount("small", "/tmp", "tmpfs", MS_NOSUID | MS_NODEV, "size=256k"), 0); });
     const std::vector<std::string> words = suse.commandLine({"tree"});
     for (const bool isOwnTmp : {false, true}) {
         const Finished run = host.run(isOwnTmp ? words : withoutMounts(host, words));

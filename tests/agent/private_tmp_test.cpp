@@ -117,22 +117,11 @@ HOST_TEST(PrivateTmp, SeesTheMountsThatTheHostMakesLater) {
     EXPECT_THAT(host.read("/proc/self/mountinfo").value_or(""), Not(HasSubstr("- tmpfs cvagent ")));
 }
 
-/// A checkout may lie below /tmp itself; what is mounted there must not hide it.
-void keepTheBuild(FakeHost& host, const std::string& tmp) {
-    if (buildDirectory().starts_with("/tmp/")) {
-        const std::string first = buildDirectory().substr(4, buildDirectory().find('/', 5) - 4);
-        host.directory(tmp + first);
-        ASSERT_EQ(mount(("/tmp" + first).c_str(), (tmp + first).c_str(), nullptr, MS_BIND | MS_REC, nullptr),
-                  0);
-    }
-}
-
 HOST_TEST(PrivateTmp, OfAUnitIsPrivateEnough) {
     SuseHost suse(host);
     const std::string tmp = "/var/tmp/systemd-private-0123-cvagent.service-abc/tmp";
     host.directory(tmp, 01777);
-    keepTheBuild(host, tmp);
-    ASSERT_EQ(mount(tmp.c_str(), "/tmp", nullptr, MS_BIND | MS_REC, nullptr), 0);
+    host.mountOver("/tmp", [&] { ASSERT_EQ(mount(tmp.c_str(), "/tmp", nullptr, MS_BIND, nullptr), 0); });
     host.tool("hostname", ToolAnswer{.out = "linux\n", .action = "> /tmp/mine"});
     EXPECT_EQ(suse.run({"tree"}).status, 0);
     EXPECT_THAT(host.listDirectory("/tmp"), ElementsAre("mine"));
