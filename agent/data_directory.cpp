@@ -22,7 +22,6 @@ namespace {
 
 namespace fs = std::filesystem;
 
-constexpr const char* kDataVariable = "CORVISTA_DATA_DIR";
 constexpr const char* kSettings = "/opt/vantrel/corvista/data";
 constexpr const char* kLockFile = ".lock";
 constexpr mode_t kWritableByOthers = S_IWGRP | S_IWOTH;

@@ -5,6 +5,9 @@
 
 namespace cvagent {
 
+/// Names another data directory.
+inline constexpr const char* kDataVariable = "CORVISTA_DATA_DIR";
+
 /// A directory held by a lock file in it that only its owner can open. The directory belongs to the caller,
 /// the way to it to the caller or to root, and nobody else can write there; what is missing is made, the last
 /// directory with mode 0700. Where nothing can be written (EROFS) there is nothing to hold.

@@ -22,8 +22,6 @@ namespace {
 
 namespace fs = std::filesystem;
 
-constexpr const char* kDataVariable = "CORVISTA_DATA_DIR";
-
 std::atomic<int> keptStandardError{STDERR_FILENO};
 
 /// The path as it is meant in the directory the program was started in.
@@ -75,7 +73,7 @@ void openStandardDescriptors() {
         if (opened < 0) {
             opened = open("/", O_RDONLY | O_DIRECTORY);
         }
-    } while (opened >= 0 && opened <= STDERR_FILENO);
+    } while (opened >= 0 && opened < STDERR_FILENO);
     if (opened > STDERR_FILENO) {
         close(opened);
     }
