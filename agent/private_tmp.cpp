@@ -82,7 +82,7 @@ bool bindAll(const Places& places, const std::string& tmp) {
                         [&wanted](const std::string& above) { return wanted.starts_with(above + "/"); })) {
             continue;  // came with the directory above it
         }
-        const std::string target = tmp + "/" + place;
+        const std::string target = fs::path(tmp) / place;
         std::error_code missing;
         if (!makeMountPoint(target, fs::is_directory(source, missing)) ||
             mount(source.c_str(), target.c_str(), nullptr, MS_BIND | MS_REC, nullptr) != 0) {
