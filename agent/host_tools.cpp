@@ -60,7 +60,7 @@ bool isProgram(const std::string& path) {
 /// The first program of that name on PATH.
 std::string findOnPath(const std::string& name) {
     for (const std::string& directory : directoriesOnPath()) {
-        std::string candidate = directory + "/" + name;
+        std::string candidate = fs::path(directory) / name;
         if (!directory.empty() && isProgram(candidate)) {
             return candidate;
         }
