@@ -4,6 +4,7 @@
 #include "agent/commands/commands.h"
 #include "agent/print.h"
 #include "agent/signals.h"
+#include "agent/surroundings.h"
 
 namespace {
 
@@ -29,8 +30,9 @@ ExitStatus run(const Options& options) {
     return ExitStatus::usage;
 }
 
-int runGuarded(const Options& options) {
+int runGuarded(Options& options) {
     try {
+        cvagent::prepareSurroundings(options);
         return static_cast<int>(run(options));
     } catch (const cvagent::Failure& failure) {
         if (*failure.what() != '\0') {
@@ -48,7 +50,8 @@ int runGuarded(const Options& options) {
 }  // namespace
 
 int main(int count, char** words) {
+    cvagent::openStandardDescriptors();
     int status = 0;
-    const auto options = cvagent::parseCommandLine(count, words, status);
+    auto options = cvagent::parseCommandLine(count, words, status);
     return options ? runGuarded(*options) : status;
 }

@@ -7,8 +7,8 @@
 
 namespace cvagent {
 
-/// The plug-in beside this program: in its build tree or where it was installed. The library's bare name when
-/// it is at neither place.
+/// The plug-in beside this program: in its build tree or where it was installed. Throws Failure when it is at
+/// neither place; nowhere else is it looked for.
 std::string pluginBesideProgram();
 
 /// A loaded and initialized plug-in. It knows the plug-in by OpenMI and by the exported builder of processor
@@ -16,6 +16,7 @@ std::string pluginBesideProgram();
 class Plugin {
 public:
     /// Loads the library, hands over the callbacks, initializes it, gives every node its path.
+    /// @param file its path; one without a slash would be looked for at the loader's own places
     /// @param listener hears of alerts, published and withdrawn nodes; null for none. Outlives the object.
     /// Throws Failure, with a text of its own for each way in which a file can be no plug-in.
     Plugin(const std::string& file, Listener* listener);

@@ -4,7 +4,6 @@
 #include "agent/host_tools.h"
 #include "agent/json.h"
 #include "agent/print.h"
-#include "agent/surroundings.h"
 
 namespace cvagent::commands {
 
@@ -60,7 +59,6 @@ std::string table(const std::vector<ToolReport>& reports, const Style& style) {
 
 ExitStatus doctor(const Options& options) {
     const Style style = Style::detect();
-    prepareSurroundings();
     const std::vector<ToolReport> reports =
         inspectHostTools(options.hostTools, Look::everything, adapterDirectory());
     print(options.json ? json::tools(reports) : table(reports, style));

@@ -1,5 +1,5 @@
 // A plug-in small enough to know all of: a tree of a few nodes, properties that are slow, failing or
-// throwing, and threads that publish, withdraw and alert. FAKE_PLUGIN, a list of words, tells it what to do
+// throwing, and threads that publish, withdraw and alert. CORVISTA_FAKE_PLUGIN, a list of words, tells it what to do
 // besides:
 //   fail, null, throw       OpenMI returns 7, hands out nothing, throws
 //   throwseven              OpenMI throws what is no exception
@@ -15,7 +15,7 @@
 //   alert                   a thread sends one alert
 //   early                   initialize sends one alert, before the agent has seen any node
 //   late                    unload sends one alert
-// FAKE_PLUGIN_DIARY names a file that gets a line for each write and for the unload.
+// CORVISTA_FAKE_PLUGIN_DIARY names a file that gets a line for each write and for the unload.
 #include <atomic>
 #include <chrono>
 #include <cstdlib>
@@ -35,12 +35,12 @@ using IC::Number;
 using IC::PropertyValue;
 
 bool told(const std::string& word) {
-    const char* words = std::getenv("FAKE_PLUGIN");
+    const char* words = std::getenv("CORVISTA_FAKE_PLUGIN");
     return words != nullptr && (" " + std::string(words) + " ").find(" " + word + " ") != std::string::npos;
 }
 
 void note(const std::string& line) {
-    if (const char* file = std::getenv("FAKE_PLUGIN_DIARY")) {
+    if (const char* file = std::getenv("CORVISTA_FAKE_PLUGIN_DIARY")) {
         std::ofstream(file, std::ios::app) << line << std::endl;
     }
 }
