@@ -44,7 +44,10 @@ void useRealTools(FakeHost& host) {
     host.useKernelNetwork();
     host.directory("/opt/vantrel/corvista/data");
     // The adapters stand where an agent would put them: first on the path.
-    const std::string path = buildDirectory() + "/hosttools/bin:" + std::getenv("PATH");
+    std::string path = std::getenv("PATH");
+    for (const char* tool : {"fdisk", "ifconfig", "route"}) {
+        path = buildDirectory() + "/hosttools/adapters/" + tool + ":" + path;
+    }
     setenv("PATH", path.c_str(), 1);
 }
 

@@ -2,7 +2,6 @@
 
 #include <CLI/CLI.hpp>
 #include <cmath>
-#include <filesystem>
 #include <iostream>
 
 #include "agent/cli/failure.h"
@@ -189,9 +188,6 @@ std::optional<Options> parseCommandLine(int count, const char* const* words, int
     try {
         app.parse(marked(count, words));
         unmark(options);
-        if (!options.program.empty()) {
-            options.program = std::filesystem::absolute(options.program);
-        }
         return options;
     } catch (const CLI::Success& help) {
         status = app.exit(help);

@@ -29,6 +29,8 @@ std::string adviceOn(const Problem& problem) {
             return "; see: cvagent tree";
         case Problem::property:
             return "; see: cvagent properties " + problem.nodeClass();
+        case Problem::pluginSearch:
+            return "; name the plug-in with --plugin FILE";
         case Problem::pluginFile:
             return "; name the right one with --plugin FILE";
         case Problem::pluginLoad:

@@ -5,6 +5,7 @@
 #include "agent/cli/print.h"
 #include "agent/cli/session.h"
 #include "agent/core/signals.h"
+#include "agent/core/surroundings.h"
 
 namespace {
 
@@ -49,8 +50,24 @@ int endWith(const cvagent::Failure& failure) {
     return static_cast<int>(failure.status());
 }
 
-int runGuarded(const Options& options) {
+/// Files that the command line names; they are meant from where the program was started.
+std::vector<std::string*> filesIn(Options& options) {
+    std::vector<std::string*> files{&options.program};
+    for (std::string& plugin : options.plugins) {
+        files.push_back(&plugin);
+    }
+    for (std::optional<std::string>* file : {&options.logFile, &options.traceFile}) {
+        if (*file) {
+            files.push_back(&**file);
+        }
+    }
+    return files;
+}
+
+int runGuarded(Options& options) {
     try {
+        cvagent::Style::detect();  // before the locale goes
+        cvagent::prepareSurroundings(filesIn(options));
         return static_cast<int>(run(options));
     } catch (const cvagent::Failure& failure) {
         return endWith(failure);
@@ -67,7 +84,8 @@ int runGuarded(const Options& options) {
 }  // namespace
 
 int main(int count, char** words) {
+    cvagent::openStandardDescriptors();
     int status = 0;
-    const auto options = cvagent::parseCommandLine(count, words, status);
+    auto options = cvagent::parseCommandLine(count, words, status);
     return options ? runGuarded(*options) : status;
 }

@@ -123,15 +123,20 @@ bool isUtf8Locale() {
     return false;
 }
 
-}  // namespace
-
-Style Style::detect() {
+Style look() {
     const char* noColour = std::getenv("NO_COLOR");
     const char* terminal = std::getenv("TERM");
     const bool dumb = terminal == nullptr || std::strcmp(terminal, "dumb") == 0;
     Style style;
     style.colour = isatty(STDOUT_FILENO) == 1 && !dumb && (noColour == nullptr || *noColour == '\0');
     style.lines = isUtf8Locale();
+    return style;
+}
+
+}  // namespace
+
+const Style& Style::detect() {
+    static const Style style = look();
     return style;
 }
 

@@ -13,8 +13,8 @@ struct Style {
     bool colour = false;
     bool lines = false;  ///< line-drawing characters; else ASCII
 
-    /// Looks at standard output and the locale the program was started with.
-    static Style detect();
+    /// Looks at standard output and at the locale, which the first call must find as the program was started.
+    static const Style& detect();
     std::string strong(const std::string& text) const { return paint(text, "1"); }
     std::string faint(const std::string& text) const { return paint(text, "2"); }
     std::string bad(const std::string& text) const { return paint(text, "31"); }

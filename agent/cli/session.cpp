@@ -1,6 +1,11 @@
 #include "agent/cli/session.h"
 
+#include <filesystem>
+
+#include "agent/core/environment.h"
 #include "agent/core/host_tools.h"
+#include "agent/core/private_tmp.h"
+#include "agent/core/program_path.h"
 #include "agent/core/signals.h"
 #include "agent/core/surroundings.h"
 
@@ -27,18 +32,17 @@ void show(ErrorLines& errors) {
 
 }  // namespace
 
-Session::Session(const Options& options) : data_(std::make_shared<DataDirectory>()) {
-    quiet_ = std::make_unique<QuietCommands>();
+Session::Session(const Options& options) {
+    AgentSettings settings = settingsOf(options);
     hint(hintAtRoot(*data_), "\nTo see everything run: sudo cvagent");
     hint(hintAtReadOnly(*data_));
-    prepareSurroundings();
+    makeTmpPrivate(ownPlaces(options, settings));
     if (options.hostTools != HostTools::native) {
-        putAdaptersFirst(inspectHostTools(options.hostTools, Look::adapters, adapterDirectory()),
-                         data_->path() + "host-tools");
+        putAdaptersFirst(inspectHostTools(options.hostTools, Look::adapters, adapterDirectory()));
     }
     StopSignals::install();
     try {
-        start(options);
+        start(settings);
     } catch (const Problem&) {
         show(*errors_);
         throw;
@@ -50,8 +54,8 @@ Session::~Session() {
     end();
 }
 
-void Session::start(const Options& options) {
-    agent_ = std::make_unique<Agent>(settings(options));
+void Session::start(const AgentSettings& settings) {
+    agent_ = std::make_unique<Agent>(settings);
     for (const Agent::FailedPlugin& failed : agent_->failedPlugins()) {
         complain(Failure(failed.problem).what());
         pluginMissing_ = true;
@@ -59,24 +63,37 @@ void Session::start(const Options& options) {
     hint(hintAtTemporaryFiles());
 }
 
-AgentSettings Session::settings(const Options& options) const {
+/// The log is opened here, before /tmp becomes another one.
+AgentSettings Session::settingsOf(const Options& options) {
     const bool live = options.command == Command::watch || options.logLevel;
     AgentSettings settings;
     settings.plugins = options.plugins;
     if (settings.plugins.empty()) {
         settings.plugins.push_back(pluginBesideProgram());
     }
-    settings.log = {options.logFile,
-                    options.traceFile,
-                    options.logLevel.value_or(kErrorLevel),
-                    live ? messageDescriptor() : -1,
-                    live,
-                    live && !options.logLevel};
+    data_ = std::make_shared<DataDirectory>();
+    quiet_ = std::make_unique<QuietCommands>();
+    const LogSettings log{options.logFile,
+                          options.traceFile,
+                          options.logLevel.value_or(kErrorLevel),
+                          live ? messageDescriptor() : -1,
+                          live,
+                          live && !options.logLevel};
+    settings.log = std::make_shared<LogOutput>(log, errors_);
     settings.commandTime = std::chrono::duration<double>(options.commandSeconds);
     settings.data = data_;
     settings.tell = complain;
-    settings.errors = errors_;
     return settings;
+}
+
+/// What the agent needs of the /tmp that everybody sees, should it lie there.
+std::vector<std::string> Session::ownPlaces(const Options& options, const AgentSettings& settings) const {
+    std::vector<std::string> places = directoriesOnPath();
+    const std::filesystem::path adapters = adapterDirectory().value_or("");
+    places.insert(places.end(), settings.plugins.begin(), settings.plugins.end());
+    places.insert(places.end(), {options.program, programDirectory(), data_->path(), adapters.parent_path(),
+                                 options.logFile.value_or(""), options.traceFile.value_or("")});
+    return places;
 }
 
 void Session::end() {

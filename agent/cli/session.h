@@ -26,14 +26,12 @@ public:
     void end();
     /// What the command's own status comes to when a plug-in is missing.
     ExitStatus statusAfter(ExitStatus own) const;
-    /// What the terminal could show before the process was prepared.
-    const Style& style() const { return style_; }
 
 private:
-    AgentSettings settings(const Options& options) const;
-    void start(const Options& options);
+    AgentSettings settingsOf(const Options& options);
+    std::vector<std::string> ownPlaces(const Options& options, const AgentSettings& settings) const;
+    void start(const AgentSettings& settings);
 
-    Style style_ = Style::detect();
     std::shared_ptr<DataDirectory> data_;
     std::shared_ptr<ErrorLines> errors_ = std::make_shared<ErrorLines>();
     std::unique_ptr<QuietCommands> quiet_;

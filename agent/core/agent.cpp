@@ -24,7 +24,7 @@ struct Agent::Engine {
 
     std::shared_ptr<DataDirectory> data;
     Tell tell;
-    LogOutput log;
+    std::shared_ptr<LogOutput> log;
     CommandDeadline deadline;
     EventLog events;
     Facts facts;
@@ -39,7 +39,8 @@ struct Agent::Engine {
 Agent::Engine::Engine(const AgentSettings& settings)
     : data(settings.data ? settings.data : std::make_shared<DataDirectory>()),
       tell(settings.tell),
-      log(settings.log, settings.errors ? settings.errors : std::make_shared<ErrorLines>()),
+      log(settings.log ? settings.log
+                       : std::make_shared<LogOutput>(LogSettings(), std::make_shared<ErrorLines>())),
       deadline(settings.commandTime, settings.tell) {
     for (const std::string& file : settings.plugins) {
         load(file);

@@ -19,15 +19,14 @@ namespace cvagent {
 /// What an agent is made of.
 struct AgentSettings {
     std::vector<std::string> plugins;  ///< files; each brings its nodes into the one tree
-    LogSettings log;
+    /// Opened before; null: the plug-ins' lines go nowhere.
+    std::shared_ptr<LogOutput> log;
     /// How long a command of a plug-in may take, in a write ten times as long; 0 for ever.
     std::chrono::duration<double> commandTime{10};
-    /// Held by the agent from now on; null: it takes the one of this process's surroundings.
+    /// Null: the agent takes the one of this process's surroundings.
     std::shared_ptr<DataDirectory> data;
     /// Hears of what belongs to no call. Any thread.
     Tell tell = tellNobody;
-    /// Errors of plug-ins that belong to no call: start, monitors, stop. Null: the agent makes its own.
-    std::shared_ptr<ErrorLines> errors;
 };
 
 /// Plug-ins at work: the one agent behind every front end. It owns data directory, log, deadline of commands,

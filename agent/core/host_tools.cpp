@@ -7,6 +7,7 @@
 #include <filesystem>
 #include <string_view>
 
+#include "agent/core/environment.h"
 #include "agent/core/probe.h"
 #include "agent/core/program_path.h"
 
@@ -58,15 +59,11 @@ bool isProgram(const std::string& path) {
 
 /// The first program of that name on PATH.
 std::string findOnPath(const std::string& name) {
-    const char* variable = std::getenv("PATH");
-    const std::string path = variable != nullptr ? variable : "";
-    for (std::size_t start = 0; start <= path.size();) {
-        const std::size_t end = std::min(path.find(':', start), path.size());
-        std::string candidate = path.substr(start, end - start) + "/" + name;
-        if (end > start && isProgram(candidate)) {
+    for (const std::string& directory : directoriesOnPath()) {
+        std::string candidate = fs::path(directory) / name;
+        if (!directory.empty() && isProgram(candidate)) {
             return candidate;
         }
-        start = end + 1;
     }
     return {};
 }
@@ -74,7 +71,7 @@ std::string findOnPath(const std::string& name) {
 ToolReport lookFor(const Tool& tool, const std::optional<std::string>& adapters) {
     ToolReport report{tool.name, tool.package, tool.purpose, findOnPath(tool.name), true, {}, false};
     if (adapters && tool.classic != nullptr) {
-        const std::string adapter = *adapters + "/" + tool.name;
+        const std::string adapter = *adapters + "/" + tool.name + "/" + tool.name;
         report.adapter = isProgram(adapter) ? adapter : "";
     }
     return report;
@@ -94,23 +91,11 @@ void probeFormats(std::vector<ToolReport>& reports) {
     }
 }
 
-/// A directory that holds links to these adapters and nothing else.
-void makeLinks(const std::vector<ToolReport>& reports, const std::string& directory) {
-    std::error_code error;
-    fs::remove_all(directory, error);
-    fs::create_directories(directory, error);
-    for (const ToolReport& report : reports) {
-        if (report.useAdapter) {
-            fs::create_symlink(report.adapter, directory + "/" + report.tool, error);
-        }
-    }
-}
-
 }  // namespace
 
 std::optional<std::string> adapterDirectory() {
-    const auto built = besideProgram({"../hosttools"}, "bin");
-    return built ? built : besideProgram({"../lib/corvista"}, "hosttools");
+    const auto built = besideProgram({"../hosttools"}, "adapters");
+    return built ? built : besideProgram({"../lib/corvista"}, "adapters");
 }
 
 std::vector<ToolReport> inspectHostTools(HostTools choice, Look look,
@@ -132,22 +117,15 @@ std::vector<ToolReport> inspectHostTools(HostTools choice, Look look,
     return reports;
 }
 
-void putAdaptersFirst(const std::vector<ToolReport>& reports, const std::string& linkDirectory) {
-    const auto used = [](const ToolReport& report) { return report.useAdapter; };
-    const auto unwanted = [](const ToolReport& report) {
-        return !report.useAdapter && !report.adapter.empty();
-    };
-    const auto first = std::find_if(reports.begin(), reports.end(), used);
-    if (first == reports.end()) {
-        return;
+void putAdaptersFirst(const std::vector<ToolReport>& reports) {
+    std::string path;
+    for (const ToolReport& report : reports) {
+        if (report.useAdapter) {
+            path += fs::path(report.adapter).parent_path().string() + ":";
+        }
     }
-    std::string directory = fs::path(first->adapter).parent_path();
-    if (std::any_of(reports.begin(), reports.end(), unwanted)) {
-        directory = linkDirectory;
-        makeLinks(reports, directory);
-    }
-    const char* path = std::getenv("PATH");
-    setenv("PATH", (directory + ":" + (path != nullptr ? path : "")).c_str(), 1);
+    const char* hosts = std::getenv("PATH");
+    setenv("PATH", (path + (hosts != nullptr ? hosts : "")).c_str(), 1);
 }
 
 }  // namespace cvagent

@@ -34,11 +34,11 @@ enum class Look { adapters, everything };
 std::vector<ToolReport> inspectHostTools(HostTools choice, Look look,
                                          const std::optional<std::string>& adapters);
 
-/// Puts the adapters that are to be used in front of PATH.
-/// @param linkDirectory where links to some of the adapters are put when not all of them are used
-void putAdaptersFirst(const std::vector<ToolReport>& reports, const std::string& linkDirectory);
+/// Puts the directories of the adapters that are to be used in front of PATH.
+void putAdaptersFirst(const std::vector<ToolReport>& reports);
 
-/// Where the adapters are, in the build tree or installed; nothing when they are not.
+/// Where the adapters are, in the build tree or installed, each in a directory of its own name; nothing when
+/// they are not.
 std::optional<std::string> adapterDirectory();
 
 }  // namespace cvagent

@@ -47,7 +47,15 @@ void guarded(const std::string& what, const Call& call) {
 }  // namespace
 
 std::string pluginBesideProgram() {
-    return besideProgram({"..", "../" CORVISTA_LIBDIR, "../lib"}, kLibrary).value_or(kLibrary);
+    const auto found = besideProgram({"../" CORVISTA_LIBDIR, "../lib"}, kLibrary);
+    if (!found) {
+        const std::string directory = programDirectory();
+        fail(directory.empty() ? "cannot tell where this program lies, for there is no /proc"
+                               : std::string("there is no ") + kLibrary +
+                                     " beside this program, which lies in " + inQuotes(directory),
+             Problem::pluginSearch);
+    }
+    return *found;
 }
 
 void tellNobody(const std::string& /*text*/) {}
@@ -74,9 +82,7 @@ void Plugin::load() {
     if (!std::filesystem::exists(file_, ignored)) {
         fail("there is no plug-in file " + inQuotes(file_), Problem::pluginFile);
     }
-    // Without a slash the loader would look at its own places.
-    const std::string path = file_.find('/') == std::string::npos ? "./" + file_ : file_;
-    library_ = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
+    library_ = dlopen(file_.c_str(), RTLD_NOW | RTLD_LOCAL);
     if (library_ == nullptr) {
         const char* reason = dlerror();
         fail("cannot load the plug-in " + inQuotes(file_) + ": " +

@@ -10,8 +10,8 @@
 
 namespace cvagent {
 
-/// The plug-in beside this program: in its build tree or where it was installed. The library's bare name when
-/// it is at neither place.
+/// The plug-in beside this program: in its build tree or where it was installed. Throws Failure when it is at
+/// neither place; nowhere else is it looked for.
 std::string pluginBesideProgram();
 
 /// Hears of what belongs to no call: a message for whoever looks after the agent.
@@ -23,6 +23,7 @@ void tellNobody(const std::string& text);
 class Plugin {
 public:
     /// Loads the library, hands over the callbacks, initializes it, gives every node its path.
+    /// @param file its path; one without a slash would be looked for at the loader's own places
     /// @param listener hears of alerts, published and withdrawn nodes; null for none. Outlives the object.
     /// @param tell     hears of a stop that went wrong
     /// Throws Problem, with a text of its own for each way in which a file can be no plug-in.

@@ -18,7 +18,17 @@ public:
         failed,     ///< the plug-in or the host failed
     };
     /// What a front end can give advice on.
-    enum Subject { none, node, property, pluginFile, pluginLoad, pluginEntry, logFile, environment };
+    enum Subject {
+        none,
+        node,
+        property,
+        pluginSearch,
+        pluginFile,
+        pluginLoad,
+        pluginEntry,
+        logFile,
+        environment
+    };
 
     Problem(Kind kind, const std::string& text, Subject subject = none, std::string nodeClass = {})
         : std::runtime_error(text), kind_(kind), subject_(subject), nodeClass_(std::move(nodeClass)) {}

@@ -1,7 +1,7 @@
 #include "agent/core/surroundings.h"
 
 #include <fcntl.h>
-#include <sys/file.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -10,111 +10,87 @@
 #include <csignal>
 #include <cstdlib>
 #include <cstring>
+#include <filesystem>
 
+#include "agent/core/environment.h"
 #include "agent/core/problem.h"
 #include "agent/core/text.h"
-#include "framework/qx/corvista_utilities.h"
 
 namespace cvagent {
 
 namespace {
 
-constexpr const char* kDataVariable = "CORVISTA_DATA_DIR";
+namespace fs = std::filesystem;
 
 std::atomic<int> keptStandardError{STDERR_FILENO};
 
-bool hasDirectory(const std::string& path, const std::string& directory) {
-    return (":" + path + ":").find(":" + directory + ":") != std::string::npos;
+/// The path as it is meant in the directory the program was started in.
+fs::path fromHere(const std::string& path) {
+    std::error_code error;
+    fs::path whole = fs::absolute(path, error);
+    if (error) {
+        throw Problem(Problem::failed, "cannot tell the current directory (" + error.message() +
+                                           "); give the whole path of " + inQuotes(path));
+    }
+    return whole;
 }
 
-/// Makes a directory and those above it; only the last one is kept from other users.
-bool makeDirectory(const std::string& path) {
-    for (std::size_t slash = path.find('/', 1); slash != std::string::npos;
-         slash = path.find('/', slash + 1)) {
-        const bool isLast = slash + 1 == path.size();
-        if (mkdir(path.substr(0, slash).c_str(), isLast ? 0700 : 0755) != 0 && errno != EEXIST) {
-            return false;
+/// So that the name holds wherever the links on the way to the file lie.
+std::string withoutLinks(const fs::path& file) {
+    std::error_code error;
+    const fs::path directory = fs::canonical(file.parent_path(), error);
+    return error ? file : directory / file.filename();
+}
+
+void resolveNames(const std::vector<std::string*>& files) {
+    for (std::string* file : files) {
+        if (!file->empty()) {
+            *file = withoutLinks(fromHere(*file));
         }
     }
-    return true;
-}
-
-/// @return a descriptor, or -1 with errno
-int openDirectory(const std::string& path) {
-    return makeDirectory(path) ? open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC) : -1;
-}
-
-std::string standardDirectory() {
-    const char* path = QX::CorvistaUtilities::getMoraineDataDir();
-    return path != nullptr ? path : "";
-}
-
-/// Where a user who may not write to the standard place keeps the data; "" when there is no home.
-std::string userDirectory() {
-    const char* state = std::getenv("XDG_STATE_HOME");
-    const char* home = std::getenv("HOME");
-    if (state != nullptr && *state == '/') {
-        return std::string(state) + "/corvista/data/";
+    const char* data = std::getenv(kDataVariable);
+    if (data != nullptr && *data != '\0') {
+        setenv(kDataVariable, fromHere(data).c_str(), 1);
     }
-    return home != nullptr && *home == '/' ? std::string(home) + "/.local/state/corvista/data/" : "";
 }
 
-[[noreturn]] void failToOpen(const std::string& path, int error) {
-    throw Problem(Problem::failed, "cannot use the data directory " + inQuotes(path) + ": " +
-                                       std::strerror(error) + "\nRun as root, or name another one with " +
-                                       kDataVariable + "=DIRECTORY");
+/// The memory may hold what is nobody's business. Only the soft limit: a service that a command restarts can
+/// have its own again.
+void forbidCoreDumps() {
+    rlimit limit{};
+    if (getrlimit(RLIMIT_CORE, &limit) == 0) {
+        limit.rlim_cur = 0;
+        setrlimit(RLIMIT_CORE, &limit);
+    }
 }
 
 }  // namespace
 
-void prepareSurroundings() {
-    setenv("LC_ALL", "C", 1);
-    const char* variable = std::getenv("PATH");
-    std::string path = variable != nullptr ? variable : "";
-    for (const char* directory : {"/usr/local/sbin", "/usr/sbin", "/sbin", "/usr/bin", "/bin"}) {
-        if (!hasDirectory(path, directory)) {
-            path += (path.empty() ? "" : ":") + std::string(directory);
+void openStandardDescriptors() {
+    int opened = -1;
+    do {
+        opened = open("/dev/null", O_RDWR);
+        if (opened < 0) {
+            opened = open("/", O_RDONLY | O_DIRECTORY);
         }
+    } while (opened >= 0 && opened < STDERR_FILENO);
+    if (opened > STDERR_FILENO) {
+        close(opened);
     }
-    setenv("PATH", path.c_str(), 1);
+}
+
+void prepareSurroundings(const std::vector<std::string*>& files) {
+    umask(S_IWGRP | S_IWOTH);
+    resolveNames(files);
+    if (chdir("/") != 0) {
+        throw Problem(Problem::failed,
+                      std::string("cannot enter the directory '/': ") + std::strerror(errno));
+    }
+    forbidCoreDumps();
+    reduceEnvironment();
     struct sigaction standard {};
     standard.sa_handler = SIG_DFL;
     sigaction(SIGCHLD, &standard, nullptr);
-}
-
-DataDirectory::DataDirectory() {
-    const char* chosen = std::getenv(kDataVariable);
-    if (chosen != nullptr && *chosen == '\0') {
-        throw Problem(Problem::refused,
-                      std::string(kDataVariable) + " is empty; set it to a directory or unset it",
-                      Problem::environment);
-    }
-    path_ = chosen == nullptr && geteuid() != 0 ? userDirectory() : standardDirectory();
-    if (path_.empty()) {
-        throw Problem(Problem::failed, std::string("there is no place for data; set ") + kDataVariable +
-                                           "=DIRECTORY or run as root");
-    }
-    if (chosen == nullptr && geteuid() != 0) {
-        setenv(kDataVariable, path_.c_str(), 1);
-    }
-    descriptor_ = openDirectory(path_);
-    if (descriptor_ < 0) {
-        failToOpen(path_, errno);
-    }
-    if (flock(descriptor_, LOCK_EX | LOCK_NB) != 0) {
-        const int error = errno;
-        close(descriptor_);
-        if (error != EWOULDBLOCK) {
-            failToOpen(path_, error);
-        }
-        throw Problem(Problem::busy, "another agent holds the data directory " + inQuotes(path_) +
-                                         "\nStop it first, or give this one a directory of its own with " +
-                                         kDataVariable + "=DIRECTORY");
-    }
-}
-
-DataDirectory::~DataDirectory() {
-    close(descriptor_);  // the lock goes with it
 }
 
 QuietCommands::QuietCommands() {

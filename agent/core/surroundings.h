@@ -1,29 +1,23 @@
 #pragma once
 
 #include <string>
+#include <vector>
+
+#include "agent/core/data_directory.h"
 
 namespace cvagent {
 
-/// Gives the process what the plug-in's commands need: tools that speak English, a PATH with the sbin
-/// directories behind what is there, children that can be waited for.
-void prepareSurroundings();
+/// Opens the descriptors 0 to 2 that the program was started without (to /dev/null): the next file opened
+/// would be taken for one of them. To be called before anything else.
+void openStandardDescriptors();
 
-/// The agent's data directory, made (mode 0700) and locked for this process. Throws Problem (busy) when
-/// another agent holds it.
-class DataDirectory {
-public:
-    DataDirectory();
-    DataDirectory(const DataDirectory&) = delete;
-    DataDirectory& operator=(const DataDirectory&) = delete;
-    ~DataDirectory();
-
-    /// With a slash at its end.
-    const std::string& path() const { return path_; }
-
-private:
-    std::string path_;
-    int descriptor_ = -1;
-};
+/// Gives the process what the plug-in's commands need, and takes from it what would let others turn them: an
+/// environment of a few variables, a PATH with the sbin directories behind what is there, "/" as the current
+/// directory, umask 022, children that can be waited for, no core dumps. To be called before any thread.
+/// @param files names that become absolute, as CORVISTA_DATA_DIR does: they are meant from where the program
+/// was
+///              started
+void prepareSurroundings(const std::vector<std::string*>& files);
 
 /// While it lives, the plug-in's commands complain to nobody: not each of them sends its own complaints away,
 /// and a missing file is no news. The program's own messages still reach the standard error it was started

@@ -93,10 +93,10 @@ fs::path directoryOf(const fs::path& target) {
 /// A file of a new name, locked by us. The sweep of another writer may catch it between creation and lock:
 /// then again.
 std::pair<Descriptor, fs::path> createTemporary(const fs::path& target) {
-    constexpr mode_t kOrdinary = 0644;
+    constexpr mode_t kPrivate = 0600;
     for (;;) {
         fs::path path = directoryOf(target) / (temporaryPrefix(target) + randomName() + std::string(kSuffix));
-        Descriptor file(::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kOrdinary));
+        Descriptor file(::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kPrivate));
         if (!file.isOpen()) {
             if (errno == EEXIST) {
                 continue;

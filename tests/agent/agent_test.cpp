@@ -35,15 +35,16 @@ constexpr const char* kHold = "/tmp/hold";
 AgentSettings settingsOf(const std::vector<std::string>& plugins) {
     AgentSettings settings;
     settings.plugins = plugins;
-    settings.errors = std::make_shared<cvagent::ErrorLines>();
     return settings;
 }
 
 /// An agent with the fake plug-in.
 class Fake {
 public:
-    explicit Fake(const std::string& words = "") : told_(setenv("FAKE_PLUGIN", words.c_str(), 1)) {
-        setenv("FAKE_PLUGIN_HOLD", kHold, 1);
+    explicit Fake(const std::string& words = "") {
+        setenv("CORVISTA_FAKE_PLUGIN", words.c_str(), 1);
+        setenv("CORVISTA_FAKE_PLUGIN_HOLD", kHold, 1);
+        settings.log = std::make_shared<cvagent::LogOutput>(cvagent::LogSettings(), errors);
         agent.emplace(settings);
     }
     Reading read(unsigned int id, const Request& request, Freshness freshness = Freshness::now) const {
@@ -55,7 +56,7 @@ public:
     }
 
     AgentSettings settings = settingsOf({FAKE_PLUGIN_FILE});
-    int told_;
+    std::shared_ptr<cvagent::ErrorLines> errors = std::make_shared<cvagent::ErrorLines>();
     std::optional<Agent> agent;
 };
 
@@ -86,14 +87,15 @@ HOST_TEST(AgentNodes, ANodeRefKeepsThePluginAtWork) {
 }
 
 HOST_TEST(AgentNodes, AReferenceCanBeGivenANodeOfAnotherAgent) {
-    Fake first;
-    NodeRef node = first.agent->find("computer");
-    first.agent.reset();
-    setenv("CORVISTA_DATA_DIR", "/var/other", 1);
-    const cvagent::AgentSettings other = settingsOf({CORVISTA_PLUGIN_FILE});
+    const cvagent::QuietCommands quiet;
+    AgentSettings settings = settingsOf({FAKE_PLUGIN_FILE});
+    settings.data = std::make_shared<cvagent::DataDirectory>();
+    auto first = std::make_unique<Agent>(settings);
+    NodeRef node = first->find("computer");
+    first.reset();
+    settings.plugins = {CORVISTA_PLUGIN_FILE};
     {
-        const cvagent::QuietCommands quiet;
-        const Agent second(other);
+        const Agent second(settings);
         node = second.find("computer");  // the last one of the first agent goes here
     }
     EXPECT_EQ(node->getDescription(), "Computer");
@@ -102,7 +104,7 @@ HOST_TEST(AgentNodes, AReferenceCanBeGivenANodeOfAnotherAgent) {
 HOST_TEST(AgentPlugins, HaveIdsThatNeverMeetInOneTree) {
     const cvagent::QuietCommands quiet;
     host.file("/proc/cpuinfo", "processor\t: 0\n");
-    setenv("FAKE_PLUGIN", "churn", 1);
+    setenv("CORVISTA_FAKE_PLUGIN", "churn", 1);
     const Agent agent(settingsOf({CORVISTA_PLUGIN_FILE, FAKE_PLUGIN_FILE}));
     EXPECT_THAT(agent.plugins(), ElementsAre(CORVISTA_PLUGIN_FILE, FAKE_PLUGIN_FILE));
     EXPECT_THAT(agent.failedPlugins(), IsEmpty());
@@ -126,8 +128,8 @@ HOST_TEST(AgentPlugins, HaveIdsThatNeverMeetInOneTree) {
 HOST_TEST(AgentPlugins, AskForNodesByNameOfTheirOwnFirst) {
     const cvagent::QuietCommands quiet;
     host.file("/proc/cpuinfo", "processor\t: 0\n");
-    setenv("FAKE_PLUGIN", "find", 1);
-    setenv("FAKE_PLUGIN_DIARY", "/tmp/diary", 1);
+    setenv("CORVISTA_FAKE_PLUGIN", "find", 1);
+    setenv("CORVISTA_FAKE_PLUGIN_DIARY", "/tmp/diary", 1);
     { const Agent agent(settingsOf({CORVISTA_PLUGIN_FILE, FAKE_PLUGIN_FILE})); }
     EXPECT_THAT(*host.read("/tmp/diary"), HasSubstr("initialize 2 100000001 100000002\n"));
     EXPECT_THAT(*host.read("/tmp/diary"), HasSubstr("\nhard-drive:sda: Hard Drive\n"));
@@ -137,7 +139,7 @@ HOST_TEST(AgentPlugins, AskForNodesByNameOfTheirOwnFirst) {
 HOST_TEST(AgentPlugins, OneThatFailsCostsNothingOfTheOthers) {
     const cvagent::QuietCommands quiet;
     for (const std::string word : {"fail", "badstart", "throwstart", "foreignids"}) {
-        setenv("FAKE_PLUGIN", word.c_str(), 1);
+        setenv("CORVISTA_FAKE_PLUGIN", word.c_str(), 1);
         const Agent agent(settingsOf({CORVISTA_PLUGIN_FILE, FAKE_PLUGIN_FILE, "/nowhere.so"}));
         ASSERT_EQ(agent.failedPlugins().size(), 2U) << word;
         EXPECT_EQ(agent.failedPlugins().front().file, FAKE_PLUGIN_FILE);
@@ -174,7 +176,7 @@ HOST_TEST(AgentErrors, BelongToTheRequestThatCausedThem) {
     }
     EXPECT_EQ(wrong, 0);
     fake.agent.reset();
-    const auto others = fake.settings.errors->take();
+    const auto others = fake.errors->take();
     ASSERT_EQ(others.texts.size(), 1U);
     EXPECT_THAT(others.texts.front(), testing::StartsWith("the monitor's own [fake]"));
 }
@@ -286,8 +288,8 @@ constexpr int kRounds = 20;  // each takes four times as long
 constexpr int kRounds = 100;
 #endif
 
-/// CORVISTA_TEST_ROUNDS asks for more rounds. The file is long, so that what a writer holds of it is soon not what
-/// stands there.
+/// CORVISTA_TEST_ROUNDS asks for more rounds. The file is long, so that what a writer holds of it is soon not
+/// what stands there.
 HOST_TEST(AgentWrites, TwoWritersOfOneFileLoseNothing) {
     const char* const asked = std::getenv("CORVISTA_TEST_ROUNDS");
     const int rounds = asked != nullptr ? std::atoi(asked) : kRounds;

@@ -31,8 +31,8 @@ public:
     std::string diary() const { return host_.read(kDiary).value_or(""); }
 
     std::vector<std::string> commandLine(const std::vector<std::string>& words) const {
-        std::vector<std::string> line = {"env", std::string("FAKE_PLUGIN_DIARY=") + kDiary,
-                                         "FAKE_PLUGIN=" + words_};
+        std::vector<std::string> line = {"env", std::string("CORVISTA_FAKE_PLUGIN_DIARY=") + kDiary,
+                                         "CORVISTA_FAKE_PLUGIN=" + words_};
         line.insert(line.end(), settings_.begin(), settings_.end());
         line.insert(line.end(), {CVAGENT_PROGRAM, "--host-tools", "native", "--plugin", plugin_});
         line.insert(line.end(), words.begin(), words.end());
@@ -40,7 +40,7 @@ public:
     }
 
 private:
-    static constexpr const char* kDiary = "/tmp/diary";
+    static constexpr const char* kDiary = "/var/diary";
 
     FakeHost& host_;
     std::string words_;

@@ -1,5 +1,5 @@
 // A plug-in small enough to know all of: a tree of a few nodes, properties that are slow, failing or
-// throwing, and threads that publish, withdraw and alert. FAKE_PLUGIN, a list of words, tells it what to do
+// throwing, and threads that publish, withdraw and alert. CORVISTA_FAKE_PLUGIN, a list of words, tells it what to do
 // besides:
 //   fail, null, throw       OpenMI returns 7, hands out nothing, throws
 //   throwseven              OpenMI throws what is no exception
@@ -17,8 +17,8 @@
 //   late                    unload sends one alert
 //   chatter                 the thread of churn reports an error each time
 //   foreignids              initialize numbers its nodes from 1, whatever the agent says
-// FAKE_PLUGIN_HOLD names a file: while it is there, what waits for it hangs.
-// FAKE_PLUGIN_DIARY names a file that gets a line for each write and for the unload.
+// CORVISTA_FAKE_PLUGIN_HOLD names a file: while it is there, what waits for it hangs.
+// CORVISTA_FAKE_PLUGIN_DIARY names a file that gets a line for each write and for the unload.
 #include <unistd.h>
 
 #include <atomic>
@@ -40,12 +40,12 @@ using IC::Number;
 using IC::PropertyValue;
 
 bool told(const std::string& word) {
-    const char* words = std::getenv("FAKE_PLUGIN");
+    const char* words = std::getenv("CORVISTA_FAKE_PLUGIN");
     return words != nullptr && (" " + std::string(words) + " ").find(" " + word + " ") != std::string::npos;
 }
 
 void note(const std::string& line) {
-    if (const char* file = std::getenv("FAKE_PLUGIN_DIARY")) {
+    if (const char* file = std::getenv("CORVISTA_FAKE_PLUGIN_DIARY")) {
         std::ofstream(file, std::ios::app) << line << std::endl;
     }
 }
@@ -57,7 +57,7 @@ void logError(const std::string& message) {
 }
 
 void waitWhileHeld() {
-    const char* file = std::getenv("FAKE_PLUGIN_HOLD");
+    const char* file = std::getenv("CORVISTA_FAKE_PLUGIN_HOLD");
     while (file != nullptr && access(file, F_OK) == 0) {
         std::this_thread::sleep_for(std::chrono::milliseconds(1));
     }

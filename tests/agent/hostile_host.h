@@ -13,6 +13,15 @@ inline ToolAnswer hanging() {
     return {.out = "", .action = "sleep 1000"};
 }
 
+/// The words with which cvagent runs without the right to mount anything, as in many containers: its /tmp is the
+/// host's.
+inline std::vector<std::string> withoutMounts(FakeHost& host, const std::vector<std::string>& words) {
+    host.realTool("setpriv");
+    std::vector<std::string> line = {"setpriv", "--bounding-set=-sys_admin"};
+    line.insert(line.end(), words.begin(), words.end());
+    return line;
+}
+
 /// From here on the tool does its worst, but for as many calls as a start makes it does as before.
 inline void afterTheStart(FakeHost& host, const SuseHost& suse, const std::string& command,
                           const ToolAnswer& good, const ToolAnswer& worst) {

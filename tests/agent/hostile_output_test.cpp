@@ -65,13 +65,17 @@ HOST_TEST(HugeOutput, ThatFillsTmpIsNoLayout) {
     SuseHost suse(host);
     // 13 bytes a line: no number of full pages ends with one.
     host.tool("fdisk -ls", ToolAnswer{.out = "", .action = std::string("yes 'no disk here'") + kGigabyte});
-    ASSERT_EQ(mount("small", "/tmp", "tmpfs", MS_NOSUID | MS_NODEV, "size=256k"), 0);
-    const Finished run = suse.run({"tree"});
-    EXPECT_EQ(run.status, 0);
-    EXPECT_THAT(run.err, HasSubstr("Command : fdisk -ls 2>/dev/null > /tmp/fdisk_tmp failed!!"));
-    EXPECT_THAT(run.err, HasSubstr("cannot write to /tmp: No space left on device"));
-    EXPECT_THAT(run.out, HasSubstr("processor:1"));
-    EXPECT_FALSE(host.exists("/tmp/fdisk_tmp"));
+    host.mountOver("/tmp",
+                   [] { ASSERT_EQ(mount("small", "/tmp", "tmpfs", MS_NOSUID | MS_NODEV, "size=256k"), 0); });
+    const std::vector<std::string> words = suse.commandLine({"tree"});
+    for (const bool isOwnTmp : {false, true}) {
+        const Finished run = host.run(isOwnTmp ? words : withoutMounts(host, words));
+        EXPECT_EQ(run.status, 0);
+        EXPECT_THAT(run.err, HasSubstr("Command : fdisk -ls 2>/dev/null > /tmp/fdisk_tmp failed!!"));
+        EXPECT_THAT(run.err, HasSubstr("cannot write to /tmp: No space left on device"));
+        EXPECT_THAT(run.out, HasSubstr("processor:1"));
+        EXPECT_FALSE(host.exists("/tmp/fdisk_tmp"));
+    }
 }
 
 // Zeros, an escape sequence, bytes that are no UTF-8, and no line break at the end.

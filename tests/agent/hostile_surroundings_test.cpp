@@ -20,7 +20,7 @@ constexpr const char* kData = "/opt/vantrel/corvista/data";
 HOST_TEST(FullTmp, IsToldAndTheRestIsShown) {
     SuseHost suse(host);
     host.fullDisk("/tmp");
-    const Finished run = suse.run({"tree"});
+    const Finished run = host.run(withoutMounts(host, suse.commandLine({"tree"})));
     EXPECT_EQ(run.status, 0);
     EXPECT_THAT(run.err,
                 HasSubstr("cvagent: cannot write to /tmp: No space left on device; drives, partitions and "
@@ -34,7 +34,7 @@ HOST_TEST(FullTmp, IsToldAndTheRestIsShown) {
 HOST_TEST(ReadOnlyTmp, IsTold) {
     SuseHost suse(host);
     host.readOnly("/tmp");
-    const Finished run = suse.run({"tree"});
+    const Finished run = host.run(withoutMounts(host, suse.commandLine({"tree"})));
     EXPECT_EQ(run.status, 0);
     EXPECT_THAT(run.err, HasSubstr("cvagent: cannot write to /tmp: Read-only file system; "));
 }

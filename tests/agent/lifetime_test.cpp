@@ -61,7 +61,7 @@ void loadAgainAndAgain(const std::string& file, int times) {
 }
 
 HOST_TEST(PluginLifetime, TwoHundredLoadsLeaveNothingBehind) {
-    setenv("FAKE_PLUGIN", "churn", 1);
+    setenv("CORVISTA_FAKE_PLUGIN", "churn", 1);
     loadAgainAndAgain(FAKE_PLUGIN_FILE, 200);
 }
 
@@ -81,7 +81,7 @@ HOST_TEST(PluginLifetime, MonitorsStoppedInTheMiddleOfAPassLeaveNothingBehind) {
 }
 
 HOST_TEST(PluginLifetime, TwoHundredFailuresLeaveNothingBehind) {
-    setenv("FAKE_PLUGIN", "badstart churn", 1);
+    setenv("CORVISTA_FAKE_PLUGIN", "badstart churn", 1);
     EXPECT_ANY_THROW(Plugin(FAKE_PLUGIN_FILE, nullptr));  // what the C library keeps from its first use
     const auto before = holdings();
     for (int i = 0; i < 200; ++i) {
@@ -91,7 +91,7 @@ HOST_TEST(PluginLifetime, TwoHundredFailuresLeaveNothingBehind) {
 }
 
 HOST_TEST(PluginLifetime, NodesAreReadWhileTheyComeAndGo) {
-    setenv("FAKE_PLUGIN", "churn alert", 1);
+    setenv("CORVISTA_FAKE_PLUGIN", "churn alert", 1);
     Counter counter;
     std::atomic<int> reads{0};
     {
@@ -116,7 +116,7 @@ HOST_TEST(PluginLifetime, NodesAreReadWhileTheyComeAndGo) {
 }
 
 HOST_TEST(PluginLifetime, HandlesKeepWithdrawnNodesAlive) {
-    setenv("FAKE_PLUGIN", "churn", 1);
+    setenv("CORVISTA_FAKE_PLUGIN", "churn", 1);
     Counter counter;
     Plugin plugin(FAKE_PLUGIN_FILE, &counter);
     cvagent::Handle drive;

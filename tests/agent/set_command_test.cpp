@@ -155,8 +155,8 @@ HOST_TEST(SetCommand, PowerActionsNeedAYes) {
     EXPECT_THAT(cvagent.diary(), HasSubstr("123=12\n"));
 }
 
-/// The machine's own terminals: the fake plug-in restarts nothing.
-class PowerQuestion : public testing::Test {
+/// The fake plug-in restarts nothing.
+class PowerQuestion : public HostFixture {
 protected:
     OnTerminal ask(const std::string& answer) {
         return runOnTerminal({CVAGENT_PROGRAM, "--host-tools", "native", "--plugin", FAKE_PLUGIN_FILE, "set",
@@ -165,14 +165,14 @@ protected:
     }
 };
 
-TEST_F(PowerQuestion, IsAskedOnATerminal) {
+HOST_TEST_F(PowerQuestion, IsAskedOnATerminal) {
     const OnTerminal yes = ask("y\n");
     EXPECT_EQ(yes.status, 0) << yes.output;
     EXPECT_THAT(yes.output, HasSubstr("This will restart the host at once. Go on? [y/N]"));
     EXPECT_THAT(yes.output, HasSubstr("9 (restart)"));
 }
 
-TEST_F(PowerQuestion, AnythingButYesMeansNo) {
+HOST_TEST_F(PowerQuestion, AnythingButYesMeansNo) {
     for (const std::string answer : {"\n", "n\n", "maybe\n", "\x04"}) {
         const OnTerminal no = ask(answer);
         EXPECT_EQ(no.status, 4) << no.output;
@@ -180,7 +180,7 @@ TEST_F(PowerQuestion, AnythingButYesMeansNo) {
     }
 }
 
-TEST_F(PowerQuestion, ColourIsForTerminals) {
+HOST_TEST_F(PowerQuestion, ColourIsForTerminals) {
     const OnTerminal run =
         runOnTerminal({CVAGENT_PROGRAM, "--host-tools", "native", "--plugin", FAKE_PLUGIN_FILE, "tree"}, "");
     EXPECT_EQ(run.status, 0);

@@ -79,7 +79,7 @@ HOST_TEST(CommandLine, WrongUsageEndsWithStatusTwoAndSaysWhereToLook) {
 
 HOST_TEST(Surroundings, SpeakTheLanguageThatTheParsersRead) {
     setenv("LC_ALL", "de_DE.UTF-8", 1);
-    cvagent::prepareSurroundings();
+    cvagent::prepareSurroundings({});
     EXPECT_STREQ(std::getenv("LC_ALL"), "C");
 }
 
@@ -158,8 +158,7 @@ HOST_TEST(StopSignals, AreRememberedOnceTheyAreInstalled) {
 TEST(WithoutRoot, SaysWhatWillBeMissingAndUsesTheHome) {
     const std::filesystem::path home =
         std::filesystem::temp_directory_path() / ("cvagent-home-" + std::to_string(getpid()));
-    std::filesystem::create_directory(home);
-    std::filesystem::permissions(home, std::filesystem::perms::all);
+    makeForNobody(home);
     const OnTerminal run = runAsNobody(
         {CVAGENT_PROGRAM, "--host-tools", "native", "--plugin", FAKE_PLUGIN_FILE, "tree"}, home.string());
     const bool kept = std::filesystem::is_directory(home / ".local/state/corvista/data");
@@ -176,8 +175,7 @@ TEST(WithoutRoot, SaysWhatWillBeMissingAndUsesTheHome) {
 TEST(WithoutRoot, KeepsTheDataWhereTheUserKeepsState) {
     const std::filesystem::path state =
         std::filesystem::temp_directory_path() / ("cvagent-state-" + std::to_string(getpid()));
-    std::filesystem::create_directory(state);
-    std::filesystem::permissions(state, std::filesystem::perms::all);
+    makeForNobody(state);
     const OnTerminal run = runAsNobody({"/usr/bin/env", "XDG_STATE_HOME=" + state.string(), CVAGENT_PROGRAM,
                                         "--host-tools", "native", "--plugin", FAKE_PLUGIN_FILE, "tree"},
                                        "/nonexistent");
@@ -259,10 +257,12 @@ HOST_TEST(Plugins, AreFoundBesideTheProgram) {
 HOST_TEST(Plugins, ThatAreNotBesideTheProgramAreMissed) {
     const std::string program = host.read(CVAGENT_PROGRAM).value_or("");
     host.file("/opt/bin/cvagent", program, 0755);
+    host.file("/opt/lib/libvantrelcvframework.so.1", host.read(FRAMEWORK_FILE).value_or(""));
     const Finished run = host.run({"/opt/bin/cvagent", "tree"});
     EXPECT_EQ(run.status, 1);
-    EXPECT_THAT(run.err, HasSubstr("there is no plug-in file 'libvantrelcvicoshwmi.so.1'"));
-    EXPECT_THAT(run.err, HasSubstr("--plugin FILE"));
+    EXPECT_EQ(run.err,
+              "cvagent: there is no libvantrelcvicoshwmi.so.1 beside this program, which lies in '/opt/bin'; name "
+              "the plug-in with --plugin FILE\n");
 }
 
 HOST_TEST(BrokenPlugins, ThatCannotStopAreNamedAndTheCommandCounts) {

@@ -1,6 +1,8 @@
 #include "tests/agent/terminal.h"
 
 #include <pty.h>
+#include <sys/mount.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -44,6 +46,18 @@ OnTerminal follow(pid_t process, int descriptor) {
     return {WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status), output};
 }
 
+/// A fake host has none.
+void provideTerminals() {
+    if (access("/dev/ptmx", F_OK) == 0) {
+        return;
+    }
+    std::filesystem::create_directory("/dev/pts");
+    if (mount("devpts", "/dev/pts", "devpts", MS_NOSUID | MS_NOEXEC, "newinstance,ptmxmode=0666") != 0) {
+        throw std::runtime_error("no terminals");
+    }
+    std::filesystem::create_symlink("pts/ptmx", "/dev/ptmx");
+}
+
 std::string temporaryDirectory() {
     std::string name = (std::filesystem::temp_directory_path() / "cvagent-test-XXXXXX").string();
     if (mkdtemp(name.data()) == nullptr) {
@@ -55,6 +69,7 @@ std::string temporaryDirectory() {
 }  // namespace
 
 OnTerminal runOnTerminal(const std::vector<std::string>& words, const std::string& typed) {
+    provideTerminals();
     const std::string data = temporaryDirectory();
     int terminal = -1;
     const pid_t process = forkpty(&terminal, nullptr, nullptr, nullptr);
@@ -71,6 +86,13 @@ OnTerminal runOnTerminal(const std::vector<std::string>& words, const std::strin
     const OnTerminal result = follow(process, terminal);
     std::filesystem::remove_all(data);
     return result;
+}
+
+void makeForNobody(const std::string& directory) {
+    if (mkdir(directory.c_str(), 0700) != 0 ||
+        (geteuid() == 0 && chown(directory.c_str(), kNobody, kNobody) != 0)) {
+        throw std::runtime_error("cannot make " + directory);
+    }
 }
 
 OnTerminal runAsNobody(const std::vector<std::string>& words, const std::string& home) {

@@ -9,9 +9,11 @@ struct OnTerminal {
     std::string output;
 };
 
-/// Runs a program on a terminal of its own, with a data directory of its own.
+/// Runs a program on a terminal of its own, with a data directory of its own. To be called on the fake host.
 /// @param typed what is typed right away
 OnTerminal runOnTerminal(const std::vector<std::string>& words, const std::string& typed);
 
+/// Makes a directory that belongs to that user.
+void makeForNobody(const std::string& directory);
 /// Runs a program as a user without rights, whose home is `home`. Output and errors come together.
 OnTerminal runAsNobody(const std::vector<std::string>& words, const std::string& home);

@@ -20,7 +20,11 @@ corvista_test(agent LIBRARIES agent_cli agent_core test_support util SOURCES
   agent/json_test.cpp
   agent/print_test.cpp
   agent/read_commands_test.cpp
+  agent/data_directory_test.cpp
+  agent/private_tmp_test.cpp
+  agent/run_path_test.cpp
   agent/set_command_test.cpp
+  agent/surroundings_attack_test.cpp
   agent/surroundings_test.cpp
   agent/team_test.cpp
   agent/terminal.cpp
@@ -28,8 +32,9 @@ corvista_test(agent LIBRARIES agent_cli agent_core test_support util SOURCES
   agent/tree_test.cpp
   agent/value_check_test.cpp
   agent/watch_command_test.cpp)
-target_compile_definitions(agent_test PRIVATE ${agent_test_programs})
-add_dependencies(agent_test cvagent fake_plugin tiny_front_end vantrelcvicoshwmi)
+target_compile_definitions(agent_test PRIVATE ${agent_test_programs}
+  HOSTTOOLS_PROGRAM="$<TARGET_FILE:corvista-hosttools>" CMAKE_PROGRAM="${CMAKE_COMMAND}")
+add_dependencies(agent_test cvagent corvista-hosttools fake_plugin tiny_front_end vantrelcvicoshwmi)
 
 corvista_test(agent_suse_host LIBRARIES test_support SOURCES
   agent/suse_host_test.cpp)

@@ -23,8 +23,8 @@ void printOne(const cvagent::Agent& agent, const char* name, const char* propert
 }  // namespace
 
 int main(int count, char** words) {
-    cvagent::prepareSurroundings();
     try {
+        cvagent::prepareSurroundings({});
         cvagent::AgentSettings settings;
         settings.plugins = {words[1]};
         const cvagent::Agent agent(settings);

@@ -73,7 +73,7 @@ HOST_TEST(WatchCommand, ShowsTheChangeThatIsSeenWhileThePluginStops) {
 
 HOST_TEST(WatchCommand, ASignalUnloadsThePluginAndIsNoFailure) {
     for (const int number : {SIGINT, SIGTERM}) {
-        host.remove("/tmp/diary");
+        host.remove("/var/diary");
         CvagentRun cvagent(host);
         cvagent.telling("churn");
         RunningProgram watch = cvagent.start({"watch"});
@@ -87,7 +87,7 @@ HOST_TEST(WatchCommand, ASignalUnloadsThePluginAndIsNoFailure) {
 
 HOST_TEST(Signals, EndOtherCommandsAfterTheUnload) {
     for (const int number : {SIGINT, SIGTERM, SIGHUP}) {
-        host.remove("/tmp/diary");
+        host.remove("/var/diary");
         CvagentRun cvagent(host);
         cvagent.telling("slow");
         RunningProgram tree = cvagent.start({"tree"});

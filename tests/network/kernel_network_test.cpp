@@ -50,7 +50,8 @@ protected:
 
     /// Asks with each program that prints the classic formats, whatever this machine's own tools print.
     static void withEachTool(FakeHost& host, const std::function<void()>& questions) {
-        for (const std::string& program : {std::string("busybox "), buildDirectory() + "/hosttools/bin/"}) {
+        for (const std::string& program :
+             {std::string("busybox "), buildDirectory() + "/hosttools/corvista-hosttools "}) {
             SCOPED_TRACE("asked with " + program);
             for (const std::string tool : {"ifconfig", "route"}) {
                 host.tool(tool + " %any", {.out = "", .action = program + tool + " \"$@\""});

@@ -126,9 +126,22 @@ void FakeHost::fullDisk(const std::string& path) {
     makeDirectories(disk + "/upper");
     makeDirectories(disk + "/work");
     std::string layers = "lowerdir=" + path + ",upperdir=" + disk + "/upper,workdir=" + disk + "/work";
-    if (mount("full", path.c_str(), "overlay", 0, (layers + ",userxattr").c_str()) != 0)
-        must(mount("full", path.c_str(), "overlay", 0, layers.c_str()), "mount the full disk at " + path);
+    mountOver(path, [&] {
+        if (mount("full", path.c_str(), "overlay", 0, (layers + ",userxattr").c_str()) != 0)
+            must(mount("full", path.c_str(), "overlay", 0, layers.c_str()), "mount the full disk at " + path);
+    });
     ballast_.push_back(fillDisk(disk));
+}
+
+void FakeHost::mountOver(const std::string& path, const std::function<void()>& mounting) {
+    std::vector<std::pair<std::string, Tree>> kept;
+    for (const std::string& place : {buildDirectory(), testsDirectory()})
+        if (place.starts_with(path + "/")) kept.emplace_back(place, Tree(place));
+    mounting();
+    for (auto& [place, tree] : kept) {
+        makeDirectories(place);
+        tree.attach(place);
+    }
 }
 
 void FakeHost::restore(const std::string& path) {

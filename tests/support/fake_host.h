@@ -4,6 +4,7 @@
 
 #include <chrono>
 #include <cstdint>
+#include <functional>
 #include <optional>
 #include <string>
 #include <vector>
@@ -68,6 +69,8 @@ public:
     void readOnly(const std::string& path);
     /// From here on the directory keeps its files, but a write below it finds no space (ENOSPC).
     void fullDisk(const std::string& path);
+    /// Mounts something over a directory; this build and the tests' sources, should they lie below it, stay.
+    void mountOver(const std::string& path, const std::function<void()>& mounting);
     /// Ends the last readOnly or fullDisk of the path; what fullDisk let through is gone with it.
     void restore(const std::string& path);
 

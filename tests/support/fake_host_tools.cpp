@@ -62,7 +62,7 @@ void FakeHost::installTool(const std::string& name) {
     std::string place = linkOf(name);
     makeParents(place);
     unlink(place.c_str());
-    symlink(place, buildDirectory() + "/fakehost/fake_tool");
+    symlink(place, std::string(toolProgramDirectory) + "/fake_tool");
 }
 
 void FakeHost::answer(const std::string& command, const ToolAnswer& answer, unsigned turn) {

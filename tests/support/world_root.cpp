@@ -14,6 +14,7 @@
 #include "tests/support/files.h"
 #include "tests/support/mounts.h"
 #include "tests/support/system_call.h"
+#include "tests/support/tool_files.h"
 #include "tests/support/world.h"
 
 namespace fake_host {
@@ -88,6 +89,7 @@ std::vector<Mount> machineTrees() {
     take(testsDirectory(), testsDirectory().substr(1));
     const char* writable = std::getenv("CORVISTA_TEST_WRITABLE_BUILD");
     take(buildDirectory(), buildDirectory().substr(1), writable && *writable == '1');
+    take(buildDirectory() + "/fakehost", std::string(toolProgramDirectory).substr(1));
     return mounts;
 }
 

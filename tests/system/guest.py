@@ -39,7 +39,7 @@ class Guest:
     def cvagent(self, *words):
         """One run of cvagent, its JSON read. It gets files of its own: an agent may be running."""
         line = shlex.join(["cvagent", *words, "--json"])
-        own = "mount -t tmpfs none /tmp && mount -t tmpfs none /opt/vantrel/corvista/data"
+        own = "mount -t tmpfs -o mode=700 none /opt/vantrel/corvista/data"
         return json.loads(self.sh(f"unshare -m sh -c {shlex.quote(own + ' && exec ' + line)}"))
 
     def set(self, node, name, *values):

@@ -60,7 +60,6 @@ std::string table(const std::vector<ToolReport>& reports, const Style& style) {
 
 ExitStatus doctor(const Options& options) {
     const Style style = Style::detect();
-    prepareSurroundings();
     const std::vector<ToolReport> reports =
         inspectHostTools(options.hostTools, Look::everything, adapterDirectory());
     print(options.json ? json::tools(reports) : table(reports, style));

@@ -53,7 +53,7 @@ ExitStatus set(Session& session, const Options& options) {
         throw Problem(*result.problem);
     }
     print(options.json ? json::change(*node, row.readable() ? result.before : result.after, result.after)
-                       : report(*node, result, row.readable(), session.style()));
+                       : report(*node, result, row.readable(), Style::detect()));
     if (result.outcome == WriteResult::differs) {
         complain(std::string("the host still has another value: ") + row.meaning);
     }

@@ -84,7 +84,7 @@ std::string drawing(const std::vector<Handle>& nodes, const Style& style) {
 
 ExitStatus tree(Session& session, const Options& options) {
     const std::vector<Handle> nodes = handlesOf(session.agent().nodes());
-    print(options.json ? json::tree(session.agent().plugins(), nodes) : drawing(nodes, session.style()));
+    print(options.json ? json::tree(session.agent().plugins(), nodes) : drawing(nodes, Style::detect()));
     return ExitStatus::done;
 }
 

@@ -85,9 +85,9 @@ ExitStatus watch(Session& session, const Options& options) {
     }
     complain("watching " + std::to_string(session.agent().nodes().size()) + " nodes" +
              (options.seconds ? "" : "; Ctrl-C ends it"));
-    follow(*events, options, session.style());
+    follow(*events, options, Style::detect());
     session.end();
-    printAll(*events, options.json, session.style());  // what came while the plug-ins were stopped
+    printAll(*events, options.json, Style::detect());  // what came while the plug-ins were stopped
     return ExitStatus::done;
 }
 

@@ -1,0 +1,51 @@
+#pragma once
+
+#include <optional>
+#include <string>
+
+namespace cvagent {
+
+/// Names another data directory.
+inline constexpr const char* kDataVariable = "CORVISTA_DATA_DIR";
+
+/// A directory held by a lock file in it that only its owner can open. The directory belongs to the caller,
+/// the way to it to the caller or to root, and nobody else can write there; what is missing is made, the last
+/// directory with mode 0700. Where nothing can be written (EROFS) there is nothing to hold.
+class HeldDirectory {
+public:
+    /// Throws Problem when somebody else could change the directory and, as `busy`, when another agent holds
+    /// it; std::system_error when it cannot be made or opened.
+    /// @param otherwise ends what the user is advised to do then
+    HeldDirectory(const std::string& path, const std::string& otherwise);
+    HeldDirectory(const HeldDirectory&) = delete;
+    HeldDirectory& operator=(const HeldDirectory&) = delete;
+    ~HeldDirectory();
+
+    /// Without symbolic links, with a slash at its end.
+    const std::string& path() const { return path_; }
+
+private:
+    void hold(const std::string& otherwise) const;
+
+    std::string path_;
+    int lock_;
+};
+
+/// The agent's data directory and the directory where the plug-in saves the settings of interfaces whatever
+/// the data directory is, both held for this process. Without root the latter only when it is the caller's.
+class DataDirectory {
+public:
+    /// Throws Problem; busy when another agent holds one of them.
+    DataDirectory();
+
+    /// With a slash at its end.
+    const std::string& path() const { return own_->path(); }
+
+private:
+    void holdSettings();
+
+    std::optional<HeldDirectory> own_;
+    std::optional<HeldDirectory> settings_;
+};
+
+}  // namespace cvagent

@@ -1,0 +1,110 @@
+#include "agent/core/environment.h"
+
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cstdlib>
+#include <filesystem>
+#include <string>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+namespace cvagent {
+
+namespace {
+
+namespace fs = std::filesystem;
+
+constexpr std::string_view kKept[] = {"HOME", "NO_COLOR", "PATH", "TERM", "TZ", "XDG_STATE_HOME"};
+constexpr std::string_view kOwnPrefix = "CORVISTA_";
+
+// What the kernel shows of owners that a user namespace has no number for: the files of the system there.
+constexpr uid_t kUnmappedOwner = 65534;
+
+bool isKept(std::string_view name) {
+    return name.starts_with(kOwnPrefix) ||
+           std::find(std::begin(kKept), std::end(kKept), name) != std::end(kKept);
+}
+
+std::vector<std::pair<std::string, std::string>> keptVariables() {
+    std::vector<std::pair<std::string, std::string>> kept;
+    for (char** variable = environ; variable != nullptr && *variable != nullptr; ++variable) {
+        const std::string text = *variable;
+        const std::size_t equals = text.find('=');
+        if (equals != std::string::npos && isKept(text.substr(0, equals))) {
+            kept.emplace_back(text.substr(0, equals), text.substr(equals + 1));
+        }
+    }
+    return kept;
+}
+
+/// Whether users without rights can put a program there, or change the way to it.
+bool isOpenToOthers(const fs::path& directory) {
+    fs::path way;
+    for (const fs::path& name : directory) {
+        way /= name;
+        struct stat found {};
+        if (stat(way.c_str(), &found) != 0 ||
+            (found.st_uid != 0 && found.st_uid != geteuid() && found.st_uid != kUnmappedOwner)) {
+            return true;
+        }
+        const bool onlyOwnFiles = (found.st_mode & S_ISVTX) != 0 && way != directory;
+        if ((found.st_mode & S_IWOTH) != 0 && !onlyOwnFiles) {
+            return true;
+        }
+    }
+    return false;
+}
+
+/// A relative directory, the empty name among them, would be one of "/", where the commands run.
+bool isUsable(const std::string& directory) {
+    if (!directory.starts_with('/')) {
+        return false;
+    }
+    std::error_code missing;
+    const fs::path place = fs::canonical(directory, missing);
+    return geteuid() != 0 || (!missing && !isOpenToOthers(place));
+}
+
+std::string safePath() {
+    std::vector<std::string> directories = directoriesOnPath();
+    std::erase_if(directories, [](const std::string& directory) { return !isUsable(directory); });
+    for (const char* directory : {"/usr/local/sbin", "/usr/sbin", "/sbin", "/usr/bin", "/bin"}) {
+        if (std::find(directories.begin(), directories.end(), directory) == directories.end()) {
+            directories.emplace_back(directory);
+        }
+    }
+    std::string path;
+    for (const std::string& directory : directories) {
+        path += (path.empty() ? "" : ":") + directory;
+    }
+    return path;
+}
+
+}  // namespace
+
+void reduceEnvironment() {
+    const auto kept = keptVariables();
+    clearenv();
+    for (const auto& [name, value] : kept) {
+        setenv(name.c_str(), value.c_str(), 1);
+    }
+    setenv("PATH", safePath().c_str(), 1);
+    setenv("LC_ALL", "C", 1);
+}
+
+std::vector<std::string> directoriesOnPath() {
+    const char* variable = std::getenv("PATH");
+    const std::string path = variable != nullptr ? variable : "";
+    std::vector<std::string> directories;
+    for (std::size_t start = 0; start <= path.size();) {
+        const std::size_t end = std::min(path.find(':', start), path.size());
+        directories.push_back(path.substr(start, end - start));
+        start = end + 1;
+    }
+    return directories;
+}
+
+}  // namespace cvagent
