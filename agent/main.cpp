@@ -30,6 +30,7 @@ ExitStatus run(const Options& options) {
 }
 
 int runGuarded(const Options& options) {
+    cvagent::StopSignals::install();
     try {
         return static_cast<int>(run(options));
     } catch (const cvagent::Failure& failure) {
@@ -38,6 +39,7 @@ int runGuarded(const Options& options) {
         }
         return static_cast<int>(failure.status());
     } catch (const cvagent::Interrupted&) {
+        cvagent::complain("nothing was done");
         cvagent::StopSignals::die();
     } catch (const std::exception& exception) {
         cvagent::complain(std::string("unexpected failure: ") + exception.what());

@@ -12,6 +12,8 @@
 #include <csignal>
 #include <utility>
 
+#include "agent/shell/starts.h"
+
 namespace cvagent {
 
 namespace {
@@ -31,6 +33,7 @@ pid_t spawn(std::vector<std::string>& words, int output) {
     posix_spawn_file_actions_adddup2(&actions, output, STDOUT_FILENO);
     posix_spawn_file_actions_addopen(&actions, STDERR_FILENO, "/dev/null", O_WRONLY, 0);
     pid_t process = -1;
+    const shell::Start start;
     const int error =
         posix_spawn(&process, words.front().c_str(), &actions, nullptr, arguments.data(), environ);
     posix_spawn_file_actions_destroy(&actions);

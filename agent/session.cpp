@@ -15,7 +15,6 @@ Session::Session(const Options& options, Listener* listener)
         putAdaptersFirst(inspectHostTools(options.hostTools, Look::adapters, adapterDirectory()),
                          data_.path() + "host-tools");
     }
-    StopSignals::install();
     deadline_.emplace(std::chrono::duration<double>(options.commandSeconds));
     try {
         load(listener);
@@ -27,6 +26,7 @@ Session::Session(const Options& options, Listener* listener)
 }
 
 Session::~Session() {
+    const OrderlyEnd unloading;
     plugin_.reset();
     log_.showErrors();
 }
@@ -34,12 +34,6 @@ Session::~Session() {
 void Session::load(Listener* listener) {
     plugin_ = std::make_unique<Plugin>(file_, listener);
     hintAtTemporaryFiles();
-}
-
-void Session::goOnUnlessStopped() {
-    if (StopSignals::received() != 0) {
-        throw Interrupted();
-    }
 }
 
 }  // namespace cvagent
