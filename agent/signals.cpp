@@ -28,9 +28,9 @@ using Clock = std::chrono::steady_clock;
 using namespace std::chrono_literals;
 
 // Together less than the second after which whoever sent the signal may give up.
-constexpr auto kOrder = 600ms;        // for an orderly end
-constexpr auto kSearch = 150ms;       // for the commands that run; one that a device holds cannot be killed
-constexpr suseconds_t kLast = 250000; // microseconds until the program dies even if the search hangs
+constexpr auto kOrder = 600ms;         // for an orderly end
+constexpr auto kSearch = 150ms;        // for the commands that run; one that a device holds cannot be killed
+constexpr suseconds_t kLast = 250000;  // microseconds until the program dies even if the search hangs
 
 std::atomic<int> receivedSignal{0};
 std::atomic<int> orderly{0};

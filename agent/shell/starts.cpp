@@ -8,8 +8,8 @@ namespace cvagent::shell {
 
 namespace {
 
-// A start counts itself, then looks for the stop; a stop declares itself, then looks for starts. In this order
-// one of the two sees the other.
+// A start counts itself, then looks for the stop; a stop declares itself, then looks for starts. In this
+// order one of the two sees the other.
 std::atomic<bool> stopped{false};
 std::atomic<int> underWay{0};
 

@@ -135,26 +135,6 @@ HOST_TEST(QuietCommands, LeaveStandardErrorAloneWhereThereIsNothingToSendItTo) {
     EXPECT_EQ(open("/dev/null", O_WRONLY | O_CLOEXEC), -1);
 }
 
-HOST_TEST(StopSignals, AreRememberedOnceTheyAreInstalled) {
-    using cvagent::StopSignals;
-    const rlimit none{0, 1024};
-    setrlimit(RLIMIT_NOFILE, &none);
-    StopSignals::install();
-    EXPECT_EQ(StopSignals::descriptor(), -1);
-    const rlimit some{1024, 1024};
-    setrlimit(RLIMIT_NOFILE, &some);
-    StopSignals::install();
-    const int descriptor = StopSignals::descriptor();
-    EXPECT_GE(descriptor, 0);
-    StopSignals::install();
-    EXPECT_EQ(StopSignals::descriptor(), descriptor);
-    EXPECT_EQ(StopSignals::received(), 0);
-    raise(SIGHUP);
-    EXPECT_EQ(StopSignals::received(), SIGHUP);
-    pollfd ready{descriptor, POLLIN, 0};
-    EXPECT_EQ(poll(&ready, 1, 0), 1);
-}
-
 TEST(WithoutRoot, SaysWhatWillBeMissingAndUsesTheHome) {
     const std::filesystem::path home =
         std::filesystem::temp_directory_path() / ("cvagent-home-" + std::to_string(getpid()));

@@ -23,6 +23,12 @@ corvista_test(agent LIBRARIES agent_code test_support util SOURCES
 target_compile_definitions(agent_test PRIVATE ${agent_test_programs})
 add_dependencies(agent_test cvagent fake_plugin vantrelcvicoshwmi)
 
+corvista_test(agent_signals LIBRARIES test_support util SOURCES
+  agent/signals_test.cpp
+  agent/terminal.cpp)
+target_compile_definitions(agent_signals_test PRIVATE ${agent_test_programs})
+add_dependencies(agent_signals_test cvagent fake_plugin vantrelcvicoshwmi)
+
 corvista_test(agent_suse_host LIBRARIES test_support SOURCES
   agent/suse_host_test.cpp)
 target_compile_definitions(agent_suse_host_test PRIVATE ${agent_test_programs})
