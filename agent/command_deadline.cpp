@@ -3,6 +3,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <fstream>
 #include <map>
 #include <sstream>
@@ -11,6 +12,7 @@
 
 #include "agent/print.h"
 #include "agent/threads.h"
+#include "agent/want.h"
 
 namespace cvagent {
 
@@ -62,6 +64,7 @@ CommandDeadline::CommandDeadline(Seconds longest) : longest_(longest) {
         watcher_ = std::thread([this] { watch(); });
     } catch (const std::system_error&) {
         complain("the system gives no more threads: commands that hang are waited for");
+        noteWant(EAGAIN);
     }
 }
 

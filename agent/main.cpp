@@ -4,6 +4,7 @@
 #include "agent/commands/commands.h"
 #include "agent/print.h"
 #include "agent/signals.h"
+#include "agent/want.h"
 
 namespace {
 
@@ -29,22 +30,33 @@ ExitStatus run(const Options& options) {
     return ExitStatus::usage;
 }
 
-int runGuarded(const Options& options) {
-    cvagent::StopSignals::install();
+ExitStatus runGuarded(const Options& options) {
     try {
-        return static_cast<int>(run(options));
+        return run(options);
     } catch (const cvagent::Failure& failure) {
         if (*failure.what() != '\0') {
             cvagent::complain(failure.what());
         }
-        return static_cast<int>(failure.status());
+        return failure.status();
     } catch (const cvagent::Interrupted&) {
         cvagent::complain("nothing was done");
         cvagent::StopSignals::die();
     } catch (const std::exception& exception) {
         cvagent::complain(std::string("unexpected failure: ") + exception.what());
-        return static_cast<int>(ExitStatus::failed);
+        return ExitStatus::failed;
     }
+}
+
+/// What is not shown or not found can be what was wanting.
+ExitStatus judged(ExitStatus status, Command command) {
+    const bool wanting = command != Command::properties && cvagent::tellWant(nullptr);
+    const bool good = status == ExitStatus::done || status == ExitStatus::notFound;
+    return wanting && good ? ExitStatus::failed : status;
+}
+
+/// Before the tables of the program are made, which need memory.
+[[gnu::constructor(101)]] void beforeEverything() {
+    cvagent::failPlainlyWithoutMemory();
 }
 
 }  // namespace
@@ -52,5 +64,9 @@ int runGuarded(const Options& options) {
 int main(int count, char** words) {
     int status = 0;
     const auto options = cvagent::parseCommandLine(count, words, status);
-    return options ? runGuarded(*options) : status;
+    if (options) {
+        cvagent::StopSignals::install();
+        status = static_cast<int>(judged(runGuarded(*options), options->command));
+    }
+    return status;
 }

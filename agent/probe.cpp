@@ -13,6 +13,7 @@
 #include <utility>
 
 #include "agent/shell/starts.h"
+#include "agent/want.h"
 
 namespace cvagent {
 
@@ -37,6 +38,7 @@ pid_t spawn(std::vector<std::string>& words, int output) {
     const int error =
         posix_spawn(&process, words.front().c_str(), &actions, nullptr, arguments.data(), environ);
     posix_spawn_file_actions_destroy(&actions);
+    noteWant(error);
     return error == 0 ? process : -1;
 }
 
@@ -45,6 +47,7 @@ pid_t spawn(std::vector<std::string>& words, int output) {
 Probe::Probe(std::vector<std::string> words) {
     std::array<int, 2> ends{-1, -1};
     if (pipe2(ends.data(), O_CLOEXEC) != 0) {
+        noteWant(errno);
         return;
     }
     pipe_ = ends[0];

@@ -3,6 +3,7 @@
 #include "agent/failure.h"
 #include "agent/host_tools.h"
 #include "agent/signals.h"
+#include "agent/want.h"
 
 namespace cvagent {
 
@@ -34,6 +35,7 @@ Session::~Session() {
 void Session::load(Listener* listener) {
     plugin_ = std::make_unique<Plugin>(file_, listener);
     hintAtTemporaryFiles();
+    tellWant(&plugin_->interface());
 }
 
 }  // namespace cvagent
