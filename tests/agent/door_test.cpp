@@ -1,8 +1,12 @@
 // The door between a plug-in and the program that loads it.
 #include <gmock/gmock.h>
+#include <unistd.h>
 
+#include <atomic>
 #include <sstream>
+#include <thread>
 
+#include "agent/shell/starts.h"
 #include "tests/agent/hostile_host.h"
 #include "tests/agent/suse_host.h"
 
@@ -49,6 +53,26 @@ HOST_TEST(ThePlugin, FindsThemInTheProgram) {
                                         " [0]: normal symbol `" +
                                         name + "'"));
     }
+}
+
+/// The state of a thread of this process, as the kernel's letter.
+char stateOf(const FakeHost& host, pid_t thread) {
+    const std::string status = host.read("/proc/self/task/" + std::to_string(thread) + "/stat").value_or("");
+    return status.substr(status.rfind(')') + 1 + 1, 1).front();
+}
+
+HOST_TEST(AStop, HoldsWhoWouldStartACommand) {
+    cvagent::shell::declareStop();
+    static std::atomic<pid_t> caller{0};  // static: the thread stays where it is
+    static std::atomic<bool> begun{false};
+    std::thread([] {
+        caller = gettid();
+        const cvagent::shell::Start start;
+        begun = true;
+    }).detach();
+    ASSERT_TRUE(eventually([&] { return caller != 0 && stateOf(host, caller) == 'S'; }));
+    EXPECT_FALSE(begun);
+    EXPECT_EQ(cvagent::shell::startsUnderWay(), 0);
 }
 
 }  // namespace

@@ -56,19 +56,28 @@ bool hangsInOpen(const FakeHost& host, const RunningProgram& program) {
     return eventually([&] { return host.read(call).value_or("").starts_with(open); });
 }
 
-HOST_TEST(ASignal, EndsAStartThatHangsInATool) {
-    const SuseHost suse(host);
-    host.tool("fdisk -ls", hanging());
+void stopAStartThatHangsIn(FakeHost& host, const SuseHost& suse, const std::string& command) {
+    host.tool(command, hanging());
     for (const int number : kStops) {
         host.clearCalls();
         RunningProgram tree = host.start(suse.commandLine({"tree"}));
-        ASSERT_TRUE(eventuallyCalls(host, "fdisk -ls"));
+        ASSERT_TRUE(eventuallyCalls(host, command));
         stopAtOnce(host, tree, number);
         EXPECT_FALSE(host.exists(kState));
     }
 }
 
+HOST_TEST(ASignal, EndsAStartThatHangsInATool) {
+    const SuseHost suse(host);
+    stopAStartThatHangsIn(host, suse, "fdisk -ls");
+}
+
 // The C library's system would have the program ignore SIGINT meanwhile.
+HOST_TEST(ASignal, EndsAStartThatHangsInACommandWithoutAPipe) {
+    const SuseHost suse(host);
+    stopAStartThatHangsIn(host, suse, "ifconfig");
+}
+
 HOST_TEST(ASignal, EndsAWriteThatHangsInATool) {
     const SuseHost suse(host);
     host.tool("ifconfig eth0 down", hanging());
