@@ -229,13 +229,17 @@ HOST_TEST(ASignal, EndsAWatchWhosePluginDoesNotStop) {
     EXPECT_EQ(stop(watch, SIGINT).status, 128 + SIGINT);
 }
 
+bool eventuallyWatches(const RunningProgram& program) {
+    return eventually([&] { return program.err().find("watching") != std::string::npos; });
+}
+
 // The last command of the first pass hangs: what it would have told must neither be reported nor kept.
 HOST_TEST(ASignal, EndsAWatchWhoseMonitorHangs) {
     const SuseHost suse(host);
     const ToolAnswer link{*host.read("/tools/.answers/ethtool/eth0")};
     {
         RunningProgram first = host.start(suse.commandLine({"watch"}));
-        ASSERT_TRUE(eventually([&] { return host.exists(kState); }));
+        ASSERT_TRUE(eventuallyWatches(first) && eventually([&] { return host.exists(kState); }));
         EXPECT_EQ(stop(first, SIGTERM).status, 0);
     }
     const auto calls = host.callsOf("ethtool").size();
@@ -244,8 +248,7 @@ HOST_TEST(ASignal, EndsAWatchWhoseMonitorHangs) {
     host.toolInTurn("ethtool eth0", answers);
     const auto state = host.read(kState);
     RunningProgram watch = host.start(suse.commandLine({"watch"}));
-    ASSERT_TRUE(eventually([&] { return isRunning(host, "sleep"); }));
-    ASSERT_TRUE(eventually([&] { return watch.err().find("watching") != std::string::npos; }));
+    ASSERT_TRUE(eventuallyWatches(watch) && eventually([&] { return isRunning(host, "sleep"); }));
     const Finished run = stop(watch, SIGTERM);
     EXPECT_THAT(run.status, testing::AnyOf(0, 128 + SIGTERM));
     EXPECT_THAT(run.out, Not(HasSubstr("alert")));
