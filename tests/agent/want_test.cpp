@@ -31,6 +31,54 @@ Finished descriptors(const SuseHost& suse, FakeHost& host, int count, const std:
     return limited(suse, host, "-n " + std::to_string(count), words);
 }
 
+HOST_TEST(FewDescriptors, ThatAreEnoughAreNotTold) {
+    const SuseHost suse(host);
+    const Finished run = descriptors(suse, host, 64, {"tree"});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.err, IsEmpty());
+}
+
+std::vector<std::string> cannotStart(const std::string& what, const std::vector<std::string>& words) {
+    std::vector<std::string> line = {"env", "LD_PRELOAD=" FEW_PROCESSES_LIBRARY, "FEW_PROCESSES=" + what};
+    line.insert(line.end(), words.begin(), words.end());
+    return line;
+}
+
+HOST_TEST(FewProcesses, CommandsThatCannotBeStartedAreCounted) {
+    const SuseHost suse(host);
+    const Finished run = host.run(cannotStart("commands", suse.commandLine({"tree"})));
+    EXPECT_EQ(run.status, 1);
+    EXPECT_THAT(run.err,
+                testing::ContainsRegex("cvagent: the tree has no hard-drive, network-port, ip-config, "
+                                       "processor, and more can be missing: "
+                                       "[1-9][0-9]* commands could not be started, the system gives "
+                                       "no more processes or threads\nRaise the limits of "));
+    EXPECT_THAT(host.callsOf("ethtool"), IsEmpty());
+}
+
+HOST_TEST(FewProcesses, ThreadsThatCannotBeStartedAreTold) {
+    const SuseHost suse(host);
+    const Finished run = host.run(cannotStart("threads", suse.commandLine({"tree"})));
+    EXPECT_EQ(run.status, 1);
+    EXPECT_THAT(run.out, HasSubstr("network-port:eth0"));
+    EXPECT_THAT(run.err, HasSubstr("NetworkMonitor thread failed."));
+    EXPECT_THAT(run.err, HasSubstr("cvagent: some of the tree can be missing: the system gives no more "
+                                   "processes or threads\n"));
+}
+
+HOST_TEST(FewProcesses, ASignalEndsTheProgramWithoutAThreadForIt) {
+    CvagentRun cvagent(host);
+    cvagent.telling("hangstart")
+        .setting("LD_PRELOAD=" FEW_PROCESSES_LIBRARY)
+        .setting("FEW_PROCESSES=threads");
+    RunningProgram tree = cvagent.start({"tree"});
+    ASSERT_TRUE(eventually([&] { return cvagent.diary().find("hanging\n") != std::string::npos; }));
+    tree.signal(SIGTERM);
+    EXPECT_EQ(tree.wait(std::chrono::seconds(1)).status, 128 + SIGTERM);
+}
+
+// The sanitizers' own checks open descriptors, and want terabytes of memory.
+#if !defined(__SANITIZE_ADDRESS__) && !defined(__SANITIZE_THREAD__)
 HOST_TEST(FewDescriptors, WhatIsMissingFromTheTreeIsTold) {
     const SuseHost suse(host);
     const Finished run = descriptors(suse, host, 10, {"tree"});
@@ -81,54 +129,7 @@ HOST_TEST(FewDescriptors, NothingIsMissingUntold) {
     }
 }
 
-HOST_TEST(FewDescriptors, ThatAreEnoughAreNotTold) {
-    const SuseHost suse(host);
-    const Finished run = descriptors(suse, host, 64, {"tree"});
-    EXPECT_EQ(run.status, 0);
-    EXPECT_THAT(run.err, IsEmpty());
-}
-
-std::vector<std::string> cannotStart(const std::string& what, const std::vector<std::string>& words) {
-    std::vector<std::string> line = {"env", "LD_PRELOAD=" FEW_PROCESSES_LIBRARY, "FEW_PROCESSES=" + what};
-    line.insert(line.end(), words.begin(), words.end());
-    return line;
-}
-
-HOST_TEST(FewProcesses, CommandsThatCannotBeStartedAreCounted) {
-    const SuseHost suse(host);
-    const Finished run = host.run(cannotStart("commands", suse.commandLine({"tree"})));
-    EXPECT_EQ(run.status, 1);
-    EXPECT_THAT(run.err,
-                testing::ContainsRegex("cvagent: the tree has no hard-drive, network-port, ip-config, "
-                                       "processor, and more can be missing: "
-                                       "[1-9][0-9]* commands could not be started, the system gives "
-                                       "no more processes or threads\nRaise the limits of "));
-    EXPECT_THAT(host.callsOf("ethtool"), IsEmpty());
-}
-
-HOST_TEST(FewProcesses, ThreadsThatCannotBeStartedAreTold) {
-    const SuseHost suse(host);
-    const Finished run = host.run(cannotStart("threads", suse.commandLine({"tree"})));
-    EXPECT_EQ(run.status, 1);
-    EXPECT_THAT(run.out, HasSubstr("network-port:eth0"));
-    EXPECT_THAT(run.err, HasSubstr("NetworkMonitor thread failed."));
-    EXPECT_THAT(run.err, HasSubstr("cvagent: some of the tree can be missing: the system gives no more "
-                                   "processes or threads\n"));
-}
-
-HOST_TEST(FewProcesses, ASignalEndsTheProgramWithoutAThreadForIt) {
-    CvagentRun cvagent(host);
-    cvagent.telling("hangstart")
-        .setting("LD_PRELOAD=" FEW_PROCESSES_LIBRARY)
-        .setting("FEW_PROCESSES=threads");
-    RunningProgram tree = cvagent.start({"tree"});
-    ASSERT_TRUE(eventually([&] { return cvagent.diary().find("hanging\n") != std::string::npos; }));
-    tree.signal(SIGTERM);
-    EXPECT_EQ(tree.wait(std::chrono::seconds(1)).status, 128 + SIGTERM);
-}
-
-#if !defined(__SANITIZE_ADDRESS__) && !defined(__SANITIZE_THREAD__)
-// The sanitizers want terabytes. Below some megabytes the loader cannot even load the program and says so.
+// Below some megabytes the loader cannot even load the program and says so.
 HOST_TEST(LittleMemory, IsToldAndNeverACrash) {
     const SuseHost suse(host);
     const std::string whole = host.run(suse.commandLine({"tree"})).out;
