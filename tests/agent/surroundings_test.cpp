@@ -1,17 +1,14 @@
 // The command line, the data directory, the log files, broken plug-ins.
 #include <fcntl.h>
 #include <gmock/gmock.h>
-#include <poll.h>
 #include <signal.h>
 #include <sys/mount.h>
-#include <sys/resource.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <filesystem>
 #include <set>
 
-#include "agent/signals.h"
 #include "agent/surroundings.h"
 #include "tests/agent/cvagent_run.h"
 #include "tests/agent/terminal.h"
