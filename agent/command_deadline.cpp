@@ -3,8 +3,7 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <charconv>
-#include <filesystem>
+#include <cerrno>
 #include <fstream>
 #include <map>
 #include <sstream>
@@ -12,6 +11,8 @@
 #include <vector>
 
 #include "agent/print.h"
+#include "agent/threads.h"
+#include "agent/want.h"
 
 namespace cvagent {
 
@@ -53,19 +54,6 @@ std::string commandText(pid_t process) {
     return words.size() > 2 && words[1] == "-c" ? words.back() : text;
 }
 
-std::vector<pid_t> threads() {
-    std::vector<pid_t> ids;
-    std::error_code ignored;  // a thread that ends meanwhile has no commands
-    for (std::filesystem::directory_iterator task("/proc/self/task", ignored), end; task != end;
-         task.increment(ignored)) {
-        const std::string name = task->path().filename();
-        pid_t id = 0;
-        std::from_chars(name.data(), name.data() + name.size(), id);
-        ids.push_back(id);
-    }
-    return ids;
-}
-
 }  // namespace
 
 CommandDeadline::CommandDeadline(Seconds longest) : longest_(longest) {
@@ -76,6 +64,7 @@ CommandDeadline::CommandDeadline(Seconds longest) : longest_(longest) {
         watcher_ = std::thread([this] { watch(); });
     } catch (const std::system_error&) {
         complain("the system gives no more threads: commands that hang are waited for");
+        noteWant(EAGAIN);
     }
 }
 
@@ -105,7 +94,7 @@ void CommandDeadline::watch() {
         const Seconds step = std::min(Seconds(now - last), 2 * interval);
         last = now;
         std::map<std::pair<pid_t, QX::ChildProcess>, Seconds> present;
-        for (const pid_t thread : threads()) {
+        for (const pid_t thread : ownThreads()) {
             for (const QX::ChildProcess& command : QX::childrenOf(thread)) {
                 const auto known = ages.find({thread, command});
                 Seconds age = known == ages.end() ? Seconds::zero() : known->second + step;

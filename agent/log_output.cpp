@@ -15,6 +15,7 @@
 #include "agent/failure.h"
 #include "agent/print.h"
 #include "agent/surroundings.h"
+#include "agent/want.h"
 #include "framework/cvlog/logger.h"
 
 namespace cvagent {
@@ -77,6 +78,9 @@ public:
     }
 
     void write(const CVLog::LogRecord& record) override {
+        if (record.level >= kErrorLevel) {
+            noteWant(record.message);
+        }
         const bool toLines = lines_ && record.level >= lowest_;
         const auto refused = refusedText(record);
         if (toLines && !(refused && advises_)) {

@@ -5,6 +5,7 @@
 #include "agent/print.h"
 #include "agent/signals.h"
 #include "agent/surroundings.h"
+#include "agent/want.h"
 
 namespace {
 
@@ -30,21 +31,34 @@ ExitStatus run(const Options& options) {
     return ExitStatus::usage;
 }
 
-int runGuarded(Options& options) {
+ExitStatus runGuarded(Options& options) {
     try {
         cvagent::prepareSurroundings(options);
-        return static_cast<int>(run(options));
+        return run(options);
     } catch (const cvagent::Failure& failure) {
         if (*failure.what() != '\0') {
             cvagent::complain(failure.what());
         }
-        return static_cast<int>(failure.status());
+        return failure.status();
     } catch (const cvagent::Interrupted&) {
+        cvagent::complain("nothing was done");
         cvagent::StopSignals::die();
     } catch (const std::exception& exception) {
         cvagent::complain(std::string("unexpected failure: ") + exception.what());
-        return static_cast<int>(ExitStatus::failed);
+        return ExitStatus::failed;
     }
+}
+
+/// What is not shown or not found can be what was wanting.
+ExitStatus judged(ExitStatus status, Command command) {
+    const bool wanting = command != Command::properties && cvagent::tellWant(nullptr);
+    const bool good = status == ExitStatus::done || status == ExitStatus::notFound;
+    return wanting && good ? ExitStatus::failed : status;
+}
+
+/// Before the tables of the program are made, which need memory.
+[[gnu::constructor(101)]] void beforeEverything() {
+    cvagent::failPlainlyWithoutMemory();
 }
 
 }  // namespace
@@ -53,5 +67,5 @@ int main(int count, char** words) {
     cvagent::openStandardDescriptors();
     int status = 0;
     auto options = cvagent::parseCommandLine(count, words, status);
-    return options ? runGuarded(*options) : status;
+    return options ? static_cast<int>(judged(runGuarded(*options), options->command)) : status;
 }

@@ -8,13 +8,15 @@
 #include "agent/private_tmp.h"
 #include "agent/program_path.h"
 #include "agent/signals.h"
+#include "agent/want.h"
 
 namespace cvagent {
 
 namespace {
 
 /// What the agent needs of the /tmp that everybody sees, should it lie there.
-std::vector<std::string> ownPlaces(const Options& options, const std::string& plugin, const DataDirectory& data) {
+std::vector<std::string> ownPlaces(const Options& options, const std::string& plugin,
+                                   const DataDirectory& data) {
     std::vector<std::string> places = directoriesOnPath();
     const std::filesystem::path adapters = adapterDirectory().value_or("");
     places.insert(places.end(), {plugin, programDirectory(), data.path(), adapters.parent_path(),
@@ -29,10 +31,10 @@ Session::Session(const Options& options, Listener* listener)
     hintAtRoot(data_);
     hintAtReadOnly(data_);
     makeTmpPrivate(ownPlaces(options, file_, data_));
+    StopSignals::install();
     if (options.hostTools != HostTools::native) {
         putAdaptersFirst(inspectHostTools(options.hostTools, Look::adapters, adapterDirectory()));
     }
-    StopSignals::install();
     deadline_.emplace(std::chrono::duration<double>(options.commandSeconds));
     try {
         load(listener);
@@ -44,6 +46,7 @@ Session::Session(const Options& options, Listener* listener)
 }
 
 Session::~Session() {
+    const OrderlyEnd unloading;
     plugin_.reset();
     log_.showErrors();
 }
@@ -51,12 +54,7 @@ Session::~Session() {
 void Session::load(Listener* listener) {
     plugin_ = std::make_unique<Plugin>(file_, listener);
     hintAtTemporaryFiles();
-}
-
-void Session::goOnUnlessStopped() {
-    if (StopSignals::received() != 0) {
-        throw Interrupted();
-    }
+    tellWant(&plugin_->interface());
 }
 
 }  // namespace cvagent

@@ -22,8 +22,6 @@ public:
     IC::ManagementInterface& interface() { return plugin_->interface(); }
     const std::string& pluginFile() const { return file_; }
     LogOutput& log() { return log_; }
-    /// Throws Interrupted when a stop signal has come.
-    static void goOnUnlessStopped();
 
 private:
     void load(Listener* listener);

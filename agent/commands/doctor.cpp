@@ -4,6 +4,7 @@
 #include "agent/host_tools.h"
 #include "agent/json.h"
 #include "agent/print.h"
+#include "agent/signals.h"
 
 namespace cvagent::commands {
 
@@ -59,6 +60,7 @@ std::string table(const std::vector<ToolReport>& reports, const Style& style) {
 
 ExitStatus doctor(const Options& options) {
     const Style style = Style::detect();
+    StopSignals::install();
     const std::vector<ToolReport> reports =
         inspectHostTools(options.hostTools, Look::everything, adapterDirectory());
     print(options.json ? json::tools(reports) : table(reports, style));

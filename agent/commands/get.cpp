@@ -94,10 +94,8 @@ ExitStatus verdict(const IC::MutableNode& node, const std::vector<Reading>& read
 ExitStatus get(const Options& options) {
     const Style style = Style::detect();
     Session session(options);
-    Session::goOnUnlessStopped();
     const Handle node = findNode(session.interface(), options.node);
     const std::vector<Reading> readings = readProperties(*node, wantedIds(*node, options.properties));
-    Session::goOnUnlessStopped();
     print(options.json ? json::node(*node, readings) : listing(*node, readings, style));
     session.log().showErrors();
     return verdict(*node, readings, !options.properties.empty());

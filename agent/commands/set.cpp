@@ -1,13 +1,14 @@
+#include <poll.h>
 #include <unistd.h>
 
 #include <cstdio>
-#include <iostream>
 
 #include "agent/command_deadline.h"
 #include "agent/commands/commands.h"
 #include "agent/json.h"
 #include "agent/print.h"
 #include "agent/session.h"
+#include "agent/signals.h"
 #include "agent/tree.h"
 
 namespace cvagent::commands {
@@ -52,6 +53,23 @@ IC::PropertyValue checkedValue(const Property& row, const std::vector<std::strin
     return *value;
 }
 
+/// The line that is typed, with its line break. Less at the end of input and when a signal comes.
+std::string typedLine() {
+    const OrderlyEnd waiting;
+    std::string line;
+    for (char typed = 0; typed != '\n' && StopSignals::received() == 0;) {
+        pollfd ready[] = {{STDIN_FILENO, POLLIN, 0}, {StopSignals::descriptor(), POLLIN, 0}};
+        if (poll(ready, 2, -1) < 0 || ready[0].revents == 0) {
+            continue;
+        }
+        if (read(STDIN_FILENO, &typed, 1) != 1) {
+            break;
+        }
+        line += typed;
+    }
+    return line;
+}
+
 /// Restarting and halting are asked for twice.
 void confirmPower(const IC::MutableNode& node, const Property& row, const IC::PropertyValue& value,
                   bool yes) {
@@ -66,9 +84,12 @@ void confirmPower(const IC::MutableNode& node, const Property& row, const IC::Pr
         throw Failure(ExitStatus::usage, "this would " + what + " the host; add --yes to do it");
     }
     ask("This will " + what + " the host at once. Go on? [y/N] ");
-    std::string answer;
-    std::getline(std::cin, answer);
-    if (answer != "y" && answer != "Y" && answer != "yes") {
+    const std::string answer = typedLine();
+    if (StopSignals::received() != 0) {
+        ask("\n");
+        throw Interrupted();
+    }
+    if (answer != "y\n" && answer != "Y\n" && answer != "yes\n") {
         throw Failure(ExitStatus::refused, "nothing was done");
     }
 }
@@ -125,7 +146,6 @@ void writeOnly(const IC::MutableNode& node, const Property& row, const Options& 
 ExitStatus set(const Options& options) {
     const Style style = Style::detect();
     Session session(options);
-    Session::goOnUnlessStopped();
     const Handle node = findNode(session.interface(), options.node);
     const Property row = writableRow(*node, options.property);
     const IC::PropertyValue value = checkedValue(row, options.values);

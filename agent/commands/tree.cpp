@@ -86,7 +86,6 @@ std::string drawing(const std::vector<Handle>& nodes, const Style& style) {
 ExitStatus tree(const Options& options) {
     const Style style = Style::detect();
     Session session(options);
-    Session::goOnUnlessStopped();
     const std::vector<Handle> nodes = session.interface().holdAll();
     print(options.json ? json::tree(session.pluginFile(), nodes) : drawing(nodes, style));
     return ExitStatus::done;

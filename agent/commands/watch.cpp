@@ -101,8 +101,10 @@ void follow(EventQueue& queue, const Options& options, const Style& style) {
 ExitStatus watch(const Options& options) {
     const Style style = Style::detect();
     EventQueue queue;
+    std::optional<OrderlyEnd> waiting;  // to the end of the plug-in and of its last events
     {
         Session session(options, &queue);
+        waiting.emplace();
         complain("watching " + std::to_string(session.interface().holdAll().size()) + " nodes" +
                  (options.seconds ? "" : "; Ctrl-C ends it"));
         follow(queue, options, style);
