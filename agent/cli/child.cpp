@@ -12,6 +12,7 @@
 #include <csignal>
 #include <thread>
 
+#include "agent/shell/starts.h"
 #include "framework/qx/process_tree.h"
 
 namespace cvagent {
@@ -60,6 +61,7 @@ void Child::spawn(const std::string& program, int input, int output) {
     setUp(attributes);
     std::string name = program;
     std::array<char*, 2> words{name.data(), nullptr};
+    const shell::Start start;
     error_ = posix_spawn(&process_, program.c_str(), &actions, &attributes, words.data(), environ);
     posix_spawnattr_destroy(&attributes);
     posix_spawn_file_actions_destroy(&actions);

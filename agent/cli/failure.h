@@ -29,7 +29,7 @@ private:
     ExitStatus status_;
 };
 
-/// A stop signal came while a command that prints one answer was at work.
+/// A stop signal came in place of the answer to a question.
 struct Interrupted {};
 
 }  // namespace cvagent

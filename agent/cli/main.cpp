@@ -6,6 +6,7 @@
 #include "agent/cli/session.h"
 #include "agent/core/signals.h"
 #include "agent/core/surroundings.h"
+#include "agent/core/want.h"
 
 namespace {
 
@@ -36,18 +37,17 @@ Question questionOf(Command command) {
 ExitStatus run(const Options& options) {
     if (const Question ask = questionOf(options.command)) {
         cvagent::Session session(options);
-        cvagent::goOnUnlessStopped();
         return session.statusAfter(ask(session, options));
     }
     return options.command == Command::doctor ? cvagent::commands::doctor(options)
                                               : cvagent::commands::properties(options);
 }
 
-int endWith(const cvagent::Failure& failure) {
+ExitStatus endWith(const cvagent::Failure& failure) {
     if (*failure.what() != '\0') {
         cvagent::complain(failure.what());
     }
-    return static_cast<int>(failure.status());
+    return failure.status();
 }
 
 /// Files that the command line names; they are meant from where the program was started.
@@ -64,21 +64,34 @@ std::vector<std::string*> filesIn(Options& options) {
     return files;
 }
 
-int runGuarded(Options& options) {
+ExitStatus runGuarded(Options& options) {
     try {
         cvagent::Style::detect();  // before the locale goes
         cvagent::prepareSurroundings(filesIn(options));
-        return static_cast<int>(run(options));
+        return run(options);
     } catch (const cvagent::Failure& failure) {
         return endWith(failure);
     } catch (const cvagent::Problem& problem) {
         return endWith(cvagent::Failure(problem));
     } catch (const cvagent::Interrupted&) {
+        cvagent::complain("nothing was done");
         cvagent::StopSignals::die();
     } catch (const std::exception& exception) {
         cvagent::complain(std::string("unexpected failure: ") + exception.what());
-        return static_cast<int>(ExitStatus::failed);
+        return ExitStatus::failed;
     }
+}
+
+/// What is not shown or not found can be what was wanting.
+ExitStatus judged(ExitStatus status, Command command) {
+    const bool wanting = command != Command::properties && cvagent::tellWant(nullptr, cvagent::complain);
+    const bool good = status == ExitStatus::done || status == ExitStatus::notFound;
+    return wanting && good ? ExitStatus::failed : status;
+}
+
+/// Before the tables of the program are made, which need memory.
+[[gnu::constructor(101)]] void beforeEverything() {
+    cvagent::failPlainlyWithoutMemory(static_cast<int>(ExitStatus::failed));
 }
 
 }  // namespace
@@ -87,5 +100,5 @@ int main(int count, char** words) {
     cvagent::openStandardDescriptors();
     int status = 0;
     auto options = cvagent::parseCommandLine(count, words, status);
-    return options ? runGuarded(*options) : status;
+    return options ? static_cast<int>(judged(runGuarded(*options), options->command)) : status;
 }

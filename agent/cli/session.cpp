@@ -8,6 +8,7 @@
 #include "agent/core/program_path.h"
 #include "agent/core/signals.h"
 #include "agent/core/surroundings.h"
+#include "agent/core/want.h"
 
 namespace cvagent {
 
@@ -37,10 +38,10 @@ Session::Session(const Options& options) {
     hint(hintAtRoot(*data_), "\nTo see everything run: sudo cvagent");
     hint(hintAtReadOnly(*data_));
     makeTmpPrivate(ownPlaces(options, settings));
+    StopSignals::install();
     if (options.hostTools != HostTools::native) {
         putAdaptersFirst(inspectHostTools(options.hostTools, Look::adapters, adapterDirectory()));
     }
-    StopSignals::install();
     try {
         start(settings);
     } catch (const Problem&) {
@@ -61,6 +62,8 @@ void Session::start(const AgentSettings& settings) {
         pluginMissing_ = true;
     }
     hint(hintAtTemporaryFiles());
+    const std::vector<Handle> nodes = handlesOf(agent_->nodes());
+    tellWant(&nodes, complain);
 }
 
 /// The log is opened here, before /tmp becomes another one.
@@ -97,6 +100,7 @@ std::vector<std::string> Session::ownPlaces(const Options& options, const AgentS
 }
 
 void Session::end() {
+    const OrderlyEnd unloading;
     agent_.reset();
     show(*errors_);
 }
@@ -112,12 +116,6 @@ ExitStatus Session::statusAfter(ExitStatus own) const {
 
 Request ownRequest() {
     return Request("the command line");
-}
-
-void goOnUnlessStopped() {
-    if (StopSignals::received() != 0) {
-        throw Interrupted();
-    }
 }
 
 }  // namespace cvagent

@@ -41,7 +41,5 @@ private:
 
 /// A request of whoever typed the command: he waits for as long as it takes.
 Request ownRequest();
-/// Throws Interrupted when a stop signal has come.
-void goOnUnlessStopped();
 
 }  // namespace cvagent

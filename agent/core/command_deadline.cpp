@@ -3,13 +3,14 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <charconv>
-#include <filesystem>
+#include <cerrno>
 #include <fstream>
 #include <map>
 #include <sstream>
 #include <system_error>
 #include <vector>
+#include "agent/core/threads.h"
+#include "agent/core/want.h"
 
 namespace cvagent {
 
@@ -51,19 +52,6 @@ std::string commandText(pid_t process) {
     return words.size() > 2 && words[1] == "-c" ? words.back() : text;
 }
 
-std::vector<pid_t> threads() {
-    std::vector<pid_t> ids;
-    std::error_code ignored;  // a thread that ends meanwhile has no commands
-    for (std::filesystem::directory_iterator task("/proc/self/task", ignored), end; task != end;
-         task.increment(ignored)) {
-        const std::string name = task->path().filename();
-        pid_t id = 0;
-        std::from_chars(name.data(), name.data() + name.size(), id);
-        ids.push_back(id);
-    }
-    return ids;
-}
-
 }  // namespace
 
 CommandDeadline::CommandDeadline(Seconds longest, std::function<void(const std::string&)> tell)
@@ -75,6 +63,7 @@ CommandDeadline::CommandDeadline(Seconds longest, std::function<void(const std::
         watcher_ = std::thread([this] { watch(); });
     } catch (const std::system_error&) {
         tell_("the system gives no more threads: commands that hang are waited for");
+        noteWant(EAGAIN);
     }
 }
 
@@ -104,7 +93,7 @@ void CommandDeadline::watch() {
         const Seconds step = std::min(Seconds(now - last), 2 * interval);
         last = now;
         std::map<std::pair<pid_t, QX::ChildProcess>, Seconds> present;
-        for (const pid_t thread : threads()) {
+        for (const pid_t thread : ownThreads()) {
             for (const QX::ChildProcess& command : QX::childrenOf(thread)) {
                 const auto known = ages.find({thread, command});
                 Seconds age = known == ages.end() ? Seconds::zero() : known->second + step;

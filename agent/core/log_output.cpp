@@ -14,6 +14,7 @@
 
 #include "agent/core/problem.h"
 #include "agent/core/text.h"
+#include "agent/core/want.h"
 #include "framework/cvlog/logger.h"
 
 namespace cvagent {
@@ -79,6 +80,9 @@ public:
     }
 
     void write(const CVLog::LogRecord& record) override {
+        if (record.level >= kErrorLevel) {
+            noteWant(record.message);
+        }
         const bool toLines = lines_ && record.level >= lowest_;
         const auto refused = refusedText(record);
         if (toLines && !(refused && advises_)) {

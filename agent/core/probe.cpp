@@ -12,6 +12,9 @@
 #include <csignal>
 #include <utility>
 
+#include "agent/core/want.h"
+#include "agent/shell/starts.h"
+
 namespace cvagent {
 
 namespace {
@@ -31,9 +34,11 @@ pid_t spawn(std::vector<std::string>& words, int output) {
     posix_spawn_file_actions_adddup2(&actions, output, STDOUT_FILENO);
     posix_spawn_file_actions_addopen(&actions, STDERR_FILENO, "/dev/null", O_WRONLY, 0);
     pid_t process = -1;
+    const shell::Start start;
     const int error =
         posix_spawn(&process, words.front().c_str(), &actions, nullptr, arguments.data(), environ);
     posix_spawn_file_actions_destroy(&actions);
+    noteWant(error);
     return error == 0 ? process : -1;
 }
 
@@ -42,6 +47,7 @@ pid_t spawn(std::vector<std::string>& words, int output) {
 Probe::Probe(std::vector<std::string> words) {
     std::array<int, 2> ends{-1, -1};
     if (pipe2(ends.data(), O_CLOEXEC) != 0) {
+        noteWant(errno);
         return;
     }
     pipe_ = ends[0];

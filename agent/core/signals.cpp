@@ -1,28 +1,41 @@
 #include "agent/core/signals.h"
 
 #include <fcntl.h>
+#include <semaphore.h>
+#include <sys/prctl.h>
+#include <sys/time.h>
 #include <unistd.h>
 
 #include <array>
+#include <atomic>
 #include <cerrno>
+#include <chrono>
 #include <csignal>
 #include <cstdlib>
+#include <exception>
+#include <system_error>
+#include <thread>
+
+#include "agent/core/threads.h"
+#include "agent/shell/starts.h"
+#include "framework/qx/process_tree.h"
 
 namespace cvagent {
 
 namespace {
 
-volatile std::sig_atomic_t receivedSignal = 0;
+using Clock = std::chrono::steady_clock;
+using namespace std::chrono_literals;
+
+// Together less than the second after which whoever sent the signal may give up.
+constexpr auto kOrder = 600ms;         // for an orderly end
+constexpr auto kSearch = 150ms;        // for the commands that run; one that a device holds cannot be killed
+constexpr suseconds_t kLast = 250000;  // microseconds until the program dies even if the search hangs
+
+std::atomic<int> receivedSignal{0};
+std::atomic<int> orderly{0};
 std::array<int, 2> wakeUp{-1, -1};
-
-void remember(int signal) {
-    const int savedErrno = errno;
-    receivedSignal = signal;
-    [[maybe_unused]] const ssize_t written = write(wakeUp[1], "", 1);  // a full pipe is readable already
-    errno = savedErrno;
-}
-
-void passOver(int /*signal*/) {}
+sem_t arrived;
 
 void handle(int signal, void (*handler)(int)) {
     struct sigaction action {};
@@ -32,19 +45,79 @@ void handle(int signal, void (*handler)(int)) {
     sigaction(signal, &action, nullptr);
 }
 
+void remember(int signal) {
+    const int savedErrno = errno;
+    int none = 0;
+    if (receivedSignal.compare_exchange_strong(none, signal) && orderly == 0) {
+        shell::declareStop();
+    }
+    // The same Ctrl-C kills shells: what they leave behind is to be found among our children.
+    prctl(PR_SET_CHILD_SUBREAPER, 1, 0, 0, 0);
+    sem_post(&arrived);
+    [[maybe_unused]] const ssize_t written = write(wakeUp[1], "", 1);  // a full pipe is readable already
+    errno = savedErrno;
+}
+
+void passOver(int /*signal*/) {}
+
+void dieAtLast(int /*signal*/) {
+    StopSignals::die();
+}
+
+/// @return whether one was alive before
+bool killCommands() {
+    bool any = false;
+    for (const pid_t thread : ownThreads()) {
+        any = any || !QX::childrenOf(thread).empty();
+        QX::killChildrenOf(thread);
+    }
+    return any;
+}
+
+[[noreturn]] void endNow() {
+    shell::declareStop();
+    handle(SIGALRM, dieAtLast);
+    const itimerval last{{0, 0}, {0, kLast}};
+    setitimer(ITIMER_REAL, &last, nullptr);
+    const auto end = Clock::now() + kSearch;
+    try {
+        bool more = true;
+        while (more && Clock::now() < end) {
+            const bool starting = shell::startsUnderWay() != 0;
+            more = killCommands() || starting;
+            std::this_thread::sleep_for(1ms);
+        }
+    } catch (const std::exception&) {
+        // No memory to look for them.
+    }
+    StopSignals::die();
+}
+
+void waitForSignal() {
+    while (sem_wait(&arrived) != 0) {
+    }
+    for (const auto end = Clock::now() + kOrder; !shell::isStopped() && Clock::now() < end;) {
+        std::this_thread::sleep_for(5ms);
+    }
+    endNow();
+}
+
 }  // namespace
 
 void StopSignals::install() {
-    if (wakeUp[0] >= 0) {
+    handle(SIGPIPE, passOver);
+    sem_init(&arrived, 0, 0);
+    try {
+        std::thread(waitForSignal).detach();
+    } catch (const std::system_error&) {
         return;
     }
     if (pipe2(wakeUp.data(), O_CLOEXEC | O_NONBLOCK) != 0) {
-        return;  // the process has no descriptors left: signals keep ending it at once
+        wakeUp = {-1, -1};
     }
     for (const int signal : {SIGINT, SIGTERM, SIGHUP}) {
         handle(signal, remember);
     }
-    handle(SIGPIPE, passOver);
 }
 
 int StopSignals::received() {
@@ -60,6 +133,14 @@ void StopSignals::die() {
     handle(signal, SIG_DFL);
     kill(getpid(), signal);
     std::_Exit(128 + signal);
+}
+
+OrderlyEnd::OrderlyEnd() {
+    ++orderly;
+}
+
+OrderlyEnd::~OrderlyEnd() {
+    --orderly;
 }
 
 }  // namespace cvagent

@@ -2,20 +2,36 @@
 
 namespace cvagent {
 
-/// SIGINT, SIGTERM and SIGHUP asked of the program: remembered, so that the plug-in is unloaded in order, and
-/// shown on a descriptor, so that a wait for events ends. The handlers do nothing else. SIGPIPE is made an
-/// error of the write. Handlers, unlike ignored or blocked signals, do not reach the commands the plug-in
-/// starts.
+/// SIGINT, SIGTERM and SIGHUP asked of the program. It ends within a second, whatever hangs:
+/// - while somebody has said that it may end in order (OrderlyEnd) it goes on, to stop the plug-in and remove
+///   the plug-in's files, but not for long;
+/// - at any other time, and when that takes too long, no command begins any more, those that run are killed
+///   with all they have started, and the program dies by the signal. Nobody waits for the other threads: what
+///   they hang in may never return.
+/// A second signal changes nothing. SIGPIPE is made an error of the write. Handlers, unlike ignored or
+/// blocked signals, do not reach the commands the plug-in starts.
 class StopSignals {
 public:
-    /// Installs the handlers, once for the process.
+    /// Installs the handlers and starts the thread that ends the process. To be called once, before the first
+    /// command begins and after what a process does before its first thread. Where the system
+    /// gives no thread, signals keep ending the program at once.
     static void install();
-    /// The signal that came, 0 for none yet.
+    /// The signal that came first, 0 for none yet.
     static int received();
-    /// Becomes readable when a signal comes. Nobody reads it.
+    /// Becomes readable when a signal comes. Nobody reads it. -1 when there are no descriptors left.
     static int descriptor();
     /// Ends the process by the signal that came, as its parent expects to see it.
     [[noreturn]] static void die();
+};
+
+/// While it lives, the thread that made it is at nothing that hangs, or knows how to end it: it looks for
+/// StopSignals::received, or is about to leave anyway.
+class OrderlyEnd {
+public:
+    OrderlyEnd();
+    OrderlyEnd(const OrderlyEnd&) = delete;
+    OrderlyEnd& operator=(const OrderlyEnd&) = delete;
+    ~OrderlyEnd();
 };
 
 }  // namespace cvagent

@@ -13,7 +13,7 @@ namespace QX {
 /// shell's pipeline is stopped as a whole before anything of it dies, so that no stage escapes and keeps the
 /// pipe open.
 /// @param thread kernel id of the thread; it must be alive
-void killChildrenOf(pid_t thread);
+CORVISTA_API void killChildrenOf(pid_t thread);
 
 /// A child process: its number and, since numbers are given out again, when it started.
 struct ChildProcess {

@@ -1,6 +1,6 @@
 // A plug-in small enough to know all of: a tree of a few nodes, properties that are slow, failing or
-// throwing, and threads that publish, withdraw and alert. CORVISTA_FAKE_PLUGIN, a list of words, tells it what to do
-// besides:
+// throwing, and threads that publish, withdraw and alert. CORVISTA_FAKE_PLUGIN, a list of words, tells it
+// what to do besides:
 //   fail, null, throw       OpenMI returns 7, hands out nothing, throws
 //   throwseven              OpenMI throws what is no exception
 //   badstart, throwstart    initialize fails, throws
@@ -9,7 +9,9 @@
 //   asks once
 //                           more when the library is closed
 //   manyerrors              initialize logs sixty different errors
-//   slow                    initialize takes half a second
+//   hangstart, hangstop     initialize, unload never return
+//   slowstop                unload takes a tenth of a second
+//   command                 initialize runs a command that hangs, and notes what it tells
 //   errors                  initialize logs errors
 //   churn                   a thread publishes and withdraws drives until unload
 //   alert                   a thread sends one alert
@@ -21,8 +23,10 @@
 // CORVISTA_FAKE_PLUGIN_DIARY names a file that gets a line for each write and for the unload.
 #include <unistd.h>
 
+#include <array>
 #include <atomic>
 #include <chrono>
+#include <cstdio>
 #include <cstdlib>
 #include <fstream>
 #include <map>
@@ -48,6 +52,21 @@ void note(const std::string& line) {
     if (const char* file = std::getenv("CORVISTA_FAKE_PLUGIN_DIARY")) {
         std::ofstream(file, std::ios::app) << line << std::endl;
     }
+}
+
+[[noreturn]] void hang() {
+    note("hanging");
+    for (;;) {
+        std::this_thread::sleep_for(std::chrono::hours(1));
+    }
+}
+
+/// The first word that a command prints, after its end.
+std::string outputOf(const char* command) {
+    std::array<char, 100> word{"nothing"};
+    FILE* const pipe = popen(command, "r");
+    const bool told = pipe != nullptr && fgets(word.data(), word.size(), pipe) != nullptr;
+    return pipe == nullptr || pclose(pipe) != 0 || !told ? "nothing" : word.data();
 }
 
 void logError(const std::string& message) {
@@ -166,9 +185,11 @@ public:
             throw std::runtime_error("cannot start");
         }
         build();
-        if (told("slow")) {
-            note("slow");
-            std::this_thread::sleep_for(std::chrono::milliseconds(500));
+        if (told("hangstart")) {
+            hang();
+        }
+        if (told("command")) {
+            note(outputOf("echo command >> \"$CORVISTA_FAKE_PLUGIN_DIARY\"; exec sleep 1000"));
         }
         if (told("find")) {
             askTheAgent();
@@ -207,6 +228,13 @@ public:
         }
         if (told("late")) {
             sendAlert();
+        }
+        if (told("hangstop")) {
+            hang();
+        }
+        if (told("slowstop")) {
+            note("slow");
+            std::this_thread::sleep_for(std::chrono::milliseconds(100));
         }
         FakeNode::ready = false;
         note("unload");

@@ -1,17 +1,14 @@
 // The command line, the data directory, the log files, broken plug-ins.
 #include <fcntl.h>
 #include <gmock/gmock.h>
-#include <poll.h>
 #include <signal.h>
 #include <sys/mount.h>
-#include <sys/resource.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <filesystem>
 #include <set>
 
-#include "agent/core/signals.h"
 #include "agent/core/surroundings.h"
 #include "tests/agent/cvagent_run.h"
 #include "tests/agent/terminal.h"
@@ -135,26 +132,6 @@ HOST_TEST(QuietCommands, LeaveStandardErrorAloneWhereThereIsNothingToSendItTo) {
     EXPECT_EQ(open("/dev/null", O_WRONLY | O_CLOEXEC), -1);
 }
 
-HOST_TEST(StopSignals, AreRememberedOnceTheyAreInstalled) {
-    using cvagent::StopSignals;
-    const rlimit none{0, 1024};
-    setrlimit(RLIMIT_NOFILE, &none);
-    StopSignals::install();
-    EXPECT_EQ(StopSignals::descriptor(), -1);
-    const rlimit some{1024, 1024};
-    setrlimit(RLIMIT_NOFILE, &some);
-    StopSignals::install();
-    const int descriptor = StopSignals::descriptor();
-    EXPECT_GE(descriptor, 0);
-    StopSignals::install();
-    EXPECT_EQ(StopSignals::descriptor(), descriptor);
-    EXPECT_EQ(StopSignals::received(), 0);
-    raise(SIGHUP);
-    EXPECT_EQ(StopSignals::received(), SIGHUP);
-    pollfd ready{descriptor, POLLIN, 0};
-    EXPECT_EQ(poll(&ready, 1, 0), 1);
-}
-
 TEST(WithoutRoot, SaysWhatWillBeMissingAndUsesTheHome) {
     const std::filesystem::path home =
         std::filesystem::temp_directory_path() / ("cvagent-home-" + std::to_string(getpid()));
@@ -260,9 +237,10 @@ HOST_TEST(Plugins, ThatAreNotBesideTheProgramAreMissed) {
     host.file("/opt/lib/libvantrelcvframework.so.1", host.read(FRAMEWORK_FILE).value_or(""));
     const Finished run = host.run({"/opt/bin/cvagent", "tree"});
     EXPECT_EQ(run.status, 1);
-    EXPECT_EQ(run.err,
-              "cvagent: there is no libvantrelcvicoshwmi.so.1 beside this program, which lies in '/opt/bin'; name "
-              "the plug-in with --plugin FILE\n");
+    EXPECT_EQ(
+        run.err,
+        "cvagent: there is no libvantrelcvicoshwmi.so.1 beside this program, which lies in '/opt/bin'; name "
+        "the plug-in with --plugin FILE\n");
 }
 
 HOST_TEST(BrokenPlugins, ThatCannotStopAreNamedAndTheCommandCounts) {

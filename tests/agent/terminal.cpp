@@ -8,8 +8,10 @@
 
 #include <array>
 #include <cerrno>
+#include <csignal>
 #include <cstdlib>
 #include <filesystem>
+#include <functional>
 #include <stdexcept>
 
 namespace {
@@ -27,7 +29,8 @@ constexpr unsigned int kNobody = 65534;
 }
 
 /// Everything the program prints until it closes its end.
-OnTerminal follow(pid_t process, int descriptor) {
+/// @param printed hears of all that was printed so far, whenever there is more
+OnTerminal follow(pid_t process, int descriptor, const std::function<void(const std::string&)>& printed) {
     std::string output;
     std::array<char, 4096> part{};
     for (;;) {
@@ -39,6 +42,7 @@ OnTerminal follow(pid_t process, int descriptor) {
             break;
         }
         output.append(part.data(), static_cast<std::size_t>(size));
+        printed(output);
     }
     close(descriptor);
     int status = 0;
@@ -66,9 +70,11 @@ std::string temporaryDirectory() {
     return name;
 }
 
-}  // namespace
-
-OnTerminal runOnTerminal(const std::vector<std::string>& words, const std::string& typed) {
+/// Runs a program on a terminal.
+/// @param begun gets the terminal and the process, and says what is to be done with what is printed
+OnTerminal onTerminal(
+    const std::vector<std::string>& words,
+    const std::function<std::function<void(const std::string&)>(int terminal, pid_t process)>& begun) {
     provideTerminals();
     const std::string data = temporaryDirectory();
     int terminal = -1;
@@ -82,10 +88,30 @@ OnTerminal runOnTerminal(const std::vector<std::string>& words, const std::strin
         unsetenv("NO_COLOR");
         become(words);
     }
-    [[maybe_unused]] const ssize_t written = write(terminal, typed.data(), typed.size());
-    const OnTerminal result = follow(process, terminal);
+    const OnTerminal result = follow(process, terminal, begun(terminal, process));
     std::filesystem::remove_all(data);
     return result;
+}
+
+void ignore(const std::string& /*output*/) {}
+
+}  // namespace
+
+OnTerminal runOnTerminal(const std::vector<std::string>& words, const std::string& typed) {
+    return onTerminal(words, [&](int terminal, pid_t /*process*/) {
+        [[maybe_unused]] const ssize_t written = write(terminal, typed.data(), typed.size());
+        return ignore;
+    });
+}
+
+OnTerminal stopOnTerminal(const std::vector<std::string>& words, const std::string& awaited, int signal) {
+    return onTerminal(words, [&](int /*terminal*/, pid_t process) {
+        return [&, process, sent = false](const std::string& output) mutable {
+            if (!sent && output.find(awaited) != std::string::npos) {
+                sent = kill(process, signal) == 0;
+            }
+        };
+    });
 }
 
 void makeForNobody(const std::string& directory) {
@@ -113,5 +139,5 @@ OnTerminal runAsNobody(const std::vector<std::string>& words, const std::string&
         become(words);
     }
     close(ends[1]);
-    return follow(process, ends[0]);
+    return follow(process, ends[0], ignore);
 }

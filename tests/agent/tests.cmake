@@ -36,6 +36,13 @@ target_compile_definitions(agent_test PRIVATE ${agent_test_programs}
   HOSTTOOLS_PROGRAM="$<TARGET_FILE:corvista-hosttools>" CMAKE_PROGRAM="${CMAKE_COMMAND}")
 add_dependencies(agent_test cvagent corvista-hosttools fake_plugin tiny_front_end vantrelcvicoshwmi)
 
+corvista_test(agent_signals LIBRARIES test_support util SOURCES
+  agent/signals_test.cpp
+  agent/terminal.cpp
+  agent/want_test.cpp)
+target_compile_definitions(agent_signals_test PRIVATE ${agent_test_programs} FEW_PROCESSES_LIBRARY="$<TARGET_FILE:fewprocesses>")
+add_dependencies(agent_signals_test cvagent fake_plugin fewprocesses vantrelcvicoshwmi)
+
 corvista_test(agent_suse_host LIBRARIES test_support SOURCES
   agent/suse_host_test.cpp)
 target_compile_definitions(agent_suse_host_test PRIVATE ${agent_test_programs})
@@ -60,6 +67,7 @@ add_dependencies(agent_kernel_tree_test cvagent vantrelcvicoshwmi corvista-hostt
 
 corvista_test(agent_hostile LIBRARIES agent_cli agent_core test_support LABELS threads SOURCES
   agent/command_deadline_test.cpp
+  agent/door_test.cpp
   agent/hostile_output_test.cpp
   agent/hostile_surroundings_test.cpp
   agent/hostile_test.cpp

@@ -1,10 +1,8 @@
-// watch, and what signals do to every command.
+// watch, by running the program.
 #include <gmock/gmock.h>
-#include <signal.h>
 
 #include <nlohmann/json.hpp>
 #include <sstream>
-#include <thread>
 
 #include "tests/agent/cvagent_run.h"
 
@@ -12,15 +10,8 @@ namespace {
 
 using testing::EndsWith;
 using testing::HasSubstr;
-using testing::IsEmpty;
 using testing::StartsWith;
 using Json = nlohmann::ordered_json;
-
-void waitFor(const CvagentRun& cvagent, const std::string& note) {
-    for (int i = 0; i < 1000 && cvagent.diary().find(note) == std::string::npos; ++i) {
-        std::this_thread::sleep_for(std::chrono::milliseconds(10));
-    }
-}
 
 HOST_TEST(WatchCommand, PrintsPublishedAndWithdrawnNodes) {
     const Finished run = CvagentRun(host).telling("churn")({"watch", "--for", "1"});
@@ -69,50 +60,6 @@ HOST_TEST(WatchCommand, ShowsTheChangeThatIsSeenWhileThePluginStops) {
     const Finished run = CvagentRun(host).telling("late")({"watch", "--for", "0"});
     EXPECT_EQ(run.status, 0);
     EXPECT_THAT(run.out, HasSubstr("NIC is Offline"));
-}
-
-HOST_TEST(WatchCommand, ASignalUnloadsThePluginAndIsNoFailure) {
-    for (const int number : {SIGINT, SIGTERM}) {
-        host.remove("/var/diary");
-        CvagentRun cvagent(host);
-        cvagent.telling("churn");
-        RunningProgram watch = cvagent.start({"watch"});
-        ASSERT_TRUE(watch.waitForOutput("withdrawn"));
-        watch.signal(number);
-        const Finished run = watch.wait(std::chrono::seconds(10));
-        EXPECT_EQ(run.status, 0) << number;
-        EXPECT_THAT(cvagent.diary(), EndsWith("\nunload\n"));
-    }
-}
-
-HOST_TEST(Signals, EndOtherCommandsAfterTheUnload) {
-    for (const int number : {SIGINT, SIGTERM, SIGHUP}) {
-        host.remove("/var/diary");
-        CvagentRun cvagent(host);
-        cvagent.telling("slow");
-        RunningProgram tree = cvagent.start({"tree"});
-        waitFor(cvagent, "slow");
-        tree.signal(number);
-        const Finished run = tree.wait(std::chrono::seconds(10));
-        EXPECT_EQ(run.status, 128 + number);
-        EXPECT_THAT(run.out, IsEmpty());
-        EXPECT_THAT(cvagent.diary(), EndsWith("\nunload\n"));
-    }
-}
-
-HOST_TEST(Signals, AReaderThatHasSeenEnoughIsNoDrama) {
-    CvagentRun cvagent(host);
-    cvagent.telling("churn");
-    std::string line;
-    for (const std::string& word : cvagent.commandLine({"watch"})) {
-        line += "'" + word + "' ";
-    }
-    const Finished run = host.run({"sh", "-c", line + "| head -n 1"});
-    EXPECT_EQ(run.status, 0);
-    EXPECT_THAT(run.err, StartsWith("cvagent: watching"));
-    EXPECT_THAT(run.err, testing::Not(HasSubstr("cannot write")));
-    waitFor(cvagent, "unload");
-    EXPECT_THAT(cvagent.diary(), EndsWith("\nunload\n"));
 }
 
 HOST_TEST(WatchCommand, ErrorsOfThePluginAreShownAsTheyCome) {

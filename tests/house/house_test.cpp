@@ -24,8 +24,9 @@ const std::map<std::string, std::set<std::string>> kMayInclude = {
     {"network", {"network", "mi", "framework"}},
     {"indications", {"indications", "mi", "framework"}},
     {"cpu", {"cpu", "mi", "framework"}},
-    {"agent/core", {"agent/core", "framework"}},
-    {"agent/cli", {"agent/cli", "agent/core", "framework"}},
+    {"agent/shell", {"agent/shell", "hosttools"}},
+    {"agent/core", {"agent/core", "agent/shell", "framework"}},
+    {"agent/cli", {"agent/cli", "agent/core", "agent/shell", "framework"}},
     {"hosttools", {"hosttools"}},
 };
 const std::set<std::string> kPlugin = {"mi", "computer", "storage", "network", "indications", "cpu"};
@@ -43,7 +44,8 @@ std::string roomOf(const fs::path& file) {
 std::vector<fs::path> sources(const std::string& room) {
     std::vector<fs::path> found;
     for (const auto& entry : fs::recursive_directory_iterator(kTree / room)) {
-        if (entry.path().extension() == ".cpp" || entry.path().extension() == ".h") {
+        const bool source = entry.path().extension() == ".cpp" || entry.path().extension() == ".h";
+        if (source && roomOf(fs::relative(entry.path(), kTree)) == room) {
             found.push_back(entry.path());
         }
     }

@@ -4,7 +4,7 @@
 #include "agent/cli/json.h"
 #include "agent/cli/print.h"
 #include "agent/core/host_tools.h"
-#include "agent/core/surroundings.h"
+#include "agent/core/signals.h"
 
 namespace cvagent::commands {
 
@@ -60,6 +60,7 @@ std::string table(const std::vector<ToolReport>& reports, const Style& style) {
 
 ExitStatus doctor(const Options& options) {
     const Style style = Style::detect();
+    StopSignals::install();
     const std::vector<ToolReport> reports =
         inspectHostTools(options.hostTools, Look::everything, adapterDirectory());
     print(options.json ? json::tools(reports) : table(reports, style));

@@ -1,0 +1,77 @@
+// popen, pclose and system as a plug-in finds them that this program has loaded: the loader looks in the
+// program first. They do what the C library's do, and besides two things: they end with a stop, and they know
+// of commands that could not be started.
+#include <dlfcn.h>
+#include <spawn.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <array>
+#include <cerrno>
+#include <cstdio>
+#include <cstdlib>
+
+#include "agent/shell/starts.h"
+
+#define CVAGENT_DOOR extern "C" __attribute__((visibility("default")))
+
+namespace {
+
+using cvagent::shell::countNotStarted;
+using cvagent::shell::Start;
+
+template <class Function>
+Function inLibrary(const char* name) {
+    return reinterpret_cast<Function>(dlsym(RTLD_NEXT, name));
+}
+
+int waitFor(pid_t process) {
+    int status = -1;
+    while (waitpid(process, &status, 0) < 0) {
+        if (errno != EINTR) {
+            return -1;
+        }
+    }
+    return status;
+}
+
+}  // namespace
+
+CVAGENT_DOOR FILE* popen(const char* command, const char* mode) {
+    static const auto original = inLibrary<FILE* (*)(const char*, const char*)>("popen");
+    const Start start;
+    FILE* const pipe = original(command, mode);
+    if (pipe == nullptr) {
+        countNotStarted(errno);
+    }
+    return pipe;
+}
+
+CVAGENT_DOOR int pclose(FILE* pipe) {
+    static const auto original = inLibrary<int (*)(FILE*)>("pclose");
+    const int status = original(pipe);
+    cvagent::shell::holdWhenStopped();
+    return status;
+}
+
+// Not the C library's: that one has the whole program ignore SIGINT for as long as the command runs.
+CVAGENT_DOOR int system(const char* command) {
+    if (command == nullptr) {
+        return 1;  // there is a shell
+    }
+    std::array<char*, 4> words{const_cast<char*>("sh"), const_cast<char*>("-c"), const_cast<char*>(command),
+                               nullptr};
+    pid_t process = -1;
+    {
+        const Start start;
+        const int error = posix_spawn(&process, "/bin/sh", nullptr, nullptr, words.data(), environ);
+        if (error != 0) {
+            countNotStarted(error);
+            errno = error;
+            return -1;
+        }
+    }
+    const int status = waitFor(process);
+    cvagent::shell::holdWhenStopped();
+    return status;
+}
