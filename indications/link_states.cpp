@@ -59,7 +59,7 @@ unsigned int verdict(unsigned int before, unsigned int now) {
 void OsHwMI::createCurNetNodeMap() {
     const LogScope scope("OsHwMI::createCurNetNodeMap(): entry", "returning from createCurNetNodeMap",
                          indicationsLogSource);
-    inventory_->currentStates.clear();
+    OSHWMI_IND::pass().current.clear();
     for (const auto& [key, node] : nodesByName()) {
         const auto now = readState(*node);
         if (!now) {
@@ -71,7 +71,7 @@ void OsHwMI::createCurNetNodeMap() {
             const unsigned int failOver = bondedNetNodeStatus(now->name);
             state = failOver == LinkState::noVerdict ? state : failOver;
         }
-        inventory_->currentStates[now->name] = state;
+        OSHWMI_IND::pass().current[now->name] = state;
     }
 }
 
@@ -87,7 +87,7 @@ unsigned int OsHwMI::bondedNetNodeStatus(const std::string& bond) {
     while (const auto line = command.nextLine()) {
         members.push_back(slaveName(*line));
         logInd(kProgress) << "OsHwMI::bondedNetNodeStatus - slaveInterface is: " << members.back();
-        OSHWMI_IND::slaves.push_back(members.back());
+        OSHWMI_IND::pass().slaves.push_back(members.back());
     }
     unsigned int status = LinkState::noVerdict;
     for (auto member = members.begin(); member != members.end() && status == LinkState::noVerdict; ++member) {
@@ -99,9 +99,9 @@ unsigned int OsHwMI::bondedNetNodeStatus(const std::string& bond) {
 
 unsigned int OsHwMI::memberVerdict(const std::string& member) const {
     // Compared with the last pass only: the current map is still being built when this is asked.
-    const auto before = inventory_->previousStates.find(member);
+    const auto before = OSHWMI_IND::pass().previous.find(member);
     MutableNode* node = nullptr;
-    if (before == inventory_->previousStates.end() || !findNetworkPort(member, &node)) {
+    if (before == OSHWMI_IND::pass().previous.end() || !findNetworkPort(member, &node)) {
         return LinkState::noVerdict;
     }
     const auto now = readState(*node);

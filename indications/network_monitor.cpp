@@ -1,13 +1,16 @@
 #include "indications/network_monitor.h"
 
 #include <memory>
+#include <utility>
 
 #include "indications/contained.h"
 #include "indications/globals.h"
+#include "indications/left_behind.h"
 #include "mi/globals.h"
 #include "mi/log.h"
 #include "mi/my_process.h"
 #include "mi/os_hw_mi.h"
+#include "mi/stopped_thread.h"
 
 namespace IC {
 
@@ -35,16 +38,19 @@ void NetworkMonitor::stop() {
 }
 
 void* NetworkMonitor::run(void*) {
+    const OSHWMI_IND::OwnPass own;
     logInd(kProgress) << "NetworkMonitor: run entry";
     while (!ending()) {
         contained([this] { pass(); });
-        OSHWMI_IND::slaves.clear();
+        OSHWMI_IND::pass().slaves.clear();
         if (!ending()) {
             wake_.wait(kSecondsBetweenPasses);
         }
     }
     done_ = true;
-    ended_->signal();
+    if (!QX::Thread::isLeft()) {
+        ended_->signal();
+    }
     logInd(kProgress) << "NetworkMonitor: run exit";
     return nullptr;
 }
@@ -53,10 +59,13 @@ void NetworkMonitor::pass() {
     const unsigned int before = commandsCutOff();
     myoshwmi.readPrevNetNodeMap();
     myoshwmi.createCurNetNodeMap();
-    if (stopRequested_ || commandsCutOff() != before) {
+    if (isLeftBehind() || stopRequested_ || commandsCutOff() != before) {
         return;  // what a killed command answered is not the host's state
     }
     myoshwmi.checkAndSendNetAlert();
+    if (isLeftBehind()) {
+        return;  // the file is a later monitor's
+    }
     myoshwmi.writePrevNetNodeMap();
 }
 
@@ -66,6 +75,7 @@ void OsHwMI::enableIndications() {
     // left that uses them.
     static const struct AtTheEnd {
         ~AtTheEnd() {
+            leaveNoThreads();
             if (myoshwmi.networkMonitor_ != nullptr) {
                 myoshwmi.disableIndications();
             }
@@ -92,18 +102,23 @@ void OsHwMI::disableIndications() {
     }
     logInd(kProgress) << "eventThreadNetIndications: Stopping thread...";
     networkMonitor_->stop();
-    if (!networkMonitor_->isDone()) {
+    // A callback of the agent may stop us on the monitor's own thread: then there is nothing to wait for.
+    const bool ownThread = networkMonitor_->isThisThread();
+    if (!networkMonitor_->isDone() && !ownThread) {
         logInd(kProgress) << "eventThreadNetIndications: Aborting thread...";
         networkMonitor_->abort();
     }
-    for (unsigned int waits = 0; !networkMonitor_->isDone() && waits < kLongestWait; ++waits) {
+    for (unsigned int waits = 0; !networkMonitor_->isDone() && !ownThread && waits < kLongestWait; ++waits) {
         logInd(kProgress) << "eventThreadNetIndications: Waiting for thread " << waits << " seconds so far";
         networkMonitorEnded_.wait(1);
     }
-    logInd(kProgress) << (networkMonitor_->isDone() ? "eventThreadNetIndicationsThread terminated."
-                                                    : "eventThreadNetIndications termination failed.");
-    delete networkMonitor_;
-    networkMonitor_ = nullptr;
+    const bool done = networkMonitor_->isDone();
+    logInd(kProgress) << (done ? "eventThreadNetIndicationsThread terminated."
+                               : "eventThreadNetIndications termination failed.");
+    std::unique_ptr<QX::Thread> monitor(std::exchange(networkMonitor_, nullptr));
+    if (!done) {
+        dropStopped(std::move(monitor));
+    }
 }
 
 }  // namespace IC

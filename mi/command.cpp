@@ -5,6 +5,7 @@
 #include <cstdlib>
 #include <memory>
 
+#include "framework/qx/thread.h"
 #include "mi/log.h"
 
 namespace IC {
@@ -80,7 +81,7 @@ FirstLine firstLine(const std::optional<std::string>& command) {
 }
 
 PlainCommand::PlainCommand(const std::optional<std::string>& command)
-    : reader_(command.value_or("")), pipe_(command ? popen(command->c_str(), "r") : nullptr) {}
+    : reader_(command.value_or("")), pipe_(command ? openPipe(command->c_str(), "r") : nullptr) {}
 
 PlainCommand::~PlainCommand() {
     closePipe(pipe_);
@@ -91,7 +92,7 @@ std::optional<std::string> PlainCommand::nextLine() {
 }
 
 void runToEnd(const std::string& command) {
-    if (fits(command)) {
+    if (fits(command) && !QX::Thread::isAborted()) {
         [[maybe_unused]] const int status = system(command.c_str());
     }
 }

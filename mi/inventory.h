@@ -10,10 +10,8 @@ namespace IC {
 
 /// What the plug-in keeps of the nodes and interfaces it knows. The nodes are the framework's.
 struct Inventory {
-    std::vector<unsigned int> drawnIds;                 ///< every id taken from the counter
-    std::map<std::string, MutableNode*> nodesByName;    ///< by interface name, bonds included
-    std::map<std::string, unsigned int> currentStates;  ///< link state by interface; the network monitor's
-    std::map<std::string, unsigned int> previousStates;
+    std::vector<unsigned int> drawnIds;               ///< every id taken from the counter
+    std::map<std::string, MutableNode*> nodesByName;  ///< by interface name, bonds included
     std::map<unsigned int, MutableNode*> processors;  ///< by processor number, from 1
 };
 

@@ -4,7 +4,20 @@
 
 namespace IC {
 
+namespace {
+
+thread_local bool logEnded = false;
+
+}  // namespace
+
+void endLogOfThisThread() {
+    logEnded = true;
+}
+
 LogLine::~LogLine() {
+    if (logEnded) {
+        return;
+    }
     try {
         const std::string message = buffer_.str();
         CVLog::CVLogger::logLevelMessage(function_, source_.name, line_, *source_.component, level_, nullptr,

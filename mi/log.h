@@ -79,6 +79,9 @@ inline LogLine logCpu(int level, const char* function = __builtin_FUNCTION(), in
     return {processorsLogSource, level, function, line};
 }
 
+/// The calling thread's lines go nowhere from now on.
+void endLogOfThisThread();
+
 /// Writes "<name>: entry" now and "<name>: exit" when the scope is left. Without a name it takes the
 /// function's.
 class LogScope {

@@ -4,6 +4,7 @@
 
 #include <csignal>
 
+#include "framework/qx/thread.h"
 #include "mi/log.h"
 
 namespace IC {
@@ -23,6 +24,14 @@ int signalOf(int status) {
 }
 
 }  // namespace
+
+FILE* openPipe(const char* command, const char* mode) {
+    if (QX::Thread::isAborted()) {
+        ++cutOff;
+        return nullptr;
+    }
+    return popen(command, mode);
+}
 
 void closePipe(FILE* pipe) {
     const int status = pipe != nullptr ? pclose(pipe) : 0;
@@ -46,7 +55,7 @@ MyProcess::~MyProcess() {
 }
 
 FILE* MyProcess::mypopen(const char* command, const char* mode) {
-    pipe_ = popen(command, mode);
+    pipe_ = openPipe(command, mode);
     ++cnt;
     return pipe_;
 }

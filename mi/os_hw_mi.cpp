@@ -4,6 +4,7 @@
 #include "mi/globals.h"
 #include "mi/log.h"
 #include "mi/shut_down.h"
+#include "mi/stopped_thread.h"
 
 namespace IC {
 
@@ -84,7 +85,7 @@ Error OsHwMI::unload() {
     const LogScope scope;
     HardDriveNodeUpdate = true;
     stopMonitors();
-    Error result = freeNodes();
+    Error result = emptyTree();
     guarded("deleteSavedConfigurations", [] { deleteSavedConfigurations(); });
     guarded("deleteFdiskTmp", [] { deleteFdiskTmp(); });
     const std::lock_guard lock(inventoryGuard_);
@@ -92,7 +93,7 @@ Error OsHwMI::unload() {
     return result;
 }
 
-Error OsHwMI::freeNodes() {
+Error OsHwMI::emptyTree() {
     // A walk that a write of the agent has begun still hangs its nodes under those that go here.
     const std::lock_guard noWalk(portWalkGuard_);
     driveNodes_.clear();
@@ -121,9 +122,9 @@ void OsHwMI::stopHardDriveMonitor() {
     driveMonitorRuns_ = false;
     driveMonitor_->stop();
     log(kProgress) << "disable Hard Drive updates: waiting for HardDriveUpdateMonitor Termination ";
-    driveMonitor_->join();
+    joinWithPatience(*driveMonitor_);
     log(kProgress) << "disable Hard Drive updates: HardDriveUpdateMonitor terminated.";
-    driveMonitor_.reset();
+    dropStopped(std::move(driveMonitor_));
 }
 
 unsigned int OsHwMI::drawNodeId() {

@@ -80,6 +80,24 @@ HOST_TEST(PluginLifetime, MonitorsStoppedInTheMiddleOfAPassLeaveNothingBehind) {
     EXPECT_THAT(host.listDirectory("/tmp"), testing::IsEmpty());
 }
 
+HOST_TEST(PluginLifetime, APluginThatStaysMappedIsLeftWithoutACallback) {
+    const cvagent::QuietCommands quiet;
+    const cvagent::LogOutput log({}, false);
+    void* const mapped = dlopen(CORVISTA_PLUGIN_FILE, RTLD_NOW | RTLD_LOCAL);
+    ASSERT_NE(mapped, nullptr);
+    Counter counter;
+    IC::ManagementInterface* interface = nullptr;
+    {
+        Plugin plugin(CORVISTA_PLUGIN_FILE, &counter);
+        interface = &plugin.interface();
+    }
+    auto* const node = new IC::MutableNode(900, 1, {1}, 11, 1);
+    EXPECT_EQ(interface->addNewNode(node).getStatus(), 0);
+    EXPECT_EQ(interface->deleteNode(node).getStatus(), 0);
+    EXPECT_EQ(counter.published + counter.withdrawn, 0);
+    dlclose(mapped);
+}
+
 HOST_TEST(PluginLifetime, TwoHundredFailuresLeaveNothingBehind) {
     setenv("FAKE_PLUGIN", "badstart churn", 1);
     EXPECT_ANY_THROW(Plugin(FAKE_PLUGIN_FILE, nullptr));  // what the C library keeps from its first use

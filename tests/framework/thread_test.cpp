@@ -20,6 +20,7 @@
 #include "framework/qx/process_tree.h"
 #include "tests/support/failing_new.h"
 #include "tests/support/no_child_lists.h"
+#include "tests/support/no_threads.h"
 
 namespace {
 
@@ -200,9 +201,7 @@ TEST(Thread, IsWaitedForNotLongerThanAsked) {
 
 TEST(Thread, KnowsItself) {
     std::atomic<int> answers = 0;
-    Worker worker([&] {
-        answers = (worker.isThisThread() ? 1 : 0) + (worker.joinWithin(kLong) ? 0 : 2);
-    });
+    Worker worker([&] { answers = (worker.isThisThread() ? 1 : 0) + (worker.joinWithin(kLong) ? 0 : 2); });
     worker.start(nullptr);
     EXPECT_FALSE(worker.isThisThread());
     worker.join();
@@ -466,6 +465,25 @@ TEST(ThreadAbort, IsRepeatedUntilTheThreadHasEndedThoughNobodyWaitsForIt) {
     worker.abort();
     aborted = true;
     EXPECT_TRUE(soon([&] { return commands == 2; }));
+}
+
+TEST(ThreadAbort, IsRepeatedByTheJoinWhereNoThreadIsLeftForIt) {
+    Reader reader;
+    std::atomic<bool> aborted = false;
+    Worker worker([&] {
+        while (!aborted) {
+            std::this_thread::yield();
+        }
+        reader.read("sleep 1000");
+    });
+    worker.start(nullptr);
+    {
+        const NoThreads none;
+        EXPECT_NO_THROW(worker.abort());
+    }
+    aborted = true;
+    std::this_thread::sleep_for(20ms);
+    worker.join();
 }
 
 TEST(ThreadAbort, IsKnownInTheThreadAlone) {

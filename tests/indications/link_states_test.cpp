@@ -136,7 +136,7 @@ HOST_TEST(LinkStates, GatherTheMembersOfAllBonds) {
     bond.interfaces.add("bond1", 1);
     LogCapture capture;
     bond.interfaces.mi().createCurNetNodeMap();
-    EXPECT_THAT(IC::OSHWMI_IND::slaves, TextsAre("eth0", "eth1", "eth7.100", "eth8"));
+    EXPECT_THAT(IC::OSHWMI_IND::pass().slaves, TextsAre("eth0", "eth1", "eth7.100", "eth8"));
     EXPECT_THAT(capture.ownMessages(3000),
                 testing::IsSupersetOf({"Calling bondedNetNodeStatus() for bonded interface: bond0",
                                        "bondedNetNodeStatus: entry",
@@ -163,7 +163,7 @@ HOST_TEST(LinkStates, OfABondWithoutAStatusFileAreItsOwn) {
     interfaces.add("bond0", 12);
     interfaces.mi().createCurNetNodeMap();
     EXPECT_THAT(interfaces.current(), ElementsAre(Pair("bond0", 12)));
-    EXPECT_THAT(IC::OSHWMI_IND::slaves, IsEmpty());
+    EXPECT_THAT(IC::OSHWMI_IND::pass().slaves, IsEmpty());
 }
 
 }  // namespace

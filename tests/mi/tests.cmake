@@ -4,6 +4,7 @@ corvista_test(mi SOURCES
   mi/lifecycle_test.cpp
   mi/line_file_test.cpp
   mi/no_memory_test.cpp
+  mi/stopped_thread_test.cpp
   mi/text_test.cpp
   support/failing_new.cpp
   LIBRARIES plugin_code test_support LABELS threads)
