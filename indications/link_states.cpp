@@ -104,6 +104,7 @@ unsigned int OsHwMI::memberVerdict(const std::string& member) const {
     if (before == OSHWMI_IND::pass().previous.end() || !findNetworkPort(member, &node)) {
         return LinkState::noVerdict;
     }
+    const auto held = node->weak_from_this().lock();  // however long the host takes to answer
     const auto now = readState(*node);
     return now && now->name == member ? verdict(before->second, now->state) : LinkState::noVerdict;
 }

@@ -85,12 +85,12 @@ void OsHwMI::enableIndications() {
     contained([this, function] {
         logInd(kProgress, function) << "Creating NetworkMonitor thread.";
         networkMonitorEnded_.wait(0);  // an earlier monitor's end is not this one's
-        auto monitor = std::make_unique<NetworkMonitor>(&networkMonitorEnded_);
-        if (!monitor->start(nullptr)) {
+        networkMonitor_ = new NetworkMonitor(&networkMonitorEnded_);  // first: what it calls may stop it
+        if (!networkMonitor_->start(nullptr)) {
             logInd(kError, function) << "NetworkMonitor thread failed.";
+            delete std::exchange(networkMonitor_, nullptr);
             return;
         }
-        networkMonitor_ = monitor.release();
         logInd(kProgress, function) << "NetworkMonitor thread created.";
     });
 }

@@ -139,13 +139,20 @@ unsigned int OsHwMI::drawNodeId() {
 void OsHwMI::rememberByName(const std::string& name, MutableNode* node) {
     const std::lock_guard lock(inventoryGuard_);
     if (inventory_) {
-        inventory_->nodesByName.emplace(name, node);
+        auto& known = inventory_->nodesByName[name];
+        known = known.expired() ? node->weak_from_this() : known;
     }
 }
 
-std::map<std::string, MutableNode*> OsHwMI::nodesByName() const {
+std::map<std::string, std::shared_ptr<MutableNode>> OsHwMI::nodesByName() const {
+    std::map<std::string, std::shared_ptr<MutableNode>> held;
     const std::lock_guard lock(inventoryGuard_);
-    return inventory_ ? inventory_->nodesByName : std::map<std::string, MutableNode*>{};
+    for (const auto& [name, node] :
+         inventory_ ? inventory_->nodesByName : decltype(Inventory::nodesByName){}) {
+        held.emplace(name, node.lock());
+    }
+    std::erase_if(held, [](const auto& entry) { return entry.second == nullptr; });  // withdrawn by the agent
+    return held;
 }
 
 bool OsHwMI::findNetworkPort(std::string name, MutableNode** node) const {
@@ -158,8 +165,9 @@ bool OsHwMI::findNetworkPort(std::string name, MutableNode** node) const {
     if (found == inventory_->nodesByName.end()) {
         return false;
     }
-    *node = found->second;
-    return true;
+    const auto held = found->second.lock();
+    *node = held ? held.get() : *node;
+    return held != nullptr;
 }
 
 }  // namespace IC

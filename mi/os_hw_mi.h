@@ -100,7 +100,7 @@ private:
     /// An interface that is known already keeps its node.
     void rememberByName(const std::string& name, MutableNode* node);
     /// A copy: the walk over the interfaces and the network monitor run at the same time.
-    std::map<std::string, MutableNode*> nodesByName() const;
+    std::map<std::string, std::shared_ptr<MutableNode>> nodesByName() const;
     void stopMonitors();
     void stopHardDriveMonitor();
     Error emptyTree();

@@ -178,9 +178,11 @@ Group waitedForBy(pid_t thread) {
         const auto isChild = [child](pid_t id) { return id == child && statusOf(id).parent == getpid(); };
         return {{child}, isChild};
     }
+    // By its name: the descriptor itself is the thread's own business.
+    const std::string descriptor = "/proc/self/fd/" + std::to_string(call.argument);
     struct stat pipe {};
-    if (call.number == SYS_read && fstat(static_cast<int>(call.argument), &pipe) == 0 &&
-        S_ISFIFO(pipe.st_mode) && callOf(thread) == call) {
+    if (call.number == SYS_read && stat(descriptor.c_str(), &pipe) == 0 && S_ISFIFO(pipe.st_mode) &&
+        callOf(thread) == call) {
         return allThat([pipe](pid_t id) { return writesTo(id, pipe); });
     }
     return {};

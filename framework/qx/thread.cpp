@@ -8,7 +8,6 @@
 #include <exception>
 #include <mutex>
 #include <string>
-#include <system_error>
 #include <thread>
 #include <utility>
 
@@ -163,7 +162,7 @@ bool Thread::start(void* argument) {
     state_->kernelId = 0;
     try {
         state_->thread = std::thread([this, argument, state = state_] { state->body(*this, argument); });
-    } catch (const std::system_error&) {
+    } catch (const std::exception&) {
         return false;
     }
     state_->running = true;
@@ -179,8 +178,7 @@ void Thread::join() {
 
 bool Thread::joinWithin(unsigned int milliseconds) {
     std::unique_lock lock(state_->guard);
-    return !state_->isCurrent() &&
-           state_->waitForEnd(lock, scaled(std::chrono::milliseconds(milliseconds)));
+    return !state_->isCurrent() && state_->waitForEnd(lock, scaled(std::chrono::milliseconds(milliseconds)));
 }
 
 void Thread::abort() {
