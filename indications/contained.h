@@ -3,6 +3,7 @@
 #include <exception>
 #include <typeinfo>
 
+#include "indications/left_behind.h"
 #include "mi/log.h"
 
 namespace IC {
@@ -13,10 +14,14 @@ void contained(Work work, const char* function = __builtin_FUNCTION()) {
     try {
         work();
     } catch (const std::exception& failure) {
-        logInd(kError, function) << "OsHwMIInd Caught " << failure.what() << " Type "
-                                 << typeid(failure).name();
+        if (!isLeftBehind()) {
+            logInd(kError, function) << "OsHwMIInd Caught " << failure.what() << " Type "
+                                     << typeid(failure).name();
+        }
     } catch (...) {
-        logInd(kError, function) << "OsHwMIInd Caught unknown exception";
+        if (!isLeftBehind()) {
+            logInd(kError, function) << "OsHwMIInd Caught unknown exception";
+        }
     }
 }
 
