@@ -31,7 +31,7 @@ private:
 
     std::atomic<bool> aborted_ = false;  // also read under the guard of a wait
     std::atomic<bool> left_ = false;
-    std::mutex guard_;                   // guards everything below; taken before the guard of a wait
+    std::mutex guard_;  // guards everything below; taken before the guard of a wait
     std::condition_variable changed_;
     bool sleepsEnd_ = false;
     std::mutex* waitGuard_ = nullptr;

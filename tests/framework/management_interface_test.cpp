@@ -298,6 +298,7 @@ TEST_F(ManagementInterfaceTest, ANodeOfAnEarlierStartCanBeHandedOverAgain) {
     interface_.unload();
     interface_.appendNode(node);
     EXPECT_THAT(map(), ElementsAre(node));
+    interface_.unload();
     EXPECT_EQ(interface_.deleteNode(node).getStatus(), Error::success);
     EXPECT_EQ(alive_, 0) << "owned once";
 }

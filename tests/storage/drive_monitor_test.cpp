@@ -254,6 +254,7 @@ HOST_TEST_F(DriveMonitor, AStopWhileADigestHangsWithdrawsNothing) {
 
 /// An agent that stops the plug-in while it is handed a drive.
 HOST_TEST_F(DriveMonitor, MayBeStoppedByTheCallbackThatItCalls) {
+    host.tool("fdisk -ls", "Disk /dev/sdb: 80.0 GB, 80026361856 bytes\n" + kLayout);
     QX::setClockSpeed(1000);
     static std::atomic<int> calls{0};
     IC::myoshwmi.setLoadCallBack(

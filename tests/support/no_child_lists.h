@@ -2,7 +2,8 @@
 
 // A test program that lists no_child_lists.cpp among its sources can have a kernel of another make.
 
-/// While it lives, the kernel is one that lists no children of threads, as far as files are opened by streams.
+/// While it lives, the kernel is one that lists no children of threads, as far as files are opened by
+/// streams.
 class NoChildLists {
 public:
     NoChildLists();
