@@ -1,6 +1,7 @@
 #include "mi/log.h"
 
 #include "framework/cvlog/logger.h"
+#include "framework/qx/thread.h"
 
 namespace IC {
 
@@ -15,7 +16,8 @@ void endLogOfThisThread() {
 }
 
 LogLine::~LogLine() {
-    if (logEnded) {
+    // What fails in an aborted thread fails because no command is started in it any more.
+    if (logEnded || (level_ == kError && QX::Thread::isAborted())) {
         return;
     }
     try {

@@ -41,7 +41,7 @@ extern const LogSource indicationsLogSource;  ///< "OsHwMIInd_ix86"
 extern const LogSource processorsLogSource;   ///< "OsHwMICpu_ix86"
 
 /// One log line: collects what is streamed into it and goes out at the end of the statement, first to the
-/// log, then to the trace. Never throws.
+/// log, then to the trace. Errors of a thread that is being aborted go nowhere. Never throws.
 class LogLine {
 public:
     LogLine(const LogSource& source, int level, const char* function, int line)

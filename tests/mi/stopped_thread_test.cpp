@@ -9,9 +9,11 @@
 #include <thread>
 
 #include "mi/command.h"
+#include "mi/log.h"
 #include "mi/my_process.h"
 #include "tests/support/command_lines.h"
 #include "tests/support/fake_host.h"
+#include "tests/support/log_capture.h"
 
 namespace {
 
@@ -52,6 +54,21 @@ HOST_TEST(AbortedThread, StartsNoFurtherCommand) {
     errand.join();
     EXPECT_THAT(commands.all(), testing::IsEmpty());
     EXPECT_EQ(MyProcess::cnt, before + 2) << "as of commands that could not be started";
+}
+
+HOST_TEST(AbortedThread, HasNoErrorsOfItsOwn) {
+    LogCapture capture;
+    Errand errand([&] {
+        IC::log(IC::kError) << "before";
+        QX::Thread::sleep(60'000);
+        IC::log(IC::kError) << "not for want of a tool";
+        IC::log(IC::kProgress) << "after";
+    });
+    errand.start(nullptr);
+    std::this_thread::sleep_for(10ms);
+    errand.abort();
+    errand.join();
+    EXPECT_THAT(capture.messages(), TextsAre("before", "after"));
 }
 
 HOST_TEST(JoinWithPatience, EndsTheCommandsAfterTenSeconds) {
