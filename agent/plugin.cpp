@@ -53,16 +53,27 @@ void guarded(const std::string& what, const Call& call) {
     }
 }
 
+/// The same at the end, when there is nothing to give up any more.
+template <class Call>
+void complaining(const std::string& what, const Call& call) {
+    try {
+        guarded(what, call);
+    } catch (const Failure& failure) {
+        complain(failure.what());
+    }
+}
+
 }  // namespace
 
 std::string pluginBesideProgram() {
     const auto found = besideProgram({"../" CORVISTA_LIBDIR, "../lib"}, kLibrary);
     if (!found) {
         const std::string directory = programDirectory();
-        fail(directory.empty() ? "cannot tell where this program lies, for there is no /proc; name the plug-in with "
-                                 "--plugin FILE"
-                               : std::string("there is no ") + kLibrary + " beside this program, which lies in " +
-                                     inQuotes(directory) + "; name the plug-in with --plugin FILE");
+        fail(directory.empty()
+                 ? "cannot tell where this program lies, for there is no /proc; name the plug-in with "
+                   "--plugin FILE"
+                 : std::string("there is no ") + kLibrary + " beside this program, which lies in " +
+                       inQuotes(directory) + "; name the plug-in with --plugin FILE");
     }
     return *found;
 }
@@ -144,15 +155,15 @@ void Plugin::start() {
 }
 
 void Plugin::stop() {
-    try {
-        // The callback stays until the monitors have ended: a change that they see without one they take for
-        // reported, and it would never be told.
-        interface_->unload();
-    } catch (const std::exception& exception) {
-        complain("unload of " + inQuotes(file_) + " threw an exception: " + exception.what());
-    } catch (...) {
-        complain("unload of " + inQuotes(file_) + " threw an unknown exception");
-    }
+    // The callback stays until the monitors have ended: a change that they see without one they take for
+    // reported, and it would never be told.
+    complaining("unload of " + inQuotes(file_), [this] { interface_->unload(); });
+    // The plug-in keeps its callbacks over a stop, and may outlive this object. That for names needs none.
+    complaining("letting go of " + inQuotes(file_), [this] {
+        interface_->deRegisterForAlerts();
+        interface_->setLoadCallBack(nullptr, nullptr, findByName);
+        interface_->setWithdrawCallBack(nullptr, nullptr);
+    });
     IC::Node::setPathSource(nullptr);
     lookedUp = nullptr;
 }
