@@ -71,6 +71,8 @@ void OsHwMI::createCpuNodeAndMap() {
 
 void OsHwMI::createCpuNodes() {
     const LogScope scope("createCpuNodes", processorsLogSource);
+    // The agent may call from any thread: a set is built whole, and none while the nodes are taken back.
+    const std::lock_guard oneBuildAtATime(portWalkGuard_);
     if (tree_.planar == nullptr) {
         return;  // called outside initialize and unload: there is no tree to hang them in
     }

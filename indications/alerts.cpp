@@ -3,6 +3,7 @@
 
 #include "indications/contained.h"
 #include "indications/globals.h"
+#include "indications/left_behind.h"
 #include "indications/link_state.h"
 #include "mi/log.h"
 #include "mi/os_hw_mi.h"
@@ -39,7 +40,7 @@ void mark(MutableNode& node, unsigned int state) {
 }
 
 bool isSlave(const std::string& name) {
-    const auto& slaves = OSHWMI_IND::slaves;
+    const auto& slaves = OSHWMI_IND::pass().slaves;
     logInd(kProgress) << "Slaves Map Size : " << static_cast<unsigned int>(slaves.size());
     if (std::ranges::find(slaves, name) == slaves.end()) {
         return false;
@@ -53,13 +54,13 @@ bool isSlave(const std::string& name) {
 void OsHwMI::checkAndSendNetAlert() {
     const LogScope scope("checkAndSendNetAlert: entry", "Returning from checkAndSendNetAlert",
                          indicationsLogSource);
-    for (const auto& [name, before] : inventory_->previousStates) {
+    for (const auto& [name, before] : OSHWMI_IND::pass().previous) {
         if (isSlave(name)) {
             continue;
         }
-        const auto now = inventory_->currentStates.find(name);
+        const auto now = OSHWMI_IND::pass().current.find(name);
         MutableNode* node = nullptr;
-        if (now == inventory_->currentStates.end() || now->second == before ||
+        if (now == OSHWMI_IND::pass().current.end() || now->second == before ||
             !findNetworkPort(name, &node)) {
             continue;
         }
@@ -73,6 +74,9 @@ void OsHwMI::checkAndSendNetAlert() {
             mark(*node, now->second);
         }
         sendAlert(Alert(kind->firstCode, 0, {node->getPath()}, kind->eventCode, kind->message));
+        if (isLeftBehind()) {
+            return;
+        }
     }
 }
 
@@ -86,6 +90,9 @@ void OsHwMI::sendAlert(const Alert& alert) {
         const auto [handler, context] = receiver;
         Error result = OSHWMI_IND::myerr;
         result = handler({alert}, context);
+        if (isLeftBehind()) {
+            return;
+        }
         logInd(kProgress) << "checkAndSendNetAlert: _alerthandler return code" << result;
     });
 }

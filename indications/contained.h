@@ -3,6 +3,7 @@
 #include <exception>
 #include <typeinfo>
 
+#include "indications/left_behind.h"
 #include "mi/log.h"
 
 namespace IC {
@@ -13,9 +14,13 @@ void contained(Work work) {
     try {
         work();
     } catch (const std::exception& failure) {
-        logInd(kError) << "OsHwMIInd Caught " << failure.what() << " Type " << typeid(failure).name();
+        if (!isLeftBehind()) {
+            logInd(kError) << "OsHwMIInd Caught " << failure.what() << " Type " << typeid(failure).name();
+        }
     } catch (...) {
-        logInd(kError) << "OsHwMIInd Caught unknown exception";
+        if (!isLeftBehind()) {
+            logInd(kError) << "OsHwMIInd Caught unknown exception";
+        }
     }
 }
 

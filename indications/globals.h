@@ -1,6 +1,7 @@
 #pragma once
 
 #include <atomic>
+#include <map>
 #include <string>
 #include <vector>
 
@@ -10,10 +11,27 @@ namespace IC::OSHWMI_IND {
 
 /// What sending an alert gives when nobody listens.
 extern Error myerr;
-/// Member ports of all bonds, as one pass of the network monitor finds them. The monitor thread's alone.
-extern std::vector<std::string> slaves;
-/// The interfaces of this pass about which a command was ended by force. The monitor thread's alone.
-extern std::vector<std::string> untold;
+/// What a pass works on. Each monitor's thread has its own: one that hangs in a callback of the agent
+/// outlives the stop, and the next start's has another.
+struct Pass {
+    std::map<std::string, unsigned int> current;   ///< link state by interface
+    std::map<std::string, unsigned int> previous;  ///< as the pass before found it
+    std::vector<std::string> slaves;               ///< member ports of all bonds
+    std::vector<std::string> untold;               ///< interfaces about which a command was ended by force
+};
+/// The calling thread's; those without an own one share one.
+Pass& pass();
+/// While it lives, the calling thread has its own. Held by the thread itself.
+class OwnPass {
+public:
+    OwnPass();
+    OwnPass(const OwnPass&) = delete;
+    OwnPass& operator=(const OwnPass&) = delete;
+    ~OwnPass();
+
+private:
+    Pass pass_;
+};
 /// Whether the last read of the state file found one.
 extern std::atomic<bool> datFileAvailable;
 /// The logger component of the indications.

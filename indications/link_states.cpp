@@ -65,8 +65,9 @@ unsigned int verdict(unsigned int before, unsigned int now) {
 void OsHwMI::createCurNetNodeMap() {
     const LogScope scope("OsHwMI::createCurNetNodeMap(): entry", "returning from createCurNetNodeMap",
                          indicationsLogSource);
-    inventory_->currentStates.clear();
-    OSHWMI_IND::untold.clear();
+    OSHWMI_IND::Pass& pass = OSHWMI_IND::pass();
+    pass.current.clear();
+    pass.untold.clear();
     for (const auto& [key, node] : nodesByName()) {
         const unsigned int before = commandsCutOff();
         const auto now = readState(*node);
@@ -78,11 +79,11 @@ void OsHwMI::createCurNetNodeMap() {
         }
         const std::string& name = now ? now->name : key;
         if (commandsCutOff() != before) {
-            state = stateOf(inventory_->previousStates, name);
-            OSHWMI_IND::untold.push_back(name);
+            state = stateOf(pass.previous, name);
+            pass.untold.push_back(name);
         }
         if (state) {
-            inventory_->currentStates[name] = *state;
+            pass.current[name] = *state;
         }
     }
 }
@@ -100,7 +101,7 @@ unsigned int OsHwMI::bondedNetNodeStatus(const std::string& bond) {
     while (const auto line = command.nextLine()) {
         members.push_back(slaveName(*line));
         logInd(kProgress) << "OsHwMI::bondedNetNodeStatus - slaveInterface is: " << members.back();
-        OSHWMI_IND::slaves.push_back(members.back());
+        OSHWMI_IND::pass().slaves.push_back(members.back());
     }
     unsigned int status = LinkState::noVerdict;
     for (auto member = members.begin(); member != members.end() && status == LinkState::noVerdict; ++member) {
@@ -112,11 +113,12 @@ unsigned int OsHwMI::bondedNetNodeStatus(const std::string& bond) {
 
 unsigned int OsHwMI::memberVerdict(const std::string& member) const {
     // Compared with the last pass only: the current map is still being built when this is asked.
-    const auto before = inventory_->previousStates.find(member);
+    const auto before = OSHWMI_IND::pass().previous.find(member);
     MutableNode* node = nullptr;
-    if (before == inventory_->previousStates.end() || !findNetworkPort(member, &node)) {
+    if (before == OSHWMI_IND::pass().previous.end() || !findNetworkPort(member, &node)) {
         return LinkState::noVerdict;
     }
+    const auto held = node->weak_from_this().lock();  // however long the host takes to answer
     const auto now = readState(*node);
     return now && now->name == member ? verdict(before->second, now->state) : LinkState::noVerdict;
 }

@@ -1,12 +1,15 @@
 #include "indications/network_monitor.h"
 
 #include <memory>
+#include <utility>
 
 #include "indications/contained.h"
 #include "indications/globals.h"
+#include "indications/left_behind.h"
 #include "mi/globals.h"
 #include "mi/log.h"
 #include "mi/os_hw_mi.h"
+#include "mi/stopped_thread.h"
 
 namespace IC {
 
@@ -34,29 +37,35 @@ void NetworkMonitor::stop() {
 }
 
 void* NetworkMonitor::run(void*) {
+    const OSHWMI_IND::OwnPass own;
     const LogScope scope("NetworkMonitor: run entry", "NetworkMonitor: run exit", indicationsLogSource);
     while (!ending()) {
         contained([this] { pass(); });
-        OSHWMI_IND::slaves.clear();
+        OSHWMI_IND::pass().slaves.clear();
         if (!ending()) {
             wake_.wait(kSecondsBetweenPasses);
         }
     }
     done_ = true;
-    ended_->signal();
+    if (!QX::Thread::isLeft()) {
+        ended_->signal();
+    }
     return nullptr;
 }
 
 void NetworkMonitor::pass() {
     myoshwmi.readPrevNetNodeMap();
     myoshwmi.createCurNetNodeMap();
-    if (stopRequested_) {
+    if (isLeftBehind() || stopRequested_) {
         return;  // the stop may have ended commands: what they answered is not the host's state
     }
-    for (const std::string& name : OSHWMI_IND::untold) {
+    for (const std::string& name : OSHWMI_IND::pass().untold) {
         logInd(kError) << "Link state of " << name << " not told, a command was ended: it stays as it was";
     }
     myoshwmi.checkAndSendNetAlert();
+    if (isLeftBehind()) {
+        return;  // the file is a later monitor's
+    }
     myoshwmi.writePrevNetNodeMap();
 }
 
@@ -66,6 +75,7 @@ void OsHwMI::enableIndications() {
     // left that uses them.
     static const struct AtTheEnd {
         ~AtTheEnd() {
+            leaveNoThreads();
             if (myoshwmi.networkMonitor_ != nullptr) {
                 myoshwmi.disableIndications();
             }
@@ -74,12 +84,12 @@ void OsHwMI::enableIndications() {
     contained([this] {
         logInd(kProgress) << "Creating NetworkMonitor thread.";
         networkMonitorEnded_.wait(0);  // an earlier monitor's end is not this one's
-        auto monitor = std::make_unique<NetworkMonitor>(&networkMonitorEnded_);
-        if (!monitor->start(nullptr)) {
+        networkMonitor_ = new NetworkMonitor(&networkMonitorEnded_);  // first: what it calls may stop it
+        if (!networkMonitor_->start(nullptr)) {
             logInd(kError) << "NetworkMonitor thread failed.";
+            delete std::exchange(networkMonitor_, nullptr);
             return;
         }
-        networkMonitor_ = monitor.release();
         logInd(kProgress) << "NetworkMonitor thread created.";
     });
 }
@@ -91,18 +101,23 @@ void OsHwMI::disableIndications() {
     }
     logInd(kProgress) << "eventThreadNetIndications: Stopping thread...";
     networkMonitor_->stop();
-    if (!networkMonitor_->isDone()) {
+    // A callback of the agent may stop us on the monitor's own thread: then there is nothing to wait for.
+    const bool ownThread = networkMonitor_->isThisThread();
+    if (!networkMonitor_->isDone() && !ownThread) {
         logInd(kProgress) << "eventThreadNetIndications: Aborting thread...";
         networkMonitor_->abort();
     }
-    for (unsigned int waits = 0; !networkMonitor_->isDone() && waits < kLongestWait; ++waits) {
+    for (unsigned int waits = 0; !networkMonitor_->isDone() && !ownThread && waits < kLongestWait; ++waits) {
         logInd(kProgress) << "eventThreadNetIndications: Waiting for thread " << waits << " seconds so far";
         networkMonitorEnded_.wait(1);
     }
-    logInd(kProgress) << (networkMonitor_->isDone() ? "eventThreadNetIndicationsThread terminated."
-                                                    : "eventThreadNetIndications termination failed.");
-    delete networkMonitor_;
-    networkMonitor_ = nullptr;
+    const bool done = networkMonitor_->isDone();
+    logInd(kProgress) << (done ? "eventThreadNetIndicationsThread terminated."
+                               : "eventThreadNetIndications termination failed.");
+    std::unique_ptr<QX::Thread> monitor(std::exchange(networkMonitor_, nullptr));
+    if (!done) {
+        dropStopped(std::move(monitor));
+    }
 }
 
 }  // namespace IC

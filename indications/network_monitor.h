@@ -12,6 +12,7 @@ class NetworkMonitor : public QX::Thread {
 public:
     /// @param ended signalled when run returns; not owned
     explicit NetworkMonitor(QX::Event* ended);
+    /// Waits for a thread that still runs.
     ~NetworkMonitor() override;
 
     /// Asks the thread to end; a sleeping pass wakes at once.

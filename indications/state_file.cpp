@@ -40,7 +40,7 @@ void OsHwMI::writePrevNetNodeMap() {
         QX::PropertyFile file{QX::File::Path(stateFilePath())};
         file.open(QX::PropertyFile::forWriting);
         // What is not visited stays: an interface that comes back is compared with what it was.
-        for (const auto& [name, state] : inventory_->currentStates) {
+        for (const auto& [name, state] : OSHWMI_IND::pass().current) {
             file.setValue(QX::make_wstring(name), std::to_wstring(state));
         }
         file.close();
@@ -51,13 +51,13 @@ void OsHwMI::writePrevNetNodeMap() {
 
 void OsHwMI::readPrevNetNodeMap() {
     const LogScope scope("readPrevNetNodeMap", indicationsLogSource);
-    inventory_->previousStates.clear();
+    OSHWMI_IND::pass().previous.clear();
     try {
         QX::PropertyFile file{QX::File::Path(stateFilePath())};
         file.open(QX::PropertyFile::forReading);
         for (const std::wstring& key : file.enumerateKeys()) {
             if (const auto state = decimal(QX::make_string(file.getValue(key)))) {
-                inventory_->previousStates[QX::make_string(key)] = *state;
+                OSHWMI_IND::pass().previous[QX::make_string(key)] = *state;
             }
         }
         file.close();
@@ -65,7 +65,7 @@ void OsHwMI::readPrevNetNodeMap() {
     } catch (...) {
         // The first start of all has no file: an empty map raises no alert.
         logInd(kProgress) << "OSHWMI_NET_IND_DAT_FILE: Not available";
-        inventory_->previousStates.clear();
+        OSHWMI_IND::pass().previous.clear();
         OSHWMI_IND::datFileAvailable = false;
     }
 }

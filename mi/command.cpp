@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cstdlib>
 
+#include "framework/qx/thread.h"
 #include "mi/log.h"
 #include "mi/text.h"
 
@@ -137,7 +138,7 @@ FirstLine firstLine(const Command& command) {
 }
 
 PlainCommand::PlainCommand(const Command& command)
-    : reader_(command.shown()), pipe_(command.toRun() != nullptr ? popen(command.toRun(), "r") : nullptr) {}
+    : reader_(command.shown()), pipe_(openPipe(command.toRun(), "r")) {}
 
 PlainCommand::~PlainCommand() {
     closePipe(pipe_);
@@ -148,7 +149,8 @@ std::optional<std::string> PlainCommand::nextLine() {
 }
 
 void runToEnd(const Command& command) {
-    if (const char* const text = command.toRun()) {
+    const char* const text = command.toRun();
+    if (text != nullptr && !QX::Thread::isAborted()) {
         [[maybe_unused]] const int status = system(text);
     }
 }

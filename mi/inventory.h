@@ -1,6 +1,7 @@
 #pragma once
 
 #include <map>
+#include <memory>
 #include <string>
 #include <vector>
 
@@ -10,11 +11,9 @@ namespace IC {
 
 /// What the plug-in keeps of the nodes and interfaces it knows. The nodes are the framework's.
 struct Inventory {
-    std::vector<unsigned int> drawnIds;                 ///< every id taken from the counter
-    std::map<std::string, MutableNode*> nodesByName;    ///< by interface name, bonds included
-    std::map<std::string, unsigned int> currentStates;  ///< link state by interface; the network monitor's
-    std::map<std::string, unsigned int> previousStates;
-    std::map<unsigned int, MutableNode*> processors;  ///< by processor number, from 1
+    std::vector<unsigned int> drawnIds;                             ///< every id taken from the counter
+    std::map<std::string, std::weak_ptr<MutableNode>> nodesByName;  ///< by interface name, bonds included
+    std::map<unsigned int, MutableNode*> processors;                ///< by processor number, from 1
 };
 
 /// The nodes of the fixed upper levels, for whoever hangs nodes under them. Null outside initialize and

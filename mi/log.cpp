@@ -1,12 +1,14 @@
 #include "mi/log.h"
 
 #include "framework/cvlog/logger.h"
+#include "framework/qx/thread.h"
 
 namespace IC {
 
 namespace {
 
 thread_local const char* operation = nullptr;  // null outside all operations
+thread_local bool logEnded = false;
 
 }  // namespace
 
@@ -22,7 +24,15 @@ const char* Operation::nameOr(const char* function) {
     return operation != nullptr ? operation : function;
 }
 
+void endLogOfThisThread() {
+    logEnded = true;
+}
+
 LogLine::~LogLine() {
+    // What fails in an aborted thread fails because no command is started in it any more.
+    if (logEnded || (level_ == kError && QX::Thread::isAborted())) {
+        return;
+    }
     try {
         const std::string message = buffer_.str();
         CVLog::CVLogger::logLevelMessage(function_, source_.name, line_, *source_.component, level_, nullptr,

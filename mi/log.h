@@ -41,7 +41,7 @@ extern const LogSource indicationsLogSource;  ///< "OsHwMIInd_ix86"
 extern const LogSource processorsLogSource;   ///< "OsHwMICpu_ix86"
 
 /// One log line: collects what is streamed into it and goes out at the end of the statement, first to the
-/// log, then to the trace. Never throws.
+/// log, then to the trace. Errors of a thread that is being aborted go nowhere. Never throws.
 class LogLine {
 public:
     LogLine(const LogSource& source, int level, const char* function, int line)
@@ -95,6 +95,9 @@ inline LogLine logInd(int level, const char* function = __builtin_FUNCTION(), in
 inline LogLine logCpu(int level, const char* function = __builtin_FUNCTION(), int line = __builtin_LINE()) {
     return {processorsLogSource, level, Operation::nameOr(function), line};
 }
+
+/// The calling thread's lines go nowhere from now on.
+void endLogOfThisThread();
 
 /// Writes "<name>: entry" now and "<name>: exit" when the scope is left. Without a name it takes the
 /// function's.

@@ -4,6 +4,7 @@
 
 #include <csignal>
 
+#include "framework/qx/thread.h"
 #include "mi/log.h"
 
 namespace IC {
@@ -13,6 +14,14 @@ namespace {
 thread_local unsigned int cutOff = 0;
 
 }  // namespace
+
+FILE* openPipe(const char* command, const char* mode) {
+    if (QX::Thread::isAborted()) {
+        ++cutOff;
+        return nullptr;
+    }
+    return command != nullptr ? popen(command, mode) : nullptr;
+}
 
 void closePipe(FILE* pipe) {
     const int status = pipe != nullptr ? pclose(pipe) : 0;
@@ -37,7 +46,7 @@ MyProcess::~MyProcess() {
 }
 
 FILE* MyProcess::mypopen(const char* command, const char* mode) {
-    pipe_ = command != nullptr ? popen(command, mode) : nullptr;
+    pipe_ = openPipe(command, mode);
     ++cnt;
     return pipe_;
 }

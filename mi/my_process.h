@@ -33,6 +33,9 @@ private:
     FILE* pipe_;
 };
 
+/// Starts a command whose output is read, or in an aborted thread none: that counts as one cut off.
+FILE* openPipe(const char* command, const char* mode);
+
 /// Ends a command's output and waits for the command; a null pipe is fine.
 void closePipe(FILE* pipe);
 

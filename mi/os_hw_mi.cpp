@@ -4,6 +4,7 @@
 #include "mi/globals.h"
 #include "mi/log.h"
 #include "mi/shut_down.h"
+#include "mi/stopped_thread.h"
 
 namespace IC {
 
@@ -83,7 +84,7 @@ Error OsHwMI::unload() {
     const LogScope scope;
     HardDriveNodeUpdate = true;
     stopMonitors();
-    Error result = freeNodes();
+    Error result = emptyTree();
     guarded("deleteSavedConfigurations", [] { deleteSavedConfigurations(); });
     guarded("deleteFdiskTmp", [] { deleteFdiskTmp(); });
     const std::lock_guard lock(inventoryGuard_);
@@ -91,7 +92,7 @@ Error OsHwMI::unload() {
     return result;
 }
 
-Error OsHwMI::freeNodes() {
+Error OsHwMI::emptyTree() {
     // A walk that a write of the agent has begun still hangs its nodes under those that go here.
     const std::lock_guard noWalk(portWalkGuard_);
     driveNodes_.clear();
@@ -120,9 +121,9 @@ void OsHwMI::stopHardDriveMonitor() {
     driveMonitorRuns_ = false;
     driveMonitor_->stop();
     log(kProgress) << "disable Hard Drive updates: waiting for HardDriveUpdateMonitor Termination ";
-    driveMonitor_->join();
+    joinWithPatience(*driveMonitor_);
     log(kProgress) << "disable Hard Drive updates: HardDriveUpdateMonitor terminated.";
-    driveMonitor_.reset();
+    dropStopped(std::move(driveMonitor_));
 }
 
 unsigned int OsHwMI::drawNodeId() {
@@ -137,13 +138,20 @@ unsigned int OsHwMI::drawNodeId() {
 void OsHwMI::rememberByName(const std::string& name, MutableNode* node) {
     const std::lock_guard lock(inventoryGuard_);
     if (inventory_) {
-        inventory_->nodesByName.emplace(name, node);
+        auto& known = inventory_->nodesByName[name];
+        known = known.expired() ? node->weak_from_this() : known;
     }
 }
 
-std::map<std::string, MutableNode*> OsHwMI::nodesByName() const {
+std::map<std::string, std::shared_ptr<MutableNode>> OsHwMI::nodesByName() const {
+    std::map<std::string, std::shared_ptr<MutableNode>> held;
     const std::lock_guard lock(inventoryGuard_);
-    return inventory_ ? inventory_->nodesByName : std::map<std::string, MutableNode*>{};
+    for (const auto& [name, node] :
+         inventory_ ? inventory_->nodesByName : decltype(Inventory::nodesByName){}) {
+        held.emplace(name, node.lock());
+    }
+    std::erase_if(held, [](const auto& entry) { return entry.second == nullptr; });  // withdrawn by the agent
+    return held;
 }
 
 bool OsHwMI::findNetworkPort(std::string name, MutableNode** node) const {
@@ -156,8 +164,9 @@ bool OsHwMI::findNetworkPort(std::string name, MutableNode** node) const {
     if (found == inventory_->nodesByName.end()) {
         return false;
     }
-    *node = found->second;
-    return true;
+    const auto held = found->second.lock();
+    *node = held ? held.get() : *node;
+    return held != nullptr;
 }
 
 }  // namespace IC

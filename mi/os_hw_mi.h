@@ -32,8 +32,8 @@ public:
     /// Builds the tree and starts the monitors. A step that fails is logged and the next one runs.
     /// @return the result of the base class's initialize
     Error initialize(unsigned int miId, const Number& ownNodeId, const Number& firstNodeId) override;
-    /// Stops the monitors, frees the nodes, removes the plug-in's own files. Safe without an initialize
-    /// before it.
+    /// Stops the monitors, empties the list of nodes, removes the plug-in's own files. Safe without an
+    /// initialize before it. The nodes themselves live as long as this object.
     Error unload() override;
 
     /// Hands a node made after start-up to the agent. A refusal is logged and not retried.
@@ -100,10 +100,10 @@ private:
     /// An interface that is known already keeps its node.
     void rememberByName(const std::string& name, MutableNode* node);
     /// A copy: the walk over the interfaces and the network monitor run at the same time.
-    std::map<std::string, MutableNode*> nodesByName() const;
+    std::map<std::string, std::shared_ptr<MutableNode>> nodesByName() const;
     void stopMonitors();
     void stopHardDriveMonitor();
-    Error freeNodes();
+    Error emptyTree();
     /// What a bond member's change since the last pass means for the bond (indications/).
     unsigned int memberVerdict(const std::string& member) const;
     void sendAlert(const Alert& alert);
@@ -139,7 +139,7 @@ private:
     NetworkMonitor* networkMonitor_ = nullptr;
     std::string hostName_;
     std::string domainName_;
-    /// One walk over the interfaces at a time, and none while the nodes are freed; guards the lists below.
+    /// One walk or builder of processors at a time, and none while the nodes go; guards the lists below.
     std::mutex portWalkGuard_;
     std::vector<std::string> dnsServers_;
     std::vector<std::string> dnsSuffixes_;

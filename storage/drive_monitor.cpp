@@ -3,6 +3,7 @@
 #include "mi/globals.h"
 #include "mi/log.h"
 #include "mi/os_hw_mi.h"
+#include "mi/stopped_thread.h"
 
 namespace IC {
 
@@ -23,7 +24,7 @@ HardDriveUpdateMonitor::~HardDriveUpdateMonitor() {
     const LogScope scope("HardDriveUpdateMonitor::~HardDriveUpdateMonitor");
     // Before the members that run uses are gone.
     stopRequested = true;
-    join();
+    joinWithPatience(*this);
 }
 
 void HardDriveUpdateMonitor::stop() {
@@ -45,7 +46,9 @@ void* HardDriveUpdateMonitor::run(void*) {
         }
     }
     done = true;
-    completed_->signal();
+    if (!QX::Thread::isLeft()) {
+        completed_->signal();
+    }
     return nullptr;
 }
 

@@ -63,12 +63,14 @@ void takeFingerprints(const Extract& extract, FingerprintPair& pair, bool keepCu
 /// them again.
 template <class Rebuild>
 void rebuildIfDifferent(const Extract& extract, FingerprintPair& pair, Rebuild rebuild) {
-    if (!pair.differs()) {
+    // An aborted thread could only withdraw the nodes, for it can list nothing; one that was left has no
+    // nodes.
+    if (QX::Thread::isAborted() || QX::Thread::isLeft() || !pair.differs()) {
         return;
     }
     const unsigned int before = commandsCutOff();
     rebuild();
-    if (commandsCutOff() != before) {
+    if (commandsCutOff() != before || QX::Thread::isLeft()) {
         return;
     }
     pair.accept();

@@ -65,6 +65,9 @@ void OsHwMI::buildStorageNodes(const StorageKind& kind, bool update) {
         return;
     }
     while (const std::optional<std::string> line = nextEntry(listing)) {
+        if (QX::Thread::isLeft()) {
+            return;  // the agent has stopped us in the middle of our call to it
+        }
         const auto index = static_cast<unsigned int>(nodes.size() + 1);
         std::unique_ptr<MutableNode> node = (this->*kind.build)(*line, index, update);
         if (node) {

@@ -44,6 +44,16 @@ void guarded(const std::string& what, const Call& call) {
     }
 }
 
+/// The same at the end, when there is nothing to give up any more.
+template <class Call>
+void complaining(const Tell& tell, const std::string& what, const Call& call) {
+    try {
+        guarded(what, call);
+    } catch (const Problem& problem) {
+        tell(problem.what());
+    }
+}
+
 }  // namespace
 
 std::string pluginBesideProgram() {
@@ -152,16 +162,15 @@ bool Plugin::isOwnId(const IC::MutableNode& node) const {
 }
 
 void Plugin::stop() {
-    const std::string what = "unload of " + inQuotes(file_);
-    try {
-        // The callback stays until the monitors have ended: a change that they see without one they take for
-        // reported, and it would never be told.
-        interface_->unload();
-    } catch (const std::exception& exception) {
-        tell_(what + " threw an exception: " + exception.what());
-    } catch (...) {
-        tell_(what + " threw an unknown exception");
-    }
+    // The callback stays until the monitors have ended: a change that they see without one they take for
+    // reported, and it would never be told.
+    complaining(tell_, "unload of " + inQuotes(file_), [this] { interface_->unload(); });
+    // The plug-in keeps its callbacks over a stop, and may outlive this object. That for names needs none.
+    complaining(tell_, "letting go of " + inQuotes(file_), [this] {
+        interface_->deRegisterForAlerts();
+        interface_->setLoadCallBack(nullptr, nullptr, running_->finder());
+        interface_->setWithdrawCallBack(nullptr, nullptr);
+    });
     running_.reset();
 }
 

@@ -33,7 +33,7 @@ Error tell(const Call& call) {
     }
 }
 
-using NodeList = std::vector<std::shared_ptr<MutableNode>>;
+using NodeList = std::list<std::shared_ptr<MutableNode>>;
 
 /// Takes a node out of a list; an empty handle when it is not in there.
 std::shared_ptr<MutableNode> takeOut(NodeList& nodes, const Node* node) {
@@ -88,21 +88,10 @@ Error ManagementInterface::deRegisterForAlerts() {
 }
 
 Error ManagementInterface::unload() {
-    NodeList nodes;
-    NodeList refused;
-    {
-        const std::unique_lock lock(guard_);
-        nodes.swap(nodes_);
-        refused.swap(refused_);
-        alertHandler_ = nullptr;
-        alertContext_ = nullptr;
-        load_ = nullptr;
-        loadContext_ = nullptr;
-        find_ = nullptr;
-        withdrawn_ = nullptr;
-        withdrawnContext_ = nullptr;
-    }
-    return {};  // the nodes go here, outside the lock: their destructors are the plug-in's
+    const std::unique_lock lock(guard_);
+    unloaded_.splice(unloaded_.end(), nodes_);
+    unloaded_.splice(unloaded_.end(), refused_);
+    return {};
 }
 
 ManagementInterface::operator std::string() const {
@@ -118,6 +107,7 @@ std::shared_ptr<MutableNode> ManagementInterface::list(MutableNode* node) {
         handle.reset(node);
     }
     takeOut(refused_, node);  // the agent is asked again
+    takeOut(unloaded_, node);
     if (std::find(nodes_.begin(), nodes_.end(), handle) == nodes_.end()) {
         nodes_.push_back(handle);
     }
@@ -156,17 +146,18 @@ Error ManagementInterface::addNewNode(Node* node) {
 
 Error ManagementInterface::deleteNode(Node* node) {
     std::shared_ptr<MutableNode> listed;
-    std::shared_ptr<MutableNode> refused;
+    std::shared_ptr<MutableNode> unlisted;
     void (*withdrawn)(const Node&, const void*) = nullptr;
     const void* context = nullptr;
     {
         const std::unique_lock lock(guard_);
         listed = takeOut(nodes_, node);
-        refused = takeOut(refused_, node);
+        unlisted = takeOut(refused_, node);
+        unlisted = unlisted ? unlisted : takeOut(unloaded_, node);
         withdrawn = withdrawn_;
         context = withdrawnContext_;
     }
-    if (!listed && !refused) {
+    if (!listed && !unlisted) {
         return failed("deleteNode: no such node");
     }
     Error result;
@@ -192,7 +183,7 @@ std::shared_ptr<MutableNode> ManagementInterface::hold(unsigned int nodeId) cons
 
 std::vector<std::shared_ptr<MutableNode>> ManagementInterface::holdAll() const {
     const std::shared_lock lock(guard_);
-    return nodes_;
+    return {nodes_.begin(), nodes_.end()};
 }
 
 void ManagementInterface::setWithdrawCallBack(void (*withdrawn)(const Node& node, const void* context),

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <functional>
+#include <list>
 #include <memory>
 #include <mutex>
 #include <shared_mutex>
@@ -27,12 +28,14 @@ public:
     ManagementInterface(const ManagementInterface&) = delete;
     ManagementInterface& operator=(const ManagementInterface&) = delete;
 
-    /// Fills `nodes` with the nodes of the list. The pointers stay good until the node is withdrawn; a reader
-    /// on another thread than the one that withdraws uses hold() or holdAll().
+    /// Fills `nodes` with the nodes of the list. A pointer stays good until the node is withdrawn or this
+    /// object goes, also over unload; a reader on another thread than the one that withdraws uses hold() or
+    /// holdAll().
     virtual Error getMap(std::vector<Node*>& nodes);
     /// @param miId id of this interface, @param ownNodeId id of the interface's node,
     /// @param firstNodeId where the node-id counter starts. Failure when a number is none.
     virtual Error initialize(unsigned int miId, const Number& ownNodeId, const Number& firstNodeId);
+    /// Callbacks stay registered until others take their place, also over unload and a new initialize.
     virtual Error registerForAlerts(AlertHandler handler, const void* context);
     virtual void setLoadCallBack(LoadCallBack load, const void* context, FindCallBack find) {
         std::unique_lock lock(guard_);
@@ -41,7 +44,7 @@ public:
         find_ = find;
     }
     virtual Error deRegisterForAlerts();
-    /// Frees every node (those held elsewhere when their last handle goes) and forgets the callbacks.
+    /// Empties the list. The nodes themselves live on, for whoever still has a pointer.
     virtual Error unload();
     virtual ~ManagementInterface();
     virtual operator std::string() const;
@@ -74,7 +77,7 @@ protected:
     std::pair<AlertHandler, const void*> alertHandler() const;
 
 private:
-    using NodeList = std::vector<std::shared_ptr<MutableNode>>;
+    using NodeList = std::list<std::shared_ptr<MutableNode>>;
 
     std::shared_ptr<MutableNode> list(MutableNode* node);
     void refuse(const std::shared_ptr<MutableNode>& node);
@@ -84,7 +87,8 @@ private:
     unsigned int ownNodeId_ = 0;
     std::vector<unsigned int> miIds_;
     NodeList nodes_;
-    NodeList refused_;  // owned, but the agent would not have them
+    NodeList refused_;   // owned, but the agent would not have them
+    NodeList unloaded_;  // owned, but of an earlier start
     AlertHandler alertHandler_ = nullptr;
     const void* alertContext_ = nullptr;
     LoadCallBack load_ = nullptr;

@@ -12,16 +12,6 @@ MutableNode::MutableNode(unsigned int nodeId, unsigned int linkedId, std::vector
 
 MutableNode::~MutableNode() = default;
 
-unsigned int MutableNode::getStatus() const {
-    const std::shared_lock lock(guard_);
-    return status_;
-}
-
-std::string MutableNode::getDescription() const {
-    const std::shared_lock lock(guard_);
-    return description_;
-}
-
 Error MutableNode::getProperty(unsigned int id, PropertyValue& out) const {
     const std::shared_lock lock(guard_);
     const auto found = properties_.find(id);
@@ -84,14 +74,12 @@ Error MutableNode::delMI(unsigned int miId) {
 }
 
 Error MutableNode::setStatus(unsigned int status) {
-    const std::unique_lock lock(guard_);
-    status_ = status;
+    storeStatus(status);
     return {};
 }
 
 Error MutableNode::setDescription(const std::string& description) {
-    const std::unique_lock lock(guard_);
-    description_ = description;
+    storeDescription(description);
     return {};
 }
 

@@ -20,8 +20,6 @@ public:
                 unsigned int nodeType, unsigned int index);
 
     ~MutableNode() override;
-    unsigned int getStatus() const override;
-    std::string getDescription() const override;
     /// What was stored last; an id that was never stored gives status 1 and "no such property: <id>", `out`
     /// untouched.
     Error getProperty(unsigned int id, PropertyValue& out) const override;
@@ -52,8 +50,6 @@ private:
     mutable std::shared_mutex guard_;  // guards everything below
     unsigned int linkedId_;
     std::vector<unsigned int> miIds_;
-    unsigned int status_ = 0;
-    std::string description_;
     std::map<unsigned int, PropertyValue> properties_;
 };
 

@@ -13,9 +13,19 @@ std::atomic<std::string (*)(const Node&)> pathSource{nullptr};
 
 Node::~Node() = default;
 
+unsigned int Node::getStatus() const {
+    const std::shared_lock lock(factsGuard_);
+    return status_;
+}
+
+std::string Node::getDescription() const {
+    const std::shared_lock lock(factsGuard_);
+    return description_;
+}
+
 std::string Node::getPath() const {
     {
-        const std::shared_lock lock(pathGuard_);
+        const std::shared_lock lock(factsGuard_);
         if (!path_.empty()) {
             return path_;
         }
@@ -29,8 +39,18 @@ void Node::setPathSource(std::string (*source)(const Node& node)) {
 }
 
 void Node::storePath(const std::string& path) {
-    const std::unique_lock lock(pathGuard_);
+    const std::unique_lock lock(factsGuard_);
     path_ = path;
+}
+
+void Node::storeStatus(unsigned int status) {
+    const std::unique_lock lock(factsGuard_);
+    status_ = status;
+}
+
+void Node::storeDescription(const std::string& description) {
+    const std::unique_lock lock(factsGuard_);
+    description_ = description;
 }
 
 }  // namespace IC

@@ -20,8 +20,9 @@ public:
     Node& operator=(const Node&) = delete;
 
     virtual ~Node();
-    virtual unsigned int getStatus() const = 0;
-    virtual std::string getDescription() const = 0;
+    /// As they were set last; 0 and "" before.
+    virtual unsigned int getStatus() const;
+    virtual std::string getDescription() const;
     virtual Error getProperty(unsigned int id, PropertyValue& out) const = 0;
     /// Every stored property by id; nothing is asked of the host.
     virtual Error getProperties(std::map<unsigned int, PropertyValue>& out) const = 0;
@@ -38,10 +39,14 @@ public:
 
 protected:
     void storePath(const std::string& path);
+    void storeStatus(unsigned int status);
+    void storeDescription(const std::string& description);
 
 private:
-    mutable std::shared_mutex pathGuard_;
+    mutable std::shared_mutex factsGuard_;  // guards everything below
     std::string path_;
+    unsigned int status_ = 0;
+    std::string description_;
 };
 
 }  // namespace IC

@@ -38,6 +38,7 @@ void Interruption::reset() {
     const std::lock_guard lock(guard_);
     sleepsEnd_ = false;
     aborted_ = false;
+    left_ = false;
 }
 
 void Interruption::sleep(std::chrono::nanoseconds duration) {

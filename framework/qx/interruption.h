@@ -18,8 +18,11 @@ public:
     void endSleeps();
     /// Sleeps and event waits return at once from now on.
     void abort();
+    /// Nobody waits for the thread any more.
+    void leave() { left_ = true; }
     void reset();
     bool aborted() const { return aborted_; }
+    bool left() const { return left_; }
     void sleep(std::chrono::nanoseconds duration);
 
 private:
@@ -27,7 +30,8 @@ private:
     void setWait(std::mutex* guard, std::condition_variable* changed);
 
     std::atomic<bool> aborted_ = false;  // also read under the guard of a wait
-    std::mutex guard_;                   // guards everything below; taken before the guard of a wait
+    std::atomic<bool> left_ = false;
+    std::mutex guard_;  // guards everything below; taken before the guard of a wait
     std::condition_variable changed_;
     bool sleepsEnd_ = false;
     std::mutex* waitGuard_ = nullptr;

@@ -1,12 +1,16 @@
 #include "framework/qx/process_tree.h"
 
 #include <dirent.h>
+#include <sys/stat.h>
 #include <sys/syscall.h>
 #include <unistd.h>
 
 #include <algorithm>
+#include <charconv>
 #include <csignal>
 #include <fstream>
+#include <functional>
+#include <iterator>
 #include <memory>
 #include <sstream>
 #include <string>
@@ -49,29 +53,30 @@ std::vector<pid_t> readIds(const std::string& listing) {
     return ids;
 }
 
-/// The lists of children that the kernel keeps for a process, one a thread.
-std::vector<std::string> childListings(pid_t process) {
-    std::vector<std::string> listings;
-    const std::string tasks = "/proc/" + std::to_string(process) + "/task/";
+/// The numbers among the names in a directory: processes, threads, descriptors. None when it is gone.
+std::vector<int> numbersIn(const std::string& path) {
+    std::vector<int> numbers;
     // Not by the iterators of libstdc++: those end the program when they find no memory.
-    const std::unique_ptr<DIR, int (*)(DIR*)> directory(opendir(tasks.c_str()), closedir);
-    // A process that has just gone has no children left to find.
-    while (const dirent* task = directory != nullptr ? readdir(directory.get()) : nullptr) {
-        if (task->d_name[0] != '.') {
-            listings.push_back(tasks + task->d_name + "/children");
+    const std::unique_ptr<DIR, int (*)(DIR*)> directory(opendir(path.c_str()), closedir);
+    while (const dirent* entry = directory != nullptr ? readdir(directory.get()) : nullptr) {
+        const std::string name = entry->d_name;
+        int number = 0;
+        if (std::from_chars(name.data(), name.data() + name.size(), number).ec == std::errc()) {
+            numbers.push_back(number);
         }
     }
-    return listings;
+    return numbers;
 }
 
 /// What the kernel tells of a process.
 struct Status {
-    char state = 'X';                ///< as it is when there is no such process
+    char state = 'X';  ///< as it is when there is no such process
+    pid_t parent = 0;
     unsigned long long started = 0;  ///< clock ticks since the machine's start
 };
 
 Status statusOf(pid_t process) {
-    constexpr int kFieldsBetween = 18;  // of state and start
+    constexpr int kFieldsBetween = 17;  // of parent and start
     std::ifstream in("/proc/" + std::to_string(process) + "/stat");
     std::string text;
     std::getline(in, text, '\0');  // the program's name can hold anything else
@@ -79,7 +84,7 @@ Status statusOf(pid_t process) {
     std::istringstream fields(afterName == std::string::npos ? "" : text.substr(afterName + 1));
     Status status;
     std::string passedOver;
-    fields >> status.state;
+    fields >> status.state >> status.parent;
     for (int i = 0; i < kFieldsBetween; ++i) {
         fields >> passedOver;
     }
@@ -95,8 +100,97 @@ bool hasEnded(const Status& status) {
     return std::string("ZXx").find(status.state) != std::string::npos;
 }
 
-std::string listingOf(pid_t thread) {
-    return "/proc/self/task/" + std::to_string(thread) + "/children";
+/// Processes that belong together.
+struct Group {
+    std::vector<pid_t> members;
+    std::function<bool(pid_t)> has;  ///< whether one does still: a number may be another's by now
+};
+
+/// Those that the kernel lists as a thread's children.
+Group listedIn(const std::string& listing) {
+    return {readIds(listing), [listing](pid_t id) {
+                const auto now = readIds(listing);
+                return std::find(now.begin(), now.end(), id) != now.end();
+            }};
+}
+
+/// Those of all processes that are so.
+Group allThat(const std::function<bool(pid_t)>& are) {
+    Group group{numbersIn("/proc/"), are};
+    std::erase_if(group.members, [&are](pid_t id) { return !are(id); });
+    return group;
+}
+
+/// A kernel can be built without lists of children.
+bool isListed(const std::string& listing) {
+    return std::ifstream(listing).is_open();
+}
+
+/// The children of a process, in one group a thread where the kernel lists them.
+std::vector<Group> childrenOfProcess(pid_t process) {
+    std::vector<Group> groups;
+    const std::string tasks = "/proc/" + std::to_string(process) + "/task/";
+    for (const int task : numbersIn(tasks)) {
+        if (const std::string listing = tasks + std::to_string(task) + "/children"; isListed(listing)) {
+            groups.push_back(listedIn(listing));
+        }
+    }
+    if (groups.empty()) {
+        groups.push_back(allThat([process](pid_t id) { return statusOf(id).parent == process; }));
+    }
+    return groups;
+}
+
+/// Whether a process, not ourselves, can write to a pipe. Who only reads from it has it by inheritance: the
+/// C library keeps the reader's end open in programs that are started while it is read.
+bool writesTo(pid_t process, const struct stat& pipe) {
+    const std::string directory = "/proc/" + std::to_string(process) + "/fd/";
+    const auto isThePipe = [&](int descriptor) {
+        const std::string path = directory + std::to_string(descriptor);
+        struct stat link {};
+        struct stat file {};
+        return stat(path.c_str(), &file) == 0 && file.st_dev == pipe.st_dev && file.st_ino == pipe.st_ino &&
+               lstat(path.c_str(), &link) == 0 && (link.st_mode & S_IWUSR) != 0;
+    };
+    return process != getpid() && std::ranges::any_of(numbersIn(directory), isThePipe);
+}
+
+/// The system call in which a thread of this process is blocked.
+struct Call {
+    long number = -1;  ///< none
+    unsigned long argument = 0;
+
+    bool operator==(const Call&) const = default;
+};
+
+Call callOf(pid_t thread) {
+    std::ifstream in("/proc/self/task/" + std::to_string(thread) + "/syscall");
+    Call call;
+    return in >> call.number >> std::hex >> call.argument ? call : Call{};
+}
+
+/// For want of a list: what the thread waits for at this moment, be it the end of a child or somebody to
+/// write to its pipe. A command that does neither keeps it from nothing.
+Group waitedForBy(pid_t thread) {
+    const Call call = callOf(thread);
+    if (call.number == SYS_wait4) {
+        const auto child = static_cast<pid_t>(call.argument);
+        const auto isChild = [child](pid_t id) { return id == child && statusOf(id).parent == getpid(); };
+        return {{child}, isChild};
+    }
+    // By its name: the descriptor itself is the thread's own business.
+    const std::string descriptor = "/proc/self/fd/" + std::to_string(call.argument);
+    struct stat pipe {};
+    if (call.number == SYS_read && stat(descriptor.c_str(), &pipe) == 0 && S_ISFIFO(pipe.st_mode) &&
+        callOf(thread) == call) {
+        return allThat([pipe](pid_t id) { return writesTo(id, pipe); });
+    }
+    return {};
+}
+
+Group commandsOf(pid_t thread) {
+    const std::string listing = "/proc/self/task/" + std::to_string(thread) + "/children";
+    return isListed(listing) ? listedIn(listing) : waitedForBy(thread);
 }
 
 /// Stops a process and waits, though not for ever, until it has: only then is its list of children final.
@@ -122,12 +216,11 @@ public:
     }
 
     /// Stops a process; its own children are still to be added.
-    /// @param listing where it stands as a child: one that no longer does is another's by now
+    /// @param group what it was found in: where it no longer is, it is another process by now
     /// @return whether it was stopped
-    bool add(pid_t id, const std::string& listing) {
+    bool add(pid_t id, const Group& group) {
         Process process(id);
-        const auto now = readIds(listing);  // still the same child, now that we hold it?
-        if (!process.isOpen() || std::find(now.begin(), now.end(), id) == now.end()) {
+        if (!process.isOpen() || !group.has(id)) {
             return false;
         }
         frozen_.push_back(std::move(process));
@@ -135,14 +228,14 @@ public:
         return true;
     }
 
-    /// The same for all that these listings tell and for their descendants.
-    void addAll(std::vector<std::string> listings) {
-        while (!listings.empty()) {
-            const std::string listing = std::move(listings.back());
-            listings.pop_back();
-            for (const pid_t id : readIds(listing)) {
-                if (add(id, listing)) {
-                    std::ranges::move(childListings(id), std::back_inserter(listings));
+    /// The same for all of these groups and for their descendants.
+    void addAll(std::vector<Group> groups) {
+        while (!groups.empty()) {
+            const Group group = std::move(groups.back());
+            groups.pop_back();
+            for (const pid_t id : group.members) {
+                if (add(id, group)) {
+                    std::ranges::move(childrenOfProcess(id), std::back_inserter(groups));
                 }
             }
         }
@@ -157,13 +250,13 @@ private:
 }  // namespace
 
 void killChildrenOf(pid_t thread) {
-    Condemned().addAll({listingOf(thread)});
+    Condemned().addAll({commandsOf(thread)});
 }
 
 std::vector<ChildProcess> childrenOf(pid_t thread) {
     std::vector<ChildProcess> children;
-    for (const pid_t id : readIds(listingOf(thread))) {
-        if (const Status status = statusOf(id); !hasEnded(status)) {
+    for (const pid_t id : commandsOf(thread).members) {
+        if (const Status status = statusOf(id); !hasEnded(status) && status.parent == getpid()) {
             children.push_back({id, status.started});
         }
     }
@@ -173,10 +266,10 @@ std::vector<ChildProcess> childrenOf(pid_t thread) {
 bool killChild(pid_t thread, const ChildProcess& child) {
     Condemned condemned;
     const Status status = statusOf(child.id);
-    if (hasEnded(status) || status.started != child.started || !condemned.add(child.id, listingOf(thread))) {
+    if (hasEnded(status) || status.started != child.started || !condemned.add(child.id, commandsOf(thread))) {
         return false;
     }
-    condemned.addAll(childListings(child.id));
+    condemned.addAll(childrenOfProcess(child.id));
     return true;
 }
 

@@ -11,7 +11,8 @@ namespace QX {
 
 /// Kills the child processes that one thread of this process has started, and all their descendants. A
 /// shell's pipeline is stopped as a whole before anything of it dies, so that no stage escapes and keeps the
-/// pipe open.
+/// pipe open. Where the kernel lists no children, they are those that the thread waits for at that moment:
+/// the processes at the other end of the pipe that it reads, or the child whose end it waits for.
 /// @param thread kernel id of the thread; it must be alive
 CORVISTA_API void killChildrenOf(pid_t thread);
 

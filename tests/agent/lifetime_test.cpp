@@ -47,14 +47,16 @@ public:
     std::atomic<int> withdrawn{0};
 };
 
-void loadAgainAndAgain(const std::string& file, int times) {
+void loadAgainAndAgain(const std::string& file, int times, double clockSpeed = 1) {
     const cvagent::LogOutput log({}, std::make_shared<cvagent::ErrorLines>());
     { Plugin first(file, nullptr); }  // what the C library keeps from its first use
     const auto before = holdings();
     for (int i = 0; i < times; ++i) {
         Counter counter;
+        QX::setClockSpeed(clockSpeed);
         Plugin plugin(file, &counter);
         ASSERT_GE(plugin.interface().holdAll().size(), 7U) << i;
+        QX::setClockSpeed(1);  // the stop waits for the monitors as long as it ever does
     }
     EXPECT_EQ(holdingsBackAt(before), before);
     EXPECT_EQ(dlopen(file.c_str(), RTLD_LAZY | RTLD_NOLOAD), nullptr) << "still mapped";
@@ -74,10 +76,27 @@ HOST_TEST(PluginLifetime, TwoHundredLoadsOfTheRealPluginLeaveNothingBehind) {
 HOST_TEST(PluginLifetime, MonitorsStoppedInTheMiddleOfAPassLeaveNothingBehind) {
     host.tool("fdisk -ls",
               "Disk /dev/sda: 80.0 GB, 80026361856 bytes\n/dev/sda1  *  1  13  104391  83  Linux\n");
-    QX::setClockSpeed(100000);  // one pass after the other
     const cvagent::QuietCommands quiet;
-    loadAgainAndAgain(CORVISTA_PLUGIN_FILE, 20);
+    loadAgainAndAgain(CORVISTA_PLUGIN_FILE, 20, 100000);  // one pass after the other
     EXPECT_THAT(host.listDirectory("/tmp"), testing::IsEmpty());
+}
+
+HOST_TEST(PluginLifetime, APluginThatStaysMappedIsLeftWithoutACallback) {
+    const cvagent::QuietCommands quiet;
+    const cvagent::LogOutput log({}, std::make_shared<cvagent::ErrorLines>());
+    void* const mapped = dlopen(CORVISTA_PLUGIN_FILE, RTLD_NOW | RTLD_LOCAL);
+    ASSERT_NE(mapped, nullptr);
+    Counter counter;
+    IC::ManagementInterface* interface = nullptr;
+    {
+        Plugin plugin(CORVISTA_PLUGIN_FILE, &counter);
+        interface = &plugin.interface();
+    }
+    auto* const node = new IC::MutableNode(900, 1, {1}, 11, 1);
+    EXPECT_EQ(interface->addNewNode(node).getStatus(), 0);
+    EXPECT_EQ(interface->deleteNode(node).getStatus(), 0);
+    EXPECT_EQ(counter.published + counter.withdrawn, 0);
+    dlclose(mapped);
 }
 
 HOST_TEST(PluginLifetime, TwoHundredFailuresLeaveNothingBehind) {

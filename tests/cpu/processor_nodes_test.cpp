@@ -1,6 +1,9 @@
 #include <gmock/gmock.h>
 
+#include <atomic>
+#include <chrono>
 #include <new>
+#include <thread>
 
 #include "framework/cvlog/logger.h"
 #include "mi/globals.h"
@@ -166,6 +169,30 @@ HOST_TEST(Processors, BuiltAgainStartFromOne) {
     ASSERT_EQ(plugin.processors().size(), 2U);
     EXPECT_EQ(plugin.processors()[1]->getIndex(), 1U);
     EXPECT_THAT(plugin.speeds(), TextsAre("1000", "1000"));
+}
+
+HOST_TEST(Processors, AskedForByTwoAtOnceAreTwoWholeSets) {
+    host.file("/proc/cpuinfo", processor(0, "1000.0") + processor(1, "2000.0"));
+    Started plugin;
+    std::atomic<int> underWay{0};
+    std::atomic<bool> together{false};
+    shell_stub::answerWith([&](const std::string&) {
+        together = ++underWay > 1 || together;
+        std::this_thread::sleep_for(std::chrono::milliseconds(50));
+        --underWay;
+        return "processor\t: 0\nprocessor\t: 1\n";
+    });
+    std::thread other([&] { plugin.mi().createCpuNodes(); });
+    plugin.mi().createCpuNodes();
+    other.join();
+    shell_stub::answerWith({});
+    EXPECT_FALSE(together) << "one waits for the other";
+    std::vector<unsigned int> indexes;
+    for (const auto& node : plugin.processors()) {
+        indexes.push_back(node->getIndex());
+    }
+    EXPECT_THAT(indexes, ElementsAre(1, 2, 1, 2));
+    EXPECT_THAT(plugin.speeds(), TextsAre("1000", "2000", "1000", "2000"));
 }
 
 HOST_TEST(Processors, AreNoneWhenTheShellCannotBeStarted) {

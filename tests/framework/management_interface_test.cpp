@@ -141,8 +141,6 @@ TEST_F(ManagementInterfaceTest, ANodeTheAgentRefusesIsKeptButNotListed) {
     agent_.answer = Error();
     EXPECT_EQ(interface_.addNewNode(node).getStatus(), Error::success);
     EXPECT_THAT(map(), ElementsAre(node));
-    interface_.unload();
-    EXPECT_EQ(alive_, 0);
 }
 
 TEST_F(ManagementInterfaceTest, ANodeAtWhichTheAgentThrowsIsRefused) {
@@ -154,8 +152,6 @@ TEST_F(ManagementInterfaceTest, ANodeAtWhichTheAgentThrowsIsRefused) {
     EXPECT_EQ(interface_.addNewNode(makeNode(3)).getStatus(), Error::failure);
     EXPECT_THAT(map(), ElementsAre());
     EXPECT_EQ(alive_, 2);
-    interface_.unload();
-    EXPECT_EQ(alive_, 0);
 }
 
 TEST_F(ManagementInterfaceTest, ARefusedNodeCanBeDeletedAndTheAgentHearsNothing) {
@@ -189,7 +185,7 @@ TEST_F(ManagementInterfaceTest, AWithdrawnNodeThatIsStillHeldCanComeBack) {
         interface_.addNewNode(node);
     }
     EXPECT_THAT(map(), ElementsAre(node));
-    interface_.unload();
+    EXPECT_EQ(interface_.deleteNode(node).getStatus(), Error::success);
     EXPECT_EQ(alive_, 0);
 }
 
@@ -260,29 +256,69 @@ TEST_F(ManagementInterfaceTest, RemembersTheAlertHandlerUntilItIsTakenBack) {
     EXPECT_EQ(interface_.alertHandler().second, nullptr);
 }
 
-TEST_F(ManagementInterfaceTest, UnloadFreesTheNodesAndForgetsTheCallbacks) {
+TEST_F(ManagementInterfaceTest, UnloadEmptiesTheListAndPointersStayGood) {
     connect();
-    interface_.registerForAlerts(&takeAlerts, &agent_);
     interface_.appendNode(makeNode(1));
     agent_.answer = Error(1, Number(), "no");
-    interface_.addNewNode(makeNode(2));
-    interface_.appendNode(makeNode(3));
-    auto held = interface_.hold(3);
-    agent_.loaded.clear();
+    auto* const refused = makeNode(2);
+    interface_.addNewNode(refused);
+    const std::vector<Node*> before = map();
     EXPECT_EQ(interface_.unload().getStatus(), Error::success);
-    EXPECT_EQ(alive_, 1);
-    held.reset();
-    EXPECT_EQ(alive_, 0);
+    EXPECT_EQ(alive_, 2);
     EXPECT_THAT(map(), ElementsAre());
-    EXPECT_EQ(interface_.alertHandler().first, nullptr);
-    EXPECT_THAT(agent_.withdrawn, ElementsAre());
+    EXPECT_EQ(interface_.getNode(1), nullptr);
+    EXPECT_EQ(interface_.hold(1), nullptr);
+    EXPECT_EQ(before.at(0)->getStatus(), 0U);
+    EXPECT_EQ(refused->getNodeId(), 2U);
+    EXPECT_THAT(agent_.withdrawn, ElementsAre()) << "none was withdrawn";
 
+    interface_.initialize(1, Number(1U), Number(2U));
+    auto* const next = makeNode(2);
+    interface_.appendNode(next);
+    EXPECT_THAT(map(), ElementsAre(next)) << "a new start has its own";
+    EXPECT_EQ(interface_.unload().getStatus(), Error::success);
+    EXPECT_EQ(alive_, 3);
+    EXPECT_EQ(before.at(0)->getDescription(), "");
+}
+
+TEST_F(ManagementInterfaceTest, ANodeCanStillBeDeletedAfterUnloadAndTheAgentHearsNothing) {
+    connect();
+    auto* const node = makeNode(1);
+    interface_.appendNode(node);
+    interface_.unload();
+    EXPECT_EQ(interface_.deleteNode(node).getStatus(), Error::success);
+    EXPECT_EQ(alive_, 0);
+    EXPECT_EQ(interface_.deleteNode(node).getStatus(), Error::failure);
+    EXPECT_THAT(agent_.withdrawn, ElementsAre());
+}
+
+TEST_F(ManagementInterfaceTest, ANodeOfAnEarlierStartCanBeHandedOverAgain) {
+    auto* const node = makeNode(1);
+    interface_.appendNode(node);
+    interface_.unload();
+    interface_.appendNode(node);
+    EXPECT_THAT(map(), ElementsAre(node));
+    interface_.unload();
+    EXPECT_EQ(interface_.deleteNode(node).getStatus(), Error::success);
+    EXPECT_EQ(alive_, 0) << "owned once";
+}
+
+TEST_F(ManagementInterfaceTest, CallbacksStayOverUnloadAndANewInitialize) {
+    connect();
+    interface_.registerForAlerts(&takeAlerts, &agent_);
+    interface_.unload();
+    EXPECT_EQ(interface_.alertHandler().first, &takeAlerts);
+    interface_.initialize(1, Number(1U), Number(2U));
+    EXPECT_EQ(interface_.alertHandler().first, &takeAlerts);
+    EXPECT_EQ(interface_.alertHandler().second, &agent_);
     auto* const node = makeNode(4);
     interface_.addNewNode(node);
     interface_.deleteNode(node);
-    EXPECT_THAT(agent_.loaded, ElementsAre());
-    EXPECT_THAT(agent_.withdrawn, ElementsAre());
-    EXPECT_EQ(interface_.unload().getStatus(), Error::success);
+    EXPECT_THAT(agent_.loaded, ElementsAre(4));
+    EXPECT_THAT(agent_.withdrawn, ElementsAre(4));
+    interface_.unload();
+    interface_.deRegisterForAlerts();
+    EXPECT_EQ(interface_.alertHandler().first, nullptr);
 }
 
 TEST(ManagementInterface, TheDestructorFreesTheNodes) {
@@ -290,7 +326,9 @@ TEST(ManagementInterface, TheDestructorFreesTheNodes) {
     {
         Interface interface;
         interface.appendNode(new CountedNode(1, alive));
-        EXPECT_EQ(alive, 1);
+        interface.unload();
+        interface.appendNode(new CountedNode(2, alive));
+        EXPECT_EQ(alive, 2);
     }
     EXPECT_EQ(alive, 0);
 }

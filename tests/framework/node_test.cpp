@@ -34,6 +34,25 @@ TEST(MutableNode, TakesNewAttributes) {
     EXPECT_EQ(static_cast<std::string>(node), "/oshw/root (type 59, id 7)");
 }
 
+TEST(Node, TwoReadsCanBeCalledAsItsOwn) {
+    class Loud : public MutableNode {
+    public:
+        Loud() : MutableNode(7, 2, {}, 59, 0) {}
+        unsigned int getStatus() const override { return 99; }
+        std::string getDescription() const override { return "LOUD"; }
+    };
+    Loud loud;
+    const IC::Node& node = loud;
+    EXPECT_EQ(node.IC::Node::getStatus(), 0U);
+    EXPECT_EQ(node.IC::Node::getDescription(), "");
+    loud.setStatus(12);
+    loud.setDescription("loud");
+    EXPECT_EQ(node.IC::Node::getStatus(), 12U);
+    EXPECT_EQ(node.IC::Node::getDescription(), "loud");
+    EXPECT_EQ(node.getStatus(), 99U);
+    EXPECT_EQ(node.getDescription(), "LOUD");
+}
+
 TEST(MutableNode, AsksThePathSourceUntilThePathIsSet) {
     MutableNode node(7, 2, {}, 59, 0);
     IC::Node::setPathSource([](const IC::Node& unseen) {

@@ -16,5 +16,6 @@ corvista_test(framework LABELS threads SOURCES
   framework/strings_test.cpp
   framework/thread_test.cpp
   support/failing_new.cpp
+  support/no_child_lists.cpp
   LIBRARIES test_support)
 set_source_files_properties(framework/stress_test.cpp PROPERTIES SKIP_UNITY_BUILD_INCLUSION ON)

@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 #include <sys/resource.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include <array>
@@ -11,11 +12,15 @@
 #include <cstdio>
 #include <fstream>
 #include <functional>
+#include <memory>
 #include <thread>
 
 #include "framework/cvlog/logger.h"
 #include "framework/qx/event.h"
+#include "framework/qx/process_tree.h"
 #include "tests/support/failing_new.h"
+#include "tests/support/no_child_lists.h"
+#include "tests/support/no_threads.h"
 
 namespace {
 
@@ -174,6 +179,72 @@ TEST(Thread, DestroyedWhileItRunsIsJoined) {
         worker.start(nullptr);
     }
     EXPECT_TRUE(finished);
+}
+
+TEST(Thread, IsWaitedForNotLongerThanAsked) {
+    std::atomic<bool> go = false;
+    Worker worker([&] {
+        QX::Thread::sleep(kLong);
+        while (!go) {
+            std::this_thread::sleep_for(1ms);
+        }
+    });
+    EXPECT_TRUE(worker.joinWithin(0)) << "it does not run";
+    worker.start(nullptr);
+    const auto start = Clock::now();
+    EXPECT_FALSE(worker.joinWithin(30));
+    EXPECT_GE(Clock::now() - start, 29ms);
+    go = true;
+    EXPECT_TRUE(worker.joinWithin(kLong));
+    EXPECT_LT(Clock::now() - start, 10s) << "its sleep has ended";
+}
+
+TEST(Thread, KnowsItself) {
+    std::atomic<int> answers = 0;
+    Worker worker([&] { answers = (worker.isThisThread() ? 1 : 0) + (worker.joinWithin(kLong) ? 0 : 2); });
+    worker.start(nullptr);
+    EXPECT_FALSE(worker.isThisThread());
+    worker.join();
+    EXPECT_EQ(answers, 3) << "and does not wait for itself";
+}
+
+/// A thread that waits for its test, with something that goes when it goes.
+struct Left {
+    std::shared_ptr<int> held = std::make_shared<int>();
+    std::weak_ptr<int> thing = held;
+    std::atomic<bool> runs = false;
+    std::atomic<bool> go = false;
+    std::atomic<bool> knew = false;
+    std::unique_ptr<QX::Thread> thread = std::make_unique<Worker>([this, thing = std::move(held)] {
+        runs = true;
+        while (!go) {
+            std::this_thread::sleep_for(1ms);
+        }
+        knew = QX::Thread::isLeft();
+    });
+};
+
+TEST(Thread, ThatIsLeftOwnsItselfUntilItsEnd) {
+    Left left;
+    left.thread->start(nullptr);
+    ASSERT_TRUE(soon([&] { return left.runs.load(); }));
+    left.thread->abort();
+    QX::Thread::leave(std::move(left.thread));
+    EXPECT_FALSE(left.thing.expired());
+    left.go = true;
+    EXPECT_TRUE(soon([&] { return left.thing.expired(); }));
+    EXPECT_TRUE(left.knew);
+    EXPECT_FALSE(QX::Thread::isLeft());
+}
+
+TEST(Thread, ThatHasEndedGoesWhenItIsLeft) {
+    Left left;
+    left.go = true;
+    left.thread->start(nullptr);
+    left.thread->join();
+    EXPECT_FALSE(left.knew);
+    QX::Thread::leave(std::move(left.thread));
+    EXPECT_TRUE(left.thing.expired());
 }
 
 TEST(Thread, MayDestroyItselfAtItsEnd) {
@@ -335,21 +406,27 @@ TEST(ThreadAbort, RacesWithTheStartOfAWait) {
     }
 }
 
-TEST(ThreadAbort, KillsACommandAndEverythingItStarted) {
-    // Every stage tells its process and holds the pipe open: the shell, a child of it, one of a subshell, one
-    // behind a pipe.
-    constexpr const char* kCommand =
-        "echo $$; sleep 1000 & echo $!; (sleep 1000 & echo $!; wait) & echo $!; "
-        "sh -c 'echo $$; sleep 1000' | cat; wait";
+/// A thread with a command is aborted, and of what has told its number nothing runs any more.
+void expectKilled(const char* command, int processes) {
     Reader reader;
-    Worker worker([&] { reader.read(kCommand); });
+    Worker worker([&] { reader.read(command); });
     worker.start(nullptr);
-    ASSERT_TRUE(soon([&] { return reader.count() == 5; }));
+    ASSERT_TRUE(soon([&] { return reader.count() == processes; }));
     worker.abort();
     worker.join();
-    for (int index = 0; index < 5; ++index) {
+    for (int index = 0; index < processes; ++index) {
         EXPECT_TRUE(soon([&] { return !isRunning(reader.line(index)); })) << index;
     }
+}
+
+// Every stage tells its process and holds the pipe open: the shell, a child of it, one of a subshell, one
+// behind a pipe.
+constexpr const char* kPipeline =
+    "echo $$; sleep 1000 & echo $!; (sleep 1000 & echo $!; wait) & echo $!; "
+    "sh -c 'echo $$; sleep 1000' | cat; wait";
+
+TEST(ThreadAbort, KillsACommandAndEverythingItStarted) {
+    expectKilled(kPipeline, 5);
 }
 
 TEST(ThreadAbort, EndsCommandsThatAreStartedAfterIt) {
@@ -369,6 +446,62 @@ TEST(ThreadAbort, EndsCommandsThatAreStartedAfterIt) {
     aborted = true;
     worker.join();
     EXPECT_EQ(commands, 3);
+}
+
+TEST(ThreadAbort, IsRepeatedUntilTheThreadHasEndedThoughNobodyWaitsForIt) {
+    Reader reader;
+    std::atomic<bool> aborted = false;
+    std::atomic<int> commands = 0;
+    Worker worker([&] {
+        while (!aborted) {
+            std::this_thread::yield();
+        }
+        for (; commands < 2; ++commands) {
+            reader.read("sleep 1000");
+        }
+    });
+    worker.start(nullptr);
+    worker.abort();
+    worker.abort();
+    aborted = true;
+    EXPECT_TRUE(soon([&] { return commands == 2; }));
+}
+
+TEST(ThreadAbort, IsRepeatedByTheJoinWhereNoThreadIsLeftForIt) {
+    Reader reader;
+    std::atomic<bool> aborted = false;
+    Worker worker([&] {
+        while (!aborted) {
+            std::this_thread::yield();
+        }
+        reader.read("sleep 1000");
+    });
+    worker.start(nullptr);
+    {
+        const NoThreads none;
+        EXPECT_NO_THROW(worker.abort());
+    }
+    aborted = true;
+    std::this_thread::sleep_for(20ms);
+    worker.join();
+}
+
+TEST(ThreadAbort, IsKnownInTheThreadAlone) {
+    std::atomic<int> answers = 0;
+    Worker worker([&] {
+        answers = QX::Thread::isAborted() ? 1 : 0;
+        QX::Thread::sleep(kLong);
+        answers += QX::Thread::isAborted() ? 4 : 2;
+    });
+    worker.start(nullptr);
+    worker.join();
+    EXPECT_EQ(answers, 2);
+    worker.start(nullptr);
+    std::this_thread::sleep_for(20ms);
+    worker.abort();
+    EXPECT_FALSE(QX::Thread::isAborted());
+    worker.join();
+    EXPECT_EQ(answers, 4);
 }
 
 TEST(ThreadAbort, DuringAJoinStillKills) {
@@ -397,6 +530,65 @@ TEST(ThreadAbort, LeavesTheCommandsOfOtherThreadsAlone) {
     bystander.abort();
     bystander.join();
     EXPECT_FALSE(isRunning(others.line(0)));
+}
+
+TEST(ThreadAbortWithoutChildLists, KillsACommandAndEverythingItStarted) {
+    const NoChildLists none;
+    expectKilled(kPipeline, 5);
+}
+
+TEST(ThreadAbortWithoutChildLists, KillsACommandThatWritesElsewhere) {
+    const NoChildLists none;
+    expectKilled("echo $$; exec > /dev/null; (sleep 1000); true", 1);
+}
+
+TEST(ThreadAbortWithoutChildLists, KillsWhatHoldsThePipeWhenTheShellHasGone) {
+    const NoChildLists none;
+    expectKilled("sleep 1000 & echo $!", 1);
+}
+
+TEST(ThreadAbortWithoutChildLists, LeavesTheCommandsOfOthersAlone) {
+    const NoChildLists none;
+    Reader mine;
+    Reader others;
+    Worker victim([&] { mine.read("echo $$; exec sleep 1000"); });
+    Worker bystander([&] { others.read("echo $$; exec sleep 1000"); });
+    victim.start(nullptr);
+    ASSERT_TRUE(soon([&] { return mine.count() == 1; }));
+    bystander.start(nullptr);
+    const pid_t heir = fork();  // has what the victim reads from, as any program that is started meanwhile
+    if (heir == 0) {
+        execlp("sleep", "sleep", "1000", nullptr);
+        _exit(127);
+    }
+    ASSERT_TRUE(soon([&] { return others.count() == 1; }));
+    victim.abort();
+    victim.join();
+    EXPECT_FALSE(isRunning(mine.line(0)));
+    EXPECT_TRUE(isRunning(others.line(0)));
+    EXPECT_TRUE(isRunning(heir));
+    kill(heir, SIGKILL);
+    EXPECT_EQ(waitpid(heir, nullptr, 0), heir);
+    bystander.abort();
+}
+
+TEST(ChildrenWithoutLists, AreWhatTheThreadWaitsFor) {
+    const NoChildLists none;
+    Reader reader;
+    std::atomic<pid_t> thread = 0;
+    Worker worker([&] {
+        thread = gettid();
+        reader.read("echo $$; exec sleep 1000");
+    });
+    worker.start(nullptr);
+    ASSERT_TRUE(soon([&] { return reader.count() == 1 && QX::childrenOf(thread).size() == 1; }));
+    const QX::ChildProcess child = QX::childrenOf(thread).at(0);
+    EXPECT_EQ(child.id, reader.line(0));
+    EXPECT_TRUE(QX::childrenOf(gettid()).empty());
+    EXPECT_FALSE(QX::killChild(thread, {child.id, child.started + 1})) << "another process by that number";
+    EXPECT_TRUE(QX::killChild(thread, child));
+    worker.join();
+    EXPECT_FALSE(isRunning(reader.line(0)));
 }
 
 }  // namespace

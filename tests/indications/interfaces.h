@@ -4,6 +4,7 @@
 #include <vector>
 
 #include "framework/ic/mutable_node.h"
+#include "indications/globals.h"
 #include "mi/command.h"
 #include "mi/globals.h"
 #include "tests/support/plugin_access.h"
@@ -48,8 +49,9 @@ public:
         return *node;
     }
     IC::OsHwMI& mi() { return mi_; }
-    std::map<std::string, unsigned int>& current() { return IC::OsHwMITestAccess::current(mi_); }
-    std::map<std::string, unsigned int>& previous() { return IC::OsHwMITestAccess::previous(mi_); }
+    /// What a pass on this thread works on.
+    static std::map<std::string, unsigned int>& current() { return IC::OSHWMI_IND::pass().current; }
+    static std::map<std::string, unsigned int>& previous() { return IC::OSHWMI_IND::pass().previous; }
 
 private:
     IC::OsHwMI& mi_ = IC::myoshwmi;

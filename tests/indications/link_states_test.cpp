@@ -78,9 +78,9 @@ HOST_TEST(LinkStates, StayAsTheyWereWhereACommandWasEnded) {
     interfaces.mi().createCurNetNodeMap();
     EXPECT_THAT(interfaces.current(), ElementsAre(Pair("eth0", 12), Pair("eth1", 1), Pair("eth3", 12)))
         << "eth2 has none yet";
-    EXPECT_THAT(IC::OSHWMI_IND::untold, TextsAre("eth1", "eth2"));
+    EXPECT_THAT(IC::OSHWMI_IND::pass().untold, TextsAre("eth1", "eth2"));
     interfaces.mi().createCurNetNodeMap();
-    EXPECT_THAT(IC::OSHWMI_IND::untold, TextsAre("eth1", "eth2")) << "those of the last pass alone";
+    EXPECT_THAT(IC::OSHWMI_IND::pass().untold, TextsAre("eth1", "eth2")) << "those of the last pass alone";
 }
 
 HOST_TEST(LinkStates, OfANodeThatCannotBeReadStayToo) {
@@ -161,7 +161,7 @@ HOST_TEST(LinkStates, GatherTheMembersOfAllBonds) {
     bond.interfaces.add("bond1", 1);
     LogCapture capture;
     bond.interfaces.mi().createCurNetNodeMap();
-    EXPECT_THAT(IC::OSHWMI_IND::slaves, TextsAre("eth0", "eth1", "eth7.100", "eth8"));
+    EXPECT_THAT(IC::OSHWMI_IND::pass().slaves, TextsAre("eth0", "eth1", "eth7.100", "eth8"));
     EXPECT_THAT(capture.ownMessages(3000),
                 testing::IsSupersetOf({"Calling bondedNetNodeStatus() for bonded interface: bond0",
                                        "bondedNetNodeStatus: entry",
@@ -209,7 +209,7 @@ HOST_TEST(LinkStates, OfABondWithoutAStatusFileAreItsOwn) {
     interfaces.add("bond0", 12);
     interfaces.mi().createCurNetNodeMap();
     EXPECT_THAT(interfaces.current(), ElementsAre(Pair("bond0", 12)));
-    EXPECT_THAT(IC::OSHWMI_IND::slaves, IsEmpty());
+    EXPECT_THAT(IC::OSHWMI_IND::pass().slaves, IsEmpty());
 }
 
 }  // namespace

@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <atomic>
 #include <chrono>
+#include <filesystem>
 #include <mutex>
 #include <optional>
 #include <thread>
@@ -61,7 +62,9 @@ std::vector<std::string> stopHeldUp(std::chrono::milliseconds delay) {
     interfaces.mi().enableIndications();
     EXPECT_TRUE(eventually([&] { return slow->asked(); }));
     LogCapture capture;
+    const auto start = std::chrono::steady_clock::now();
     interfaces.mi().disableIndications();
+    EXPECT_LT(std::chrono::steady_clock::now() - start, 1500ms);
     EXPECT_EQ(capture.ownMessages(3000), capture.ownMessages());
     return capture.ownMessages();
 }
@@ -206,6 +209,113 @@ HOST_TEST(NetworkMonitor, IsWaitedForTenTimesAtTheMost) {
     EXPECT_THAT(messages,
                 testing::Not(Contains("eventThreadNetIndications: Waiting for thread 10 seconds so far")));
     EXPECT_THAT(messages, Contains("eventThreadNetIndications termination failed."));
+}
+
+/// An agent whose first alert is not answered until the test lets it go on.
+struct Stuck {
+    std::atomic<int> calls{0};
+    std::atomic<bool> go{false};
+
+    static IC::Error hear(const std::vector<IC::Alert>&, const void* context) {
+        auto* stuck = const_cast<Stuck*>(static_cast<const Stuck*>(context));
+        if (++stuck->calls == 1) {
+            while (!stuck->go) {
+                std::this_thread::sleep_for(1ms);
+            }
+        }
+        return {};
+    }
+};
+
+std::size_t threads() {
+    const std::filesystem::directory_iterator tasks("/proc/self/task");
+    return static_cast<std::size_t>(std::distance(begin(tasks), end(tasks)));
+}
+
+HOST_TEST(NetworkMonitor, IsLeftWhenACallbackHangsForEver) {
+    std::thread([] {}).join();  // what a sanitizer starts beside the first thread of a process
+    const std::size_t before = threads();
+    host.file(kFile, "eth0=12\neth1=12\n");
+    Stuck stuck;
+    LogCapture capture;
+    {
+        Interfaces interfaces;
+        interfaces.add("eth0", 1);
+        interfaces.add("eth1", 1);
+        interfaces.mi().registerForAlerts(Stuck::hear, &stuck);
+        interfaces.mi().enableIndications();
+        ASSERT_TRUE(eventually([&] { return stuck.calls == 1; }));
+        QX::setClockSpeed(20);  // a second passes in 50 ms
+        const auto start = std::chrono::steady_clock::now();
+        EXPECT_EQ(interfaces.mi().unload().getStatus(), 0);
+        EXPECT_GE(std::chrono::steady_clock::now() - start, 490ms);
+        EXPECT_LT(std::chrono::steady_clock::now() - start, 5s);
+    }
+    EXPECT_TRUE(Interfaces::previous().empty()) << "what the pass works on is its thread's alone";
+    EXPECT_THAT(capture.ownMessages(), Contains("eventThreadNetIndications termination failed."));
+    EXPECT_THAT(capture.ownMessages(),
+                Contains(testing::StartsWith("eventThreadNetIndications: Waiting for thread ")).Times(10));
+    QX::setClockSpeed(1);
+    {
+        Interfaces next;  // a new start beside the thread of the last one
+        next.add("eth0", 12);
+        next.add("eth1", 12);
+        next.mi().enableIndications();
+        ASSERT_TRUE(eventually([&] {
+            const auto said = capture.messages();
+            return std::ranges::find(said, "writePrevNetNodeMap: exit") != said.end();
+        })) << "the first pass is over";
+        const auto lines = capture.messages().size();
+        stuck.go = true;
+        EXPECT_TRUE(eventually([&] { return threads() == before + 1; }));
+        EXPECT_EQ(stuck.calls, 1) << "the agent was told of a stop: no alert comes after it";
+        EXPECT_EQ(capture.messages().size(), lines) << "and no line";
+        EXPECT_EQ(host.read(kFile), "eth0=12\neth1=12\n");
+        EXPECT_FALSE(IC::OsHwMITestAccess::networkMonitorEnded(next.mi()));
+        capture.clear();
+    }
+    EXPECT_THAT(capture.ownMessages(), Contains("eventThreadNetIndicationsThread terminated."));
+}
+
+HOST_TEST(NetworkMonitor, ThatWasLeftMayOutliveTheProgramsEnd) {
+    host.file(kFile, "eth0=12\n");
+    static Stuck stuck;  // until the process has gone
+    Interfaces interfaces;
+    interfaces.add("eth0", 1);
+    interfaces.mi().registerForAlerts(Stuck::hear, &stuck);
+    interfaces.mi().enableIndications();
+    ASSERT_TRUE(eventually([&] { return stuck.calls == 1; }));
+    QX::setClockSpeed(1000);
+    interfaces.mi().disableIndications();
+}
+
+/// An agent that has enough after one alert, and says so while it is told.
+IC::Error stopAll(const std::vector<IC::Alert>&, const void* context) {
+    auto* calls = const_cast<std::atomic<int>*>(static_cast<const std::atomic<int>*>(context));
+    IC::myoshwmi.deRegisterForAlerts();
+    EXPECT_EQ(IC::myoshwmi.unload().getStatus(), 0);
+    ++*calls;
+    return {};
+}
+
+HOST_TEST(NetworkMonitor, MayBeStoppedByTheCallbackThatItCalls) {
+    std::thread([] {}).join();
+    const std::size_t before = threads();
+    host.file(kFile, "eth0=12\neth1=12\n");
+    host.file("/tmp/fdisk_tmp", "");
+    Interfaces interfaces;
+    interfaces.add("eth0", 1);
+    interfaces.add("eth1", 1);
+    std::atomic<int> calls{0};
+    interfaces.mi().registerForAlerts(stopAll, &calls);
+    const auto start = std::chrono::steady_clock::now();
+    interfaces.mi().enableIndications();
+    ASSERT_TRUE(eventually([&] { return calls == 1 && threads() == before; }));
+    EXPECT_LT(std::chrono::steady_clock::now() - start, 5s) << "it does not wait for itself";
+    EXPECT_EQ(calls, 1);
+    EXPECT_EQ(host.read(kFile), "eth0=12\neth1=12\n") << "of the second change nobody was told";
+    EXPECT_FALSE(host.exists("/tmp/fdisk_tmp")) << "the stop has run its commands";
+    EXPECT_FALSE(IC::OsHwMITestAccess::hasInventory());
 }
 
 HOST_TEST(NetworkMonitor, StartedAgainIsNotTakenForTheOneThatEnded) {

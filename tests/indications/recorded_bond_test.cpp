@@ -33,7 +33,7 @@ public:
         plugin_.mi().createCurNetNodeMap();
         plugin_.mi().checkAndSendNetAlert();
         plugin_.mi().writePrevNetNodeMap();
-        IC::OSHWMI_IND::slaves.clear();
+        IC::OSHWMI_IND::pass().slaves.clear();
         return heard_.now();
     }
     IC::MutableNode& bond() { return *plugin_.config("bond0"); }

@@ -4,13 +4,17 @@
 #include <gtest/gtest.h>
 
 #include <array>
+#include <atomic>
+#include <chrono>
 #include <cstdio>
 #include <filesystem>
+#include <functional>
 #include <memory>
 #include <sstream>
 #include <thread>
 
 #include "framework/ic/management_interface.h"
+#include "framework/qx/thread.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/texts_are.h"
 
@@ -97,6 +101,51 @@ HOST_TEST(Library, OpenedAgainStartsAsItDidTheFirstTime) {
         dlclose(library);
         ASSERT_FALSE(isLoaded());
     }
+}
+
+/// An agent that does not come back from an alert before it may.
+struct Stuck {
+    std::atomic<bool> called{false};
+    std::atomic<bool> go{false};
+
+    static IC::Error hear(const std::vector<IC::Alert>&, const void* context) {
+        auto* stuck = const_cast<Stuck*>(static_cast<const Stuck*>(context));
+        stuck->called = true;
+        while (!stuck->go) {
+            std::this_thread::sleep_for(std::chrono::milliseconds(1));
+        }
+        return {};
+    }
+};
+
+bool eventually(const std::function<bool()>& holds) {
+    for (int i = 0; i < 1000 && !holds(); ++i) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(10));
+    }
+    return holds();
+}
+
+HOST_TEST(Library, StaysMappedAsLongAsACallbackHangs) {
+    host.copyTree("suse-two-nics");
+    host.file("/opt/vantrel/corvista/data/oshwminetind.dat", "eth0=12\n");
+    std::thread([] {}).join();
+    const std::size_t before = threads();
+    void* library = dlopen(kPlugin.c_str(), RTLD_NOW | RTLD_LOCAL);
+    ASSERT_NE(library, nullptr) << dlerror();
+    IC::ManagementInterface* interface = nullptr;
+    IC::Error* error = nullptr;
+    reinterpret_cast<Entry>(dlsym(library, "OpenMI"))(&interface, &error);
+    Stuck stuck;
+    interface->registerForAlerts(Stuck::hear, &stuck);
+    interface->initialize(1, IC::Number(1U), IC::Number(2U));
+    ASSERT_TRUE(eventually([&] { return stuck.called.load(); }));
+    QX::setClockSpeed(100);  // eleven seconds pass in 110 ms
+    EXPECT_EQ(interface->unload().getStatus(), 0);
+    EXPECT_EQ(dlclose(library), 0);
+    EXPECT_TRUE(isLoaded());
+    EXPECT_EQ(threads(), before + 2) << "the one that hangs, and the one that looks for its commands";
+    stuck.go = true;
+    EXPECT_TRUE(eventually([&] { return threads() == before; }));
 }
 
 TEST(Library, HandsOutTheSameTwoAddressesEveryTime) {

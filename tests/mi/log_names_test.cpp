@@ -255,7 +255,7 @@ void pass(IC::OsHwMI& mi, IC::Error (*handler)(const std::vector<IC::Alert>&, co
           unsigned int before) {
     mi.registerForAlerts(handler, nullptr);
     mi.readPrevNetNodeMap();
-    Access::previous(mi) = {{"bond0", before}, {"eth0", before}, {"eth1", before}};
+    IC::OSHWMI_IND::pass().previous = {{"bond0", before}, {"eth0", before}, {"eth1", before}};
     mi.createCurNetNodeMap();
     mi.checkAndSendNetAlert();
     mi.writePrevNetNodeMap();

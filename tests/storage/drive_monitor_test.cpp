@@ -3,6 +3,8 @@
 
 #include <pthread.h>
 
+#include <algorithm>
+#include <atomic>
 #include <chrono>
 #include <new>
 #include <thread>
@@ -66,6 +68,26 @@ protected:
         IC::myoshwmi.createPartitionNodes(false);
         clearCommands();
     }
+
+    /// A stop while a tool of a comparison hangs.
+    static std::vector<std::string> stopWhileHanging(const FakeHost& host, const std::string& tool) {
+        QX::setClockSpeed(1000);
+        IC::myoshwmi.startHDDThread();
+        const auto end = steady_clock::now() + 20s;
+        while (host.callsOf(tool).empty() && steady_clock::now() < end) {
+            std::this_thread::sleep_for(1ms);
+        }
+        EXPECT_FALSE(host.callsOf(tool).empty());
+        QX::setClockSpeed(50);  // ten seconds pass in 200 ms
+        LogCapture log;
+        const auto start = steady_clock::now();
+        Access::stopMonitor();
+        EXPECT_GE(steady_clock::now() - start, 199ms) << "not before ten seconds";
+        EXPECT_LT(steady_clock::now() - start, 10s);
+        EXPECT_THAT(diary(), IsEmpty()) << "nothing was compared";
+        EXPECT_THAT(log.messages(6000), IsEmpty());
+        return log.ownMessages();
+    }
 };
 
 HOST_TEST_F(DriveMonitor, ComparesAfterTwoMinutesAndThenEveryMinute) {
@@ -105,12 +127,14 @@ HOST_TEST_F(DriveMonitor, StartedWhileOneRunsTheEarlierOneEndsFirst) {
     const Passes passes;
     IC::myoshwmi.startHDDThread();
     ASSERT_TRUE(passes.waitFor(1));
-    IC::myoshwmi.startHDDThread();
+    EXPECT_EQ(passes.times().size(), 1U);
+    IC::myoshwmi.startHDDThread();  // ten seconds pass in 10 ms: the fdisk of the earlier one is ended
     ASSERT_TRUE(passes.waitFor(3));
+    QX::setClockSpeed(1);
     Access::stopMonitor();
     EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda", "published /dev/sda", "withdrawn /dev/sda1",
-                                  "published /dev/sda1", "withdrawn /dev/sda", "published /dev/sda",
-                                  "withdrawn /dev/sda1", "published /dev/sda1"));
+                                  "published /dev/sda1"))
+        << "by the later one's first pass";
 }
 
 HOST_TEST_F(DriveMonitor, FollowsTheLayout) {
@@ -207,9 +231,53 @@ HOST_TEST_F(DriveMonitor, AStopDuringAComparisonWaitsForItsEnd) {
     const Passes passes;
     IC::myoshwmi.startHDDThread();
     ASSERT_TRUE(passes.waitFor(1));
+    QX::setClockSpeed(1);
     Access::stopMonitor();
     EXPECT_EQ(passes.times().size(), 1U);
     EXPECT_EQ(diary().size(), 4U) << "the comparison went to its end";
+}
+
+HOST_TEST_F(DriveMonitor, AStopWhileFdiskHangsEndsItAfterTenSeconds) {
+    host.tool("fdisk -ls", ToolAnswer{.out = kLayout, .delayMilliseconds = 60'000});
+    EXPECT_THAT(stopWhileHanging(host, "fdisk"),
+                TextsAre("HardDriveUpdateMonitor::stop: entry", "HardDriveUpdateMonitor::stop: exit",
+                         "disable Hard Drive updates: waiting for HardDriveUpdateMonitor Termination ",
+                         "disable Hard Drive updates: HardDriveUpdateMonitor terminated.",
+                         "HardDriveUpdateMonitor::~HardDriveUpdateMonitor: entry",
+                         "HardDriveUpdateMonitor::~HardDriveUpdateMonitor: exit"));
+}
+
+HOST_TEST_F(DriveMonitor, AStopWhileADigestHangsWithdrawsNothing) {
+    host.tool("md5sum", ToolAnswer{.out = "0  -\n", .delayMilliseconds = 60'000});
+    stopWhileHanging(host, "md5sum");
+}
+
+/// An agent that stops the plug-in while it is handed a drive.
+HOST_TEST_F(DriveMonitor, MayBeStoppedByTheCallbackThatItCalls) {
+    host.tool("fdisk -ls", "Disk /dev/sdb: 80.0 GB, 80026361856 bytes\n" + kLayout);
+    QX::setClockSpeed(1000);
+    static std::atomic<int> calls{0};
+    IC::myoshwmi.setLoadCallBack(
+        [](IC::Node* const&, const void*) -> IC::Error {
+            EXPECT_EQ(IC::myoshwmi.unload().getStatus(), 0);
+            ++calls;
+            return {};
+        },
+        nullptr, nullptr);
+    LogCapture log;
+    IC::myoshwmi.startHDDThread();
+    const auto end = steady_clock::now() + 20s;
+    const auto ended = [&] {
+        const auto said = log.messages();
+        return std::ranges::find(said, "HardDriveUpdateMonitor::~HardDriveUpdateMonitor: exit") != said.end();
+    };
+    while (!ended() && steady_clock::now() < end) {
+        std::this_thread::sleep_for(1ms);
+    }
+    EXPECT_TRUE(ended());
+    EXPECT_EQ(calls, 1);
+    EXPECT_TRUE(Access::drives().empty());
+    EXPECT_THAT(log.messages(6000), IsEmpty());
 }
 
 HOST_TEST_F(DriveMonitor, AMonitorThatIsDroppedEndsByItself) {

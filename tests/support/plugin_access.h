@@ -38,9 +38,6 @@ struct OsHwMITestAccess {
 
     static bool networkMonitorEnded(OsHwMI& mi) { return mi.networkMonitorEnded_.wait(0); }
 
-    static std::map<std::string, unsigned int>& current(OsHwMI& mi) { return mi.inventory_->currentStates; }
-    static std::map<std::string, unsigned int>& previous(OsHwMI& mi) { return mi.inventory_->previousStates; }
-
     /// Enough of the tree for drives and partitions: a disk controller with the first node id.
     static void plantDiskController(unsigned int firstNodeId) {
         myoshwmi.ManagementInterface::initialize(7, Number(1U), Number(firstNodeId));
