@@ -33,13 +33,13 @@ using Access = IC::OsHwMITestAccess;
 const std::map<std::string, std::set<std::string>> kOperations =
     operationNames(std::filesystem::path(testsDirectory()).parent_path());
 
-struct Text {
+struct LoggedText {
     const char* start;  ///< of the message
     std::set<std::string> operations;
 };
 
 /// Lines that helpers, templates and closures write, or operations without an entry line, and whose they are.
-const std::vector<Text> kTexts = {
+const std::vector<LoggedText> kTexts = {
     {"disable Hard Drive updates: waiting for HardDriveUpdateMonitor Termination ", {"unload"}},
     {"disable Hard Drive updates: HardDriveUpdateMonitor terminated.", {"unload"}},
     {"createDiskControllerNodes failed: out of luck", {"initialize"}},
@@ -126,9 +126,9 @@ const std::vector<Text> kTexts = {
 };
 
 /// The row whose text begins like the message, the longest of several.
-const Text* rowOf(const std::string& message) {
-    const Text* found = nullptr;
-    for (const Text& row : kTexts) {
+const LoggedText* rowOf(const std::string& message) {
+    const LoggedText* found = nullptr;
+    for (const LoggedText& row : kTexts) {
         const std::string start = row.start;
         if (message.starts_with(start) &&
             (found == nullptr || start.size() > std::string(found->start).size())) {
@@ -147,13 +147,13 @@ std::string nameInText(const std::string& message) {
 }
 
 void expectNames(const std::vector<LogLine>& lines) {
-    std::map<const Text*, std::set<std::string>> seen;
+    std::map<const LoggedText*, std::set<std::string>> seen;
     for (const LogLine& line : lines) {
         const std::string whole = line.function + ", " + line.source + ": " + line.message;
         const auto operation = kOperations.find(line.function);
         ASSERT_NE(operation, kOperations.end()) << whole;
         EXPECT_TRUE(operation->second.contains(line.source)) << whole;
-        const Text* row = rowOf(line.message);
+        const LoggedText* row = rowOf(line.message);
         if (row != nullptr) {
             seen[row].insert(line.function);
             EXPECT_TRUE(row->operations.contains(line.function)) << whole;
@@ -161,7 +161,7 @@ void expectNames(const std::vector<LogLine>& lines) {
             EXPECT_EQ(line.function, name) << whole;
         }
     }
-    for (const Text& row : kTexts) {
+    for (const LoggedText& row : kTexts) {
         EXPECT_EQ(seen[&row], row.operations) << row.start << ": not all of them were played";
     }
 }
