@@ -1,0 +1,203 @@
+#include "agent/shell/child.h"
+
+#include <fcntl.h>
+#include <spawn.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <csignal>
+#include <deque>
+#include <iterator>
+#include <map>
+#include <mutex>
+
+namespace cvagent::shell {
+
+namespace {
+
+constexpr int kSignalStatus = 128;
+
+struct Running {
+    std::string command;
+    bool forced = false;
+};
+
+/// The processes that have been started and not yet waited for.
+class Register {
+public:
+    void add(pid_t process, const std::string& command) {
+        const std::lock_guard lock(guard_);
+        const auto noted = std::ranges::find(early_, process);
+        running_[process] = {command, noted != early_.end()};
+        if (noted != early_.end()) {
+            early_.erase(noted);
+        }
+    }
+    /// @return whether it was killed through noteKill
+    bool remove(pid_t process) {
+        const std::lock_guard lock(guard_);
+        const auto found = running_.find(process);
+        const bool forced = found != running_.end() && found->second.forced;
+        running_.erase(process);
+        return forced;
+    }
+    std::string commandOf(pid_t process) {
+        const std::lock_guard lock(guard_);
+        const auto found = running_.find(process);
+        return found != running_.end() ? found->second.command : "";
+    }
+    void noteKill(pid_t process) {
+        const std::lock_guard lock(guard_);
+        const auto found = running_.find(process);
+        if (found != running_.end()) {
+            found->second.forced = true;
+            return;
+        }
+        // Started, but not yet listed here; or the child of one that is.
+        constexpr std::size_t kMost = 64;
+        early_.push_back(process);
+        if (early_.size() > kMost) {
+            early_.pop_front();
+        }
+    }
+
+private:
+    std::mutex guard_;
+    std::map<pid_t, Running> running_;
+    std::deque<pid_t> early_;
+};
+
+Register& processes() {
+    static Register only;
+    return only;
+}
+
+/// What the new process does to its descriptors before it begins.
+class Actions {
+public:
+    Actions() { posix_spawn_file_actions_init(&actions_); }
+    Actions(const Actions&) = delete;
+    Actions& operator=(const Actions&) = delete;
+    ~Actions() { posix_spawn_file_actions_destroy(&actions_); }
+
+    int setUp(int output, bool silent) {
+        const int error = posix_spawn_file_actions_adddup2(&actions_, output, STDOUT_FILENO);
+        return error != 0 || !silent
+                   ? error
+                   : posix_spawn_file_actions_addopen(&actions_, STDERR_FILENO, "/dev/null", O_WRONLY, 0);
+    }
+    const posix_spawn_file_actions_t* get() const { return &actions_; }
+
+private:
+    posix_spawn_file_actions_t actions_{};
+};
+
+/// Out of the way of the three standard descriptors, of which one may be free.
+int moveUp(Descriptor& end) {
+    if (end.get() > STDERR_FILENO) {
+        return 0;
+    }
+    Descriptor higher(fcntl(end.get(), F_DUPFD_CLOEXEC, STDERR_FILENO + 1));
+    if (!higher.isOpen()) {
+        return errno;
+    }
+    end = std::move(higher);
+    return 0;
+}
+
+int makePipe(Descriptor& reading, Descriptor& writing) {
+    std::array<int, 2> ends{};
+    if (pipe2(ends.data(), O_CLOEXEC) != 0) {
+        return errno;
+    }
+    reading = Descriptor(ends[0]);
+    writing = Descriptor(ends[1]);
+    const int error = moveUp(reading);
+    return error != 0 ? error : moveUp(writing);
+}
+
+}  // namespace
+
+int Child::start(const Start& start, int output) {
+    Actions actions;
+    if (const int error = actions.setUp(output, start.silent); error != 0) {
+        return error;
+    }
+    std::vector<std::string> texts = start.words;
+    std::vector<char*> words;
+    std::ranges::transform(texts, std::back_inserter(words), [](std::string& text) { return text.data(); });
+    words.push_back(nullptr);
+    // Not on a thread of ours: the kernel lists a thread's children, and whoever ends commands looks there.
+    pid_t process = -1;
+    const int error =
+        posix_spawn(&process, start.path.c_str(), actions.get(), nullptr, words.data(), environ);
+    if (error == 0) {
+        process_ = process;
+        processes().add(process_, start.command);
+    }
+    return error;
+}
+
+Child::End Child::wait() {
+    if (process_ < 0) {
+        return end_;
+    }
+    // Struck off the list while it keeps its number: the next process that gets it is another one.
+    siginfo_t ended{};
+    while (waitid(P_PID, static_cast<id_t>(process_), &ended, WEXITED | WNOWAIT) != 0 && errno == EINTR) {
+    }
+    const bool forced = processes().remove(process_);
+    int status = 0;
+    const pid_t waited = waitpid(process_, &status, 0);
+    process_ = -1;
+    if (waited < 0) {
+        return end_;  // somebody else has waited for it
+    }
+    const bool signalled = WIFSIGNALED(status);
+    end_.status = signalled ? kSignalStatus + WTERMSIG(status) : WEXITSTATUS(status);
+    end_.forced = forced && signalled && WTERMSIG(status) == SIGKILL;
+    return end_;
+}
+
+std::string commandOf(pid_t process) {
+    return processes().commandOf(process);
+}
+
+void noteKill(pid_t process) {
+    processes().noteKill(process);
+}
+
+int ProcessSource::start(const Start& start) {
+    Descriptor writing;
+    const int error = makePipe(output_, writing);
+    return error != 0 ? error : child_.start(start, writing.get());
+}
+
+int ProcessSource::startInto(const Start& start, int output) {
+    return child_.start(start, output);
+}
+
+bool ProcessSource::pull(std::string& out) {
+    if (!output_.isOpen()) {
+        return false;
+    }
+    const std::size_t before = out.size();
+    out.resize(before + kChunk);
+    ssize_t got = 0;
+    do {
+        got = read(output_.get(), out.data() + before, kChunk);
+    } while (got < 0 && errno == EINTR);
+    out.resize(before + (got > 0 ? static_cast<std::size_t>(got) : 0));
+    return got > 0;
+}
+
+Child::End ProcessSource::finish() {
+    output_.reset();
+    end_ = child_.wait();
+    return end_;
+}
+
+}  // namespace cvagent::shell
