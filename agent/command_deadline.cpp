@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "agent/print.h"
+#include "agent/shell/child.h"
 #include "agent/threads.h"
 #include "agent/want.h"
 
@@ -44,6 +45,9 @@ std::string secondsText(Seconds time) {
 
 /// The command as its author wrote it: the text that the shell was given.
 std::string commandText(pid_t process) {
+    if (std::string command = shell::commandOf(process); !command.empty()) {
+        return command;
+    }
     std::ifstream in("/proc/" + std::to_string(process) + "/cmdline");
     std::string text;
     std::vector<std::string> words;

@@ -10,6 +10,7 @@
 #include "agent/environment.h"
 #include "agent/probe.h"
 #include "agent/program_path.h"
+#include "agent/shell/programs.h"
 
 namespace cvagent {
 
@@ -122,6 +123,7 @@ void putAdaptersFirst(const std::vector<ToolReport>& reports) {
     for (const ToolReport& report : reports) {
         if (report.useAdapter) {
             path += fs::path(report.adapter).parent_path().string() + ":";
+            shell::setHostTools(report.adapter);  // all of them are one program
         }
     }
     const char* hosts = std::getenv("PATH");

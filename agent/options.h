@@ -12,6 +12,9 @@ enum class Command { tree, get, set, watch, properties, doctor };
 /// classic format.
 enum class HostTools { automatic, native, classic };
 
+/// How the plug-in's commands are run: without a shell where that is safe, or all of them by /bin/sh.
+enum class Commands { direct, shell };
+
 constexpr int kErrorLevel = 6000;  ///< log lines from here up are errors
 
 /// What the command line asks for.
@@ -23,6 +26,7 @@ struct Options {
     std::optional<int> logLevel;
     double commandSeconds = 10;  ///< how long a command of the plug-in may take; 0 for ever
     HostTools hostTools = HostTools::automatic;
+    Commands commands = Commands::direct;
     bool json = false;
     bool yes = false;               ///< power actions need no question
     std::optional<double> seconds;  ///< how long to watch; none: until a signal comes

@@ -7,6 +7,8 @@
 #include "agent/host_tools.h"
 #include "agent/private_tmp.h"
 #include "agent/program_path.h"
+#include "agent/shell/child.h"
+#include "agent/shell/runner.h"
 #include "agent/signals.h"
 #include "agent/want.h"
 
@@ -32,6 +34,8 @@ Session::Session(const Options& options, Listener* listener)
     hintAtReadOnly(data_);
     makeTmpPrivate(ownPlaces(options, file_, data_));
     StopSignals::install();
+    shell::leaveAllToShell(options.commands == Commands::shell);
+    QX::setKillWitness(shell::noteKill);
     if (options.hostTools != HostTools::native) {
         putAdaptersFirst(inspectHostTools(options.hostTools, Look::adapters, adapterDirectory()));
     }

@@ -13,6 +13,9 @@
 #include <iterator>
 #include <map>
 #include <mutex>
+#include <utility>
+
+#include "agent/shell/starts.h"
 
 namespace cvagent::shell {
 
@@ -20,40 +23,36 @@ namespace {
 
 constexpr int kSignalStatus = 128;
 
-struct Running {
-    std::string command;
-    bool forced = false;
-};
-
 /// The processes that have been started and not yet waited for.
 class Register {
 public:
-    void add(pid_t process, const std::string& command) {
+    void add(pid_t process, const std::shared_ptr<RunningProcess>& running) {
         const std::lock_guard lock(guard_);
         const auto noted = std::ranges::find(early_, process);
-        running_[process] = {command, noted != early_.end()};
         if (noted != early_.end()) {
+            running->forced = true;
             early_.erase(noted);
         }
+        running_[process] = running;
     }
-    /// @return whether it was killed through noteKill
-    bool remove(pid_t process) {
+    /// Its number may be another's by now.
+    void remove(pid_t process, const std::shared_ptr<RunningProcess>& running) {
         const std::lock_guard lock(guard_);
         const auto found = running_.find(process);
-        const bool forced = found != running_.end() && found->second.forced;
-        running_.erase(process);
-        return forced;
+        if (found != running_.end() && found->second == running) {
+            running_.erase(found);
+        }
     }
     std::string commandOf(pid_t process) {
         const std::lock_guard lock(guard_);
         const auto found = running_.find(process);
-        return found != running_.end() ? found->second.command : "";
+        return found != running_.end() ? found->second->command : "";
     }
     void noteKill(pid_t process) {
         const std::lock_guard lock(guard_);
         const auto found = running_.find(process);
         if (found != running_.end()) {
-            found->second.forced = true;
+            found->second->forced = true;
             return;
         }
         // Started, but not yet listed here; or the child of one that is.
@@ -66,7 +65,7 @@ public:
 
 private:
     std::mutex guard_;
-    std::map<pid_t, Running> running_;
+    std::map<pid_t, std::shared_ptr<RunningProcess>> running_;
     std::deque<pid_t> early_;
 };
 
@@ -121,7 +120,7 @@ int makePipe(Descriptor& reading, Descriptor& writing) {
 
 }  // namespace
 
-int Child::start(const Start& start, int output) {
+int Child::start(const ProcessStart& start, int output) {
     Actions actions;
     if (const int error = actions.setUp(output, start.silent); error != 0) {
         return error;
@@ -130,13 +129,16 @@ int Child::start(const Start& start, int output) {
     std::vector<char*> words;
     std::ranges::transform(texts, std::back_inserter(words), [](std::string& text) { return text.data(); });
     words.push_back(nullptr);
-    // Not on a thread of ours: the kernel lists a thread's children, and whoever ends commands looks there.
+    running_ = std::make_shared<RunningProcess>(start.command);
+    // By the calling thread itself: the kernel lists a thread's children, and whoever ends commands looks
+    // there.
+    const Start gate;
     pid_t process = -1;
     const int error =
         posix_spawn(&process, start.path.c_str(), actions.get(), nullptr, words.data(), environ);
     if (error == 0) {
         process_ = process;
-        processes().add(process_, start.command);
+        processes().add(process_, running_);
     }
     return error;
 }
@@ -145,20 +147,19 @@ Child::End Child::wait() {
     if (process_ < 0) {
         return end_;
     }
-    // Struck off the list while it keeps its number: the next process that gets it is another one.
-    siginfo_t ended{};
-    while (waitid(P_PID, static_cast<id_t>(process_), &ended, WEXITED | WNOWAIT) != 0 && errno == EINTR) {
-    }
-    const bool forced = processes().remove(process_);
     int status = 0;
-    const pid_t waited = waitpid(process_, &status, 0);
-    process_ = -1;
+    pid_t waited = 0;
+    do {
+        waited = waitpid(process_, &status, 0);
+    } while (waited < 0 && errno == EINTR);
+    processes().remove(std::exchange(process_, -1), running_);
+    holdWhenStopped();
     if (waited < 0) {
         return end_;  // somebody else has waited for it
     }
     const bool signalled = WIFSIGNALED(status);
     end_.status = signalled ? kSignalStatus + WTERMSIG(status) : WEXITSTATUS(status);
-    end_.forced = forced && signalled && WTERMSIG(status) == SIGKILL;
+    end_.forced = running_->forced && signalled && WTERMSIG(status) == SIGKILL;
     return end_;
 }
 
@@ -170,13 +171,13 @@ void noteKill(pid_t process) {
     processes().noteKill(process);
 }
 
-int ProcessSource::start(const Start& start) {
+int ProcessSource::start(const ProcessStart& start) {
     Descriptor writing;
     const int error = makePipe(output_, writing);
     return error != 0 ? error : child_.start(start, writing.get());
 }
 
-int ProcessSource::startInto(const Start& start, int output) {
+int ProcessSource::startInto(const ProcessStart& start, int output) {
     return child_.start(start, output);
 }
 

@@ -2,7 +2,10 @@
 
 #include <sys/types.h>
 
+#include <atomic>
+#include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "agent/shell/descriptor.h"
@@ -10,11 +13,18 @@
 
 namespace cvagent::shell {
 
-struct Start {
+struct ProcessStart {
     std::string path;
     std::vector<std::string> words;  ///< the name it is called by first
     bool silent = false;             ///< standard error goes to /dev/null
     std::string command;             ///< the whole command line it belongs to
+};
+
+/// What is known of a process until it was waited for.
+struct RunningProcess {
+    explicit RunningProcess(std::string line) : command(std::move(line)) {}
+    const std::string command;  ///< the whole command line
+    std::atomic<bool> forced = false;
 };
 
 /// A process that the calling thread has started, so that it stands among that thread's children. It is
@@ -23,7 +33,7 @@ class Child {
 public:
     /// Starts it with its output going to `output`.
     /// @return 0, or an error number: then there is no process
-    int start(const Start& start, int output);
+    int start(const ProcessStart& start, int output);
     Child() = default;
     Child(const Child&) = delete;
     Child& operator=(const Child&) = delete;
@@ -38,6 +48,7 @@ public:
 
 private:
     pid_t process_ = -1;
+    std::shared_ptr<RunningProcess> running_;
     End end_;
 };
 
@@ -52,9 +63,9 @@ void noteKill(pid_t process);
 class ProcessSource : public Source {
 public:
     /// @return 0, or an error number: then there is no process
-    int start(const Start& start);
+    int start(const ProcessStart& start);
     /// The same with its output going to a file, or to a descriptor of the caller's.
-    int startInto(const Start& start, int output);
+    int startInto(const ProcessStart& start, int output);
 
     bool pull(std::string& out) override;
     int status() const override { return end_.status; }

@@ -13,6 +13,7 @@
 #include "agent/shell/filters/filters.h"
 #include "agent/shell/local_file.h"
 #include "agent/shell/programs.h"
+#include "agent/shell/starts.h"
 
 namespace cvagent::shell {
 
@@ -153,9 +154,10 @@ FirstStage standIn(const FirstStageRequest& request, const Program& program, boo
 FirstStage startProcess(const FirstStageRequest& request, const std::string& path,
                         std::vector<std::string> words) {
     auto process = std::make_unique<ProcessSource>();
-    const Start start{path, std::move(words), request.silent, request.command};
+    const ProcessStart start{path, std::move(words), request.silent, request.command};
     const int error = request.output >= 0 ? process->startInto(start, request.output) : process->start(start);
     if (error == EAGAIN || error == ENOMEM || error == EMFILE || error == ENFILE) {
+        countNotStarted(error);
         return {{Outcome::failed, error}};
     }
     if (error != 0) {

@@ -168,11 +168,24 @@ private:
             return false;
         }
         const std::string_view inside = text_.substr(at_ + 1, end - at_ - 1);
-        if (quote == '"' && inside.find_first_of("$`\\!") != std::string_view::npos) {
+        if (quote == '"' && !isPlain(inside)) {
             return false;
         }
         text += inside;
         at_ = end + 1;
+        return true;
+    }
+
+    /// In "quotes" a backslash is one, but before letters that would mean something else without it.
+    static bool isPlain(std::string_view inside) {
+        for (std::size_t at = 0; at < inside.size(); ++at) {
+            const bool means = inside[at] == '\\' &&
+                               (at + 1 == inside.size() ||
+                                std::string_view("\\\n").find(inside[at + 1]) != std::string_view::npos);
+            if (means || inside[at] == '$' || inside[at] == '`') {
+                return false;
+            }
+        }
         return true;
     }
 

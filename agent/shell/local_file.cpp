@@ -83,7 +83,7 @@ LocalFile openForReading(const std::string& path) {
         return {outcomeOf(errno)};
     }
     if (!isRegular(looked)) {
-        return {};
+        return {kindOf(looked) == static_cast<mode_t>(S_IFDIR) ? LocalFile::missing : LocalFile::unfit};
     }
     Descriptor file = place.open(O_RDONLY | O_NONBLOCK | O_NOCTTY);
     if (!file.isOpen()) {

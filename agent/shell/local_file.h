@@ -11,7 +11,7 @@ namespace cvagent::shell {
 struct LocalFile {
     enum Outcome {
         opened,
-        missing,  ///< there is none, or it may not be read: a tool could not open it either
+        missing,  ///< there is none, it may not be read or is a directory: a tool has nothing of it either
         unfit     ///< anything else: for a tool, which can be killed
     };
     Outcome outcome = unfit;

@@ -3,6 +3,7 @@
 #include <sys/types.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <cerrno>
 #include <exception>
 #include <memory>
@@ -14,6 +15,8 @@
 namespace cvagent::shell {
 
 namespace {
+
+std::atomic<bool> allToShell = false;
 
 struct Streams {
     std::mutex guard;
@@ -54,7 +57,14 @@ FILE* makeStream(std::unique_ptr<Command> command) {
 
 }  // namespace
 
+void leaveAllToShell(bool all) {
+    allToShell = all;
+}
+
 std::optional<FILE*> openCommand(const char* command) {
+    if (allToShell) {
+        return std::nullopt;
+    }
     try {
         auto made = std::make_unique<Command>(command, -1);
         const Outcome outcome = made->begin();
@@ -84,6 +94,9 @@ std::optional<int> closeCommand(FILE* stream) {
 }
 
 std::optional<int> runCommand(const char* command) {
+    if (allToShell) {
+        return std::nullopt;
+    }
     try {
         Command run(command, STDOUT_FILENO);
         const Outcome outcome = run.begin();

@@ -5,6 +5,10 @@
 
 namespace cvagent::shell {
 
+/// From here on every command is left to a shell, or none that need not be. To be set once, before there are
+/// any.
+void leaveAllToShell(bool all);
+
 /// Runs a command as popen(command, "r") does.
 /// @return nothing when it is for a shell to run; null with errno when the system has no room for it
 std::optional<FILE*> openCommand(const char* command);

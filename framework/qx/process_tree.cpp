@@ -108,6 +108,8 @@ void freeze(const Process& process) {
     }
 }
 
+void (*killWitness)(pid_t) = nullptr;
+
 /// Processes that are stopped first, all of them, and killed then. When the search ends half-way they go on
 /// instead: whoever kills a shell alone sets its tools free, and they keep the pipe open.
 class Condemned {
@@ -117,6 +119,9 @@ public:
     Condemned& operator=(const Condemned&) = delete;
     ~Condemned() {
         for (const Process& process : frozen_) {
+            if (complete_ && killWitness != nullptr) {
+                killWitness(process.id());
+            }
             process.send(complete_ ? SIGKILL : SIGCONT);
         }
     }
@@ -155,6 +160,10 @@ private:
 };
 
 }  // namespace
+
+void setKillWitness(void (*witness)(pid_t)) {
+    killWitness = witness;
+}
 
 void killChildrenOf(pid_t thread) {
     Condemned().addAll({listingOf(thread)});

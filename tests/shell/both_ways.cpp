@@ -140,6 +140,12 @@ std::vector<std::string> productCommands(const std::string& name) {
         bonding + "\"Slave Interface: \" | cut -d ':' -f2 2> /dev/null",
         bonding + "\"Bonding Mode: \" | cut -d ':' -f2 2> /dev/null",
         bonding + "-i \"Currently Active Slave: ETH0\" 2> /dev/null",
+        bonding +
+            "-P \"Slave Interface: eth0\\nMII Status\" 2> /dev/null | grep \"MII Status: \" 2> /dev/null | "
+            "cut -d' ' -f3 2> /dev/null",
+        bonding +
+            "-P \"Slave Interface: eth0\\nMII Status: up\\n\" 2> /dev/null | grep \"Link Failure Count: \" "
+            "2> /dev/null | cut -d ' ' -f4 2> /dev/null",
         "/usr/sbin/vpdupdate 2> /dev/null",
     };
     for (const char* key : {"MASTER", "SLAVE", "BOOTPROTO", "MTU="}) {

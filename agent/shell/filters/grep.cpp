@@ -56,6 +56,37 @@ private:
     bool found_ = false;
 };
 
+/// grep -P looks at one line at a time, so a pattern that wants a line break in the middle is never found.
+class NeverFound : public Filter {
+public:
+    bool pull(std::string& /*out*/) override {
+        for (std::string chunk; from().pull(chunk); chunk.clear()) {
+        }
+        return false;
+    }
+    int status() const override { return 1; }
+};
+
+/// `-P` with letters, digits and harmless marks and a `\n` among them. The complaint of a grep that was built
+/// without -P must be wanted by nobody.
+bool isNeverFound(Words words, bool silent) {
+    if (!silent || words.size() != 2 || words.front() != "-P") {
+        return false;
+    }
+    const std::string& pattern = words[1];
+    const std::size_t escape = pattern.find("\\n");
+    const auto plain = [](std::string_view text) {
+        return std::ranges::all_of(text, [](char letter) {
+            return (letter >= 'a' && letter <= 'z') || (letter >= 'A' && letter <= 'Z') ||
+                   (letter >= '0' && letter <= '9') ||
+                   std::string_view(" :_-.@/").find(letter) != std::string_view::npos;
+        });
+    };
+    return escape != std::string::npos && plain(pattern.substr(0, escape)) &&
+           (plain(pattern.substr(escape + 2)) ||
+            (pattern.ends_with("\\n") && plain(pattern.substr(escape + 2, pattern.size() - escape - 4))));
+}
+
 struct Request {
     bool invert = false;
     bool ignoreCase = false;
@@ -90,6 +121,9 @@ std::unique_ptr<Filter> makeGrepOf(const std::string& name, Words words, Dialect
 }
 
 std::unique_ptr<Filter> makeGrep(Words words, bool silent) {
+    if (isNeverFound(words, silent)) {
+        return std::make_unique<NeverFound>();
+    }
     return makeGrepOf("(standard input)", words, Dialect::basic, silent);
 }
 
