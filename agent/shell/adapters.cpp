@@ -17,7 +17,7 @@ namespace cvagent::shell {
 
 namespace {
 
-using Words = std::span<const std::string>;
+using Arguments = std::span<const std::string>;
 
 /// What a tool has printed.
 struct Printed {
@@ -73,7 +73,7 @@ private:
 };
 
 /// @return nothing when the tool would need what is not given to it here
-std::shared_ptr<const Printed> run(const std::string& name, Words words, KnownHost& host) {
+std::shared_ptr<const Printed> run(const std::string& name, Arguments words, KnownHost& host) {
     const hosttools::Applet* const tool = hosttools::findApplet(name);
     if (tool == nullptr) {
         return nullptr;
@@ -91,7 +91,7 @@ std::shared_ptr<const Printed> run(const std::string& name, Words words, KnownHo
 /// Listings of interfaces and routes, each made once until the kernel announces a change.
 class NetworkAnswers {
 public:
-    std::shared_ptr<const Printed> ask(const std::string& name, Words words) {
+    std::shared_ptr<const Printed> ask(const std::string& name, Arguments words) {
         const std::lock_guard lock(guard_);
         if (!news_.isQuiet() || !tablesAreTheKernels()) {
             host_.forget();
@@ -122,7 +122,7 @@ private:
     std::map<std::vector<std::string>, std::shared_ptr<const Printed>> answers_;
 };
 
-bool isNetworkListing(const std::string& name, Words words) {
+bool isNetworkListing(const std::string& name, Arguments words) {
     if (name == "ifconfig") {
         return words.empty() ||
                (words.size() == 1 && (words.front() == "-a" || !words.front().starts_with('-')));
@@ -131,7 +131,7 @@ bool isNetworkListing(const std::string& name, Words words) {
     return name == "route" && (ipv6 || (words.size() == 1 && words.front() == "-n"));
 }
 
-bool isDiskListing(const std::string& name, Words words) {
+bool isDiskListing(const std::string& name, Arguments words) {
     return name == "fdisk" && words.size() == 1 && words.front().starts_with("-l");
 }
 

@@ -51,12 +51,12 @@ std::unique_ptr<Filter> makeFilter(const Stage& stage) {
 
 /// The words that a shell makes of a word with something inserted: divided at blanks.
 std::vector<std::string> splitWord(const std::string& text) {
-    constexpr std::string_view kBlanks = " \t\n";
+    constexpr std::string_view kSeparators = " \t\n";
     std::vector<std::string> words;
-    for (std::size_t at = text.find_first_not_of(kBlanks); at != std::string::npos;) {
-        const std::size_t end = std::min(text.find_first_of(kBlanks, at), text.size());
+    for (std::size_t at = text.find_first_not_of(kSeparators); at != std::string::npos;) {
+        const std::size_t end = std::min(text.find_first_of(kSeparators, at), text.size());
         words.push_back(text.substr(at, end - at));
-        at = text.find_first_not_of(kBlanks, end);
+        at = text.find_first_not_of(kSeparators, end);
     }
     return words;
 }
