@@ -6,6 +6,8 @@
 #include <cstdlib>
 #include <cstring>
 #include <exception>
+#include <initializer_list>
+#include <string_view>
 #include <utility>
 
 namespace cvagent::shell {
@@ -15,15 +17,25 @@ namespace {
 constexpr int kShellFailure = 2;
 constexpr unsigned kStatusShift = 8;
 
-bool isPlainLocale(const char* variable) {
-    const char* const value = std::getenv(variable);
-    return value != nullptr && (std::strcmp(value, "C") == 0 || std::strcmp(value, "POSIX") == 0);
+/// The value of the first of these variables that has one.
+std::string_view firstSet(std::initializer_list<const char*> variables) {
+    for (const char* const variable : variables) {
+        if (const char* const value = std::getenv(variable); value != nullptr && *value != '\0') {
+            return value;
+        }
+    }
+    return "C";
 }
 
 /// The filters stand for the tools as they are in the C locale, without what else changes them.
 bool toolsAreAsUsual() {
-    return isPlainLocale("LC_ALL") && std::getenv("POSIXLY_CORRECT") == nullptr &&
-           std::getenv("GREP_OPTIONS") == nullptr;
+    for (const char* const category : {"LC_CTYPE", "LC_COLLATE", "LC_MESSAGES"}) {
+        const std::string_view locale = firstSet({"LC_ALL", category, "LANG"});
+        if (locale != "C" && locale != "POSIX") {
+            return false;
+        }
+    }
+    return std::getenv("POSIXLY_CORRECT") == nullptr && std::getenv("GREP_OPTIONS") == nullptr;
 }
 
 }  // namespace

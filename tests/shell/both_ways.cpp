@@ -55,6 +55,7 @@ void PrintTo(const Ran& ran, std::ostream* stream) {
 }
 
 Ran inShell(const std::string& command, Complaints complaints) {
+    cvagent::shell::leaveAllToShell(true);
     Ran ran;
     {
         const ErrorOutput redirected(complaints);
@@ -62,6 +63,7 @@ Ran inShell(const std::string& command, Complaints complaints) {
         ran.out = readAll(pipe);
         ran.status = pclose(pipe);
     }
+    cvagent::shell::leaveAllToShell(false);
     ran.err = complaints == Complaints::seen ? ErrorOutput::text() : "";
     ran.inShell = true;
     return ran;

@@ -91,12 +91,14 @@ HOST_TEST(Traps, AMissingToolIsMissing) {
 }
 
 HOST_TEST(Traps, WhatChangesTheToolsIsLeftToThem) {
-    for (const char* locale : {"de_DE.UTF-8", ""}) {
-        setenv("LC_ALL", locale, 1);
-        EXPECT_TRUE(direct("echo b | grep b", Complaints::seen).inShell) << locale;
+    for (const char* variable : {"LC_ALL", "LC_CTYPE", "LC_COLLATE", "LC_MESSAGES", "LANG"}) {
+        unsetenv("LC_ALL");
+        EXPECT_FALSE(direct("echo b | grep b", Complaints::seen).inShell) << variable;
+        setenv(variable, "de_DE.UTF-8", 1);
+        EXPECT_TRUE(direct("echo b | grep b", Complaints::seen).inShell) << variable;
+        unsetenv(variable);
     }
-    unsetenv("LC_ALL");
-    EXPECT_TRUE(direct("echo b | grep b", Complaints::seen).inShell);
+    setenv("LANG", "de_DE.UTF-8", 1);
     inC();
     EXPECT_FALSE(direct("echo b | grep b", Complaints::seen).inShell);
     setenv("POSIXLY_CORRECT", "1", 1);
