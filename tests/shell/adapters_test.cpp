@@ -55,7 +55,11 @@ std::size_t processesStarted() {
 
 void useAdapters() {
     setenv("LC_ALL", "C", 1);
-    setenv("PATH", (std::string(HOSTTOOLS_LINKS) + ":" + std::getenv("PATH")).c_str(), 1);
+    std::string path;
+    for (const std::string tool : {"fdisk", "ifconfig", "route"}) {
+        path += std::string(HOSTTOOLS_LINKS) + "/" + tool + ":";
+    }
+    setenv("PATH", (path + std::getenv("PATH")).c_str(), 1);
     cvagent::shell::setHostTools(HOSTTOOLS_PROGRAM);
 }
 
