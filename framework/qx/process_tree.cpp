@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <atomic>
 #include <csignal>
 #include <fstream>
 #include <memory>
@@ -108,7 +109,7 @@ void freeze(const Process& process) {
     }
 }
 
-void (*killWitness)(pid_t) = nullptr;
+std::atomic<void (*)(pid_t)> killWitness = nullptr;
 
 /// Processes that are stopped first, all of them, and killed then. When the search ends half-way they go on
 /// instead: whoever kills a shell alone sets its tools free, and they keep the pipe open.
@@ -119,8 +120,8 @@ public:
     Condemned& operator=(const Condemned&) = delete;
     ~Condemned() {
         for (const Process& process : frozen_) {
-            if (complete_ && killWitness != nullptr) {
-                killWitness(process.id());
+            if (auto* const witness = killWitness.load(); complete_ && witness != nullptr) {
+                witness(process.id());
             }
             process.send(complete_ ? SIGKILL : SIGCONT);
         }
