@@ -119,7 +119,7 @@ void describeFromTable(const std::string& root, Disk& disk) {
 
 }  // namespace
 
-std::vector<Disk> listDisks(const std::string& root) {
+std::optional<std::vector<Disk>> listDisks(const std::string& root, Opening opening) {
     std::vector<Disk> disks;
     for (const std::string& name : listDirectory(root + "/sys/block")) {
         if (kindOf(name).empty()) continue;
@@ -127,12 +127,18 @@ std::vector<Disk> listDisks(const std::string& root) {
         Disk disk = readDisk(directory, name);
         // One path of a disk with several is hidden behind the disk itself.
         if (disk.sectors == 0 || readNumber(directory + "/hidden") != 0) continue;
-        if (!describeFromUdev(root, disk) && mayHaveTable(disk) && !isAsleep(directory))
+        if (!describeFromUdev(root, disk) && mayHaveTable(disk) && !isAsleep(directory)) {
+            if (opening == Opening::none) return std::nullopt;
             describeFromTable(root, disk);
+        }
         disks.push_back(std::move(disk));
     }
     std::ranges::sort(disks, comesBefore);
     return disks;
+}
+
+std::vector<Disk> listDisks(const std::string& root) {
+    return *listDisks(root, Opening::whereNeeded);
 }
 
 }  // namespace hosttools

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstdint>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -39,5 +40,10 @@ struct Disk {
 /// devices are left out.
 /// @param root in front of /sys, /run and /dev; empty on a live host
 std::vector<Disk> listDisks(const std::string& root);
+
+enum class Opening { whereNeeded, none };
+/// The same. @return nothing when a disk would have to be opened and none is to be: a disk can keep its
+/// reader waiting
+std::optional<std::vector<Disk>> listDisks(const std::string& root, Opening opening);
 
 }  // namespace hosttools

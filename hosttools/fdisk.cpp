@@ -1,4 +1,3 @@
-#include <unistd.h>
 #include <algorithm>
 #include <cstdlib>
 #include <memory>
@@ -43,7 +42,7 @@ std::string resolved(const std::string& path) {
 }
 
 /// Puts the disks that were asked for in the place of all, in the order they were asked for.
-bool select(const std::vector<std::string>& devices, std::vector<Disk>& disks) {
+bool select(const std::vector<std::string>& devices, std::vector<Disk>& disks, Answer& answer) {
     std::vector<Disk> chosen;
     bool found = true;
     for (const std::string& device : devices) {
@@ -52,7 +51,7 @@ bool select(const std::vector<std::string>& devices, std::vector<Disk>& disks) {
         if (match != disks.end()) {
             chosen.push_back(*match);
         } else {
-            complain(toolName, Text().add(device).add(" is not a disk of this host"));
+            answer.complain(toolName, Text().add(device).add(" is not a disk of this host"));
             found = false;
         }
     }
@@ -60,29 +59,28 @@ bool select(const std::vector<std::string>& devices, std::vector<Disk>& disks) {
     return found;
 }
 
-/// The messages go to standard error, each after its disk: a consumer takes every line of the listing that
+/// The messages go to standard error: a consumer takes every line of the listing that
 /// begins with "Disk" and a disk of this host's for a disk of its own.
-bool print(const std::vector<Disk>& disks) {
+void print(const std::vector<Disk>& disks, Answer& answer) {
     for (const Disk& disk : disks) {
-        Text text;
-        listDisk(text, disk);
-        if (!writeAll(STDOUT_FILENO, text)) return false;
-        if (isBare(disk)) writeAll(STDERR_FILENO, missingTableMessage(disk));
+        listDisk(answer.out, disk);
+        if (isBare(disk)) answer.errors.add(missingTableMessage(disk));
     }
-    return true;
 }
 
 }  // namespace
 
-int runFdisk(Arguments arguments) {
+int runFdisk(Arguments arguments, Host& host, Answer& answer) {
     Request request;
     if (!readRequest(arguments, request)) {
-        complain(toolName, "only lists disks here: fdisk -l[su] [DISK]...");
+        answer.complain(toolName, "only lists disks here: fdisk -l[su] [DISK]...");
         return 1;
     }
-    std::vector<Disk> disks = listDisks("");
-    const bool found = request.devices.empty() || select(request.devices, disks);
-    return print(disks) && found ? 0 : 1;
+    auto disks = host.disks();
+    if (!disks) return 1;
+    const bool found = request.devices.empty() || select(request.devices, *disks, answer);
+    print(*disks, answer);
+    return found ? 0 : 1;
 }
 
 }  // namespace hosttools

@@ -1,6 +1,8 @@
 #include <net/if.h>
 #include <cerrno>
 #include <cstring>
+#include <memory>
+#include <optional>
 #include <string>
 
 #include "hosttools/applet.h"
@@ -12,40 +14,40 @@ namespace {
 
 constexpr const char* toolName = "ifconfig";
 
-int listAll(bool downToo) {
-    Interfaces interfaces;
-    if (const int error = readInterfaces({}, interfaces); error != 0) {
-        complain(toolName, Text().add("netlink: ").add(std::strerror(error)));
+int listAll(bool downToo, Host& host, Answer& answer) {
+    std::shared_ptr<const Interfaces> interfaces;
+    if (const int error = host.interfaces({}, interfaces); error != 0) {
+        answer.complain(toolName, Text().add("netlink: ").add(std::strerror(error)));
         return 1;
     }
-    Text text;
-    for (const Stanza& stanza : listStanzas(interfaces)) {
-        if (downToo || (stanza.link->flags & IFF_UP)) listInterface(text, stanza);
+    for (const Stanza& stanza : listStanzas(*interfaces)) {
+        if (downToo || (stanza.link->flags & IFF_UP)) listInterface(answer.out, stanza);
     }
-    return finish(text);
+    return 0;
 }
 
-int listOne(std::string_view name) {
-    Interfaces interfaces;
-    const int error = readInterfaces(name.substr(0, name.find(':')), interfaces);
-    if (error != 0 || interfaces.links.empty()) {
+int listOne(std::string_view name, Host& host, Answer& answer) {
+    std::shared_ptr<const Interfaces> interfaces;
+    const int error = host.interfaces(name.substr(0, name.find(':')), interfaces);
+    const auto stanza = error == 0 ? makeStanza(*interfaces, name) : std::nullopt;
+    if (!stanza) {
         const char* reason = error == ENODEV || error == 0 ? "Device not found" : std::strerror(error);
-        complain(toolName, Text().add(name).add(": error fetching interface information: ").add(reason));
+        answer.complain(toolName,
+                        Text().add(name).add(": error fetching interface information: ").add(reason));
         return 1;
     }
-    Text text;
-    listInterface(text, makeStanza(interfaces, name));
-    return finish(text);
+    listInterface(answer.out, *stanza);
+    return 0;
 }
 
 }  // namespace
 
-int runIfconfig(Arguments arguments) {
+int runIfconfig(Arguments arguments, Host& host, Answer& answer) {
     const bool all = !arguments.empty() && std::string_view(arguments.front()) == "-a";
     const Arguments words = all ? arguments.subspan(1) : arguments;
-    if (words.empty()) return listAll(all);
-    if (words.size() == 1) return listOne(words.front());
-    return changeInterface(words.front(), words.subspan(1));
+    if (words.empty()) return listAll(all, host, answer);
+    if (words.size() == 1) return listOne(words.front(), host, answer);
+    return changeInterface(words.front(), words.subspan(1), answer);
 }
 
 }  // namespace hosttools

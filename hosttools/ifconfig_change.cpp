@@ -19,8 +19,8 @@ constexpr const char* toolName = "ifconfig";
 /// The classic calls on one interface.
 class Change {
 public:
-    explicit Change(const char* interface)
-        : socket_(socket(AF_INET, SOCK_DGRAM | SOCK_CLOEXEC, 0)), interface_(interface) {}
+    Change(const char* interface, Answer& answer)
+        : socket_(socket(AF_INET, SOCK_DGRAM | SOCK_CLOEXEC, 0)), interface_(interface), answer_(answer) {}
 
     bool flags(unsigned set, unsigned clear) {
         ifreq request = emptyRequest();
@@ -37,6 +37,7 @@ public:
         std::memcpy(&request.ifr_addr, &address, sizeof address);
         return call(number, name, request);
     }
+    void complain(std::string_view message) { answer_.complain(toolName, message); }
 
 private:
     ifreq emptyRequest() const {
@@ -46,12 +47,13 @@ private:
     }
     bool call(unsigned long number, const char* name, ifreq& request) {
         if (ioctl(socket_.get(), number, &request) == 0) return true;
-        complain(toolName, Text().add(name).add(": ").add(std::strerror(errno)));
+        complain(Text().add(name).add(": ").add(std::strerror(errno)));
         return false;
     }
 
     Descriptor socket_;
     std::string_view interface_;
+    Answer& answer_;
 };
 
 struct FlagWord {
@@ -78,15 +80,15 @@ constexpr AddressWord addressWords[] = {
     {"dstaddr", SIOCSIFDSTADDR, "SIOCSIFDSTADDR"},
 };
 
-bool readAddress(const char* word, in_addr& address) {
+bool readAddress(Change& change, const char* word, in_addr& address) {
     if (parseInet(word, address)) return true;
-    complain(toolName, Text().add("bad address '").add(word).add("'"));
+    change.complain(Text().add("bad address '").add(word).add("'"));
     return false;
 }
 
 bool setAddress(Change& change, unsigned long number, const char* name, const char* word) {
     in_addr address{};
-    return readAddress(word, address) && change.address(number, name, address);
+    return readAddress(change, word, address) && change.address(number, name, address);
 }
 
 /// Carries out the first word, with its argument when it has one.
@@ -102,7 +104,7 @@ bool changeNext(Change& change, Arguments& words) {
         return setAddress(change, SIOCSIFADDR, "SIOCSIFADDR", word) && change.flags(IFF_UP | IFF_RUNNING, 0);
     }
     if (words.empty()) {
-        complain(toolName, Text().add(word).add(" needs an address"));
+        change.complain(Text().add(word).add(" needs an address"));
         return false;
     }
     const char* value = words.front();
@@ -112,8 +114,8 @@ bool changeNext(Change& change, Arguments& words) {
 
 }  // namespace
 
-int changeInterface(const char* interface, Arguments words) {
-    Change change(interface);
+int changeInterface(const char* interface, Arguments words, Answer& answer) {
+    Change change(interface, answer);
     while (!words.empty()) {
         if (!changeNext(change, words)) return 1;
     }

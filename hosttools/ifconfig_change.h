@@ -9,6 +9,6 @@ namespace hosttools {
 /// ADDRESS`, `pointopoint ADDRESS`. The first that fails ends it, with the classic message on standard error.
 /// Addresses are numeric ("default" is 0.0.0.0): no name is looked up.
 /// @return the exit status
-int changeInterface(const char* interface, Arguments words);
+int changeInterface(const char* interface, Arguments words, Answer& answer);
 
 }  // namespace hosttools

@@ -215,8 +215,12 @@ std::vector<Stanza> listStanzas(const Interfaces& interfaces) {
     return StanzaList(interfaces).take();
 }
 
-Stanza makeStanza(const Interfaces& interfaces, std::string_view name) {
-    Stanza stanza{std::string(name), &interfaces.links.front(), nullptr, {}, isAlias(name)};
+std::optional<Stanza> makeStanza(const Interfaces& interfaces, std::string_view name) {
+    auto link = std::ranges::find(interfaces.links, name.substr(0, name.find(':')), &Link::name);
+    // The only one that was read can have been asked for by another of its names.
+    if (interfaces.links.size() == 1) link = interfaces.links.begin();
+    if (link == interfaces.links.end()) return std::nullopt;
+    Stanza stanza{std::string(name), &*link, nullptr, {}, isAlias(name)};
     const auto inet = std::ranges::find_if(interfaces.inet, [&](const InetAddress& address) {
         return address.link == stanza.link->index && address.label == name;
     });

@@ -3,6 +3,7 @@
 #include <netinet/in.h>
 #include <array>
 #include <cstdint>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -90,8 +91,8 @@ struct Stanza {
 
 /// All links and their aliases by name. The stanzas point into interfaces.
 std::vector<Stanza> listStanzas(const Interfaces& interfaces);
-/// The one of a name ("eth0" or "eth0:1") whose link is the only one read. An alias need not exist: it then
-/// has no address.
-Stanza makeStanza(const Interfaces& interfaces, std::string_view name);
+/// The one of a name ("eth0" or "eth0:1"). An alias need not exist: it then has no address.
+/// @return nothing when there is no such link
+std::optional<Stanza> makeStanza(const Interfaces& interfaces, std::string_view name);
 
 }  // namespace hosttools

@@ -1,4 +1,4 @@
-#include <cstring>
+#include <unistd.h>
 
 #include "hosttools/applet.h"
 #include "hosttools/text.h"
@@ -8,58 +8,61 @@ namespace {
 
 constexpr const char* programName = "corvista-hosttools";
 
-constexpr Applet applets[] = {
-    {"fdisk", runFdisk, "fdisk -l[su] [DISK]..."},
-    {"ifconfig", runIfconfig,
-     "ifconfig [-a] [INTERFACE [up|down|ADDRESS|netmask MASK|broadcast ADDRESS|pointopoint ADDRESS]...]"},
-    {"route", runRoute,
-     "route [-A inet6] -n\n"
-     "  route add|del -host A|-net A netmask M|default [gw G] [metric N] [[dev] INTERFACE]"},
-};
-
-const Applet* findApplet(std::string_view name) {
-    for (const Applet& applet : applets) {
-        if (name == applet.name) return &applet;
-    }
-    return nullptr;
-}
-
 std::string_view baseName(std::string_view path) {
     return path.substr(path.rfind('/') + 1);
 }
 
+/// The whole output goes out at once.
+int print(const Answer& answer, int status) {
+    const bool whole = writeAll(STDOUT_FILENO, answer.out);
+    writeAll(STDERR_FILENO, answer.errors);
+    return whole ? status : 1;
+}
+
+int complain(std::string_view message) {
+    Answer answer;
+    answer.complain(programName, message);
+    return print(answer, 1);
+}
+
+int run(const Applet& applet, Arguments words) {
+    Host host;
+    Answer answer;
+    const int status = applet.run(words, host, answer);
+    return print(answer, status);
+}
+
 int printHelp() {
-    Text text;
+    Answer answer;
+    Text& text = answer.out;
     text.add(programName).add(" prints the classic formats of host tools whose own output has changed.\n\n");
     text.add("Usage: ").add(programName).add(" TOOL [ARGUMENT]...\n");
     text.add("   or: TOOL [ARGUMENT]...   (through a link with the tool's name)\n\nTools:\n");
-    for (const Applet& applet : applets) text.add("  ").add(applet.usage).add("\n");
+    for (const Applet& applet : applets()) text.add("  ").add(applet.usage).add("\n");
     text.add("\nOptions:\n  --help     print this text\n  --version  print the version\n");
-    return finish(text);
+    return print(answer, 0);
 }
 
 int printVersion() {
-    return finish(Text().add(programName).add(" " CORVISTA_VERSION "\n"));
+    Answer answer;
+    answer.out.add(programName).add(" " CORVISTA_VERSION "\n");
+    return print(answer, 0);
 }
 
 int runNamed(Arguments words) {
-    if (words.empty()) {
-        complain(programName, "which tool? Try --help");
-        return 1;
-    }
+    if (words.empty()) return complain("which tool? Try --help");
     const std::string_view name = words.front();
     if (name == "--help") return printHelp();
     if (name == "--version") return printVersion();
-    if (const Applet* applet = findApplet(name)) return applet->run(words.subspan(1));
-    complain(programName, Text().add("no such tool: ").add(name).add(". Try --help"));
-    return 1;
+    if (const Applet* applet = findApplet(name)) return run(*applet, words.subspan(1));
+    return complain(Text().add("no such tool: ").add(name).add(". Try --help"));
 }
 
 }  // namespace
 
 int runProgram(Arguments words) {
     if (words.empty()) return 1;
-    if (const Applet* applet = findApplet(baseName(words.front()))) return applet->run(words.subspan(1));
+    if (const Applet* applet = findApplet(baseName(words.front()))) return run(*applet, words.subspan(1));
     return runNamed(words.subspan(1));
 }
 

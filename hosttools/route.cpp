@@ -36,30 +36,31 @@ bool readOptions(Arguments& words, Request& request) {
     return true;
 }
 
-int list(const char* path, Text (*listing)(std::string_view)) {
+int list(const char* path, Text (*listing)(std::string_view), Answer& answer) {
     const auto content = readFile(path);
     if (!content) {
-        complain(toolName, Text().add("can't open '").add(path).add("': ").add(std::strerror(errno)));
+        answer.complain(toolName, Text().add("can't open '").add(path).add("': ").add(std::strerror(errno)));
         return 1;
     }
-    return finish(listing(*content));
+    answer.out = listing(*content);
+    return 0;
 }
 
 }  // namespace
 
-int runRoute(Arguments arguments) {
+int runRoute(Arguments arguments, Host&, Answer& answer) {
     Request request;
     Arguments words = arguments;
     const bool known = readOptions(words, request);
-    if (known && !words.empty() && !request.inet6) return changeRoute(words);
+    if (known && !words.empty() && !request.inet6) return changeRoute(words, answer);
     if (!known || !words.empty() || !request.numeric) {
-        complain(
+        answer.complain(
             toolName,
             "only numeric listings and changes of IPv4 routes here: route [-A inet6] -n, route add|del ...");
         return 1;
     }
-    return request.inet6 ? list("/proc/net/ipv6_route", listInet6Routes)
-                         : list("/proc/net/route", listRoutes);
+    return request.inet6 ? list("/proc/net/ipv6_route", listInet6Routes, answer)
+                         : list("/proc/net/route", listRoutes, answer);
 }
 
 }  // namespace hosttools

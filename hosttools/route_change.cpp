@@ -32,7 +32,7 @@ void setAddress(sockaddr& place, in_addr value) {
 /// Walks the words behind "add" or "del".
 class Reader {
 public:
-    explicit Reader(Arguments words) : words_(words) {}
+    Reader(Arguments words, Answer& answer) : words_(words), answer_(answer) {}
 
     bool read(Change& change) {
         if (!readTarget(change)) return false;
@@ -74,7 +74,7 @@ private:
         const char* word = take();
         in_addr address{};
         if (!parseInet(word, address)) {
-            complain(toolName, Text().add("resolving ").add(word));
+            answer_.complain(toolName, Text().add("resolving ").add(word));
             return false;
         }
         setAddress(place, address);
@@ -92,31 +92,32 @@ private:
         words_ = words_.subspan(1);
         return word;
     }
-    static bool refuse() {
-        complain(
+    bool refuse() {
+        answer_.complain(
             toolName,
             "cannot be read: add|del -host A|-net A netmask M|default [gw G] [metric N] [[dev] INTERFACE]");
         return false;
     }
 
     Arguments words_;
+    Answer& answer_;
 };
 
 }  // namespace
 
-int changeRoute(Arguments words) {
+int changeRoute(Arguments words, Answer& answer) {
     const std::string_view verb = words.front();
     Change change;
     if (verb != "add" && verb != "del") {
-        complain(toolName, Text().add("neither add nor del: ").add(verb));
+        answer.complain(toolName, Text().add("neither add nor del: ").add(verb));
         return 1;
     }
-    if (!Reader(words.subspan(1)).read(change)) return 1;
+    if (!Reader(words.subspan(1), answer).read(change)) return 1;
     if (!change.interface.empty()) change.entry.rt_dev = change.interface.data();
     const bool add = verb == "add";
     const Descriptor socket(::socket(AF_INET, SOCK_DGRAM | SOCK_CLOEXEC, 0));
     if (ioctl(socket.get(), add ? SIOCADDRT : SIOCDELRT, &change.entry) == 0) return 0;
-    complain(toolName, Text().add(add ? "SIOCADDRT: " : "SIOCDELRT: ").add(std::strerror(errno)));
+    answer.complain(toolName, Text().add(add ? "SIOCADDRT: " : "SIOCDELRT: ").add(std::strerror(errno)));
     return 1;
 }
 

@@ -78,12 +78,4 @@ bool writeAll(int descriptor, std::string_view text) {
     return true;
 }
 
-int finish(const Text& output) {
-    return writeAll(STDOUT_FILENO, output) ? 0 : 1;
-}
-
-void complain(std::string_view tool, std::string_view message) {
-    writeAll(STDERR_FILENO, Text().add(tool).add(": ").add(message).add("\n"));
-}
-
 }  // namespace hosttools

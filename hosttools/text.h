@@ -37,9 +37,5 @@ private:
 
 /// Writes the whole text to a descriptor. @return whether all of it went out
 bool writeAll(int descriptor, std::string_view text);
-/// Writes a tool's output. @return its exit status: 0, or 1 when the output could not be written
-int finish(const Text& output);
-/// "<tool>: <message>" on standard error.
-void complain(std::string_view tool, std::string_view message);
 
 }  // namespace hosttools

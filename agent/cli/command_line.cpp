@@ -61,6 +61,12 @@ void addGlobalOptions(CLI::App& app, Options& options) {
            "each the one that prints the classic format (auto, the default)")
         ->type_name("auto|native|classic")
         ->transform(CLI::CheckedTransformer(choices).description(""));
+    const std::map<std::string, Commands> ways{{"direct", Commands::direct}, {"shell", Commands::shell}};
+    app.add_option("--commands", options.commands,
+                   "How the plug-in's commands are run: without a shell where that makes no difference "
+                   "(direct, the default), or all by /bin/sh (shell)")
+        ->type_name("direct|shell")
+        ->transform(CLI::CheckedTransformer(ways).description(""));
     app.add_option("--command-timeout", options.commandSeconds,
                    "End a command of the plug-in that takes longer, in a write ten times as long; what it "
                    "would have told reads as an error. 0 waits for ever. Default: 10")

@@ -19,6 +19,7 @@ struct Options {
     std::optional<int> logLevel;
     double commandSeconds = 10;  ///< how long a command of the plug-in may take; 0 for ever
     HostTools hostTools = HostTools::automatic;
+    Commands commands = Commands::direct;
     bool json = false;
     bool yes = false;               ///< power actions need no question
     std::optional<double> seconds;  ///< how long to watch; none: until a signal comes

@@ -38,6 +38,7 @@ Session::Session(const Options& options) {
     hint(hintAtRoot(*data_), "\nTo see everything run: sudo cvagent");
     hint(hintAtReadOnly(*data_));
     makeTmpPrivate(ownPlaces(options, settings));
+    setUpCommands(options.commands);
     StopSignals::install();
     if (options.hostTools != HostTools::native) {
         putAdaptersFirst(inspectHostTools(options.hostTools, Look::adapters, adapterDirectory()));

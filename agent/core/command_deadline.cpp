@@ -9,8 +9,10 @@
 #include <sstream>
 #include <system_error>
 #include <vector>
+
 #include "agent/core/threads.h"
 #include "agent/core/want.h"
+#include "agent/shell/child.h"
 
 namespace cvagent {
 
@@ -42,6 +44,9 @@ std::string secondsText(Seconds time) {
 
 /// The command as its author wrote it: the text that the shell was given.
 std::string commandText(pid_t process) {
+    if (std::string command = shell::commandOf(process); !command.empty()) {
+        return command;
+    }
     std::ifstream in("/proc/" + std::to_string(process) + "/cmdline");
     std::string text;
     std::vector<std::string> words;

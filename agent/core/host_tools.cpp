@@ -10,6 +10,10 @@
 #include "agent/core/environment.h"
 #include "agent/core/probe.h"
 #include "agent/core/program_path.h"
+#include "agent/shell/child.h"
+#include "agent/shell/programs.h"
+#include "agent/shell/runner.h"
+#include "framework/qx/process_tree.h"
 
 namespace cvagent {
 
@@ -117,11 +121,17 @@ std::vector<ToolReport> inspectHostTools(HostTools choice, Look look,
     return reports;
 }
 
+void setUpCommands(Commands commands) {
+    shell::leaveAllToShell(commands == Commands::shell);
+    QX::setKillWitness(shell::noteKill);
+}
+
 void putAdaptersFirst(const std::vector<ToolReport>& reports) {
     std::string path;
     for (const ToolReport& report : reports) {
         if (report.useAdapter) {
             path += fs::path(report.adapter).parent_path().string() + ":";
+            shell::setHostTools(report.adapter);  // all of them are one program
         }
     }
     const char* hosts = std::getenv("PATH");

@@ -10,6 +10,13 @@ namespace cvagent {
 /// classic format.
 enum class HostTools { automatic, native, classic };
 
+/// How the plug-in's commands are run: without a shell where that is safe, or all of them by /bin/sh.
+enum class Commands { direct, shell };
+
+/// Has the commands of this process run so. Without the call they are run directly, but the end of one by its
+/// deadline looks like any other. To be called once, before there are threads.
+void setUpCommands(Commands commands);
+
 /// What is known of one tool that the plug-in's commands run.
 struct ToolReport {
     std::string tool;

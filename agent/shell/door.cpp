@@ -1,6 +1,6 @@
 // popen, pclose and system as a plug-in finds them that this program has loaded: the loader looks in the
-// program first. They do what the C library's do, and besides two things: they end with a stop, and they know
-// of commands that could not be started.
+// program first. They do what the C library's do, and besides: they do without a shell where that is safe,
+// they end with a stop, and they know of commands that could not be started.
 #include <dlfcn.h>
 #include <spawn.h>
 #include <sys/wait.h>
@@ -10,7 +10,9 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
+#include <cstring>
 
+#include "agent/shell/runner.h"
 #include "agent/shell/starts.h"
 
 #define CVAGENT_DOOR extern "C" __attribute__((visibility("default")))
@@ -39,6 +41,11 @@ int waitFor(pid_t process) {
 
 CVAGENT_DOOR FILE* popen(const char* command, const char* mode) {
     static const auto original = inLibrary<FILE* (*)(const char*, const char*)>("popen");
+    if (std::strcmp(mode, "r") == 0) {
+        if (const auto direct = cvagent::shell::openCommand(command)) {
+            return *direct;
+        }
+    }
     const Start start;
     FILE* const pipe = original(command, mode);
     if (pipe == nullptr) {
@@ -49,6 +56,9 @@ CVAGENT_DOOR FILE* popen(const char* command, const char* mode) {
 
 CVAGENT_DOOR int pclose(FILE* pipe) {
     static const auto original = inLibrary<int (*)(FILE*)>("pclose");
+    if (const auto status = cvagent::shell::closeCommand(pipe)) {
+        return *status;
+    }
     const int status = original(pipe);
     cvagent::shell::holdWhenStopped();
     return status;
@@ -58,6 +68,9 @@ CVAGENT_DOOR int pclose(FILE* pipe) {
 CVAGENT_DOOR int system(const char* command) {
     if (command == nullptr) {
         return 1;  // there is a shell
+    }
+    if (const auto status = cvagent::shell::runCommand(command)) {
+        return *status;
     }
     std::array<char*, 4> words{const_cast<char*>("sh"), const_cast<char*>("-c"), const_cast<char*>(command),
                                nullptr};

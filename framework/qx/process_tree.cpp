@@ -6,6 +6,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <atomic>
 #include <charconv>
 #include <csignal>
 #include <fstream>
@@ -202,6 +203,8 @@ void freeze(const Process& process) {
     }
 }
 
+std::atomic<void (*)(pid_t)> killWitness = nullptr;
+
 /// Processes that are stopped first, all of them, and killed then. When the search ends half-way they go on
 /// instead: whoever kills a shell alone sets its tools free, and they keep the pipe open.
 class Condemned {
@@ -211,6 +214,9 @@ public:
     Condemned& operator=(const Condemned&) = delete;
     ~Condemned() {
         for (const Process& process : frozen_) {
+            if (auto* const witness = killWitness.load(); complete_ && witness != nullptr) {
+                witness(process.id());
+            }
             process.send(complete_ ? SIGKILL : SIGCONT);
         }
     }
@@ -248,6 +254,10 @@ private:
 };
 
 }  // namespace
+
+void setKillWitness(void (*witness)(pid_t)) {
+    killWitness = witness;
+}
 
 void killChildrenOf(pid_t thread) {
     Condemned().addAll({commandsOf(thread)});

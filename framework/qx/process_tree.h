@@ -36,4 +36,9 @@ CORVISTA_API std::vector<ChildProcess> childrenOf(pid_t thread);
 /// @return false when it had ended before
 CORVISTA_API bool killChild(pid_t thread, const ChildProcess& child);
 
+/// Has a function called with each process right before one of the functions above kills it, on the thread
+/// that kills: who waits for it can tell such an end from any other. To be set once, before there are
+/// threads.
+CORVISTA_API void setKillWitness(void (*witness)(pid_t));
+
 }  // namespace QX

@@ -195,10 +195,10 @@ TEST(Stanzas, AddressesOfLinksAndAliases) {
 TEST(Stanzas, OneByName) {
     Interfaces interfaces = someInterfaces();
     interfaces.links = {link("eth1", 2)};
-    EXPECT_EQ(textOf(makeStanza(interfaces, "eth1").inet->local), "10.0.0.3");
-    EXPECT_THAT(makeStanza(interfaces, "eth1").inet6, SizeIs(2));
-    EXPECT_EQ(textOf(makeStanza(interfaces, "eth1:a").inet->local), "10.0.0.2");
-    const Stanza absent = makeStanza(interfaces, "eth1:77");
+    EXPECT_EQ(textOf(makeStanza(interfaces, "eth1")->inet->local), "10.0.0.3");
+    EXPECT_THAT(makeStanza(interfaces, "eth1")->inet6, SizeIs(2));
+    EXPECT_EQ(textOf(makeStanza(interfaces, "eth1:a")->inet->local), "10.0.0.2");
+    const Stanza absent = makeStanza(interfaces, "eth1:77").value();
     EXPECT_EQ(absent.name, "eth1:77");
     EXPECT_EQ(absent.inet, nullptr);
     EXPECT_TRUE(absent.alias);

@@ -7,6 +7,7 @@
 #include <functional>
 #include <thread>
 
+#include "agent/shell/runner.h"
 #include "mi/disk_snapshot.h"
 #include "mi/globals.h"
 #include "mi/node_types.h"
@@ -101,6 +102,7 @@ HOST_TEST_F(LayoutComparison, AnUnchangedLayoutTouchesNothing) {
 }
 
 HOST_TEST_F(LayoutComparison, ASnapshotThatIsNotWholeTouchesNothing) {
+    cvagent::shell::leaveAllToShell(true);  // one is killed here
     startWith(host, kLayout);
     LogCapture log;
     pass(host, "Disk /dev/sdb: 80");

@@ -2,6 +2,7 @@
 // cannot start: "commands", "threads". C library only.
 #include <dlfcn.h>
 #include <pthread.h>
+#include <spawn.h>
 
 #include <cerrno>
 #include <cstdio>
@@ -34,6 +35,15 @@ REPLACED FILE* popen(const char* command, const char* mode) {
         return nullptr;
     }
     return machine<FILE* (*)(const char*, const char*)>("popen")(command, mode);
+}
+
+REPLACED int posix_spawn(pid_t* process, const char* path, const posix_spawn_file_actions_t* actions,
+                         const posix_spawnattr_t* attributes, char* const words[], char* const variables[]) {
+    using Spawn = int (*)(pid_t*, const char*, const posix_spawn_file_actions_t*, const posix_spawnattr_t*,
+                          char* const[], char* const[]);
+    return cannotStart("commands")
+               ? EAGAIN
+               : machine<Spawn>("posix_spawn")(process, path, actions, attributes, words, variables);
 }
 
 REPLACED int pthread_create(pthread_t* thread, const pthread_attr_t* attributes, void* (*run)(void*),

@@ -7,6 +7,8 @@
 #include <set>
 #include <utility>
 
+#include "agent/shell/runner.h"
+
 namespace {
 
 struct Rules {
@@ -80,6 +82,9 @@ FILE* open(const char* command, const char* mode, FILE* (*shell)(const char*, co
 extern "C" __attribute__((visibility("default"))) int pclose(FILE* stream) {
     if (takeCanned(stream)) {
         return fclose(stream);
+    }
+    if (const auto status = cvagent::shell::closeCommand(stream)) {
+        return *status;
     }
     using Pclose = int (*)(FILE*);
     static const auto next = reinterpret_cast<Pclose>(dlsym(RTLD_NEXT, "pclose"));

@@ -1,0 +1,202 @@
+#include "agent/shell/child.h"
+
+#include <fcntl.h>
+#include <spawn.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <csignal>
+#include <iterator>
+#include <map>
+#include <mutex>
+#include <utility>
+
+#include "agent/shell/starts.h"
+
+namespace cvagent::shell {
+
+namespace {
+
+constexpr int kSignalStatus = 128;
+
+/// The processes that have been started and not yet waited for.
+class Register {
+public:
+    void add(pid_t process, const std::shared_ptr<RunningProcess>& running) {
+        const std::lock_guard lock(guard_);
+        const auto noted = std::ranges::find(early_, process);
+        if (noted != early_.end()) {
+            running->forced = true;
+            *noted = 0;
+        }
+        running_[process] = running;
+    }
+    /// Its number may be another's by now.
+    void remove(pid_t process, const std::shared_ptr<RunningProcess>& running) {
+        const std::lock_guard lock(guard_);
+        const auto found = running_.find(process);
+        if (found != running_.end() && found->second == running) {
+            running_.erase(found);
+        }
+    }
+    std::string commandOf(pid_t process) {
+        const std::lock_guard lock(guard_);
+        const auto found = running_.find(process);
+        return found != running_.end() ? found->second->command : "";
+    }
+    void noteKill(pid_t process) {
+        const std::lock_guard lock(guard_);
+        const auto found = running_.find(process);
+        if (found != running_.end()) {
+            found->second->forced = true;
+            return;
+        }
+        // Started, but not yet listed here; or the child of one that is.
+        // Without memory of its own, for whoever kills cannot fail half-way.
+        early_[next_] = process;
+        next_ = (next_ + 1) % early_.size();
+    }
+
+private:
+    std::mutex guard_;
+    std::map<pid_t, std::shared_ptr<RunningProcess>> running_;
+    std::array<pid_t, 64> early_{};  // the last ones; 0 for none
+    std::size_t next_ = 0;
+};
+
+Register& processes() {
+    static Register only;
+    return only;
+}
+
+/// What the new process does to its descriptors before it begins.
+class Actions {
+public:
+    Actions() { posix_spawn_file_actions_init(&actions_); }
+    Actions(const Actions&) = delete;
+    Actions& operator=(const Actions&) = delete;
+    ~Actions() { posix_spawn_file_actions_destroy(&actions_); }
+
+    int setUp(int output, bool silent) {
+        const int error = posix_spawn_file_actions_adddup2(&actions_, output, STDOUT_FILENO);
+        return error != 0 || !silent
+                   ? error
+                   : posix_spawn_file_actions_addopen(&actions_, STDERR_FILENO, "/dev/null", O_WRONLY, 0);
+    }
+    const posix_spawn_file_actions_t* get() const { return &actions_; }
+
+private:
+    posix_spawn_file_actions_t actions_{};
+};
+
+/// Out of the way of the three standard descriptors, of which one may be free.
+int moveUp(Descriptor& end) {
+    if (end.get() > STDERR_FILENO) {
+        return 0;
+    }
+    Descriptor higher(fcntl(end.get(), F_DUPFD_CLOEXEC, STDERR_FILENO + 1));
+    if (!higher.isOpen()) {
+        return errno;
+    }
+    end = std::move(higher);
+    return 0;
+}
+
+int makePipe(Descriptor& reading, Descriptor& writing) {
+    std::array<int, 2> ends{};
+    if (pipe2(ends.data(), O_CLOEXEC) != 0) {
+        return errno;
+    }
+    reading = Descriptor(ends[0]);
+    writing = Descriptor(ends[1]);
+    const int error = moveUp(reading);
+    return error != 0 ? error : moveUp(writing);
+}
+
+}  // namespace
+
+int Child::start(const ProcessStart& start, int output) {
+    Actions actions;
+    if (const int error = actions.setUp(output, start.silent); error != 0) {
+        return error;
+    }
+    std::vector<std::string> texts = start.words;
+    std::vector<char*> words;
+    std::ranges::transform(texts, std::back_inserter(words), [](std::string& text) { return text.data(); });
+    words.push_back(nullptr);
+    running_ = std::make_shared<RunningProcess>(start.command);
+    // By the calling thread itself: the kernel lists a thread's children, and whoever ends commands looks
+    // there.
+    const Start gate;
+    pid_t process = -1;
+    const int error =
+        posix_spawn(&process, start.path.c_str(), actions.get(), nullptr, words.data(), environ);
+    if (error == 0) {
+        process_ = process;
+        processes().add(process_, running_);
+    }
+    return error;
+}
+
+Child::End Child::wait() {
+    if (process_ < 0) {
+        return end_;
+    }
+    int status = 0;
+    pid_t waited = 0;
+    do {
+        waited = waitpid(process_, &status, 0);
+    } while (waited < 0 && errno == EINTR);
+    processes().remove(std::exchange(process_, -1), running_);
+    holdWhenStopped();
+    if (waited < 0) {
+        return end_;  // somebody else has waited for it
+    }
+    const bool signalled = WIFSIGNALED(status);
+    end_.status = signalled ? kSignalStatus + WTERMSIG(status) : WEXITSTATUS(status);
+    end_.forced = running_->forced && signalled && WTERMSIG(status) == SIGKILL;
+    return end_;
+}
+
+std::string commandOf(pid_t process) {
+    return processes().commandOf(process);
+}
+
+void noteKill(pid_t process) {
+    processes().noteKill(process);
+}
+
+int ProcessSource::start(const ProcessStart& start) {
+    Descriptor writing;
+    const int error = makePipe(output_, writing);
+    return error != 0 ? error : child_.start(start, writing.get());
+}
+
+int ProcessSource::startInto(const ProcessStart& start, int output) {
+    return child_.start(start, output);
+}
+
+bool ProcessSource::pull(std::string& out) {
+    if (!output_.isOpen()) {
+        return false;
+    }
+    const std::size_t before = out.size();
+    out.resize(before + kChunk);
+    ssize_t got = 0;
+    do {
+        got = read(output_.get(), out.data() + before, kChunk);
+    } while (got < 0 && errno == EINTR);
+    out.resize(before + (got > 0 ? static_cast<std::size_t>(got) : 0));
+    return got > 0;
+}
+
+Child::End ProcessSource::finish() {
+    output_.reset();
+    end_ = child_.wait();
+    return end_;
+}
+
+}  // namespace cvagent::shell

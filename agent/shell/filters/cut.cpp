@@ -1,0 +1,70 @@
+#include <charconv>
+#include <optional>
+
+#include "agent/shell/filters/filters.h"
+#include "agent/shell/filters/line_filter.h"
+
+namespace cvagent::shell {
+
+namespace {
+
+/// One field of each line; a line without the delimiter is printed whole.
+class Cut : public LineFilter {
+public:
+    Cut(char delimiter, unsigned field) : delimiter_(delimiter), field_(field) {}
+
+protected:
+    bool takeLine(std::string_view line, std::string& out) override {
+        std::size_t end = line.find(delimiter_);
+        if (end == std::string_view::npos) {
+            out += line;
+            out += '\n';
+            return true;
+        }
+        for (unsigned passed = 1; passed < field_; ++passed) {
+            line = end == std::string_view::npos ? std::string_view() : line.substr(end + 1);
+            end = line.find(delimiter_);
+        }
+        out += line.substr(0, end);
+        out += '\n';
+        return true;
+    }
+
+private:
+    char delimiter_;
+    unsigned field_;
+};
+
+/// The value of an option, joined to its letter or the next word.
+std::optional<std::string> takeOption(Words& words, char letter) {
+    if (words.empty() || !words.front().starts_with(std::string{'-', letter})) {
+        return std::nullopt;
+    }
+    const bool joined = words.front().size() > 2;
+    if (!joined && words.size() < 2) {
+        return std::nullopt;
+    }
+    std::string value = joined ? words.front().substr(2) : words[1];
+    words = words.subspan(joined ? 1 : 2);
+    return value;
+}
+
+}  // namespace
+
+std::unique_ptr<Filter> makeCut(Words words, bool /*silent*/) {
+    constexpr unsigned kMostFields = 1000;
+    const auto delimiter = takeOption(words, 'd');
+    const auto list = takeOption(words, 'f');
+    if (!delimiter || !list || !words.empty() || delimiter->size() != 1 || *delimiter == "\n") {
+        return nullptr;
+    }
+    unsigned field = 0;
+    const char* const end = list->data() + list->size();
+    const auto read = std::from_chars(list->data(), end, field);
+    if (read.ec != std::errc() || read.ptr != end || field < 1 || field > kMostFields) {
+        return nullptr;
+    }
+    return std::make_unique<Cut>(delimiter->front(), field);
+}
+
+}  // namespace cvagent::shell

@@ -1,0 +1,41 @@
+#include "agent/shell/filters/line_filter.h"
+
+namespace cvagent::shell {
+
+bool LineFilter::pull(std::string& out) {
+    const std::size_t before = out.size();
+    while (out.size() == before && !ended_) {
+        const std::size_t held = buffer_.size();
+        if (!from().pull(buffer_)) {
+            takeLast(out);
+            break;
+        }
+        arrived(buffer_, held);
+        takeLines(out);
+        if (buffer_.size() > kLongestLine) {
+            ended_ = gaveUp_ = true;
+        }
+    }
+    return out.size() > before;
+}
+
+void LineFilter::takeLines(std::string& out) {
+    std::size_t begin = 0;
+    for (std::size_t end = buffer_.find('\n', searched_); end != std::string::npos && !ended_;
+         end = buffer_.find('\n', begin)) {
+        ended_ = !takeLine(std::string_view(buffer_).substr(begin, end - begin), out);
+        begin = end + 1;
+    }
+    buffer_.erase(0, begin);
+    searched_ = buffer_.size();
+}
+
+void LineFilter::takeLast(std::string& out) {
+    ended_ = true;
+    if (!buffer_.empty()) {
+        takeLine(buffer_, out);
+        buffer_.clear();
+    }
+}
+
+}  // namespace cvagent::shell

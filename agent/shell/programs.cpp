@@ -1,0 +1,179 @@
+#include "agent/shell/programs.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <cstdlib>
+#include <map>
+#include <mutex>
+#include <optional>
+#include <tuple>
+
+#include "agent/shell/descriptor.h"
+
+namespace cvagent::shell {
+
+namespace {
+
+constexpr auto kSystemDirectories =
+    std::to_array<std::string_view>({"/usr/bin/", "/bin/", "/usr/sbin/", "/sbin/"});
+
+/// A filter's name and the words that are found in the program which it stands for.
+struct Known {
+    std::string_view name;
+    std::string_view mark;
+};
+constexpr std::string_view kBinary = "\177ELF";
+constexpr std::string_view kScript = "#!";
+constexpr std::string_view kEgrepScript = "exec grep -E \"$@\"\n";
+constexpr auto kKnown = std::to_array<Known>({{"awk", "Michael D. Brennan"},
+                                              {"cat", "GNU coreutils"},
+                                              {"cut", "GNU coreutils"},
+                                              {"egrep", "GNU grep"},
+                                              {"grep", "GNU grep"},
+                                              {"md5sum", "GNU coreutils"},
+                                              {"rm", "GNU coreutils"},
+                                              {"sha1sum", "GNU coreutils"},
+                                              {"tr", "GNU coreutils"}});
+
+/// A file by what changes when another one takes its place.
+using Identity = std::tuple<dev_t, ino_t, off_t, time_t, long, time_t, long>;
+
+Identity identityOf(const struct stat& file) {
+    return {file.st_dev,          file.st_ino,         file.st_size,        file.st_mtim.tv_sec,
+            file.st_mtim.tv_nsec, file.st_ctim.tv_sec, file.st_ctim.tv_nsec};
+}
+
+std::string beginningOf(const std::string& path) {
+    constexpr std::size_t kMost = 4UL << 20U;
+    const Descriptor file(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
+    std::string content;
+    for (std::size_t used = 0; file.isOpen() && used < kMost;) {
+        content.resize(used + 65536);
+        const ssize_t got = read(file.get(), content.data() + used, content.size() - used);
+        used += got > 0 ? static_cast<std::size_t>(got) : 0;
+        content.resize(used);
+        if (got <= 0) {
+            break;
+        }
+    }
+    return content;
+}
+
+/// The script that newer releases of GNU grep install as egrep; theirs, or a distribution's without the
+/// warning.
+bool isEgrepScript(std::string_view content) {
+    constexpr std::size_t kLongest = 200;
+    return content.size() < kLongest && content.starts_with("#!/bin/sh\n") &&
+           content.ends_with(kEgrepScript) && content.find("obsolescent") == std::string_view::npos;
+}
+
+bool holds(const Known& known, const std::string& path) {
+    const std::string content = beginningOf(path);
+    if (content.starts_with(kScript)) {
+        return known.name == "egrep" && isEgrepScript(content);
+    }
+    return content.starts_with(kBinary) && content.find(known.mark) != std::string::npos;
+}
+
+/// What was found out about files, by what identifies them.
+class Memory {
+public:
+    bool isKnown(const Known& known, const std::string& path, const struct stat& file) {
+        const auto key = std::pair(known.name, identityOf(file));
+        {
+            const std::lock_guard lock(guard_);
+            if (const auto found = answers_.find(key); found != answers_.end()) {
+                return found->second;
+            }
+        }
+        const bool answer = holds(known, path);
+        const std::lock_guard lock(guard_);
+        constexpr std::size_t kMost = 1000;
+        if (answers_.size() < kMost) {
+            answers_.emplace(key, answer);
+        }
+        return answer;
+    }
+
+    void setAdapters(const std::string& program) {
+        const std::lock_guard lock(guard_);
+        struct stat file {};
+        const bool there = stat(program.c_str(), &file) == 0;
+        adapters_ = there ? std::optional(identityOf(file)) : std::nullopt;
+    }
+    bool isAdapter(const struct stat& file) {
+        const std::lock_guard lock(guard_);
+        return adapters_ == identityOf(file);
+    }
+
+private:
+    std::mutex guard_;
+    std::map<std::pair<std::string_view, Identity>, bool> answers_;
+    std::optional<Identity> adapters_;
+};
+
+Memory& memory() {
+    static Memory only;
+    return only;
+}
+
+Program::Kind kindOf(const std::string& name, const std::string& path, const struct stat& file) {
+    if (memory().isAdapter(file)) {
+        return Program::adapter;
+    }
+    const auto* const known = std::ranges::find(kKnown, name, &Known::name);
+    const std::string_view directory = std::string_view(path).substr(0, path.rfind('/') + 1);
+    const bool standard = std::ranges::find(kSystemDirectories, directory) != kSystemDirectories.end();
+    if (known == kKnown.end() || !standard || !memory().isKnown(*known, path, file)) {
+        return Program::tool;
+    }
+    // The one may be a script that runs the other.
+    return name == "egrep" ? (findProgram("grep").kind == Program::known ? Program::known : Program::tool)
+                           : Program::known;
+}
+
+/// @return nothing when there is no such file
+std::optional<Program> lookAt(const std::string& name, const std::string& path) {
+    struct stat file {};
+    if (stat(path.c_str(), &file) != 0) {
+        return errno == ENOENT || errno == ENOTDIR ? std::nullopt : std::optional(Program{Program::unclear});
+    }
+    if (!S_ISREG(file.st_mode) || access(path.c_str(), X_OK) != 0) {
+        return Program{Program::unclear};
+    }
+    return Program{kindOf(name, path, file), path};
+}
+
+}  // namespace
+
+Program findProgram(const std::string& name) {
+    if (name.find('/') != std::string::npos) {
+        return name.front() == '/' ? lookAt(name, name).value_or(Program{}) : Program{Program::unclear};
+    }
+    const char* const variable = std::getenv("PATH");
+    std::string_view rest = variable != nullptr ? variable : "";
+    for (bool more = true; more;) {
+        const std::size_t end = rest.find(':');
+        const std::string_view directory = rest.substr(0, end);
+        more = end != std::string_view::npos;
+        rest.remove_prefix(more ? end + 1 : rest.size());
+        if (!directory.starts_with('/')) {
+            return {Program::unclear};
+        }
+        if (auto found = lookAt(name, std::string(directory) + '/' + name)) {
+            return *found;
+        }
+    }
+    return {};
+}
+
+void setHostTools(const std::string& program) {
+    memory().setAdapters(program);
+}
+
+}  // namespace cvagent::shell

@@ -1,0 +1,114 @@
+// Every kind of stage that the plug-in's commands use, against the real tools, with input that no host
+// prints.
+#include <gmock/gmock.h>
+
+#include "tests/shell/both_ways.h"
+#include "tests/support/fake_host.h"
+
+namespace {
+
+using both_ways::Complaints;
+using both_ways::direct;
+using both_ways::inShell;
+using both_ways::Ran;
+
+constexpr const char* kStages[] = {
+    "cat",
+    "grep b",
+    "grep ^b",
+    "grep 'b$'",
+    "grep '^b.$'",
+    "grep ''",
+    "grep '^'",
+    "grep '$'",
+    "grep '^$'",
+    "grep .",
+    "grep a.c",
+    "grep -v b",
+    "grep -w b",
+    "grep -vw 'a b'",
+    "grep -w a.c",
+    "grep -i 'A B'",
+    "grep -iv A",
+    "egrep 'b|c c|x'",
+    "cut -d ' ' -f1",
+    "cut -d ' ' -f3",
+    "cut -d: -f2",
+    "cut -d '=' -f2",
+    "cut -d a -f9",
+    "tr -s ' '",
+    "tr -s '*' ' '",
+    "tr '[A-Z]' '[a-z]'",
+    "tr ab c",
+    "tr -s abc xy",
+    "awk '{print $1}'",
+    "awk '{print $5}'",
+    "awk '{print $NF}'",
+    "md5sum",
+    "sha1sum",
+};
+
+std::vector<std::string> inputs() {
+    using namespace std::string_literals;
+    std::string manyLines;
+    for (int i = 0; i < 5000; ++i) {
+        manyLines += "a b " + std::to_string(i) + (i % 3 == 0 ? ":x=y\n" : " c  c\n");
+    }
+    return {""s,
+            "\n"s,
+            "\n\n\n"s,
+            "b"s,
+            "b\n"s,
+            "a b\nb\nab\nba\n b \n_b\nb_\nb-\nA B\nabc\na\n"s,
+            "a b c:d=e f\n"s,
+            "  lead and  trail  \n \n\t\n\ttab\tbed\t\n"s,
+            ":\n::\n=\na:\n:a"s,
+            "a\vb c\fd e\rf g\r\n"s,
+            "**a  **  b** c\n* *\n"s,
+            "\xff\xfe b \x80\n\xc3\xa9 b\n\xe2\x82"s,
+            "b\0b\nb\n"s,
+            "x\n\0\nb\n"s,
+            "x\0"s,
+            "\0b"s,
+            "a\0c\nabc\0"s,
+            "]^_`ABCXYZ[{\\}\n"s,
+            std::string(70000, 'b') + "\nb b\n",
+            std::string(300, ' ') + "b\n" + std::string(5000, '*'),
+            manyLines};
+}
+
+HOST_TEST(Filters, PrintWhatTheToolsPrint) {
+    setenv("LC_ALL", "C", 1);
+    for (const std::string& input : inputs()) {
+        host.file("/etc/input", input);
+        for (const std::string stage : kStages) {
+            const std::string command = "cat /etc/input | " + stage;
+            const Ran ours = direct(command, Complaints::seen);
+            EXPECT_FALSE(ours.inShell) << command;
+            EXPECT_EQ(ours, inShell(command, Complaints::seen)) << command << " of " << input.substr(0, 200);
+        }
+    }
+}
+
+HOST_TEST(Filters, ReadAFileAsTheToolsDo) {
+    setenv("LC_ALL", "C", 1);
+    for (const std::string& input : inputs()) {
+        host.file("/etc/input", input);
+        for (const std::string command : {"cat /etc/input", "grep b /etc/input", "grep -v b /etc/input",
+                                          "grep ^b /etc/input", "egrep 'b|x' /etc/input"}) {
+            const Ran ours = direct(command, Complaints::seen);
+            EXPECT_FALSE(ours.inShell) << command;
+            EXPECT_EQ(ours, inShell(command, Complaints::seen)) << command << " of " << input.substr(0, 200);
+        }
+    }
+}
+
+HOST_TEST(Filters, HandALineThatIsTooLongToNobody) {
+    setenv("LC_ALL", "C", 1);
+    host.file("/etc/input", std::string(20UL << 20U, 'b'));
+    EXPECT_EQ(direct("cat /etc/input | grep b", Complaints::seen).out, "");
+    EXPECT_EQ(direct("cat /etc/input | grep b", Complaints::seen).status, 2 << 8);
+    EXPECT_EQ(direct("cat /etc/input | tr -s b", Complaints::seen).out, "b");
+}
+
+}  // namespace

@@ -1,0 +1,271 @@
+// What a runner that only looks like a shell gets wrong.
+#include <gmock/gmock.h>
+#include <sys/resource.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <csignal>
+#include <filesystem>
+#include <fstream>
+#include <thread>
+
+#include "agent/shell/child.h"
+#include "agent/shell/runner.h"
+#include "tests/shell/both_ways.h"
+#include "tests/support/fake_host.h"
+
+namespace {
+
+using both_ways::Complaints;
+using both_ways::direct;
+using both_ways::inShell;
+using cvagent::shell::closeCommand;
+using cvagent::shell::openCommand;
+
+/// A command line that is known to be run without a shell.
+class Running {
+public:
+    explicit Running(const char* command) : stream_(openCommand(command).value()) {}
+    Running(const Running&) = delete;
+    Running& operator=(const Running&) = delete;
+    ~Running() {
+        if (stream_ != nullptr) {
+            end();
+        }
+    }
+
+    std::string line() {
+        char text[512] = "";
+        return fgets(text, sizeof text, stream_) != nullptr ? text : "";
+    }
+    int end() { return closeCommand(std::exchange(stream_, nullptr)).value(); }
+
+private:
+    FILE* stream_;
+};
+
+void inC() {
+    setenv("LC_ALL", "C", 1);
+}
+
+std::vector<pid_t> childrenOfThisThread() {
+    std::ifstream in("/proc/self/task/" + std::to_string(gettid()) + "/children");
+    return {std::istream_iterator<pid_t>(in), {}};
+}
+
+void waitFor(const std::function<bool()>& condition) {
+    for (int i = 0; i < 10000 && !condition(); ++i) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(1));
+    }
+    EXPECT_TRUE(condition());
+}
+
+HOST_TEST(Traps, AScriptedToolIsRun) {
+    inC();
+    host.tool("grep b", "scripted\n");
+    host.file("/etc/lines", "a\nb\n");
+    EXPECT_TRUE(direct("cat /etc/lines | grep b", Complaints::seen).inShell);
+    EXPECT_EQ(direct("grep b", Complaints::seen).out, "scripted\n");
+    EXPECT_THAT(host.calls(), TextsAre("grep b"));
+}
+
+HOST_TEST(Traps, AToolThatWasCopiedElsewhereIsNotTheSystems) {
+    inC();
+    host.directory("/opt/bin");
+    std::filesystem::copy_file("/usr/bin/grep", "/opt/bin/grep");
+    const std::string before = std::getenv("PATH");
+    setenv("PATH", ("/opt/bin:" + before).c_str(), 1);
+    EXPECT_TRUE(direct("echo b | grep b", Complaints::seen).inShell);
+    setenv("PATH", before.c_str(), 1);
+    EXPECT_FALSE(direct("echo b | grep b", Complaints::seen).inShell);
+}
+
+HOST_TEST(Traps, AMissingToolIsMissing) {
+    inC();
+    setenv("PATH", "/tools", 1);
+    EXPECT_TRUE(direct("echo b | grep b", Complaints::unseen).inShell);
+    EXPECT_EQ(direct("cat /etc/hosts 2> /dev/null", Complaints::seen).status, 127 << 8);
+    setenv("PATH", ".:/usr/bin", 1);
+    EXPECT_TRUE(direct("cat /etc/hosts 2> /dev/null", Complaints::seen).inShell);
+}
+
+HOST_TEST(Traps, WhatChangesTheToolsIsLeftToThem) {
+    for (const char* variable : {"LC_ALL", "LC_CTYPE", "LC_COLLATE", "LC_MESSAGES", "LANG"}) {
+        unsetenv("LC_ALL");
+        EXPECT_FALSE(direct("echo b | grep b", Complaints::seen).inShell) << variable;
+        setenv(variable, "de_DE.UTF-8", 1);
+        EXPECT_TRUE(direct("echo b | grep b", Complaints::seen).inShell) << variable;
+        unsetenv(variable);
+    }
+    setenv("LANG", "de_DE.UTF-8", 1);
+    inC();
+    EXPECT_FALSE(direct("echo b | grep b", Complaints::seen).inShell);
+    setenv("POSIXLY_CORRECT", "1", 1);
+    EXPECT_TRUE(direct("echo b | grep b", Complaints::seen).inShell);
+}
+
+HOST_TEST(Traps, TheFirstToolIsStartedAtOnceAndNotWaitedFor) {
+    inC();
+    host.tool(
+        "slow",
+        ToolAnswer{.out = "done\n", .status = 0, .action = "until [ -e /tmp/go ]; do sleep 0.01; done"});
+    Running running("slow | cat");
+    waitFor([&] { return !host.calls().empty(); });
+    host.file("/tmp/go", "");
+    EXPECT_EQ(running.line(), "done\n");
+    EXPECT_EQ(running.end(), 0);
+}
+
+HOST_TEST(Traps, ToolsStartOneAfterTheOther) {
+    inC();
+    host.tool("first",
+              ToolAnswer{.out = "1\n", .status = 0, .action = "until [ -e /tmp/go ]; do sleep 0.01; done"});
+    host.tool("second", "2\n");
+    Running running("first; second | cat");
+    waitFor([&] { return !host.calls().empty(); });
+    EXPECT_THAT(host.calls(), TextsAre("first"));
+    host.file("/tmp/go", "");
+    EXPECT_EQ(running.line(), "1\n");
+    EXPECT_EQ(running.line(), "2\n");
+    EXPECT_EQ(running.end(), 0);
+    EXPECT_THAT(host.calls(), TextsAre("first", "second"));
+}
+
+HOST_TEST(Traps, OutputWithoutEndEndsWhenNobodyReads) {
+    inC();
+    for (const char* command : {"yes", "yes | cat", "yes | tr y z", "yes | grep y | cut -d y -f2"}) {
+        Running running(command);
+        EXPECT_NE(running.line(), "");
+        const int status = running.end();
+        EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 128 + SIGPIPE) << command;
+    }
+    EXPECT_EQ(inShell("cat /dev/zero | cat | head -c 5", Complaints::seen).status, 0);
+}
+
+HOST_TEST(Traps, AGigabyteDoesNotPileUp) {
+    inC();
+    const auto peak = [] {
+        rusage usage{};
+        getrusage(RUSAGE_SELF, &usage);
+        return usage.ru_maxrss;
+    };
+    Running running("yes | grep y | cut -d ' ' -f1 | tr y z");
+    running.line();
+    const long before = peak();
+    for (int i = 0; i < 2000000; ++i) {
+        ASSERT_EQ(running.line(), "z\n");
+    }
+    EXPECT_LT(peak() - before, 4096) << "KiB";
+}
+
+HOST_TEST(Traps, WhatFollowsIsDoneAlsoWhenNobodyReads) {
+    inC();
+    host.tool("tool", "some\n");
+    host.file("/tmp/gone", "");
+    Running running("tool; tool | cat; rm /tmp/gone");
+    EXPECT_EQ(running.end(), 0);
+    EXPECT_FALSE(host.exists("/tmp/gone"));
+    EXPECT_THAT(host.calls(), TextsAre("tool", "tool"));
+}
+
+HOST_TEST(Traps, AKilledCommandEndsAsAKilledShell) {
+    inC();
+    host.tool("tool", "");
+    for (const char* command : {"sleep 100", "sleep 100 | cat; tool", "cat `sleep 100` | cat; tool"}) {
+        Running running(command);
+        const auto children = childrenOfThisThread();
+        ASSERT_EQ(children.size(), 1U) << command;
+        EXPECT_EQ(cvagent::shell::commandOf(children.front()), command);
+        cvagent::shell::noteKill(children.front());
+        kill(children.front(), SIGKILL);
+        EXPECT_EQ(running.line(), "");
+        const int status = running.end();
+        EXPECT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == SIGKILL) << command;
+    }
+    EXPECT_THAT(host.calls(), testing::IsEmpty());
+    EXPECT_EQ(cvagent::shell::commandOf(getpid()), "");
+}
+
+HOST_TEST(Traps, AToolThatSomebodyElseKillsIsNoKilledCommand) {
+    inC();
+    host.tool("tool", "after\n");
+    Running running("sleep 100; tool");
+    kill(childrenOfThisThread().at(0), SIGKILL);
+    EXPECT_EQ(running.line(), "after\n");
+    EXPECT_EQ(running.end(), 0);
+}
+
+HOST_TEST(Traps, NothingIsOpenedThatCanHang) {
+    inC();
+    ASSERT_EQ(mkfifo("/tmp/fifo", 0600), 0);
+    host.symlink("/tmp/link", "/tmp/fifo");
+    host.symlink("/tmp/away", "/proc/version");
+    for (const char* command :
+         {"cat /tmp/fifo 2> /dev/null", "cat /tmp/link 2> /dev/null", "cat /dev/zero | cat",
+          "grep x /dev/tty 2> /dev/null", "cat /etc/lines > /tmp/fifo", "cat /.proc/kmsg 2> /dev/null"}) {
+        EXPECT_FALSE(openCommand(command).has_value()) << command;
+    }
+}
+
+HOST_TEST(Traps, AFileLimitEndsNobodyButTheTool) {
+    inC();
+    host.file("/etc/lines", "some\n");
+    const rlimit none{1, RLIM_INFINITY};
+    setrlimit(RLIMIT_FSIZE, &none);
+    EXPECT_FALSE(openCommand("cat /etc/lines > /tmp/out").has_value());
+}
+
+HOST_TEST(Traps, AFullDiskIsToldAsTheToolsTellIt) {
+    inC();
+    host.file("/etc/lines", std::string(100000, 'b') + "\nb\n");
+    host.directory("/var/full");
+    host.fullDisk("/var/full");
+    for (const char* command :
+         {"cat /etc/lines | grep b > /var/full/out", "egrep 'a|b' /etc/lines > /var/full/out",
+          "cat /etc/lines | cut -d a -f1 > /var/full/out"}) {
+        const auto ours = direct(command, Complaints::unseen);
+        EXPECT_FALSE(ours.inShell);
+        EXPECT_EQ(ours, inShell(command, Complaints::unseen)) << command;
+    }
+}
+
+HOST_TEST(Traps, DescriptorsAreNotLeftBehindNorHandedOn) {
+    inC();
+    const auto open = [] {
+        const std::filesystem::directory_iterator all("/proc/self/fd");
+        return std::distance(begin(all), end(all));
+    };
+    direct("seq 3 > /tmp/out", Complaints::seen);
+    const auto before = open();
+    const std::string handedOn = direct("ls /proc/self/fd", Complaints::seen).out;
+    {
+        const Running outer("sleep 0.01 | cat");
+        const Running file("cat /tmp/out");
+        EXPECT_EQ(direct("ls /proc/self/fd", Complaints::seen).out, handedOn);
+    }
+    direct("echo x | cat; sleep 0 > /tmp/out; cat /tmp/out", Complaints::seen);
+    EXPECT_EQ(open(), before);
+    close(STDIN_FILENO);
+    close(STDOUT_FILENO);
+    EXPECT_EQ(Running("seq 1").line(), "1\n");
+}
+
+HOST_TEST(Traps, ManyThreadsRunCommandsSideBySide) {
+    inC();
+    host.file("/etc/lines", "one\ntwo\n");
+    std::vector<std::thread> threads;
+    for (int i = 0; i < 4; ++i) {
+        threads.emplace_back([] {
+            for (int turn = 0; turn < 20; ++turn) {
+                EXPECT_EQ(Running("cat /etc/lines | grep two").line(), "two\n");
+                EXPECT_EQ(Running("seq 3 | grep 3; echo x").line(), "3\n");
+            }
+        });
+    }
+    for (std::thread& thread : threads) {
+        thread.join();
+    }
+}
+
+}  // namespace
