@@ -12,7 +12,7 @@ bool eventually(const Condition& condition) {
     const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(10);
     bool holds = condition();
     while (!holds && std::chrono::steady_clock::now() < end) {
-        std::this_thread::sleep_for(std::chrono::milliseconds(1));
+        std::this_thread::sleep_for(std::chrono::milliseconds(2));
         holds = condition();
     }
     return holds;
