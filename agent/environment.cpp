@@ -24,7 +24,8 @@ constexpr std::string_view kOwnPrefix = "CORVISTA_";
 constexpr uid_t kUnmappedOwner = 65534;
 
 bool isKept(std::string_view name) {
-    return name.starts_with(kOwnPrefix) || std::find(std::begin(kKept), std::end(kKept), name) != std::end(kKept);
+    return name.starts_with(kOwnPrefix) ||
+           std::find(std::begin(kKept), std::end(kKept), name) != std::end(kKept);
 }
 
 std::vector<std::pair<std::string, std::string>> keptVariables() {

@@ -147,10 +147,7 @@ HOST_TEST(DataLock, CoversTheSavedSettingsOfAnAgentWithAnotherDirectory) {
     ASSERT_TRUE(watch.waitForOutput("published"));
     host.file(std::string(kFixed) + "/ifcfg-eth0", "BOOTPROTO=static\n");
     SuseHost suse(host);
-    std::vector<std::string> words = {"env", "CORVISTA_DATA_DIR=/var/other"};
-    const std::vector<std::string> cvagent = suse.commandLine({"tree"});
-    words.insert(words.end(), cvagent.begin(), cvagent.end());
-    const Finished second = host.run(words);
+    const Finished second = host.run(suse.commandLine({"tree"}, {"CORVISTA_DATA_DIR=/var/other"}));
     EXPECT_EQ(second.status, 5);
     EXPECT_THAT(second.err,
                 HasSubstr("another agent holds the data directory '/opt/vantrel/corvista/data/'"));

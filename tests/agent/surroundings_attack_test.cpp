@@ -95,25 +95,12 @@ HOST_TEST(StartingDirectory, ThatIsGoneIsNeededForRelativeNamesAlone) {
 HOST_TEST(CallersEnvironment, ReachesCommandsOnlyAsFarAsTheyNeedIt) {
     SuseHost suse(host);
     tellFromWithin(host, "env");
-    std::vector<std::string> words = {"env",
-                                      "LD_LIBRARY_PATH=/home/stranger",
-                                      "LD_AUDIT=/home/stranger/spy.so",
-                                      "GREP_OPTIONS=--invert-match",
-                                      "GREP_COLORS=mt=01;31",
-                                      "POSIXLY_CORRECT=1",
-                                      "BASH_ENV=/home/stranger/run",
-                                      "ENV=/home/stranger/run",
-                                      "IFS=/",
-                                      "CDPATH=/home/stranger",
-                                      "BASH_FUNC_cat%%=() { touch /var/attacked; }",
-                                      "LANG=de_DE.UTF-8",
-                                      "LC_MESSAGES=de_DE.UTF-8",
-                                      "TZ=UTC",
-                                      "TERM=xterm",
-                                      "XDG_STATE_HOME=/home/me"};
-    const std::vector<std::string> cvagent = suse.commandLine({"tree"});
-    words.insert(words.end(), cvagent.begin(), cvagent.end());
-    const Finished run = host.run(words);
+    const Finished run = host.run(suse.commandLine(
+        {"tree"},
+        {"LD_LIBRARY_PATH=/home/stranger", "LD_AUDIT=/home/stranger/spy.so", "GREP_OPTIONS=--invert-match",
+         "GREP_COLORS=mt=01;31", "POSIXLY_CORRECT=1", "BASH_ENV=/home/stranger/run", "ENV=/home/stranger/run",
+         "IFS=/", "CDPATH=/home/stranger", "BASH_FUNC_cat%%=() { touch /var/attacked; }", "LANG=de_DE.UTF-8",
+         "LC_MESSAGES=de_DE.UTF-8", "TZ=UTC", "TERM=xterm", "XDG_STATE_HOME=/home/me"}));
     EXPECT_EQ(run.status, 0) << run.err;
     std::set<std::string> names;
     std::istringstream lines(told(host));
@@ -138,11 +125,8 @@ HOST_TEST(CallersPath, LeadsRootToNoProgramOfAStranger) {
     host.directory("/home/stranger/bin", 01777);
     host.directory("/srv/open", 0777);
     tellFromWithin(host, "echo $PATH");
-    std::vector<std::string> words = {
-        "env", "PATH=:.:bin:/home/stranger/bin:/srv/open/closed/bin:/nowhere:/tools:/usr/bin::"};
-    const std::vector<std::string> cvagent = suse.commandLine({"tree"});
-    words.insert(words.end(), cvagent.begin(), cvagent.end());
-    const Finished run = host.run(fromDirectory(kStrangers, words));
+    const std::string path = ":.:bin:/home/stranger/bin:/srv/open/closed/bin:/nowhere:/tools:/usr/bin::";
+    const Finished run = host.run(fromDirectory(kStrangers, suse.commandLine({"tree"}, {"PATH=" + path})));
     EXPECT_EQ(run.status, 0) << run.err;
     EXPECT_EQ(told(host), "/tools:/usr/bin:/usr/local/sbin:/usr/sbin:/sbin:/bin\n");
     EXPECT_FALSE(host.exists("/var/attacked"));
