@@ -11,6 +11,8 @@
 #include <utility>
 #include <vector>
 
+#include "agent/owners.h"
+
 namespace cvagent {
 
 namespace {
@@ -20,11 +22,9 @@ namespace fs = std::filesystem;
 constexpr std::string_view kKept[] = {"HOME", "NO_COLOR", "PATH", "TERM", "TZ", "XDG_STATE_HOME"};
 constexpr std::string_view kOwnPrefix = "CORVISTA_";
 
-// What the kernel shows of owners that a user namespace has no number for: the files of the system there.
-constexpr uid_t kUnmappedOwner = 65534;
-
 bool isKept(std::string_view name) {
-    return name.starts_with(kOwnPrefix) || std::find(std::begin(kKept), std::end(kKept), name) != std::end(kKept);
+    return name.starts_with(kOwnPrefix) ||
+           std::find(std::begin(kKept), std::end(kKept), name) != std::end(kKept);
 }
 
 std::vector<std::pair<std::string, std::string>> keptVariables() {
@@ -45,8 +45,7 @@ bool isOpenToOthers(const fs::path& directory) {
     for (const fs::path& name : directory) {
         way /= name;
         struct stat found {};
-        if (stat(way.c_str(), &found) != 0 ||
-            (found.st_uid != 0 && found.st_uid != geteuid() && found.st_uid != kUnmappedOwner)) {
+        if (stat(way.c_str(), &found) != 0 || (found.st_uid != geteuid() && !isTheSystem(found.st_uid))) {
             return true;
         }
         const bool onlyOwnFiles = (found.st_mode & S_ISVTX) != 0 && way != directory;

@@ -1,15 +1,18 @@
 // What a stranger, or a careless caller, lays out around cvagent: directory, environment, PATH, umask,
 // descriptors.
 #include <gmock/gmock.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstdlib>
 #include <filesystem>
 #include <set>
 #include <sstream>
 
 #include "agent/environment.h"
+#include "agent/surroundings.h"
 #include "tests/agent/cvagent_run.h"
 #include "tests/agent/from_directory.h"
 #include "tests/agent/suse_host.h"
@@ -182,6 +185,15 @@ HOST_TEST(CallersLimits, LeaveNoCoreWithWhatTheProgramKnows) {
         host.run(fromDirectory("/", suse.commandLine({"tree"}), "ulimit -H -c 8 && ulimit -S -c 8"));
     EXPECT_EQ(run.status, 0) << run.err;
     EXPECT_EQ(told(host), "0\n8\n") << "a service that a command restarts can raise it again";
+}
+
+// A limit of 0 is passed over where the kernel hands cores to a program.
+HOST_TEST(CallersLimits, KeepACoreFromAProgramThatCollectsThem) {
+    cvagent::Options options;
+    cvagent::prepareSurroundings(options);
+    rlimit limit{};
+    ASSERT_EQ(getrlimit(RLIMIT_CORE, &limit), 0);
+    EXPECT_EQ(limit.rlim_cur, std::min<rlim_t>(1, limit.rlim_max));
 }
 
 HOST_TEST(ClosedDescriptors, NoFileTakesTheirPlace) {
