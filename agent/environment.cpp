@@ -20,6 +20,8 @@ namespace {
 namespace fs = std::filesystem;
 
 constexpr std::string_view kKept[] = {"HOME", "NO_COLOR", "PATH", "TERM", "TZ", "XDG_STATE_HOME"};
+constexpr std::string_view kSystemDirectories[] = {"/usr/local/sbin", "/usr/sbin", "/sbin", "/usr/bin",
+                                                   "/bin"};
 constexpr std::string_view kOwnPrefix = "CORVISTA_";
 
 bool isKept(std::string_view name) {
@@ -56,21 +58,31 @@ bool isOpenToOthers(const fs::path& directory) {
     return false;
 }
 
-/// A relative directory, the empty name among them, would be one of "/", where the commands run.
-bool isUsable(const std::string& directory) {
+/// The directory as it comes into PATH; "" when it must not. A relative one, the empty name among them, would
+/// be one of "/", where the commands run. For root links are followed now, for who owns one can lead it
+/// elsewhere later; the system's own stay as everybody knows them.
+std::string usable(const std::string& directory) {
     if (!directory.starts_with('/')) {
-        return false;
+        return "";
+    }
+    if (geteuid() != 0) {
+        return directory;
     }
     std::error_code missing;
     const fs::path place = fs::canonical(directory, missing);
-    return geteuid() != 0 || (!missing && !isOpenToOthers(place));
+    if (missing || isOpenToOthers(place)) {
+        return "";
+    }
+    const bool isSystems = std::ranges::find(kSystemDirectories, directory) != std::end(kSystemDirectories);
+    return isSystems ? directory : place.string();
 }
 
 std::string safePath() {
     std::vector<std::string> directories = directoriesOnPath();
-    std::erase_if(directories, [](const std::string& directory) { return !isUsable(directory); });
-    for (const char* directory : {"/usr/local/sbin", "/usr/sbin", "/sbin", "/usr/bin", "/bin"}) {
-        if (std::find(directories.begin(), directories.end(), directory) == directories.end()) {
+    std::ranges::transform(directories, directories.begin(), usable);
+    std::erase(directories, "");
+    for (const std::string_view directory : kSystemDirectories) {
+        if (std::ranges::find(directories, directory) == directories.end()) {
             directories.emplace_back(directory);
         }
     }

@@ -159,10 +159,13 @@ TEST(CallersPathOfUsers, LeadsRootToNoDirectoryOfSomebodyElse) {
     const std::string way = "/tmp/cvagent-path-" + std::to_string(getpid());
     std::filesystem::create_directories(way + "/bin");
     ASSERT_EQ(chown(way.c_str(), 65533, 65533), 0);
+    // He can have it lead elsewhere when it has been looked at.
+    std::filesystem::create_directory_symlink("/usr/lib", way + "/link");
     const auto reduced = [&way] {
-        setenv("PATH", (way + "/bin:" + way + ":/usr/bin").c_str(), 1);
+        setenv("PATH", (way + "/bin:" + way + ":" + way + "/link:/usr/bin").c_str(), 1);
         cvagent::reduceEnvironment();
-        _exit(std::string(std::getenv("PATH")) == "/usr/bin:/usr/local/sbin:/usr/sbin:/sbin:/bin" ? 0 : 1);
+        const std::string path = std::getenv("PATH");
+        _exit(path == "/usr/lib:/usr/bin:/usr/local/sbin:/usr/sbin:/sbin:/bin" ? 0 : 1);
     };
     EXPECT_EXIT(reduced(), testing::ExitedWithCode(0), "");
     std::filesystem::remove_all(way);
