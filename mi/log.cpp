@@ -7,21 +7,21 @@ namespace IC {
 
 namespace {
 
-thread_local const char* operation = nullptr;  // null outside all operations
+thread_local const char* current = nullptr;  // null outside all operations
 thread_local bool logEnded = false;
 
 }  // namespace
 
-Operation::Operation(const char* function) : outer_(operation) {
-    operation = function;
+Operation::Operation(const char* function) : outer_(current) {
+    current = function;
 }
 
 Operation::~Operation() {
-    operation = outer_;
+    current = outer_;
 }
 
 const char* Operation::nameOr(const char* function) {
-    return operation != nullptr ? operation : function;
+    return current != nullptr ? current : function;
 }
 
 void endLogOfThisThread() {
