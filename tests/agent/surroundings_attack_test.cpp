@@ -1,15 +1,18 @@
 // What a stranger, or a careless caller, lays out around cvagent: directory, environment, PATH, umask,
 // descriptors.
 #include <gmock/gmock.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstdlib>
 #include <filesystem>
 #include <set>
 #include <sstream>
 
 #include "agent/environment.h"
+#include "agent/surroundings.h"
 #include "tests/agent/cvagent_run.h"
 #include "tests/agent/from_directory.h"
 #include "tests/agent/suse_host.h"
@@ -140,10 +143,13 @@ TEST(CallersPathOfUsers, LeadsRootToNoDirectoryOfSomebodyElse) {
     const std::string way = "/tmp/cvagent-path-" + std::to_string(getpid());
     std::filesystem::create_directories(way + "/bin");
     ASSERT_EQ(chown(way.c_str(), 65533, 65533), 0);
+    // He can have it lead elsewhere when it has been looked at.
+    std::filesystem::create_directory_symlink("/usr/lib", way + "/link");
     const auto reduced = [&way] {
-        setenv("PATH", (way + "/bin:" + way + ":/usr/bin").c_str(), 1);
+        setenv("PATH", (way + "/bin:" + way + ":" + way + "/link:/usr/bin").c_str(), 1);
         cvagent::reduceEnvironment();
-        _exit(std::string(std::getenv("PATH")) == "/usr/bin:/usr/local/sbin:/usr/sbin:/sbin:/bin" ? 0 : 1);
+        const std::string path = std::getenv("PATH");
+        _exit(path == "/usr/lib:/usr/bin:/usr/local/sbin:/usr/sbin:/sbin:/bin" ? 0 : 1);
     };
     EXPECT_EXIT(reduced(), testing::ExitedWithCode(0), "");
     std::filesystem::remove_all(way);
@@ -166,6 +172,15 @@ HOST_TEST(CallersLimits, LeaveNoCoreWithWhatTheProgramKnows) {
         host.run(fromDirectory("/", suse.commandLine({"tree"}), "ulimit -H -c 8 && ulimit -S -c 8"));
     EXPECT_EQ(run.status, 0) << run.err;
     EXPECT_EQ(told(host), "0\n8\n") << "a service that a command restarts can raise it again";
+}
+
+// A limit of 0 is passed over where the kernel hands cores to a program.
+HOST_TEST(CallersLimits, KeepACoreFromAProgramThatCollectsThem) {
+    cvagent::Options options;
+    cvagent::prepareSurroundings(options);
+    rlimit limit{};
+    ASSERT_EQ(getrlimit(RLIMIT_CORE, &limit), 0);
+    EXPECT_EQ(limit.rlim_cur, std::min<rlim_t>(1, limit.rlim_max));
 }
 
 HOST_TEST(ClosedDescriptors, NoFileTakesTheirPlace) {
