@@ -2,6 +2,7 @@
 
 #include <atomic>
 #include <map>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -14,10 +15,11 @@ extern Error myerr;
 /// What a pass works on. Each monitor's thread has its own: one that hangs in a callback of the agent
 /// outlives the stop, and the next start's has another.
 struct Pass {
-    std::map<std::string, unsigned int> current;   ///< link state by interface
-    std::map<std::string, unsigned int> previous;  ///< as the pass before found it
-    std::vector<std::string> slaves;               ///< member ports of all bonds
-    std::vector<std::string> untold;               ///< interfaces about which a command was ended by force
+    std::map<std::string, unsigned int> current;           ///< link state by interface
+    std::map<std::string, unsigned int> previous;          ///< as the pass before found it
+    std::vector<std::string> slaves;                       ///< member ports of all bonds
+    std::map<std::string, std::set<std::string>> members;  ///< of each bond, as it was listed last
+    std::vector<std::string> untold;  ///< interfaces about which a command was ended by force
 };
 /// The calling thread's; those without an own one share one.
 Pass& pass();

@@ -1,6 +1,8 @@
 // The link states of this pass, read from the published nodes.
 #include <algorithm>
+#include <iterator>
 #include <optional>
+#include <set>
 
 #include "indications/globals.h"
 #include "indications/link_state.h"
@@ -60,6 +62,32 @@ unsigned int verdict(unsigned int before, unsigned int now) {
     return LinkState::noVerdict;
 }
 
+/// Notes the members of a bond, which the pass has listed from `first` on. Of a bond that was cut off the
+/// members of the passes before count too: the listing itself may not be whole.
+/// @return those by whose change the bond still has to be judged
+std::set<std::string> membersWithoutVerdict(OSHWMI_IND::Pass& pass, const std::string& bond,
+                                            std::size_t first, bool cutOff) {
+    std::set<std::string> listed(std::next(pass.slaves.begin(), static_cast<std::ptrdiff_t>(first)),
+                                 pass.slaves.end());
+    std::set<std::string>& members = pass.members[bond];
+    if (!cutOff) {
+        members = std::move(listed);
+        return {};
+    }
+    std::ranges::set_difference(members, listed, std::back_inserter(pass.slaves));
+    members.merge(listed);
+    return members;
+}
+
+/// The next pass must find these as the last one left them, or a fail-over would never be told.
+void keepStates(OSHWMI_IND::Pass& pass, const std::set<std::string>& names) {
+    for (const std::string& name : names) {
+        if (const auto state = stateOf(pass.previous, name)) {
+            pass.current[name] = *state;
+        }
+    }
+}
+
 }  // namespace
 
 void OsHwMI::createCurNetNodeMap() {
@@ -68,24 +96,33 @@ void OsHwMI::createCurNetNodeMap() {
     OSHWMI_IND::Pass& pass = OSHWMI_IND::pass();
     pass.current.clear();
     pass.untold.clear();
+    std::set<std::string> unjudged;
     for (const auto& [key, node] : nodesByName()) {
         const unsigned int before = commandsCutOff();
         const auto now = readState(*node);
+        const std::string& name = now ? now->name : key;
         std::optional<unsigned int> state = now ? std::optional(now->state) : std::nullopt;
-        if (now && contains(now->name, "bond")) {
-            logInd(kProgress) << "Calling bondedNetNodeStatus() for bonded interface: " << now->name;
-            const unsigned int failOver = bondedNetNodeStatus(now->name);
+        // A bond that was cut off in its own answer has members all the same: they raise no alerts.
+        const bool isBond = contains(name, "bond") && (now || commandsCutOff() != before);
+        const std::size_t slaves = pass.slaves.size();
+        if (isBond) {
+            logInd(kProgress) << "Calling bondedNetNodeStatus() for bonded interface: " << name;
+            const unsigned int failOver = bondedNetNodeStatus(name);
             state = failOver == LinkState::noVerdict ? state : failOver;
         }
-        const std::string& name = now ? now->name : key;
-        if (commandsCutOff() != before) {
+        const bool cutOff = commandsCutOff() != before;
+        if (cutOff) {
             state = stateOf(pass.previous, name);
             pass.untold.push_back(name);
+        }
+        if (isBond) {
+            unjudged.merge(membersWithoutVerdict(pass, name, slaves, cutOff));
         }
         if (state) {
             pass.current[name] = *state;
         }
     }
+    keepStates(pass, unjudged);
 }
 
 unsigned int OsHwMI::bondedNetNodeStatus(const std::string& bond) {

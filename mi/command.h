@@ -28,7 +28,10 @@ constexpr std::size_t kCommandBuffer =
 /// cut.
 class Command {
 public:
-    enum class Length { ofBuffer, any };
+    enum class Length {
+        ofBuffer,  ///< refused when it does not fit kCommandBuffer
+        any,
+    };
 
     template <std::size_t size>
     consteval Command(const char (&text)[size]) : fixed_(text) {}

@@ -7,21 +7,21 @@ namespace IC {
 
 namespace {
 
-thread_local const char* operation = nullptr;  // null outside all operations
+thread_local const char* innermost = nullptr;  // null outside all operations
 thread_local bool logEnded = false;
 
 }  // namespace
 
-Operation::Operation(const char* function) : outer_(operation) {
-    operation = function;
+Operation::Operation(const char* function) : outer_(innermost) {
+    innermost = function;
 }
 
 Operation::~Operation() {
-    operation = outer_;
+    innermost = outer_;
 }
 
 const char* Operation::nameOr(const char* function) {
-    return operation != nullptr ? operation : function;
+    return innermost != nullptr ? innermost : function;
 }
 
 void endLogOfThisThread() {

@@ -1,5 +1,7 @@
 #include "mi/os_hw_mi.h"
 
+#include <utility>
+
 #include "mi/disk_snapshot.h"
 #include "mi/globals.h"
 #include "mi/log.h"
@@ -139,18 +141,23 @@ void OsHwMI::rememberByName(const std::string& name, MutableNode* node) {
     const std::lock_guard lock(inventoryGuard_);
     if (inventory_) {
         auto& known = inventory_->nodesByName[name];
-        known = known.expired() ? node->weak_from_this() : known;
+        if (known.expired()) {
+            known = node->weak_from_this();
+        }
     }
 }
 
 std::map<std::string, std::shared_ptr<MutableNode>> OsHwMI::nodesByName() const {
     std::map<std::string, std::shared_ptr<MutableNode>> held;
     const std::lock_guard lock(inventoryGuard_);
-    for (const auto& [name, node] :
-         inventory_ ? inventory_->nodesByName : decltype(Inventory::nodesByName){}) {
-        held.emplace(name, node.lock());
+    if (!inventory_) {
+        return held;
     }
-    std::erase_if(held, [](const auto& entry) { return entry.second == nullptr; });  // withdrawn by the agent
+    for (const auto& [name, known] : inventory_->nodesByName) {
+        if (auto node = known.lock()) {  // the agent has not withdrawn it
+            held.emplace(name, std::move(node));
+        }
+    }
     return held;
 }
 

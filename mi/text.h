@@ -25,6 +25,7 @@ std::string trimStart(std::string text, char unwanted = ' ');
 inline std::string signedDecimal(unsigned int number) {
     return std::to_string(static_cast<int>(number));
 }
+
 /// `text` with its control characters, and `also`, spelt out (\x1b): it stays on one line and steers nothing.
 std::string printable(std::string_view text, char also = '\x7f');
 

@@ -12,6 +12,7 @@
 #include <filesystem>
 #include <system_error>
 
+#include "agent/core/owners.h"
 #include "agent/core/problem.h"
 #include "agent/core/text.h"
 #include "framework/qx/corvista_utilities.h"
@@ -24,7 +25,6 @@ namespace fs = std::filesystem;
 
 constexpr const char* kSettings = "/opt/vantrel/corvista/data";
 constexpr const char* kLockFile = ".lock";
-constexpr mode_t kWritableByOthers = S_IWGRP | S_IWOTH;
 
 [[noreturn]] void failWith(int error) {
     throw std::system_error(error, std::generic_category());
@@ -94,11 +94,11 @@ private:
         }
     }
     void judge(const std::string& place, const struct stat& found, bool isGoal) const {
-        if (found.st_uid != geteuid() && (isGoal || found.st_uid != 0)) {
+        if (found.st_uid != geteuid() && (isGoal || !isTheSystem(found.st_uid))) {
             refuse(place, "belongs to somebody else (user " + std::to_string(found.st_uid) + ")");
         }
         const bool onlyOwnFiles = (found.st_mode & S_ISVTX) != 0 && !isGoal;
-        if (!S_ISLNK(found.st_mode) && (found.st_mode & kWritableByOthers) != 0 && !onlyOwnFiles) {
+        if (!S_ISLNK(found.st_mode) && !onlyOwnFiles && othersCanWrite(place, found)) {
             refuse(place, "can be written by others");
         }
     }
@@ -157,6 +157,13 @@ std::string userDirectory() {
         return std::string(state) + "/corvista/data/";
     }
     return home != nullptr && *home == '/' ? std::string(home) + "/.local/state/corvista/data/" : "";
+}
+
+/// What every agent of this user holds, for the plug-in's files have the same names in all of them.
+std::string fixedDirectory() {
+    struct stat found {};
+    const bool isOurs = stat(kSettings, &found) == 0 && found.st_uid == geteuid();
+    return isOurs || geteuid() == 0 ? kSettings : userDirectory();
 }
 
 }  // namespace
@@ -222,20 +229,22 @@ DataDirectory::DataDirectory() {
 }
 
 void DataDirectory::holdSettings() {
+    const std::string fixed = fixedDirectory();
     std::error_code missing;
-    if (fs::equivalent(own_->path(), kSettings, missing)) {
+    if (fixed.empty() || fs::equivalent(own_->path(), fixed, missing)) {
         return;
     }
-    struct stat found {};
-    const bool isTheirs = stat(kSettings, &found) != 0 || found.st_uid != geteuid();
-    if (geteuid() != 0 && isTheirs) {
-        return;
-    }
+    const std::string why = fixed == kSettings ? "; settings of interfaces are saved there whatever "
+                                               : "; files in /tmp have the same names whatever ";
     try {
-        settings_.emplace(kSettings, std::string("; settings of interfaces are saved there whatever ") +
-                                         kDataVariable + " is");
+        settings_.emplace(fixed, why + kDataVariable + " is");
     } catch (const std::system_error&) {
-        // Where it cannot be made, no agent saves or removes anything.
+        // Where it cannot be made, no agent saves or removes settings.
+    } catch (const Problem& problem) {
+        // A user named another directory perhaps because this one is not safe.
+        if (geteuid() == 0 || problem.kind() == Problem::busy) {
+            throw;
+        }
     }
 }
 

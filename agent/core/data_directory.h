@@ -9,8 +9,8 @@ namespace cvagent {
 inline constexpr const char* kDataVariable = "CORVISTA_DATA_DIR";
 
 /// A directory held by a lock file in it that only its owner can open. The directory belongs to the caller,
-/// the way to it to the caller or to root, and nobody else can write there; what is missing is made, the last
-/// directory with mode 0700. Where nothing can be written (EROFS) there is nothing to hold.
+/// the way to it to the caller or to root, and nobody else can write there (see owners.h); what is missing is
+/// made, the last directory with mode 0700. Where nothing can be written (EROFS) there is nothing to hold.
 class HeldDirectory {
 public:
     /// Throws Problem when somebody else could change the directory and, as `busy`, when another agent holds
@@ -31,8 +31,9 @@ private:
     int lock_;
 };
 
-/// The agent's data directory and the directory where the plug-in saves the settings of interfaces whatever
-/// the data directory is, both held for this process. Without root the latter only when it is the caller's.
+/// The agent's data directory and, whatever that is, one that all agents of the user hold, for the names of
+/// the plug-in's files in /tmp and of the saved settings of interfaces are fixed: where these are saved, or
+/// the user's own standard directory where that is not the caller's. Both are held for this process.
 class DataDirectory {
 public:
     /// Throws Problem; busy when another agent holds one of them.

@@ -11,6 +11,8 @@
 #include <utility>
 #include <vector>
 
+#include "agent/core/owners.h"
+
 namespace cvagent {
 
 namespace {
@@ -18,10 +20,9 @@ namespace {
 namespace fs = std::filesystem;
 
 constexpr std::string_view kKept[] = {"HOME", "NO_COLOR", "PATH", "TERM", "TZ", "XDG_STATE_HOME"};
+constexpr std::string_view kSystemDirectories[] = {"/usr/local/sbin", "/usr/sbin", "/sbin", "/usr/bin",
+                                                   "/bin"};
 constexpr std::string_view kOwnPrefix = "CORVISTA_";
-
-// What the kernel shows of owners that a user namespace has no number for: the files of the system there.
-constexpr uid_t kUnmappedOwner = 65534;
 
 bool isKept(std::string_view name) {
     return name.starts_with(kOwnPrefix) ||
@@ -46,8 +47,7 @@ bool isOpenToOthers(const fs::path& directory) {
     for (const fs::path& name : directory) {
         way /= name;
         struct stat found {};
-        if (stat(way.c_str(), &found) != 0 ||
-            (found.st_uid != 0 && found.st_uid != geteuid() && found.st_uid != kUnmappedOwner)) {
+        if (stat(way.c_str(), &found) != 0 || (found.st_uid != geteuid() && !isTheSystem(found.st_uid))) {
             return true;
         }
         const bool onlyOwnFiles = (found.st_mode & S_ISVTX) != 0 && way != directory;
@@ -58,21 +58,31 @@ bool isOpenToOthers(const fs::path& directory) {
     return false;
 }
 
-/// A relative directory, the empty name among them, would be one of "/", where the commands run.
-bool isUsable(const std::string& directory) {
+/// The directory as it comes into PATH; "" when it must not. A relative one, the empty name among them, would
+/// be one of "/", where the commands run. For root links are followed now, for who owns one can lead it
+/// elsewhere later; the system's own stay as everybody knows them.
+std::string usable(const std::string& directory) {
     if (!directory.starts_with('/')) {
-        return false;
+        return "";
+    }
+    if (geteuid() != 0) {
+        return directory;
     }
     std::error_code missing;
     const fs::path place = fs::canonical(directory, missing);
-    return geteuid() != 0 || (!missing && !isOpenToOthers(place));
+    if (missing || isOpenToOthers(place)) {
+        return "";
+    }
+    const bool isSystems = std::ranges::find(kSystemDirectories, directory) != std::end(kSystemDirectories);
+    return isSystems ? directory : place.string();
 }
 
 std::string safePath() {
     std::vector<std::string> directories = directoriesOnPath();
-    std::erase_if(directories, [](const std::string& directory) { return !isUsable(directory); });
-    for (const char* directory : {"/usr/local/sbin", "/usr/sbin", "/sbin", "/usr/bin", "/bin"}) {
-        if (std::find(directories.begin(), directories.end(), directory) == directories.end()) {
+    std::ranges::transform(directories, directories.begin(), usable);
+    std::erase(directories, "");
+    for (const std::string_view directory : kSystemDirectories) {
+        if (std::ranges::find(directories, directory) == directories.end()) {
             directories.emplace_back(directory);
         }
     }

@@ -21,7 +21,8 @@ namespace fs = std::filesystem;
 constexpr const char* kTmp = "/tmp";
 constexpr const char* kContent = "mode=1777,size=32m";
 
-/// What stays reachable: names relative to /tmp and what lies there now, so too.
+/// What stays reachable: its name relative to /tmp, and where it really lies: relative to /tmp when that is
+/// below /tmp, too, else absolute.
 using Places = std::map<std::string, std::string>;
 
 /// The last mount at a directory is the one in sight. A unit's own /tmp is a directory of the host's,

@@ -13,6 +13,7 @@
 #include <csignal>
 #include <cstdlib>
 #include <exception>
+#include <initializer_list>
 #include <system_error>
 #include <thread>
 
@@ -43,6 +44,16 @@ void handle(int signal, void (*handler)(int)) {
     action.sa_flags = SA_RESTART;
     sigemptyset(&action.sa_mask);
     sigaction(signal, &action, nullptr);
+}
+
+/// Whoever started the program may have held them back, and that is inherited.
+void letThrough(std::initializer_list<int> signals) {
+    sigset_t all;
+    sigemptyset(&all);
+    for (const int signal : signals) {
+        sigaddset(&all, signal);
+    }
+    pthread_sigmask(SIG_UNBLOCK, &all, nullptr);
 }
 
 void remember(int signal) {
@@ -105,6 +116,7 @@ void waitForSignal() {
 }  // namespace
 
 void StopSignals::install() {
+    letThrough({SIGINT, SIGTERM, SIGHUP, SIGALRM});
     handle(SIGPIPE, passOver);
     sem_init(&arrived, 0, 0);
     try {

@@ -13,8 +13,8 @@ namespace cvagent {
 class StopSignals {
 public:
     /// Installs the handlers and starts the thread that ends the process. To be called once, before the first
-    /// command begins and after what a process does before its first thread. Where the system
-    /// gives no thread, signals keep ending the program at once.
+    /// command begins and after what a process does before its first thread. Where the system gives no
+    /// thread, signals keep ending the program at once.
     static void install();
     /// The signal that came first, 0 for none yet.
     static int received();

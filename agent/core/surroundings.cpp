@@ -5,6 +5,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <atomic>
 #include <cerrno>
 #include <csignal>
@@ -54,12 +55,13 @@ void resolveNames(const std::vector<std::string*>& files) {
     }
 }
 
-/// The memory may hold what is nobody's business. Only the soft limit: a service that a command restarts can
-/// have its own again.
+/// The memory may hold what is nobody's business. No file is as small as one byte, and where cores go to a
+/// program the kernel passes over a limit of 0 but not over this one. Only the soft limit: a service that a
+/// command restarts can have its own again.
 void forbidCoreDumps() {
     rlimit limit{};
     if (getrlimit(RLIMIT_CORE, &limit) == 0) {
-        limit.rlim_cur = 0;
+        limit.rlim_cur = std::min<rlim_t>(1, limit.rlim_max);
         setrlimit(RLIMIT_CORE, &limit);
     }
 }

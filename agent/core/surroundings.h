@@ -15,8 +15,7 @@ void openStandardDescriptors();
 /// environment of a few variables, a PATH with the sbin directories behind what is there, "/" as the current
 /// directory, umask 022, children that can be waited for, no core dumps. To be called before any thread.
 /// @param files names that become absolute, as CORVISTA_DATA_DIR does: they are meant from where the program
-/// was
-///              started
+///              was started
 void prepareSurroundings(const std::vector<std::string*>& files);
 
 /// While it lives, the plug-in's commands complain to nobody: not each of them sends its own complaints away,

@@ -104,7 +104,7 @@ bool hasEnded(const Status& status) {
 /// Processes that belong together.
 struct Group {
     std::vector<pid_t> members;
-    std::function<bool(pid_t)> has;  ///< whether one does still: a number may be another's by now
+    std::function<bool(pid_t)> has;  ///< whether it still does: its number may be another's by now
 };
 
 /// Those that the kernel lists as a thread's children.
@@ -115,7 +115,7 @@ Group listedIn(const std::string& listing) {
             }};
 }
 
-/// Those of all processes that are so.
+/// Those processes of the host of which something is true.
 Group allThat(const std::function<bool(pid_t)>& are) {
     Group group{numbersIn("/proc/"), are};
     std::erase_if(group.members, [&are](pid_t id) { return !are(id); });

@@ -147,15 +147,40 @@ HOST_TEST(DataLock, CoversTheSavedSettingsOfAnAgentWithAnotherDirectory) {
     ASSERT_TRUE(watch.waitForOutput("published"));
     host.file(std::string(kFixed) + "/ifcfg-eth0", "BOOTPROTO=static\n");
     SuseHost suse(host);
-    std::vector<std::string> words = {"env", "CORVISTA_DATA_DIR=/var/other"};
-    const std::vector<std::string> cvagent = suse.commandLine({"tree"});
-    words.insert(words.end(), cvagent.begin(), cvagent.end());
-    const Finished second = host.run(words);
+    const Finished second = host.run(suse.commandLine({"tree"}, {"CORVISTA_DATA_DIR=/var/other"}));
     EXPECT_EQ(second.status, 5);
     EXPECT_THAT(second.err,
                 HasSubstr("another agent holds the data directory '/opt/vantrel/corvista/data/'"));
     EXPECT_THAT(second.err, HasSubstr("settings of interfaces are saved there"));
     EXPECT_EQ(host.read(std::string(kFixed) + "/ifcfg-eth0"), "BOOTPROTO=static\n");
+}
+
+// The listings in /tmp have one name for all agents of a user, and his are in the /tmp that everybody sees.
+TEST(DataLockOfUsers, CoversTheListingsOfAnAgentWithAnotherDirectory) {
+    const std::string home = "/tmp/cvagent-two-" + std::to_string(getpid());
+    makeForNobody(home);
+    const std::vector<std::string> tree = {"/usr/bin/env",   "CORVISTA_DATA_DIR=" + home + "/other",
+                                           CVAGENT_PROGRAM,  "--host-tools",
+                                           "native",         "--plugin",
+                                           FAKE_PLUGIN_FILE, "tree"};
+    const OnTerminal alone = runAsNobody(tree, home);
+    const std::string lockFile = home + "/.local/state/corvista/data/.lock";
+    const int lock = open(lockFile.c_str(), O_RDWR | O_CLOEXEC);
+    const bool isHeld = lock >= 0 && flock(lock, LOCK_EX | LOCK_NB) == 0;
+    const OnTerminal second = runAsNobody(tree, home);
+    // One that is not safe is nothing to hold.
+    std::filesystem::permissions(home + "/.local", std::filesystem::perms::all);
+    const OnTerminal unsafe = runAsNobody(tree, home);
+    close(lock);
+    std::filesystem::remove_all(home);
+    if (alone.status == 127 || alone.status == 126) {
+        GTEST_SKIP() << "the build tree is closed to other users";
+    }
+    EXPECT_EQ(alone.status, 0) << alone.output;
+    EXPECT_TRUE(isHeld);
+    EXPECT_EQ(second.status, 5) << second.output;
+    EXPECT_THAT(second.output, HasSubstr("files in /tmp have the same names whatever CORVISTA_DATA_DIR is"));
+    EXPECT_EQ(unsafe.status, 0) << unsafe.output;
 }
 
 HOST_TEST(DataLock, OfTheFixedDirectoryIsDoneWithoutWhereItCannotBeMade) {

@@ -41,10 +41,8 @@ HOST_TEST(TheProgram, ExportsPopenPcloseAndSystemAlone) {
 
 HOST_TEST(ThePlugin, FindsThemInTheProgram) {
     const SuseHost suse(host);
-    std::vector<std::string> line = {"env", "LD_DEBUG=bindings", "LD_DEBUG_OUTPUT=/bindings"};
-    const auto words = suse.commandLine({"tree"});
-    line.insert(line.end(), words.begin(), words.end());
-    RunningProgram tree = host.start(line);
+    RunningProgram tree =
+        host.start(suse.commandLine({"tree"}, {"LD_DEBUG=bindings", "LD_DEBUG_OUTPUT=/bindings"}));
     const std::string output = "/bindings." + std::to_string(tree.pid());
     ASSERT_TRUE(eventually([&] { return !host.calls().empty(); }));  // all is bound before
     const std::string bindings = host.read(output).value_or("");

@@ -6,8 +6,7 @@
 //   badstart, throwstart    initialize fails, throws
 //   throwstop, sevenstop    unload throws, throws what is no exception
 //   find                    initialize asks the agent for nodes by name, hands it a node of another make;
-//   asks once
-//                           more when the library is closed
+//                           asks once more when the library is closed
 //   manyerrors              initialize logs sixty different errors
 //   hangstart, hangstop     initialize, unload never return
 //   slowstop                unload takes a tenth of a second

@@ -1,20 +1,19 @@
 #pragma once
 
 #include <algorithm>
-#include <chrono>
 #include <string>
-#include <thread>
 #include <vector>
 
 #include "tests/agent/suse_host.h"
+#include "tests/support/waiting.h"
 
 /// A tool that never ends; its shell is not the process that waits.
 inline ToolAnswer hanging() {
     return {.out = "", .action = "sleep 1000"};
 }
 
-/// The words with which cvagent runs without the right to mount anything, as in many containers: its /tmp is the
-/// host's.
+/// The words with which cvagent runs without the right to mount anything, as in many containers: its /tmp is
+/// the host's.
 inline std::vector<std::string> withoutMounts(FakeHost& host, const std::vector<std::string>& words) {
     host.realTool("setpriv");
     std::vector<std::string> line = {"setpriv", "--bounding-set=-sys_admin"};
@@ -41,18 +40,6 @@ inline bool isRunning(const FakeHost& host, const std::string& program) {
         if (host.read("/proc/" + std::to_string(process) + "/cmdline").value_or("").starts_with(program)) {
             return true;
         }
-    }
-    return false;
-}
-
-/// Whether something comes true within ten seconds.
-template <class Condition>
-bool eventually(const Condition& condition) {
-    for (int i = 0; i < 1000; ++i) {
-        if (condition()) {
-            return true;
-        }
-        std::this_thread::sleep_for(std::chrono::milliseconds(10));
     }
     return false;
 }

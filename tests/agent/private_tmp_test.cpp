@@ -97,10 +97,8 @@ HOST_TEST(PrivateTmp, HasAPluginThatLiesInTmpItself) {
 HOST_TEST(PrivateTmp, HasTheToolsOfTheCallersPath) {
     SuseHost suse(host);
     host.file("/tmp/tools/hostname", "#!/bin/sh\necho from-tmp\n", 0755);
-    std::vector<std::string> words = {"env", "PATH=/tmp/tools:/tools:/usr/bin"};
-    const std::vector<std::string> cvagent = suse.commandLine({"tree"});
-    words.insert(words.end(), cvagent.begin(), cvagent.end());
-    EXPECT_THAT(host.run(words).out, HasSubstr("Computer: from-tmp"));
+    const Finished run = host.run(suse.commandLine({"tree"}, {"PATH=/tmp/tools:/tools:/usr/bin"}));
+    EXPECT_THAT(run.out, HasSubstr("Computer: from-tmp"));
 }
 
 HOST_TEST(PrivateTmp, SeesTheMountsThatTheHostMakesLater) {

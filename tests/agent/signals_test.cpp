@@ -227,6 +227,16 @@ HOST_TEST(ASignal, EndsAnIdleWatchInOrder) {
     }
 }
 
+HOST_TEST(ASignal, ArrivesAlsoWhereTheCallerHeldItBack) {
+    CvagentRun cvagent(host);
+    cvagent.telling("churn");
+    std::vector<std::string> words = cvagent.commandLine({"watch"});
+    words.insert(words.begin(), {"env", "--block-signal=INT,TERM,HUP,ALRM"});
+    RunningProgram watch = host.start(words);
+    ASSERT_TRUE(watch.waitForOutput("withdrawn"));
+    EXPECT_EQ(stop(watch, SIGTERM).status, 0);
+}
+
 HOST_TEST(ASignal, EndsAWatchWhosePluginDoesNotStop) {
     CvagentRun cvagent(host);
     cvagent.telling("churn hangstop");

@@ -1,15 +1,18 @@
 // What a stranger, or a careless caller, lays out around cvagent: directory, environment, PATH, umask,
 // descriptors.
 #include <gmock/gmock.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstdlib>
 #include <filesystem>
 #include <set>
 #include <sstream>
 
 #include "agent/core/environment.h"
+#include "agent/core/surroundings.h"
 #include "tests/agent/cvagent_run.h"
 #include "tests/agent/from_directory.h"
 #include "tests/agent/suse_host.h"
@@ -95,25 +98,12 @@ HOST_TEST(StartingDirectory, ThatIsGoneIsNeededForRelativeNamesAlone) {
 HOST_TEST(CallersEnvironment, ReachesCommandsOnlyAsFarAsTheyNeedIt) {
     SuseHost suse(host);
     tellFromWithin(host, "env");
-    std::vector<std::string> words = {"env",
-                                      "LD_LIBRARY_PATH=/home/stranger",
-                                      "LD_AUDIT=/home/stranger/spy.so",
-                                      "GREP_OPTIONS=--invert-match",
-                                      "GREP_COLORS=mt=01;31",
-                                      "POSIXLY_CORRECT=1",
-                                      "BASH_ENV=/home/stranger/run",
-                                      "ENV=/home/stranger/run",
-                                      "IFS=/",
-                                      "CDPATH=/home/stranger",
-                                      "BASH_FUNC_cat%%=() { touch /var/attacked; }",
-                                      "LANG=de_DE.UTF-8",
-                                      "LC_MESSAGES=de_DE.UTF-8",
-                                      "TZ=UTC",
-                                      "TERM=xterm",
-                                      "XDG_STATE_HOME=/home/me"};
-    const std::vector<std::string> cvagent = suse.commandLine({"tree"});
-    words.insert(words.end(), cvagent.begin(), cvagent.end());
-    const Finished run = host.run(words);
+    const Finished run = host.run(suse.commandLine(
+        {"tree"},
+        {"LD_LIBRARY_PATH=/home/stranger", "LD_AUDIT=/home/stranger/spy.so", "GREP_OPTIONS=--invert-match",
+         "GREP_COLORS=mt=01;31", "POSIXLY_CORRECT=1", "BASH_ENV=/home/stranger/run", "ENV=/home/stranger/run",
+         "IFS=/", "CDPATH=/home/stranger", "BASH_FUNC_cat%%=() { touch /var/attacked; }", "LANG=de_DE.UTF-8",
+         "LC_MESSAGES=de_DE.UTF-8", "TZ=UTC", "TERM=xterm", "XDG_STATE_HOME=/home/me"}));
     EXPECT_EQ(run.status, 0) << run.err;
     std::set<std::string> names;
     std::istringstream lines(told(host));
@@ -138,11 +128,8 @@ HOST_TEST(CallersPath, LeadsRootToNoProgramOfAStranger) {
     host.directory("/home/stranger/bin", 01777);
     host.directory("/srv/open", 0777);
     tellFromWithin(host, "echo $PATH");
-    std::vector<std::string> words = {
-        "env", "PATH=:.:bin:/home/stranger/bin:/srv/open/closed/bin:/nowhere:/tools:/usr/bin::"};
-    const std::vector<std::string> cvagent = suse.commandLine({"tree"});
-    words.insert(words.end(), cvagent.begin(), cvagent.end());
-    const Finished run = host.run(fromDirectory(kStrangers, words));
+    const std::string path = ":.:bin:/home/stranger/bin:/srv/open/closed/bin:/nowhere:/tools:/usr/bin::";
+    const Finished run = host.run(fromDirectory(kStrangers, suse.commandLine({"tree"}, {"PATH=" + path})));
     EXPECT_EQ(run.status, 0) << run.err;
     EXPECT_EQ(told(host), "/tools:/usr/bin:/usr/local/sbin:/usr/sbin:/sbin:/bin\n");
     EXPECT_FALSE(host.exists("/var/attacked"));
@@ -156,10 +143,13 @@ TEST(CallersPathOfUsers, LeadsRootToNoDirectoryOfSomebodyElse) {
     const std::string way = "/tmp/cvagent-path-" + std::to_string(getpid());
     std::filesystem::create_directories(way + "/bin");
     ASSERT_EQ(chown(way.c_str(), 65533, 65533), 0);
+    // He can have it lead elsewhere when it has been looked at.
+    std::filesystem::create_directory_symlink("/usr/lib", way + "/link");
     const auto reduced = [&way] {
-        setenv("PATH", (way + "/bin:" + way + ":/usr/bin").c_str(), 1);
+        setenv("PATH", (way + "/bin:" + way + ":" + way + "/link:/usr/bin").c_str(), 1);
         cvagent::reduceEnvironment();
-        _exit(std::string(std::getenv("PATH")) == "/usr/bin:/usr/local/sbin:/usr/sbin:/sbin:/bin" ? 0 : 1);
+        const std::string path = std::getenv("PATH");
+        _exit(path == "/usr/lib:/usr/bin:/usr/local/sbin:/usr/sbin:/sbin:/bin" ? 0 : 1);
     };
     EXPECT_EXIT(reduced(), testing::ExitedWithCode(0), "");
     std::filesystem::remove_all(way);
@@ -182,6 +172,14 @@ HOST_TEST(CallersLimits, LeaveNoCoreWithWhatTheProgramKnows) {
         host.run(fromDirectory("/", suse.commandLine({"tree"}), "ulimit -H -c 8 && ulimit -S -c 8"));
     EXPECT_EQ(run.status, 0) << run.err;
     EXPECT_EQ(told(host), "0\n8\n") << "a service that a command restarts can raise it again";
+}
+
+// A limit of 0 is passed over where the kernel hands cores to a program.
+HOST_TEST(CallersLimits, KeepACoreFromAProgramThatCollectsThem) {
+    cvagent::prepareSurroundings({});
+    rlimit limit{};
+    ASSERT_EQ(getrlimit(RLIMIT_CORE, &limit), 0);
+    EXPECT_EQ(limit.rlim_cur, std::min<rlim_t>(1, limit.rlim_max));
 }
 
 HOST_TEST(ClosedDescriptors, NoFileTakesTheirPlace) {

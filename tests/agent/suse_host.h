@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <set>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "tests/support/fake_host.h"
@@ -31,9 +32,15 @@ public:
         host_.clearCalls();
         return host_.run(commandLine(words));
     }
-    std::vector<std::string> commandLine(const std::vector<std::string>& words) const {
-        std::vector<std::string> line = {CVAGENT_PROGRAM, "--host-tools", "native", "--plugin",
-                                         CORVISTA_PLUGIN_FILE};
+    /// @param variables for its environment, as NAME=VALUE
+    std::vector<std::string> commandLine(const std::vector<std::string>& words,
+                                         std::vector<std::string> variables = {}) const {
+        std::vector<std::string> line = std::move(variables);
+        if (!line.empty()) {
+            line.insert(line.begin(), "env");
+        }
+        line.insert(line.end(),
+                    {CVAGENT_PROGRAM, "--host-tools", "native", "--plugin", CORVISTA_PLUGIN_FILE});
         line.insert(line.end(), words.begin(), words.end());
         return line;
     }

@@ -13,10 +13,10 @@ struct OnTerminal {
 /// @param typed what is typed right away
 OnTerminal runOnTerminal(const std::vector<std::string>& words, const std::string& typed);
 
-/// Makes a directory that belongs to that user.
-void makeForNobody(const std::string& directory);
-/// Runs a program on such a terminal and sends it a signal once it has printed a text.
+/// The same, but nothing is typed: a signal is sent once the program has printed a text.
 OnTerminal stopOnTerminal(const std::vector<std::string>& words, const std::string& awaited, int signal);
 
 /// Runs a program as a user without rights, whose home is `home`. Output and errors come together.
 OnTerminal runAsNobody(const std::vector<std::string>& words, const std::string& home);
+/// Makes a directory that belongs to that user.
+void makeForNobody(const std::string& directory);

@@ -18,6 +18,7 @@ corvista_test(agent LIBRARIES agent_cli agent_core test_support util SOURCES
   agent/event_program_test.cpp
   agent/host_tools_test.cpp
   agent/json_test.cpp
+  agent/owners_test.cpp
   agent/print_test.cpp
   agent/read_commands_test.cpp
   agent/data_directory_test.cpp

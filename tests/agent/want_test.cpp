@@ -39,16 +39,15 @@ HOST_TEST(FewDescriptors, ThatAreEnoughAreNotTold) {
     EXPECT_THAT(run.err, IsEmpty());
 }
 
-std::vector<std::string> cannotStart(const std::string& what, const std::vector<std::string>& words) {
-    std::vector<std::string> line = {"env", "LD_PRELOAD=" FEW_PROCESSES_LIBRARY,
-                                     "CORVISTA_FEW_PROCESSES=" + what};
-    line.insert(line.end(), words.begin(), words.end());
-    return line;
+/// cvagent tree where the system gives no more of something.
+std::vector<std::string> treeWithout(const SuseHost& suse, const std::string& what) {
+    return suse.commandLine({"tree"},
+                            {"LD_PRELOAD=" FEW_PROCESSES_LIBRARY, "CORVISTA_FEW_PROCESSES=" + what});
 }
 
 HOST_TEST(FewProcesses, CommandsThatCannotBeStartedAreCounted) {
     const SuseHost suse(host);
-    const Finished run = host.run(cannotStart("commands", suse.commandLine({"tree"})));
+    const Finished run = host.run(treeWithout(suse, "commands"));
     EXPECT_EQ(run.status, 1);
     EXPECT_THAT(run.err,
                 // Processors are found without a process.
@@ -61,7 +60,7 @@ HOST_TEST(FewProcesses, CommandsThatCannotBeStartedAreCounted) {
 
 HOST_TEST(FewProcesses, ThreadsThatCannotBeStartedAreTold) {
     const SuseHost suse(host);
-    const Finished run = host.run(cannotStart("threads", suse.commandLine({"tree"})));
+    const Finished run = host.run(treeWithout(suse, "threads"));
     EXPECT_EQ(run.status, 1);
     EXPECT_THAT(run.out, HasSubstr("network-port:eth0"));
     EXPECT_THAT(run.err, HasSubstr("NetworkMonitor thread failed."));

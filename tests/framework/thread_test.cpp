@@ -429,65 +429,56 @@ TEST(ThreadAbort, KillsACommandAndEverythingItStarted) {
     expectKilled(kPipeline, 5);
 }
 
-TEST(ThreadAbort, EndsCommandsThatAreStartedAfterIt) {
+/// A thread that starts commands which never end, one after the other, once it is told to.
+struct Stubborn {
+    explicit Stubborn(int count)
+        : worker([this, count] {
+              while (!go) {
+                  std::this_thread::yield();
+              }
+              for (; ended < count; ++ended) {
+                  reader.read("sleep 1000");
+              }
+          }) {
+        worker.start(nullptr);
+    }
+
     Reader reader;
-    std::atomic<bool> aborted = false;
-    std::atomic<int> commands = 0;
-    Worker worker([&] {
-        while (!aborted) {
-            std::this_thread::yield();
-        }
-        for (; commands < 3; ++commands) {
-            reader.read("sleep 1000");
-        }
-    });
-    worker.start(nullptr);
-    worker.abort();
-    aborted = true;
-    worker.join();
-    EXPECT_EQ(commands, 3);
+    std::atomic<bool> go = false;
+    std::atomic<int> ended = 0;  ///< commands
+    Worker worker;
+};
+
+TEST(ThreadAbort, EndsCommandsThatAreStartedAfterIt) {
+    Stubborn stubborn(3);
+    stubborn.worker.abort();
+    stubborn.go = true;
+    stubborn.worker.join();
+    EXPECT_EQ(stubborn.ended, 3);
 }
 
 TEST(ThreadAbort, IsRepeatedUntilTheThreadHasEndedThoughNobodyWaitsForIt) {
-    Reader reader;
-    std::atomic<bool> aborted = false;
-    std::atomic<int> commands = 0;
-    Worker worker([&] {
-        while (!aborted) {
-            std::this_thread::yield();
-        }
-        for (; commands < 2; ++commands) {
-            reader.read("sleep 1000");
-        }
-    });
-    worker.start(nullptr);
-    worker.abort();
-    worker.abort();
-    aborted = true;
-    EXPECT_TRUE(soon([&] { return commands == 2; }));
+    Stubborn stubborn(2);
+    stubborn.worker.abort();
+    stubborn.worker.abort();
+    stubborn.go = true;
+    EXPECT_TRUE(soon([&] { return stubborn.ended == 2; }));
 }
 
 TEST(ThreadAbort, IsRepeatedByTheJoinWhereNoThreadIsLeftForIt) {
-    Reader reader;
-    std::atomic<bool> aborted = false;
-    Worker worker([&] {
-        while (!aborted) {
-            std::this_thread::yield();
-        }
-        reader.read("sleep 1000");
-    });
-    worker.start(nullptr);
+    Stubborn stubborn(1);
     {
         const NoThreads none;
-        EXPECT_NO_THROW(worker.abort());
+        EXPECT_NO_THROW(stubborn.worker.abort());
     }
-    aborted = true;
-    std::this_thread::sleep_for(20ms);
-    worker.join();
+    stubborn.go = true;
+    stubborn.worker.join();
+    EXPECT_EQ(stubborn.ended, 1);
 }
 
 TEST(ThreadAbort, IsKnownInTheThreadAlone) {
-    std::atomic<int> answers = 0;
+    constexpr int kNone = -1;
+    std::atomic<int> answers = kNone;
     Worker worker([&] {
         answers = QX::Thread::isAborted() ? 1 : 0;
         QX::Thread::sleep(kLong);
@@ -496,8 +487,9 @@ TEST(ThreadAbort, IsKnownInTheThreadAlone) {
     worker.start(nullptr);
     worker.join();
     EXPECT_EQ(answers, 2);
+    answers = kNone;
     worker.start(nullptr);
-    std::this_thread::sleep_for(20ms);
+    ASSERT_TRUE(soon([&] { return answers != kNone; }));
     worker.abort();
     EXPECT_FALSE(QX::Thread::isAborted());
     worker.join();

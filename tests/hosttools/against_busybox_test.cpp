@@ -241,15 +241,15 @@ protected:
         }
     };
 
-    /// @param prefix stands in front of the tools' names
+    /// @param by gives the command line that does what a tool's own does
     /// @return what is left, without the counters and the carrier, which settle when they like
-    static Result changed(const std::string& prefix, const std::string& commands) {
+    static Result changed(std::string (*by)(const std::string&), const std::string& commands) {
         const NetworkNamespace network;
         EXPECT_EQ(network.shell(std::string("set -e\n") + kStart).status, 0);
         std::istringstream lines(commands);
         Result result;
         for (std::string line; std::getline(lines, line, ';');) {
-            const Outcome outcome = network.shell(prefix + line);
+            const Outcome outcome = network.shell(by(line));
             result.statuses += std::to_string(outcome.status) + "\n";
             result.errors += outcome.errors;
         }
@@ -264,7 +264,8 @@ protected:
 };
 
 TEST_P(ChangesAgainstBusybox, LeaveTheSameBehind) {
-    EXPECT_EQ(changed(adapter(""), GetParam()), changed("busybox ", GetParam()));
+    const auto busybox = [](const std::string& command) { return "busybox " + command; };
+    EXPECT_EQ(changed(adapter, GetParam()), changed(busybox, GetParam()));
 }
 
 INSTANTIATE_TEST_SUITE_P(
@@ -303,7 +304,7 @@ TEST_F(AgainstBusybox, UnreadableChangesChangeNothing) {
           "route -A inet6 add default gw 10.0.0.9", "route -A ipx -n", "route -A", "route change default",
           "route -n extra", "route add default gw", "route add default metric x v0",
           "route del default v0 v1"}) {
-        const Outcome outcome = network().shell(adapter("") + words);
+        const Outcome outcome = network().shell(adapter(words));
         EXPECT_EQ(outcome.status, 1) << words;
         EXPECT_EQ(outcome.output, "") << words;
         EXPECT_NE(outcome.errors, "") << words;
@@ -314,7 +315,7 @@ TEST_F(AgainstBusybox, UnreadableChangesChangeNothing) {
 TEST_F(AgainstBusybox, FamiliesOfRouteListings) {
     setUp("ip link add v0 type veth peer name v1\nip link set v0 up");
     const auto listing = [&](const std::string& words) {
-        return network().shell(adapter("route ") + words).output;
+        return network().shell(adapter("route " + words)).output;
     };
     EXPECT_EQ(listing("-6 -n"), listing("-A inet6 -n"));
     EXPECT_EQ(listing("-n -A inet6"), listing("-A inet6 -n"));

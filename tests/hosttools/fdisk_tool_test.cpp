@@ -93,22 +93,20 @@ TEST(Tools, SayWhyTheyCannotAskTheKernel) {
 }
 
 TEST(Program, TellsItsToolsAndVersion) {
-    const std::string program = adapter("../corvista-hosttools");
-    EXPECT_THAT(run({program, "--help"}).output, HasSubstr("fdisk -l"));
-    EXPECT_THAT(run({program, "--version"}).output, testing::StartsWith("corvista-hosttools "));
-    EXPECT_EQ(run({program, "fdisk", "-l"}).status, 0);
+    EXPECT_THAT(run({HOSTTOOLS_PROGRAM, "--help"}).output, HasSubstr("fdisk -l"));
+    EXPECT_THAT(run({HOSTTOOLS_PROGRAM, "--version"}).output, testing::StartsWith("corvista-hosttools "));
+    EXPECT_EQ(run({HOSTTOOLS_PROGRAM, "fdisk", "-l"}).status, 0);
 }
 
 TEST(Program, RefusesUnknownTools) {
-    const std::string program = adapter("../corvista-hosttools");
-    EXPECT_EQ(run({program}).errors, "corvista-hosttools: which tool? Try --help\n");
-    const Outcome outcome = run({program, "mount"});
+    EXPECT_EQ(run({HOSTTOOLS_PROGRAM}).errors, "corvista-hosttools: which tool? Try --help\n");
+    const Outcome outcome = run({HOSTTOOLS_PROGRAM, "mount"});
     EXPECT_EQ(outcome.status, 1);
     EXPECT_EQ(outcome.errors, "corvista-hosttools: no such tool: mount. Try --help\n");
 }
 
 TEST(Program, FailsWhenItsOutputGoesNowhere) {
-    EXPECT_EQ(shell(adapter("../corvista-hosttools") + " --help >/dev/full").status, 1);
+    EXPECT_EQ(shell(HOSTTOOLS_PROGRAM " --help >/dev/full").status, 1);
 }
 
 }  // namespace

@@ -69,8 +69,8 @@ Outcome shell(const std::string& command) {
     return run({"/bin/sh", "-c", command});
 }
 
-std::string adapter(const std::string& name) {
-    return HOSTTOOLS_BIN "/" + name;
+std::string adapter(const std::string& command) {
+    return HOSTTOOLS_ADAPTERS "/" + command.substr(0, command.find(' ')) + "/" + command;
 }
 
 bool hasProgram(const std::string& name) {

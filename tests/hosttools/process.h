@@ -18,7 +18,7 @@ using Words = std::vector<std::string>;
 Outcome run(const Words& words, const std::function<void()>& before = {});
 /// Runs a shell command line.
 Outcome shell(const std::string& command);
-/// The path of one of the adapters, by its link.
-std::string adapter(const std::string& name);
+/// A command of one of the adapters, or its name alone, with the path of the adapter's link.
+std::string adapter(const std::string& command);
 /// @return whether PATH leads to such a program
 bool hasProgram(const std::string& name);

@@ -15,7 +15,8 @@ corvista_test(hosttools LIBRARIES hosttools SOURCES
   hosttools/route_listing_test.cpp
   hosttools/text_test.cpp)
 target_compile_definitions(hosttools_test PRIVATE
-  HOSTTOOLS_BIN="$<TARGET_FILE_DIR:corvista-hosttools>/bin" HOSTTOOLS_RECORDINGS="${CMAKE_CURRENT_LIST_DIR}")
+  HOSTTOOLS_PROGRAM="$<TARGET_FILE:corvista-hosttools>"
+  HOSTTOOLS_ADAPTERS="$<TARGET_FILE_DIR:corvista-hosttools>/adapters" HOSTTOOLS_RECORDINGS="${CMAKE_CURRENT_LIST_DIR}")
 add_dependencies(hosttools_test corvista-hosttools)
 # The kernel's header of interfaces and the C library's do not go together.
 set_source_files_properties(hosttools/ifconfig_listing_test.cpp PROPERTIES SKIP_UNITY_BUILD_INCLUSION ON)

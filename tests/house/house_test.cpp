@@ -211,4 +211,50 @@ TEST(House, EveryPlantedDefectFitsItsFile) {
     EXPECT_GE(count, 125U);
 }
 
+/// Every "Suite.Name" of the tests.
+std::set<std::string> namesOfTests() {
+    static const std::regex test(R"((?:HOST_)?TEST(?:_F|_P)?\(\s*(\w+),\s*(\w+)\))");
+    std::set<std::string> names;
+    for (const auto& entry : fs::recursive_directory_iterator(kTree / "tests")) {
+        if (entry.path().extension() == ".cpp") {
+            const std::string text = content(entry.path());
+            for (std::sregex_iterator at(text.begin(), text.end(), test), end; at != end; ++at) {
+                names.insert((*at)[1].str() + '.' + (*at)[2].str());
+            }
+        }
+    }
+    return names;
+}
+
+/// Whether a row's last column names something that is there, be it the tests of the row above.
+void expectNamesTests(const std::string& column, const std::set<std::string>& tests) {
+    static const std::regex quoted("`([^`]+)`");
+    bool any = column.find("the same") != column.npos;
+    for (std::sregex_iterator at(column.begin(), column.end(), quoted), end; at != end; ++at) {
+        const std::string name = (*at)[1];
+        any = true;
+        if (name.ends_with(".*")) {
+            const std::string suite = name.substr(0, name.size() - 1);
+            const auto first = tests.lower_bound(suite);
+            EXPECT_TRUE(first != tests.end() && first->starts_with(suite)) << name;
+        } else {
+            EXPECT_TRUE(tests.contains(name) || fs::exists(kTree / name)) << name;
+        }
+    }
+    EXPECT_TRUE(any) << column;
+}
+
+TEST(House, EveryAttackThatThePageOnSecurityNamesIsPlayed) {
+    const std::set<std::string> tests = namesOfTests();
+    std::size_t rows = 0;
+    for (const std::string& line : lines(kTree / "docs/security.md")) {
+        if (line.starts_with("|") && line != "|---|---|---|" && !line.ends_with("| Test |")) {
+            const std::string row = line.substr(0, line.size() - 1);
+            expectNamesTests(row.substr(row.rfind('|')), tests);
+            ++rows;
+        }
+    }
+    EXPECT_GT(rows, 40U);
+}
+
 }  // namespace

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "framework/ic/mutable_node.h"
@@ -21,17 +22,18 @@ public:
     void is(unsigned int state) { MutableNode::setProperty(123, {IC::Number(state), true}); }
 };
 
-/// An interface that is asked by a command; somebody ends that by force when `hangs`.
+/// An interface that is asked by a command; somebody ends that by force when `hangs`, or the next one.
 class AskedNode : public InterfaceNode {
 public:
     using InterfaceNode::InterfaceNode;
     IC::Error getProperty(unsigned int id, IC::PropertyValue& value) const override {
-        if (hangs && id == 123) {
+        if (id == 123 && (hangs || std::exchange(hangsOnce, false))) {
             const IC::HostCommand command("kill -KILL $$");
         }
         return MutableNode::getProperty(id, value);
     }
     bool hangs = false;
+    mutable bool hangsOnce = false;
 };
 
 /// The plug-in object with interfaces of the test's own and no monitor.

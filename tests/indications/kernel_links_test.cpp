@@ -27,7 +27,8 @@ public:
         host.directory("/opt/vantrel/corvista/data");
         for (const std::string tool : {"ifconfig", "route"}) {
             host.tool(tool + " %any",
-                      {.out = "", .action = buildDirectory() + "/hosttools/corvista-hosttools " + tool + " \"$@\""});
+                      {.out = "",
+                       .action = buildDirectory() + "/hosttools/corvista-hosttools " + tool + " \"$@\""});
         }
         // The far ends have names that the listing of the interfaces passes over.
         for (const std::string number : {"0", "1"}) {

@@ -33,6 +33,11 @@ public:
         interfaces.mi().createCurNetNodeMap();
         return interfaces.current().at("bond0");
     }
+    /// As writing and reading the file does it.
+    void nextPass() {
+        interfaces.previous() = interfaces.current();
+        IC::OSHWMI_IND::pass().slaves.clear();
+    }
 
     Interfaces interfaces;
     InterfaceNode& eth0;
@@ -183,24 +188,68 @@ HOST_TEST(LinkStates, GiveNoVerdictWhenTheMembersCannotBeAsked) {
                 TextsAre("OsHwMI::bondedNetNodeStatus - grepping slave device error"));
 }
 
-HOST_TEST(LinkStates, OfABondStayWhenACommandOfAMemberWasEnded) {
+/// A tool by which somebody ends the shell that runs it.
+constexpr char kKillsItsShell[] = "read -r _ _ _ shell _ < /proc/$PPID/stat; kill -KILL $shell";
+
+HOST_TEST(LinkStates, OfABondStayWithThoseOfItsMembersWhenACommandOfOneWasEnded) {
     Bond bond(host, {{"eth0", 1}, {"eth1", 1}, {"eth5", 1}, {"bond0", 33}});
     host.file("/proc/net/bonding/bond0", "Slave Interface: eth5\nSlave Interface: eth0\n");
     auto& member = bond.interfaces.add<AskedNode>("eth5", 12);
     member.hangs = true;
     bond.eth0.is(12);
+    bond.eth1.is(12);
     EXPECT_EQ(bond.state(), 33U);
     EXPECT_THAT(bond.interfaces.current(),
-                ElementsAre(Pair("bond0", 33), Pair("eth0", 12), Pair("eth1", 1), Pair("eth5", 1)));
+                ElementsAre(Pair("bond0", 33), Pair("eth0", 1), Pair("eth1", 12), Pair("eth5", 1)));
     member.hangs = false;
+    member.is(1);
+    bond.nextPass();
+    EXPECT_EQ(bond.state(), 32U) << "eth0's going down is told as soon as it can be";
+    EXPECT_EQ(bond.interfaces.current().at("eth0"), 12U);
+}
+
+HOST_TEST(LinkStates, OfAMemberStayWhereItWasEndedForItsBondAlone) {
+    Bond bond(host, {{"eth1", 1}, {"eth5", 1}, {"bond0", 1}});
+    host.file("/proc/net/bonding/bond0", "Slave Interface: eth5\n");
+    bond.interfaces.add<AskedNode>("eth5", 12).hangsOnce = true;
+    EXPECT_EQ(bond.state(), 1U);
+    EXPECT_EQ(bond.interfaces.current().at("eth5"), 1U);
+    bond.nextPass();
     EXPECT_EQ(bond.state(), 32U);
+}
+
+HOST_TEST(LinkStates, OfMembersRaiseNoAlertWhenTheirBondDoesNotTellOfThem) {
+    Bond bond(host, {{"eth0", 1}, {"eth1", 1}, {"bond0", 1}, {"eth7", 1}});
+    bond.interfaces.add("eth7", 12);
+    const std::string listed = "Slave Interface: eth0\nSlave Interface: eth1\n";
+    host.toolInTurn("grep %any", {{.out = listed}, {.out = "", .action = kKillsItsShell}, {.out = listed}});
+    EXPECT_EQ(bond.state(), 1U);
+    bond.nextPass();
+    bond.eth0.is(12);
+    EXPECT_EQ(bond.state(), 1U);
+    EXPECT_THAT(IC::OSHWMI_IND::pass().slaves, TextsAre("eth0", "eth1"));
+    EXPECT_EQ(bond.interfaces.current().at("eth0"), 1U);
+    EXPECT_EQ(bond.interfaces.current().at("eth7"), 12U);
+    bond.nextPass();
+    EXPECT_EQ(bond.state(), 32U);
+}
+
+HOST_TEST(LinkStates, OfMembersRaiseNoAlertWhenTheirBondItselfCannotBeRead) {
+    Bond bond(host, {{"eth1", 1}, {"eth0", 1}, {"bond7", 12}});
+    host.file("/proc/net/bonding/bond7", "Slave Interface: eth1\n");
+    auto& hanging = bond.interfaces.add<AskedNode>("bond7", 1);
+    hanging.setProperty(123, {"not a number", true});
+    hanging.hangs = true;
+    bond.eth1.is(12);
+    bond.state();
+    EXPECT_THAT(IC::OSHWMI_IND::pass().slaves, testing::Contains("eth1"));
+    EXPECT_EQ(bond.interfaces.current().at("bond7"), 12U);
+    EXPECT_EQ(bond.interfaces.current().at("eth1"), 1U);
 }
 
 HOST_TEST(LinkStates, OfABondStayWhenItsMembersAreNotTold) {
     Bond bond(host, {{"eth0", 1}, {"eth1", 1}, {"bond0", 32}});
-    host.tool("grep %any", ToolAnswer{.out = "",
-                                      .action = "read -r _ _ _ shell _ < /proc/$PPID/stat; "
-                                                "kill -KILL $shell"});
+    host.tool("grep %any", ToolAnswer{.out = "", .action = kKillsItsShell});
     EXPECT_EQ(bond.state(), 32U);
 }
 

@@ -5,7 +5,6 @@
 #include <algorithm>
 #include <atomic>
 #include <chrono>
-#include <filesystem>
 #include <mutex>
 #include <optional>
 #include <thread>
@@ -17,6 +16,7 @@
 #include "tests/support/log_capture.h"
 #include "tests/support/no_threads.h"
 #include "tests/support/texts_are.h"
+#include "tests/support/waiting.h"
 
 namespace {
 
@@ -24,18 +24,6 @@ using namespace std::chrono_literals;
 using testing::Contains;
 
 constexpr char kFile[] = "/opt/vantrel/corvista/data/oshwminetind.dat";
-
-/// Waits until something holds; false when it does not within ten seconds.
-template <class Condition>
-bool eventually(Condition holds) {
-    for (int i = 0; i < 1000; ++i) {
-        if (holds()) {
-            return true;
-        }
-        std::this_thread::sleep_for(10ms);
-    }
-    return false;
-}
 
 /// An interface that answers late, and not for want of a command.
 class SlowNode : public IC::MutableNode {
@@ -227,14 +215,9 @@ struct Stuck {
     }
 };
 
-std::size_t threads() {
-    const std::filesystem::directory_iterator tasks("/proc/self/task");
-    return static_cast<std::size_t>(std::distance(begin(tasks), end(tasks)));
-}
-
 HOST_TEST(NetworkMonitor, IsLeftWhenACallbackHangsForEver) {
     std::thread([] {}).join();  // what a sanitizer starts beside the first thread of a process
-    const std::size_t before = threads();
+    const std::size_t before = runningThreads();
     host.file(kFile, "eth0=12\neth1=12\n");
     Stuck stuck;
     LogCapture capture;
@@ -267,7 +250,7 @@ HOST_TEST(NetworkMonitor, IsLeftWhenACallbackHangsForEver) {
         })) << "the first pass is over";
         const auto lines = capture.messages().size();
         stuck.go = true;
-        EXPECT_TRUE(eventually([&] { return threads() == before + 1; }));
+        EXPECT_TRUE(eventually([&] { return runningThreads() == before + 1; }));
         EXPECT_EQ(stuck.calls, 1) << "the agent was told of a stop: no alert comes after it";
         EXPECT_EQ(capture.messages().size(), lines) << "and no line";
         EXPECT_EQ(host.read(kFile), "eth0=12\neth1=12\n");
@@ -300,7 +283,7 @@ IC::Error stopAll(const std::vector<IC::Alert>&, const void* context) {
 
 HOST_TEST(NetworkMonitor, MayBeStoppedByTheCallbackThatItCalls) {
     std::thread([] {}).join();
-    const std::size_t before = threads();
+    const std::size_t before = runningThreads();
     host.file(kFile, "eth0=12\neth1=12\n");
     host.file("/tmp/fdisk_tmp", "");
     Interfaces interfaces;
@@ -310,7 +293,7 @@ HOST_TEST(NetworkMonitor, MayBeStoppedByTheCallbackThatItCalls) {
     interfaces.mi().registerForAlerts(stopAll, &calls);
     const auto start = std::chrono::steady_clock::now();
     interfaces.mi().enableIndications();
-    ASSERT_TRUE(eventually([&] { return calls == 1 && threads() == before; }));
+    ASSERT_TRUE(eventually([&] { return calls == 1 && runningThreads() == before; }));
     EXPECT_LT(std::chrono::steady_clock::now() - start, 5s) << "it does not wait for itself";
     EXPECT_EQ(calls, 1);
     EXPECT_EQ(host.read(kFile), "eth0=12\neth1=12\n") << "of the second change nobody was told";

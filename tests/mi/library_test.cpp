@@ -7,16 +7,15 @@
 #include <atomic>
 #include <chrono>
 #include <cstdio>
-#include <filesystem>
-#include <functional>
 #include <memory>
-#include <sstream>
+#include <stdexcept>
 #include <thread>
 
 #include "framework/ic/management_interface.h"
 #include "framework/qx/thread.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/texts_are.h"
+#include "tests/support/waiting.h"
 
 namespace {
 
@@ -59,10 +58,19 @@ TEST(Library, NeedsTheFrameworkAndTheLanguageRuntimeAlone) {
 
 using Entry = int (*)(IC::ManagementInterface**, IC::Error**);
 
-std::size_t threads() {
-    const std::filesystem::directory_iterator tasks("/proc/self/task");
-    return static_cast<std::size_t>(std::distance(begin(tasks), end(tasks)));
-}
+/// The plug-in as an agent opens it.
+struct Opened {
+    Opened() {
+        if (library == nullptr) {
+            throw std::runtime_error(dlerror());
+        }
+        reinterpret_cast<Entry>(dlsym(library, "OpenMI"))(&interface, &error);
+    }
+
+    void* library = dlopen(kPlugin.c_str(), RTLD_NOW | RTLD_LOCAL);
+    IC::ManagementInterface* interface = nullptr;
+    IC::Error* error = nullptr;
+};
 
 bool isLoaded() {
     void* library = dlopen(kPlugin.c_str(), RTLD_NOW | RTLD_NOLOAD);
@@ -74,31 +82,23 @@ bool isLoaded() {
 
 HOST_TEST(Library, ClosedWithoutAnUnloadLeavesNoThreadInCodeThatIsGone) {
     std::thread([] {}).join();  // what a sanitizer starts beside the first thread of a process
-    const std::size_t before = threads();
-    void* library = dlopen(kPlugin.c_str(), RTLD_NOW | RTLD_LOCAL);
-    ASSERT_NE(library, nullptr) << dlerror();
-    IC::ManagementInterface* interface = nullptr;
-    IC::Error* error = nullptr;
-    reinterpret_cast<Entry>(dlsym(library, "OpenMI"))(&interface, &error);
-    interface->initialize(1, IC::Number(1U), IC::Number(2U));
-    EXPECT_EQ(threads(), before + 2) << "the two monitors";
-    dlclose(library);
+    const std::size_t before = runningThreads();
+    const Opened plugin;
+    plugin.interface->initialize(1, IC::Number(1U), IC::Number(2U));
+    EXPECT_EQ(runningThreads(), before + 2) << "the two monitors";
+    dlclose(plugin.library);
     EXPECT_FALSE(isLoaded());
-    EXPECT_EQ(threads(), before);
+    EXPECT_EQ(runningThreads(), before);
 }
 
 HOST_TEST(Library, OpenedAgainStartsAsItDidTheFirstTime) {
     for (int time = 0; time < 2; ++time) {
-        void* library = dlopen(kPlugin.c_str(), RTLD_NOW | RTLD_LOCAL);
-        ASSERT_NE(library, nullptr) << dlerror();
-        IC::ManagementInterface* interface = nullptr;
-        IC::Error* error = nullptr;
-        reinterpret_cast<Entry>(dlsym(library, "OpenMI"))(&interface, &error);
-        EXPECT_TRUE(interface->holdAll().empty());
-        EXPECT_EQ(interface->initialize(1, IC::Number(1U), IC::Number(2U)).getStatus(), 0);
-        EXPECT_EQ(interface->holdAll().size(), 7U);
-        EXPECT_EQ(interface->unload().getStatus(), 0);
-        dlclose(library);
+        const Opened plugin;
+        EXPECT_TRUE(plugin.interface->holdAll().empty());
+        EXPECT_EQ(plugin.interface->initialize(1, IC::Number(1U), IC::Number(2U)).getStatus(), 0);
+        EXPECT_EQ(plugin.interface->holdAll().size(), 7U);
+        EXPECT_EQ(plugin.interface->unload().getStatus(), 0);
+        dlclose(plugin.library);
         ASSERT_FALSE(isLoaded());
     }
 }
@@ -118,34 +118,23 @@ struct Stuck {
     }
 };
 
-bool eventually(const std::function<bool()>& holds) {
-    for (int i = 0; i < 1000 && !holds(); ++i) {
-        std::this_thread::sleep_for(std::chrono::milliseconds(10));
-    }
-    return holds();
-}
-
 HOST_TEST(Library, StaysMappedAsLongAsACallbackHangs) {
     host.copyTree("suse-two-nics");
     host.file("/opt/vantrel/corvista/data/oshwminetind.dat", "eth0=12\n");
     std::thread([] {}).join();
-    const std::size_t before = threads();
-    void* library = dlopen(kPlugin.c_str(), RTLD_NOW | RTLD_LOCAL);
-    ASSERT_NE(library, nullptr) << dlerror();
-    IC::ManagementInterface* interface = nullptr;
-    IC::Error* error = nullptr;
-    reinterpret_cast<Entry>(dlsym(library, "OpenMI"))(&interface, &error);
+    const std::size_t before = runningThreads();
+    const Opened plugin;
     Stuck stuck;
-    interface->registerForAlerts(Stuck::hear, &stuck);
-    interface->initialize(1, IC::Number(1U), IC::Number(2U));
+    plugin.interface->registerForAlerts(Stuck::hear, &stuck);
+    plugin.interface->initialize(1, IC::Number(1U), IC::Number(2U));
     ASSERT_TRUE(eventually([&] { return stuck.called.load(); }));
     QX::setClockSpeed(100);  // eleven seconds pass in 110 ms
-    EXPECT_EQ(interface->unload().getStatus(), 0);
-    EXPECT_EQ(dlclose(library), 0);
+    EXPECT_EQ(plugin.interface->unload().getStatus(), 0);
+    EXPECT_EQ(dlclose(plugin.library), 0);
     EXPECT_TRUE(isLoaded());
-    EXPECT_EQ(threads(), before + 2) << "the one that hangs, and the one that looks for its commands";
+    EXPECT_EQ(runningThreads(), before + 2) << "the one that hangs, and the one that looks for its commands";
     stuck.go = true;
-    EXPECT_TRUE(eventually([&] { return threads() == before; }));
+    EXPECT_TRUE(eventually([&] { return runningThreads() == before; }));
 }
 
 TEST(Library, HandsOutTheSameTwoAddressesEveryTime) {

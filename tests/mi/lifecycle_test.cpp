@@ -386,7 +386,7 @@ HOST_TEST(Lifecycle, WithdrawsTheNextNodeAlsoWhenTheAgentThrowsAtOne) {
     IC::myoshwmi.unload();
 }
 
-HOST_TEST(Lifecycle, WaitsForAWalkThatIsUnderWayBeforeItFreesTheNodes) {
+HOST_TEST(Lifecycle, WaitsForAWalkThatIsUnderWayBeforeItEmptiesTheTree) {
     host.toolInTurn("brctl show", {{""}, {""}, {"", 0, "", 1000}});  // start-up asks twice
     initialize(IC::myoshwmi);
     std::thread walk([] { IC::myoshwmi.createNetworkPortNodes(true); });

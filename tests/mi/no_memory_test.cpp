@@ -1,8 +1,6 @@
 // Starts that run out of memory at every place where they ask for some.
 #include <gmock/gmock.h>
 
-#include <chrono>
-#include <filesystem>
 #include <new>
 #include <stdexcept>
 #include <thread>
@@ -15,19 +13,13 @@
 #include "tests/support/log_capture.h"
 #include "tests/support/plugin_access.h"
 #include "tests/support/shell_stub.h"
+#include "tests/support/waiting.h"
 
 namespace {
 
-std::ptrdiff_t runningThreads() {
-    return std::distance(std::filesystem::directory_iterator("/proc/self/task"), {});
-}
-
-/// Waits until so many threads run: one that was joined is listed a moment longer.
-bool comeTo(std::ptrdiff_t wanted) {
-    for (int tries = 0; tries < 1000 && runningThreads() != wanted; ++tries) {
-        std::this_thread::sleep_for(std::chrono::milliseconds(1));
-    }
-    return runningThreads() == wanted;
+/// Waits until so many threads run.
+bool comeTo(std::size_t wanted) {
+    return eventually([wanted] { return runningThreads() == wanted; });
 }
 
 using IC::Number;

@@ -6,6 +6,6 @@
 #include <string>
 
 /// Which operations the headers of the plug-in's rooms declare for others, by name, each with the log sources
-/// its lines may name. Private members, the headers of helpers, and what stands in a
-/// body are none.
+/// its lines may name. Private members, what the headers of helpers declare and what stands in a body are
+/// none.
 std::map<std::string, std::set<std::string>> operationNames(const std::filesystem::path& tree);

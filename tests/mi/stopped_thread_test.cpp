@@ -3,6 +3,7 @@
 
 #include <gmock/gmock.h>
 
+#include <atomic>
 #include <chrono>
 #include <functional>
 #include <memory>
@@ -14,6 +15,7 @@
 #include "tests/support/command_lines.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
+#include "tests/support/waiting.h"
 
 namespace {
 
@@ -49,7 +51,6 @@ HOST_TEST(AbortedThread, StartsNoFurtherCommand) {
         IC::runToEnd("true");
     });
     errand.start(nullptr);
-    std::this_thread::sleep_for(10ms);
     errand.abort();
     errand.join();
     EXPECT_THAT(commands.all(), testing::IsEmpty());
@@ -58,14 +59,16 @@ HOST_TEST(AbortedThread, StartsNoFurtherCommand) {
 
 HOST_TEST(AbortedThread, HasNoErrorsOfItsOwn) {
     LogCapture capture;
+    std::atomic<bool> begun{false};
     Errand errand([&] {
         IC::log(IC::kError) << "before";
+        begun = true;
         QX::Thread::sleep(60'000);
         IC::log(IC::kError) << "not for want of a tool";
         IC::log(IC::kProgress) << "after";
     });
     errand.start(nullptr);
-    std::this_thread::sleep_for(10ms);
+    ASSERT_TRUE(eventually([&] { return begun.load(); }));
     errand.abort();
     errand.join();
     EXPECT_THAT(capture.messages(), TextsAre("before", "after"));

@@ -1,5 +1,6 @@
 // Rebuilds that run out of memory at every place where they ask for some: nothing is lost, nothing is left.
 #include <new>
+#include <stdexcept>
 
 #include "mi/disk_snapshot.h"
 #include "mi/globals.h"
@@ -61,6 +62,24 @@ HOST_TEST_F(NoMemory, AnyAllocationOfARebuildMayFail) {
         diary().clear();
     }
     EXPECT_GT(allocations, 50);
+    shell_stub::answerWith({});
+}
+
+/// Too long to be kept without memory.
+const std::string kReason(300, 'x');
+
+HOST_TEST_F(NoMemory, LeavesNoNodeBehindWhoseRefusalCannotBeTold) {
+    host.file(IC::diskSnapshotPath, "");
+    shell_stub::answerWith(answer);
+    IC::myoshwmi.setLoadCallBack(
+        [](IC::Node* const&, const void*) -> IC::Error { throw std::runtime_error(kReason); }, nullptr,
+        nullptr);
+    {
+        const FailingNew none(kReason.size() + 1, [] { throw std::bad_alloc(); });
+        EXPECT_THROW(IC::myoshwmi.createHardDriveNodes(true), std::bad_alloc);
+    }
+    EXPECT_TRUE(Access::drives().empty());
+    EXPECT_TRUE(nodesOfType(IC::NodeType::hardDrive).empty()) << "nothing would ever withdraw it";
     shell_stub::answerWith({});
 }
 

@@ -1,5 +1,5 @@
-// A program for which the system has no more processes; loaded ahead into it. FEW_PROCESSES says what it
-// cannot start: "commands", "threads". C library only.
+// A program for which the system has no more processes; loaded ahead into it. CORVISTA_FEW_PROCESSES says
+// what it cannot start: "commands", "threads". C library only.
 #include <dlfcn.h>
 #include <pthread.h>
 #include <spawn.h>

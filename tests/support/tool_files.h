@@ -8,7 +8,8 @@
 namespace fake_host {
 
 inline constexpr const char* toolDirectory = "/tools";
-// A place of its own for the program behind the tools: the build may lie below /tmp, which a program under test hides.
+// A place of its own for the program behind the tools: the build may lie below /tmp, which a program under
+// test hides.
 inline constexpr const char* toolProgramDirectory = "/.fakehost";
 inline constexpr const char* answerDirectory = "/tools/.answers";
 inline constexpr const char* callsFile = "/record/calls";

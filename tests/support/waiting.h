@@ -1,0 +1,25 @@
+#pragma once
+
+#include <chrono>
+#include <cstddef>
+#include <filesystem>
+#include <iterator>
+#include <thread>
+
+/// Whether something comes true within ten seconds.
+template <class Condition>
+bool eventually(const Condition& condition) {
+    const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(10);
+    bool holds = condition();
+    while (!holds && std::chrono::steady_clock::now() < end) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(2));
+        holds = condition();
+    }
+    return holds;
+}
+
+/// The threads of this process: one that was joined is counted a moment longer.
+inline std::size_t runningThreads() {
+    const std::filesystem::directory_iterator tasks("/proc/self/task");
+    return static_cast<std::size_t>(std::distance(begin(tasks), end(tasks)));
+}
