@@ -40,9 +40,9 @@ HOST_TEST(FewDescriptors, ThatAreEnoughAreNotTold) {
 }
 
 /// cvagent tree where the system gives no more of something.
-std::vector<std::string> treeWithout(const SuseHost& suse, const std::string& what) {
-    return suse.commandLine({"tree"},
-                            {"LD_PRELOAD=" FEW_PROCESSES_LIBRARY, "CORVISTA_FEW_PROCESSES=" + what});
+std::vector<std::string> treeWithout(const SuseHost& suse, const std::string& what,
+                                     const std::vector<std::string>& words = {"tree"}) {
+    return suse.commandLine(words, {"LD_PRELOAD=" FEW_PROCESSES_LIBRARY, "CORVISTA_FEW_PROCESSES=" + what});
 }
 
 HOST_TEST(FewProcesses, CommandsThatCannotBeStartedAreCounted) {
@@ -56,6 +56,13 @@ HOST_TEST(FewProcesses, CommandsThatCannotBeStartedAreCounted) {
                                        "[1-9][0-9]* commands could not be started, the system gives "
                                        "no more processes or threads\nRaise the limits of "));
     EXPECT_THAT(host.callsOf("ethtool"), IsEmpty());
+}
+
+HOST_TEST(FewProcesses, ShellsForAllCommandsTakeMoreOfThem) {
+    const SuseHost suse(host);
+    const Finished run = host.run(treeWithout(suse, "commands", {"--commands", "shell", "tree"}));
+    EXPECT_THAT(run.err, HasSubstr("cvagent: the tree has no hard-drive, network-port, ip-config, "
+                                   "processor, and more can be missing: "));
 }
 
 HOST_TEST(FewProcesses, ThreadsThatCannotBeStartedAreTold) {
