@@ -19,12 +19,21 @@ namespace fs = std::filesystem;
 
 constexpr std::string_view kKept[] = {"HOME", "NO_COLOR", "PATH", "TERM", "TZ", "XDG_STATE_HOME"};
 constexpr std::string_view kOwnPrefix = "CORVISTA_";
+constexpr const char* kMark = "CVAGENT_COMMAND";
 
 // What the kernel shows of owners that a user namespace has no number for: the files of the system there.
 constexpr uid_t kUnmappedOwner = 65534;
 
 bool isKept(std::string_view name) {
-    return name.starts_with(kOwnPrefix) || std::find(std::begin(kKept), std::end(kKept), name) != std::end(kKept);
+    return name.starts_with(kOwnPrefix) ||
+           std::find(std::begin(kKept), std::end(kKept), name) != std::end(kKept);
+}
+
+/// The C library opens any file that is named in place of a zone, be it a pipe that nobody writes to.
+bool isZone(std::string_view value) {
+    const std::string_view zone = value.substr(value.starts_with(':') ? 1 : 0);
+    const bool isSystems = zone == "/etc/localtime" || zone.starts_with("/usr/share/zoneinfo/");
+    return (!zone.starts_with('/') || isSystems) && zone.find("..") == zone.npos;
 }
 
 std::vector<std::pair<std::string, std::string>> keptVariables() {
@@ -32,11 +41,17 @@ std::vector<std::pair<std::string, std::string>> keptVariables() {
     for (char** variable = environ; variable != nullptr && *variable != nullptr; ++variable) {
         const std::string text = *variable;
         const std::size_t equals = text.find('=');
-        if (equals != std::string::npos && isKept(text.substr(0, equals))) {
-            kept.emplace_back(text.substr(0, equals), text.substr(equals + 1));
+        const std::string name = text.substr(0, equals);
+        if (equals != std::string::npos && isKept(name) &&
+            (name != "TZ" || isZone(text.substr(equals + 1)))) {
+            kept.emplace_back(name, text.substr(equals + 1));
         }
     }
     return kept;
+}
+
+bool isOthers(uid_t owner) {
+    return owner != 0 && owner != geteuid() && owner != kUnmappedOwner;
 }
 
 /// Whether users without rights can put a program there, or change the way to it.
@@ -45,12 +60,25 @@ bool isOpenToOthers(const fs::path& directory) {
     for (const fs::path& name : directory) {
         way /= name;
         struct stat found {};
-        if (stat(way.c_str(), &found) != 0 ||
-            (found.st_uid != 0 && found.st_uid != geteuid() && found.st_uid != kUnmappedOwner)) {
+        if (stat(way.c_str(), &found) != 0 || isOthers(found.st_uid)) {
             return true;
         }
         const bool onlyOwnFiles = (found.st_mode & S_ISVTX) != 0 && way != directory;
         if ((found.st_mode & S_IWOTH) != 0 && !onlyOwnFiles) {
+            return true;
+        }
+    }
+    return false;
+}
+
+/// Whether a link on the way to a directory can lead elsewhere tomorrow.
+bool hasLinkOfOthers(const fs::path& directory) {
+    fs::path way;
+    for (const fs::path& name : directory) {
+        way /= name;
+        struct stat found {};
+        const bool isLink = lstat(way.c_str(), &found) == 0 && S_ISLNK(found.st_mode);
+        if (isLink && (isOthers(found.st_uid) || isOpenToOthers(way.parent_path()))) {
             return true;
         }
     }
@@ -64,7 +92,7 @@ bool isUsable(const std::string& directory) {
     }
     std::error_code missing;
     const fs::path place = fs::canonical(directory, missing);
-    return geteuid() != 0 || (!missing && !isOpenToOthers(place));
+    return geteuid() != 0 || (!missing && !isOpenToOthers(place) && !hasLinkOfOthers(directory));
 }
 
 std::string safePath() {
@@ -92,6 +120,11 @@ void reduceEnvironment() {
     }
     setenv("PATH", safePath().c_str(), 1);
     setenv("LC_ALL", "C", 1);
+    setenv(kMark, std::to_string(getpid()).c_str(), 1);
+}
+
+std::string markOfCommands() {
+    return std::string(kMark) + "=" + std::to_string(getpid());
 }
 
 std::vector<std::string> directoriesOnPath() {

@@ -16,6 +16,7 @@
 #include <system_error>
 #include <thread>
 
+#include "agent/environment.h"
 #include "agent/shell/starts.h"
 #include "agent/threads.h"
 #include "framework/qx/process_tree.h"
@@ -51,7 +52,7 @@ void remember(int signal) {
     if (receivedSignal.compare_exchange_strong(none, signal) && orderly == 0) {
         shell::declareStop();
     }
-    // The same Ctrl-C kills shells: what they leave behind is to be found among our children.
+    // The same Ctrl-C kills shells: what those leave behind that die later is to be found among our children.
     prctl(PR_SET_CHILD_SUBREAPER, 1, 0, 0, 0);
     sem_post(&arrived);
     [[maybe_unused]] const ssize_t written = write(wakeUp[1], "", 1);  // a full pipe is readable already
@@ -68,10 +69,11 @@ void dieAtLast(int /*signal*/) {
 bool killCommands() {
     bool any = false;
     for (const pid_t thread : ownThreads()) {
-        any = any || !QX::childrenOf(thread).empty();
-        QX::killChildrenOf(thread);
+        any = any || !commandsOf(thread).empty();
+        QX::killChildrenOf(thread, childrenOfTheCaller());
     }
-    return any;
+    // The same Ctrl-C has killed shells: a tool that it did not kill is nobody's child any more.
+    return QX::killMarked(markOfCommands(), shell::busySince()) || any;
 }
 
 [[noreturn]] void endNow() {
@@ -106,6 +108,7 @@ void waitForSignal() {
 
 void StopSignals::install() {
     handle(SIGPIPE, passOver);
+    handle(SIGXFSZ, passOver);
     sem_init(&arrived, 0, 0);
     try {
         std::thread(waitForSignal).detach();

@@ -4,6 +4,8 @@
 
 #include <atomic>
 
+#include "framework/qx/process_tree.h"
+
 namespace cvagent::shell {
 
 namespace {
@@ -15,6 +17,9 @@ std::atomic<int> underWay{0};
 
 std::atomic<unsigned long> failures{0};
 std::atomic<int> lastError{0};
+
+std::atomic<int> running{0};
+std::atomic<unsigned long long> runningSince{0};
 
 static_assert(std::atomic<bool>::is_always_lock_free, "a signal handler writes it");
 
@@ -49,6 +54,20 @@ Start::Start() {
 Start::~Start() {
     --underWay;
     holdWhenStopped();
+}
+
+void countBegun() {
+    if (running++ == 0) {
+        runningSince = QX::ticksNow();
+    }
+}
+
+void countEnded() {
+    --running;
+}
+
+unsigned long long busySince() {
+    return runningSince;
 }
 
 NotStarted notStarted() {

@@ -22,6 +22,13 @@ public:
     ~Start();
 };
 
+/// A command from its start until its end was waited for.
+void countBegun();
+void countEnded();
+/// Since when there has always been a command under way, in QX::ticksNow; when there is none, since the last
+/// time. What a command before left behind is not of those that run.
+unsigned long long busySince();
+
 /// Holds the calling thread for ever once a stop was declared.
 void holdWhenStopped();
 

@@ -8,6 +8,7 @@
 #include <algorithm>
 #include <charconv>
 #include <csignal>
+#include <ctime>
 #include <fstream>
 #include <functional>
 #include <iterator>
@@ -169,6 +170,23 @@ Call callOf(pid_t thread) {
     return in >> call.number >> std::hex >> call.argument ? call : Call{};
 }
 
+/// Whether a process of our group, not ourselves, has the entry in its environment.
+bool isMarked(pid_t process, const std::string& entry, unsigned long long since) {
+    if (process == getpid() || getpgid(process) != getpgrp()) {
+        return false;
+    }
+    if (const Status status = statusOf(process); hasEnded(status) || status.started < since) {
+        return false;
+    }
+    std::ifstream in("/proc/" + std::to_string(process) + "/environ");
+    for (std::string variable; std::getline(in, variable, '\0');) {
+        if (variable == entry) {
+            return true;
+        }
+    }
+    return false;
+}
+
 /// For want of a list: what the thread waits for at this moment, be it the end of a child or somebody to
 /// write to its pipe. A command that does neither keeps it from nothing.
 Group waitedForBy(pid_t thread) {
@@ -250,7 +268,31 @@ private:
 }  // namespace
 
 void killChildrenOf(pid_t thread) {
-    Condemned().addAll({commandsOf(thread)});
+    killChildrenOf(thread, {});
+}
+
+void killChildrenOf(pid_t thread, const std::vector<ChildProcess>& spared) {
+    Group commands = commandsOf(thread);
+    std::erase_if(commands.members, [&spared](pid_t id) {
+        return std::ranges::any_of(spared, [id](const ChildProcess& child) { return child.id == id; });
+    });
+    Condemned().addAll({std::move(commands)});
+}
+
+unsigned long long ticksNow() {
+    constexpr long kNanoseconds = 1000000000;
+    const long perSecond = sysconf(_SC_CLK_TCK);
+    timespec now{};
+    clock_gettime(CLOCK_BOOTTIME, &now);
+    return static_cast<unsigned long long>(now.tv_sec) * static_cast<unsigned long long>(perSecond) +
+           static_cast<unsigned long long>(now.tv_nsec / (kNanoseconds / perSecond));
+}
+
+bool killMarked(const std::string& entry, unsigned long long since) {
+    Group marked = allThat([=](pid_t id) { return isMarked(id, entry, since); });
+    const bool any = !marked.members.empty();
+    Condemned().addAll({std::move(marked)});
+    return any;
 }
 
 std::vector<ChildProcess> childrenOf(pid_t thread) {

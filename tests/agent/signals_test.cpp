@@ -157,6 +157,40 @@ HOST_TEST(ASignal, KillsWhatACommandHasStartedInASessionOfItsOwn) {
     stopAtOnce(host, tree, SIGINT);
 }
 
+// A Ctrl-C reaches shells and tools as well: what a tool that goes on has lost is its parent.
+HOST_TEST(ASignal, KillsWhatACommandHasLeftBehind) {
+    const SuseHost suse(host);
+    host.tool("fdisk -ls", ToolAnswer{.out = "", .action = "(sleep 999 &) ; sleep 1000"});
+    RunningProgram tree = host.start(suse.commandLine({"tree"}));
+    ASSERT_TRUE(eventually([&] { return isRunning(host, std::string("sleep\0", 6) + "1000"); }));
+    stopAtOnce(host, tree, SIGINT);
+}
+
+// Such as a service that it has started.
+HOST_TEST(ASignal, SparesWhatACommandBeforeHasLeftBehind) {
+    const SuseHost suse(host);
+    host.tool("fdisk -ls", ToolAnswer{.out = "", .action = "(sleep 999 > /dev/null 2>&1 &)"});
+    host.tool("brctl show", ToolAnswer{.out = "", .action = "sleep 1000"});
+    RunningProgram tree = host.start(suse.commandLine({"tree"}));
+    ASSERT_TRUE(eventually([&] { return isRunning(host, std::string("sleep\0", 6) + "1000"); }));
+    stop(tree, SIGTERM);
+    EXPECT_FALSE(isRunning(host, std::string("sleep\0", 6) + "1000"));
+    EXPECT_TRUE(isRunning(host, std::string("sleep\0", 6) + "999"));
+}
+
+HOST_TEST(ASignal, ThatTheCallerHasBlockedEndsTheProgram) {
+    const SuseHost suse(host);
+    host.tool("fdisk -ls", hanging());
+    sigset_t all;
+    sigset_t before;
+    sigfillset(&all);
+    pthread_sigmask(SIG_SETMASK, &all, &before);
+    RunningProgram tree = host.start(suse.commandLine({"tree"}));
+    pthread_sigmask(SIG_SETMASK, &before, nullptr);
+    ASSERT_TRUE(eventually([&] { return isRunning(host, "sleep"); }));
+    stopAtOnce(host, tree, SIGTERM);
+}
+
 HOST_TEST(ASignal, FollowedByOthersEndsTheProgramAsWell) {
     const SuseHost suse(host);
     host.tool("fdisk -ls", hanging());
