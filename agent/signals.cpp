@@ -46,6 +46,11 @@ void handle(int signal, void (*handler)(int)) {
     sigaction(signal, &action, nullptr);
 }
 
+bool isIgnored(int signal) {
+    struct sigaction action {};
+    return sigaction(signal, nullptr, &action) == 0 && action.sa_handler == SIG_IGN;
+}
+
 void remember(int signal) {
     const int savedErrno = errno;
     int none = 0;
@@ -119,7 +124,9 @@ void StopSignals::install() {
         wakeUp = {-1, -1};
     }
     for (const int signal : {SIGINT, SIGTERM, SIGHUP}) {
-        handle(signal, remember);
+        if (signal != SIGHUP || !isIgnored(signal)) {  // as after nohup
+            handle(signal, remember);
+        }
     }
 }
 

@@ -3,8 +3,7 @@
 #include <unistd.h>
 
 #include <atomic>
-
-#include "framework/qx/process_tree.h"
+#include <ctime>
 
 namespace cvagent::shell {
 
@@ -19,7 +18,7 @@ std::atomic<unsigned long> failures{0};
 std::atomic<int> lastError{0};
 
 std::atomic<int> running{0};
-std::atomic<unsigned long long> runningSince{0};
+std::atomic<std::chrono::nanoseconds> runningSince{std::chrono::nanoseconds(0)};
 
 static_assert(std::atomic<bool>::is_always_lock_free, "a signal handler writes it");
 
@@ -58,7 +57,9 @@ Start::~Start() {
 
 void countBegun() {
     if (running++ == 0) {
-        runningSince = QX::ticksNow();
+        timespec now{};
+        clock_gettime(CLOCK_BOOTTIME, &now);
+        runningSince = std::chrono::seconds(now.tv_sec) + std::chrono::nanoseconds(now.tv_nsec);
     }
 }
 
@@ -66,7 +67,7 @@ void countEnded() {
     --running;
 }
 
-unsigned long long busySince() {
+std::chrono::nanoseconds busySince() {
     return runningSince;
 }
 

@@ -8,7 +8,6 @@
 #include <algorithm>
 #include <charconv>
 #include <csignal>
-#include <ctime>
 #include <fstream>
 #include <functional>
 #include <iterator>
@@ -279,17 +278,10 @@ void killChildrenOf(pid_t thread, const std::vector<ChildProcess>& spared) {
     Condemned().addAll({std::move(commands)});
 }
 
-unsigned long long ticksNow() {
-    constexpr long kNanoseconds = 1000000000;
-    const long perSecond = sysconf(_SC_CLK_TCK);
-    timespec now{};
-    clock_gettime(CLOCK_BOOTTIME, &now);
-    return static_cast<unsigned long long>(now.tv_sec) * static_cast<unsigned long long>(perSecond) +
-           static_cast<unsigned long long>(now.tv_nsec / (kNanoseconds / perSecond));
-}
-
-bool killMarked(const std::string& entry, unsigned long long since) {
-    Group marked = allThat([=](pid_t id) { return isMarked(id, entry, since); });
+bool killMarked(const std::string& entry, std::chrono::nanoseconds since) {
+    const auto aTick = std::chrono::nanoseconds(std::chrono::seconds(1)) / sysconf(_SC_CLK_TCK);
+    const auto first = static_cast<unsigned long long>(since / aTick);
+    Group marked = allThat([=](pid_t id) { return isMarked(id, entry, first); });
     const bool any = !marked.members.empty();
     Condemned().addAll({std::move(marked)});
     return any;

@@ -2,6 +2,7 @@
 
 #include <sys/types.h>
 
+#include <chrono>
 #include <string>
 #include <tuple>
 #include <vector>
@@ -21,11 +22,9 @@ CORVISTA_API void killChildrenOf(pid_t thread);
 /// descendants: commands whose parent has died, which are nobody's children. What has left the group to live
 /// on, as a service does, is spared.
 /// @param entry NAME=VALUE
-/// @param since clock ticks since the machine's start: those that were there before are spared
+/// @param since by CLOCK_BOOTTIME: those that were there before are spared
 /// @return whether there were any
-CORVISTA_API bool killMarked(const std::string& entry, unsigned long long since);
-/// This moment, in the same ticks.
-CORVISTA_API unsigned long long ticksNow();
+CORVISTA_API bool killMarked(const std::string& entry, std::chrono::nanoseconds since);
 
 /// A child process: its number and, since numbers are given out again, when it started.
 struct ChildProcess {

@@ -12,6 +12,7 @@
 #include <sstream>
 
 #include "tests/agent/cvagent_run.h"
+#include "tests/agent/from_directory.h"
 #include "tests/agent/hostile_host.h"
 #include "tests/agent/suse_host.h"
 #include "tests/agent/terminal.h"
@@ -189,6 +190,22 @@ HOST_TEST(ASignal, ThatTheCallerHasBlockedEndsTheProgram) {
     pthread_sigmask(SIG_SETMASK, &before, nullptr);
     ASSERT_TRUE(eventually([&] { return isRunning(host, "sleep"); }));
     stopAtOnce(host, tree, SIGTERM);
+}
+
+/// The signals that a program ignores, as the kernel writes them: a number in hexadecimal digits.
+unsigned long ignoredBy(const FakeHost& host, const RunningProgram& program) {
+    const std::string status = host.read("/proc/" + std::to_string(program.pid()) + "/status").value_or("");
+    const std::string label = "SigIgn:";
+    return std::stoul(status.substr(status.find(label) + label.size()), nullptr, 16);
+}
+
+HOST_TEST(ASignal, ThatNohupIgnoresStaysIgnored) {
+    CvagentRun cvagent(host);
+    cvagent.telling("churn");
+    RunningProgram watch = host.start(fromDirectory("/", cvagent.commandLine({"watch"}), "trap '' HUP TERM"));
+    ASSERT_TRUE(watch.waitForOutput("withdrawn"));
+    EXPECT_EQ(ignoredBy(host, watch), 1UL << (SIGHUP - 1));
+    EXPECT_EQ(stop(watch, SIGTERM).status, 0);
 }
 
 HOST_TEST(ASignal, FollowedByOthersEndsTheProgramAsWell) {
