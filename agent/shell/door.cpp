@@ -10,6 +10,7 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
+#include <string>
 
 #include "agent/shell/starts.h"
 
@@ -17,12 +18,21 @@
 
 namespace {
 
+using cvagent::shell::countBegun;
+using cvagent::shell::countEnded;
 using cvagent::shell::countNotStarted;
 using cvagent::shell::Start;
 
 template <class Function>
 Function inLibrary(const char* name) {
     return reinterpret_cast<Function>(dlsym(RTLD_NEXT, name));
+}
+
+/// The reader's end of a pipe is not for programs that others start meanwhile: a pipe with two readers does
+/// not end its writer when the one that reads goes.
+std::string closingOnExec(const char* mode) {
+    const std::string text = mode;
+    return text.find('e') == std::string::npos ? text + 'e' : text;
 }
 
 int waitFor(pid_t process) {
@@ -40,9 +50,11 @@ int waitFor(pid_t process) {
 CVAGENT_DOOR FILE* popen(const char* command, const char* mode) {
     static const auto original = inLibrary<FILE* (*)(const char*, const char*)>("popen");
     const Start start;
-    FILE* const pipe = original(command, mode);
+    countBegun();
+    FILE* const pipe = original(command, closingOnExec(mode).c_str());
     if (pipe == nullptr) {
         countNotStarted(errno);
+        countEnded();
     }
     return pipe;
 }
@@ -51,6 +63,7 @@ CVAGENT_DOOR int pclose(FILE* pipe) {
     static const auto original = inLibrary<int (*)(FILE*)>("pclose");
     const int status = original(pipe);
     cvagent::shell::holdWhenStopped();
+    countEnded();
     return status;
 }
 
@@ -64,14 +77,17 @@ CVAGENT_DOOR int system(const char* command) {
     pid_t process = -1;
     {
         const Start start;
+        countBegun();
         const int error = posix_spawn(&process, "/bin/sh", nullptr, nullptr, words.data(), environ);
         if (error != 0) {
             countNotStarted(error);
+            countEnded();
             errno = error;
             return -1;
         }
     }
     const int status = waitFor(process);
     cvagent::shell::holdWhenStopped();
+    countEnded();
     return status;
 }
