@@ -14,8 +14,7 @@ void openStandardDescriptors();
 /// directory, umask 022, children that can be waited for, no core dumps, no blocked signals, running timers
 /// and limits that end it in the middle of a write. To be called before any thread.
 /// @param options the names of files in it become absolute: they are meant from where the program was
-/// started,
-///                as is CORVISTA_DATA_DIR
+///                started, as is CORVISTA_DATA_DIR
 void prepareSurroundings(Options& options);
 
 /// While it lives, the plug-in's commands complain to nobody: not each of them sends its own complaints away,

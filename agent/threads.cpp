@@ -12,22 +12,26 @@ namespace cvagent {
 
 namespace {
 
-std::vector<QX::ChildProcess> callers;
+/// Never destroyed: a signal at the very end still asks for it.
+std::vector<QX::ChildProcess>& callers() {
+    static auto& children = *new std::vector<QX::ChildProcess>;
+    return children;
+}
 
 }  // namespace
 
 void rememberChildrenOfTheCaller() {
-    callers = QX::childrenOf(getpid());
+    callers() = QX::childrenOf(getpid());
 }
 
 const std::vector<QX::ChildProcess>& childrenOfTheCaller() {
-    return callers;
+    return callers();
 }
 
 std::vector<QX::ChildProcess> commandsOf(pid_t thread) {
     std::vector<QX::ChildProcess> commands = QX::childrenOf(thread);
     std::erase_if(commands, [](const QX::ChildProcess& child) {
-        return std::find(callers.begin(), callers.end(), child) != callers.end();
+        return std::find(callers().begin(), callers().end(), child) != callers().end();
     });
     return commands;
 }
