@@ -36,7 +36,9 @@ HOST_TEST(HugeOutput, OfAQueryIsReadAsFarAsItsAnswer) {
     host.tool(
         "route -A inet6 -n",
         ToolAnswer{.out = "", .action = std::string("yes '::/0 fe80::1 UG 1024 0 0 eth0'") + kGigabyte});
-    const Finished run = suse.run({"get", "ip-config:eth0", "IPv6Gateway", "--json"});
+    // 64 MiB of lines take their time on a busy machine.
+    const Finished run =
+        suse.run({"--command-timeout", "100", "get", "ip-config:eth0", "IPv6Gateway", "--json"});
     EXPECT_EQ(run.status, 0);
     EXPECT_EQ(Json::parse(run.out)["properties"]["101"]["value"], "fe80::1");
 }
