@@ -167,10 +167,11 @@ HOST_TEST(ASignal, KillsWhatACommandHasLeftBehind) {
     stopAtOnce(host, tree, SIGINT);
 }
 
-// Such as a service that it has started.
+// Such as a service that it has started. The kernel tells the age of a process in hundredths of a second: the
+// command goes on for some of them, so that the next one is younger than what it leaves.
 HOST_TEST(ASignal, SparesWhatACommandBeforeHasLeftBehind) {
     const SuseHost suse(host);
-    host.tool("fdisk -ls", ToolAnswer{.out = "", .action = "(sleep 999 > /dev/null 2>&1 &)"});
+    host.tool("fdisk -ls", ToolAnswer{.out = "", .action = "(sleep 999 > /dev/null 2>&1 &) ; sleep 0.05"});
     host.tool("brctl show", ToolAnswer{.out = "", .action = "sleep 1000"});
     RunningProgram tree = host.start(suse.commandLine({"tree"}));
     ASSERT_TRUE(eventually([&] { return isRunning(host, std::string("sleep\0", 6) + "1000"); }));
