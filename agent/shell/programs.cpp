@@ -29,16 +29,20 @@ struct Known {
 };
 constexpr std::string_view kBinary = "\177ELF";
 constexpr std::string_view kScript = "#!";
+/// Zeros around it: a text of a program in C, and not one that only speaks of these.
+constexpr std::string_view kCoreutils("\0GNU coreutils\0", 15);
+/// Older releases print this complaint, worded otherwise, among what they find.
+constexpr std::string_view kGrep = ": binary file matches";
 constexpr std::string_view kEgrepScript = "exec grep -E \"$@\"\n";
-constexpr auto kKnown = std::to_array<Known>({{"awk", "Michael D. Brennan"},
-                                              {"cat", "GNU coreutils"},
-                                              {"cut", "GNU coreutils"},
-                                              {"egrep", "GNU grep"},
-                                              {"grep", "GNU grep"},
-                                              {"md5sum", "GNU coreutils"},
-                                              {"rm", "GNU coreutils"},
-                                              {"sha1sum", "GNU coreutils"},
-                                              {"tr", "GNU coreutils"}});
+constexpr auto kKnown = std::to_array<Known>({{"awk", "1996,2014, Michael D. Brennan"},
+                                              {"cat", kCoreutils},
+                                              {"cut", kCoreutils},
+                                              {"egrep", kGrep},
+                                              {"grep", kGrep},
+                                              {"md5sum", kCoreutils},
+                                              {"rm", kCoreutils},
+                                              {"sha1sum", kCoreutils},
+                                              {"tr", kCoreutils}});
 
 /// A file by what changes when another one takes its place.
 using Identity = std::tuple<dev_t, ino_t, off_t, time_t, long, time_t, long>;
