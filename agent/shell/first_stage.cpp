@@ -211,7 +211,7 @@ FirstStage startFirstStage(const FirstStageRequest& request) {
 
 FirstStage startShell(const FirstStageRequest& request, const std::string& text,
                       const std::string& argument) {
-    return startProcess(request, "/bin/sh", {"sh", "-c", text, "sh", argument});
+    return startProcess(request, "/bin/sh", {"sh", "-c", "--", text, "sh", argument});
 }
 
 }  // namespace cvagent::shell

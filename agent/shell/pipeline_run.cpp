@@ -236,7 +236,6 @@ void PipelineRun::failToWrite(int error) {
 
 /// A tool that prints learns that nobody reads when it has filled its buffer or ends.
 bool PipelineRun::drainUnread() {
-    constexpr std::size_t kToolsBuffer = 4096;
     std::string printed;
     while (printed.size() < kToolsBuffer && last_->pull(printed)) {
     }

@@ -34,7 +34,7 @@ constexpr std::string_view kCoreutils("\0GNU coreutils\0", 15);
 /// Older releases print this complaint, worded otherwise, among what they find.
 constexpr std::string_view kGrep = ": binary file matches";
 constexpr std::string_view kEgrepScript = "exec grep -E \"$@\"\n";
-constexpr auto kKnown = std::to_array<Known>({{"awk", "1996,2014, Michael D. Brennan"},
+constexpr auto kKnown = std::to_array<Known>({{"awk", "Thomas E. Dickey"},
                                               {"cat", kCoreutils},
                                               {"cut", kCoreutils},
                                               {"egrep", kGrep},
@@ -76,8 +76,7 @@ bool isEgrepScript(std::string_view content) {
            content.ends_with(kEgrepScript) && content.find("obsolescent") == std::string_view::npos;
 }
 
-bool holds(const Known& known, const std::string& path) {
-    const std::string content = beginningOf(path);
+bool holds(const Known& known, std::string_view content) {
     if (content.starts_with(kScript)) {
         return known.name == "egrep" && isEgrepScript(content);
     }
@@ -95,10 +94,12 @@ public:
                 return found->second;
             }
         }
-        const bool answer = holds(known, path);
+        const std::string content = beginningOf(path);
+        const bool answer = holds(known, content);
         const std::lock_guard lock(guard_);
         constexpr std::size_t kMost = 1000;
-        if (answers_.size() < kMost) {
+        // A file that could not be read for want of descriptors can be read later.
+        if (!content.empty() && answers_.size() < kMost) {
             answers_.emplace(key, answer);
         }
         return answer;

@@ -257,6 +257,23 @@ HOST_TEST(Traps, AKillOfLongAgoIsNotAnotherProcesses) {
     EXPECT_TRUE(met);
 }
 
+HOST_TEST(Traps, WantOfDescriptorsIsOverWhenThereAreSomeAgain) {
+    inC();
+    host.file("/etc/lines", "b\n");
+    rlimit before{};
+    getrlimit(RLIMIT_NOFILE, &before);
+    for (rlim_t most = 3; most < 16; ++most) {
+        const rlimit few{most, before.rlim_max};
+        setrlimit(RLIMIT_NOFILE, &few);
+        const auto stream = openCommand("cat /etc/lines | grep b");
+        if (stream && *stream != nullptr) {
+            closeCommand(*stream);
+        }
+    }
+    setrlimit(RLIMIT_NOFILE, &before);
+    EXPECT_EQ(Running("cat /etc/lines | grep b").line(), "b\n");
+}
+
 HOST_TEST(Traps, AFileLimitEndsNobodyButTheTool) {
     inC();
     host.file("/etc/lines", "some\n");
