@@ -97,7 +97,8 @@ public:
         const std::lock_guard lock(guard_);
         const auto now = Clock::now();
         const bool quiet = news_.isQuiet();
-        changed_ = quiet ? changed_ : now;
+        const bool first = made_ == Clock::time_point();
+        changed_ = quiet || first ? changed_ : now;
         if (!quiet || now - changed_ < kSettling || now - made_ > kLongest || !tablesAreTheKernels()) {
             host_.forget();
             answers_.clear();
