@@ -4,6 +4,7 @@
 #include <sys/vfs.h>
 
 #include <algorithm>
+#include <chrono>
 #include <map>
 #include <mutex>
 #include <optional>
@@ -18,6 +19,7 @@ namespace cvagent::shell {
 namespace {
 
 using Arguments = std::span<const std::string>;
+using Clock = std::chrono::steady_clock;
 
 /// What a tool has printed.
 struct Printed {
@@ -93,9 +95,14 @@ class NetworkAnswers {
 public:
     std::shared_ptr<const Printed> ask(const std::string& name, Arguments words) {
         const std::lock_guard lock(guard_);
-        if (!news_.isQuiet() || !tablesAreTheKernels()) {
+        const auto now = Clock::now();
+        const bool quiet = news_.isQuiet();
+        const bool first = made_ == Clock::time_point();
+        changed_ = quiet || first ? changed_ : now;
+        if (!quiet || now - changed_ < kSettling || now - made_ > kLongest || !tablesAreTheKernels()) {
             host_.forget();
             answers_.clear();
+            made_ = now;
         }
         std::vector<std::string> key{name};
         key.insert(key.end(), words.begin(), words.end());
@@ -116,8 +123,15 @@ private:
         return statfs("/proc/net/route", &system) == 0 && system.f_type == PROC_SUPER_MAGIC;
     }
 
+    /// A link that goes down is announced before its routes go, and these go without a word.
+    static constexpr std::chrono::milliseconds kSettling{100};
+    /// So long at most what changes without news is told as it was.
+    static constexpr std::chrono::seconds kLongest{1};
+
     std::mutex guard_;
     KernelNews news_;
+    Clock::time_point changed_;  ///< when news came
+    Clock::time_point made_;     ///< when the first of the answers was read
     KnownHost host_;
     std::map<std::vector<std::string>, std::shared_ptr<const Printed>> answers_;
 };

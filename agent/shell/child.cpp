@@ -25,12 +25,16 @@ constexpr int kSignalStatus = 128;
 /// The processes that have been started and not yet waited for.
 class Register {
 public:
-    void add(pid_t process, const std::shared_ptr<RunningProcess>& running) {
+    /// How many kills were noted until now.
+    std::size_t notes() {
         const std::lock_guard lock(guard_);
-        const auto noted = std::ranges::find(early_, process);
-        if (noted != early_.end()) {
-            running->forced = true;
-            *noted = 0;
+        return next_;
+    }
+    /// @param before notes() before it was started: an older note is of another process with this number
+    void add(pid_t process, const std::shared_ptr<RunningProcess>& running, std::size_t before) {
+        const std::lock_guard lock(guard_);
+        for (std::size_t note = before; note < next_; ++note) {
+            running->forced = running->forced || early_[note % early_.size()] == process;
         }
         running_[process] = running;
     }
@@ -56,15 +60,14 @@ public:
         }
         // Started, but not yet listed here; or the child of one that is.
         // Without memory of its own, for whoever kills cannot fail half-way.
-        early_[next_] = process;
-        next_ = (next_ + 1) % early_.size();
+        early_[next_++ % early_.size()] = process;
     }
 
 private:
     std::mutex guard_;
     std::map<pid_t, std::shared_ptr<RunningProcess>> running_;
-    std::array<pid_t, 64> early_{};  // the last ones; 0 for none
-    std::size_t next_ = 0;
+    std::array<pid_t, 64> early_{};  // the last ones
+    std::size_t next_ = 0;           // counts all
 };
 
 Register& processes() {
@@ -131,12 +134,13 @@ int Child::start(const ProcessStart& start, int output) {
     // By the calling thread itself: the kernel lists a thread's children, and whoever ends commands looks
     // there.
     const Start gate;
+    const std::size_t notes = processes().notes();
     pid_t process = -1;
     const int error =
         posix_spawn(&process, start.path.c_str(), actions.get(), nullptr, words.data(), environ);
     if (error == 0) {
         process_ = process;
-        processes().add(process_, running_);
+        processes().add(process_, running_, notes);
     }
     return error;
 }

@@ -1,6 +1,7 @@
 #include "agent/shell/command.h"
 
 #include <algorithm>
+#include <array>
 #include <cerrno>
 #include <csignal>
 #include <cstdlib>
@@ -16,6 +17,7 @@ namespace {
 
 constexpr int kShellFailure = 2;
 constexpr unsigned kStatusShift = 8;
+constexpr auto kChangeTools = std::to_array<const char*>({"GREP_OPTIONS", "MAWKBINMODE", "POSIXLY_CORRECT"});
 
 /// The value of the first of these variables that has one.
 std::string_view firstSet(std::initializer_list<const char*> variables) {
@@ -35,7 +37,7 @@ bool toolsAreAsUsual() {
             return false;
         }
     }
-    return std::getenv("POSIXLY_CORRECT") == nullptr && std::getenv("GREP_OPTIONS") == nullptr;
+    return std::ranges::none_of(kChangeTools, [](const char* name) { return std::getenv(name) != nullptr; });
 }
 
 }  // namespace

@@ -4,6 +4,7 @@
 #include <sys/sysmacros.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <cstdlib>
@@ -20,6 +21,10 @@ namespace cvagent::shell {
 namespace {
 
 constexpr int kNotFound = 127;
+/// A larger one is for a process to read: it takes long, and a process can be killed.
+constexpr off_t kLargestFile = 64L << 20U;
+/// grep looks for zeros in as much as it reads at a time, which differs between its releases.
+constexpr off_t kLargestForGrep = 32L << 10U;
 
 bool isNullDevice(const struct stat& file) {
     constexpr unsigned kMemoryDevices = 1;
@@ -43,13 +48,16 @@ public:
         out.resize(before + kChunk);
         const ssize_t got = read(file_.get(), out.data() + before, kChunk);
         out.resize(before + (got > 0 ? static_cast<std::size_t>(got) : 0));
-        status_ = got < 0 ? 1 : 0;
-        return got > 0;
+        read_ += std::max<ssize_t>(got, 0);
+        // What grows while it is read must not hold this thread, which nobody can kill.
+        status_ = got < 0 || read_ > kLargestFile ? 1 : 0;
+        return got > 0 && read_ <= kLargestFile;
     }
     int status() const override { return status_; }
 
 private:
     Descriptor file_;
+    off_t read_ = 0;
     int status_ = 0;
 };
 
@@ -65,16 +73,19 @@ FirstStage echo(Words words) {
     return answered(std::make_unique<TextSource>(text + '\n'));
 }
 
-/// A name that a tool's complaint and its options leave as it is.
+/// A name that a tool's complaint and its options leave as it is, and that is the same file to the tool.
 bool isPlainPath(const std::string& path) {
-    return path.starts_with('/');
+    return path.starts_with('/') && !path.starts_with("/proc/self") && !path.starts_with("/proc/thread-self");
 }
 
-FirstStage fileOr(const std::string& path, std::unique_ptr<Filter> filter, bool silent,
-                  int statusWhenMissing) {
-    LocalFile file = openForReading(path);
+FirstStage fileOr(const std::string& path, std::unique_ptr<Filter> filter, bool silent, int statusWhenMissing,
+                  off_t most) {
+    LocalFile file = openForReading(path, most);
     if (file.outcome == LocalFile::missing && silent) {
         return answered(std::make_unique<TextSource>("", statusWhenMissing));
+    }
+    if (file.outcome == LocalFile::large) {
+        return {};
     }
     if (file.outcome != LocalFile::opened) {
         return refused();
@@ -88,8 +99,9 @@ FirstStage fileOr(const std::string& path, std::unique_ptr<Filter> filter, bool 
 }
 
 FirstStage catFile(Words words, bool silent) {
-    return words.size() == 1 && isPlainPath(words.front()) ? fileOr(words.front(), nullptr, silent, 1)
-                                                           : FirstStage{};
+    return words.size() == 1 && isPlainPath(words.front())
+               ? fileOr(words.front(), nullptr, silent, 1, kLargestFile)
+               : FirstStage{};
 }
 
 FirstStage grepFile(Words words, bool silent, Dialect dialect) {
@@ -97,7 +109,8 @@ FirstStage grepFile(Words words, bool silent, Dialect dialect) {
         return {};
     }
     auto filter = makeGrepOf(words.back(), words.first(words.size() - 1), dialect, silent);
-    return filter != nullptr ? fileOr(words.back(), std::move(filter), silent, 2) : FirstStage{};
+    return filter != nullptr ? fileOr(words.back(), std::move(filter), silent, 2, kLargestForGrep)
+                             : FirstStage{};
 }
 
 FirstStage basicGrepFile(Words words, bool silent) {
@@ -198,7 +211,7 @@ FirstStage startFirstStage(const FirstStageRequest& request) {
 
 FirstStage startShell(const FirstStageRequest& request, const std::string& text,
                       const std::string& argument) {
-    return startProcess(request, "/bin/sh", {"sh", "-c", text, "sh", argument});
+    return startProcess(request, "/bin/sh", {"sh", "-c", "--", text, "sh", argument});
 }
 
 }  // namespace cvagent::shell

@@ -120,6 +120,10 @@ private:
             }
             while (readPiece(word.after)) {
             }
+            // What is in quotes is not divided, what is inserted is.
+            if ((word.text + word.after).find_first_of(" \t\n") != std::string::npos) {
+                return false;
+            }
         }
         // A number before an arrow is a descriptor's.
         const bool descriptor =

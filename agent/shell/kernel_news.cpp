@@ -18,7 +18,7 @@ constexpr unsigned group(unsigned number) {
 
 constexpr unsigned kGroups = group(RTNLGRP_LINK) | group(RTNLGRP_IPV4_IFADDR) | group(RTNLGRP_IPV6_IFADDR) |
                              group(RTNLGRP_IPV4_ROUTE) | group(RTNLGRP_IPV6_ROUTE) |
-                             group(RTNLGRP_IPV6_PREFIX) | group(RTNLGRP_IPV6_IFINFO);
+                             group(RTNLGRP_IPV6_PREFIX) | group(RTNLGRP_IPV6_IFINFO) | group(RTNLGRP_NEXTHOP);
 
 }  // namespace
 

@@ -73,7 +73,7 @@ bool sizeIsLimited() {
 
 }  // namespace
 
-LocalFile openForReading(const std::string& path) {
+LocalFile openForReading(const std::string& path, off_t most) {
     const Place place(path);
     if (!place.isKnown()) {
         return {};
@@ -89,8 +89,12 @@ LocalFile openForReading(const std::string& path) {
     if (!file.isOpen()) {
         return {outcomeOf(errno)};
     }
-    if (!isRegular(file) || !answersAtOnce(file)) {
+    struct stat found {};
+    if (fstat(file.get(), &found) != 0 || !S_ISREG(found.st_mode) || !answersAtOnce(file)) {
         return {};
+    }
+    if (found.st_size > most) {
+        return {LocalFile::large};
     }
     return {LocalFile::opened, std::move(file)};
 }

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <sys/types.h>
+
 #include <string>
 
 #include "agent/shell/descriptor.h"
@@ -11,6 +13,7 @@ namespace cvagent::shell {
 struct LocalFile {
     enum Outcome {
         opened,
+        large,    ///< larger than is wanted
         missing,  ///< there is none, it may not be read or is a directory: a tool has nothing of it either
         unfit     ///< anything else: for a tool, which can be killed
     };
@@ -19,7 +22,8 @@ struct LocalFile {
 };
 
 /// @param path from the root directory on
-LocalFile openForReading(const std::string& path);
+/// @param most bytes that it may have
+LocalFile openForReading(const std::string& path, off_t most);
 /// Opens as a shell does for `>` and `>>`. Whatever goes wrong is `unfit`: a shell then says so.
 LocalFile openForWriting(const std::string& path, bool append);
 /// Whether a path names a file or link that can be removed at once.

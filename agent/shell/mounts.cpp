@@ -109,7 +109,7 @@ class Table {
 public:
     std::optional<std::string> mountOf(const std::string& path) {
         const std::lock_guard lock(guard_);
-        if (owner_ != getpid()) {
+        if (owner_ != getpid() || !file_.isOpen()) {
             // A child process may have mounts of its own.
             file_ = Descriptor(open("/proc/self/mountinfo", O_RDONLY | O_CLOEXEC));
             owner_ = getpid();

@@ -105,6 +105,11 @@ Outcome PipelineRun::start(const Pipeline& pipeline) {
     if (standardOutput_ >= 0 && pipeline.stages.size() > 1 && !pipeline.stages.back().output) {
         return {Outcome::refused};
     }
+    // These two tell of a write that fails in their own way.
+    const Stage& last = pipeline.stages.back();
+    if (last.output && (last.words.front().text == "echo" || last.words.front().text == "awk")) {
+        return {Outcome::refused};
+    }
     if (const Outcome made = makeFilters(); made.kind != Outcome::started) {
         return made;
     }
@@ -124,7 +129,10 @@ Outcome PipelineRun::startFirst(std::vector<std::string> words) {
     }
     const bool alone = filters_.empty();
     const int output = !alone ? -1 : file_.isOpen() ? file_.get() : standardOutput_;
-    const bool isRead = standardOutput_ < 0 || file_.isOpen();
+    const auto& written = pipeline_->stages.back().output;
+    // A tool notices, or is killed, that reads what it prints.
+    const bool isOwn = written && std::ranges::find(words, written->path) != words.end();
+    const bool isRead = !isOwn && (standardOutput_ < 0 || file_.isOpen());
     return take(
         startFirstStage({std::move(words), pipeline_->stages.front().silent, command_, output, isRead}));
 }
@@ -228,7 +236,6 @@ void PipelineRun::failToWrite(int error) {
 
 /// A tool that prints learns that nobody reads when it has filled its buffer or ends.
 bool PipelineRun::drainUnread() {
-    constexpr std::size_t kToolsBuffer = 4096;
     std::string printed;
     while (printed.size() < kToolsBuffer && last_->pull(printed)) {
     }

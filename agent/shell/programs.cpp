@@ -29,16 +29,20 @@ struct Known {
 };
 constexpr std::string_view kBinary = "\177ELF";
 constexpr std::string_view kScript = "#!";
+/// Zeros around it: a text of a program in C, and not one that only speaks of these.
+constexpr std::string_view kCoreutils("\0GNU coreutils\0", 15);
+/// Older releases print this complaint, worded otherwise, among what they find.
+constexpr std::string_view kGrep = ": binary file matches";
 constexpr std::string_view kEgrepScript = "exec grep -E \"$@\"\n";
-constexpr auto kKnown = std::to_array<Known>({{"awk", "Michael D. Brennan"},
-                                              {"cat", "GNU coreutils"},
-                                              {"cut", "GNU coreutils"},
-                                              {"egrep", "GNU grep"},
-                                              {"grep", "GNU grep"},
-                                              {"md5sum", "GNU coreutils"},
-                                              {"rm", "GNU coreutils"},
-                                              {"sha1sum", "GNU coreutils"},
-                                              {"tr", "GNU coreutils"}});
+constexpr auto kKnown = std::to_array<Known>({{"awk", "Thomas E. Dickey"},
+                                              {"cat", kCoreutils},
+                                              {"cut", kCoreutils},
+                                              {"egrep", kGrep},
+                                              {"grep", kGrep},
+                                              {"md5sum", kCoreutils},
+                                              {"rm", kCoreutils},
+                                              {"sha1sum", kCoreutils},
+                                              {"tr", kCoreutils}});
 
 /// A file by what changes when another one takes its place.
 using Identity = std::tuple<dev_t, ino_t, off_t, time_t, long, time_t, long>;
@@ -72,8 +76,7 @@ bool isEgrepScript(std::string_view content) {
            content.ends_with(kEgrepScript) && content.find("obsolescent") == std::string_view::npos;
 }
 
-bool holds(const Known& known, const std::string& path) {
-    const std::string content = beginningOf(path);
+bool holds(const Known& known, std::string_view content) {
     if (content.starts_with(kScript)) {
         return known.name == "egrep" && isEgrepScript(content);
     }
@@ -91,10 +94,12 @@ public:
                 return found->second;
             }
         }
-        const bool answer = holds(known, path);
+        const std::string content = beginningOf(path);
+        const bool answer = holds(known, content);
         const std::lock_guard lock(guard_);
         constexpr std::size_t kMost = 1000;
-        if (answers_.size() < kMost) {
+        // A file that could not be read for want of descriptors can be read later.
+        if (!content.empty() && answers_.size() < kMost) {
             answers_.emplace(key, answer);
         }
         return answer;

@@ -6,7 +6,8 @@
 
 namespace cvagent::shell {
 
-constexpr std::size_t kChunk = 65536;  ///< bytes that are read at a time
+constexpr std::size_t kChunk = 65536;       ///< bytes that are read at a time
+constexpr std::size_t kToolsBuffer = 4096;  ///< bytes that a tool prints to a pipe at a time
 
 /// Bytes that are asked for: a stage of a pipeline reads the one before it, and nothing is read that nobody
 /// asked for.
@@ -20,6 +21,8 @@ public:
     /// Appends the next bytes, at least one. Waits until there are some.
     /// @return false at the end
     virtual bool pull(std::string& out) = 0;
+    /// Whether the tool it stands for prints to a pipe when its buffer is full, or at its end.
+    virtual bool printsInBlocks() const { return false; }
     /// The stage's exit status, once its end was reached.
     virtual int status() const { return 0; }
 };

@@ -235,6 +235,18 @@ constexpr Row kRows[] = {
     {"cat /etc/li`tool none` | grep o", false},
     {"cat /etc/li`tool pattern` | grep two"},
     {"cat `tool two` | grep two"},
+    {"cat '/etc/a b'`tool word`", true},
+    {"cat /proc/self/comm"},
+    {"grep a /proc/thread-self/comm"},
+    {"echo x > /tmp/a", true},
+    {"echo x;-n"},
+    {"tool nul | cut -d : -f 1 | grep -v x"},
+    {"tool nul | tr a b | grep -v x | cat"},
+    {"tool nul | awk '{print $1}' | grep -v x"},
+    {"echo x y | awk '{print $1}' > /tmp/a", true},
+    {"cat /etc/lines > /tmp/a; cat /tmp/a >> /tmp/a"},
+    {"cat /etc/lines > /tmp/a; cat /tmp/a | cat > /tmp/a"},
+    {"cat /etc/lines > /tmp/a; grep o /tmp/a > /tmp/a"},
     {"echo `tool two` x"},
     {"echo `tool a; tool a`", true},
     {"echo `tool a` `tool b`", true},
@@ -258,6 +270,7 @@ HOST_TEST(Rows, DoTheSameBothWays) {
     host.tool("tool word", "nes\n\n");
     host.tool("tool none", "");
     host.tool("tool pattern", "n*s\n");
+    host.tool("tool nul", std::string("one\ntwo\n\0x", 10));
     host.tool("tool two", " /etc/lines\n/etc/lines ");
     host.file("/tools/script", "echo from a script\nexit 7\n", 0755);
     host.file("/tools/killed", "#!/bin/sh\nkill -9 $$\n", 0755);

@@ -103,6 +103,14 @@ HOST_TEST(Filters, ReadAFileAsTheToolsDo) {
     }
 }
 
+HOST_TEST(Filters, LeaveALargeFileToGrepItself) {
+    setenv("LC_ALL", "C", 1);
+    host.file("/etc/input", "b\n" + std::string(70000, 'a') + '\n' + std::string(1, '\0') + '\n');
+    for (const std::string command : {"grep b /etc/input", "egrep 'b|x' /etc/input"}) {
+        EXPECT_EQ(direct(command, Complaints::seen), inShell(command, Complaints::seen)) << command;
+    }
+}
+
 HOST_TEST(Filters, HandALineThatIsTooLongToNobody) {
     setenv("LC_ALL", "C", 1);
     host.file("/etc/input", std::string(20UL << 20U, 'b'));

@@ -208,6 +208,72 @@ HOST_TEST(Traps, NothingIsOpenedThatCanHang) {
     }
 }
 
+HOST_TEST(Traps, AHugeFileIsReadByWhatCanBeKilled) {
+    inC();
+    host.file("/etc/huge", "");
+    std::filesystem::resize_file("/etc/huge", 1ULL << 40U);
+    for (const char* command : {"cat /etc/huge | grep x", "grep x /etc/huge"}) {
+        Running running(command);
+        const auto children = childrenOfThisThread();
+        ASSERT_EQ(children.size(), 1U) << command;
+        kill(children.front(), SIGKILL);
+        EXPECT_EQ(running.line(), "") << command;
+    }
+}
+
+HOST_TEST(Traps, AFileThatGrowsWhileItIsReadComesToAnEnd) {
+    inC();
+    host.file("/etc/grows", "");
+    FILE* const stream = openCommand("cat /etc/grows").value();
+    constexpr std::size_t kSize = 256UL << 20U;
+    std::filesystem::resize_file("/etc/grows", kSize);
+    std::vector<char> buffer(1UL << 20U);
+    std::size_t read = 0;
+    for (std::size_t got = 0; (got = fread(buffer.data(), 1, buffer.size(), stream)) > 0;) {
+        read += got;
+    }
+    EXPECT_LT(read, kSize);
+    EXPECT_EQ(closeCommand(stream), 1 << 8);
+}
+
+HOST_TEST(Traps, AKillOfLongAgoIsNotAnotherProcesses) {
+    inC();
+    bool met = false;
+    for (int attempt = 0; attempt < 20 && !met; ++attempt) {
+        pid_t last = 0;
+        {
+            const Running running("sleep 0");
+            last = childrenOfThisThread().at(0);
+        }
+        for (pid_t next = last + 1; next < last + 40; ++next) {
+            cvagent::shell::noteKill(next);
+        }
+        Running running("sleep 100");
+        const pid_t process = childrenOfThisThread().at(0);
+        met = process > last && process < last + 40;
+        kill(process, SIGKILL);
+        EXPECT_EQ(running.end(), (128 + SIGKILL) << 8);
+    }
+    EXPECT_TRUE(met);
+}
+
+HOST_TEST(Traps, WantOfDescriptorsIsOverWhenThereAreSomeAgain) {
+    inC();
+    host.file("/etc/lines", "b\n");
+    rlimit before{};
+    getrlimit(RLIMIT_NOFILE, &before);
+    for (rlim_t most = 3; most < 16; ++most) {
+        const rlimit few{most, before.rlim_max};
+        setrlimit(RLIMIT_NOFILE, &few);
+        const auto stream = openCommand("cat /etc/lines | grep b");
+        if (stream && *stream != nullptr) {
+            closeCommand(*stream);
+        }
+    }
+    setrlimit(RLIMIT_NOFILE, &before);
+    EXPECT_EQ(Running("cat /etc/lines | grep b").line(), "b\n");
+}
+
 HOST_TEST(Traps, AFileLimitEndsNobodyButTheTool) {
     inC();
     host.file("/etc/lines", "some\n");

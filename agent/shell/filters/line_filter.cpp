@@ -2,11 +2,21 @@
 
 namespace cvagent::shell {
 
+/// Whether something came. What the tools see at once is seen at once here, too: grep looks for zeros in it.
+bool LineFilter::fill() {
+    const std::size_t held = buffer_.size();
+    bool more = from().pull(buffer_);
+    while (more && from().printsInBlocks() && buffer_.size() - held < kToolsBuffer) {
+        more = from().pull(buffer_);
+    }
+    return buffer_.size() > held;
+}
+
 bool LineFilter::pull(std::string& out) {
     const std::size_t before = out.size();
     while (out.size() == before && !ended_) {
         const std::size_t held = buffer_.size();
-        if (!from().pull(buffer_)) {
+        if (!fill()) {
             takeLast(out);
             break;
         }

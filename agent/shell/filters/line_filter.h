@@ -14,6 +14,7 @@ public:
     static constexpr std::size_t kLongestLine = 8UL << 20U;
 
     bool pull(std::string& out) override;
+    bool printsInBlocks() const override { return true; }
     int status() const override { return gaveUp_ ? 2 : 0; }
 
 protected:
@@ -25,6 +26,7 @@ protected:
     bool gaveUp() const { return gaveUp_; }
 
 private:
+    bool fill();
     void takeLines(std::string& out);
     void takeLast(std::string& out);
 

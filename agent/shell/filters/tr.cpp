@@ -18,6 +18,7 @@ public:
     Tr(std::array<char, kLetters> becomes, std::array<bool, kLetters> squeezed)
         : becomes_(becomes), squeezed_(squeezed) {}
 
+    bool printsInBlocks() const override { return true; }
     bool pull(std::string& out) override {
         const std::size_t before = out.size();
         while (out.size() == before) {
