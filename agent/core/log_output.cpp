@@ -23,6 +23,9 @@ namespace {
 
 constexpr std::size_t kMostNames = 1000;  // that are remembered as told
 
+std::mutex latestGuard;
+const LogOutput* latest = nullptr;  // the one that the logger writes to; guarded by latestGuard
+
 /// Log files hold the host's settings: only their owner reads them.
 int openLog(const std::string& file) {
     const int descriptor = open(file.c_str(), O_WRONLY | O_APPEND | O_CREAT | O_CLOEXEC, 0600);
@@ -139,12 +142,19 @@ LogOutput::LogOutput(const LogSettings& settings, std::shared_ptr<ErrorLines> un
     log_->keepErrors(std::move(unowned), settings);
     if (settings.traceFile) {
         trace_ = std::make_unique<Sink>(settings.traceFile, -1, 0);
-        CVLog::CVLogger::setTrace(trace_.get(), 0);
     }
+    const std::lock_guard lock(latestGuard);
+    latest = this;
+    CVLog::CVLogger::setTrace(trace_.get(), 0);
     CVLog::CVLogger::setLog(log_.get(), log_->threshold());  // nothing can fail any more
 }
 
 LogOutput::~LogOutput() {
+    const std::lock_guard lock(latestGuard);
+    if (latest != this) {
+        return;  // another agent's lines go on
+    }
+    latest = nullptr;
     CVLog::CVLogger::setLog(nullptr, 0);
     CVLog::CVLogger::setTrace(nullptr, 0);
 }

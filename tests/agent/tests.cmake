@@ -13,6 +13,7 @@ set(agent_test_programs
   FRAMEWORK_FILE="$<TARGET_FILE:corvista_framework>")
 
 corvista_test(agent LIBRARIES agent_cli agent_core test_support util SOURCES
+  agent/calls_test.cpp
   agent/catalogue_test.cpp
   agent/core_parts_test.cpp
   agent/event_program_test.cpp
