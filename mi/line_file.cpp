@@ -1,6 +1,7 @@
 #include "mi/line_file.h"
 
 #include <fcntl.h>
+#include <sys/resource.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -33,10 +34,7 @@ public:
 
     /// Whether there is room for `size` bytes; nothing is changed. A file system that cannot tell is taken at
     /// its word later.
-    bool hasRoom(std::size_t size) const {
-        return size == 0 || fallocate(descriptor_, FALLOC_FL_KEEP_SIZE, 0, static_cast<off_t>(size)) == 0 ||
-               (errno != ENOSPC && errno != EDQUOT);
-    }
+    bool hasRoom(std::size_t size) const { return size == 0 || (fitsTheLimit(size) && isThereRoom(size)); }
 
     /// Empties the file and writes the content: whoever is killed in between leaves the beginning of the new
     /// content, never the end of the old one.
@@ -57,6 +55,17 @@ public:
     }
 
 private:
+    /// A process that writes beyond its limit is ended by SIGXFSZ, with the file cut already.
+    static bool fitsTheLimit(std::size_t size) {
+        rlimit limit{};
+        return getrlimit(RLIMIT_FSIZE, &limit) != 0 || limit.rlim_cur == RLIM_INFINITY ||
+               size <= limit.rlim_cur;
+    }
+    bool isThereRoom(std::size_t size) const {
+        return fallocate(descriptor_, FALLOC_FL_KEEP_SIZE, 0, static_cast<off_t>(size)) == 0 ||
+               (errno != ENOSPC && errno != EDQUOT);
+    }
+
     int descriptor_;
 };
 

@@ -30,7 +30,31 @@ bool isMiiStatusUp(const std::string& bond) {
     return status.line && parse::isMiiUp(*status.line);
 }
 
+/// While it lives, this thread asks the members of one bond more. The kernel nests none, but what is taken
+/// for a member's file can name the bond that it is asked for.
+class BondDepth {
+public:
+    BondDepth() { ++depth; }
+    BondDepth(const BondDepth&) = delete;
+    BondDepth& operator=(const BondDepth&) = delete;
+    ~BondDepth() { --depth; }
+
+    static bool isTooDeep() {
+        constexpr int kDeepest = 4;
+        return depth > kDeepest;
+    }
+
+private:
+    static thread_local int depth;
+};
+
+thread_local int BondDepth::depth = 0;
+
 bool areMembersUp(const std::string& bond) {
+    const BondDepth level;
+    if (BondDepth::isTooDeep()) {
+        return false;
+    }
     HostCommand lines = bondMemberLines(bond);
     if (!lines.started()) {
         log(kError) << "isNICUp - grepping slave device error";

@@ -99,7 +99,7 @@ void CommandDeadline::watch() {
         last = now;
         std::map<std::pair<pid_t, QX::ChildProcess>, Seconds> present;
         for (const pid_t thread : ownThreads()) {
-            for (const QX::ChildProcess& command : QX::childrenOf(thread)) {
+            for (const QX::ChildProcess& command : commandsOf(thread)) {
                 const auto known = ages.find({thread, command});
                 Seconds age = known == ages.end() ? Seconds::zero() : known->second + step;
                 if (age >= limitOf(thread)) {

@@ -23,10 +23,18 @@ constexpr std::string_view kKept[] = {"HOME", "NO_COLOR", "PATH", "TERM", "TZ", 
 constexpr std::string_view kSystemDirectories[] = {"/usr/local/sbin", "/usr/sbin", "/sbin", "/usr/bin",
                                                    "/bin"};
 constexpr std::string_view kOwnPrefix = "CORVISTA_";
+constexpr const char* kMark = "CVAGENT_COMMAND";
 
 bool isKept(std::string_view name) {
     return name.starts_with(kOwnPrefix) ||
            std::find(std::begin(kKept), std::end(kKept), name) != std::end(kKept);
+}
+
+/// The C library opens any file that is named in place of a zone, be it a pipe that nobody writes to.
+bool isZone(std::string_view value) {
+    const std::string_view zone = value.substr(value.starts_with(':') ? 1 : 0);
+    const bool isSystems = zone == "/etc/localtime" || zone.starts_with("/usr/share/zoneinfo/");
+    return (!zone.starts_with('/') || isSystems) && zone.find("..") == zone.npos;
 }
 
 std::vector<std::pair<std::string, std::string>> keptVariables() {
@@ -34,8 +42,10 @@ std::vector<std::pair<std::string, std::string>> keptVariables() {
     for (char** variable = environ; variable != nullptr && *variable != nullptr; ++variable) {
         const std::string text = *variable;
         const std::size_t equals = text.find('=');
-        if (equals != std::string::npos && isKept(text.substr(0, equals))) {
-            kept.emplace_back(text.substr(0, equals), text.substr(equals + 1));
+        const std::string name = text.substr(0, equals);
+        if (equals != std::string::npos && isKept(name) &&
+            (name != "TZ" || isZone(text.substr(equals + 1)))) {
+            kept.emplace_back(name, text.substr(equals + 1));
         }
     }
     return kept;
@@ -103,6 +113,11 @@ void reduceEnvironment() {
     }
     setenv("PATH", safePath().c_str(), 1);
     setenv("LC_ALL", "C", 1);
+    setenv(kMark, std::to_string(getpid()).c_str(), 1);
+}
+
+std::string markOfCommands() {
+    return std::string(kMark) + "=" + std::to_string(getpid());
 }
 
 std::vector<std::string> directoriesOnPath() {

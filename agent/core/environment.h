@@ -11,6 +11,10 @@ namespace cvagent {
 /// before any thread.
 void reduceEnvironment();
 
+/// What stands in the environment of the commands, and of all that they start, once it is reduced:
+/// NAME=VALUE, of this process alone.
+std::string markOfCommands();
+
 /// The directories of PATH, in order.
 std::vector<std::string> directoriesOnPath();
 

@@ -1,6 +1,7 @@
 #include "agent/core/log_output.h"
 
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -26,11 +27,42 @@ constexpr std::size_t kMostNames = 1000;  // that are remembered as told
 std::mutex latestGuard;
 const LogOutput* latest = nullptr;  // the one that the logger writes to; guarded by latestGuard
 
+bool isOurs(const struct stat& file) {
+    return file.st_uid == geteuid() || file.st_uid == 0;
+}
+
+/// Follows a link in the last place, and waits for somebody to read a pipe, only when root or the caller has
+/// put it there. A file is refused that others read there, or have under another name.
+int openForAppending(const std::string& file) {
+    constexpr int kFlags = O_WRONLY | O_APPEND | O_CREAT | O_CLOEXEC | O_NOCTTY;
+    int descriptor = open(file.c_str(), kFlags | O_NOFOLLOW | O_NONBLOCK, 0600);
+    const bool isItself = descriptor >= 0;
+    struct stat found {};
+    if (!isItself && (errno == ELOOP || errno == ENXIO) && lstat(file.c_str(), &found) == 0 &&
+        isOurs(found)) {
+        descriptor = open(file.c_str(), kFlags, 0600);
+    }
+    if (descriptor < 0 || fstat(descriptor, &found) != 0) {
+        return descriptor;
+    }
+    const bool isFile = S_ISREG(found.st_mode) || (isItself && S_ISFIFO(found.st_mode));
+    if (isFile && (!isOurs(found) || found.st_nlink > 1)) {
+        close(descriptor);
+        errno = EPERM;
+        return -1;
+    }
+    fcntl(descriptor, F_SETFL, O_APPEND);  // writes are waited for
+    return descriptor;
+}
+
 /// Log files hold the host's settings: only their owner reads them.
 int openLog(const std::string& file) {
-    const int descriptor = open(file.c_str(), O_WRONLY | O_APPEND | O_CREAT | O_CLOEXEC, 0600);
+    const int descriptor = openForAppending(file);
     if (descriptor < 0) {
-        throw Problem(Problem::failed, "cannot write to '" + printable(file) + "': " + std::strerror(errno),
+        const std::string reason = errno == EPERM   ? "it belongs to somebody else or has a second name"
+                                   : errno == ELOOP ? "it is a link of somebody else's"
+                                                    : std::strerror(errno);
+        throw Problem(Problem::failed, "cannot write to '" + printable(file) + "': " + reason,
                       Problem::logFile);
     }
     return descriptor;

@@ -13,10 +13,10 @@
 #include <csignal>
 #include <cstdlib>
 #include <exception>
-#include <initializer_list>
 #include <system_error>
 #include <thread>
 
+#include "agent/core/environment.h"
 #include "agent/core/threads.h"
 #include "agent/shell/starts.h"
 #include "framework/qx/process_tree.h"
@@ -46,14 +46,9 @@ void handle(int signal, void (*handler)(int)) {
     sigaction(signal, &action, nullptr);
 }
 
-/// Whoever started the program may have held them back, and that is inherited.
-void letThrough(std::initializer_list<int> signals) {
-    sigset_t all;
-    sigemptyset(&all);
-    for (const int signal : signals) {
-        sigaddset(&all, signal);
-    }
-    pthread_sigmask(SIG_UNBLOCK, &all, nullptr);
+bool isIgnored(int signal) {
+    struct sigaction action {};
+    return sigaction(signal, nullptr, &action) == 0 && action.sa_handler == SIG_IGN;
 }
 
 void remember(int signal) {
@@ -62,7 +57,7 @@ void remember(int signal) {
     if (receivedSignal.compare_exchange_strong(none, signal) && orderly == 0) {
         shell::declareStop();
     }
-    // The same Ctrl-C kills shells: what they leave behind is to be found among our children.
+    // The same Ctrl-C kills shells: what those leave behind that die later is to be found among our children.
     prctl(PR_SET_CHILD_SUBREAPER, 1, 0, 0, 0);
     sem_post(&arrived);
     [[maybe_unused]] const ssize_t written = write(wakeUp[1], "", 1);  // a full pipe is readable already
@@ -79,10 +74,11 @@ void dieAtLast(int /*signal*/) {
 bool killCommands() {
     bool any = false;
     for (const pid_t thread : ownThreads()) {
-        any = any || !QX::childrenOf(thread).empty();
-        QX::killChildrenOf(thread);
+        any = any || !commandsOf(thread).empty();
+        QX::killChildrenOf(thread, childrenOfTheCaller());
     }
-    return any;
+    // The same Ctrl-C has killed shells: a tool that it did not kill is nobody's child any more.
+    return QX::killMarked(markOfCommands(), shell::busySince()) || any;
 }
 
 [[noreturn]] void endNow() {
@@ -116,8 +112,8 @@ void waitForSignal() {
 }  // namespace
 
 void StopSignals::install() {
-    letThrough({SIGINT, SIGTERM, SIGHUP, SIGALRM});
     handle(SIGPIPE, passOver);
+    handle(SIGXFSZ, passOver);
     sem_init(&arrived, 0, 0);
     try {
         std::thread(waitForSignal).detach();
@@ -128,7 +124,9 @@ void StopSignals::install() {
         wakeUp = {-1, -1};
     }
     for (const int signal : {SIGINT, SIGTERM, SIGHUP}) {
-        handle(signal, remember);
+        if (signal != SIGHUP || !isIgnored(signal)) {  // as after nohup
+            handle(signal, remember);
+        }
     }
 }
 

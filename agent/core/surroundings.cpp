@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <sys/resource.h>
 #include <sys/stat.h>
+#include <sys/time.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -16,6 +17,7 @@
 #include "agent/core/environment.h"
 #include "agent/core/problem.h"
 #include "agent/core/text.h"
+#include "agent/core/threads.h"
 
 namespace cvagent {
 
@@ -66,6 +68,34 @@ void forbidCoreDumps() {
     }
 }
 
+/// What ends a program in the middle of a write. Where a limit cannot be lifted it is at least as high as it
+/// may be.
+void liftDeadlyLimits() {
+    for (const auto resource : {RLIMIT_FSIZE, RLIMIT_CPU}) {
+        constexpr rlimit kNone{RLIM_INFINITY, RLIM_INFINITY};
+        rlimit limit{};
+        if (setrlimit(resource, &kNone) != 0 && getrlimit(resource, &limit) == 0) {
+            limit.rlim_cur = limit.rlim_max;
+            setrlimit(resource, &limit);
+        }
+    }
+}
+
+/// Blocked signals and running timers outlive an exec: the ones would keep SIGTERM from the program and from
+/// its commands, the others would end it at a moment of the caller's choice.
+void forgetSignalsOfTheCaller() {
+    for (const auto timer : {ITIMER_REAL, ITIMER_VIRTUAL, ITIMER_PROF}) {
+        constexpr itimerval kNever{};
+        setitimer(timer, &kNever, nullptr);
+    }
+    struct sigaction standard {};
+    standard.sa_handler = SIG_DFL;
+    sigaction(SIGCHLD, &standard, nullptr);
+    sigset_t none;
+    sigemptyset(&none);
+    sigprocmask(SIG_SETMASK, &none, nullptr);
+}
+
 }  // namespace
 
 void openStandardDescriptors() {
@@ -82,6 +112,8 @@ void openStandardDescriptors() {
 }
 
 void prepareSurroundings(const std::vector<std::string*>& files) {
+    rememberChildrenOfTheCaller();
+    forgetSignalsOfTheCaller();
     umask(S_IWGRP | S_IWOTH);
     resolveNames(files);
     if (chdir("/") != 0) {
@@ -89,10 +121,8 @@ void prepareSurroundings(const std::vector<std::string*>& files) {
                       std::string("cannot enter the directory '/': ") + std::strerror(errno));
     }
     forbidCoreDumps();
+    liftDeadlyLimits();
     reduceEnvironment();
-    struct sigaction standard {};
-    standard.sa_handler = SIG_DFL;
-    sigaction(SIGCHLD, &standard, nullptr);
 }
 
 QuietCommands::QuietCommands() {

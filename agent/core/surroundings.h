@@ -13,7 +13,8 @@ void openStandardDescriptors();
 
 /// Gives the process what the plug-in's commands need, and takes from it what would let others turn them: an
 /// environment of a few variables, a PATH with the sbin directories behind what is there, "/" as the current
-/// directory, umask 022, children that can be waited for, no core dumps. To be called before any thread.
+/// directory, umask 022, children that can be waited for, no core dumps, no blocked signals, running timers
+/// and limits that end it in the middle of a write. To be called before any thread.
 /// @param files names that become absolute, as CORVISTA_DATA_DIR does: they are meant from where the program
 ///              was started
 void prepareSurroundings(const std::vector<std::string*>& files);

@@ -11,6 +11,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <string>
 
 #include "agent/shell/runner.h"
 #include "agent/shell/starts.h"
@@ -19,12 +20,21 @@
 
 namespace {
 
+using cvagent::shell::countBegun;
+using cvagent::shell::countEnded;
 using cvagent::shell::countNotStarted;
 using cvagent::shell::Start;
 
 template <class Function>
 Function inLibrary(const char* name) {
     return reinterpret_cast<Function>(dlsym(RTLD_NEXT, name));
+}
+
+/// The reader's end of a pipe is not for programs that others start meanwhile: a pipe with two readers does
+/// not end its writer when the one that reads goes.
+std::string closingOnExec(const char* mode) {
+    const std::string text = mode;
+    return text.find('e') == std::string::npos ? text + 'e' : text;
 }
 
 int waitFor(pid_t process) {
@@ -37,9 +47,7 @@ int waitFor(pid_t process) {
     return status;
 }
 
-}  // namespace
-
-CVAGENT_DOOR FILE* popen(const char* command, const char* mode) {
+FILE* opened(const char* command, const char* mode) {
     static const auto original = inLibrary<FILE* (*)(const char*, const char*)>("popen");
     if (std::strcmp(mode, "r") == 0) {
         if (const auto direct = cvagent::shell::openCommand(command)) {
@@ -47,31 +55,15 @@ CVAGENT_DOOR FILE* popen(const char* command, const char* mode) {
         }
     }
     const Start start;
-    FILE* const pipe = original(command, mode);
+    FILE* const pipe = original(command, closingOnExec(mode).c_str());
     if (pipe == nullptr) {
         countNotStarted(errno);
     }
     return pipe;
 }
 
-CVAGENT_DOOR int pclose(FILE* pipe) {
-    static const auto original = inLibrary<int (*)(FILE*)>("pclose");
-    if (const auto status = cvagent::shell::closeCommand(pipe)) {
-        return *status;
-    }
-    const int status = original(pipe);
-    cvagent::shell::holdWhenStopped();
-    return status;
-}
-
-// Not the C library's: that one has the whole program ignore SIGINT for as long as the command runs.
-CVAGENT_DOOR int system(const char* command) {
-    if (command == nullptr) {
-        return 1;  // there is a shell
-    }
-    if (const auto status = cvagent::shell::runCommand(command)) {
-        return *status;
-    }
+/// Runs a shell to its end. Not by the C library: that one has the whole program ignore SIGINT meanwhile.
+int ranByShell(const char* command) {
     std::array<char*, 4> words{const_cast<char*>("sh"), const_cast<char*>("-c"), const_cast<char*>(command),
                                nullptr};
     pid_t process = -1;
@@ -86,5 +78,39 @@ CVAGENT_DOOR int system(const char* command) {
     }
     const int status = waitFor(process);
     cvagent::shell::holdWhenStopped();
+    return status;
+}
+
+}  // namespace
+
+CVAGENT_DOOR FILE* popen(const char* command, const char* mode) {
+    countBegun();
+    FILE* const pipe = opened(command, mode);
+    if (pipe == nullptr) {
+        countEnded();
+    }
+    return pipe;
+}
+
+CVAGENT_DOOR int pclose(FILE* pipe) {
+    static const auto original = inLibrary<int (*)(FILE*)>("pclose");
+    if (const auto status = cvagent::shell::closeCommand(pipe)) {
+        countEnded();
+        return *status;
+    }
+    const int status = original(pipe);
+    cvagent::shell::holdWhenStopped();
+    countEnded();
+    return status;
+}
+
+CVAGENT_DOOR int system(const char* command) {
+    if (command == nullptr) {
+        return 1;  // there is a shell
+    }
+    countBegun();
+    const auto direct = cvagent::shell::runCommand(command);
+    const int status = direct ? *direct : ranByShell(command);
+    countEnded();
     return status;
 }

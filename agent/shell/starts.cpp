@@ -3,6 +3,7 @@
 #include <unistd.h>
 
 #include <atomic>
+#include <ctime>
 
 namespace cvagent::shell {
 
@@ -15,6 +16,9 @@ std::atomic<int> underWay{0};
 
 std::atomic<unsigned long> failures{0};
 std::atomic<int> lastError{0};
+
+std::atomic<int> running{0};
+std::atomic<std::chrono::nanoseconds> runningSince{std::chrono::nanoseconds(0)};
 
 static_assert(std::atomic<bool>::is_always_lock_free, "a signal handler writes it");
 
@@ -49,6 +53,22 @@ Start::Start() {
 Start::~Start() {
     --underWay;
     holdWhenStopped();
+}
+
+void countBegun() {
+    if (running++ == 0) {
+        timespec now{};
+        clock_gettime(CLOCK_BOOTTIME, &now);
+        runningSince = std::chrono::seconds(now.tv_sec) + std::chrono::nanoseconds(now.tv_nsec);
+    }
+}
+
+void countEnded() {
+    --running;
+}
+
+std::chrono::nanoseconds busySince() {
+    return runningSince;
 }
 
 NotStarted notStarted() {

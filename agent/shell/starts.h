@@ -1,5 +1,7 @@
 #pragma once
 
+#include <chrono>
+
 namespace cvagent::shell {
 
 /// From here on no command begins in this process, and there is no way back. Who asks for one, or for the end
@@ -21,6 +23,13 @@ public:
     Start& operator=(const Start&) = delete;
     ~Start();
 };
+
+/// A command from its start until its end was waited for.
+void countBegun();
+void countEnded();
+/// Since when there has always been a command under way, by CLOCK_BOOTTIME; when there is none, since the
+/// last time. What a command before left behind is not of those that run.
+std::chrono::nanoseconds busySince();
 
 /// Holds the calling thread for ever once a stop was declared.
 void holdWhenStopped();

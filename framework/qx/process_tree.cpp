@@ -170,6 +170,23 @@ Call callOf(pid_t thread) {
     return in >> call.number >> std::hex >> call.argument ? call : Call{};
 }
 
+/// Whether a process of our group, not ourselves, has the entry in its environment.
+bool isMarked(pid_t process, const std::string& entry, unsigned long long since) {
+    if (process == getpid() || getpgid(process) != getpgrp()) {
+        return false;
+    }
+    if (const Status status = statusOf(process); hasEnded(status) || status.started < since) {
+        return false;
+    }
+    std::ifstream in("/proc/" + std::to_string(process) + "/environ");
+    for (std::string variable; std::getline(in, variable, '\0');) {
+        if (variable == entry) {
+            return true;
+        }
+    }
+    return false;
+}
+
 /// For want of a list: what the thread waits for at this moment, be it the end of a child or somebody to
 /// write to its pipe. A command that does neither keeps it from nothing.
 Group waitedForBy(pid_t thread) {
@@ -260,7 +277,24 @@ void setKillWitness(void (*witness)(pid_t)) {
 }
 
 void killChildrenOf(pid_t thread) {
-    Condemned().addAll({commandsOf(thread)});
+    killChildrenOf(thread, {});
+}
+
+void killChildrenOf(pid_t thread, const std::vector<ChildProcess>& spared) {
+    Group commands = commandsOf(thread);
+    std::erase_if(commands.members, [&spared](pid_t id) {
+        return std::ranges::any_of(spared, [id](const ChildProcess& child) { return child.id == id; });
+    });
+    Condemned().addAll({std::move(commands)});
+}
+
+bool killMarked(const std::string& entry, std::chrono::nanoseconds since) {
+    const auto aTick = std::chrono::nanoseconds(std::chrono::seconds(1)) / sysconf(_SC_CLK_TCK);
+    const auto first = static_cast<unsigned long long>(since / aTick);
+    Group marked = allThat([=](pid_t id) { return isMarked(id, entry, first); });
+    const bool any = !marked.members.empty();
+    Condemned().addAll({std::move(marked)});
+    return any;
 }
 
 std::vector<ChildProcess> childrenOf(pid_t thread) {

@@ -2,6 +2,8 @@
 
 #include <sys/types.h>
 
+#include <chrono>
+#include <string>
 #include <tuple>
 #include <vector>
 
@@ -15,6 +17,14 @@ namespace QX {
 /// the processes at the other end of the pipe that it reads, or the child whose end it waits for.
 /// @param thread kernel id of the thread; it must be alive
 CORVISTA_API void killChildrenOf(pid_t thread);
+
+/// Kills the processes in the group of this process that have an entry in their environment, and all their
+/// descendants: commands whose parent has died, which are nobody's children. What has left the group to live
+/// on, as a service does, is spared.
+/// @param entry NAME=VALUE
+/// @param since by CLOCK_BOOTTIME: those that were there before are spared
+/// @return whether there were any
+CORVISTA_API bool killMarked(const std::string& entry, std::chrono::nanoseconds since);
 
 /// A child process: its number and, since numbers are given out again, when it started.
 struct ChildProcess {
@@ -30,6 +40,9 @@ struct ChildProcess {
 /// The child processes of one thread of this process that have not ended.
 /// @param thread its kernel id; there are none of a thread that has gone
 CORVISTA_API std::vector<ChildProcess> childrenOf(pid_t thread);
+
+/// As killChildrenOf(thread), without some of them.
+CORVISTA_API void killChildrenOf(pid_t thread, const std::vector<ChildProcess>& spared);
 
 /// Kills one of them with all its descendants, as killChildrenOf does. A descendant that has lost its parent
 /// before is nobody's child here and lives on.

@@ -7,6 +7,7 @@
 #include <thread>
 
 #include "agent/shell/starts.h"
+#include "tests/agent/cvagent_run.h"
 #include "tests/agent/hostile_host.h"
 #include "tests/agent/suse_host.h"
 
@@ -51,6 +52,13 @@ HOST_TEST(ThePlugin, FindsThemInTheProgram) {
                                         " [0]: normal symbol `" +
                                         name + "'"));
     }
+}
+
+// A tool that another command starts meanwhile would hold it open.
+HOST_TEST(APipe, IsNoOtherCommands) {
+    CvagentRun cvagent(host);
+    EXPECT_EQ(cvagent.telling("pipe")({"tree"}).status, 0);
+    EXPECT_THAT(cvagent.diary(), HasSubstr("closed on exec\nended with 7\n"));
 }
 
 /// The state of a thread of this process, as the kernel's letter.

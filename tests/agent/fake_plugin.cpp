@@ -10,6 +10,7 @@
 //   manyerrors              initialize logs sixty different errors
 //   hangstart, hangstop     initialize, unload never return
 //   slowstop                unload takes a tenth of a second
+//   pipe                    initialize runs a command and notes who else has its pipe, and its end
 //   command                 initialize runs a command that hangs, and notes what it tells
 //   errors                  initialize logs errors
 //   churn                   a thread publishes and withdraws drives until unload
@@ -20,6 +21,8 @@
 //   foreignids              initialize numbers its nodes from 1, whatever the agent says
 // CORVISTA_FAKE_PLUGIN_HOLD names a file: while it is there, what waits for it hangs.
 // CORVISTA_FAKE_PLUGIN_DIARY names a file that gets a line for each write and for the unload.
+#include <fcntl.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include <array>
@@ -186,6 +189,11 @@ public:
         build();
         if (told("hangstart")) {
             hang();
+        }
+        if (told("pipe")) {
+            FILE* const pipe = popen("exit 7", "r");
+            note((fcntl(fileno(pipe), F_GETFD) & FD_CLOEXEC) != 0 ? "closed on exec" : "left open");
+            note("ended with " + std::to_string(WEXITSTATUS(pclose(pipe))));
         }
         if (told("command")) {
             note(outputOf("echo command >> \"$CORVISTA_FAKE_PLUGIN_DIARY\"; exec sleep 1000"));

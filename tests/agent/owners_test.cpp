@@ -15,7 +15,7 @@ using cvagent::isTheSystem;
 using cvagent::othersCanWrite;
 
 constexpr uid_t kUser = 1000;
-constexpr uid_t kNobody = 65534;
+constexpr uid_t kNobodysId = 65534;
 
 struct stat directoryOf(uid_t user, gid_t group, mode_t mode) {
     struct stat found {};
@@ -82,13 +82,13 @@ HOST_TEST(TheSystem, IsRootAndNotTheUserNobody) {
     EXPECT_FALSE(isTheSystem(kUser));
     host.remove("/proc/self");
     host.file("/proc/self/uid_map", "         0          0 4294967295\n");
-    EXPECT_FALSE(isTheSystem(kNobody));
+    EXPECT_FALSE(isTheSystem(kNobodysId));
 }
 
 HOST_TEST(TheSystem, InAUsersContainerHasNoNumber) {
     host.remove("/proc/self");
     host.file("/proc/self/uid_map", "         0       1000          1\n         1     100000      65536\n");
-    EXPECT_TRUE(isTheSystem(kNobody));
+    EXPECT_TRUE(isTheSystem(kNobodysId));
     EXPECT_FALSE(isTheSystem(kUser));
 }
 

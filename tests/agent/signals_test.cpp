@@ -12,6 +12,7 @@
 #include <sstream>
 
 #include "tests/agent/cvagent_run.h"
+#include "tests/agent/from_directory.h"
 #include "tests/agent/hostile_host.h"
 #include "tests/agent/suse_host.h"
 #include "tests/agent/terminal.h"
@@ -155,6 +156,59 @@ HOST_TEST(ASignal, KillsWhatACommandHasStartedInASessionOfItsOwn) {
     RunningProgram tree = host.start(suse.commandLine({"tree"}));
     ASSERT_TRUE(eventually([&] { return isRunning(host, "sleep"); }));
     stopAtOnce(host, tree, SIGINT);
+}
+
+// A Ctrl-C reaches shells and tools as well: what a tool that goes on has lost is its parent.
+HOST_TEST(ASignal, KillsWhatACommandHasLeftBehind) {
+    const SuseHost suse(host);
+    host.tool("fdisk -ls", ToolAnswer{.out = "", .action = "(sleep 999 &) ; sleep 1000"});
+    RunningProgram tree = host.start(suse.commandLine({"tree"}));
+    ASSERT_TRUE(eventually([&] { return isRunning(host, std::string("sleep\0", 6) + "1000"); }));
+    stopAtOnce(host, tree, SIGINT);
+}
+
+// Such as a service that it has started. The kernel tells the age of a process in hundredths of a second: the
+// command goes on for some of them, so that the next one is younger than what it leaves.
+HOST_TEST(ASignal, SparesWhatACommandBeforeHasLeftBehind) {
+    const SuseHost suse(host);
+    host.tool("fdisk -ls", ToolAnswer{.out = "", .action = "(sleep 999 > /dev/null 2>&1 &) ; sleep 0.05"});
+    host.tool("brctl show", ToolAnswer{.out = "", .action = "sleep 1000"});
+    RunningProgram tree = host.start(suse.commandLine({"tree"}));
+    ASSERT_TRUE(eventually([&] { return isRunning(host, std::string("sleep\0", 6) + "1000"); }));
+    stop(tree, SIGTERM);
+    EXPECT_FALSE(isRunning(host, std::string("sleep\0", 6) + "1000"));
+    EXPECT_TRUE(isRunning(host, std::string("sleep\0", 6) + "999"));
+}
+
+HOST_TEST(ASignal, ThatTheCallerHasBlockedEndsTheProgram) {
+    const SuseHost suse(host);
+    host.tool("fdisk -ls", hanging());
+    sigset_t all;
+    sigset_t before;
+    sigfillset(&all);
+    pthread_sigmask(SIG_SETMASK, &all, &before);
+    RunningProgram tree = host.start(suse.commandLine({"tree"}));
+    pthread_sigmask(SIG_SETMASK, &before, nullptr);
+    ASSERT_TRUE(eventually([&] { return isRunning(host, "sleep"); }));
+    stopAtOnce(host, tree, SIGTERM);
+}
+
+/// The signals that a program ignores, as the kernel writes them: a number in hexadecimal digits.
+unsigned long ignoredBy(const FakeHost& host, const RunningProgram& program) {
+    const std::string status = host.read("/proc/" + std::to_string(program.pid()) + "/status").value_or("");
+    const std::string label = "SigIgn:";
+    return std::stoul(status.substr(status.find(label) + label.size()), nullptr, 16);
+}
+
+HOST_TEST(ASignal, ThatNohupIgnoresStaysIgnored) {
+    CvagentRun cvagent(host);
+    cvagent.telling("churn");
+    RunningProgram watch = host.start(fromDirectory("/", cvagent.commandLine({"watch"}), "trap '' HUP TERM"));
+    ASSERT_TRUE(watch.waitForOutput("withdrawn"));
+    const unsigned long hangUp = 1UL << (SIGHUP - 1);
+    const unsigned long terminate = 1UL << (SIGTERM - 1);
+    EXPECT_EQ(ignoredBy(host, watch) & (hangUp | terminate), hangUp);
+    EXPECT_EQ(stop(watch, SIGTERM).status, 0);
 }
 
 HOST_TEST(ASignal, FollowedByOthersEndsTheProgramAsWell) {

@@ -6,6 +6,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <csignal>
 #include <cstdlib>
 #include <filesystem>
 #include <set>
@@ -15,6 +16,7 @@
 #include "agent/core/surroundings.h"
 #include "tests/agent/cvagent_run.h"
 #include "tests/agent/from_directory.h"
+#include "tests/agent/hostile_host.h"
 #include "tests/agent/suse_host.h"
 
 namespace {
@@ -64,9 +66,8 @@ HOST_TEST(StrangersDirectory, HoldsNoPlugin) {
         kStrangers + std::string("/bin"), {"env", "LD_LIBRARY_PATH=" + libraries, CVAGENT_PROGRAM, "tree"}));
     EXPECT_EQ(run.status, 1);
     // A sanitizer has things of its own to say.
-    EXPECT_THAT(run.err,
-                testing::EndsWith("cvagent: cannot tell where this program lies, for there is no /proc; "
-                                  "name the plug-in with --plugin FILE\n"));
+    EXPECT_THAT(run.err, HasSubstr("cvagent: cannot tell where this program lies, for there is no /proc; "
+                                   "name the plug-in with --plugin FILE\n"));
 }
 
 HOST_TEST(StartingDirectory, IsWhereTheNamesOnTheCommandLineAreMeantFrom) {
@@ -111,8 +112,8 @@ HOST_TEST(CallersEnvironment, ReachesCommandsOnlyAsFarAsTheyNeedIt) {
         names.insert(line.substr(0, line.find('=')));
     }
     // Shells set the working directory themselves.
-    EXPECT_THAT(names,
-                IsSubsetOf({"HOME", "LC_ALL", "OLDPWD", "PATH", "PWD", "TERM", "TZ", "XDG_STATE_HOME", "_"}));
+    EXPECT_THAT(names, IsSubsetOf({"CVAGENT_COMMAND", "HOME", "LC_ALL", "OLDPWD", "PATH", "PWD", "TERM", "TZ",
+                                   "XDG_STATE_HOME", "_"}));
     EXPECT_THAT(told(host), HasSubstr("LC_ALL=C\n"));
     EXPECT_THAT(told(host), HasSubstr("TZ=UTC\n"));
 }
@@ -180,6 +181,67 @@ HOST_TEST(CallersLimits, KeepACoreFromAProgramThatCollectsThem) {
     rlimit limit{};
     ASSERT_EQ(getrlimit(RLIMIT_CORE, &limit), 0);
     EXPECT_EQ(limit.rlim_cur, std::min<rlim_t>(1, limit.rlim_max));
+}
+
+HOST_TEST(CallersLimits, DoNotEndTheProgramInTheMiddleOfAWrite) {
+    SuseHost suse(host);
+    tellFromWithin(host, "ulimit -S -f; ulimit -S -t");
+    const Finished run =
+        host.run(fromDirectory("/", suse.commandLine({"tree"}), "ulimit -S -f 8 && ulimit -S -t 1000"));
+    EXPECT_EQ(run.status, 0) << run.err;
+    EXPECT_EQ(told(host), "unlimited\nunlimited\n");
+}
+
+// In a child, for a timer of a test would end it.
+TEST(CallersTimers, DoNotEndTheProgram) {
+    const auto prepared = [] {
+        alarm(1000);
+        cvagent::prepareSurroundings({});
+        _exit(alarm(0) == 0 ? 0 : 1);
+    };
+    EXPECT_EXIT(prepared(), testing::ExitedWithCode(0), "");
+}
+
+// The C library would wait for ever for somebody to write a zone that is a pipe. In a child, whose
+// environment nobody misses.
+TEST(CallersZone, IsOneOfTheSystem) {
+    const auto keeps = [](const std::string& zone) {
+        setenv("TZ", zone.c_str(), 1);
+        cvagent::reduceEnvironment();
+        return std::getenv("TZ") != nullptr;
+    };
+    const auto reduced = [&keeps] {
+        for (const char* zone : {":/etc/localtime", "/usr/share/zoneinfo/Etc/UTC", "Europe/Zurich", "UTC"}) {
+            if (!keeps(zone)) {
+                _exit(1);
+            }
+        }
+        for (const char* zone : {"/home/x/zone", ":/home/x/zone", "../../../home/x/zone", ":../zone"}) {
+            if (keeps(zone)) {
+                _exit(2);
+            }
+        }
+        _exit(0);
+    };
+    EXPECT_EXIT(reduced(), testing::ExitedWithCode(0), "");
+}
+
+// As after `exec > >(tee log); exec cvagent watch` in a shell.
+HOST_TEST(CallersChildren, AreNoCommandsOfOurs) {
+    SuseHost suse(host);
+    host.tool("fdisk -ls", hanging());
+    const Finished run = host.run(fromDirectory("/", suse.commandLine({"--command-timeout", "0.2", "tree"}),
+                                                "{ sleep 999 & } && true"));
+    EXPECT_THAT(run.err, HasSubstr("ended after 0.2 s"));
+    EXPECT_THAT(run.err, Not(HasSubstr("sleep 999")));
+    EXPECT_TRUE(isRunning(host, std::string("sleep\0", 6) + "999"));
+    RunningProgram tree =
+        host.start(fromDirectory("/", suse.commandLine({"tree"}), "{ sleep 998 & } && true"));
+    ASSERT_TRUE(eventually([&] { return isRunning(host, std::string("sleep\0", 6) + "1000"); }));
+    tree.signal(SIGTERM);
+    EXPECT_EQ(tree.wait().status, 128 + SIGTERM);
+    EXPECT_FALSE(isRunning(host, std::string("sleep\0", 6) + "1000"));
+    EXPECT_TRUE(isRunning(host, std::string("sleep\0", 6) + "998"));
 }
 
 HOST_TEST(ClosedDescriptors, NoFileTakesTheirPlace) {

@@ -200,6 +200,44 @@ HOST_TEST(Logs, AFileThatCannotBeWrittenEndsTheCommand) {
     EXPECT_THAT(cvagent.diary(), IsEmpty());
 }
 
+// Who laid it there would read what is written, or have it written where he likes.
+HOST_TEST(Logs, DoNotGoToAFileOfAnother) {
+    CvagentRun cvagent(host);
+    cvagent.telling("errors");
+    host.directory("/home/me", 01777);
+    host.file("/etc/private", "old\n", 0600);
+    host.file("/home/me/file", "", 0666);
+    host.symlink("/home/me/link", "/etc/private");
+    ASSERT_EQ(link("/etc/private", "/home/me/second"), 0);
+    ASSERT_EQ(mkfifo("/home/me/fifo", 0666), 0);
+    const Finished second = cvagent({"--log", "/home/me/second", "tree"});
+    EXPECT_EQ(second.status, 1);
+    EXPECT_THAT(second.err, HasSubstr("belongs to somebody else or has a second name"));
+    for (const std::string file : {"/home/me/file", "/home/me/link", "/home/me/fifo"}) {
+        if (!host.giveToStranger(file)) {
+            GTEST_SKIP() << "there is no stranger";
+        }
+        const Finished run = cvagent({"--log", file, "tree"});
+        EXPECT_EQ(run.status, 1) << file;
+        EXPECT_THAT(run.err, HasSubstr("cannot write to '" + file + "'"));
+    }
+    EXPECT_EQ(host.read("/home/me/file"), "");
+    EXPECT_EQ(host.read("/etc/private"), "old\n");
+    EXPECT_THAT(cvagent.diary(), IsEmpty());
+}
+
+HOST_TEST(Logs, GoThroughALinkOfOurs) {
+    CvagentRun cvagent(host);
+    cvagent.telling("errors");
+    host.directory("/home/me");
+    host.symlink("/home/me/link", "/var/log");
+    EXPECT_EQ(cvagent({"--log", "/home/me/link", "tree"}).status, 0);
+    EXPECT_THAT(host.read("/var/log").value_or(""), HasSubstr("first error"));
+    const Finished shown = cvagent({"--log", "/dev/fd/2", "tree"});
+    EXPECT_EQ(shown.status, 0);
+    EXPECT_THAT(shown.err, HasSubstr("first error"));
+}
+
 HOST_TEST(BrokenPlugins, EachHaveAMessageOfTheirOwn) {
     host.file("/tmp/text.so", "no library");
     host.file("/tmp/empty.so", "");

@@ -16,7 +16,7 @@
 
 namespace {
 
-constexpr unsigned int kUnprivileged = 65534;
+constexpr unsigned int kNobody = 65534;
 
 [[noreturn]] void become(const std::vector<std::string>& words) {
     std::vector<char*> arguments;
@@ -116,7 +116,7 @@ OnTerminal stopOnTerminal(const std::vector<std::string>& words, const std::stri
 
 void makeForNobody(const std::string& directory) {
     if (mkdir(directory.c_str(), 0700) != 0 ||
-        (geteuid() == 0 && chown(directory.c_str(), kUnprivileged, kUnprivileged) != 0)) {
+        (geteuid() == 0 && chown(directory.c_str(), kNobody, kNobody) != 0)) {
         throw std::runtime_error("cannot make " + directory);
     }
 }
@@ -133,7 +133,7 @@ OnTerminal runAsNobody(const std::vector<std::string>& words, const std::string&
         unsetenv("CORVISTA_DATA_DIR");
         unsetenv("XDG_STATE_HOME");
         setenv("HOME", home.c_str(), 1);
-        if (geteuid() == 0 && (setgid(kUnprivileged) != 0 || setuid(kUnprivileged) != 0)) {
+        if (geteuid() == 0 && (setgid(kNobody) != 0 || setuid(kNobody) != 0)) {
             _exit(126);
         }
         become(words);

@@ -1,6 +1,7 @@
 #include "mi/line_file.h"
 
 #include <sys/mount.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/time.h>
 
@@ -143,6 +144,16 @@ HOST_TEST(LineFile, CannotOpenAFileThatAFullDiskDoesNotLetBeOpened) {
     EXPECT_FALSE(file.write("/etc/full/file"));
     EXPECT_TRUE(capture.messages(6000).empty()) << "the writer says it in its own words";
     EXPECT_EQ(host.read("/etc/full/file"), "old\n");
+}
+
+HOST_TEST(LineFile, LeavesTheOldFileWhenTheProcessMayNotWriteALongerOne) {
+    host.file("/etc/file", "old\n");
+    rlimit limit{};
+    ASSERT_EQ(getrlimit(RLIMIT_FSIZE, &limit), 0);
+    const rlimit low{4096, limit.rlim_max};
+    ASSERT_EQ(setrlimit(RLIMIT_FSIZE, &low), 0);
+    expectNoRoom(host, "/etc/file", 4097);
+    ASSERT_EQ(setrlimit(RLIMIT_FSIZE, &limit), 0);
 }
 
 HOST_TEST(LineFile, LeavesTheOldFileWhenTheDiskHasNoRoomForALongerOne) {

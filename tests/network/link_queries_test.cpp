@@ -265,6 +265,16 @@ HOST_TEST(NicUp, ANameWithBondInItIsABondWhereverItStands) {
     EXPECT_FALSE(IC::isNICUp("bond0"));
 }
 
+// A member's name has a blank in front: a file of that name where the agent stands is read as well.
+HOST_TEST(NicUp, ABondThatNamesItselfEnds) {
+    host.file("/proc/net/bonding/bond0", "MII Status: up\nSlave Interface: bond0\n");
+    host.file("/home/stranger/bond0", "MII Status: up\nSlave Interface: bond0\n");
+    ASSERT_EQ(chdir("/home/stranger"), 0);
+    const CommandLines commands;
+    EXPECT_FALSE(IC::isNICUp("bond0"));
+    EXPECT_LT(commands.all().size(), 20U);
+}
+
 HOST_TEST(NicUp, AMissingBondIsDown) {
     EXPECT_FALSE(IC::isNICUp("bond7"));
 }

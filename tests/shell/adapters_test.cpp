@@ -8,6 +8,7 @@
 #include "agent/shell/runner.h"
 #include "tests/shell/both_ways.h"
 #include "tests/support/fake_host.h"
+#include "tests/support/waiting.h"
 
 namespace {
 
@@ -63,12 +64,18 @@ void useAdapters() {
     cvagent::shell::setHostTools(HOSTTOOLS_PROGRAM);
 }
 
+/// A link settles, and the news of it come, a moment after the change.
 void compareListings(const std::string& change) {
     for (const std::string listing : kListings) {
-        const auto ours = direct(listing, Complaints::unseen);
-        const auto theirs = inShell(listing, Complaints::unseen);
+        auto ours = direct(listing, Complaints::unseen);
+        auto theirs = inShell(listing, Complaints::unseen);
+        const auto alike = [&] {
+            ours = direct(listing, Complaints::unseen);
+            theirs = inShell(listing, Complaints::unseen);
+            return withoutCounts(ours.out) == withoutCounts(theirs.out);
+        };
+        EXPECT_TRUE(eventually(alike)) << listing << " after " << change << ":\n" << ours.out << theirs.out;
         EXPECT_FALSE(ours.inShell) << listing;
-        EXPECT_EQ(withoutCounts(ours.out), withoutCounts(theirs.out)) << listing << " after " << change;
         EXPECT_EQ(ours.status, theirs.status) << listing << " after " << change;
     }
 }
