@@ -59,9 +59,11 @@ void OsHwMI::checkAndSendNetAlert() {
             continue;
         }
         const auto now = OSHWMI_IND::pass().current.find(name);
-        MutableNode* node = nullptr;
-        if (now == OSHWMI_IND::pass().current.end() || now->second == before ||
-            !findNetworkPort(name, &node)) {
+        if (now == OSHWMI_IND::pass().current.end() || now->second == before) {
+            continue;
+        }
+        const auto node = findNetworkPort(name);  // held, should it be withdrawn meanwhile
+        if (!node) {
             continue;
         }
         logInd(kProgress) << "OsHwMI::checkAndSendNetAlert() entering switch case";

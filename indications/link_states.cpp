@@ -151,11 +151,13 @@ unsigned int OsHwMI::bondedNetNodeStatus(const std::string& bond) {
 unsigned int OsHwMI::memberVerdict(const std::string& member) const {
     // Compared with the last pass only: the current map is still being built when this is asked.
     const auto before = OSHWMI_IND::pass().previous.find(member);
-    MutableNode* node = nullptr;
-    if (before == OSHWMI_IND::pass().previous.end() || !findNetworkPort(member, &node)) {
+    if (before == OSHWMI_IND::pass().previous.end()) {
         return LinkState::noVerdict;
     }
-    const auto held = node->weak_from_this().lock();  // however long the host takes to answer
+    const auto node = findNetworkPort(member);  // held, however long the host takes to answer
+    if (!node) {
+        return LinkState::noVerdict;
+    }
     const auto now = readState(*node);
     return now && now->name == member ? verdict(before->second, now->state) : LinkState::noVerdict;
 }

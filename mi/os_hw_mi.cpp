@@ -162,18 +162,19 @@ std::map<std::string, std::shared_ptr<MutableNode>> OsHwMI::nodesByName() const 
 }
 
 bool OsHwMI::findNetworkPort(std::string name, MutableNode** node) const {
+    const auto held = findNetworkPort(name);
+    *node = held ? held.get() : *node;
+    return held != nullptr;
+}
+
+std::shared_ptr<MutableNode> OsHwMI::findNetworkPort(const std::string& name) const {
     const LogScope scope;
     const std::lock_guard lock(inventoryGuard_);
     if (!inventory_) {
-        return false;
+        return nullptr;
     }
     const auto found = inventory_->nodesByName.find(name);
-    if (found == inventory_->nodesByName.end()) {
-        return false;
-    }
-    const auto held = found->second.lock();
-    *node = held ? held.get() : *node;
-    return held != nullptr;
+    return found == inventory_->nodesByName.end() ? nullptr : found->second.lock();
 }
 
 }  // namespace IC

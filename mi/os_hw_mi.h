@@ -67,8 +67,7 @@ public:
     void createIPConfigNodes(std::vector<CIPInfo*>* addresses, std::string name, MutableNode* parent,
                              unsigned int& index);
     void stringFormatForDNSServersAndSuffixes(std::string& servers, std::string& suffixes);
-    /// Looks an interface up among the published nodes.
-    /// @param node receives the node when there is one
+    /// Looks an interface up among the published nodes. @param node receives the node when there is one
     bool findNetworkPort(std::string name, MutableNode** node) const;
 
     // indications/
@@ -101,6 +100,7 @@ private:
     void rememberByName(const std::string& name, MutableNode* node);
     /// A copy: the walk over the interfaces and the network monitor run at the same time.
     std::map<std::string, std::shared_ptr<MutableNode>> nodesByName() const;
+    std::shared_ptr<MutableNode> findNetworkPort(const std::string& name) const;  ///< held; null for none
     void stopMonitors();
     void stopHardDriveMonitor();
     Error emptyTree();

@@ -6,6 +6,7 @@
 
 #include <cerrno>
 #include <cstring>
+#include <filesystem>
 
 #include "agent/cli/child.h"
 #include "agent/cli/failure.h"
@@ -17,13 +18,27 @@
 
 namespace cvagent {
 
+namespace {
+
+/// As an errno; 0 when nothing speaks against it.
+int whyNotRun(const std::string& program) {
+    if (access(program.c_str(), X_OK) != 0) {
+        return errno;
+    }
+    return std::filesystem::is_directory(program) ? EISDIR : 0;
+}
+
+}  // namespace
+
 EventProgram::EventProgram(std::string program, Seconds longest, std::shared_ptr<Subscription> events)
     : program_(std::move(program)),
       longest_(std::chrono::duration_cast<Clock::duration>(longest)),
       events_(std::move(events)),
       stop_(eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)) {
-    if (access(program_.c_str(), X_OK) != 0) {
-        const int error = errno;
+    if (stop_ < 0) {
+        throw Failure(ExitStatus::failed, std::string("cannot wait for events: ") + std::strerror(errno));
+    }
+    if (const int error = whyNotRun(program_); error != 0) {
         close(stop_);
         throw Failure(ExitStatus::usage, "cannot run " + inQuotes(program_) + ": " + std::strerror(error));
     }

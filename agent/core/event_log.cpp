@@ -4,17 +4,23 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cerrno>
+#include <cstring>
 #include <utility>
+
+#include "agent/core/problem.h"
 
 namespace cvagent {
 
 Subscription::Subscription(std::size_t most, std::optional<Event::Kind> only)
-    : most_(most), only_(only), ready_(eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)) {}
+    : most_(most), only_(only), ready_(eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)) {
+    if (ready_ < 0) {
+        throw Problem(Problem::failed, std::string("cannot wait for events: ") + std::strerror(errno));
+    }
+}
 
 Subscription::~Subscription() {
-    if (ready_ >= 0) {
-        close(ready_);
-    }
+    close(ready_);
 }
 
 void Subscription::put(const Event& event) {
@@ -56,9 +62,9 @@ void EventLog::hear(const Event& event) {
 }
 
 EventLog::Since EventLog::sinceLocked(std::uint64_t number) const {
-    const std::uint64_t oldest = last_ - kept_.size() + 1;
+    const std::uint64_t gone = last_ - kept_.size();  // the last one that is kept no more
     Since since;
-    since.missing = number + 1 < oldest ? oldest - number - 1 : 0;
+    since.missing = number < gone ? gone - number : 0;
     std::copy_if(kept_.begin(), kept_.end(), std::back_inserter(since.events),
                  [number](const Event& event) { return event.number > number; });
     return since;

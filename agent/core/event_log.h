@@ -21,6 +21,7 @@ public:
 
     /// @param most events that are kept for the subscriber; the oldest goes first
     /// @param only the one kind that he wants; nothing for all
+    /// Throws Problem (failed) when the system gives no descriptor.
     explicit Subscription(std::size_t most, std::optional<Event::Kind> only = std::nullopt);
     Subscription(const Subscription&) = delete;
     Subscription& operator=(const Subscription&) = delete;

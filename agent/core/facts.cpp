@@ -18,7 +18,7 @@ void Facts::forget(unsigned int node) {
 
 void Facts::judge(const IC::MutableNode& node, Reading& reading, Clock::time_point begun) {
     if (reading.timedOut) {
-        attachLast(node, reading);
+        attachLast(node, reading, begun);
         return;
     }
     if (reading.failed()) {
@@ -35,14 +35,14 @@ void Facts::judge(const IC::MutableNode& node, Reading& reading, Clock::time_poi
     }
 }
 
-Reading Facts::overdue(const IC::MutableNode& node, unsigned int id) {
+Reading Facts::overdue(const IC::MutableNode& node, unsigned int id, Clock::time_point begun) {
     Reading reading{id, findProperty(node.nodeType(), id), {}, "no answer in time"};
     reading.timedOut = true;
-    attachLast(node, reading);
+    attachLast(node, reading, begun);
     return reading;
 }
 
-void Facts::attachLast(const IC::MutableNode& node, Reading& reading) {
+void Facts::attachLast(const IC::MutableNode& node, Reading& reading, Clock::time_point begun) {
     const Reading last = known(node, reading.id);
     if (last.failed() || !last.asOf) {
         return;
@@ -51,10 +51,12 @@ void Facts::attachLast(const IC::MutableNode& node, Reading& reading) {
     reading.asOf = last.asOf;
     reading.stale = true;
     const std::lock_guard lock(guard_);
-    if (met_.contains(node.getNodeId())) {
-        facts_.try_emplace({node.getNodeId(), reading.id}, Fact{last.value, *last.asOf}).first->second.stale =
-            true;
+    if (!met_.contains(node.getNodeId())) {
+        return;
     }
+    Fact& fact =
+        facts_.try_emplace({node.getNodeId(), reading.id}, Fact{last.value, *last.asOf}).first->second;
+    fact.stale = fact.stale || fact.asOf <= begun;
 }
 
 std::optional<IC::PropertyValue> Facts::note(unsigned int node, unsigned int id,

@@ -23,8 +23,8 @@ public:
     /// Takes over what a read brought. One that was cut off gets the last value, marked stale.
     /// @param begun when the read began; an older answer never replaces a younger one
     void judge(const IC::MutableNode& node, Reading& reading, Clock::time_point begun);
-    /// A read of which nothing was heard until its caller's deadline.
-    Reading overdue(const IC::MutableNode& node, unsigned int id);
+    /// A read that began then and of which nothing was heard until its caller's deadline.
+    Reading overdue(const IC::MutableNode& node, unsigned int id, Clock::time_point begun);
     /// What is known of a property without asking the host: the last reading, else what the node stores.
     Reading known(const IC::MutableNode& node, unsigned int id) const;
     /// What an alert says of a property.
@@ -39,8 +39,8 @@ private:
     };
     using Key = std::pair<unsigned int, unsigned int>;  // node and property
 
-    /// The last value, marked stale.
-    void attachLast(const IC::MutableNode& node, Reading& reading);
+    /// The last value, marked stale; one that has come since the read began stays good for others.
+    void attachLast(const IC::MutableNode& node, Reading& reading, Clock::time_point begun);
 
     mutable std::mutex guard_;
     std::map<unsigned int, Clock::time_point> met_;  // the listed nodes; guarded by guard_

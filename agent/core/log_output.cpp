@@ -24,6 +24,9 @@ namespace {
 
 constexpr std::size_t kMostNames = 1000;  // that are remembered as told
 
+std::mutex latestGuard;
+const LogOutput* latest = nullptr;  // the one that the logger writes to; guarded by latestGuard
+
 bool isOurs(const struct stat& file) {
     return file.st_uid == geteuid() || file.st_uid == 0;
 }
@@ -171,12 +174,19 @@ LogOutput::LogOutput(const LogSettings& settings, std::shared_ptr<ErrorLines> un
     log_->keepErrors(std::move(unowned), settings);
     if (settings.traceFile) {
         trace_ = std::make_unique<Sink>(settings.traceFile, -1, 0);
-        CVLog::CVLogger::setTrace(trace_.get(), 0);
     }
+    const std::lock_guard lock(latestGuard);
+    latest = this;
+    CVLog::CVLogger::setTrace(trace_.get(), 0);
     CVLog::CVLogger::setLog(log_.get(), log_->threshold());  // nothing can fail any more
 }
 
 LogOutput::~LogOutput() {
+    const std::lock_guard lock(latestGuard);
+    if (latest != this) {
+        return;  // another agent's lines go on
+    }
+    latest = nullptr;
     CVLog::CVLogger::setLog(nullptr, 0);
     CVLog::CVLogger::setTrace(nullptr, 0);
 }

@@ -25,7 +25,7 @@ struct LogSettings {
 
 /// Where the plug-ins' log and trace lines go while this object lives. An error that is reported on the
 /// thread of a call belongs to that call; the others, those of starts, monitors and stops, belong to
-/// nobody's.
+/// nobody's. Of several such objects the one that was made last gets the lines.
 /// A name that the plug-in refuses to put into a command is among the errors once, with what to do about it.
 class LogOutput {
 public:

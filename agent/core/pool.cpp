@@ -128,6 +128,7 @@ void Pool::drop(const void* batch) {
     const auto first = std::stable_partition(state_->queue.begin(), state_->queue.end(), isKept);
     dropped.assign(std::make_move_iterator(first), std::make_move_iterator(state_->queue.end()));
     state_->queue.erase(first, state_->queue.end());
+    state_->done.notify_all();
 }
 
 bool Pool::settle(std::chrono::milliseconds longest) {

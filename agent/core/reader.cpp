@@ -51,16 +51,23 @@ std::vector<Reading> Reader::read(const Handle& node, const std::vector<unsigned
     return readings;
 }
 
+/// The errors of a stop of the agent, which may come next on this thread, are not the request's.
+Reading Reader::ask(const IC::MutableNode& node, unsigned int id, const Request& request) {
+    const ErrorScope scope(request.errors());
+    const auto begun = Facts::Clock::now();
+    Reading reading = readProperty(node, id);
+    facts_.judge(node, reading, begun);
+    return reading;
+}
+
 std::vector<Reading> Reader::readNow(const Handle& node, const std::vector<unsigned int>& ids,
                                      const Request& request) {
+    const auto asked = Facts::Clock::now();
     const auto answers = std::make_shared<Answers>(ids.size());
     for (std::size_t i = 0; i < ids.size(); ++i) {
         pool_.submit(node->getNodeId(), answers.get(),
                      [held = node, id = ids[i], i, answers, request, this]() mutable {
-                         const ErrorScope scope(request.errors());
-                         const auto begun = Facts::Clock::now();
-                         Reading reading = readProperty(*held, id);
-                         facts_.judge(*held, reading, begun);
+                         Reading reading = ask(*held, id, request);
                          held.reset();  // whoever has his answer may end the agent and know that it has ended
                          answers->put(i, std::move(reading));
                      });
@@ -69,7 +76,7 @@ std::vector<Reading> Reader::readNow(const Handle& node, const std::vector<unsig
     pool_.drop(answers.get());
     std::vector<Reading> readings;
     for (std::size_t i = 0; i < ids.size(); ++i) {
-        readings.push_back(come[i] ? *std::move(come[i]) : facts_.overdue(*node, ids[i]));
+        readings.push_back(come[i] ? *std::move(come[i]) : facts_.overdue(*node, ids[i], asked));
     }
     return readings;
 }

@@ -30,6 +30,7 @@ public:
 private:
     std::vector<Reading> readNow(const Handle& node, const std::vector<unsigned int>& ids,
                                  const Request& request);
+    Reading ask(const IC::MutableNode& node, unsigned int id, const Request& request);
 
     Pool& pool_;
     Facts& facts_;

@@ -75,19 +75,30 @@ private:
 
 /// Where the result of a write goes, whether somebody still waits for it or not.
 struct Writer::Pending {
-    std::mutex guard;
+    std::mutex guard;  // guards everything below
     std::condition_variable come;
-    std::optional<WriteResult> result;  // guarded by guard
+    bool begun = false;
+    bool givenUp = false;
+    std::optional<WriteResult> result;
+
+    /// @return false when nobody wants it any more
+    bool begin() {
+        const std::lock_guard lock(guard);
+        begun = !givenUp;
+        return begun;
+    }
 };
 
 WriteResult Writer::write(const Handle& node, const Property& row, const IC::PropertyValue& value,
                           const Request& request) {
     auto turn = std::make_shared<Turn>(*this, request.deadline());
     const auto pending = std::make_shared<Pending>();
-    pool_.submit(kWrites, this,
+    pool_.submit(kWrites, pending.get(),
                  [job = Job{node, row, value}, turn = std::move(turn), pending, request, this]() mutable {
-                     const ErrorScope scope(request.errors());
-                     WriteResult result = perform(job);
+                     if (!pending->begin()) {
+                         return;
+                     }
+                     WriteResult result = perform(job, request);
                      turn.reset();
                      job.node.reset();  // as in a read
                      const std::lock_guard lock(pending->guard);
@@ -99,14 +110,20 @@ WriteResult Writer::write(const Handle& node, const Property& row, const IC::Pro
                 [&pending] { return pending->result.has_value(); })) {
         return *std::move(pending->result);
     }
+    pending->givenUp = true;
+    const bool begun = pending->begun;
+    lock.unlock();
+    pool_.drop(pending.get());
+    const char* const came = begun ? " may be changed later or in part" : " was not changed";
+    const auto doubtful = begun ? Facts::Clock::now() : Facts::Clock::time_point::min();
     WriteResult result;
-    result.before = result.after = facts_.overdue(*node, row.id);
-    result.problem = Problem(Problem::timedOut,
-                             std::string(row.name) + " may be changed later or in part: no answer in time");
+    result.before = result.after = facts_.overdue(*node, row.id, doubtful);
+    result.problem = Problem(Problem::timedOut, row.name + std::string(came) + ": no answer in time");
     return result;
 }
 
-WriteResult Writer::perform(const Job& job) {
+WriteResult Writer::perform(const Job& job, const Request& request) {
+    const ErrorScope scope(request.errors());
     const Property& row = job.row;
     WriteResult result;
     result.before.id = row.id;
@@ -114,10 +131,11 @@ WriteResult Writer::perform(const Job& job) {
         result.before = readHere(*job.node, row.id);
     }
     result.problem = setGuarded(*job.node, row, job.value);
+    refresh_();
     if (result.problem && result.problem->kind() == Problem::failed) {
+        result.after = {row.id, row, {}, "not asked"};
         return result;
     }
-    refresh_();
     result.after = {row.id, row, {}, result.problem ? "cut off" : "can only be written"};
     if (!result.problem && row.readable()) {
         result.after = readHere(*job.node, row.id);

@@ -23,7 +23,7 @@ struct WriteResult {
     };
 
     Reading before;  ///< of a property that can only be written: nothing was read
-    Reading after;
+    Reading after;   ///< failed when nothing was read, as after a write that failed
     Outcome outcome = notKnown;
     std::optional<Problem> problem;  ///< why it failed, or was cut off; nothing when the plug-in took it
 };
@@ -39,7 +39,7 @@ public:
     Writer& operator=(const Writer&) = delete;
 
     /// @param node kept until the write is done. A write that hangs at its caller's deadline goes on, and no
-    ///             other one begins before its end.
+    ///             other one begins before its end; one that has not begun by then never does.
     /// Throws Problem (busy) when another write is at work until the deadline.
     WriteResult write(const Handle& node, const Property& row, const IC::PropertyValue& value,
                       const Request& request);
@@ -49,7 +49,7 @@ private:
     struct Pending;
     class Turn;
 
-    WriteResult perform(const Job& job);
+    WriteResult perform(const Job& job, const Request& request);
     Reading readHere(const IC::MutableNode& node, unsigned int id);
 
     Pool& pool_;

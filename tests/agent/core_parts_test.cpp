@@ -4,6 +4,7 @@
 
 #include <barrier>
 #include <latch>
+#include <limits>
 #include <thread>
 #include <type_traits>
 
@@ -79,6 +80,14 @@ TEST(EventLog, NumbersEventsAndKeepsTheLastOnes) {
     EXPECT_THAT(log.since(5).events, IsEmpty());
     EXPECT_EQ(log.since(99).missing, 0U);
     EXPECT_THAT(log.since(99).events, IsEmpty());
+}
+
+TEST(EventLog, MissesNothingAfterANumberThatIsStillToCome) {
+    EventLog log(3);
+    log.hear(eventOf(Event::Kind::alert));
+    const EventLog::Since since = log.since(std::numeric_limits<std::uint64_t>::max());
+    EXPECT_THAT(since.events, IsEmpty());
+    EXPECT_EQ(since.missing, 0U);
 }
 
 TEST(EventLog, ASlowSubscriberLosesTheOldestAndIsToldHowMany) {
@@ -254,6 +263,23 @@ TEST(Facts, AnOlderAnswerThatComesLateChangesNothing) {
     EXPECT_EQ(static_cast<std::string>(facts.known(node, 5).value), "young");
 }
 
+TEST(Facts, AnOlderReadThatIsCutOffLeavesAYoungerAnswerGood) {
+    const IC::MutableNode node(7, 0, {1}, 40, 0);
+    Facts facts;
+    facts.meet(7);
+    const auto earlier = Facts::Clock::now();
+    Reading young{5, {}, IC::PropertyValue("young", true), {}};
+    facts.judge(node, young, earlier + 1s);
+    Reading cut{5, {}, {}, "timed out", false, true};
+    facts.judge(node, cut, earlier);
+    EXPECT_EQ(static_cast<std::string>(cut.value), "young");
+    EXPECT_FALSE(facts.known(node, 5).stale);
+    facts.overdue(node, 5, earlier);
+    EXPECT_FALSE(facts.known(node, 5).stale);
+    facts.overdue(node, 5, earlier + 1s);
+    EXPECT_TRUE(facts.known(node, 5).stale);
+}
+
 TEST(Facts, WhatTheNodeStoresIsKnownFromTheStartOn) {
     IC::MutableNode node(7, 0, {1}, 40, 0);
     node.setProperty(5, IC::PropertyValue("stored", true));
@@ -262,9 +288,9 @@ TEST(Facts, WhatTheNodeStoresIsKnownFromTheStartOn) {
     facts.meet(7);
     EXPECT_EQ(static_cast<std::string>(facts.known(node, 5).value), "stored");
     EXPECT_GE(facts.known(node, 5).asOf, before);
-    EXPECT_TRUE(facts.overdue(node, 5).stale);
-    EXPECT_EQ(static_cast<std::string>(facts.overdue(node, 5).value), "stored");
-    EXPECT_FALSE(facts.overdue(node, 6).stale);
+    EXPECT_TRUE(facts.overdue(node, 5, Facts::Clock::now()).stale);
+    EXPECT_EQ(static_cast<std::string>(facts.overdue(node, 5, Facts::Clock::now()).value), "stored");
+    EXPECT_FALSE(facts.overdue(node, 6, Facts::Clock::now()).stale);
     facts.forget(7);
     EXPECT_EQ(facts.known(node, 5).asOf, std::nullopt);
 }

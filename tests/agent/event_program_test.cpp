@@ -73,6 +73,9 @@ HOST_TEST(EventProgram, ThatIsNoneIsWrongUsage) {
     const Finished run = CvagentRun(host)({"watch", "--for", "0", "--exec", "/nowhere"});
     EXPECT_EQ(run.status, 2);
     EXPECT_THAT(run.err, HasSubstr("cannot run '/nowhere': No such file or directory"));
+    const Finished directory = CvagentRun(host)({"watch", "--for", "0", "--exec", "/opt"});
+    EXPECT_EQ(directory.status, 2);
+    EXPECT_THAT(directory.err, HasSubstr("cannot run '/opt': Is a directory"));
     host.file("/opt/text", "no program\n", 0755);
     const Finished text = CvagentRun(host).telling("early")({"watch", "--for", "0", "--exec", "/opt/text"});
     EXPECT_EQ(text.status, 0);

@@ -49,8 +49,9 @@ corvista_test(agent_suse_host LIBRARIES test_support SOURCES
 target_compile_definitions(agent_suse_host_test PRIVATE ${agent_test_programs})
 add_dependencies(agent_suse_host_test cvagent vantrelcvicoshwmi)
 
-corvista_test(agent_core LIBRARIES agent_core test_support LABELS threads SOURCES
-  agent/agent_test.cpp)
+corvista_test(agent_core LIBRARIES agent_cli agent_core test_support LABELS threads SOURCES
+  agent/agent_test.cpp
+  agent/calls_test.cpp)
 target_compile_definitions(agent_core_test PRIVATE ${agent_test_programs})
 add_dependencies(agent_core_test fake_plugin vantrelcvicoshwmi)
 

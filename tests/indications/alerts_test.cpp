@@ -179,6 +179,35 @@ HOST_TEST(Alerts, AreNoneForAnUnknownStateWhichIsLogged) {
     }
 }
 
+/// Is withdrawn while it is marked.
+class LeavingNode : public InterfaceNode {
+public:
+    using InterfaceNode::InterfaceNode;
+    LeavingNode(const LeavingNode&) = delete;
+    LeavingNode& operator=(const LeavingNode&) = delete;
+    ~LeavingNode() override { gone = true; }
+    IC::Error setProperty(const unsigned int& /*id*/, const IC::PropertyValue& /*value*/) override {
+        IC::Error result = IC::myoshwmi.deleteNode(this);
+        goneTooSoon = gone;
+        return result;
+    }
+    static inline bool gone = false;
+    static inline bool goneTooSoon = false;
+};
+
+HOST_TEST(Alerts, HoldTheNodeTheyAreAbout) {
+    Interfaces interfaces;
+    Agent agent(interfaces.mi());
+    interfaces.add<LeavingNode>("eth0", 77);
+    interfaces.previous() = {{"eth0", 1}};
+    interfaces.current() = {{"eth0", 32}};
+    interfaces.mi().checkAndSendNetAlert();
+    ASSERT_EQ(agent.alerts.size(), 1U);
+    EXPECT_THAT(agent.alerts[0].substitutions(), TextsAre("/ports/eth0"));
+    EXPECT_FALSE(LeavingNode::goneTooSoon);
+    EXPECT_TRUE(LeavingNode::gone);
+}
+
 HOST_TEST(Alerts, GoOutInTheOrderOfTheNamesOneByOne) {
     OneChange change(12, 1);
     change.interfaces.add("bond0", 1);
