@@ -44,10 +44,12 @@ void useRealTools(FakeHost& host) {
     host.useKernelNetwork();
     host.directory("/opt/vantrel/corvista/data");
     // The adapters stand where an agent would put them: first on the path.
-    std::string path = std::getenv("PATH");
+    std::string path;
     for (const char* tool : {"fdisk", "ifconfig", "route"}) {
-        path = buildDirectory() + "/hosttools/adapters/" + tool + ":" + path;
+        path += buildDirectory() + "/hosttools/adapters/" + tool + ":";
     }
+    const char* hosts = std::getenv("PATH");
+    path += hosts != nullptr ? hosts : "/usr/sbin:/usr/bin:/sbin:/bin";
     setenv("PATH", path.c_str(), 1);
 }
 

@@ -7,6 +7,8 @@
 #include <sys/stat.h>
 #include <sys/syscall.h>
 
+#include <algorithm>
+#include <array>
 #include <cerrno>
 #include <optional>
 
@@ -125,7 +127,8 @@ LocalFile::Outcome removable(const std::string& path) {
         return errno == ENOENT ? LocalFile::missing : LocalFile::unfit;
     }
     const auto kind = kindOf(looked);
-    const bool fits = kind == static_cast<mode_t>(S_IFREG) || kind == static_cast<mode_t>(S_IFLNK);
+    constexpr std::array<mode_t, 2> kFit = {S_IFREG, S_IFLNK};
+    const bool fits = std::find(kFit.begin(), kFit.end(), kind) != kFit.end();
     return fits ? LocalFile::opened : LocalFile::unfit;
 }
 
