@@ -113,6 +113,8 @@ TEST(Reader, WhatEndsWithTheNodeIsNotTheRequests) {
     EXPECT_EQ(owner, nullptr);
 }
 
+// UndefinedBehaviorSanitizer looks at an object through a pipe.
+#if !defined(__SANITIZE_ADDRESS__)
 /// What the work complains of while no descriptor is to be had.
 template <class Work>
 std::string withoutDescriptors(const Work& work) {
@@ -138,6 +140,7 @@ TEST(EventLog, WhoCouldNotBeWokenDoesNotSubscribe) {
     EXPECT_EQ(withoutDescriptors([&events] { cvagent::EventProgram("/bin/true", 1s, events); }),
               "cannot wait for events: Too many open files");
 }
+#endif
 
 TEST(LogOutput, AnEarlierOneThatGoesLeavesTheLatestItsLines) {
     const auto first = std::make_shared<ErrorLines>();

@@ -54,6 +54,8 @@ HOST_TEST(StrangersDirectory, ItsNamesAreNoPartOfACommand) {
     EXPECT_EQ(told(host), "/\n");
 }
 
+// AddressSanitizer knows its own stack from /proc.
+#if !defined(__SANITIZE_ADDRESS__)
 HOST_TEST(StrangersDirectory, HoldsNoPlugin) {
     host.directory(std::string(kStrangers) + "/bin");
     const std::string fake = host.read(FAKE_PLUGIN_FILE).value_or("");
@@ -65,10 +67,11 @@ HOST_TEST(StrangersDirectory, HoldsNoPlugin) {
     const Finished run = host.run(fromDirectory(
         kStrangers + std::string("/bin"), {"env", "LD_LIBRARY_PATH=" + libraries, CVAGENT_PROGRAM, "tree"}));
     EXPECT_EQ(run.status, 1);
-    // A sanitizer has things of its own to say.
-    EXPECT_THAT(run.err, HasSubstr("cvagent: cannot tell where this program lies, for there is no /proc; "
-                                   "name the plug-in with --plugin FILE\n"));
+    EXPECT_THAT(run.err,
+                testing::EndsWith("cvagent: cannot tell where this program lies, for there is no /proc; "
+                                  "name the plug-in with --plugin FILE\n"));
 }
+#endif
 
 HOST_TEST(StartingDirectory, IsWhereTheNamesOnTheCommandLineAreMeantFrom) {
     host.file("/home/me/plugin.so", host.read(FAKE_PLUGIN_FILE).value_or(""));
