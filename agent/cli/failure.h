@@ -14,7 +14,7 @@ enum class ExitStatus {
     usage = 2,     ///< the command line makes no sense
     notFound = 3,  ///< no such node or property
     refused = 4,   ///< the value is not one the property accepts
-    busy = 5,      ///< another agent holds the data directory
+    busy = 5,      ///< another agent, or another write, is in the way
 };
 
 /// Ends the command: the text goes to standard error and says what to do next.

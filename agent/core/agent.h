@@ -30,8 +30,9 @@ struct AgentSettings {
 };
 
 /// Plug-ins at work: the one agent behind every front end. It owns data directory, log, deadline of commands,
-/// threads and plug-ins, and changes nothing of the process: that is main's, before any thread. All
-/// operations may be called from many threads at once.
+/// threads and plug-ins. It changes nothing of the process, but for the variable that names a data directory
+/// of its own making: the rest is main's, before any thread. All operations may be called from many threads
+/// at once.
 class Agent {
 public:
     /// Loads every plug-in. One that fails costs nothing of the others; when all fail, the first one's

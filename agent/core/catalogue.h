@@ -34,7 +34,7 @@ struct Label {
 
 struct Property;
 
-/// Makes the value for the plug-in out of the words of the command line; nothing when the property does not
+/// Makes the value for the plug-in out of the words that a person gave; nothing when the property does not
 /// accept them.
 using Check = std::optional<IC::PropertyValue> (*)(const Property& property,
                                                    std::span<const std::string> words);

@@ -10,7 +10,7 @@
 
 namespace cvagent {
 
-/// The plug-in beside this program: in its build tree or where it was installed. Throws Failure when it is at
+/// The plug-in beside this program: in its build tree or where it was installed. Throws Problem when it is at
 /// neither place; nowhere else is it looked for.
 std::string pluginBesideProgram();
 
