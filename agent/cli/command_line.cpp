@@ -129,12 +129,22 @@ void addReaders(CLI::App& app, Options& options) {
         ->add_option("--exec", options.program,
                      "Run this program on each alert, one at a time, with the event as JSON on its standard "
                      "input")
-        ->type_name("PROGRAM");
+        ->type_name("PROGRAM")
+        ->check(CLI::Validator(
+            [](const std::string& name) { return name.empty() ? "no program is named" : std::string(); },
+            ""));
     watch
         ->add_option("--exec-timeout", options.programSeconds,
                      "End the program, with what it has started, when it takes longer. Default: 30")
         ->type_name("SECONDS")
-        ->check(secondsUpTo(86400));
+        ->check(secondsUpTo(86400))
+        ->check(CLI::Validator(
+            [](const std::string& seconds) {
+                double time = 0;
+                const bool some = CLI::detail::lexical_cast(seconds, time) && time > 0;
+                return some ? std::string() : inQuotes(seconds) + " leaves the program no time";
+            },
+            ""));
     addJson(*watch, options);
     watch->footer("With --json each event is one object on a line of its own.");
     watch->callback([&options] { options.command = Command::watch; });

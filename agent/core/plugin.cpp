@@ -123,7 +123,11 @@ void Plugin::open() {
 }
 
 void Plugin::start() {
-    running_.emplace(*interface_);
+    try {
+        running_.emplace(*interface_);
+    } catch (const Problem& problem) {
+        throw Problem(problem.kind(), inQuotes(file_) + ": " + problem.what());
+    }
     try {
         guarded("initialize of " + inQuotes(file_), [this] {
             const IdRange ids = running_->ids();

@@ -82,6 +82,15 @@ HOST_TEST(EventProgram, ThatIsNoneIsWrongUsage) {
     EXPECT_THAT(text.err, HasSubstr("cannot run '/opt/text' for event 1: Exec format error"));
 }
 
+HOST_TEST(EventProgram, HasANameAndSomeTime) {
+    for (const std::vector<std::string>& words :
+         {std::vector<std::string>{"--exec", ""}, {"--exec", "/bin/true", "--exec-timeout", "0"}}) {
+        std::vector<std::string> line = {"watch", "--for", "0"};
+        line.insert(line.end(), words.begin(), words.end());
+        EXPECT_EQ(CvagentRun(host)(line).status, 2) << words.back();
+    }
+}
+
 HOST_TEST(EventProgram, ThatHangsIsKilledWithItsDescendants) {
     install(host, "trap '' TERM\nsleep 1000 &\n(sleep 1001 &)\necho $$ > /var/process\nsleep 1002\n");
     const Finished run = CvagentRun(host).telling("early late")(
