@@ -1,5 +1,6 @@
 #include "agent/core/agent.h"
 
+#include <algorithm>
 #include <utility>
 
 #include "agent/core/announcer.h"
@@ -21,6 +22,7 @@ struct Agent::Engine {
     std::vector<Handle> handles() const;
     void load(const std::string& file);
     void refresh();
+    bool lists(const Handle& node) const;
 
     std::shared_ptr<DataDirectory> data;
     Tell tell;
@@ -33,7 +35,8 @@ struct Agent::Engine {
     std::vector<FailedPlugin> failed;
     Pool pool;
     Reader reader{pool, facts};
-    Writer writer{pool, facts, announcer, [this] { refresh(); }};
+    Writer writer{
+        pool, facts, announcer, {[this] { refresh(); }, [this](const Handle& node) { return lists(node); }}};
 };
 
 Agent::Engine::Engine(const AgentSettings& settings)
@@ -53,7 +56,7 @@ Agent::Engine::Engine(const AgentSettings& settings)
 void Agent::Engine::load(const std::string& file) {
     try {
         plugins.push_back(std::make_unique<Plugin>(file, &announcer, tell));
-        announcer.takeStock(plugins.back()->interface().holdAll());
+        announcer.takeStock(plugins.back()->interface());
     } catch (const Problem& problem) {
         failed.push_back({file, problem});
     }
@@ -73,6 +76,12 @@ void Agent::Engine::refresh() {
         setPaths(plugin->interface());
         announcer.announceNew(plugin->interface());
     }
+}
+
+bool Agent::Engine::lists(const Handle& node) const {
+    return std::any_of(plugins.begin(), plugins.end(), [&node](const auto& plugin) {
+        return plugin->interface().hold(node->getNodeId()).get() == node.get();
+    });
 }
 
 Agent::Agent(const AgentSettings& settings) : engine_(std::make_shared<Engine>(settings)) {}

@@ -35,6 +35,8 @@ struct Event {
     unsigned int eventCode = 0;
 };
 
+constexpr std::size_t kEventKinds = 4;
+
 /// "published", "withdrawn", "alert" or "written".
 const char* eventName(Event::Kind kind);
 Event nodeEvent(Event::Kind kind, const IC::Node& node);

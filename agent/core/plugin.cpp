@@ -71,7 +71,7 @@ std::string pluginBesideProgram() {
 void tellNobody(const std::string& /*text*/) {}
 
 Plugin::Plugin(const std::string& file, Listener* listener, Tell tell)
-    : file_(file), listener_(listener), tell_(std::move(tell)) {
+    : file_(file), events_(listener), tell_(std::move(tell)) {
     try {
         load();
         open();
@@ -80,6 +80,7 @@ Plugin::Plugin(const std::string& file, Listener* listener, Tell tell)
         close();
         throw;
     }
+    events_.release();
 }
 
 Plugin::~Plugin() {
@@ -195,25 +196,19 @@ IC::Error Plugin::nodeLoaded(IC::Node* const& node, const void* plugin) {
         return {IC::Error::failure, IC::Number(), "the id of another plug-in's node"};
     }
     known->setPath(makePath(*self->interface_, *known));
-    if (self->listener_ != nullptr) {
-        self->listener_->hear(nodeEvent(Event::Kind::published, *known));
-    }
+    self->events_.hear(nodeEvent(Event::Kind::published, *known));
     return {};
 }
 
 void Plugin::nodeWithdrawn(const IC::Node& node, const void* plugin) {
     const auto* self = static_cast<const Plugin*>(plugin);
-    if (self->listener_ != nullptr) {
-        self->listener_->hear(nodeEvent(Event::Kind::withdrawn, node));
-    }
+    self->events_.hear(nodeEvent(Event::Kind::withdrawn, node));
 }
 
 IC::Error Plugin::alertsCame(const std::vector<IC::Alert>& alerts, const void* plugin) {
     const auto* self = static_cast<const Plugin*>(plugin);
     for (const IC::Alert& alert : alerts) {
-        if (self->listener_ != nullptr) {
-            self->listener_->hear(alertEvent(alert, self->interface_->holdAll()));
-        }
+        self->events_.hear(alertEvent(alert, self->interface_->holdAll()));
     }
     return {};
 }

@@ -35,8 +35,10 @@ struct WriterParts {
     EventLog events;
     cvagent::Announcer announcer{events, facts};
     int refreshed = 0;
+    bool listed = true;
     Pool pool{1, 1};
-    cvagent::Writer writer{pool, facts, announcer, [this] { ++refreshed; }};
+    cvagent::Writer writer{
+        pool, facts, announcer, {[this] { ++refreshed; }, [this](const Handle&) { return listed; }}};
 };
 
 TEST(Writer, AWriteThatHasNotBegunAtItsDeadlineNeverDoes) {

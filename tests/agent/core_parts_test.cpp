@@ -198,7 +198,7 @@ TEST(Pool, WhatWasNotBegunCanBeTakenBack) {
         Pool pool(1, 1);
         stuck.submitTo(pool, 7, 3);
         stuck.waitFor(1);
-        pool.drop(&stuck);
+        pool.giveUp(&stuck);
         std::latch done(1);
         pool.submit(8, nullptr, [&done] { done.count_down(); });
         stuck.release();
@@ -312,7 +312,7 @@ TEST(Announcer, TellsOfANodeOnceWhoeverSeesItFirst) {
     Facts facts;
     cvagent::Announcer announcer(log, facts);
     ports.addPort("eth0");
-    announcer.takeStock(ports.holdAll());
+    announcer.takeStock(ports);
     announcer.announceNew(ports);
     EXPECT_EQ(log.last(), 0U);
     const IC::MutableNode* const made = ports.addPort("eth1");
@@ -331,7 +331,7 @@ TEST(Announcer, AnAlertTellsTheStateBeforeAndAfter) {
     Facts facts;
     cvagent::Announcer announcer(log, facts);
     ports.addPort("eth0");
-    announcer.takeStock(ports.holdAll());
+    announcer.takeStock(ports);
     for (const auto& [code, message] : std::vector<std::pair<unsigned int, std::string>>{
              {12, "NIC is Offline "}, {1, "NIC is Online "}, {32, "NIC has Switched Over "}}) {
         announcer.hear(
