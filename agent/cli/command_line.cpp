@@ -3,6 +3,7 @@
 #include <CLI/CLI.hpp>
 #include <cmath>
 #include <iostream>
+#include <sstream>
 
 #include "agent/cli/failure.h"
 #include "agent/cli/print.h"
@@ -206,7 +207,9 @@ std::optional<Options> parseCommandLine(int count, const char* const* words, int
         unmark(options);
         return options;
     } catch (const CLI::Success& help) {
-        status = app.exit(help);
+        std::ostringstream text;
+        status = app.exit(help, text, text);
+        print(text.str());
     } catch (const CLI::RequiredError& error) {
         const bool noCommand = app.get_subcommands().empty();
         std::cerr << "cvagent: " << (noCommand ? "which command? Try: cvagent tree" : error.what())

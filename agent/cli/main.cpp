@@ -1,4 +1,5 @@
 #include <exception>
+#include <optional>
 
 #include "agent/cli/command_line.h"
 #include "agent/cli/commands/commands.h"
@@ -82,6 +83,15 @@ ExitStatus runGuarded(Options& options) {
     }
 }
 
+std::optional<Options> parsed(int count, char** words, int& status) {
+    try {
+        return cvagent::parseCommandLine(count, words, status);
+    } catch (const cvagent::Failure& failure) {
+        status = static_cast<int>(endWith(failure));
+        return std::nullopt;
+    }
+}
+
 /// What is not shown or not found can be what was wanting.
 ExitStatus judged(ExitStatus status, Command command) {
     const bool wanting = command != Command::properties && cvagent::tellWant(nullptr, cvagent::complain);
@@ -98,7 +108,8 @@ ExitStatus judged(ExitStatus status, Command command) {
 
 int main(int count, char** words) {
     cvagent::openStandardDescriptors();
+    cvagent::StopSignals::becomeWriteErrors();
     int status = 0;
-    auto options = cvagent::parseCommandLine(count, words, status);
+    auto options = parsed(count, words, status);
     return options ? static_cast<int>(judged(runGuarded(*options), options->command)) : status;
 }

@@ -1,5 +1,6 @@
 #include "agent/cli/print.h"
 
+#include <poll.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -123,6 +124,22 @@ bool isUtf8Locale() {
     return false;
 }
 
+/// @return 0, or an errno
+int writeAll(int descriptor, const std::string& text) {
+    for (std::size_t done = 0; done < text.size();) {
+        const ssize_t size = write(descriptor, text.data() + done, text.size() - done);
+        if (size > 0) {
+            done += static_cast<std::size_t>(size);
+        } else if (errno == EAGAIN) {  // whoever shares the pipe may have made it so
+            pollfd room{descriptor, POLLOUT, 0};
+            poll(&room, 1, -1);
+        } else if (errno != EINTR) {
+            return errno;
+        }
+    }
+    return 0;
+}
+
 Style look() {
     const char* noColour = std::getenv("NO_COLOR");
     const char* terminal = std::getenv("TERM");
@@ -144,13 +161,13 @@ std::string Style::paint(const std::string& text, const char* code) const {
     return colour && !text.empty() ? std::string("\x1b[") + code + "m" + text + "\x1b[0m" : text;
 }
 
+/// A reader that has seen enough (head, less) needs no message.
 void print(const std::string& text) {
-    const bool written = std::fwrite(text.data(), 1, text.size(), stdout) == text.size();
-    if (!written || std::fflush(stdout) != 0) {
-        // A reader that has seen enough (head, less) needs no message.
+    const int error = standardOutputWasClosed() ? EBADF : writeAll(STDOUT_FILENO, text);
+    if (error != 0) {
         throw Failure(
             ExitStatus::failed,
-            errno == EPIPE ? "" : std::string("cannot write to standard output: ") + std::strerror(errno));
+            error == EPIPE ? "" : std::string("cannot write to standard output: ") + std::strerror(error));
     }
 }
 

@@ -24,7 +24,8 @@ private:
     std::string paint(const std::string& text, const char* code) const;
 };
 
-/// Writes text to standard output. Throws Failure when it cannot be written.
+/// Writes text to standard output. Throws Failure when it cannot be written, without a text when nobody reads
+/// it any more.
 void print(const std::string& text);
 /// One message of the program to the standard error it was started with.
 void complain(const std::string& text);

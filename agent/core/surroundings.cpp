@@ -26,6 +26,7 @@ namespace {
 namespace fs = std::filesystem;
 
 std::atomic<int> keptStandardError{STDERR_FILENO};
+std::atomic<bool> standardOutputClosed{false};
 
 /// The path as it is meant in the directory the program was started in.
 fs::path fromHere(const std::string& path) {
@@ -99,6 +100,7 @@ void forgetSignalsOfTheCaller() {
 }  // namespace
 
 void openStandardDescriptors() {
+    standardOutputClosed = fcntl(STDOUT_FILENO, F_GETFD) < 0;
     int opened = -1;
     do {
         opened = open("/dev/null", O_RDWR);
@@ -109,6 +111,10 @@ void openStandardDescriptors() {
     if (opened > STDERR_FILENO) {
         close(opened);
     }
+}
+
+bool standardOutputWasClosed() {
+    return standardOutputClosed;
 }
 
 void prepareSurroundings(const std::vector<std::string*>& files) {

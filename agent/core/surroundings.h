@@ -10,6 +10,8 @@ namespace cvagent {
 /// Opens the descriptors 0 to 2 that the program was started without (to /dev/null): the next file opened
 /// would be taken for one of them. To be called before anything else.
 void openStandardDescriptors();
+/// Whether standard output was one of them: what is written there reaches nobody.
+bool standardOutputWasClosed();
 
 /// Gives the process what the plug-in's commands need, and takes from it what would let others turn them: an
 /// environment of a few variables, a PATH with the sbin directories behind what is there, "/" as the current

@@ -150,6 +150,26 @@ HOST_TEST(AgentPlugins, OneThatFailsCostsNothingOfTheOthers) {
     EXPECT_THROW(Agent(settingsOf({"/nowhere.so"})), Problem);
 }
 
+HOST_TEST(AgentPlugins, NothingIsToldOfOneThatDoesNotStart) {
+    const cvagent::QuietCommands quiet;
+    host.file("/proc/cpuinfo", "processor\t: 0\n");
+    const auto pathsAndEvents = [](const std::string& words) {
+        setenv("CORVISTA_FAKE_PLUGIN", words.c_str(), 1);
+        const Agent agent(settingsOf({CORVISTA_PLUGIN_FILE, FAKE_PLUGIN_FILE}));
+        std::vector<std::string> events;
+        for (const Event& event : agent.events(0).events) {
+            events.push_back(eventName(event.kind) + (" " + event.path));
+        }
+        return std::pair(pathsOf(agent), events);
+    };
+    const std::string drive = "/oshw/root/computer/chassis/planar/disk-controller/hard-drive:sdc";
+    const std::string port = "/oshw/root/computer/chassis/network-controller/network-port:eth0";
+    EXPECT_THAT(pathsAndEvents("early publish").second, ElementsAre("alert " + port, "published " + drive));
+    const auto failed = pathsAndEvents("early publish late badstart");
+    EXPECT_THAT(failed.second, IsEmpty());
+    EXPECT_THAT(failed.first, testing::Not(testing::Contains(HasSubstr("hard-drive"))));
+}
+
 HOST_TEST(AgentPlugins, TheSameOneTwiceIsRefused) {
     const Agent agent(settingsOf({FAKE_PLUGIN_FILE, FAKE_PLUGIN_FILE}));
     ASSERT_EQ(agent.failedPlugins().size(), 1U);
@@ -208,6 +228,92 @@ HOST_TEST(AgentReads, WhatHangsIsStaleInTimeAndNothingElseIsLate) {
     EXPECT_FALSE(now.failed() || now.stale);
     EXPECT_GT(static_cast<unsigned int>(now.value), 1U);
     EXPECT_LT(static_cast<unsigned int>(now.value), 20U);  // what nobody waits for is not begun
+}
+
+HOST_TEST(AgentReads, AnyNumberOfNodesThatHangMakesNothingElseLate) {
+    Fake fake("drives");
+    host.file(kHold, "");
+    const NodeRef computer = fake.agent->find("computer");
+    std::vector<NodeRef> stuck;
+    for (int i = 0; i < 20; ++i) {
+        stuck.push_back(fake.agent->find("hard-drive:x" + std::to_string(i)));
+    }
+    const std::vector<unsigned int> ids(10, 904);
+    for (int round = 0; round < 3; ++round) {
+        for (const NodeRef& node : stuck) {
+            EXPECT_THAT(fake.agent->read(node, ids, Freshness::now, within(10ms)),
+                        Each(testing::Field(&Reading::timedOut, true)));
+        }
+        const auto start = std::chrono::steady_clock::now();
+        EXPECT_FALSE(fake.agent->read(computer, {108}, Freshness::now, within(5s)).front().failed());
+        EXPECT_LT(std::chrono::steady_clock::now() - start, 1s);
+    }
+    // Once a node has hung for long its readings are stale at once.
+    std::this_thread::sleep_for(1s);
+    const auto start = std::chrono::steady_clock::now();
+    for (const NodeRef& node : stuck) {
+        const Reading reading = fake.agent->read(node, {89}, Freshness::now, within(5s)).front();
+        EXPECT_TRUE(reading.stale && reading.timedOut);
+        EXPECT_THAT(static_cast<std::string>(reading.value), testing::StartsWith("/dev/x"));
+    }
+    EXPECT_LT(std::chrono::steady_clock::now() - start, 1s);
+    host.remove(kHold);
+    EXPECT_FALSE(fake.agent->read(stuck.front(), {89}, Freshness::now, Request("test")).front().failed());
+}
+
+HOST_TEST(AgentReads, TwentyNodesThatHangAtOnceMakeNothingElseLate) {
+    Fake fake("drives");
+    host.file(kHold, "");
+    std::vector<std::jthread> askers;
+    for (int i = 0; i < 20; ++i) {
+        askers.emplace_back([&fake, i] {
+            const NodeRef node = fake.agent->find("hard-drive:x" + std::to_string(i));
+            fake.agent->read(node, std::vector<unsigned int>(10, 904), Freshness::now, within(3s));
+        });
+    }
+    std::this_thread::sleep_for(20ms);
+    EXPECT_FALSE(fake.read(108, within(2500ms)).failed());
+    host.remove(kHold);
+}
+
+HOST_TEST(AgentReads, OneThatNobodyWaitsForAsksNobody) {
+    Fake fake;
+    const Reading reading = fake.read(904, Request("test", Request::Clock::time_point()));
+    EXPECT_TRUE(reading.timedOut && reading.failed());
+    EXPECT_EQ(static_cast<unsigned int>(fake.read(904, Request("test")).value), 1U);
+}
+
+HOST_TEST(AgentReads, TheAgentMayGoWhileTheyHang) {
+    Fake fake;
+    host.file(kHold, "");
+    fake.read(904, within(10ms));
+    std::jthread end([&fake] { fake.agent.reset(); });
+    std::this_thread::sleep_for(20ms);
+    host.remove(kHold);
+    end.join();
+    EXPECT_EQ(dlopen(FAKE_PLUGIN_FILE, RTLD_LAZY | RTLD_NOLOAD), nullptr);
+}
+
+HOST_TEST(AgentWrites, OneThatNobodyWaitsForChangesNothing) {
+    Fake fake;
+    const WriteResult late = fake.write("late", Request("test", Request::Clock::time_point()));
+    ASSERT_TRUE(late.problem);
+    EXPECT_STREQ(late.problem->what(), "OwnerContact was not changed: no answer in time");
+    EXPECT_EQ(static_cast<std::string>(fake.read(115, Request("test")).value), "");
+}
+
+HOST_TEST(AgentWrites, NobodyWaitsForEverForOneThatHangs) {
+    Fake fake;
+    host.file(kHold, "");
+    EXPECT_TRUE(fake.write("hold", within(20ms)).problem);
+    try {
+        fake.write("second", Request("test"));
+        ADD_FAILURE() << "two writes at once";
+    } catch (const Problem& problem) {
+        EXPECT_EQ(problem.kind(), Problem::busy);
+    }
+    host.remove(kHold);
+    EXPECT_EQ(fake.write("third", within(5s)).outcome, WriteResult::applied);
 }
 
 HOST_TEST(AgentReads, WhatIsKnownAsksNobody) {
@@ -327,6 +433,27 @@ HOST_TEST(AgentWrites, TwoWritersOfOneFileLoseNothing) {
         }
     }
     EXPECT_EQ(lost, 0) << "of " << rounds << " rounds";
+}
+
+HOST_TEST(AgentThreads, SixtyFourReadWhileNodesComeAndGo) {
+    Fake fake("churn alert");
+    const auto deaf = fake.agent->subscribe(0);  // never read
+    std::atomic<int> read{0};
+    {
+        std::vector<std::jthread> readers;
+        for (int i = 0; i < 64; ++i) {
+            readers.emplace_back([&fake, &read, i] {
+                for (int round = 0; round < 3; ++round) {
+                    const auto nodes = fake.agent->nodes();
+                    const NodeRef& node = nodes[static_cast<std::size_t>(i) % nodes.size()];
+                    const auto deadline = i % 2 == 0 ? within(5s) : Request("test");
+                    read += fake.agent->read(node, {89, 108}, Freshness::now, deadline).size() == 2 ? 1 : 0;
+                    fake.agent->subscribe(0, Event::Kind::alert)->take();
+                }
+            });
+        }
+    }
+    EXPECT_EQ(read, 64 * 3);
 }
 
 HOST_TEST(AgentThreads, EverythingAtOnce) {

@@ -57,6 +57,20 @@ TEST(Writer, AWriteThatHasNotBegunAtItsDeadlineNeverDoes) {
     EXPECT_EQ(parts.write(node, "next", 5s).outcome, cvagent::WriteResult::applied);
 }
 
+TEST(Writer, ANodeThatIsGoneIsNotWrittenTo) {
+    const auto node = std::make_shared<IC::MutableNode>(7, 0, std::vector<unsigned int>{1}, 40, 0);
+    node->setProperty(115, IC::PropertyValue("old", true));
+    WriterParts parts;
+    parts.listed = false;
+    const auto result = parts.write(node, "new", 5s);
+    ASSERT_TRUE(result.problem);
+    EXPECT_EQ(result.problem->kind(), Problem::notFound);
+    EXPECT_STREQ(result.problem->what(), "OwnerContact was not changed: the node is gone");
+    EXPECT_TRUE(result.after.failed());
+    EXPECT_EQ(parts.events.last(), 0U);
+    EXPECT_EQ(static_cast<std::string>(cvagent::readProperty(*node, 115).value), "old");
+}
+
 /// Refuses to be written.
 class ReadOnlyNode : public IC::MutableNode {
 public:

@@ -77,6 +77,7 @@ void follow(Subscription& events, const Options& options, const Style& style) {
 }  // namespace
 
 ExitStatus watch(Session& session, const Options& options) {
+    print("");                 // an output that is closed is told now, not at the first event
     const OrderlyEnd waiting;  // to the end of the plug-in and of its last events
     const auto events = session.agent().subscribe(0);
     std::optional<EventProgram> program;
