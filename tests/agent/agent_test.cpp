@@ -241,12 +241,12 @@ HOST_TEST(AgentReads, AnyNumberOfNodesThatHangMakesNothingElseLate) {
     const std::vector<unsigned int> ids(10, 904);
     for (int round = 0; round < 3; ++round) {
         for (const NodeRef& node : stuck) {
-            EXPECT_THAT(fake.agent->read(node, ids, Freshness::now, within(10ms)),
+            EXPECT_THAT(fake.agent->read(node, ids, Freshness::now, within(round == 0 ? 50ms : 5ms)),
                         Each(testing::Field(&Reading::timedOut, true)));
         }
         const auto start = std::chrono::steady_clock::now();
         EXPECT_FALSE(fake.agent->read(computer, {108}, Freshness::now, within(5s)).front().failed());
-        EXPECT_LT(std::chrono::steady_clock::now() - start, 1s);
+        EXPECT_LT(std::chrono::steady_clock::now() - start, 3s);
     }
     // Once a node has hung for long its readings are stale at once.
     std::this_thread::sleep_for(1s);
@@ -256,7 +256,7 @@ HOST_TEST(AgentReads, AnyNumberOfNodesThatHangMakesNothingElseLate) {
         EXPECT_TRUE(reading.stale && reading.timedOut);
         EXPECT_THAT(static_cast<std::string>(reading.value), testing::StartsWith("/dev/x"));
     }
-    EXPECT_LT(std::chrono::steady_clock::now() - start, 1s);
+    EXPECT_LT(std::chrono::steady_clock::now() - start, 3s);
     host.remove(kHold);
     EXPECT_FALSE(fake.agent->read(stuck.front(), {89}, Freshness::now, Request("test")).front().failed());
 }

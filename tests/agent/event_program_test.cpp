@@ -105,10 +105,10 @@ HOST_TEST(EventProgram, ThatHangsIsKilledWithItsDescendants) {
 }
 
 HOST_TEST(EventProgram, ASignalEndsItAtOnce) {
-    install(host, "sleep 1000\n");
+    install(host, "echo > /var/started\nsleep 1000\n");
     CvagentRun cvagent(host);
     RunningProgram watch = cvagent.telling("early").start({"watch", "--exec", kProgram});
-    ASSERT_TRUE(watch.waitForOutput("NIC is Offline"));
+    ASSERT_TRUE(eventually([&] { return host.read("/var/started").has_value(); }));
     watch.signal(SIGTERM);
     const Finished run = watch.wait(std::chrono::seconds(10));
     EXPECT_EQ(run.status, 0);
