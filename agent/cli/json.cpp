@@ -79,7 +79,7 @@ const char* kindOf(const IC::PropertyValue& value) {
 Json readingObject(const Reading& reading) {
     Json object{{"name", reading.name()}};
     if (reading.failed()) {
-        object["kind"] = reading.row ? kindName(reading.row->kind) : "none";
+        object["kind"] = reading.row != nullptr ? kindName(reading.row->kind) : "none";
         object["error"] = reading.error;
     } else {
         object["kind"] = kindOf(reading.value);
@@ -169,15 +169,19 @@ std::string event(const Event& event) {
         object["description"] = event.message;
     }
     addProperty(object, event);
+    if (!event.caller.empty()) {
+        object["caller"] = event.caller;
+    }
     if (event.number != 0) {
         object["number"] = event.number;
     }
     return document(object, -1);
 }
 
-std::string catalogue(const std::vector<Property>& rows) {
+std::string catalogue(const std::vector<const Property*>& rows) {
     Json list = Json::array();
-    for (const Property& row : rows) {
+    for (const Property* each : rows) {
+        const Property& row = *each;
         const auto type = static_cast<unsigned int>(row.type);
         Json object{{"class", className(type)},
                     {"type", type},
@@ -185,7 +189,7 @@ std::string catalogue(const std::vector<Property>& rows) {
                     {"name", row.name},
                     {"kind", kindName(row.kind)},
                     {"unit", unitName(row.unit)},
-                    {"readable", row.readable()},
+                    {"readable", row.readable},
                     {"writable", row.writable()}};
         object["values"] = labelList(row);
         object["accepts"] = row.writable() ? Json(acceptedText(row)) : Json(nullptr);

@@ -19,11 +19,11 @@ std::string tree(const std::vector<std::string>& plugins, const std::vector<Hand
 std::string node(const IC::MutableNode& node, const std::vector<Reading>& readings);
 /// {"id", "path", "property": {"id", "name", "old", "new"}}, both as in a node.
 std::string change(const IC::MutableNode& node, const Reading& before, const Reading& after);
-/// One line: {"time", "event", "path", ...}; with "number" when the agent has given one, and "property":
-/// {"id", "name", "before", "after"} when the event is about one.
+/// One line: {"time", "event", "path", ...}; with "number" when the agent has given one, "property":
+/// {"id", "name", "before", "after"} when the event is about one, and "caller" when somebody has written it.
 std::string event(const Event& event);
 /// [{"class", "type", "id", "name", "kind", "unit", "readable", "writable", "values", "accepts", "meaning"}]
-std::string catalogue(const std::vector<Property>& rows);
+std::string catalogue(const std::vector<const Property*>& rows);
 /// [{"tool", "host", "classic", "adapter", "used", "package", "purpose"}]
 std::string tools(const std::vector<ToolReport>& reports);
 

@@ -119,8 +119,4 @@ std::shared_ptr<Subscription> Agent::subscribe(std::uint64_t after, std::optiona
     return engine_->events.subscribe(after, EventLog::kMost, only);
 }
 
-EventLog::Since Agent::events(std::uint64_t after) const {
-    return engine_->events.since(after);
-}
-
 }  // namespace cvagent

@@ -60,13 +60,12 @@ public:
     /// See Reader::read.
     std::vector<Reading> read(const NodeRef& node, const std::vector<unsigned int>& ids, Freshness freshness,
                               const Request& request) const;
-    /// See Writer::write. What may be written is judged before: see operations.h.
+    /// See Writer::write. What may be written is judged before: see property_words.h.
     WriteResult write(const NodeRef& node, const Property& row, const IC::PropertyValue& value,
                       const Request& request) const;
 
     /// See EventLog. A subscription outlives the agent: the last events come while the plug-ins stop.
     std::shared_ptr<Subscription> subscribe(std::uint64_t after, std::optional<Event::Kind> only = {}) const;
-    EventLog::Since events(std::uint64_t after) const;
 
 private:
     struct Engine;

@@ -60,12 +60,14 @@ void Announcer::announceNew(const IC::ManagementInterface& interface) {
     }
 }
 
-void Announcer::announceWrite(const IC::MutableNode& node, const Reading& before, const Reading& after) {
+void Announcer::announceWrite(const IC::MutableNode& node, const Reading& before, const Reading& after,
+                              const std::string& caller) {
     Event event = nodeEvent(Event::Kind::written, node);
     event.property = after.id;
     event.propertyName = after.name();
     event.before = stateText(before);
     event.after = stateText(after);
+    event.caller = caller;
     events_.hear(event);
 }
 

@@ -21,7 +21,8 @@ public:
     void takeStock(const std::vector<Handle>& nodes);
     /// Nodes that have appeared without the plug-in's telling are told. A write can make some.
     void announceNew(const IC::ManagementInterface& interface);
-    void announceWrite(const IC::MutableNode& node, const Reading& before, const Reading& after);
+    void announceWrite(const IC::MutableNode& node, const Reading& before, const Reading& after,
+                       const std::string& caller);
 
 private:
     void hearAlert(Event event);

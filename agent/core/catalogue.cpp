@@ -2,10 +2,10 @@
 
 #include <strings.h>
 #include <algorithm>
-#include <charconv>
 #include <stdexcept>
 
 #include "agent/core/oshw/tables.h"
+#include "agent/core/text.h"
 #include "agent/core/value_check.h"
 
 namespace cvagent {
@@ -84,40 +84,34 @@ const AlertRow* findAlert(const std::string& message) {
     return nullptr;
 }
 
-std::vector<Property> propertiesOf(unsigned int nodeType) {
-    std::vector<Property> rows;
+std::vector<const Property*> propertiesOf(unsigned int nodeType) {
+    std::vector<const Property*> rows;
     for (const CatalogueTable* table : tables()) {
         for (const auto part : table->properties) {
-            std::copy_if(part.begin(), part.end(), std::back_inserter(rows), [nodeType](const Property& row) {
-                return static_cast<unsigned int>(row.type) == nodeType;
-            });
+            for (const Property& row : part) {
+                if (static_cast<unsigned int>(row.type) == nodeType) {
+                    rows.push_back(&row);
+                }
+            }
         }
     }
     return rows;
 }
 
-std::optional<Property> findProperty(unsigned int nodeType, unsigned int id) {
-    for (const Property& row : propertiesOf(nodeType)) {
-        if (row.id == id) {
-            return row;
-        }
-    }
-    return std::nullopt;
+const Property* findProperty(unsigned int nodeType, unsigned int id) {
+    const auto rows = propertiesOf(nodeType);
+    const auto found = std::ranges::find(rows, id, &Property::id);
+    return found == rows.end() ? nullptr : *found;
 }
 
-std::optional<Property> findProperty(unsigned int nodeType, const std::string& text) {
-    unsigned int id = 0;
-    const char* end = text.data() + text.size();
-    const auto [stop, error] = std::from_chars(text.data(), end, id);
-    if (error == std::errc() && stop == end) {
-        return findProperty(nodeType, id);
+const Property* findProperty(unsigned int nodeType, const std::string& text) {
+    if (const auto id = wholeNumber<unsigned int>(text)) {
+        return findProperty(nodeType, *id);
     }
-    for (const Property& row : propertiesOf(nodeType)) {
-        if (strcasecmp(row.name, text.c_str()) == 0) {
-            return row;
-        }
-    }
-    return std::nullopt;
+    const auto rows = propertiesOf(nodeType);
+    const auto found = std::ranges::find_if(
+        rows, [&text](const Property* row) { return strcasecmp(row->name, text.c_str()) == 0; });
+    return found == rows.end() ? nullptr : *found;
 }
 
 const char* kindName(Kind kind) {
@@ -160,10 +154,9 @@ const char* unitName(Unit unit) {
     return "";
 }
 
-const char* labelOf(const Property& property, unsigned int code) {
-    const auto found = std::find_if(property.labels.begin(), property.labels.end(),
-                                    [code](const Label& label) { return label.code == code; });
-    return found == property.labels.end() ? nullptr : found->text;
+const Label* findLabel(const Property& property, unsigned int code) {
+    const auto found = std::ranges::find(property.labels, code, &Label::code);
+    return found == property.labels.end() ? nullptr : &*found;
 }
 
 std::string acceptedText(const Property& property) {

@@ -11,8 +11,8 @@ namespace {
 /// The state that an alert tells, and the one that the node stores.
 void tellState(Event& event, const IC::MutableNode& node) {
     const AlertRow* row = findAlert(event.message);
-    const auto property = row != nullptr ? findProperty(node.nodeType(), row->property) : std::nullopt;
-    if (!property) {
+    const Property* property = row != nullptr ? findProperty(node.nodeType(), row->property) : nullptr;
+    if (property == nullptr) {
         return;
     }
     event.property = property->id;

@@ -18,7 +18,7 @@ Reading readProperty(const IC::MutableNode& node, unsigned int id) {
         const IC::Error result = node.getProperty(id, reading.value);
         if (result.getStatus() != 0) {
             reading.error = errorText(result);
-            reading.missing = result.text() == "no such property: " + std::to_string(id);
+            reading.missing = result.code() == IC::Number(IC::Error::kNoSuchProperty);
         }
     } catch (const std::exception& exception) {
         reading.error = std::string("the plug-in threw: ") + exception.what();

@@ -1,12 +1,12 @@
 #include "agent/core/tree.h"
 
 #include <algorithm>
-#include <charconv>
 #include <functional>
 #include <optional>
 #include <set>
 
 #include "agent/core/problem.h"
+#include "agent/core/text.h"
 
 namespace cvagent {
 
@@ -20,13 +20,6 @@ std::string pathOf(const IC::MutableNode& node, const Finder& parentOf, int dept
     const Handle parent = depth < kDeepest ? parentOf(node.getLinkedId()) : nullptr;
     const std::string above = parent ? pathOf(*parent, parentOf, depth + 1) : std::string();
     return above + "/" + pathComponent(node);
-}
-
-std::optional<unsigned int> asId(const std::string& text) {
-    unsigned int id = 0;
-    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), id);
-    const bool whole = error == std::errc() && end == text.data() + text.size() && !text.empty();
-    return whole ? std::optional(id) : std::nullopt;
 }
 
 /// Whether a person's word means the node: its whole path or the last part of it.
@@ -84,7 +77,7 @@ void setPaths(const IC::ManagementInterface& interface) {
 }
 
 Handle findNode(const std::vector<Handle>& nodes, const std::string& text) {
-    if (const std::optional<unsigned int> id = asId(text)) {
+    if (const std::optional<unsigned int> id = wholeNumber<unsigned int>(text)) {
         if (Handle node = withId(nodes, *id)) {
             return node;
         }

@@ -47,7 +47,7 @@ WriteResult::Outcome compare(const Property& row, const IC::PropertyValue& writt
 
 struct Writer::Job {
     Handle node;
-    Property row;
+    const Property& row;
     IC::PropertyValue value;
 };
 
@@ -127,29 +127,22 @@ WriteResult Writer::perform(const Job& job, const Request& request) {
     const Property& row = job.row;
     WriteResult result;
     result.before.id = row.id;
-    if (row.readable()) {
-        result.before = readHere(*job.node, row.id);
+    if (row.readable) {
+        result.before = facts_.ask(*job.node, row.id);
     }
     result.problem = setGuarded(*job.node, row, job.value);
     refresh_();
     if (result.problem && result.problem->kind() == Problem::failed) {
-        result.after = {row.id, row, {}, "not asked"};
+        result.after = {row.id, &row, {}, "not asked"};
         return result;
     }
-    result.after = {row.id, row, {}, result.problem ? "cut off" : "can only be written"};
-    if (!result.problem && row.readable()) {
-        result.after = readHere(*job.node, row.id);
+    result.after = {row.id, &row, {}, result.problem ? "cut off" : "can only be written"};
+    if (!result.problem && row.readable) {
+        result.after = facts_.ask(*job.node, row.id);
         result.outcome = compare(row, job.value, result.after);
     }
-    announcer_.announceWrite(*job.node, result.before, result.after);
+    announcer_.announceWrite(*job.node, result.before, result.after, request.caller());
     return result;
-}
-
-Reading Writer::readHere(const IC::MutableNode& node, unsigned int id) {
-    const auto begun = Facts::Clock::now();
-    Reading reading = readProperty(node, id);
-    facts_.judge(node, reading, begun);
-    return reading;
 }
 
 }  // namespace cvagent

@@ -50,7 +50,6 @@ private:
     class Turn;
 
     WriteResult perform(const Job& job, const Request& request);
-    Reading readHere(const IC::MutableNode& node, unsigned int id);
 
     Pool& pool_;
     Facts& facts_;

@@ -9,7 +9,7 @@
 #include <set>
 #include <thread>
 
-#include "agent/core/operations.h"
+#include "agent/core/property_words.h"
 #include "framework/cvlog/logger.h"
 #include "tests/agent/suse_host.h"
 #include "tests/support/fake_host.h"
@@ -231,12 +231,13 @@ HOST_TEST(AgentWrites, TellWhatCameOfThem) {
     ASSERT_TRUE(bad.problem);
     EXPECT_EQ(bad.problem->kind(), Problem::failed);
     EXPECT_EQ(bad.outcome, WriteResult::notKnown);
-    const auto events = fake.agent->events(0).events;
+    const auto events = fake.agent->subscribe(0)->take().events;
     ASSERT_EQ(events.size(), 1U);
     EXPECT_EQ(events[0].kind, Event::Kind::written);
     EXPECT_EQ(events[0].path, "/oshw/root/computer");
     EXPECT_EQ(events[0].propertyName, "OwnerContact");
     EXPECT_EQ(events[0].after, "room 5");
+    EXPECT_EQ(events[0].caller, "test");
 }
 
 HOST_TEST(AgentWrites, NodesThatAWriteMadeAppearAreTold) {
@@ -246,7 +247,7 @@ HOST_TEST(AgentWrites, NodesThatAWriteMadeAppearAreTold) {
                                                  IC::PropertyValue(IC::Number(1U), true), Request("test"));
     EXPECT_EQ(result.outcome, WriteResult::notKnown);
     std::vector<std::string> told;
-    for (const Event& event : fake.agent->events(0).events) {
+    for (const Event& event : fake.agent->subscribe(0)->take().events) {
         if (event.path.find("hard-drive") == std::string::npos) {
             told.push_back(eventName(event.kind) + (" " + event.path));
         }
@@ -351,7 +352,7 @@ HOST_TEST(AgentThreads, EverythingAtOnce) {
             });
         }
         repeat([&] {
-            const auto events = fake.agent->subscribe(fake.agent->events(0).missing);
+            const auto events = fake.agent->subscribe(0);
             fake.agent->read(fake.agent->find("computer"), {108}, Freshness::known, Request("test"));
             events->take();
             pathsOf(*fake.agent);

@@ -3,7 +3,7 @@
 #include <cstdio>
 
 #include "agent/core/agent.h"
-#include "agent/core/operations.h"
+#include "agent/core/property_words.h"
 
 namespace {
 
