@@ -123,9 +123,9 @@ void addProperty(Json& object, const Event& event) {
 
 }  // namespace
 
-std::string tree(const std::vector<std::string>& plugins, const std::vector<Handle>& nodes) {
+std::string tree(const std::vector<std::string>& plugins, const std::vector<NodeRef>& nodes) {
     Json list = Json::array();
-    for (const Handle& node : nodes) {
+    for (const NodeRef& node : nodes) {
         list.push_back(nodeObject(*node, storedReadings(*node)));
     }
     Json whole{{"plugin", plugins.front()}};

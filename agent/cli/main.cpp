@@ -5,8 +5,6 @@
 #include "agent/cli/print.h"
 #include "agent/cli/session.h"
 #include "agent/core/signals.h"
-#include "agent/core/surroundings.h"
-#include "agent/core/want.h"
 
 namespace {
 
@@ -34,11 +32,13 @@ Question questionOf(Command command) {
     return nullptr;
 }
 
-ExitStatus run(const Options& options) {
+ExitStatus run(Options& options, cvagent::WantMessages& wants) {
     if (const Question ask = questionOf(options.command)) {
-        cvagent::Session session(options);
+        const cvagent::PreparedProcess process(cvagent::processSettings(options));
+        cvagent::Session session(process, options, wants);
         return session.statusAfter(ask(session, options));
     }
+    cvagent::prepareSurroundings({});
     return options.command == Command::doctor ? cvagent::commands::doctor(options)
                                               : cvagent::commands::properties(options);
 }
@@ -50,25 +50,10 @@ ExitStatus endWith(const cvagent::Failure& failure) {
     return failure.status();
 }
 
-/// Files that the command line names; they are meant from where the program was started.
-std::vector<std::string*> filesIn(Options& options) {
-    std::vector<std::string*> files{&options.program};
-    for (std::string& plugin : options.plugins) {
-        files.push_back(&plugin);
-    }
-    for (std::optional<std::string>* file : {&options.logFile, &options.traceFile}) {
-        if (*file) {
-            files.push_back(&**file);
-        }
-    }
-    return files;
-}
-
-ExitStatus runGuarded(Options& options) {
+ExitStatus runGuarded(Options& options, cvagent::WantMessages& wants) {
     try {
         cvagent::Style::detect();  // before the locale goes
-        cvagent::prepareSurroundings(filesIn(options));
-        return run(options);
+        return run(options, wants);
     } catch (const cvagent::Failure& failure) {
         return endWith(failure);
     } catch (const cvagent::Problem& problem) {
@@ -83,15 +68,17 @@ ExitStatus runGuarded(Options& options) {
 }
 
 /// What is not shown or not found can be what was wanting.
-ExitStatus judged(ExitStatus status, Command command) {
-    const bool wanting = command != Command::properties && cvagent::tellWant(nullptr, cvagent::complain);
+ExitStatus runAndJudge(Options& options) {
+    cvagent::WantMessages wants;
+    const ExitStatus status = runGuarded(options, wants);
+    const bool wanting = options.command != Command::properties && wants.tell();
     const bool good = status == ExitStatus::done || status == ExitStatus::notFound;
     return wanting && good ? ExitStatus::failed : status;
 }
 
 /// Before the tables of the program are made, which need memory.
 [[gnu::constructor(101)]] void beforeEverything() {
-    cvagent::failPlainlyWithoutMemory(static_cast<int>(ExitStatus::failed));
+    cvagent::failPlainlyWithoutMemory();
 }
 
 }  // namespace
@@ -100,5 +87,5 @@ int main(int count, char** words) {
     cvagent::openStandardDescriptors();
     int status = 0;
     auto options = cvagent::parseCommandLine(count, words, status);
-    return options ? static_cast<int>(judged(runGuarded(*options), options->command)) : status;
+    return options ? static_cast<int>(runAndJudge(*options)) : status;
 }

@@ -1,5 +1,6 @@
 #include "agent/core/agent.h"
 
+#include <stdexcept>
 #include <utility>
 
 #include "agent/core/announcer.h"
@@ -37,11 +38,14 @@ struct Agent::Engine {
 };
 
 Agent::Engine::Engine(const AgentSettings& settings)
-    : data(settings.data ? settings.data : std::make_shared<DataDirectory>()),
+    : data(settings.data),
       tell(settings.tell),
       log(settings.log ? settings.log
                        : std::make_shared<LogOutput>(LogSettings(), std::make_shared<ErrorLines>())),
       deadline(settings.commandTime, settings.tell) {
+    if (!data) {
+        throw std::invalid_argument("an agent needs a data directory");
+    }
     for (const std::string& file : settings.plugins) {
         load(file);
     }

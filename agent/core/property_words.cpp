@@ -92,7 +92,7 @@ IC::PropertyValue acceptedValue(const Property& row, const std::vector<std::stri
 }
 
 const Label* drasticLabel(const Property& row, const IC::PropertyValue& value) {
-    const bool isCode = row.kind == Kind::enumeration || row.kind == Kind::number;
+    const bool isCode = !row.labels.empty() && (value.asEnum() != nullptr || value.asNumber() != nullptr);
     const Label* label = isCode ? findLabel(row, static_cast<unsigned int>(value)) : nullptr;
     return label != nullptr && label->drastic ? label : nullptr;
 }

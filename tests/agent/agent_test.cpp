@@ -36,6 +36,7 @@ constexpr const char* kHold = "/tmp/hold";
 AgentSettings settingsOf(const std::vector<std::string>& plugins) {
     AgentSettings settings;
     settings.plugins = plugins;
+    settings.data = std::make_shared<cvagent::DataDirectory>();
     return settings;
 }
 
@@ -90,7 +91,6 @@ HOST_TEST(AgentNodes, ANodeRefKeepsThePluginAtWork) {
 HOST_TEST(AgentNodes, AReferenceCanBeGivenANodeOfAnotherAgent) {
     const cvagent::QuietCommands quiet;
     AgentSettings settings = settingsOf({FAKE_PLUGIN_FILE});
-    settings.data = std::make_shared<cvagent::DataDirectory>();
     auto first = std::make_unique<Agent>(settings);
     NodeRef node = first->find("computer");
     first.reset();
@@ -148,6 +148,12 @@ HOST_TEST(AgentPlugins, OneThatFailsCostsNothingOfTheOthers) {
         EXPECT_THAT(pathsOf(agent), testing::Contains("/oshw/root/computer"));
     }
     EXPECT_THROW(Agent(settingsOf({"/nowhere.so"})), Problem);
+}
+
+HOST_TEST(AgentPlugins, AreLoadedWithADataDirectoryOnly) {
+    AgentSettings settings = settingsOf({FAKE_PLUGIN_FILE});
+    settings.data = nullptr;
+    EXPECT_THROW(Agent{settings}, std::invalid_argument);
 }
 
 HOST_TEST(AgentPlugins, TheSameOneTwiceIsRefused) {

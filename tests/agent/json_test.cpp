@@ -38,7 +38,7 @@ TEST(Json, TheTreeNamesThePluginAndEveryNode) {
     NodeList list;
     list.add(38, 0);
     list.add(59, 1);
-    const Json tree = Json::parse(cvagent::json::tree({"/lib/plugin.so"}, list.holdAll()));
+    const Json tree = Json::parse(cvagent::json::tree({"/lib/plugin.so"}, list.nodes()));
     EXPECT_EQ(tree["plugin"], "/lib/plugin.so");
     ASSERT_EQ(tree["nodes"].size(), 2U);
     EXPECT_EQ(tree["nodes"][1]["parent"], 1);

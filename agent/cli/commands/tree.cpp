@@ -55,7 +55,7 @@ std::string branch(const std::vector<bool>& last, const Style& style) {
     return text;
 }
 
-std::string drawing(const std::vector<Handle>& nodes, const Style& style) {
+std::string drawing(const std::vector<NodeRef>& nodes, const Style& style) {
     std::string text;
     for (const Placed& placed : drawingOrder(nodes)) {
         const IC::MutableNode& node = *placed.node;
@@ -72,7 +72,7 @@ std::string drawing(const std::vector<Handle>& nodes, const Style& style) {
 }  // namespace
 
 ExitStatus tree(Session& session, const Options& options) {
-    const std::vector<Handle> nodes = handlesOf(session.agent().nodes());
+    const std::vector<NodeRef> nodes = session.agent().nodes();
     print(options.json ? json::tree(session.agent().plugins(), nodes) : drawing(nodes, Style::detect()));
     return ExitStatus::done;
 }
