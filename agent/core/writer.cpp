@@ -20,9 +20,9 @@ IC::Error callSetProperty(IC::MutableNode& node, unsigned int id, const IC::Prop
 
 std::optional<Problem> setGuarded(IC::MutableNode& node, const Property& row,
                                   const IC::PropertyValue& value) {
-    const Errand errand(Errand::write);
+    const CommandScope scope(CommandScope::write);
     const IC::Error result = callSetProperty(node, row.id, value);
-    if (const std::string complaint = errand.complaint(); !complaint.empty()) {
+    if (const std::string complaint = scope.complaint(); !complaint.empty()) {
         return Problem(Problem::timedOut,
                        std::string(row.name) + " may be changed only in part: " + complaint);
     }

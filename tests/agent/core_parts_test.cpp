@@ -378,6 +378,23 @@ TEST(Problems, HaveTheirExitStatusAndAdviceAtTheEdgeAlone) {
     }
 }
 
+TEST(Failures, HaveTheAdviceForTheirKindAndSubject) {
+    const auto shown = [](Problem::Kind kind, Problem::Subject subject, const std::string& detail = "") {
+        return std::string(cvagent::Failure(Problem(kind, "it", subject, detail)).what());
+    };
+    EXPECT_EQ(shown(Problem::notFound, Problem::node), "it; see: cvagent tree");
+    EXPECT_EQ(shown(Problem::ambiguous, Problem::node, "\n  5  /a"),
+              "it; give the id or the path of one of them:\n  5  /a");
+    EXPECT_EQ(shown(Problem::busy, Problem::dataFixed, "; why"), "it\nStop it first; why");
+    EXPECT_EQ(shown(Problem::busy, Problem::dataOwn),
+              "it\nStop it first, or name another one with CORVISTA_DATA_DIR=DIRECTORY");
+    EXPECT_EQ(
+        shown(Problem::failed, Problem::dataOwn),
+        "it\nMake all of the way to it yours or root's and writable by nobody else, or name another one "
+        "with CORVISTA_DATA_DIR=DIRECTORY");
+    EXPECT_EQ(shown(Problem::busy, Problem::none), "it");
+}
+
 TEST(PropertyWords, NameAClassWithItsArticle) {
     const IC::MutableNode node(7, 0, {1}, 29, 0);
     EXPECT_EQ(cvagent::Failure(problemOf([&] { cvagent::writableRow(node, "NoSuch"); })).what(),
