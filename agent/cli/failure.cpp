@@ -1,29 +1,20 @@
 #include "agent/cli/failure.h"
 
 #include <algorithm>
+#include <array>
 #include <iterator>
 
 namespace cvagent {
 
 namespace {
 
+/// In the order of Problem::Kind.
+constexpr std::array kStatuses = {ExitStatus::notFound, ExitStatus::notFound, ExitStatus::refused,
+                                  ExitStatus::busy,     ExitStatus::failed,   ExitStatus::failed};
+
+/// What the caller sets for the program is part of his command line.
 ExitStatus statusOf(const Problem& problem) {
-    if (problem.subject() == Problem::dataVariable) {
-        return ExitStatus::usage;
-    }
-    switch (problem.kind()) {
-        case Problem::notFound:
-        case Problem::ambiguous:
-            return ExitStatus::notFound;
-        case Problem::refused:
-            return ExitStatus::refused;
-        case Problem::busy:
-            return ExitStatus::busy;
-        case Problem::timedOut:
-        case Problem::failed:
-            break;
-    }
-    return ExitStatus::failed;
+    return problem.subject() == Problem::dataVariable ? ExitStatus::usage : kStatuses.at(problem.kind());
 }
 
 struct Advice {

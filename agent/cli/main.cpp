@@ -1,3 +1,4 @@
+#include <array>
 #include <exception>
 
 #include "agent/cli/command_line.h"
@@ -14,26 +15,12 @@ using cvagent::Options;
 
 using Question = ExitStatus (*)(cvagent::Session& session, const Options& options);
 
-/// What needs an agent; null for what does not.
-Question questionOf(Command command) {
-    switch (command) {
-        case Command::tree:
-            return cvagent::commands::tree;
-        case Command::get:
-            return cvagent::commands::get;
-        case Command::set:
-            return cvagent::commands::set;
-        case Command::watch:
-            return cvagent::commands::watch;
-        case Command::properties:
-        case Command::doctor:
-            break;
-    }
-    return nullptr;
-}
+/// What needs an agent, in the order of Command; null for what does not.
+constexpr std::array<Question, 6> kQuestions = {cvagent::commands::tree, cvagent::commands::get,
+                                                cvagent::commands::set, cvagent::commands::watch};
 
 ExitStatus run(Options& options, cvagent::WantMessages& wants) {
-    if (const Question ask = questionOf(options.command)) {
+    if (const Question ask = kQuestions.at(static_cast<std::size_t>(options.command))) {
         const cvagent::PreparedProcess process(cvagent::processSettings(options));
         cvagent::Session session(process, options, wants);
         return session.statusAfter(ask(session, options));

@@ -2,6 +2,7 @@
 
 #include <strings.h>
 #include <algorithm>
+#include <array>
 #include <stdexcept>
 
 #include "agent/core/oshw/tables.h"
@@ -23,6 +24,22 @@ Tables& tables() {
     throw std::logic_error("the catalogue of " + std::string(table.owner) + " has " + what +
                            ", which is there already");
 }
+
+/// The first row of any table of which something is true; null for none.
+template <class Row, class Predicate>
+const Row* findRow(std::span<const Row> CatalogueTable::*rows, const Predicate& isMeant) {
+    for (const CatalogueTable* table : tables()) {
+        const auto found = std::ranges::find_if(table->*rows, isMeant);
+        if (found != (table->*rows).end()) {
+            return &*found;
+        }
+    }
+    return nullptr;
+}
+
+// In the order of the enumerations.
+constexpr std::array kKindNames = {"number", "enum", "text", "texts", "numbers"};
+constexpr std::array kUnitNames = {"", "kB", "KiB", "kbit/s", "Mbit/s", "MHz", "s since 1970", "min", "bits"};
 
 }  // namespace
 
@@ -51,37 +68,18 @@ std::vector<NodeClass> nodeClasses() {
 }
 
 const NodeClass* findClass(unsigned int nodeType) {
-    for (const CatalogueTable* table : tables()) {
-        for (const NodeClass& row : table->classes) {
-            if (static_cast<unsigned int>(row.type) == nodeType) {
-                return &row;
-            }
-        }
-    }
-    return nullptr;
+    return findRow(&CatalogueTable::classes, [nodeType](const NodeClass& row) {
+        return static_cast<unsigned int>(row.type) == nodeType;
+    });
 }
 
 const NodeClass* findClass(const std::string& name) {
-    for (const CatalogueTable* table : tables()) {
-        for (const NodeClass& row : table->classes) {
-            if (row.name == name) {
-                return &row;
-            }
-        }
-    }
-    return nullptr;
+    return findRow(&CatalogueTable::classes, [&name](const NodeClass& row) { return row.name == name; });
 }
 
 const AlertRow* findAlert(const std::string& message) {
     const std::string text = message.substr(0, message.find_last_not_of(' ') + 1);
-    for (const CatalogueTable* table : tables()) {
-        for (const AlertRow& row : table->alerts) {
-            if (row.message == text) {
-                return &row;
-            }
-        }
-    }
-    return nullptr;
+    return findRow(&CatalogueTable::alerts, [&text](const AlertRow& row) { return row.message == text; });
 }
 
 std::vector<const Property*> propertiesOf(unsigned int nodeType) {
@@ -115,43 +113,11 @@ const Property* findProperty(unsigned int nodeType, const std::string& text) {
 }
 
 const char* kindName(Kind kind) {
-    switch (kind) {
-        case Kind::number:
-            return "number";
-        case Kind::enumeration:
-            return "enum";
-        case Kind::text:
-            return "text";
-        case Kind::texts:
-            return "texts";
-        case Kind::numbers:
-            return "numbers";
-    }
-    return "none";
+    return kKindNames.at(static_cast<std::size_t>(kind));
 }
 
 const char* unitName(Unit unit) {
-    switch (unit) {
-        case Unit::none:
-            return "";
-        case Unit::thousandBytes:
-            return "kB";
-        case Unit::kibibytes:
-            return "KiB";
-        case Unit::kilobitsPerSecond:
-            return "kbit/s";
-        case Unit::megabitsPerSecond:
-            return "Mbit/s";
-        case Unit::megahertz:
-            return "MHz";
-        case Unit::secondsSinceEpoch:
-            return "s since 1970";
-        case Unit::minutes:
-            return "min";
-        case Unit::bits:
-            return "bits";
-    }
-    return "";
+    return kUnitNames.at(static_cast<std::size_t>(unit));
 }
 
 const Label* findLabel(const Property& property, unsigned int code) {
