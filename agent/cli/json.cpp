@@ -1,5 +1,6 @@
 #include "agent/cli/json.h"
 
+#include <array>
 #include <nlohmann/json.hpp>
 
 #include "agent/cli/print.h"
@@ -58,21 +59,8 @@ Json plainValue(const IC::PropertyValue& value) {
 }
 
 const char* kindOf(const IC::PropertyValue& value) {
-    switch (value.kind()) {
-        case IC::PropertyValue::number:
-            return "number";
-        case IC::PropertyValue::text:
-            return "text";
-        case IC::PropertyValue::enumeration:
-            return "enum";
-        case IC::PropertyValue::texts:
-            return "texts";
-        case IC::PropertyValue::numbers:
-            return "numbers";
-        case IC::PropertyValue::none:
-            break;
-    }
-    return "none";
+    static constexpr std::array kNames = {"none", "number", "text", "enum", "texts", "numbers"};
+    return kNames.at(value.kind());
 }
 
 /// A failed read has the kind the catalogue promises, since it brought no value.
