@@ -53,7 +53,7 @@ EventProgram::~EventProgram() {
 }
 
 void EventProgram::serve() {
-    const Errand ours(Errand::ours);
+    const CommandScope ours(CommandScope::ours);
     for (bool more = true; more;) {
         pollfd ready[] = {{events_->descriptor(), POLLIN, 0}, {stop_, POLLIN, 0}};
         if (poll(ready, 2, -1) < 0) {

@@ -68,17 +68,17 @@ std::string inLargerUnits(Unit unit, const IC::Number& number) {
     }
 }
 
-std::string withLabel(const std::optional<Property>& property, const std::string& code, unsigned int number) {
-    const char* label = property ? labelOf(*property, number) : nullptr;
-    return label == nullptr ? code : code + " (" + label + ")";
+std::string withLabel(const Property* property, const std::string& code, unsigned int number) {
+    const Label* label = property != nullptr ? findLabel(*property, number) : nullptr;
+    return label == nullptr ? code : code + " (" + label->text + ")";
 }
 
-std::string numberText(const std::optional<Property>& property, const IC::Number& number) {
+std::string numberText(const Property* property, const IC::Number& number) {
     std::string text = number.toString();
-    if (!property || number.empty() || number.kind() == IC::Number::boolean) {
+    if (property == nullptr || number.empty() || number.kind() == IC::Number::boolean) {
         return text;
     }
-    if (labelOf(*property, number) != nullptr) {
+    if (findLabel(*property, number) != nullptr) {
         return withLabel(property, text, number);
     }
     if (property->unit != Unit::none) {
@@ -97,7 +97,7 @@ std::string joined(const List& list, ToText toText) {
     return text;
 }
 
-std::string plainText(const std::optional<Property>& property, const IC::PropertyValue& value) {
+std::string plainText(const Property* property, const IC::PropertyValue& value) {
     if (const IC::Number* number = value.asNumber()) {
         return numberText(property, *number);
     }
@@ -185,7 +185,7 @@ void ask(const std::string& question) {
     [[maybe_unused]] const ssize_t written = write(messageDescriptor(), question.data(), question.size());
 }
 
-std::string valueText(const std::optional<Property>& property, const IC::PropertyValue& value) {
+std::string valueText(const Property* property, const IC::PropertyValue& value) {
     if (value.empty()) {
         return "not known";
     }

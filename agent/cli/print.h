@@ -1,6 +1,5 @@
 #pragma once
 
-#include <optional>
 #include <string>
 
 #include "agent/core/catalogue.h"
@@ -33,8 +32,8 @@ void complain(const std::string& text);
 void ask(const std::string& question);
 
 /// A value for people: with its unit, its label, a size in GB and GiB.
-/// @param property its row of the catalogue; none for a property that is not in it
-std::string valueText(const std::optional<Property>& property, const IC::PropertyValue& value);
+/// @param property its row of the catalogue; null for a property that is not in it
+std::string valueText(const Property* property, const IC::PropertyValue& value);
 
 /// "80.0 GB (74.5 GiB)"
 std::string sizeText(unsigned long long bytes);

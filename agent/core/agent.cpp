@@ -1,6 +1,7 @@
 #include "agent/core/agent.h"
 
 #include <algorithm>
+#include <stdexcept>
 #include <utility>
 
 #include "agent/core/announcer.h"
@@ -40,11 +41,14 @@ struct Agent::Engine {
 };
 
 Agent::Engine::Engine(const AgentSettings& settings)
-    : data(settings.data ? settings.data : std::make_shared<DataDirectory>()),
+    : data(settings.data),
       tell(settings.tell),
       log(settings.log ? settings.log
                        : std::make_shared<LogOutput>(LogSettings(), std::make_shared<ErrorLines>())),
       deadline(settings.commandTime, settings.tell) {
+    if (!data) {
+        throw std::invalid_argument("an agent needs a data directory");
+    }
     for (const std::string& file : settings.plugins) {
         load(file);
     }
@@ -126,10 +130,6 @@ WriteResult Agent::write(const NodeRef& node, const Property& row, const IC::Pro
 
 std::shared_ptr<Subscription> Agent::subscribe(std::uint64_t after, std::optional<Event::Kind> only) const {
     return engine_->events.subscribe(after, EventLog::kMost, only);
-}
-
-EventLog::Since Agent::events(std::uint64_t after) const {
-    return engine_->events.since(after);
 }
 
 }  // namespace cvagent

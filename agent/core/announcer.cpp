@@ -82,12 +82,14 @@ void Announcer::announceNew(const IC::ManagementInterface& interface) {
     }
 }
 
-void Announcer::announceWrite(const IC::MutableNode& node, const Reading& before, const Reading& after) {
+void Announcer::announceWrite(const IC::MutableNode& node, const Reading& before, const Reading& after,
+                              const std::string& caller) {
     Event event = nodeEvent(Event::Kind::written, node);
     event.property = after.id;
     event.propertyName = after.name();
     event.before = stateText(before);
     event.after = stateText(after);
+    event.caller = caller;
     const std::lock_guard lock(guard_);
     if (const auto told = told_.find({event.nodeId, event.property}); told != told_.end()) {
         told->second = event.after;

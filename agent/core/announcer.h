@@ -25,7 +25,8 @@ public:
     void takeStock(const IC::ManagementInterface& interface);
     /// Nodes that have appeared without the plug-in's telling are told. A write can make some.
     void announceNew(const IC::ManagementInterface& interface);
-    void announceWrite(const IC::MutableNode& node, const Reading& before, const Reading& after);
+    void announceWrite(const IC::MutableNode& node, const Reading& before, const Reading& after,
+                       const std::string& caller);
 
 private:
     using Key = std::pair<unsigned int, unsigned int>;  // node and property

@@ -114,11 +114,6 @@ EventLog::Since EventLog::since(std::uint64_t number) const {
     return sinceLocked(number);
 }
 
-std::uint64_t EventLog::last() const {
-    const std::lock_guard lock(guard_);
-    return last_;
-}
-
 std::shared_ptr<Subscription> EventLog::subscribe(std::uint64_t after, std::size_t most,
                                                   std::optional<Event::Kind> only) {
     auto subscription = std::make_shared<Subscription>(most, only);

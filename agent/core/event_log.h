@@ -84,8 +84,6 @@ public:
     void hear(const Event& event) override;
     /// The events after a number, the oldest first; 0 asks for all that are kept.
     Since since(std::uint64_t number) const;
-    /// The number of the last event.
-    std::uint64_t last() const;
     /// A queue of the events after a number, those that have happened included.
     std::shared_ptr<Subscription> subscribe(std::uint64_t after, std::size_t most = kMost,
                                             std::optional<Event::Kind> only = std::nullopt);

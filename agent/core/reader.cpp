@@ -55,10 +55,7 @@ std::vector<Reading> Reader::read(const Handle& node, const std::vector<unsigned
 /// The errors of a stop of the agent, which may come next on this thread, are not the request's.
 Reading Reader::askHere(const IC::MutableNode& node, unsigned int id, const Request& request) {
     const ErrorScope scope(request.errors());
-    const auto begun = Facts::Clock::now();
-    Reading reading = readProperty(node, id);
-    facts_.judge(node, reading, begun);
-    return reading;
+    return facts_.ask(node, id);
 }
 
 /// Whether there is no use in asking: nobody would wait for the answer, or the node has not answered others

@@ -35,16 +35,16 @@ public:
 /// Where the program's own messages go.
 int messageDescriptor();
 
-// What the user is told of the surroundings; "" when there is nothing to tell.
+// What the surroundings leave out; "" when that is nothing.
 
 /// What will be missing without root.
-std::string hintAtRoot(const DataDirectory& data);
+std::string limitsOfUser(const DataDirectory& data);
 
 /// What does not work when nothing can be written to the data directory.
-std::string hintAtReadOnly(const DataDirectory& data);
+std::string limitsOfData(const DataDirectory& data);
 
 /// What is missing when nothing can be written to /tmp, where the plug-in's commands keep their listings. To
 /// be asked after a start: a listing can be what has filled it.
-std::string hintAtTemporaryFiles();
+std::string limitsOfTmp();
 
 }  // namespace cvagent

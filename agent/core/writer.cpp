@@ -20,9 +20,9 @@ IC::Error callSetProperty(IC::MutableNode& node, unsigned int id, const IC::Prop
 
 std::optional<Problem> setGuarded(IC::MutableNode& node, const Property& row,
                                   const IC::PropertyValue& value) {
-    const Errand errand(Errand::write);
+    const CommandScope scope(CommandScope::write);
     const IC::Error result = callSetProperty(node, row.id, value);
-    if (const std::string complaint = errand.complaint(); !complaint.empty()) {
+    if (const std::string complaint = scope.complaint(); !complaint.empty()) {
         return Problem(Problem::timedOut,
                        std::string(row.name) + " may be changed only in part: " + complaint);
     }
@@ -47,7 +47,7 @@ WriteResult::Outcome compare(const Property& row, const IC::PropertyValue& writt
 
 struct Writer::Job {
     Handle node;
-    Property row;
+    const Property& row;
     IC::PropertyValue value;
 };
 
@@ -151,36 +151,29 @@ WriteResult Writer::perform(const Job& job, const Request& request) {
     const ErrorScope scope(request.errors());
     const Property& row = job.row;
     WriteResult result;
-    result.before = {row.id, row, {}, "not asked"};
+    result.before = {row.id, &row, {}, "not asked"};
     if (!tree_.lists(job.node)) {
         result.after = result.before;
         result.problem =
             Problem(Problem::notFound, row.name + std::string(" was not changed: the node is gone"));
         return result;
     }
-    if (row.readable()) {
-        result.before = readHere(*job.node, row.id);
+    if (row.readable) {
+        result.before = facts_.ask(*job.node, row.id);
     }
     result.problem = setGuarded(*job.node, row, job.value);
     tree_.refresh();
     if (result.problem && result.problem->kind() == Problem::failed) {
-        result.after = {row.id, row, {}, "not asked"};
+        result.after = {row.id, &row, {}, "not asked"};
         return result;
     }
-    result.after = {row.id, row, {}, result.problem ? "cut off" : "can only be written"};
-    if (!result.problem && row.readable()) {
-        result.after = readHere(*job.node, row.id);
+    result.after = {row.id, &row, {}, result.problem ? "cut off" : "can only be written"};
+    if (!result.problem && row.readable) {
+        result.after = facts_.ask(*job.node, row.id);
         result.outcome = compare(row, job.value, result.after);
     }
-    announcer_.announceWrite(*job.node, result.before, result.after);
+    announcer_.announceWrite(*job.node, result.before, result.after, request.caller());
     return result;
-}
-
-Reading Writer::readHere(const IC::MutableNode& node, unsigned int id) {
-    const auto begun = Facts::Clock::now();
-    Reading reading = readProperty(node, id);
-    facts_.judge(node, reading, begun);
-    return reading;
 }
 
 }  // namespace cvagent

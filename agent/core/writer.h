@@ -61,7 +61,6 @@ private:
     WriteResult perform(const Job& job, const Request& request);
     void giveUp(std::uint64_t turn);
     WriteResult timedOut(const IC::MutableNode& node, const Property& row, bool begun);
-    Reading readHere(const IC::MutableNode& node, unsigned int id);
 
     Pool& pool_;
     Facts& facts_;

@@ -9,7 +9,7 @@
 #include <set>
 #include <thread>
 
-#include "agent/core/operations.h"
+#include "agent/core/property_words.h"
 #include "framework/cvlog/logger.h"
 #include "tests/agent/suse_host.h"
 #include "tests/support/fake_host.h"
@@ -36,6 +36,7 @@ constexpr const char* kHold = "/tmp/hold";
 AgentSettings settingsOf(const std::vector<std::string>& plugins) {
     AgentSettings settings;
     settings.plugins = plugins;
+    settings.data = std::make_shared<cvagent::DataDirectory>();
     return settings;
 }
 
@@ -90,7 +91,6 @@ HOST_TEST(AgentNodes, ANodeRefKeepsThePluginAtWork) {
 HOST_TEST(AgentNodes, AReferenceCanBeGivenANodeOfAnotherAgent) {
     const cvagent::QuietCommands quiet;
     AgentSettings settings = settingsOf({FAKE_PLUGIN_FILE});
-    settings.data = std::make_shared<cvagent::DataDirectory>();
     auto first = std::make_unique<Agent>(settings);
     NodeRef node = first->find("computer");
     first.reset();
@@ -157,7 +157,7 @@ HOST_TEST(AgentPlugins, NothingIsToldOfOneThatDoesNotStart) {
         setenv("CORVISTA_FAKE_PLUGIN", words.c_str(), 1);
         const Agent agent(settingsOf({CORVISTA_PLUGIN_FILE, FAKE_PLUGIN_FILE}));
         std::vector<std::string> events;
-        for (const Event& event : agent.events(0).events) {
+        for (const Event& event : agent.subscribe(0)->take().events) {
             events.push_back(eventName(event.kind) + (" " + event.path));
         }
         return std::pair(pathsOf(agent), events);
@@ -168,6 +168,12 @@ HOST_TEST(AgentPlugins, NothingIsToldOfOneThatDoesNotStart) {
     const auto failed = pathsAndEvents("early publish late badstart");
     EXPECT_THAT(failed.second, IsEmpty());
     EXPECT_THAT(failed.first, testing::Not(testing::Contains(HasSubstr("hard-drive"))));
+}
+
+HOST_TEST(AgentPlugins, AreLoadedWithADataDirectoryOnly) {
+    AgentSettings settings = settingsOf({FAKE_PLUGIN_FILE});
+    settings.data = nullptr;
+    EXPECT_THROW(Agent{settings}, std::invalid_argument);
 }
 
 HOST_TEST(AgentPlugins, TheSameOneTwiceIsRefused) {
@@ -337,12 +343,13 @@ HOST_TEST(AgentWrites, TellWhatCameOfThem) {
     ASSERT_TRUE(bad.problem);
     EXPECT_EQ(bad.problem->kind(), Problem::failed);
     EXPECT_EQ(bad.outcome, WriteResult::notKnown);
-    const auto events = fake.agent->events(0).events;
+    const auto events = fake.agent->subscribe(0)->take().events;
     ASSERT_EQ(events.size(), 1U);
     EXPECT_EQ(events[0].kind, Event::Kind::written);
     EXPECT_EQ(events[0].path, "/oshw/root/computer");
     EXPECT_EQ(events[0].propertyName, "OwnerContact");
     EXPECT_EQ(events[0].after, "room 5");
+    EXPECT_EQ(events[0].caller, "test");
 }
 
 HOST_TEST(AgentWrites, NodesThatAWriteMadeAppearAreTold) {
@@ -352,7 +359,7 @@ HOST_TEST(AgentWrites, NodesThatAWriteMadeAppearAreTold) {
                                                  IC::PropertyValue(IC::Number(1U), true), Request("test"));
     EXPECT_EQ(result.outcome, WriteResult::notKnown);
     std::vector<std::string> told;
-    for (const Event& event : fake.agent->events(0).events) {
+    for (const Event& event : fake.agent->subscribe(0)->take().events) {
         if (event.path.find("hard-drive") == std::string::npos) {
             told.push_back(eventName(event.kind) + (" " + event.path));
         }
@@ -478,7 +485,7 @@ HOST_TEST(AgentThreads, EverythingAtOnce) {
             });
         }
         repeat([&] {
-            const auto events = fake.agent->subscribe(fake.agent->events(0).missing);
+            const auto events = fake.agent->subscribe(0);
             fake.agent->read(fake.agent->find("computer"), {108}, Freshness::known, Request("test"));
             events->take();
             pathsOf(*fake.agent);

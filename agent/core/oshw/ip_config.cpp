@@ -52,7 +52,7 @@ constexpr Property kIpConfigRows[] = {
     {ip, 29, "IPv6InterfaceId", Kind::text, Unit::none, {}, "fourth group of the IPv6 address"},
     {ip, 47, "Protocol", Kind::number, Unit::none, kProtocols, "the protocols the interface carries"},
     {ip, 74, "EnumeratePorts", Kind::number, Unit::none, kEnumerate,
-     "writing 1 looks for interfaces that have appeared", check::code, nullptr, true},
+     "writing 1 looks for interfaces that have appeared", check::code, nullptr, false},
     {ip, 93, "DHCPServers", Kind::texts, Unit::none, {}, "the servers that leased the addresses"},
     {ip,
      94,

@@ -6,21 +6,29 @@ namespace {
 
 using Naming = NodeClass::Naming;
 
+constexpr unsigned int kComputer[] = {108};
+constexpr unsigned int kDrive[] = {37};
+constexpr unsigned int kPartition[] = {112};
+constexpr unsigned int kPort[] = {123, 57};
+constexpr unsigned int kIpConfig[] = {123, 25, 26, 27};
+constexpr unsigned int kTeam[] = {198, 165};
+constexpr unsigned int kProcessor[] = {80};
+
 constexpr NodeClass kClasses[] = {
     {NodeType::osHardware, "oshw", Naming::single, 0},
     {NodeType::root, "root", Naming::single, 0},
-    {NodeType::computer, "computer", Naming::single, 0},
+    {NodeType::computer, "computer", Naming::single, 0, kComputer},
     {NodeType::chassis, "chassis", Naming::single, 0},
     {NodeType::planar, "planar", Naming::single, 0},
     {NodeType::networkController, "network-controller", Naming::single, 0},
     {NodeType::diskController, "disk-controller", Naming::single, 0},
-    {NodeType::hardDrive, "hard-drive", Naming::byProperty, 89},
-    {NodeType::partition, "partition", Naming::byProperty, 89},
-    {NodeType::networkPort, "network-port", Naming::byProperty, 108},
-    {NodeType::ipConfig, "ip-config", Naming::byProperty, 108},
+    {NodeType::hardDrive, "hard-drive", Naming::byProperty, 89, kDrive, true},
+    {NodeType::partition, "partition", Naming::byProperty, 89, kPartition},
+    {NodeType::networkPort, "network-port", Naming::byProperty, 108, kPort, true},
+    {NodeType::ipConfig, "ip-config", Naming::byProperty, 108, kIpConfig, true},
     {NodeType::lanEndpoint, "lan-endpoint", Naming::byProperty, 108},
-    {NodeType::team, "team", Naming::byProperty, 197},
-    {NodeType::processor, "processor", Naming::byIndex, 0},
+    {NodeType::team, "team", Naming::byProperty, 197, kTeam},
+    {NodeType::processor, "processor", Naming::byIndex, 0, kProcessor, true},
 };
 
 // An interface's states, as its state property has them. The two alerts of a bond's member carry the same

@@ -1,4 +1,4 @@
-#include "agent/core/operations.h"
+#include "agent/core/property_words.h"
 
 #include <set>
 
@@ -9,25 +9,25 @@ namespace cvagent {
 
 namespace {
 
-constexpr unsigned int kPowerAction = 123;  // of the computer
-constexpr unsigned int kRestart = 9;
-constexpr unsigned int kHalt = 12;
+/// "a team", "an ip-config"
+std::string withArticle(const std::string& nodeClass) {
+    return (nodeClass.find_first_of("aeio") == 0 ? "an " : "a ") + nodeClass;
+}
 
 [[noreturn]] void failWithout(const std::string& nodeClass, const std::string& word) {
-    throw Problem(Problem::notFound, "a " + nodeClass + " has no property " + inQuotes(word),
+    throw Problem(Problem::notFound, withArticle(nodeClass) + " has no property " + inQuotes(word),
                   Problem::property, nodeClass);
 }
 
 unsigned int readableId(const IC::MutableNode& node, const std::string& word) {
-    if (const auto row = findProperty(node.nodeType(), word)) {
-        if (!row->readable()) {
+    if (const Property* row = findProperty(node.nodeType(), word)) {
+        if (!row->readable) {
             throw Problem(Problem::notFound, std::string(row->name) + " can be written but not read");
         }
         return row->id;
     }
-    const std::string digits = "0123456789";
-    if (!word.empty() && word.size() < 10 && word.find_first_not_of(digits) == std::string::npos) {
-        return static_cast<unsigned int>(std::stoul(word));
+    if (const auto id = wholeNumber<unsigned int>(word)) {
+        return *id;
     }
     failWithout(className(node.nodeType()), word);
 }
@@ -35,9 +35,9 @@ unsigned int readableId(const IC::MutableNode& node, const std::string& word) {
 /// What the catalogue knows of the class and whatever else the node has stored.
 std::vector<unsigned int> allIds(const IC::MutableNode& node) {
     std::set<unsigned int> ids;
-    for (const Property& row : propertiesOf(node.nodeType())) {
-        if (row.readable()) {
-            ids.insert(row.id);
+    for (const Property* row : propertiesOf(node.nodeType())) {
+        if (row->readable) {
+            ids.insert(row->id);
         }
     }
     for (const auto& [id, value] : storedProperties(node)) {
@@ -68,14 +68,15 @@ std::vector<unsigned int> readableIds(const IC::MutableNode& node, const std::ve
     return words.empty() ? allIds(node) : ids;
 }
 
-Property writableRow(const IC::MutableNode& node, const std::string& word) {
+const Property& writableRow(const IC::MutableNode& node, const std::string& word) {
     const std::string nodeClass = className(node.nodeType());
-    const auto row = findProperty(node.nodeType(), word);
-    if (!row) {
+    const Property* row = findProperty(node.nodeType(), word);
+    if (row == nullptr) {
         failWithout(nodeClass, word);
     }
     if (!row->writable()) {
-        throw Problem(Problem::refused, std::string(row->name) + " of a " + nodeClass + " cannot be written",
+        throw Problem(Problem::refused,
+                      std::string(row->name) + " of " + withArticle(nodeClass) + " cannot be written",
                       Problem::property, nodeClass);
     }
     return *row;
@@ -90,14 +91,10 @@ IC::PropertyValue acceptedValue(const Property& row, const std::vector<std::stri
     return *value;
 }
 
-PowerAction powerAction(const Property& row, const IC::PropertyValue& value) {
-    if (row.type != NodeType::computer || row.id != kPowerAction) {
-        return PowerAction::none;
-    }
-    const auto action = static_cast<unsigned int>(value);
-    return action == kRestart ? PowerAction::restart
-           : action == kHalt  ? PowerAction::halt
-                              : PowerAction::none;
+const Label* drasticLabel(const Property& row, const IC::PropertyValue& value) {
+    const bool isCode = !row.labels.empty() && (value.asEnum() != nullptr || value.asNumber() != nullptr);
+    const Label* label = isCode ? findLabel(row, static_cast<unsigned int>(value)) : nullptr;
+    return label != nullptr && label->drastic ? label : nullptr;
 }
 
 }  // namespace cvagent
