@@ -13,7 +13,6 @@
 #include "agent/shell/adapters.h"
 #include "agent/shell/filters/filters.h"
 #include "agent/shell/local_file.h"
-#include "agent/shell/programs.h"
 #include "agent/shell/starts.h"
 
 namespace cvagent::shell {
@@ -192,12 +191,12 @@ bool nullDeviceIsThere() {
     return stat("/dev/null", &file) == 0 && isNullDevice(file);
 }
 
-FirstStage startFirstStage(const FirstStageRequest& request) {
+FirstStage startFirstStage(const FirstStageRequest& request, ProgramSearch& programs) {
     if (request.words.front() == "echo") {
         return !request.isRead ? refused() : echo(Words(request.words).subspan(1));
     }
     const bool silent = request.silent || complaintsGoNowhere();
-    const Program program = findProgram(request.words.front());
+    const Program program = programs.find(request.words.front());
     if (program.kind == Program::missing && silent) {
         return answered(std::make_unique<TextSource>("", kNotFound));
     }

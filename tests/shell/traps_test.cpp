@@ -277,6 +277,35 @@ HOST_TEST(Traps, WantOfDescriptorsIsOverWhenThereAreSomeAgain) {
 }
 #endif
 
+/// As long ago as a change must be to be told from one that follows.
+void madeLongAgo(const std::string& directory) {
+    std::filesystem::last_write_time(directory,
+                                     std::filesystem::file_time_type::clock::now() - std::chrono::hours(1));
+}
+
+HOST_TEST(Traps, AToolThatAppearsIsSeenAtOnce) {
+    inC();
+    host.directory("/opt/bin");
+    host.symlink("/opt/bin/cut", "/opt/later");
+    const std::string before = std::getenv("PATH");
+    setenv("PATH", ("/opt/bin:" + before).c_str(), 1);
+    // A directory's last change is its making, which nobody can set: so it is looked at when that is past.
+    std::this_thread::sleep_for(std::chrono::milliseconds(2050));
+    for (int turn = 0; turn < 2; ++turn) {
+        EXPECT_FALSE(direct("echo b:c | grep b | cut -d : -f1", Complaints::seen).inShell);
+    }
+    host.file("/opt/later", "#!/bin/sh\necho linked\n", 0755);
+    EXPECT_EQ(inShell("echo b:c | cut -d : -f1", Complaints::seen).out, "linked\n");
+    EXPECT_TRUE(direct("echo b:c | cut -d : -f1", Complaints::seen).inShell);
+    host.file("/opt/bin/grep", "#!/bin/sh\necho scripted\n", 0755);
+    EXPECT_TRUE(direct("echo b | grep b", Complaints::seen).inShell);
+    host.remove("/opt/bin/grep");
+    EXPECT_FALSE(direct("echo b | grep b", Complaints::seen).inShell);
+    host.file("/opt/bin/grep", "#!/bin/sh\necho scripted\n", 0755);
+    madeLongAgo("/opt/bin");
+    EXPECT_TRUE(direct("echo b | grep b", Complaints::seen).inShell);
+}
+
 HOST_TEST(Traps, AFileLimitEndsNobodyButTheTool) {
     inC();
     host.file("/etc/lines", "some\n");
