@@ -4,6 +4,7 @@
 
 #include "agent/core/environment.h"
 #include "agent/core/host_tools.h"
+#include "agent/core/node_classes.h"
 #include "agent/core/private_tmp.h"
 #include "agent/core/program_path.h"
 #include "agent/core/signals.h"
@@ -29,6 +30,18 @@ void show(ErrorLines& errors) {
         complain("the plug-in reports: and " + std::to_string(taken.lost) +
                  " more; --log FILE keeps them all");
     }
+}
+
+/// A question for one node needs the processors only if it can mean one of them: by a path, by an id, by a
+/// bare number. Another plug-in's builder may build anything, and a log is to be whole.
+bool needsProcessors(const Options& options) {
+    const bool ofOneNode = options.command == Command::get || options.command == Command::set;
+    if (!ofOneNode || !options.plugins.empty() || options.logFile || options.traceFile || options.logLevel) {
+        return true;
+    }
+    const std::string last = options.node.substr(options.node.rfind('/') + 1);
+    return last.starts_with(className(static_cast<unsigned int>(NodeType::processor))) ||
+           last.find_first_not_of("0123456789") == std::string::npos;
 }
 
 }  // namespace
@@ -64,7 +77,7 @@ void Session::start(const AgentSettings& settings) {
     }
     hint(hintAtTemporaryFiles());
     const std::vector<Handle> nodes = handlesOf(agent_->nodes());
-    tellWant(&nodes, complain);
+    tellWant(&nodes, complain, settings.processors);
 }
 
 /// The log is opened here, before /tmp becomes another one.
@@ -86,6 +99,7 @@ AgentSettings Session::settingsOf(const Options& options) {
     settings.log = std::make_shared<LogOutput>(log, errors_);
     settings.commandTime = std::chrono::duration<double>(options.commandSeconds);
     settings.data = data_;
+    settings.processors = needsProcessors(options);
     settings.tell = complain;
     return settings;
 }

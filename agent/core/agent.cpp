@@ -19,7 +19,7 @@ struct Agent::Engine {
     explicit Engine(const AgentSettings& settings);
 
     std::vector<Handle> handles() const;
-    void load(const std::string& file);
+    void load(const std::string& file, bool processors);
     void refresh();
 
     std::shared_ptr<DataDirectory> data;
@@ -43,16 +43,16 @@ Agent::Engine::Engine(const AgentSettings& settings)
                        : std::make_shared<LogOutput>(LogSettings(), std::make_shared<ErrorLines>())),
       deadline(settings.commandTime, settings.tell) {
     for (const std::string& file : settings.plugins) {
-        load(file);
+        load(file, settings.processors);
     }
     if (plugins.empty() && !failed.empty()) {
         throw Problem(failed.front().problem);
     }
 }
 
-void Agent::Engine::load(const std::string& file) {
+void Agent::Engine::load(const std::string& file, bool processors) {
     try {
-        plugins.push_back(std::make_unique<Plugin>(file, &announcer, tell));
+        plugins.push_back(std::make_unique<Plugin>(file, &announcer, tell, processors));
         announcer.takeStock(plugins.back()->interface().holdAll());
     } catch (const Problem& problem) {
         failed.push_back({file, problem});

@@ -26,8 +26,9 @@ public:
     /// @param file its path; one without a slash would be looked for at the loader's own places
     /// @param listener hears of alerts, published and withdrawn nodes; null for none. Outlives the object.
     /// @param tell     hears of a stop that went wrong
+    /// @param processors whether its builder of processor nodes is called
     /// Throws Problem, with a text of its own for each way in which a file can be no plug-in.
-    Plugin(const std::string& file, Listener* listener, Tell tell = tellNobody);
+    Plugin(const std::string& file, Listener* listener, Tell tell = tellNobody, bool processors = true);
     Plugin(const Plugin&) = delete;
     Plugin& operator=(const Plugin&) = delete;
     /// Unloads the plug-in and closes the library.
@@ -43,7 +44,7 @@ private:
 
     void load();
     void open();
-    void start();
+    void start(bool processors);
     void checkIds() const;
     bool isOwnId(const IC::MutableNode& node) const;
     void stop();

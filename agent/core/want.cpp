@@ -108,8 +108,11 @@ std::string causeText(int error) {
 }
 
 /// The classes that every host has nodes of and this tree has none of.
-std::string gaps(const std::vector<Handle>& tree) {
+std::string gaps(const std::vector<Handle>& tree, bool processors) {
     std::set<unsigned int> present;
+    if (!processors) {
+        present.insert(static_cast<unsigned int>(NodeType::processor));
+    }
     for (const Handle& node : tree) {
         present.insert(node->nodeType());
     }
@@ -156,7 +159,8 @@ void noteWant(const std::string& errorLine) {
     }
 }
 
-bool tellWant(const std::vector<Handle>* tree, const std::function<void(const std::string&)>& tell) {
+bool tellWant(const std::vector<Handle>* tree, const std::function<void(const std::string&)>& tell,
+              bool processors) {
     static int told = 0;
     const shell::NotStarted commands = shell::notStarted();
     const int error = cause(commands);
@@ -165,7 +169,7 @@ bool tellWant(const std::vector<Handle>* tree, const std::function<void(const st
     }
     told = error;
     std::string text;
-    if (const std::string missing = tree != nullptr ? gaps(*tree) : ""; !missing.empty()) {
+    if (const std::string missing = tree != nullptr ? gaps(*tree, processors) : ""; !missing.empty()) {
         text = "the tree has no " + missing + ", and more can be missing: ";
     } else if (tree != nullptr) {
         text = "some of the tree can be missing: ";

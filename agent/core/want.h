@@ -22,7 +22,9 @@ void failPlainlyWithoutMemory(int status);
 
 /// Tells what was not given and what to do, each want once.
 /// @param tree what has just been built: its gaps are named. Null when there is none
+/// @param processors whether those were to be in it
 /// @return whether anything was wanting since the program began
-bool tellWant(const std::vector<Handle>* tree, const std::function<void(const std::string&)>& tell);
+bool tellWant(const std::vector<Handle>* tree, const std::function<void(const std::string&)>& tell,
+              bool processors = true);
 
 }  // namespace cvagent
