@@ -17,7 +17,9 @@ namespace {
 
 constexpr int kShellFailure = 2;
 constexpr unsigned kStatusShift = 8;
-constexpr auto kChangeTools = std::to_array<const char*>({"GREP_OPTIONS", "MAWKBINMODE", "POSIXLY_CORRECT"});
+constexpr auto kChangeTools =
+    std::to_array<const char*>({"AWKBUFSIZE", "GAWK_PERSIST_FILE", "GAWK_READ_TIMEOUT", "GREP_OPTIONS",
+                                "MAWKBINMODE", "POSIXLY_CORRECT"});
 
 /// The value of the first of these variables that has one.
 std::string_view firstSet(std::initializer_list<const char*> variables) {

@@ -77,10 +77,12 @@ bool isPlainPath(const std::string& path) {
     return path.starts_with('/') && !path.starts_with("/proc/self") && !path.starts_with("/proc/thread-self");
 }
 
-FirstStage fileOr(const std::string& path, std::unique_ptr<Filter> filter, bool silent, int statusWhenMissing,
-                  off_t most) {
+FirstStage fileOr(const std::string& path, std::unique_ptr<Filter> filter, Manner manner,
+                  int statusWhenMissing, off_t most) {
     LocalFile file = openForReading(path, most);
-    if (file.outcome == LocalFile::missing && silent) {
+    // Why there is nothing to read decides how busybox's grep ends.
+    const bool sameEnd = filter == nullptr || !manner.busybox;
+    if (file.outcome == LocalFile::missing && manner.silent && sameEnd) {
         return answered(std::make_unique<TextSource>("", statusWhenMissing));
     }
     if (file.outcome == LocalFile::large) {
@@ -97,31 +99,31 @@ FirstStage fileOr(const std::string& path, std::unique_ptr<Filter> filter, bool 
     return answered(std::move(filter));
 }
 
-FirstStage catFile(Words words, bool silent) {
+FirstStage catFile(Words words, Manner manner) {
     return words.size() == 1 && isPlainPath(words.front())
-               ? fileOr(words.front(), nullptr, silent, 1, kLargestFile)
+               ? fileOr(words.front(), nullptr, manner, 1, kLargestFile)
                : FirstStage{};
 }
 
-FirstStage grepFile(Words words, bool silent, Dialect dialect) {
+FirstStage grepFile(Words words, Manner manner, Dialect dialect) {
     if (words.size() < 2 || !isPlainPath(words.back())) {
         return {};
     }
-    auto filter = makeGrepOf(words.back(), words.first(words.size() - 1), dialect, silent);
-    return filter != nullptr ? fileOr(words.back(), std::move(filter), silent, 2, kLargestForGrep)
+    auto filter = makeGrepOf(words.back(), words.first(words.size() - 1), dialect, manner);
+    return filter != nullptr ? fileOr(words.back(), std::move(filter), manner, 2, kLargestForGrep)
                              : FirstStage{};
 }
 
-FirstStage basicGrepFile(Words words, bool silent) {
-    return grepFile(words, silent, Dialect::basic);
+FirstStage basicGrepFile(Words words, Manner manner) {
+    return grepFile(words, manner, Dialect::basic);
 }
 
-FirstStage extendedGrepFile(Words words, bool silent) {
-    return grepFile(words, silent, Dialect::extended);
+FirstStage extendedGrepFile(Words words, Manner manner) {
+    return grepFile(words, manner, Dialect::extended);
 }
 
 /// `rm FILE` and `rm -rf FILE`. What rm would ask before is not done here.
-FirstStage removeFile(Words words, bool silent) {
+FirstStage removeFile(Words words, Manner manner) {
     const bool force = !words.empty() && words.front() == "-rf";
     words = words.subspan(force ? 1 : 0);
     if (words.size() != 1 || !isPlainPath(words.front())) {
@@ -129,7 +131,7 @@ FirstStage removeFile(Words words, bool silent) {
     }
     const std::string& path = words.front();
     const LocalFile::Outcome found = removable(path);
-    if (found == LocalFile::missing && (force || silent)) {
+    if (found == LocalFile::missing && (force || manner.silent)) {
         return answered(std::make_unique<TextSource>("", force ? 0 : 1));
     }
     const bool asks = !force && isatty(STDIN_FILENO) != 0 && access(path.c_str(), W_OK) != 0;
@@ -141,7 +143,7 @@ FirstStage removeFile(Words words, bool silent) {
 
 struct FileTool {
     std::string_view name;
-    FirstStage (*stage)(Words words, bool silent);
+    FirstStage (*stage)(Words words, Manner manner);
 };
 constexpr auto kFileTools = std::to_array<FileTool>(
     {{"cat", catFile}, {"egrep", extendedGrepFile}, {"grep", basicGrepFile}, {"rm", removeFile}});
@@ -156,8 +158,10 @@ FirstStage standIn(const FirstStageRequest& request, const Program& program, boo
         return {{}, askAdapter(request.words.front(), words, silent)};
     }
     for (const FileTool& tool : kFileTools) {
-        if (program.kind == Program::known && tool.name == request.words.front()) {
-            return tool.stage(words, silent);
+        // What busybox says of a write that fails is its own.
+        const bool busybox = program.kind == Program::busybox && request.output < 0;
+        if ((busybox || program.kind == Program::known) && tool.name == request.words.front()) {
+            return tool.stage(words, {silent, busybox});
         }
     }
     return {};

@@ -22,7 +22,7 @@ constexpr std::size_t kMostInserted = 1UL << 20U;
 
 struct FilterTool {
     std::string_view name;
-    std::unique_ptr<Filter> (*make)(Words words, bool silent);
+    std::unique_ptr<Filter> (*make)(Words words, Manner manner);
 };
 constexpr auto kFilters = std::to_array<FilterTool>({{"awk", makeAwk},
                                                      {"cat", makeCat},
@@ -42,10 +42,16 @@ std::vector<std::string> textsOf(const std::vector<Word>& words) {
 std::unique_ptr<Filter> makeFilter(const Stage& stage, ProgramSearch& programs) {
     const std::vector<std::string> words = textsOf(stage.words);
     const auto* const tool = std::ranges::find(kFilters, words.front(), &FilterTool::name);
-    if (tool == kFilters.end() || programs.find(words.front()).kind != Program::known) {
+    if (tool == kFilters.end()) {
         return nullptr;
     }
-    return tool->make(Words(words).subspan(1), stage.silent);
+    const Program::Kind kind = programs.find(words.front()).kind;
+    const bool busybox = kind == Program::busybox;
+    // What it says of a write that fails is its own.
+    if ((!busybox && kind != Program::known) || (busybox && stage.output)) {
+        return nullptr;
+    }
+    return tool->make(Words(words).subspan(1), {stage.silent, busybox});
 }
 
 /// The words that a shell makes of a word with something inserted: divided at blanks.

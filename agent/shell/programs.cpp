@@ -35,7 +35,11 @@ constexpr std::string_view kCoreutils("\0GNU coreutils\0", 15);
 /// Older releases print this complaint, worded otherwise, among what they find.
 constexpr std::string_view kGrep = ": binary file matches";
 constexpr std::string_view kEgrepScript = "exec grep -E \"$@\"\n";
+/// Its own tools differ from release to release and from build to build.
+constexpr std::string_view kBusybox("\0BusyBox v1.35.0 (Debian ", 25);
+constexpr std::string_view kGawk("\0GNU Awk ", 9);
 constexpr auto kKnown = std::to_array<Known>({{"awk", "Thomas E. Dickey"},
+                                              {"awk", kGawk},
                                               {"cat", kCoreutils},
                                               {"cut", kCoreutils},
                                               {"egrep", kGrep},
@@ -76,18 +80,25 @@ bool isEgrepScript(std::string_view content) {
            content.ends_with(kEgrepScript) && content.find("obsolescent") == std::string_view::npos;
 }
 
-bool holds(const Known& known, std::string_view content) {
+Program::Kind kindIn(const std::string& name, std::string_view content) {
     if (content.starts_with(kScript)) {
-        return known.name == "egrep" && isEgrepScript(content);
+        return name == "egrep" && isEgrepScript(content) ? Program::known : Program::tool;
     }
-    return content.starts_with(kBinary) && content.find(known.mark) != std::string::npos;
+    if (!content.starts_with(kBinary)) {
+        return Program::tool;
+    }
+    const bool known = std::ranges::any_of(kKnown, [&](const Known& one) {
+        return one.name == name && content.find(one.mark) != std::string::npos;
+    });
+    const bool busybox = content.find(kBusybox) != std::string::npos;
+    return known ? Program::known : busybox ? Program::busybox : Program::tool;
 }
 
 /// What was found out about files, by what identifies them.
 class Memory {
 public:
-    bool isKnown(const Known& known, const std::string& path, const struct stat& file) {
-        const auto key = std::pair(known.name, identityOf(file));
+    Program::Kind kindOf(const std::string& name, const std::string& path, const struct stat& file) {
+        const auto key = std::pair(name, identityOf(file));
         {
             const std::lock_guard lock(guard_);
             if (const auto found = answers_.find(key); found != answers_.end()) {
@@ -95,7 +106,7 @@ public:
             }
         }
         const std::string content = beginningOf(path);
-        const bool answer = holds(known, content);
+        const Program::Kind answer = kindIn(name, content);
         const std::lock_guard lock(guard_);
         constexpr std::size_t kMost = 1000;
         // A file that could not be read for want of descriptors can be read later.
@@ -132,7 +143,7 @@ public:
 
 private:
     std::mutex guard_;
-    std::map<std::pair<std::string_view, Identity>, bool> answers_;
+    std::map<std::pair<std::string, Identity>, Program::Kind> answers_;
     std::optional<Identity> adapters_;
     std::map<std::string, Identity> absent_;  // files, with the directory in which they were missing
 };
@@ -177,15 +188,16 @@ Program::Kind ProgramSearch::kindOf(const std::string& name, const std::string& 
     if (memory().isAdapter(file)) {
         return Program::adapter;
     }
-    const auto* const known = std::ranges::find(kKnown, name, &Known::name);
+    const bool filtered = std::ranges::find(kKnown, name, &Known::name) != kKnown.end();
     const std::string_view directory = std::string_view(path).substr(0, path.rfind('/') + 1);
     const bool standard = std::ranges::find(kSystemDirectories, directory) != kSystemDirectories.end();
-    if (known == kKnown.end() || !standard || !memory().isKnown(*known, path, file)) {
+    if (!filtered || !standard) {
         return Program::tool;
     }
+    const Program::Kind kind = memory().kindOf(name, path, file);
     // The one may be a script that runs the other.
-    return name == "egrep" ? (find("grep").kind == Program::known ? Program::known : Program::tool)
-                           : Program::known;
+    const bool asGrep = kind != Program::known || name != "egrep" || find("grep").kind == Program::known;
+    return asGrep ? kind : Program::tool;
 }
 
 std::optional<Program> ProgramSearch::lookAt(const std::string& name, const std::string& path) {

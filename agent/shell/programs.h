@@ -16,6 +16,7 @@ struct Program {
         unclear,  ///< only a shell can say: a directory that is no absolute path, a file that cannot be run
         tool,     ///< a program or script
         known,    ///< the system's own, of the implementation that the filter of that name stands for
+        busybox,  ///< the same of busybox, of the release that the filters were compared with
         adapter   ///< our own host tools
     };
     Kind kind = missing;

@@ -1,6 +1,12 @@
 #include "agent/shell/filters/line_filter.h"
 
+#include <algorithm>
+
 namespace cvagent::shell {
+
+void LineFilter::endLinesAtZeros(std::string& buffer, std::size_t first) {
+    std::replace(buffer.begin() + static_cast<std::ptrdiff_t>(first), buffer.end(), '\0', '\n');
+}
 
 /// Whether something came. What the tools see at once is seen at once here, too: grep looks for zeros in it.
 bool LineFilter::fill() {

@@ -23,6 +23,7 @@ protected:
     virtual bool takeLine(std::string_view line, std::string& out) = 0;
     /// Sees the bytes that have just come before they are taken for lines, and may change them.
     virtual void arrived(std::string& /*buffer*/, std::size_t /*first*/) {}
+    static void endLinesAtZeros(std::string& buffer, std::size_t first);
     bool gaveUp() const { return gaveUp_; }
 
 private:
