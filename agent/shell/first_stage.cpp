@@ -8,6 +8,7 @@
 #include <array>
 #include <cerrno>
 #include <cstdlib>
+#include <cstring>
 #include <utility>
 
 #include "agent/shell/adapters.h"
@@ -41,21 +42,33 @@ FirstStage answered(std::unique_ptr<Source> source) {
 
 class FileSource : public Source {
 public:
-    explicit FileSource(Descriptor file) : file_(std::move(file)) {}
+    /// @param complaint what the tool says before the reason when it cannot read on; "" for nothing
+    /// @param isGreps grep reads it itself, and ends by it
+    FileSource(Descriptor file, std::string complaint, bool isGreps)
+        : file_(std::move(file)), complaint_(std::move(complaint)), isGreps_(isGreps) {}
     bool pull(std::string& out) override {
         const std::size_t before = out.size();
         out.resize(before + kChunk);
         const ssize_t got = read(file_.get(), out.data() + before, kChunk);
+        failed_ = got < 0;
+        if (failed_ && !complaint_.empty()) {
+            const std::string text = complaint_ + std::strerror(errno) + '\n';
+            [[maybe_unused]] const ssize_t written = write(STDERR_FILENO, text.data(), text.size());
+        }
         out.resize(before + (got > 0 ? static_cast<std::size_t>(got) : 0));
         read_ += std::max<ssize_t>(got, 0);
         // What grows while it is read must not hold this thread, which nobody can kill.
-        status_ = got < 0 || read_ > kLargestFile ? 1 : 0;
+        status_ = failed_ || read_ > kLargestFile ? 1 : 0;
         return got > 0 && read_ <= kLargestFile;
     }
+    bool failed() const override { return failed_ && isGreps_; }
     int status() const override { return status_; }
 
 private:
     Descriptor file_;
+    std::string complaint_;
+    bool isGreps_;
+    bool failed_ = false;
     off_t read_ = 0;
     int status_ = 0;
 };
@@ -79,6 +92,9 @@ bool isPlainPath(const std::string& path) {
 
 FirstStage fileOr(const std::string& path, std::unique_ptr<Filter> filter, Manner manner,
                   int statusWhenMissing, off_t most) {
+    if (manner.busybox && !manner.silent) {
+        return {};
+    }
     LocalFile file = openForReading(path, most);
     // Why there is nothing to read decides how busybox's grep ends.
     const bool sameEnd = filter == nullptr || !manner.busybox;
@@ -91,7 +107,9 @@ FirstStage fileOr(const std::string& path, std::unique_ptr<Filter> filter, Manne
     if (file.outcome != LocalFile::opened) {
         return refused();
     }
-    auto source = std::make_unique<FileSource>(std::move(file.descriptor));
+    const bool isGreps = filter != nullptr;
+    const std::string complaint = manner.silent ? "" : (isGreps ? "grep: " : "cat: ") + path + ": ";
+    auto source = std::make_unique<FileSource>(std::move(file.descriptor), complaint, isGreps);
     if (filter == nullptr) {
         return answered(std::move(source));
     }

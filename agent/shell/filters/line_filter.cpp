@@ -23,6 +23,7 @@ bool LineFilter::pull(std::string& out) {
     while (out.size() == before && !ended_) {
         const std::size_t held = buffer_.size();
         if (!fill()) {
+            gaveUp_ = from().failed();
             takeLast(out);
             break;
         }
@@ -48,7 +49,7 @@ void LineFilter::takeLines(std::string& out) {
 
 void LineFilter::takeLast(std::string& out) {
     ended_ = true;
-    if (!buffer_.empty()) {
+    if (!buffer_.empty() && !gaveUp_) {
         takeLine(buffer_, out);
         buffer_.clear();
     }
