@@ -127,6 +127,10 @@ void install(FakeHost& host, const std::string& tool, const std::string& program
 
 void compareAll(FakeHost& host, const std::vector<std::string>& commands) {
     for (const std::string& input : inputs()) {
+        // What no other tool has made anything else of is left out, for each line here starts a shell.
+        if (input.find_first_of(std::string("\0\t\v_", 4)) == std::string::npos && !input.ends_with('*')) {
+            continue;
+        }
         host.file("/etc/input", input);
         for (const std::string& command : commands) {
             const Ran ours = direct(command, Complaints::unseen);
