@@ -1,5 +1,6 @@
 #include "agent/cli/session.h"
 
+#include "agent/core/node_classes.h"
 #include "agent/core/signals.h"
 #include "agent/core/surroundings.h"
 
@@ -28,9 +29,22 @@ void show(ErrorLines& errors) {
     }
 }
 
+/// A question for one node needs the processors only if it can mean one of them: by a path, by an id, by a
+/// bare number. Another plug-in's builder may build anything, and a log is to be whole.
+bool needsProcessors(const Options& options) {
+    const bool ofOneNode = options.command == Command::get || options.command == Command::set;
+    if (!ofOneNode || !options.plugins.empty() || options.logFile || options.traceFile || options.logLevel) {
+        return true;
+    }
+    const std::string last = options.node.substr(options.node.rfind('/') + 1);
+    return last.starts_with(className(static_cast<unsigned int>(NodeType::processor))) ||
+           last.find_first_not_of("0123456789") == std::string::npos;
+}
+
 }  // namespace
 
 ProcessSettings processSettings(Options& options) {
+    options.processors = needsProcessors(options);
     if (options.plugins.empty()) {
         options.plugins.push_back(pluginBesideProgram());
     }
@@ -52,6 +66,7 @@ Session::Session(const PreparedProcess& process, const Options& options, WantMes
     AgentSettings settings = process.agentSettings();
     settings.plugins = options.plugins;
     settings.commandTime = std::chrono::duration<double>(options.commandSeconds);
+    settings.processors = options.processors;
     settings.tell = complain;
     hint(limitsOfUser(process.data()), "\nTo see everything run: sudo cvagent");
     hint(limitsOfData(process.data()));
@@ -76,7 +91,7 @@ void Session::start(const AgentSettings& settings, WantMessages& wants) {
     }
     hint(limitsOfTmp());
     const std::vector<NodeRef> nodes = agent_->nodes();
-    wants.tell(&nodes);
+    wants.tell(&nodes, settings.processors);
 }
 
 void Session::end() {

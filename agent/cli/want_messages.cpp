@@ -36,9 +36,9 @@ std::string remedyFor(int error) {
     return row == kRemedies.end() ? "" : std::string("\n") + row->text;
 }
 
-std::string gapsIn(const std::vector<NodeRef>& tree) {
+std::string gapsIn(const std::vector<NodeRef>& tree, bool processors) {
     std::string names;
-    for (const std::string& name : missingClasses(tree)) {
+    for (const std::string& name : missingClasses(tree, processors)) {
         names += (names.empty() ? "" : ", ") + name;
     }
     return names.empty() ? "some of the tree can be missing: "
@@ -47,13 +47,13 @@ std::string gapsIn(const std::vector<NodeRef>& tree) {
 
 }  // namespace
 
-bool WantMessages::tell(const std::vector<NodeRef>* tree) {
+bool WantMessages::tell(const std::vector<NodeRef>* tree, bool processors) {
     const Want want = findWant();
     if (want.error == 0 || want.error == told_) {
         return told_ != 0;
     }
     told_ = want.error;
-    std::string text = tree != nullptr ? gapsIn(*tree) : "";
+    std::string text = tree != nullptr ? gapsIn(*tree, processors) : "";
     if (want.commands != 0) {
         text += std::to_string(want.commands) + (want.commands == 1 ? " command" : " commands") +
                 " could not be started, ";

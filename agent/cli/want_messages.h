@@ -10,8 +10,9 @@ namespace cvagent {
 class WantMessages {
 public:
     /// @param tree what has just been built: its gaps are named. Null when there is none
+    /// @param processors whether those were to be in it
     /// @return whether anything was wanting since the program began
-    bool tell(const std::vector<NodeRef>* tree = nullptr);
+    bool tell(const std::vector<NodeRef>* tree = nullptr, bool processors = true);
 
 private:
     int told_ = 0;

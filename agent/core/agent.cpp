@@ -21,7 +21,7 @@ struct Agent::Engine {
     explicit Engine(const AgentSettings& settings);
 
     std::vector<Handle> handles() const;
-    void load(const std::string& file);
+    void load(const std::string& file, bool processors);
     void refresh();
     bool lists(const Handle& node) const;
 
@@ -50,16 +50,16 @@ Agent::Engine::Engine(const AgentSettings& settings)
         throw std::invalid_argument("an agent needs a data directory");
     }
     for (const std::string& file : settings.plugins) {
-        load(file);
+        load(file, settings.processors);
     }
     if (plugins.empty() && !failed.empty()) {
         throw Problem(failed.front().problem);
     }
 }
 
-void Agent::Engine::load(const std::string& file) {
+void Agent::Engine::load(const std::string& file, bool processors) {
     try {
-        plugins.push_back(std::make_unique<Plugin>(file, &announcer, tell));
+        plugins.push_back(std::make_unique<Plugin>(file, &announcer, tell, processors));
         announcer.takeStock(plugins.back()->interface());
     } catch (const Problem& problem) {
         failed.push_back({file, problem});

@@ -21,6 +21,8 @@ struct AgentSettings {
     std::vector<std::string> plugins;  ///< files; each brings its nodes into the one tree
     /// Opened before; null: the plug-ins' lines go nowhere.
     std::shared_ptr<LogOutput> log;
+    /// Whether the plug-ins build their nodes of processors, which is asked of them apart from their start.
+    bool processors = true;
     /// How long a command of a plug-in may take, in a write ten times as long; 0 for ever.
     std::chrono::duration<double> commandTime{10};
     /// Held for as long as the agent is; there is none without.

@@ -70,12 +70,12 @@ std::string pluginBesideProgram() {
 
 void tellNobody(const std::string& /*text*/) {}
 
-Plugin::Plugin(const std::string& file, Listener* listener, Tell tell)
+Plugin::Plugin(const std::string& file, Listener* listener, Tell tell, bool processors)
     : file_(file), events_(listener), tell_(std::move(tell)) {
     try {
         load();
         open();
-        start();
+        start(processors);
     } catch (...) {
         close();
         throw;
@@ -123,14 +123,14 @@ void Plugin::open() {
     }
 }
 
-void Plugin::start() {
+void Plugin::start(bool processors) {
     try {
         running_.emplace(*interface_);
     } catch (const Problem& problem) {
         throw Problem(problem.kind(), inQuotes(file_) + ": " + problem.what());
     }
     try {
-        guarded("initialize of " + inQuotes(file_), [this] {
+        guarded("initialize of " + inQuotes(file_), [this, processors] {
             const IdRange ids = running_->ids();
             interface_->setLoadCallBack(nodeLoaded, this, running_->finder());
             interface_->setWithdrawCallBack(nodeWithdrawn, this);
@@ -140,7 +140,8 @@ void Plugin::start() {
             if (result.getStatus() != 0) {
                 fail("the plug-in " + inQuotes(file_) + " did not initialize: " + errorText(result));
             }
-            if (const auto create = symbol<Builder>(library_, kProcessorBuilder)) {
+            const auto create = symbol<Builder>(library_, kProcessorBuilder);
+            if (create != nullptr && processors) {
                 create(interface_);
             }
             checkIds();

@@ -28,8 +28,9 @@ public:
     /// @param listener hears of alerts, published and withdrawn nodes, from the moment when the start has
     ///                 succeeded: what came before it hears then. Null for none. Outlives the object.
     /// @param tell     hears of a stop that went wrong
+    /// @param processors whether its builder of processor nodes is called
     /// Throws Problem, with a text of its own for each way in which a file can be no plug-in.
-    Plugin(const std::string& file, Listener* listener, Tell tell = tellNobody);
+    Plugin(const std::string& file, Listener* listener, Tell tell = tellNobody, bool processors = true);
     Plugin(const Plugin&) = delete;
     Plugin& operator=(const Plugin&) = delete;
     /// Unloads the plug-in and closes the library.
@@ -45,7 +46,7 @@ private:
 
     void load();
     void open();
-    void start();
+    void start(bool processors);
     void checkIds() const;
     bool isOwnId(const IC::MutableNode& node) const;
     void stop();

@@ -112,13 +112,14 @@ Want findWant() {
     return want;
 }
 
-std::vector<std::string> missingClasses(const std::vector<NodeRef>& nodes) {
+std::vector<std::string> missingClasses(const std::vector<NodeRef>& nodes, bool processors) {
     std::vector<std::string> missing;
     for (const NodeClass& nodeClass : nodeClasses()) {
         const auto isOfIt = [&nodeClass](const NodeRef& node) {
             return node->nodeType() == static_cast<unsigned int>(nodeClass.type);
         };
-        if (nodeClass.everywhere && std::ranges::none_of(nodes, isOfIt)) {
+        const bool wanted = nodeClass.everywhere && (processors || nodeClass.type != NodeType::processor);
+        if (wanted && std::ranges::none_of(nodes, isOfIt)) {
             missing.emplace_back(nodeClass.name);
         }
     }

@@ -20,7 +20,8 @@ struct Want {
 Want findWant();
 
 /// The classes that every host has nodes of and that there are none of.
-std::vector<std::string> missingClasses(const std::vector<NodeRef>& nodes);
+/// @param processors whether those were asked for
+std::vector<std::string> missingClasses(const std::vector<NodeRef>& nodes, bool processors);
 
 /// @param error the errno of a call that failed; one that tells of no want, or 0, is passed over
 void noteWant(int error);

@@ -3,7 +3,9 @@
 
 #include <fstream>
 #include <regex>
+#include <thread>
 
+#include "agent/shell/kernel_news.h"
 #include "agent/shell/programs.h"
 #include "agent/shell/runner.h"
 #include "tests/shell/both_ways.h"
@@ -92,6 +94,40 @@ HOST_TEST(Adapters, ListWhatTheKernelHasNow) {
         EXPECT_EQ(inShell("ip " + change, Complaints::seen).err, "");
         compareListings(change);
     }
+}
+
+HOST_TEST(Adapters, AreAskedAnewAtOnceWhenARouteGoesWithItsNextHop) {
+    host.useKernelNetwork();
+    host.realTool("ip");
+    useAdapters();
+    for (const std::string change :
+         {"link add one type veth peer name two", "link set one up", "link set two up",
+          "address add 192.0.2.7/24 dev one", "nexthop add id 7 via 192.0.2.1 dev one",
+          "route add 198.51.100.0/24 nhid 7"}) {
+        ASSERT_EQ(inShell("ip " + change, Complaints::seen).err, "");
+    }
+    const auto shown = [] { return direct("route -n", Complaints::unseen).out; };
+    ASSERT_TRUE(eventually([&] { return shown().find("198.51.100.0") != std::string::npos; }));
+    std::this_thread::sleep_for(std::chrono::milliseconds(200));  // until what is told is kept
+    shown();
+    inShell("ip nexthop delete id 7", Complaints::seen);
+    EXPECT_EQ(shown().find("198.51.100.0"), std::string::npos);
+}
+
+HOST_TEST(Adapters, ReadTheKernelAnewWhenNewsWereLost) {
+    host.useKernelNetwork();
+    host.realTool("ip");
+    cvagent::shell::KernelNews news;
+    EXPECT_FALSE(news.isQuiet());
+    EXPECT_TRUE(news.isQuiet());
+    std::string batch = "link add one type veth peer name two\n";
+    for (int i = 0; i < 1000; ++i) {
+        batch += "link set one alias " + std::string(200, static_cast<char>('a' + i % 26)) + '\n';
+    }
+    host.file("/tmp/batch", batch);
+    ASSERT_EQ(inShell("ip -batch /tmp/batch", Complaints::seen).err, "");
+    EXPECT_FALSE(news.isQuiet());
+    EXPECT_TRUE(news.isQuiet());
 }
 
 HOST_TEST(Adapters, NeedNoProcess) {
