@@ -62,9 +62,7 @@ std::optional<std::string> Host::line(const std::string& path) const {
     if (!whole) {
         return std::nullopt;
     }
-    std::string first = trimmed(whole->substr(0, whole->find('\n')));
-    std::replace_if(
-        first.begin(), first.end(), [](unsigned char byte) { return byte < ' ' || byte == 0x7f; }, '?');
+    std::string first = printable(trimmed(whole->substr(0, whole->find('\n'))));
     return first.empty() ? std::nullopt : std::optional(std::move(first));
 }
 
@@ -150,6 +148,12 @@ bool comesBefore(const std::string& left, const std::string& right) {
     }
     return left.size() - at < right.size() - other ||
            (left.size() - at == right.size() - other && left < right);
+}
+
+std::string printable(std::string text) {
+    std::replace_if(
+        text.begin(), text.end(), [](unsigned char byte) { return byte < ' ' || byte == 0x7f; }, '?');
+    return text;
 }
 
 std::string trimmed(const std::string& text) {

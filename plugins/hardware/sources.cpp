@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <iterator>
 
+#include "plugins/hardware/memory/memory.h"
+#include "plugins/hardware/processor/processors.h"
 #include "plugins/hardware/system/system.h"
 
 namespace hardware {
@@ -29,7 +31,10 @@ constexpr Row nameRow(Class type) {
 }
 
 const Source kSources[] = {
-    {Class::system, systemRows(), listSystem, describeSystem, "dmi"},
+    {Class::system, systemRows(), listSystem, describeSystem, ""},
+    {Class::memory, memoryRows(), listMemory, describeMemory, "memory"},
+    {Class::memoryModule, memoryModuleRows(), listMemoryModules, describeMemoryModule, ""},
+    {Class::processor, processorRows(), listProcessors, describeProcessor, "cpu"},
 };
 
 }  // namespace
