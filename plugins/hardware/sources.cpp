@@ -4,7 +4,9 @@
 #include <iterator>
 
 #include "plugins/hardware/memory/memory.h"
+#include "plugins/hardware/network/links.h"
 #include "plugins/hardware/processor/processors.h"
+#include "plugins/hardware/sensor/sensors.h"
 #include "plugins/hardware/system/system.h"
 
 namespace hardware {
@@ -35,6 +37,8 @@ const Source kSources[] = {
     {Class::memory, memoryRows(), listMemory, describeMemory, "memory"},
     {Class::memoryModule, memoryModuleRows(), listMemoryModules, describeMemoryModule, ""},
     {Class::processor, processorRows(), listProcessors, describeProcessor, "cpu"},
+    {Class::link, linkRows(), listLinks, describeLink, "net"},
+    {Class::sensor, sensorRows(), listSensors, describeSensor, "hwmon"},
 };
 
 }  // namespace
