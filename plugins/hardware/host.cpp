@@ -98,6 +98,15 @@ std::optional<bool> Host::flag(const std::string& path) const {
     return first == "0" || first == "N" ? std::optional(false) : std::nullopt;
 }
 
+std::optional<std::string> Host::field(const std::string& path, const std::string& key) const {
+    for (const std::string& one : lines(path)) {
+        if (one.starts_with(key + "=")) {
+            return printable(one.substr(key.size() + 1));
+        }
+    }
+    return std::nullopt;
+}
+
 std::vector<std::string> Host::entries(const std::string& directory) const {
     std::vector<std::string> names;
     std::error_code error;

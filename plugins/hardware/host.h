@@ -31,6 +31,8 @@ public:
     std::optional<long long> signedNumber(const std::string& path) const;
     /// "0" and "1", "N" and "Y".
     std::optional<bool> flag(const std::string& path) const;
+    /// The value behind "KEY=" in a file of such lines.
+    std::optional<std::string> field(const std::string& path, const std::string& key) const;
     /// The names in a directory, "eth2" before "eth10"; none when it cannot be read.
     std::vector<std::string> entries(const std::string& directory) const;
     /// The last part of what a link points to.

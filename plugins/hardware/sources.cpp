@@ -7,6 +7,7 @@
 #include "plugins/hardware/network/links.h"
 #include "plugins/hardware/processor/processors.h"
 #include "plugins/hardware/sensor/sensors.h"
+#include "plugins/hardware/storage/storage.h"
 #include "plugins/hardware/system/system.h"
 
 namespace hardware {
@@ -37,6 +38,11 @@ const Source kSources[] = {
     {Class::memory, memoryRows(), listMemory, describeMemory, "memory"},
     {Class::memoryModule, memoryModuleRows(), listMemoryModules, describeMemoryModule, ""},
     {Class::processor, processorRows(), listProcessors, describeProcessor, "cpu"},
+    {Class::drive, driveRows(), listDrives, describeDrive, "block"},
+    {Class::array, arrayRows(), listArrays, describeArray, "block"},
+    {Class::mapping, mappingRows(), listMappings, describeMapping, "block"},
+    {Class::partition, partitionRows(), listPartitions, describePartition, "block"},
+    {Class::fileSystem, fileSystemRows(), listFileSystems, describeFileSystem, "block"},
     {Class::link, linkRows(), listLinks, describeLink, "net"},
     {Class::sensor, sensorRows(), listSensors, describeSensor, "hwmon"},
 };

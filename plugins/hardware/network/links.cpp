@@ -112,22 +112,13 @@ constexpr unsigned int kEthernet = 1;
 constexpr unsigned int kInfiniband = 32;
 constexpr unsigned int kLoopback = 772;
 
-std::optional<std::string> uevent(const Host& host, const std::string& link, const std::string& key) {
-    for (const std::string& line : host.lines(link + "/uevent")) {
-        if (line.starts_with(key + "=")) {
-            return printable(line.substr(key.size() + 1));
-        }
-    }
-    return std::nullopt;
-}
-
 std::optional<std::string> sortOf(const Host& host, const std::string& link, const LinkDriver& driver) {
     const auto mark = std::find_if(kMarks.begin(), kMarks.end(),
                                    [&](const Mark& one) { return host.exists(link + one.file); });
     if (mark != kMarks.end()) {
         return mark->sort;
     }
-    if (const auto told = uevent(host, link, "DEVTYPE")) {
+    if (const auto told = host.field(link + "/uevent", "DEVTYPE")) {
         return told;
     }
     const auto type = host.number(link + "/type");
