@@ -8,10 +8,11 @@
 
 namespace IC {
 
-/// The result of a call that can fail. Status 0 is success; the framework's own failures use 1.
+/// The result of a call that can fail. Status 0 is success; the framework's own failures use 1. A plug-in may
+/// use 2 where the host has not answered in time: what was known before can still be so.
 class CORVISTA_API Error {
 public:
-    enum StatusType : unsigned char { success = 0, failure = 1 };
+    enum StatusType : unsigned char { success = 0, failure = 1, unanswered = 2 };
     /// The code of a failure to read a property that was never stored.
     static constexpr unsigned int kNoSuchProperty = 1;
 

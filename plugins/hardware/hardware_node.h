@@ -1,0 +1,70 @@
+#pragma once
+
+#include <chrono>
+#include <memory>
+#include <mutex>
+#include <string>
+
+#include "framework/ic/mutable_node.h"
+#include "plugins/hardware/host.h"
+#include "plugins/hardware/patience.h"
+#include "plugins/hardware/sources.h"
+
+namespace hardware {
+
+/// What all nodes ask with. It lives as long as the last question.
+struct Asking {
+    explicit Asking(Host where) : host(std::move(where)) {}
+
+    Host host;
+    Patience patience{std::chrono::seconds(2)};
+};
+
+/// What is known of a thing that does not answer.
+Found nameOnly(Class type, const std::string& name);
+
+/// Asks one source for one thing.
+/// @return nothing when it does not answer in time
+std::optional<Found> ask(const std::shared_ptr<Asking>& asking, const Source& source,
+                         const std::string& name);
+
+/// A node of the tree: stores what was found, and looks again when a live property is read.
+class HardwareNode : public IC::MutableNode {
+public:
+    struct Place {
+        unsigned int id;
+        unsigned int parent;
+        std::vector<unsigned int> owners;
+        unsigned int index;
+    };
+    HardwareNode(const Place& place, const Source& source, std::string name, std::shared_ptr<Asking> asking);
+
+    /// A live property is read from the host, at most twice a second; Error::unanswered when the device does
+    /// not answer in time.
+    IC::Error getProperty(unsigned int id, IC::PropertyValue& out) const override;
+    IC::Error getProperties(std::map<unsigned int, IC::PropertyValue>& out) const override;
+    /// Nothing of the host is changed here.
+    IC::Error setProperty(const unsigned int& id, const IC::PropertyValue& value) override;
+
+    const Source& source() const { return source_; }
+    const std::string& name() const { return name_; }
+    /// Takes over what was found; what is not told any more is forgotten.
+    void store(const Found& found);
+
+private:
+    IC::Error refresh() const;
+
+    /// What is known, shared by the readers.
+    struct Known {
+        Found found;
+        std::chrono::steady_clock::time_point asOf;
+    };
+
+    const Source& source_;
+    const std::string name_;
+    const std::shared_ptr<Asking> asking_;
+    mutable std::mutex guard_;  // guards what is known; not held while the host is asked
+    mutable Known known_;
+};
+
+}  // namespace hardware

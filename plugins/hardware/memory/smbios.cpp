@@ -1,0 +1,98 @@
+#include "plugins/hardware/memory/smbios.h"
+
+#include <algorithm>
+#include <array>
+#include <string_view>
+#include <utility>
+
+#include "plugins/hardware/host.h"
+
+namespace hardware {
+
+namespace {
+
+constexpr std::size_t kHeader = 4;  // type, length, handle
+constexpr std::uint8_t kEnd = 127;
+
+// What firmware writes where its maker has filled nothing in.
+constexpr std::array<std::string_view, 10> kNothing = {
+    "Not Specified", "Unknown", "None",           "NO DIMM",       "To Be Filled By O.E.M.",
+    "Not Provided",  "N/A",     "Default string", "Not Available", "Empty"};
+
+std::uint8_t byteAt(const std::string& bytes, std::size_t place) {
+    return static_cast<std::uint8_t>(bytes[place]);
+}
+
+/// Takes the texts behind a structure. @return where the next one begins; npos when they have no end
+std::size_t readTexts(const std::string& table, std::size_t at, std::vector<std::string>& texts) {
+    if (table.compare(at, 2, std::string(2, '\0')) == 0) {
+        return at + 2;
+    }
+    while (at < table.size() && table[at] != '\0') {
+        const std::size_t end = table.find('\0', at);
+        if (end == std::string::npos) {
+            return end;
+        }
+        texts.push_back(printable(trimmed(table.substr(at, end - at))));
+        at = end + 1;
+    }
+    return at < table.size() ? at + 1 : std::string::npos;
+}
+
+}  // namespace
+
+SmbiosRecord::SmbiosRecord(std::uint8_t type, std::string fixed, std::vector<std::string> texts)
+    : type_(type), fixed_(std::move(fixed)), texts_(std::move(texts)) {}
+
+std::optional<std::uint32_t> SmbiosRecord::number(std::size_t offset, std::size_t size) const {
+    if (offset + size > fixed_.size()) {
+        return std::nullopt;
+    }
+    std::uint32_t value = 0;
+    for (std::size_t place = size; place-- > 0;) {
+        value = value << 8U | byteAt(fixed_, offset + place);
+    }
+    return value;
+}
+
+std::optional<std::uint8_t> SmbiosRecord::byte(std::size_t offset) const {
+    const auto value = number(offset, 1);
+    return value ? std::optional(static_cast<std::uint8_t>(*value)) : std::nullopt;
+}
+
+std::optional<std::uint16_t> SmbiosRecord::word(std::size_t offset) const {
+    const auto value = number(offset, 2);
+    return value ? std::optional(static_cast<std::uint16_t>(*value)) : std::nullopt;
+}
+
+std::optional<std::uint32_t> SmbiosRecord::doubleWord(std::size_t offset) const {
+    return number(offset, 4);
+}
+
+std::optional<std::string> SmbiosRecord::text(std::size_t offset) const {
+    const std::size_t place = byte(offset).value_or(0);
+    if (place == 0 || place > texts_.size()) {
+        return std::nullopt;
+    }
+    const std::string& text = texts_[place - 1];
+    const bool nothing = text.empty() || std::find(kNothing.begin(), kNothing.end(), text) != kNothing.end();
+    return nothing ? std::nullopt : std::optional(text);
+}
+
+std::vector<SmbiosRecord> readSmbios(const std::string& table) {
+    std::vector<SmbiosRecord> records;
+    for (std::size_t at = 0; at != std::string::npos && at + kHeader <= table.size();) {
+        const std::uint8_t type = byteAt(table, at);
+        const std::size_t length = byteAt(table, at + 1);
+        if (type == kEnd || length < kHeader || at + length > table.size()) {
+            break;
+        }
+        std::string fixed = table.substr(at, length);
+        std::vector<std::string> texts;
+        at = readTexts(table, at + length, texts);
+        records.emplace_back(type, std::move(fixed), std::move(texts));
+    }
+    return records;
+}
+
+}  // namespace hardware

@@ -1,0 +1,231 @@
+#include "plugins/hardware/processor/processors.h"
+
+#include <algorithm>
+#include <map>
+#include <set>
+
+namespace hardware {
+
+namespace {
+
+constexpr auto kType = Class::processor;
+const std::string kAll = "/sys/devices/system/cpu/";
+
+enum : Id {
+    kMaker = firstId(kType) + 1,
+    kModel,
+    kCores,
+    kThreads,
+    kLevel1Data,
+    kLevel1Instructions,
+    kLevel2,
+    kLevel3,
+    kFrequency,
+    kTopFrequency,
+    kMicrocode,
+    kWeaknesses,
+};
+
+constexpr Row kRows[] = {
+    {kType, kMaker, "Maker", Kind::text, "", "vendor_id or CPU implementer in /proc/cpuinfo", "who made it"},
+    {kType, kModel, "Model", Kind::text, "", "model name or CPU part in /proc/cpuinfo", "the model's name"},
+    {kType, kCores, "Cores", Kind::number, "",
+     "topology/core_id of each processor in /sys/devices/system/cpu", "cores that are in use"},
+    {kType, kThreads, "Threads", Kind::number, "", "processors of the package in /sys/devices/system/cpu",
+     "processors that the kernel schedules on"},
+    {kType, kLevel1Data, "Level1DataCache", Kind::number, "bytes", "cache/index* in /sys/devices/system/cpu",
+     "all first-level data caches together"},
+    {kType, kLevel1Instructions, "Level1InstructionCache", Kind::number, "bytes",
+     "cache/index* in /sys/devices/system/cpu", "all first-level instruction caches together"},
+    {kType, kLevel2, "Level2Cache", Kind::number, "bytes", "cache/index* in /sys/devices/system/cpu",
+     "all second-level caches together"},
+    {kType, kLevel3, "Level3Cache", Kind::number, "bytes", "cache/index* in /sys/devices/system/cpu",
+     "all third-level caches together"},
+    {kType, kFrequency, "Frequency", Kind::number, "kilohertz",
+     "cpufreq/scaling_cur_freq, else cpu MHz in /proc/cpuinfo", "how fast its first processor runs now",
+     Audience::everybody, true},
+    {kType, kTopFrequency, "TopFrequency", Kind::number, "kilohertz", "cpufreq/cpuinfo_max_freq",
+     "how fast it can run"},
+    {kType, kMicrocode, "Microcode", Kind::text, "", "microcode in /proc/cpuinfo",
+     "version of its microcode"},
+    {kType, kWeaknesses, "Weaknesses", Kind::texts, "", "/sys/devices/system/cpu/vulnerabilities",
+     "known weaknesses that it has, and what the kernel does about them"},
+};
+
+using Fields = std::map<std::string, std::string>;
+
+/// The section of one processor; where there are none, what stands for all.
+Fields sectionOf(const Host& host, const std::string& processor) {
+    Fields fields;
+    for (const std::string& line : host.lines("/proc/cpuinfo")) {
+        const std::size_t colon = line.find(':');
+        if (colon == std::string::npos) {
+            continue;
+        }
+        const std::string key = trimmed(line.substr(0, colon));
+        const std::string value = printable(trimmed(line.substr(colon + 1)));
+        if (key == "processor") {
+            if (fields.contains(key) && fields[key] == processor) {
+                break;
+            }
+            fields.clear();
+        }
+        fields[key] = value;
+    }
+    return fields;
+}
+
+std::optional<std::string> field(const Fields& fields, const std::string& key) {
+    const auto found = fields.find(key);
+    return found == fields.end() ? std::nullopt : std::optional(found->second);
+}
+
+bool isProcessor(const std::string& name) {
+    return name.starts_with("cpu") && asNumber(name.substr(3));
+}
+
+/// The processors of a package, by their numbers; one without a topology counts as package 0.
+std::vector<std::string> processorsOf(const Host& host, const std::string& package) {
+    std::vector<std::string> numbers;
+    for (const std::string& name : host.entries(kAll)) {
+        const bool used = isProcessor(name) && host.flag(kAll + name + "/online").value_or(true);
+        if (used && host.line(kAll + name + "/topology/physical_package_id").value_or("0") == package) {
+            numbers.push_back(name.substr(3));
+        }
+    }
+    return numbers;
+}
+
+unsigned long long coresOf(const Host& host, const std::vector<std::string>& processors) {
+    std::set<std::string> cores;
+    for (const std::string& number : processors) {
+        const std::string topology = kAll + "cpu" + number + "/topology/";
+        cores.insert(host.line(topology + "core_cpus_list")
+                         .value_or(host.line(topology + "thread_siblings_list").value_or(number)));
+    }
+    return cores.size();
+}
+
+/// "32K", in bytes.
+std::optional<unsigned long long> cacheSize(const std::string& text) {
+    const auto size = text.ends_with("K") ? asNumber(text.substr(0, text.size() - 1)) : std::nullopt;
+    return size ? std::optional(*size * 1024) : std::nullopt;
+}
+
+/// Sizes by property; a cache that several processors share counts once.
+std::map<Id, unsigned long long> cachesOf(const Host& host, const std::vector<std::string>& processors) {
+    static const std::map<std::string, Id> kSorts = {{"1Data", kLevel1Data},
+                                                     {"1Instruction", kLevel1Instructions},
+                                                     {"2Unified", kLevel2},
+                                                     {"3Unified", kLevel3}};
+    std::map<Id, unsigned long long> sizes;
+    std::set<std::string> counted;
+    for (const std::string& number : processors) {
+        const std::string caches = kAll + "cpu" + number + "/cache/";
+        for (const std::string& index : host.entries(caches)) {
+            const std::string cache = caches + index + "/";
+            const auto sort =
+                kSorts.find(host.line(cache + "level").value_or("") + host.line(cache + "type").value_or(""));
+            const auto size = cacheSize(host.line(cache + "size").value_or(""));
+            const std::string shared = host.line(cache + "shared_cpu_list").value_or(number);
+            if (sort != kSorts.end() && size && counted.insert(sort->first + " " + shared).second) {
+                sizes[sort->second] += *size;
+            }
+        }
+    }
+    return sizes;
+}
+
+/// "2100.000" megahertz, in kilohertz.
+std::optional<unsigned long long> kilohertz(const std::optional<std::string>& megahertz) {
+    if (!megahertz) {
+        return std::nullopt;
+    }
+    const std::size_t point = std::min(megahertz->find('.'), megahertz->size());
+    std::string fraction = point < megahertz->size() ? megahertz->substr(point + 1) : "";
+    fraction.resize(3, '0');
+    return asNumber(megahertz->substr(0, point) + fraction);
+}
+
+struct Part {
+    const char* implementer;
+    const char* part;
+    const char* name;
+};
+
+// 64-bit ARM kernels tell numbers only; those of the servers and boards that are met.
+constexpr Part kParts[] = {
+    {"0x41", "0xb76", "ARM1176"},     {"0x41", "0xc07", "Cortex-A7"},   {"0x41", "0xd03", "Cortex-A53"},
+    {"0x41", "0xd05", "Cortex-A55"},  {"0x41", "0xd07", "Cortex-A57"},  {"0x41", "0xd08", "Cortex-A72"},
+    {"0x41", "0xd0b", "Cortex-A76"},  {"0x41", "0xd0c", "Neoverse-N1"}, {"0x41", "0xd40", "Neoverse-V1"},
+    {"0x41", "0xd49", "Neoverse-N2"}, {"0x41", "0xd4f", "Neoverse-V2"}, {"0xc0", "0xac3", "Ampere-1"},
+};
+
+std::optional<std::string> modelOf(const Fields& fields) {
+    if (const auto name = field(fields, "model name")) {
+        return name;
+    }
+    for (const Part& part : kParts) {
+        if (field(fields, "CPU implementer") == part.implementer && field(fields, "CPU part") == part.part) {
+            return part.name;
+        }
+    }
+    return field(fields, "cpu");  // PowerPC
+}
+
+std::optional<std::string> makerOf(const Fields& fields) {
+    const auto implementer = field(fields, "CPU implementer");
+    return implementer == "0x41" ? "ARM" : implementer ? implementer : field(fields, "vendor_id");
+}
+
+std::vector<std::string> weaknesses(const Host& host) {
+    const std::string all = kAll + "vulnerabilities/";
+    std::vector<std::string> texts;
+    for (const std::string& name : host.entries(all)) {
+        const auto text = host.line(all + name);
+        if (text && *text != "Not affected") {
+            texts.push_back(name + ": " + *text);
+        }
+    }
+    return texts;
+}
+
+}  // namespace
+
+Rows processorRows() {
+    return kRows;
+}
+
+std::vector<std::string> listProcessors(const Host& host) {
+    std::set<std::string, decltype(&comesBefore)> packages(comesBefore);
+    for (const std::string& name : host.entries(kAll)) {
+        if (isProcessor(name)) {
+            packages.insert(host.line(kAll + name + "/topology/physical_package_id").value_or("0"));
+        }
+    }
+    return {packages.begin(), packages.end()};
+}
+
+void describeProcessor(const Host& host, Found& found) {
+    const std::vector<std::string> processors = processorsOf(host, found.name);
+    if (processors.empty()) {
+        return;
+    }
+    const Fields fields = sectionOf(host, processors.front());
+    const std::string frequency = kAll + "cpu" + processors.front() + "/cpufreq/";
+    Facts& facts = found.facts;
+    facts.text(kMaker, makerOf(fields));
+    facts.text(kModel, modelOf(fields));
+    facts.number(kCores, coresOf(host, processors));
+    facts.number(kThreads, processors.size());
+    for (const auto& [property, size] : cachesOf(host, processors)) {
+        facts.number(property, size);
+    }
+    const auto scaled = host.number(frequency + "scaling_cur_freq");
+    facts.number(kFrequency, scaled ? scaled : kilohertz(field(fields, "cpu MHz")));
+    facts.number(kTopFrequency, host.number(frequency + "cpuinfo_max_freq"));
+    facts.text(kMicrocode, field(fields, "microcode"));
+    facts.texts(kWeaknesses, weaknesses(host));
+}
+
+}  // namespace hardware

@@ -1,0 +1,154 @@
+#include "plugins/hardware/sensor/sensors.h"
+
+#include <algorithm>
+#include <array>
+#include <string_view>
+
+#include "plugins/hardware/sensor/chips.h"
+
+namespace hardware {
+
+namespace {
+
+constexpr auto kType = Class::sensor;
+constexpr auto kZones = "/sys/class/thermal/";
+
+enum : Id {
+    kChip = firstId(kType) + 1,
+    kLabel,
+    kTemperature,
+    kFan,
+    kVoltage,
+    kCurrent,
+    kPower,
+    kEnergy,
+    kHumidity,
+    kLow,
+    kHigh,
+    kCritical,
+    kAlarm,
+};
+
+constexpr Row row(Id id, const char* name, Kind kind, const char* unit, const char* source,
+                  const char* meaning, bool live = true) {
+    return {kType, id, name, kind, unit, source, meaning, Audience::everybody, live};
+}
+
+constexpr Row kRows[] = {
+    row(kChip, "Chip", Kind::text, "", "name in /sys/class/hwmon/hwmon*", "the chip and where it sits",
+        false),
+    row(kLabel, "Label", Kind::text, "", "*_label", "what is measured", false),
+    row(kTemperature, "Temperature", Kind::number, "degrees Celsius", "temp*_input", "the temperature now"),
+    row(kFan, "FanSpeed", Kind::number, "revolutions per minute", "fan*_input", "how fast the fan turns now"),
+    row(kVoltage, "Voltage", Kind::number, "volts", "in*_input", "the voltage now"),
+    row(kCurrent, "Current", Kind::number, "amperes", "curr*_input", "the current now"),
+    row(kPower, "Power", Kind::number, "watts", "power*_input or power*_average", "the power drawn now"),
+    row(kEnergy, "Energy", Kind::number, "joules", "energy*_input", "the energy used so far"),
+    row(kHumidity, "Humidity", Kind::number, "percent", "humidity*_input", "the relative humidity now"),
+    row(kLow, "LowLimit", Kind::number, "as the value", "*_min", "what is too low"),
+    row(kHigh, "HighLimit", Kind::number, "as the value", "*_max", "what is too high"),
+    row(kCritical, "CriticalLimit", Kind::number, "as the value", "*_crit", "what does harm"),
+    row(kAlarm, "Alarm", Kind::flag, "", "*_alarm", "whether the chip gives an alarm"),
+};
+
+struct Sort {
+    std::string_view prefix;  ///< of its files
+    Id value;
+    double unit;  ///< what the kernel counts, in the unit of the row
+};
+
+constexpr std::array<Sort, 7> kSorts = {{{"temp", kTemperature, 1e-3},
+                                         {"fan", kFan, 1},
+                                         {"in", kVoltage, 1e-3},
+                                         {"curr", kCurrent, 1e-3},
+                                         {"power", kPower, 1e-6},
+                                         {"energy", kEnergy, 1e-6},
+                                         {"humidity", kHumidity, 1e-3}}};
+
+/// "temp12": the sort of sensor; null for what is none.
+const Sort* sortOf(const std::string& sensor) {
+    const auto found = std::find_if(kSorts.begin(), kSorts.end(), [&](const Sort& sort) {
+        return sensor.starts_with(sort.prefix) && asNumber(sensor.substr(sort.prefix.size()));
+    });
+    return found == kSorts.end() ? nullptr : &*found;
+}
+
+/// The sensors of a chip: "fan1", "in0", "temp2".
+std::vector<std::string> sensorsOf(const Host& host, const Chip& chip) {
+    std::vector<std::string> names;
+    for (const std::string& file : host.entries(chip.directory)) {
+        const std::size_t end = file.rfind('_');
+        const std::string ending = end == std::string::npos ? "" : file.substr(end);
+        const std::string sensor = file.substr(0, end == std::string::npos ? 0 : end);
+        if ((ending == "_input" || (ending == "_average" && sensor.starts_with("power"))) &&
+            sortOf(sensor) != nullptr && (names.empty() || names.back() != sensor)) {
+            names.push_back(sensor);
+        }
+    }
+    return names;
+}
+
+bool isLoneZone(const Host& host, const std::string& name) {
+    const std::vector<std::string> entries = host.entries(kZones + name);
+    return name.starts_with("thermal_zone") &&
+           std::none_of(entries.begin(), entries.end(),
+                        [](const std::string& entry) { return entry.starts_with("hwmon"); });
+}
+
+std::optional<double> measured(const Host& host, const std::string& file, double unit) {
+    const auto count = host.signedNumber(file);
+    return count ? std::optional(static_cast<double>(*count) * unit) : std::nullopt;
+}
+
+void describeZone(const Host& host, Found& found) {
+    const std::string zone = kZones + found.name;
+    found.facts.text(kLabel, host.line(zone + "/type"));
+    found.facts.real(kTemperature, measured(host, zone + "/temp", 1e-3));
+}
+
+}  // namespace
+
+Rows sensorRows() {
+    return kRows;
+}
+
+std::vector<std::string> listSensors(const Host& host) {
+    std::vector<std::string> names;
+    for (const Chip& chip : chips(host)) {
+        for (const std::string& sensor : sensorsOf(host, chip)) {
+            names.push_back(chip.name + ":" + sensor);
+        }
+    }
+    for (const std::string& zone : host.entries(kZones)) {
+        if (isLoneZone(host, zone)) {
+            names.push_back(zone);
+        }
+    }
+    return names;
+}
+
+void describeSensor(const Host& host, Found& found) {
+    const std::size_t colon = found.name.rfind(':');
+    if (colon == std::string::npos) {
+        describeZone(host, found);
+        return;
+    }
+    const std::string sensor = found.name.substr(colon + 1);
+    const Sort* const sort = sortOf(sensor);
+    const std::optional<Chip> chip = findChip(host, found.name.substr(0, colon));
+    if (sort == nullptr || !chip) {
+        return;
+    }
+    const std::string file = chip->directory + "/" + sensor;
+    Facts& facts = found.facts;
+    facts.text(kChip, chip->name);
+    facts.text(kLabel, host.line(file + "_label"));
+    const auto value = measured(host, file + "_input", sort->unit);
+    facts.real(sort->value, value ? value : measured(host, file + "_average", sort->unit));
+    facts.real(kLow, measured(host, file + "_min", sort->unit));
+    facts.real(kHigh, measured(host, file + "_max", sort->unit));
+    facts.real(kCritical, measured(host, file + "_crit", sort->unit));
+    facts.flag(kAlarm, host.flag(file + "_alarm"));
+}
+
+}  // namespace hardware

@@ -1,0 +1,76 @@
+#include "plugins/hardware/sources.h"
+
+#include <algorithm>
+#include <iterator>
+
+#include "plugins/hardware/memory/memory.h"
+#include "plugins/hardware/network/links.h"
+#include "plugins/hardware/processor/processors.h"
+#include "plugins/hardware/sensor/sensors.h"
+#include "plugins/hardware/storage/storage.h"
+#include "plugins/hardware/system/system.h"
+
+namespace hardware {
+
+namespace {
+
+constexpr ClassRow kClasses[] = {
+    {Class::hardware, "hardware", false},
+    {Class::system, "system", false},
+    {Class::memory, "memory", false},
+    {Class::memoryModule, "memory-module", true},
+    {Class::processor, "cpu", true},
+    {Class::drive, "drive", true},
+    {Class::partition, "drive-part", true},
+    {Class::fileSystem, "file-system", true},
+    {Class::array, "array", true},
+    {Class::mapping, "mapping", true},
+    {Class::link, "link", true},
+    {Class::sensor, "sensor", true},
+};
+
+constexpr Row nameRow(Class type) {
+    return {type, firstId(type), "Name", Kind::text, "", "the kernel", "what it is called"};
+}
+
+const Source kSources[] = {
+    {Class::system, systemRows(), listSystem, describeSystem, ""},
+    {Class::memory, memoryRows(), listMemory, describeMemory, "memory"},
+    {Class::memoryModule, memoryModuleRows(), listMemoryModules, describeMemoryModule, ""},
+    {Class::processor, processorRows(), listProcessors, describeProcessor, "cpu"},
+    {Class::drive, driveRows(), listDrives, describeDrive, "block"},
+    {Class::array, arrayRows(), listArrays, describeArray, "block"},
+    {Class::mapping, mappingRows(), listMappings, describeMapping, "block"},
+    {Class::partition, partitionRows(), listPartitions, describePartition, "block"},
+    {Class::fileSystem, fileSystemRows(), listFileSystems, describeFileSystem, "block"},
+    {Class::link, linkRows(), listLinks, describeLink, "net"},
+    {Class::sensor, sensorRows(), listSensors, describeSensor, "hwmon"},
+};
+
+}  // namespace
+
+std::span<const ClassRow> classes() {
+    return kClasses;
+}
+
+const ClassRow& classRow(Class type) {
+    return *std::find_if(std::begin(kClasses), std::end(kClasses),
+                         [type](const ClassRow& row) { return row.type == type; });
+}
+
+std::span<const Source> sources() {
+    return kSources;
+}
+
+std::vector<Row> allRows() {
+    std::vector<Row> all;
+    for (const Source& source : sources()) {
+        if (classRow(source.type).several) {
+            all.push_back(nameRow(source.type));
+        }
+        all.insert(all.end(), source.rows.begin(), source.rows.end());
+    }
+    return all;
+}
+
+}  // namespace hardware

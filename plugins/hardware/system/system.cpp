@@ -1,0 +1,178 @@
+#include "plugins/hardware/system/system.h"
+
+#include <algorithm>
+#include <array>
+#include <set>
+#include <string_view>
+
+namespace hardware {
+
+namespace {
+
+constexpr auto kType = Class::system;
+
+enum : Id {
+    kMaker = firstId(kType) + 1,
+    kModel,
+    kSerial,
+    kUuid,
+    kFirmwareVersion,
+    kFirmwareDate,
+    kVirtual,
+    kVirtualKind,
+    kBootTime,
+    kKernel,
+    kArchitecture,
+    kDistribution,
+    kSockets,
+};
+
+constexpr Row kRows[] = {
+    {kType, kMaker, "Maker", Kind::text, "", "/sys/class/dmi/id/sys_vendor", "who made the computer"},
+    {kType, kModel, "Model", Kind::text, "", "/sys/class/dmi/id/product_name or /proc/device-tree/model",
+     "the computer's model"},
+    {kType, kSerial, "SerialNumber", Kind::text, "",
+     "/sys/class/dmi/id/product_serial or /proc/device-tree/serial-number", "the computer's serial number",
+     Audience::trusted},
+    {kType, kUuid, "UUID", Kind::text, "", "/sys/class/dmi/id/product_uuid",
+     "the number that no other computer has", Audience::trusted},
+    {kType, kFirmwareVersion, "FirmwareVersion", Kind::text, "", "/sys/class/dmi/id/bios_version",
+     "version of the firmware"},
+    {kType, kFirmwareDate, "FirmwareDate", Kind::text, "", "/sys/class/dmi/id/bios_date",
+     "when the firmware was made, as it says it"},
+    {kType, kVirtual, "Virtual", Kind::flag, "", "flags in /proc/cpuinfo, /sys/class/dmi/id, /sys/hypervisor",
+     "whether the computer is a virtual machine"},
+    {kType, kVirtualKind, "VirtualKind", Kind::text, "", "/sys/class/dmi/id, /sys/hypervisor/type",
+     "what runs the virtual machine"},
+    {kType, kBootTime, "BootTime", Kind::number, "seconds since 1970", "btime in /proc/stat",
+     "when the host was started"},
+    {kType, kKernel, "Kernel", Kind::text, "", "/proc/sys/kernel/osrelease", "release of the running kernel"},
+    {kType, kArchitecture, "Architecture", Kind::text, "", "/proc/sys/kernel/arch",
+     "what the kernel was made for"},
+    {kType, kDistribution, "Distribution", Kind::text, "", "PRETTY_NAME in /etc/os-release",
+     "the operating system as it calls itself"},
+    {kType, kSockets, "ProcessorSockets", Kind::number, "",
+     "/sys/devices/system/cpu/cpu*/topology/physical_package_id", "sockets that hold a processor"},
+};
+
+/// The value behind "KEY=" in a file for a shell: quotes and backslashes taken off.
+std::optional<std::string> shellValue(const Host& host, const std::string& path, const std::string& key) {
+    for (const std::string& line : host.lines(path)) {
+        if (!line.starts_with(key + "=")) {
+            continue;
+        }
+        std::string value;
+        for (std::size_t at = key.size() + 1; at < line.size(); ++at) {
+            if (line[at] == '\\' && at + 1 < line.size()) {
+                value += line[++at];
+            } else if (line[at] != '"' && line[at] != '\'') {
+                value += line[at];
+            }
+        }
+        return printable(value);
+    }
+    return std::nullopt;
+}
+
+std::optional<unsigned long long> bootTime(const Host& host) {
+    for (const std::string& line : host.lines("/proc/stat")) {
+        if (line.starts_with("btime ")) {
+            return asNumber(trimmed(line.substr(6)));
+        }
+    }
+    return std::nullopt;
+}
+
+struct Hypervisor {
+    std::string_view told;  ///< how the maker or the model begins
+    const char* name;
+};
+
+constexpr std::array<Hypervisor, 11> kHypervisors = {{{"QEMU", "QEMU"},
+                                                      {"KVM", "KVM"},
+                                                      {"VMware", "VMware"},
+                                                      {"VirtualBox", "VirtualBox"},
+                                                      {"Virtual Machine", "Hyper-V"},
+                                                      {"Xen", "Xen"},
+                                                      {"HVM domU", "Xen"},
+                                                      {"Bochs", "Bochs"},
+                                                      {"Parallels", "Parallels"},
+                                                      {"Google Compute Engine", "KVM"},
+                                                      {"OpenStack", "KVM"}}};
+
+std::optional<std::string> virtualKind(const Host& host) {
+    if (const auto type = host.line("/sys/hypervisor/type")) {
+        return *type == "xen" ? "Xen" : *type;
+    }
+    for (const char* file : {"product_name", "sys_vendor", "bios_vendor"}) {
+        const std::string told = host.line(std::string("/sys/class/dmi/id/") + file).value_or("");
+        const auto known =
+            std::find_if(kHypervisors.begin(), kHypervisors.end(),
+                         [&told](const Hypervisor& one) { return told.starts_with(one.told); });
+        if (known != kHypervisors.end()) {
+            return known->name;
+        }
+    }
+    return std::nullopt;
+}
+
+/// The processor says so itself, on x86; nothing where nobody tells.
+std::optional<bool> isVirtual(const Host& host) {
+    for (const std::string& line : host.lines("/proc/cpuinfo")) {
+        if (line.starts_with("flags")) {
+            return (line + " ").find(" hypervisor ") != std::string::npos;
+        }
+    }
+    return std::nullopt;
+}
+
+std::optional<unsigned long long> sockets(const Host& host) {
+    const std::string all = "/sys/devices/system/cpu/";
+    std::set<std::string> packages;
+    for (const std::string& name : host.entries(all)) {
+        if (const auto package = host.line(all + name + "/topology/physical_package_id")) {
+            packages.insert(*package);
+        }
+    }
+    return packages.empty() ? std::nullopt : std::optional<unsigned long long>(packages.size());
+}
+
+template <class Answer>
+Answer firstOf(Answer first, const Answer& second) {
+    return first ? first : second;
+}
+
+}  // namespace
+
+Rows systemRows() {
+    return kRows;
+}
+
+std::vector<std::string> listSystem(const Host& /*host*/) {
+    return {""};
+}
+
+void describeSystem(const Host& host, Found& found) {
+    const std::string dmi = "/sys/class/dmi/id/";
+    const std::string tree = "/proc/device-tree/";
+    Facts& facts = found.facts;
+    facts.text(kMaker, host.line(dmi + "sys_vendor"));
+    facts.text(kModel, firstOf(host.line(dmi + "product_name"), host.line(tree + "model")));
+    if (host.privileged()) {
+        facts.text(kSerial, firstOf(host.line(dmi + "product_serial"), host.line(tree + "serial-number")));
+        facts.text(kUuid, host.line(dmi + "product_uuid"));
+    }
+    facts.text(kFirmwareVersion, host.line(dmi + "bios_version"));
+    facts.text(kFirmwareDate, host.line(dmi + "bios_date"));
+    const std::optional<std::string> kind = virtualKind(host);
+    facts.flag(kVirtual, kind ? std::optional(true) : isVirtual(host));
+    facts.text(kVirtualKind, kind);
+    facts.number(kBootTime, bootTime(host));
+    facts.text(kKernel, host.line("/proc/sys/kernel/osrelease"));
+    facts.text(kArchitecture, host.line("/proc/sys/kernel/arch"));
+    facts.text(kDistribution, firstOf(shellValue(host, "/etc/os-release", "PRETTY_NAME"),
+                                      shellValue(host, "/usr/lib/os-release", "PRETTY_NAME")));
+    facts.number(kSockets, sockets(host));
+}
+
+}  // namespace hardware
