@@ -23,7 +23,9 @@ constexpr const char* kFooter =
     "  cvagent set ip-config:eth0 DNSServers 192.0.2.53 2001:db8::53\n"
     "  cvagent COMMAND --help";
 constexpr const char* kNodeHelp =
-    "The node: its id, its path, or the last part of its path when only one node has it";
+    "The node: its id, its path, or the last part of its path when only one node has it; of several "
+    "plug-ins' "
+    "nodes the first plug-in's";
 
 /// Seconds up to a limit; the range check of the parser lets "nan" through.
 CLI::Validator secondsUpTo(double most) {
@@ -40,7 +42,7 @@ CLI::Validator secondsUpTo(double most) {
 
 void addGlobalOptions(CLI::App& app, Options& options) {
     app.add_option("--plugin", options.plugins,
-                   "The plug-in to load; by default the one beside this program. Several may be given")
+                   "The plug-in to load, in place of all those beside this program. Several may be given")
         ->type_name("FILE")
         ->expected(1)
         ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);

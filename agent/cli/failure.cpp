@@ -33,6 +33,9 @@ constexpr Advice kAdvice[] = {
     {Problem::failed, Problem::pluginLoad,
      "\nName another one with --plugin FILE, or build and install this one again"},
     {Problem::failed, Problem::pluginEntry, "; name another one with --plugin FILE"},
+    {Problem::failed, Problem::pluginOwner,
+     "\nMake it and its directory yours or root's and writable by nobody else, take it away, or name the "
+     "plug-ins to load with --plugin FILE"},
     {Problem::failed, Problem::logFile, "; name another file or none"},
     {Problem::failed, Problem::currentDirectory, "; give the whole path of "},
     {Problem::refused, Problem::dataVariable, "; set it to a directory or unset it"},

@@ -66,6 +66,9 @@ const char* kindOf(const IC::PropertyValue& value) {
 /// A failed read has the kind the catalogue promises, since it brought no value.
 Json readingObject(const Reading& reading) {
     Json object{{"name", reading.name()}};
+    if (reading.row != nullptr && reading.row->source != nullptr && *unitName(*reading.row) != '\0') {
+        object["unit"] = unitName(*reading.row);
+    }
     if (reading.failed()) {
         object["kind"] = reading.row != nullptr ? kindName(reading.row->kind) : "none";
         object["error"] = reading.error;
@@ -176,12 +179,16 @@ std::string catalogue(const std::vector<const Property*>& rows) {
                     {"id", row.id},
                     {"name", row.name},
                     {"kind", kindName(row.kind)},
-                    {"unit", unitName(row.unit)},
+                    {"unit", unitName(row)},
                     {"readable", row.readable},
                     {"writable", row.writable()}};
         object["values"] = labelList(row);
         object["accepts"] = row.writable() ? Json(acceptedText(row)) : Json(nullptr);
         object["meaning"] = row.meaning;
+        if (row.source != nullptr) {
+            object["source"] = row.source;
+            object["trusted"] = row.trusted;
+        }
         list.push_back(std::move(object));
     }
     return document(list, 2);

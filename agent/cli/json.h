@@ -16,14 +16,16 @@ namespace cvagent::json {
 /// "plugins": [FILE...] stands behind the first one.
 std::string tree(const std::vector<std::string>& plugins, const std::vector<NodeRef>& nodes);
 /// {"id", "parent", "type", "class", "index", "path", "description", "status", "properties": {"108": {"name",
-/// "kind", "value"}}}; a property whose read failed has "error" in place of "value".
+/// "kind", "value"}}}; a property whose read failed has "error" in place of "value". One of a plug-in that
+/// brings its own catalogue has "unit", too, where it counts something.
 std::string node(const IC::MutableNode& node, const std::vector<Reading>& readings);
 /// {"id", "path", "property": {"id", "name", "old", "new"}}, both as in a node.
 std::string change(const IC::MutableNode& node, const Reading& before, const Reading& after);
 /// One line: {"time", "event", "path", ...}; with "number" when the agent has given one, "property":
 /// {"id", "name", "before", "after"} when the event is about one, and "caller" when somebody has written it.
 std::string event(const Event& event);
-/// [{"class", "type", "id", "name", "kind", "unit", "readable", "writable", "values", "accepts", "meaning"}]
+/// [{"class", "type", "id", "name", "kind", "unit", "readable", "writable", "values", "accepts", "meaning"}];
+/// of a plug-in that brings its own catalogue also "source" and "trusted"
 std::string catalogue(const std::vector<const Property*>& rows);
 /// [{"tool", "host", "classic", "adapter", "used", "package", "purpose"}]
 std::string tools(const std::vector<ToolReport>& reports);

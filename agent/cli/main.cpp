@@ -1,6 +1,8 @@
 #include <array>
 #include <exception>
 #include <optional>
+#include <string>
+#include <vector>
 
 #include "agent/cli/command_line.h"
 #include "agent/cli/commands/commands.h"
@@ -26,7 +28,11 @@ ExitStatus run(Options& options, cvagent::WantMessages& wants) {
         cvagent::Session session(process, options, wants);
         return session.statusAfter(ask(session, options));
     }
-    cvagent::prepareSurroundings({});
+    std::vector<std::string*> files;
+    for (std::string& plugin : options.plugins) {
+        files.push_back(&plugin);
+    }
+    cvagent::prepareSurroundings(files);
     return options.command == Command::doctor ? cvagent::commands::doctor(options)
                                               : cvagent::commands::properties(options);
 }

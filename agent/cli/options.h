@@ -13,8 +13,11 @@ enum class Command { tree, get, set, watch, properties, doctor };
 /// What the command line asks for.
 struct Options {
     Command command = Command::tree;
-    std::vector<std::string> plugins;  ///< none: looked for beside the program
-    bool processors = true;            ///< whether they can be meant; not typed
+    std::vector<std::string> plugins;     ///< none: looked for beside the program
+    std::vector<std::string> catalogues;  ///< beside them; not typed
+    bool pluginMissing = false;           ///< one that is beside the program was left out; not typed
+    bool pluginsNamed = false;            ///< on the command line; not typed
+    bool processors = true;               ///< whether they can be meant; not typed
     std::optional<std::string> logFile;
     std::optional<std::string> traceFile;
     std::optional<int> logLevel;

@@ -53,6 +53,10 @@ std::string offsetText(double minutes) {
 /// What a number comes to in larger units; empty when there is nothing to add.
 std::string inLargerUnits(Unit unit, const IC::Number& number) {
     switch (unit) {
+        case Unit::bytes:
+            return number.toUnsigned64() < 10000 ? "" : sizeText(number.toUnsigned64());
+        case Unit::kilohertz:
+            return formatted("%.2f GHz", number.toDouble() / 1e6);
         case Unit::thousandBytes:
             return sizeText(number.toUnsigned64() * 1000);
         case Unit::kibibytes:
@@ -78,11 +82,11 @@ std::string numberText(const Property* property, const IC::Number& number) {
     if (property == nullptr || number.empty() || number.kind() == IC::Number::boolean) {
         return text;
     }
-    if (findLabel(*property, number) != nullptr) {
+    if (!property->labels.empty() && findLabel(*property, number) != nullptr) {
         return withLabel(property, text, number);
     }
     if (property->unit != Unit::none) {
-        text += std::string(" ") + unitName(property->unit);
+        text += std::string(" ") + unitName(*property);
     }
     const std::string larger = inLargerUnits(property->unit, number);
     return larger.empty() ? text : text + ", " + larger;

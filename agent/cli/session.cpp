@@ -1,6 +1,8 @@
 #include "agent/cli/session.h"
 
+#include "agent/core/catalogue_file.h"
 #include "agent/core/node_classes.h"
+#include "agent/core/plugin_files.h"
 #include "agent/core/signals.h"
 #include "agent/core/surroundings.h"
 
@@ -43,15 +45,30 @@ bool needsProcessors(const Options& options) {
 
 }  // namespace
 
+void findPlugins(Options& options) {
+    options.pluginsNamed = !options.plugins.empty();
+    if (!options.pluginsNamed) {
+        PluginFiles found = pluginsBesideProgram();
+        for (const LeftOut& one : found.leftOut) {
+            complain(Failure(one.problem).what());
+        }
+        options.plugins = std::move(found.files);
+        options.pluginMissing = !found.leftOut.empty();
+    }
+    for (const std::string& plugin : options.plugins) {
+        options.catalogues.push_back(catalogueFileOf(plugin));
+    }
+}
+
 ProcessSettings processSettings(Options& options) {
     options.processors = needsProcessors(options);
-    if (options.plugins.empty()) {
-        options.plugins.push_back(pluginBesideProgram());
-    }
+    findPlugins(options);
     ProcessSettings settings;
     settings.files.push_back(&options.program);
-    for (std::string& plugin : options.plugins) {
-        settings.files.push_back(&plugin);
+    for (std::vector<std::string>* files : {&options.plugins, &options.catalogues}) {
+        for (std::string& file : *files) {
+            settings.files.push_back(&file);
+        }
     }
     const bool shown = options.command == Command::watch || options.logLevel;
     settings.log = {options.logFile, options.traceFile,          options.logLevel.value_or(kErrorLevel),
@@ -62,7 +79,10 @@ ProcessSettings processSettings(Options& options) {
 }
 
 Session::Session(const PreparedProcess& process, const Options& options, WantMessages& wants)
-    : errors_(process.errors()) {
+    : errors_(process.errors()),
+      answersForAll_(options.pluginsNamed || options.command == Command::tree ||
+                     options.command == Command::watch),
+      pluginMissing_(options.pluginMissing) {
     AgentSettings settings = process.agentSettings();
     settings.plugins = options.plugins;
     settings.commandTime = std::chrono::duration<double>(options.commandSeconds);
@@ -106,7 +126,7 @@ void Session::showErrors(const Request& request) {
 }
 
 ExitStatus Session::statusAfter(ExitStatus own) const {
-    return own == ExitStatus::done && pluginMissing_ ? ExitStatus::failed : own;
+    return own == ExitStatus::done && pluginMissing_ && answersForAll_ ? ExitStatus::failed : own;
 }
 
 Request ownRequest() {

@@ -10,8 +10,11 @@
 
 namespace cvagent {
 
-/// The process as the command line needs it; the plug-in beside the program becomes the options' when they
-/// name none. Throws Problem.
+/// The plug-ins beside the program become the options' when they name none; what is left out is told. Throws
+/// Problem when there are none.
+void findPlugins(Options& options);
+
+/// The process as the command line needs it, with the plug-ins found. Throws Problem.
 /// @param options outlive the settings; names of files in them become absolute with the process
 ProcessSettings processSettings(Options& options);
 
@@ -30,7 +33,8 @@ public:
     void showErrors(const Request& request);
     /// Stops the agent and shows what it reports on its way.
     void end();
-    /// What the command's own status comes to when a plug-in is missing.
+    /// What the command's own status comes to when a plug-in is missing: one that was named, or one whose
+    /// nodes the answer should hold. A question for a node of another one has its whole answer.
     ExitStatus statusAfter(ExitStatus own) const;
 
 private:
@@ -38,7 +42,8 @@ private:
 
     ErrorLines& errors_;
     std::unique_ptr<Agent> agent_;
-    bool pluginMissing_ = false;
+    bool answersForAll_;  // the answer is about every plug-in
+    bool pluginMissing_;
 };
 
 /// A request of whoever typed the command: he waits for as long as it takes.

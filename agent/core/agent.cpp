@@ -2,10 +2,13 @@
 
 #include <algorithm>
 #include <stdexcept>
+#include <thread>
 #include <utility>
 
 #include "agent/core/announcer.h"
+#include "agent/core/catalogue_file.h"
 #include "agent/core/command_deadline.h"
+#include "agent/core/text.h"
 #include "agent/core/tree.h"
 
 namespace cvagent {
@@ -20,8 +23,17 @@ constexpr std::chrono::seconds kPatience{10};  // a hung command is ended by the
 struct Agent::Engine {
     explicit Engine(const AgentSettings& settings);
 
-    std::vector<Handle> handles() const;
-    void load(const std::string& file, bool processors);
+    /// A plug-in on its way into the tree.
+    struct Beginner {
+        std::string file;
+        std::unique_ptr<Plugin> plugin;
+        std::optional<Problem> problem;
+    };
+
+    NodesOfEach nodesOfEach() const;
+    void load(Beginner& beginner);
+    void start(Beginner& beginner, bool processors);
+    void startAll(std::vector<Beginner>& beginners, bool processors);
     void refresh();
     bool lists(const Handle& node) const;
 
@@ -49,28 +61,74 @@ Agent::Engine::Engine(const AgentSettings& settings)
     if (!data) {
         throw std::invalid_argument("an agent needs a data directory");
     }
+    std::vector<Beginner> beginners;
     for (const std::string& file : settings.plugins) {
-        load(file, settings.processors);
+        load(beginners.emplace_back(Beginner{file, nullptr, {}}));
+    }
+    startAll(beginners, settings.processors);
+    for (Beginner& beginner : beginners) {
+        if (beginner.problem) {
+            failed.push_back({beginner.file, *beginner.problem});
+        } else {
+            plugins.push_back(std::move(beginner.plugin));
+        }
     }
     if (plugins.empty() && !failed.empty()) {
         throw Problem(failed.front().problem);
     }
 }
 
-void Agent::Engine::load(const std::string& file, bool processors) {
+void Agent::Engine::load(Beginner& beginner) {
     try {
-        plugins.push_back(std::make_unique<Plugin>(file, &announcer, tell, processors));
-        announcer.takeStock(plugins.back()->interface());
+        beginner.plugin = Plugin::loaded(beginner.file, &announcer, tell);
     } catch (const Problem& problem) {
-        failed.push_back({file, problem});
+        beginner.problem = problem;
     }
 }
 
-std::vector<Handle> Agent::Engine::handles() const {
-    std::vector<Handle> all;
+void Agent::Engine::start(Beginner& beginner, bool processors) {
+    if (beginner.problem) {
+        return;
+    }
+    try {
+        loadCatalogueOf(beginner.file, tell);
+        beginner.plugin->start(processors);
+        announcer.takeStock(beginner.plugin->interface());
+        return;
+    } catch (const Problem& problem) {
+        beginner.problem = problem;
+    } catch (const std::exception& exception) {  // must not leave a thread, nor the first one the others
+        beginner.problem.emplace(Problem::failed, inQuotes(beginner.file) + ": " + exception.what());
+    }
+    beginner.plugin.reset();
+}
+
+/// The first one, which waits most for the host's tools, on the calling thread. Where the system gives no
+/// threads, all of them.
+void Agent::Engine::startAll(std::vector<Beginner>& beginners, bool processors) {
+    std::vector<std::thread> threads;
+    threads.reserve(beginners.size());
+    std::size_t here = 1;  // from here on there are threads for them
+    for (std::size_t i = beginners.size(); i > here; --i) {
+        try {
+            threads.emplace_back(
+                [this, &beginner = beginners[i - 1], processors] { start(beginner, processors); });
+        } catch (const std::exception&) {
+            here = i;
+        }
+    }
+    for (std::size_t i = 0; i < std::min(here, beginners.size()); ++i) {
+        start(beginners[i], processors);
+    }
+    for (std::thread& thread : threads) {
+        thread.join();
+    }
+}
+
+NodesOfEach Agent::Engine::nodesOfEach() const {
+    NodesOfEach all;
     for (const auto& plugin : plugins) {
-        const std::vector<Handle> nodes = plugin->interface().holdAll();
-        all.insert(all.end(), nodes.begin(), nodes.end());
+        all.push_back(plugin->interface().holdAll());
     }
     return all;
 }
@@ -108,14 +166,16 @@ std::vector<std::string> Agent::plugins() const {
 
 std::vector<NodeRef> Agent::nodes() const {
     std::vector<NodeRef> all;
-    for (const Handle& node : engine_->handles()) {
-        all.push_back(NodeRef(engine_, node));
+    for (const std::vector<Handle>& nodes : engine_->nodesOfEach()) {
+        for (const Handle& node : nodes) {
+            all.push_back(NodeRef(engine_, node));
+        }
     }
     return all;
 }
 
 NodeRef Agent::find(const std::string& text) const {
-    return {engine_, findNode(engine_->handles(), text)};
+    return {engine_, findNode(engine_->nodesOfEach(), text)};
 }
 
 std::vector<Reading> Agent::read(const NodeRef& node, const std::vector<unsigned int>& ids,

@@ -18,7 +18,9 @@ namespace cvagent {
 
 /// What an agent is made of; see PreparedProcess::agentSettings.
 struct AgentSettings {
-    std::vector<std::string> plugins;  ///< files; each brings its nodes into the one tree
+    /// Files; each brings its nodes into the one tree, and a file of names beside it (catalogue_file.h).
+    /// Where a word could mean nodes of several, the first of them decides.
+    std::vector<std::string> plugins;
     /// Opened before; null: the plug-ins' lines go nowhere.
     std::shared_ptr<LogOutput> log;
     /// Whether the plug-ins build their nodes of processors, which is asked of them apart from their start.
@@ -36,8 +38,9 @@ struct AgentSettings {
 /// operations may be called from many threads at once.
 class Agent {
 public:
-    /// Loads every plug-in. Throws std::invalid_argument without a data directory. One that fails costs
-    /// nothing of the others; when all fail, the first one's Problem is thrown.
+    /// Loads every plug-in, one after the other, and starts them side by side. Throws std::invalid_argument
+    /// without a data directory. One that fails costs nothing of the others; when all fail, the first one's
+    /// Problem is thrown.
     explicit Agent(const AgentSettings& settings);
     Agent(const Agent&) = delete;
     Agent& operator=(const Agent&) = delete;
@@ -55,7 +58,7 @@ public:
     std::vector<std::string> plugins() const;
 
     std::vector<NodeRef> nodes() const;
-    /// The node a person means by an id, a path or the last part of one. Throws Problem: notFound, ambiguous.
+    /// The node a person means; see findNode in tree.h. Throws Problem: notFound, ambiguous.
     NodeRef find(const std::string& text) const;
 
     /// See Reader::read.

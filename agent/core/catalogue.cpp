@@ -3,6 +3,8 @@
 #include <strings.h>
 #include <algorithm>
 #include <array>
+#include <atomic>
+#include <mutex>
 #include <stdexcept>
 
 #include "agent/core/oshw/tables.h"
@@ -13,11 +15,36 @@ namespace cvagent {
 
 namespace {
 
-using Tables = std::vector<const CatalogueTable*>;
+/// It only grows, so that whoever reads needs no lock.
+class Tables {
+public:
+    using All = std::span<const CatalogueTable* const>;
 
-Tables& tables() {
-    static Tables all{&oshw::table()};
+    Tables() { add(oshw::table()); }
+    /// @return whether there was room
+    bool add(const CatalogueTable& table) {
+        const std::size_t count = count_.load();
+        if (count == tables_.size()) {
+            return false;
+        }
+        tables_.at(count) = &table;
+        count_.store(count + 1);
+        return true;
+    }
+    All all() const { return All(tables_).first(count_.load()); }
+
+private:
+    std::array<const CatalogueTable*, 64> tables_{};  // those that are not counted belong to who adds
+    std::atomic<std::size_t> count_{0};
+};
+
+Tables& allTables() {
+    static Tables all;
     return all;
+}
+
+Tables::All tables() {
+    return allTables().all();
 }
 
 [[noreturn]] void refuse(const CatalogueTable& table, const std::string& what) {
@@ -38,12 +65,39 @@ const Row* findRow(std::span<const Row> CatalogueTable::*rows, const Predicate& 
 }
 
 // In the order of the enumerations.
-constexpr std::array kKindNames = {"number", "enum", "text", "texts", "numbers"};
-constexpr std::array kUnitNames = {"", "kB", "KiB", "kbit/s", "Mbit/s", "MHz", "s since 1970", "min", "bits"};
+constexpr std::array kKindNames = {"number", "enum", "text", "texts", "numbers", "flag"};
+constexpr std::array kUnitNames = {"",    "bytes", "kB",           "KiB", "kbit/s", "Mbit/s",
+                                   "kHz", "MHz",   "s since 1970", "min", "bits",   ""};
+
+/// Calls something for the rows of a class until it says that it has seen enough.
+template <class Enough>
+void forEachOf(unsigned int nodeType, const Enough& enough) {
+    for (const CatalogueTable* table : tables()) {
+        for (const auto part : table->properties) {
+            for (const Property& row : part) {
+                if (static_cast<unsigned int>(row.type) == nodeType && enough(row)) {
+                    return;
+                }
+            }
+        }
+    }
+}
+
+template <class Predicate>
+const Property* firstOf(unsigned int nodeType, const Predicate& isMeant) {
+    const Property* found = nullptr;
+    forEachOf(nodeType, [&](const Property& row) {
+        found = isMeant(row) ? &row : nullptr;
+        return found != nullptr;
+    });
+    return found;
+}
 
 }  // namespace
 
 void addToCatalogue(const CatalogueTable& table) {
+    static std::mutex guard;
+    const std::lock_guard lock(guard);
     for (const NodeClass& row : table.classes) {
         if (findClass(static_cast<unsigned int>(row.type)) != nullptr || findClass(row.name) != nullptr) {
             refuse(table, std::string("the class ") + row.name);
@@ -56,7 +110,9 @@ void addToCatalogue(const CatalogueTable& table) {
             }
         }
     }
-    tables().push_back(&table);
+    if (!allTables().add(table)) {
+        throw std::logic_error("there is no room for the catalogue of " + std::string(table.owner));
+    }
 }
 
 std::vector<NodeClass> nodeClasses() {
@@ -84,40 +140,32 @@ const AlertRow* findAlert(const std::string& message) {
 
 std::vector<const Property*> propertiesOf(unsigned int nodeType) {
     std::vector<const Property*> rows;
-    for (const CatalogueTable* table : tables()) {
-        for (const auto part : table->properties) {
-            for (const Property& row : part) {
-                if (static_cast<unsigned int>(row.type) == nodeType) {
-                    rows.push_back(&row);
-                }
-            }
-        }
-    }
+    forEachOf(nodeType, [&rows](const Property& row) {
+        rows.push_back(&row);
+        return false;
+    });
     return rows;
 }
 
 const Property* findProperty(unsigned int nodeType, unsigned int id) {
-    const auto rows = propertiesOf(nodeType);
-    const auto found = std::ranges::find(rows, id, &Property::id);
-    return found == rows.end() ? nullptr : *found;
+    return firstOf(nodeType, [id](const Property& row) { return row.id == id; });
 }
 
 const Property* findProperty(unsigned int nodeType, const std::string& text) {
     if (const auto id = wholeNumber<unsigned int>(text)) {
         return findProperty(nodeType, *id);
     }
-    const auto rows = propertiesOf(nodeType);
-    const auto found = std::ranges::find_if(
-        rows, [&text](const Property* row) { return strcasecmp(row->name, text.c_str()) == 0; });
-    return found == rows.end() ? nullptr : *found;
+    return firstOf(nodeType,
+                   [&text](const Property& row) { return strcasecmp(row.name, text.c_str()) == 0; });
 }
 
 const char* kindName(Kind kind) {
     return kKindNames.at(static_cast<std::size_t>(kind));
 }
 
-const char* unitName(Unit unit) {
-    return kUnitNames.at(static_cast<std::size_t>(unit));
+const char* unitName(const Property& property) {
+    return property.unitText != nullptr ? property.unitText
+                                        : kUnitNames.at(static_cast<std::size_t>(property.unit));
 }
 
 const Label* findLabel(const Property& property, unsigned int code) {

@@ -10,19 +10,22 @@
 
 namespace cvagent {
 
-enum class Kind { number, enumeration, text, texts, numbers };
+enum class Kind { number, enumeration, text, texts, numbers, flag };
 
 /// What a number counts; decides how it is shown to people.
 enum class Unit {
     none,
+    bytes,
     thousandBytes,
     kibibytes,
     kilobitsPerSecond,
     megabitsPerSecond,
+    kilohertz,
     megahertz,
     secondsSinceEpoch,
     minutes,
     bits,
+    other,  ///< shown as the row's unitText says
 };
 
 /// A code of an enumeration and what it means.
@@ -52,6 +55,10 @@ struct Property {
     Check check = nullptr;          ///< set for what can be written
     const char* accepts = nullptr;  ///< what check lets pass, in words; null: told from the labels
     bool readable = true;
+    // Of a plug-in's own file; see catalogue_file.h.
+    const char* unitText = nullptr;  ///< the unit's short name; null: unit's own
+    const char* source = nullptr;    ///< where the plug-in reads it; null where nobody says
+    bool trusted = false;            ///< told to root only
 
     bool writable() const { return check != nullptr; }
 };
@@ -66,8 +73,8 @@ const Property* findProperty(unsigned int nodeType, unsigned int id);
 const Property* findProperty(unsigned int nodeType, const std::string& text);
 
 const char* kindName(Kind kind);
-/// "" for Unit::none.
-const char* unitName(Unit unit);
+/// "" where there is none.
+const char* unitName(const Property& property);
 /// The label of a code; null when it has none.
 const Label* findLabel(const Property& property, unsigned int code);
 /// What the property accepts, for a message.
@@ -89,8 +96,9 @@ struct CatalogueTable {
     std::vector<std::span<const Property>> properties;
     std::span<const AlertRow> alerts;
 };
-/// Adds a plug-in's table to the catalogue. To be called before the first agent is made; the table is used
-/// until the program ends. Throws std::logic_error when another table has such a class or property already.
+/// Adds a plug-in's table to the catalogue; it is used until the program ends. Throws std::logic_error when
+/// another table has such a class or property already, or when there are too many tables. Any thread; the
+/// catalogue is read meanwhile.
 void addToCatalogue(const CatalogueTable& table);
 
 }  // namespace cvagent

@@ -6,7 +6,6 @@
 #include <filesystem>
 
 #include "agent/core/problem.h"
-#include "agent/core/program_path.h"
 #include "agent/core/reading.h"
 #include "agent/core/text.h"
 #include "agent/core/tree.h"
@@ -15,7 +14,6 @@ namespace cvagent {
 
 namespace {
 
-constexpr const char* kLibrary = "libvantrelcvicoshwmi.so.1";
 constexpr const char* kProcessorBuilder = "_ZN2IC6OsHwMI14createCpuNodesEv";
 
 using OpenMi = int (*)(IC::ManagementInterface**, IC::Error**);
@@ -56,35 +54,34 @@ void complaining(const Tell& tell, const std::string& what, const Call& call) {
 
 }  // namespace
 
-std::string pluginBesideProgram() {
-    const auto found = besideProgram({"../" CORVISTA_LIBDIR, "../lib"}, kLibrary);
-    if (!found) {
-        const std::string directory = programDirectory();
-        fail(directory.empty() ? "cannot tell where this program lies, for there is no /proc"
-                               : std::string("there is no ") + kLibrary +
-                                     " beside this program, which lies in " + inQuotes(directory),
-             Problem::pluginSearch);
-    }
-    return *found;
-}
-
 void tellNobody(const std::string& /*text*/) {}
 
-Plugin::Plugin(const std::string& file, Listener* listener, Tell tell, bool processors)
+Plugin::Plugin(const std::string& file, Listener* listener, Tell tell, LoadOnly /*tag*/)
     : file_(file), events_(listener), tell_(std::move(tell)) {
     try {
         load();
         open();
-        start(processors);
+        takePlace();
     } catch (...) {
         close();
         throw;
     }
-    events_.release();
+}
+
+Plugin::Plugin(const std::string& file, Listener* listener, Tell tell, bool processors)
+    : Plugin(file, listener, std::move(tell), LoadOnly()) {
+    start(processors);
+}
+
+std::unique_ptr<Plugin> Plugin::loaded(const std::string& file, Listener* listener, Tell tell) {
+    return std::unique_ptr<Plugin>(new Plugin(file, listener, std::move(tell), LoadOnly()));
 }
 
 Plugin::~Plugin() {
-    stop();
+    if (begun_) {
+        stop();
+    }
+    running_.reset();
     close();
 }
 
@@ -123,34 +120,36 @@ void Plugin::open() {
     }
 }
 
-void Plugin::start(bool processors) {
+void Plugin::takePlace() {
     try {
         running_.emplace(*interface_);
     } catch (const Problem& problem) {
         throw Problem(problem.kind(), inQuotes(file_) + ": " + problem.what());
     }
-    try {
-        guarded("initialize of " + inQuotes(file_), [this, processors] {
-            const IdRange ids = running_->ids();
-            interface_->setLoadCallBack(nodeLoaded, this, running_->finder());
-            interface_->setWithdrawCallBack(nodeWithdrawn, this);
-            interface_->registerForAlerts(alertsCame, this);
-            const IC::Error result =
-                interface_->initialize(ids.interfaceId, IC::Number(ids.ownNode), IC::Number(ids.firstNode));
-            if (result.getStatus() != 0) {
-                fail("the plug-in " + inQuotes(file_) + " did not initialize: " + errorText(result));
-            }
-            const auto create = symbol<Builder>(library_, kProcessorBuilder);
-            if (create != nullptr && processors) {
-                create(interface_);
-            }
-            checkIds();
-            setPaths(*interface_);
-        });
-    } catch (...) {
-        stop();
-        throw;
+}
+
+void Plugin::start(bool processors) {
+    begun_ = true;
+    guarded("initialize of " + inQuotes(file_), [this, processors] { initialize(processors); });
+    events_.release();
+}
+
+void Plugin::initialize(bool processors) {
+    const IdRange ids = running_->ids();
+    interface_->setLoadCallBack(nodeLoaded, this, running_->finder());
+    interface_->setWithdrawCallBack(nodeWithdrawn, this);
+    interface_->registerForAlerts(alertsCame, this);
+    const IC::Error result =
+        interface_->initialize(ids.interfaceId, IC::Number(ids.ownNode), IC::Number(ids.firstNode));
+    if (result.getStatus() != 0) {
+        fail("the plug-in " + inQuotes(file_) + " did not initialize: " + errorText(result));
     }
+    const auto create = symbol<Builder>(library_, kProcessorBuilder);
+    if (create != nullptr && processors) {
+        create(interface_);
+    }
+    checkIds();
+    setPaths(*interface_);
 }
 
 void Plugin::checkIds() const {

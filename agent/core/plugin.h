@@ -1,6 +1,7 @@
 #pragma once
 
 #include <functional>
+#include <memory>
 #include <optional>
 #include <string>
 
@@ -10,10 +11,6 @@
 #include "framework/ic/management_interface.h"
 
 namespace cvagent {
-
-/// The plug-in beside this program: in its build tree or where it was installed. Throws Problem when it is at
-/// neither place; nowhere else is it looked for.
-std::string pluginBesideProgram();
 
 /// Hears of what belongs to no call: a message for whoever looks after the agent.
 using Tell = std::function<void(const std::string& text)>;
@@ -31,6 +28,11 @@ public:
     /// @param processors whether its builder of processor nodes is called
     /// Throws Problem, with a text of its own for each way in which a file can be no plug-in.
     Plugin(const std::string& file, Listener* listener, Tell tell = tellNobody, bool processors = true);
+    /// The same in two steps, so that several can start at once while the order in which they were loaded
+    /// decides their ids: loaded() loads the library and gives it its place, start() does the rest.
+    static std::unique_ptr<Plugin> loaded(const std::string& file, Listener* listener, Tell tell);
+    /// At most once. Throws Problem; what is left then is good for nothing but its end.
+    void start(bool processors);
     Plugin(const Plugin&) = delete;
     Plugin& operator=(const Plugin&) = delete;
     /// Unloads the plug-in and closes the library.
@@ -44,9 +46,13 @@ private:
     static void nodeWithdrawn(const IC::Node& node, const void* plugin);
     static IC::Error alertsCame(const std::vector<IC::Alert>& alerts, const void* plugin);
 
+    struct LoadOnly {};
+    Plugin(const std::string& file, Listener* listener, Tell tell, LoadOnly tag);
+
     void load();
     void open();
-    void start(bool processors);
+    void takePlace();
+    void initialize(bool processors);
     void checkIds() const;
     bool isOwnId(const IC::MutableNode& node) const;
     void stop();
@@ -58,6 +64,7 @@ private:
     void* library_ = nullptr;
     IC::ManagementInterface* interface_ = nullptr;
     std::optional<RunningPlugin> running_;
+    bool begun_ = false;  // there is something to stop
 };
 
 }  // namespace cvagent

@@ -26,6 +26,7 @@ public:
         pluginFile,
         pluginLoad,
         pluginEntry,
+        pluginOwner,  ///< others could put code of theirs into it
         logFile,
         currentDirectory,
         dataVariable,  ///< names no directory

@@ -1,5 +1,7 @@
 #include "agent/core/reading.h"
 
+#include <unistd.h>
+
 #include <exception>
 #include <utility>
 
@@ -19,6 +21,8 @@ Reading readProperty(const IC::MutableNode& node, unsigned int id) {
         if (result.getStatus() != 0) {
             reading.error = errorText(result);
             reading.missing = result.code() == IC::Number(IC::Error::kNoSuchProperty);
+            reading.timedOut = result.getStatus() == IC::Error::unanswered;
+            reading.value = {};
         }
     } catch (const std::exception& exception) {
         reading.error = std::string("the plug-in threw: ") + exception.what();
@@ -33,6 +37,13 @@ Reading readProperty(const IC::MutableNode& node, unsigned int id) {
         reading.timedOut = true;
     }
     return reading;
+}
+
+std::string Reading::complaint() const {
+    if (missing && row != nullptr) {
+        return row->trusted && geteuid() != 0 ? "told to root only" : "not known";
+    }
+    return "not known (" + error + ")";
 }
 
 std::vector<Reading> storedReadings(const IC::MutableNode& node) {

@@ -17,7 +17,7 @@ struct Reading {
     IC::PropertyValue value;
     std::string error;      ///< empty when the read succeeded
     bool missing = false;   ///< it failed because the node has no such property
-    bool timedOut = false;  ///< it failed because a command of the host did not end in time
+    bool timedOut = false;  ///< it failed because the host or a device did not answer in time
     /// The value is the last one that is known, and the host may have another one by now.
     bool stale = false;
     /// When the value was what the host said; nothing when it is not known.
@@ -25,10 +25,8 @@ struct Reading {
 
     bool failed() const { return !error.empty(); }
     /// Why there is no value, for people: a property that every node of the class could have is just not
-    /// known here.
-    std::string complaint() const {
-        return missing && row != nullptr ? "not known" : "not known (" + error + ")";
-    }
+    /// known here, or not told to this user.
+    std::string complaint() const;
     std::string name() const { return row != nullptr ? row->name : std::to_string(id); }
 };
 

@@ -69,11 +69,10 @@ Handle findFrom(const Look& look, std::size_t place, const std::string& name) {
             throw;
         }
     }
-    std::vector<Handle> all;
+    NodesOfEach all;
     for (const IC::ManagementInterface* interface : look.seen()) {
         if (interface != nullptr) {
-            const std::vector<Handle> nodes = interface->holdAll();
-            all.insert(all.end(), nodes.begin(), nodes.end());
+            all.push_back(interface->holdAll());
         }
     }
     return findNode(all, name);

@@ -77,24 +77,32 @@ void setPaths(const IC::ManagementInterface& interface) {
     }
 }
 
-Handle findNode(const std::vector<Handle>& nodes, const std::string& text) {
+Handle findNode(const NodesOfEach& plugins, const std::string& text) {
     if (const std::optional<unsigned int> id = wholeNumber<unsigned int>(text)) {
-        if (Handle node = withId(nodes, *id)) {
-            return node;
+        for (const std::vector<Handle>& nodes : plugins) {
+            if (Handle node = withId(nodes, *id)) {
+                return node;
+            }
         }
         throw Problem(Problem::notFound, "there is no node with the id " + text, Problem::node);
     }
-    std::vector<Handle> found = matching(nodes, text, isMeant);
-    if (found.empty() && !text.empty()) {
-        found = matching(nodes, text, isNamed);
+    for (const auto matches : {isMeant, isNamed}) {
+        for (const std::vector<Handle>& nodes : plugins) {
+            const std::vector<Handle> found =
+                text.empty() ? std::vector<Handle>() : matching(nodes, text, matches);
+            if (found.size() > 1) {
+                failAmbiguous(text, found);
+            }
+            if (!found.empty()) {
+                return found.front();
+            }
+        }
     }
-    if (found.size() > 1) {
-        failAmbiguous(text, found);
-    }
-    if (found.empty()) {
-        throw Problem(Problem::notFound, "there is no node '" + text + "'", Problem::node);
-    }
-    return found.front();
+    throw Problem(Problem::notFound, "there is no node '" + text + "'", Problem::node);
+}
+
+Handle findNode(const std::vector<Handle>& nodes, const std::string& text) {
+    return findNode(NodesOfEach{nodes}, text);
 }
 
 Handle findNode(const IC::ManagementInterface& interface, const std::string& text) {

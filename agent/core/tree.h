@@ -13,8 +13,14 @@ std::string makePath(const IC::ManagementInterface& interface, const IC::Mutable
 /// Gives every listed node its path.
 void setPaths(const IC::ManagementInterface& interface);
 
-/// The node a person means by an id, a path or the last part of one. Throws Problem: notFound, or ambiguous,
-/// which lists the candidates.
+/// The nodes of several plug-ins, each plug-in's apart, the one whose names come first in front.
+using NodesOfEach = std::vector<std::vector<Handle>>;
+
+/// The node a person means by an id, by a path or its last part ("link:eth0", "computer"), or by the name
+/// alone in that last part ("sda"). A name alone counts only where no path and no last part is meant. Of
+/// several plug-ins the first that has such a node decides, so one more of them makes no word ambiguous.
+/// Throws Problem: notFound, or ambiguous, which lists the candidates.
+Handle findNode(const NodesOfEach& plugins, const std::string& text);
 Handle findNode(const std::vector<Handle>& nodes, const std::string& text);
 Handle findNode(const IC::ManagementInterface& interface, const std::string& text);
 

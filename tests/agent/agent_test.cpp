@@ -236,6 +236,26 @@ HOST_TEST(AgentReads, WhatHangsIsStaleInTimeAndNothingElseIsLate) {
     EXPECT_LT(static_cast<unsigned int>(now.value), 20U);  // what nobody waits for is not begun
 }
 
+HOST_TEST(AgentReads, WhatADeviceDoesNotAnswerIsTheLastValueMarkedStale) {
+    Fake fake;
+    host.file(kHold, "");
+    const Reading never = fake.read(905, Request("test"));
+    EXPECT_TRUE(never.timedOut && never.failed());
+    EXPECT_TRUE(never.value.empty());
+    host.remove(kHold);
+    EXPECT_EQ(static_cast<unsigned int>(fake.read(905, Request("test")).value), 1U);
+    host.file(kHold, "");
+    const Reading stale = fake.read(905, Request("test"));
+    EXPECT_TRUE(stale.timedOut && stale.stale && !stale.missing);
+    EXPECT_EQ(stale.error, "the device does not answer");
+    EXPECT_EQ(static_cast<unsigned int>(stale.value), 1U);
+    EXPECT_TRUE(fake.read(905, Request("test"), Freshness::known).stale);
+    host.remove(kHold);
+    const Reading now = fake.read(905, Request("test"));
+    EXPECT_FALSE(now.failed() || now.stale);
+    EXPECT_EQ(static_cast<unsigned int>(now.value), 2U);
+}
+
 HOST_TEST(AgentReads, AnyNumberOfNodesThatHangMakesNothingElseLate) {
     Fake fake("drives");
     host.file(kHold, "");

@@ -80,9 +80,13 @@ void logError(const std::string& message) {
     CVLog::CVLogger::traceLevelMessage("fake", "fake_plugin", 1, component, 6000, nullptr, 0, 0, message);
 }
 
-void waitWhileHeld() {
+bool isHeld() {
     const char* file = std::getenv("CORVISTA_FAKE_PLUGIN_HOLD");
-    while (file != nullptr && access(file, F_OK) == 0) {
+    return file != nullptr && access(file, F_OK) == 0;
+}
+
+void waitWhileHeld() {
+    while (isHeld()) {
         std::this_thread::sleep_for(std::chrono::milliseconds(1));
     }
 }
@@ -90,8 +94,9 @@ void waitWhileHeld() {
 void appearBelow(unsigned int parent);
 
 /// 900 is slow, 901 fails and logs, 902 throws, 903 throws what is no exception, 904 hangs while it is held,
-/// 910 to 919 log an error of their own; 115 writes with an error line, 116 does not write, 74 makes a node.
-/// Writing "throw" or "seven" throws, writing "hold" hangs while it is held.
+/// 905 says then that nobody answers, 910 to 919 log an error of their own; 115 writes with an error line,
+/// 116 does not write, 74 makes a node. Writing "throw" or "seven" throws, writing "hold" hangs while it is
+/// held.
 class FakeNode : public IC::MutableNode {
 public:
     using MutableNode::MutableNode;
@@ -111,6 +116,13 @@ public:
                 throw 7;
             case 904:
                 waitWhileHeld();
+                out = PropertyValue(Number(++answers_), true);
+                return {};
+            case 905:
+                if (isHeld()) {
+                    out = PropertyValue("no answer", true);
+                    return {Error::unanswered, Number(), "the device does not answer"};
+                }
                 out = PropertyValue(Number(++answers_), true);
                 return {};
             default:

@@ -79,3 +79,27 @@ add_dependencies(agent_hostile_test cvagent clockjump fake_plugin vantrelcvicosh
 
 corvista_test(agent_many_interfaces LIBRARIES agent_cli agent_core plugin_code test_support SOURCES
   agent/many_interfaces_test.cpp)
+
+# The plug-in of docs/plug-ins.md: the text of the document is what is compiled, loaded and read.
+set_property(DIRECTORY APPEND PROPERTY CMAKE_CONFIGURE_DEPENDS ${CMAKE_SOURCE_DIR}/docs/plug-ins.md)
+file(READ ${CMAKE_SOURCE_DIR}/docs/plug-ins.md plugins_page)
+foreach(block cpp json)
+  string(FIND "${plugins_page}" "```${block}\n" start)
+  string(LENGTH "```${block}\n" fence)
+  math(EXPR start "${start} + ${fence}")
+  string(SUBSTRING "${plugins_page}" ${start} -1 rest)
+  string(FIND "${rest}" "```" length)
+  string(SUBSTRING "${rest}" 0 ${length} text)
+  file(GENERATE OUTPUT ${CMAKE_BINARY_DIR}/example/$<IF:$<STREQUAL:${block},cpp>,uptime.cpp,libuptime.json> CONTENT "${text}")
+endforeach()
+add_library(uptime SHARED ${CMAKE_BINARY_DIR}/example/uptime.cpp)
+target_link_libraries(uptime PRIVATE corvista_framework corvista_options)
+set_target_properties(uptime PROPERTIES LIBRARY_OUTPUT_DIRECTORY ${CMAKE_BINARY_DIR}/example SOVERSION 1 UNITY_BUILD OFF
+  BUILD_WITH_INSTALL_RPATH ON INSTALL_RPATH "$ORIGIN/../lib;$ORIGIN/../..")
+
+corvista_test(agent_plugins LIBRARIES agent_cli agent_core test_support LABELS threads SOURCES
+  agent/catalogue_file_test.cpp
+  agent/plugin_directory_test.cpp)
+target_compile_definitions(agent_plugins_test PRIVATE ${agent_test_programs}
+  HARDWARE_FILE="$<TARGET_FILE:corvistahardware>" UPTIME_FILE="$<TARGET_FILE:uptime>")
+add_dependencies(agent_plugins_test corvistahardware cvagent fake_plugin uptime vantrelcvicoshwmi)

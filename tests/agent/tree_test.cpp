@@ -144,4 +144,54 @@ TEST_F(Tree, TheDrawingPutsChildrenUnderTheirParents) {
     EXPECT_THAT(depths, ElementsAre(1, 2, 3, 4, 5, 6, 7, 5, 1));
 }
 
+/// A second plug-in's nodes beside those of the first.
+class TwoTrees : public Tree {
+protected:
+    NodeList other;
+    unsigned int port = addNamed(12, network, 108, "eth0");
+
+    unsigned int addOther(unsigned int type, unsigned int property, const char* name) {
+        const unsigned int id = other.add(type, 0, 1);
+        other.hold(id)->setProperty(property, IC::PropertyValue(name, true));
+        return id;
+    }
+    const IC::MutableNode* found(const std::string& text) {
+        setPaths(list);
+        setPaths(other);
+        return findNode(cvagent::NodesOfEach{list.holdAll(), other.holdAll()}, text).get();
+    }
+};
+
+TEST_F(TwoTrees, ANameAloneIsTheFirstPluginsWhileItHasOne) {
+    const unsigned int same = addOther(45, 89, "eth0");
+    const unsigned int only = addOther(45, 89, "eth7");
+    EXPECT_EQ(found("eth0"), list.hold(port).get());
+    EXPECT_EQ(found("eth7"), other.hold(only).get());
+    EXPECT_EQ(found("partition:eth0"), other.hold(same).get());
+}
+
+TEST_F(TwoTrees, ALastPartComesBeforeANameAlone) {
+    addNamed(12, network, 108, "memory");  // a link can have any name
+    const unsigned int memory = addOther(12, 108, "x");
+    addOther(45, 89, "network-port:x");
+    EXPECT_EQ(found("network-port:x"), other.hold(memory).get());
+    const unsigned int single = other.add(40, 0);
+    addNamed(12, network, 108, "computer");
+    EXPECT_EQ(found("computer"), list.hold(computer).get());
+    other.hold(single);
+}
+
+TEST_F(TwoTrees, SeveralOfTheDecidingPluginAreAmbiguousAndOnlyTheyAreListed) {
+    addNamed(29, port, 108, "eth0");
+    addOther(45, 89, "eth0");
+    try {
+        found("eth0");
+        FAIL() << "found one";
+    } catch (const Problem& problem) {
+        EXPECT_EQ(problem.kind(), Problem::ambiguous);
+        EXPECT_THAT(problem.what(), HasSubstr("the name of 2 nodes"));
+        EXPECT_THAT(problem.detail(), testing::Not(HasSubstr("partition")));
+    }
+}
+
 }  // namespace

@@ -28,6 +28,7 @@ const std::map<std::string, std::set<std::string>> kMayInclude = {
     {"agent/core", {"agent/core", "agent/shell", "framework"}},
     {"agent/cli", {"agent/cli", "agent/core", "agent/shell", "framework"}},
     {"hosttools", {"hosttools"}},
+    {"plugins/hardware", {"plugins/hardware", "framework"}},
 };
 const std::set<std::string> kPlugin = {"mi", "computer", "storage", "network", "indications", "cpu"};
 

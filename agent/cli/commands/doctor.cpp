@@ -1,9 +1,12 @@
+#include <filesystem>
 #include <set>
 
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/json.h"
 #include "agent/cli/print.h"
+#include "agent/core/catalogue_file.h"
 #include "agent/core/host_tools.h"
+#include "agent/core/plugin_files.h"
 #include "agent/core/signals.h"
 
 namespace cvagent::commands {
@@ -56,6 +59,31 @@ std::string table(const std::vector<ToolReport>& reports, const Style& style) {
     return text + "\n" + advice(reports);
 }
 
+std::string pluginLine(const std::string& file, const Style& style) {
+    const bool named = std::filesystem::is_regular_file(catalogueFileOf(file));
+    return "  " + printable(file) + (named ? style.faint("  with names of its own") : "") + "\n";
+}
+
+/// They are looked at, not loaded.
+std::string plugins(const Options& options, const Style& style) {
+    std::string text = "\n" + style.strong("PLUG-INS") + "\n";
+    PluginFiles found{options.plugins, {}};
+    if (options.plugins.empty()) {
+        try {
+            found = pluginsBesideProgram();
+        } catch (const Problem& problem) {
+            return text + "  " + style.bad(printable(problem.what())) + "\n";
+        }
+    }
+    for (const std::string& file : found.files) {
+        text += pluginLine(file, style);
+    }
+    for (const LeftOut& one : found.leftOut) {
+        text += "  " + style.bad(printable(one.problem.what())) + "\n";
+    }
+    return text;
+}
+
 }  // namespace
 
 ExitStatus doctor(const Options& options) {
@@ -63,7 +91,7 @@ ExitStatus doctor(const Options& options) {
     StopSignals::install();
     const std::vector<ToolReport> reports =
         inspectHostTools(options.hostTools, Look::everything, adapterDirectory());
-    print(options.json ? json::tools(reports) : table(reports, style));
+    print(options.json ? json::tools(reports) : table(reports, style) + plugins(options, style));
     return ExitStatus::done;
 }
 

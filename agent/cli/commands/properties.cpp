@@ -3,6 +3,8 @@
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/json.h"
 #include "agent/cli/print.h"
+#include "agent/core/catalogue_file.h"
+#include "agent/core/plugin_files.h"
 
 namespace cvagent::commands {
 
@@ -26,11 +28,14 @@ const char* accessText(const Property& row) {
     if (!row.readable) {
         return "write";
     }
+    if (row.trusted) {
+        return "read by root";
+    }
     return row.writable() ? "read, write" : "read";
 }
 
 std::string kindAndUnit(const Property& row) {
-    const std::string unit = unitName(row.unit);
+    const std::string unit = unitName(row);
     return std::string(kindName(row.kind)) + (unit.empty() ? "" : ", " + unit);
 }
 
@@ -51,6 +56,9 @@ std::string describe(const Property& row, const Style& style) {
     if (!row.labels.empty()) {
         text += indent + style.faint("values: ") + labelText(row) + "\n";
     }
+    if (row.source != nullptr && *row.source != '\0') {
+        text += indent + style.faint("source: ") + row.source + "\n";
+    }
     if (row.writable()) {
         text += indent + style.faint("accepts: ") + acceptedText(row) + "\n";
     }
@@ -69,9 +77,25 @@ std::string describeClass(const NodeClass& nodeClass, const Style& style) {
     return text;
 }
 
+/// The names that the plug-ins bring along; the OS/hardware plug-in's are known without it.
+void loadCatalogues(const Options& options) {
+    std::vector<std::string> plugins = options.plugins;
+    if (plugins.empty()) {
+        try {
+            plugins = pluginsBesideProgram().files;
+        } catch (const Problem&) {
+            return;
+        }
+    }
+    for (const std::string& plugin : plugins) {
+        loadCatalogueOf(plugin, complain);
+    }
+}
+
 }  // namespace
 
 ExitStatus properties(const Options& options) {
+    loadCatalogues(options);
     const Style style = Style::detect();
     std::vector<const Property*> rows;
     std::string text;
