@@ -48,9 +48,10 @@ int runBrctl(Arguments arguments, Host&, Answer& answer) {
         return answer.leaveToHost(toolName,
                                   firstOf(arguments) == "show" ? arguments.back() : firstOf(arguments));
     }
-    answer.out.add("bridge name\tbridge id\t\tSTP enabled\tinterfaces\n");
     for (const std::string& name : sortedNames(sysfs)) {
-        if (isBridge(name)) list(answer.out, name);
+        if (!isBridge(name)) continue;
+        if (answer.out.size() == 0) answer.out.add("bridge name\tbridge id\t\tSTP enabled\tinterfaces\n");
+        list(answer.out, name);
     }
     return 0;
 }

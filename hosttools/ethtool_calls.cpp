@@ -166,14 +166,14 @@ constexpr Named speeds[] = {{0, "10baseT/Half"},
                             {91, "100baseFX/Full"},
                             {92, "10baseT1L/Full"}};
 
-void addNames(Text& text, std::span<const Named> names, const ModeMask& modes, std::string_view none) {
+void addErrorCorrections(Text& text, const ModeMask& modes) {
     bool any = false;
-    for (const auto& [bit, name] : names) {
+    for (const auto& [bit, name] : errorCorrections) {
         if (!modes.has(bit)) continue;
         text.add(any ? " " : "").add(name);
         any = true;
     }
-    if (!any) text.add(none);
+    if (!any) text.add("Not reported");
 }
 
 /// The full duplex of a speed stands on the line of its half duplex, should this be there or not.
@@ -212,15 +212,16 @@ void addModes(Text& text, const ModeMask& modes, const Labels& label) {
     text.add("\n\t").add(label.negotiate).add(" auto-negotiation: ");
     text.add(modes.has(ETHTOOL_LINK_MODE_Autoneg_BIT) ? "Yes\n\t" : "No\n\t");
     text.add(label.whose).add(" FEC modes: ");
-    addNames(text, errorCorrections, modes, "Not reported");
+    addErrorCorrections(text, modes);
     text.add('\n');
 }
 
 void addSettings(Text& text, const Settings& settings) {
     text.add("\tSupported ports: [ ");
-    const ModeMask ours(settings, supported);
-    addNames(text, ports, ours, "");
-    text.add(ours.any() ? " ]\n" : "]\n");
+    for (const auto& [bit, name] : ports) {
+        if (ModeMask(settings, supported).has(bit)) text.add(name).add(' ');
+    }
+    text.add("]\n");
     for (const Mask mask : {supported, advertised, partner}) {
         const ModeMask modes(settings, mask);
         if (mask != partner || modes.any()) addModes(text, modes, labels[mask]);
@@ -278,10 +279,6 @@ private:
     }
     bool call(void* data) const {
         ifreq request{};
-        if (name_.size() >= IFNAMSIZ) {
-            errno = ENODEV;
-            return false;
-        }
         name_.copy(request.ifr_name, IFNAMSIZ - 1);
         request.ifr_data = static_cast<char*>(data);
         return ioctl(socket_.get(), SIOCETHTOOL, &request) == 0;
@@ -339,6 +336,11 @@ private:
 
 int listLinkByCalls(std::string_view name, Answer& answer) {
     constexpr int nothingKnown = 75;
+    if (name.size() >= IFNAMSIZ) {
+        answer.errors.add("netlink interface initialization failed, device name longer than ");
+        answer.errors.number(IFNAMSIZ - 1).add(" not supported\n");
+        return 1;
+    }
     answer.out.add("Settings for ").add(name).add(":\n");
     Calls calls(name, answer);
     calls.run();

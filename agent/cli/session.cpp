@@ -41,7 +41,7 @@ Session::Session(const Options& options) {
     setUpCommands(options.commands);
     StopSignals::install();
     if (options.hostTools != HostTools::native) {
-        putAdaptersFirst(inspectHostTools(options.hostTools, Look::adapters, adapterDirectory()));
+        putAdaptersOnPath(inspectHostTools(options.hostTools, Look::adapters, adapterDirectory()));
     }
     try {
         start(settings);

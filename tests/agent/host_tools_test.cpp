@@ -98,13 +98,13 @@ HOST_TEST(HostTools, ForcedChoicesRunNothing) {
 HOST_TEST(HostTools, OnlyTheAdaptersInUseComeFirst) {
     installAdapters(host);
     host.tool("ifconfig lo", kClassicIfconfig);
-    cvagent::putAdaptersFirst(inspectHostTools(HostTools::automatic, Look::adapters, kAdapters));
+    cvagent::putAdaptersOnPath(inspectHostTools(HostTools::automatic, Look::adapters, kAdapters));
     EXPECT_EQ(std::string(std::getenv("PATH")),
               "/opt/adapters/route:/opt/adapters/fdisk:/tools:/usr/sbin:/usr/bin:/sbin:/bin");
 }
 
 HOST_TEST(HostTools, ThePathStaysWhenNoAdapterIsUsed) {
-    cvagent::putAdaptersFirst(inspectHostTools(HostTools::native, Look::adapters, kAdapters));
+    cvagent::putAdaptersOnPath(inspectHostTools(HostTools::native, Look::adapters, kAdapters));
     EXPECT_EQ(std::string(std::getenv("PATH")), "/tools:/usr/sbin:/usr/bin:/sbin:/bin");
 }
 

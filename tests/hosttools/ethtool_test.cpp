@@ -225,4 +225,40 @@ TEST_F(Ethtool, SignalQuality) {
     expectSame(Card::whole().state(up + byte(ETHTOOL_A_LINKSTATE_EXT_STATE, 4)));
 }
 
+/// On a kernel that has the older calls only.
+class EthtoolByCalls : public Ethtool {
+protected:
+    void SetUp() override {
+        Ethtool::SetUp();
+        if (!canUnshare()) GTEST_SKIP() << "namespaces are not available";
+    }
+    static void expectSame(const NetworkNamespace& network, const std::string& link,
+                           const std::string& variables = "") {
+        const std::string before = variables + " FAKE_ETHTOOL=none LD_PRELOAD=" FAKE_ETHTOOL_KERNEL " ";
+        const Outcome real = network.shell(before + "ethtool " + link);
+        const Outcome ours = network.shell(before + ETHTOOL_BY_CALLS " " + link);
+        EXPECT_EQ(ours.output, real.output) << link << variables;
+        EXPECT_EQ(ours.errors, real.errors) << link;
+        EXPECT_EQ(ours.status, real.status) << link;
+    }
+};
+
+// A sanitizer wants to be loaded before whatever is preloaded.
+#if !defined(__SANITIZE_ADDRESS__) && !defined(__SANITIZE_THREAD__)
+TEST_F(EthtoolByCalls, KernelLinks) {
+    const NetworkNamespace network;
+    EXPECT_EQ(network.shell("ip link add v0 type veth peer name v1; ip link add br0 type bridge").status, 0);
+    for (const char* link : {"v0", "br0", "lo", "nosuch", "averyverylongname"}) {
+        expectSame(network, link);
+    }
+}
+
+TEST_F(EthtoolByCalls, Cards) {
+    const NetworkNamespace network;
+    for (const int mode : {-1, 0, 1, 3, 6, 9, 13, 50, 92, 93, 127}) {
+        expectSame(network, "lo", "FAKE_SETTINGS=" + std::to_string(mode));
+    }
+}
+#endif
+
 }  // namespace

@@ -1,15 +1,22 @@
 // Preloaded into the system's own ethtool: what the kernel answers to its questions comes from files, so that
 // it prints network cards that the machine does not have. FAKE_ETHTOOL is their directory. A file has the
-// number of a question's command for its name and holds the attributes of the answer. Or, when ethtool
-// netlink is missing ("none" in place of a directory), the tool has to use the older calls.
+// number of a question's command for its name and holds the attributes of the answer. Without ethtool netlink
+// ("none" in place of a directory) the tool has to use the older calls; FAKE_SETTINGS is then the bit of the
+// one link mode that the card has, or -1 for all of them.
 #include <dlfcn.h>
+#include <linux/ethtool.h>
 #include <linux/genetlink.h>
 #include <linux/netlink.h>
+#include <linux/sockios.h>
+#include <net/if.h>
+#include <sys/ioctl.h>
 #include <sys/socket.h>
 
 #include <algorithm>
 #include <array>
 #include <cerrno>
+#include <cstdarg>
+#include <cstdint>
 #include <cstdlib>
 #include <cstring>
 #include <fstream>
@@ -70,9 +77,60 @@ bool isAcknowledgement(const nlmsghdr& header, const char* bytes) {
     return header.nlmsg_type == NLMSG_ERROR && error == 0;
 }
 
+void fillIn(ethtool_link_settings& settings, int only) {
+    constexpr int kWords = 4;
+    if (settings.link_mode_masks_nwords != kWords) {
+        settings.link_mode_masks_nwords = -kWords;
+        return;
+    }
+    settings.speed = SPEED_2500;
+    settings.duplex = DUPLEX_HALF;
+    settings.port = PORT_TP;
+    settings.phy_address = 3;
+    settings.transceiver = XCVR_EXTERNAL;
+    settings.autoneg = AUTONEG_ENABLE;
+    settings.eth_tp_mdix = ETH_TP_MDI_X;
+    settings.eth_tp_mdix_ctrl = ETH_TP_MDI_AUTO;
+    std::array<std::uint32_t, std::size_t{3} * kWords> masks{};
+    for (unsigned bit = 0; bit < 32U * masks.size(); ++bit) {
+        if (only < 0 || bit % (32U * kWords) == static_cast<unsigned>(only))
+            masks[bit / 32] |= 1U << (bit % 32);
+    }
+    std::memcpy(&settings + 1, masks.data(), sizeof masks);
+}
+
+void fillIn(ethtool_wolinfo& wake) {
+    wake.supported = 0xff;
+    wake.wolopts = WAKE_MAGIC | WAKE_ARP;
+    std::ranges::fill(wake.sopass, 0);
+    wake.sopass[1] = 0xab;
+}
+
 }  // namespace
 
 extern "C" {
+
+int ioctl(int descriptor, unsigned long request, ...) noexcept {
+    static const auto real = next<int (*)(int, unsigned long, void*)>("ioctl");
+    va_list rest;
+    va_start(rest, request);
+    void* const argument = va_arg(rest, void*);
+    va_end(rest);
+    const char* const only = std::getenv("FAKE_SETTINGS");
+    if (request != SIOCETHTOOL || only == nullptr) return real(descriptor, request, argument);
+    void* const data = static_cast<ifreq*>(argument)->ifr_data;
+    const std::uint32_t command = *static_cast<std::uint32_t*>(data);
+    if (command == ETHTOOL_GLINKSETTINGS) {
+        fillIn(*static_cast<ethtool_link_settings*>(data), std::atoi(only));
+    } else if (command == ETHTOOL_GWOL) {
+        fillIn(*static_cast<ethtool_wolinfo*>(data));
+    } else if (command == ETHTOOL_GMSGLVL) {
+        static_cast<ethtool_value*>(data)->data = 0xffff;
+    } else {
+        return real(descriptor, request, argument);
+    }
+    return 0;
+}
 
 int socket(int domain, int type, int protocol) noexcept {
     static const auto real = next<int (*)(int, int, int)>("socket");
