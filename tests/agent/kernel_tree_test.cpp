@@ -205,6 +205,38 @@ HOST_TEST_F(KernelTree, ShowsInterfacesWithTodaysNames) {
                                      "network-port:cont0", "ip-config:cont0", "ip-config:br0"));
 }
 
+HOST_TEST_F(KernelTree, WritesAnInterfaceWithOneOfTodaysNames) {
+    wireTodaysNames(host);
+    const std::string start = "BOOTPROTO=static\nIPADDR=10.1.2.3/20\n";
+    interfaceFile(host, "ens18", start);
+    const std::string file =
+        "/etc/sysconfig/network/ifcfg-eth-id-" + KernelTold(host).hardwareAddress("ens18");
+    const auto write = [&](const std::string& property, const std::string& value) {
+        const Finished run = host.run({CVAGENT_PROGRAM, "--plugin", CORVISTA_PLUGIN_FILE, "set",
+                                       "ip-config:ens18", property, value, "--yes"});
+        EXPECT_EQ(run.status, 0) << run.err;
+    };
+    write("IPv4Address", "10.1.2.9");
+    EXPECT_THAT(host.read(file).value_or(""), testing::HasSubstr("IPADDR=10.1.2.9\n"));
+    write("InterfaceState", "12");
+    EXPECT_FALSE(KernelTold(host).nodes().empty());
+    EXPECT_THAT(ip(host, "-o link show ens18").out, testing::Not(testing::HasSubstr("UP")));
+    write("InterfaceState", "1");
+    EXPECT_THAT(ip(host, "-o link show ens18").out, testing::HasSubstr(",UP"));
+}
+
+HOST_TEST_F(KernelTree, TellsOfAnInterfaceWithOneOfTodaysNames) {
+    wireTodaysNames(host);
+    wire(host, {"link set sw1 up", "link set ens18 up"});
+    host.file("/opt/vantrel/corvista/data/oshwminetind.dat", "ens18=12\n");
+    RunningProgram watch = host.start({CVAGENT_PROGRAM, "--plugin", CORVISTA_PLUGIN_FILE, "watch", "--json"});
+    EXPECT_TRUE(watch.waitForOutput("}\n"));
+    watch.signal(SIGTERM);
+    const Json alert = Json::parse(watch.wait().out);
+    EXPECT_EQ(alert["message"], "NIC is Online ");
+    EXPECT_THAT(alert["path"].get<std::string>(), testing::HasSubstr("ens18"));
+}
+
 /// The host without net-tools, ethtool and bridge-utils.
 HOST_TEST_F(KernelTree, IsTheSameOnABareHost) {
     wireTodaysNames(host);
