@@ -9,7 +9,6 @@
 #include <array>
 #include <cerrno>
 #include <cstring>
-#include <memory>
 #include <span>
 
 #include "hosttools/ethtool_words.h"

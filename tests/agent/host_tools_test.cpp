@@ -239,7 +239,8 @@ HOST_TEST(Doctor, NeedsNoPackageOnABareHost) {
                     "\negrep +/.*egrep \\(finds no interfaces with names such as enp3s0\\) +our adapter "));
     EXPECT_THAT(run.out,
                 testing::HasSubstr("Our adapters stand in for: ifconfig fdisk ethtool brctl egrep\n"));
-    EXPECT_THAT(run.out, testing::HasSubstr("for: route\n"));
+    EXPECT_THAT(run.out,
+                testing::HasSubstr("Our adapters stand by, should the host's own be removed: route\n"));
     EXPECT_THAT(run.out, testing::EndsWith("Nothing is missing: no package needs to be installed.\n"));
 }
 

@@ -53,7 +53,8 @@ std::string adaptersInUse(const std::vector<ToolReport>& reports) {
             report.useAdapter || report.standsBy ? " " + report.tool : "";
     }
     return (inUse.empty() ? "" : "Our adapters stand in for:" + inUse + "\n") +
-           (standBy.empty() ? "" : "and would, were they missing, for:" + standBy + "\n");
+           (standBy.empty() ? ""
+                            : "Our adapters stand by, should the host's own be removed:" + standBy + "\n");
 }
 
 std::string table(const std::vector<ToolReport>& reports, const Style& style) {
