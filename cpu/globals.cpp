@@ -1,8 +1,6 @@
 // All globals of the processor source.
 #include "cpu/globals.h"
 
-#include "mi/log.h"
-
 namespace IC {
 
 std::string loggerOsHwMICpu = "Corvista.IC.MI.OsHwMICpu";

@@ -3,8 +3,8 @@
 #include <exception>
 #include <typeinfo>
 
+#include "indications/globals.h"
 #include "indications/left_behind.h"
-#include "mi/log.h"
 
 namespace IC {
 

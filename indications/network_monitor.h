@@ -4,6 +4,7 @@
 
 #include "framework/qx/event.h"
 #include "framework/qx/thread.h"
+#include "indications/pass.h"
 
 namespace IC {
 
@@ -11,7 +12,7 @@ namespace IC {
 class NetworkMonitor : public QX::Thread {
 public:
     /// @param ended signalled when run returns; not owned
-    explicit NetworkMonitor(QX::Event* ended);
+    NetworkMonitor(QX::Event* ended, const NodeTree& tree);
     /// Waits for a thread that still runs.
     ~NetworkMonitor() override;
 
@@ -23,11 +24,12 @@ public:
     bool isDone() const { return done_; }
 
 private:
-    void pass();
+    void pass(Pass& own) const;
     bool ending() const { return done_ || stopRequested_; }
 
     QX::Event wake_{true};
     QX::Event* const ended_;
+    const NodeTree& tree_;
     std::atomic<bool> done_{false};
     std::atomic<bool> stopRequested_{false};
 };

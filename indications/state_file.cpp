@@ -8,8 +8,7 @@
 #include "framework/qx/property_file.h"
 #include "framework/qx/strings.h"
 #include "indications/globals.h"
-#include "mi/log.h"
-#include "mi/os_hw_mi.h"
+#include "indications/pass.h"
 
 namespace IC {
 
@@ -34,13 +33,13 @@ std::optional<unsigned int> decimal(const std::string& text) {
 
 }  // namespace
 
-void OsHwMI::writePrevNetNodeMap() {
+void writePrevNetNodeMap(const Pass& pass) {
     const LogScope scope("writePrevNetNodeMap", indicationsLogSource);
     try {
         QX::PropertyFile file{QX::File::Path(stateFilePath())};
         file.open(QX::PropertyFile::forWriting);
         // What is not visited stays: an interface that comes back is compared with what it was.
-        for (const auto& [name, state] : OSHWMI_IND::pass().current) {
+        for (const auto& [name, state] : pass.now.current) {
             file.setValue(QX::make_wstring(name), std::to_wstring(state));
         }
         file.close();
@@ -49,15 +48,15 @@ void OsHwMI::writePrevNetNodeMap() {
     }
 }
 
-void OsHwMI::readPrevNetNodeMap() {
+void readPrevNetNodeMap(Pass& pass) {
     const LogScope scope("readPrevNetNodeMap", indicationsLogSource);
-    OSHWMI_IND::pass().previous.clear();
+    pass.previous.clear();
     try {
         QX::PropertyFile file{QX::File::Path(stateFilePath())};
         file.open(QX::PropertyFile::forReading);
         for (const std::wstring& key : file.enumerateKeys()) {
             if (const auto state = decimal(QX::make_string(file.getValue(key)))) {
-                OSHWMI_IND::pass().previous[QX::make_string(key)] = *state;
+                pass.previous[QX::make_string(key)] = *state;
             }
         }
         file.close();
@@ -65,7 +64,7 @@ void OsHwMI::readPrevNetNodeMap() {
     } catch (...) {
         // The first start of all has no file: an empty map raises no alert.
         logInd(kProgress) << "OSHWMI_NET_IND_DAT_FILE: Not available";
-        OSHWMI_IND::pass().previous.clear();
+        pass.previous.clear();
         OSHWMI_IND::datFileAvailable = false;
     }
 }

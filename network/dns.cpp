@@ -5,9 +5,9 @@
 
 #include "mi/line_file.h"
 #include "mi/log.h"
-#include "mi/os_hw_mi.h"
 #include "mi/text.h"
 #include "network/ip_origin.h"
+#include "network/network_builder.h"
 
 namespace IC {
 
@@ -148,7 +148,7 @@ void getDNSDetails(std::vector<std::string>& servers, std::vector<std::string>& 
     }
 }
 
-void OsHwMI::stringFormatForDNSServersAndSuffixes(std::string& servers, std::string& suffixes) {
+void NetworkBuilder::stringFormatForDNSServersAndSuffixes(std::string& servers, std::string& suffixes) {
     const LogScope scope;
     appendAll(servers, dnsServers_);
     appendAll(suffixes, dnsSuffixes_);

@@ -2,7 +2,6 @@
 #include "mi/globals.h"
 #include "mi/host_name.h"
 #include "mi/log.h"
-#include "mi/os_hw_mi.h"
 #include "mi/property_table.h"
 #include "network/dns.h"
 #include "network/esx.h"
@@ -11,6 +10,7 @@
 #include "network/ipv4_writer.h"
 #include "network/ipv6_writer.h"
 #include "network/link_queries.h"
+#include "network/network_builder.h"
 
 namespace IC {
 
@@ -87,7 +87,7 @@ Then reenumerate(const Change& change) {
     if (change.number() != 1) {
         return Then::store;
     }
-    myoshwmi.createNetworkPortNodes(true);
+    change.config.builder()->createNetworkPortNodes(true);
     return Then::forget;
 }
 
@@ -168,7 +168,7 @@ Error IPConfigNode::setProperty(const unsigned int& id, const PropertyValue& val
     log(kProgress) << "IPConfigNode::setProperty : IPOrigin Value :" << origin;
     std::string mac;
     getHardwareAddress(name_, mac);
-    const bool acts = OSHWMI::bInitflag && complete_;
+    const bool acts = OSHWMI::bInitflag && builder() != nullptr;
     if (!acts || act(id, originCode(origin) == IPOrigin::fixed, {*this, value, mac}) == Then::store) {
         MutableNode::setProperty(id, value);
     }

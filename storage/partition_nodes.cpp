@@ -5,6 +5,7 @@
 #include "mi/node_types.h"
 #include "mi/text.h"
 #include "storage/storage_build.h"
+#include "storage/storage_builder.h"
 #include "storage/storage_nodes.h"
 
 namespace IC {
@@ -24,24 +25,11 @@ unsigned long long blocks(const std::string& text) {
     return static_cast<unsigned long long>(static_cast<long long>(number));
 }
 
-}  // namespace
-
-void OsHwMI::createPartitionNodes(bool update) {
-    const LogScope scope;
-    static constexpr StorageKind partitions = {
-        .listing = "cat /tmp/fdisk_tmp | grep ^/dev",
-        .withdrawnText = "Delete a Partition entry: ",
-        .publishedText = "Partition Node Published",
-        .nodes = &OsHwMI::partitionNodes_,
-        .build = &OsHwMI::buildPartition,
-    };
-    buildStorageNodes(partitions, update);
-}
-
-std::unique_ptr<MutableNode> OsHwMI::buildPartition(const std::string& line, unsigned int index, bool) {
+std::unique_ptr<MutableNode> buildPartition(NodeTree& tree, const std::string& line, unsigned int index,
+                                            bool) {
     const std::string device = firstToken(line);
     std::unique_ptr<DiskPartition> node(
-        makeNode<DiskPartition>(tree_.diskController, NodeType::partition, index, device));
+        tree.makeNode<DiskPartition>(tree.fixed.diskController, NodeType::partition, index, device));
     node->setStatus(kStatusGood);
     node->setDescription("Partition");
     node->setProperty(DiskPartition::devicePath, PropertyValue(device, true));
@@ -56,6 +44,20 @@ std::unique_ptr<MutableNode> OsHwMI::buildPartition(const std::string& line, uns
     log(kProgress) << "Partition blocksize in Uint64 : " << number;
     node->setProperty(DiskPartition::partitionBlocks, PropertyValue(Number(number), true));
     return node;
+}
+
+constexpr StorageKind kPartitionKind = {
+    .listing = "cat /tmp/fdisk_tmp | grep ^/dev",
+    .withdrawnText = "Delete a Partition entry: ",
+    .publishedText = "Partition Node Published",
+    .build = buildPartition,
+};
+
+}  // namespace
+
+void StorageBuilder::createPartitionNodes(bool update) {
+    const LogScope scope;
+    buildStorageNodes(tree_, kPartitionKind, partitionNodes_, update);
 }
 
 }  // namespace IC

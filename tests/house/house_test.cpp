@@ -24,12 +24,14 @@ const std::map<std::string, std::set<std::string>> kMayInclude = {
     {"network", {"network", "mi", "framework"}},
     {"indications", {"indications", "mi", "framework"}},
     {"cpu", {"cpu", "mi", "framework"}},
+    {"oshwmi", {"oshwmi", "computer", "storage", "network", "indications", "cpu", "mi", "framework"}},
     {"agent/shell", {"agent/shell", "hosttools"}},
     {"agent/core", {"agent/core", "agent/shell", "framework"}},
     {"agent/cli", {"agent/cli", "agent/core", "agent/shell", "framework"}},
     {"hosttools", {"hosttools"}},
 };
-const std::set<std::string> kPlugin = {"mi", "computer", "storage", "network", "indications", "cpu"};
+const std::set<std::string> kPlugin = {"mi",          "computer", "storage", "network",
+                                       "indications", "cpu",      "oshwmi"};
 
 /// The innermost room of a file, or where none of the house is, its first directory.
 std::string roomOf(const fs::path& file) {

@@ -422,7 +422,7 @@ HOST_TEST(NetworkMonitor, TellsAChangeAgainThatItCannotKeep) {
 HOST_TEST(NetworkMonitor, WakesWhenItIsAskedToStop) {
     Interfaces interfaces;
     QX::Event ended(true);
-    IC::NetworkMonitor monitor(&ended);
+    IC::NetworkMonitor monitor(&ended, IC::myoshwmi);
     LogCapture capture;
     ASSERT_TRUE(monitor.start(nullptr));
     ASSERT_TRUE(eventually([&] { return !capture.messages(6000).empty(); })) << "the first pass is over";
@@ -434,7 +434,7 @@ HOST_TEST(NetworkMonitor, WakesWhenItIsAskedToStop) {
 
 HOST_TEST(NetworkMonitor, StoppedBeforeItRunsDoesNoPass) {
     QX::Event ended(true);
-    IC::NetworkMonitor monitor(&ended);
+    IC::NetworkMonitor monitor(&ended, IC::myoshwmi);
     EXPECT_FALSE(monitor.isDone());
     monitor.stop();
     LogCapture capture;

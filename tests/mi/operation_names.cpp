@@ -129,7 +129,7 @@ private:
 
 Names operationNames(const fs::path& tree) {
     Names names;
-    for (const char* room : {"mi", "computer", "storage", "network", "indications", "cpu"}) {
+    for (const char* room : {"mi", "computer", "storage", "network", "indications", "cpu", "oshwmi"}) {
         for (const auto& entry : fs::directory_iterator(tree / room)) {
             const std::string name = fs::relative(entry.path(), tree);
             if (name.ends_with(".h") && !kHelpers.contains(name)) {

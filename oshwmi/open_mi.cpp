@@ -1,6 +1,6 @@
 #include "mi/globals.h"
 #include "mi/log.h"
-#include "mi/os_hw_mi.h"
+#include "oshwmi/os_hw_mi.h"
 
 /// The plug-in's one entry: hands out the plug-in object and the record of the last initialize's result.
 /// @return 0
