@@ -1,5 +1,4 @@
 // One node for each logical processor the kernel lists, under the planar.
-#include <cstdlib>
 #include <fstream>
 
 #include "cpu/globals.h"
@@ -38,8 +37,7 @@ void describeProcessors(const std::map<unsigned int, MutableNode*>& processors) 
         const std::string speed = line.substr(line.find(':') + 1);
         processor->second->setDescription("Processor");
         processor->second->setProperty(
-            kClockSpeed,
-            PropertyValue(Number(static_cast<unsigned int>(std::strtoul(speed.c_str(), nullptr, 10))), true));
+            kClockSpeed, PropertyValue(Number(static_cast<unsigned int>(leadingDecimal(speed))), true));
         ++processor;
     }
 }

@@ -1,6 +1,6 @@
 // The link states of the last pass, kept across restarts of the agent: one key an interface, its state in
 // decimal.
-#include <charconv>
+#include <climits>
 #include <optional>
 #include <stdexcept>
 
@@ -9,6 +9,7 @@
 #include "framework/qx/strings.h"
 #include "indications/globals.h"
 #include "indications/pass.h"
+#include "mi/text.h"
 
 namespace IC {
 
@@ -24,11 +25,12 @@ std::string stateFilePath() {
     return std::string(directory) + "oshwminetind.dat";
 }
 
-std::optional<unsigned int> decimal(const std::string& text) {
-    unsigned int number = 0;
-    const char* end = text.data() + text.size();
-    const auto [stopped, failure] = std::from_chars(text.data(), end, number);
-    return failure == std::errc() && stopped == end ? std::optional(number) : std::nullopt;
+/// Digits alone, as they were written; nothing for a line that was damaged.
+std::optional<unsigned int> keptState(const std::string& text) {
+    const bool digits = text.find_first_not_of("0123456789") == text.npos && !text.empty();
+    const long long number = digits ? leadingDecimal(text) : -1;
+    return number >= 0 && number <= UINT_MAX ? std::optional(static_cast<unsigned int>(number))
+                                             : std::nullopt;
 }
 
 }  // namespace
@@ -55,7 +57,7 @@ void readPrevNetNodeMap(Pass& pass) {
         QX::PropertyFile file{QX::File::Path(stateFilePath())};
         file.open(QX::PropertyFile::forReading);
         for (const std::wstring& key : file.enumerateKeys()) {
-            if (const auto state = decimal(QX::make_string(file.getValue(key)))) {
+            if (const auto state = keptState(QX::make_string(file.getValue(key)))) {
                 pass.previous[QX::make_string(key)] = *state;
             }
         }

@@ -1,4 +1,5 @@
-#include <cstdlib>
+#include <algorithm>
+#include <limits>
 
 #include "mi/command.h"
 #include "mi/log.h"
@@ -21,8 +22,8 @@ std::string firstToken(const std::string& line) {
 /// partition of 2 TiB or more stays at 2147483647, the number that agents of such hosts have always been
 /// shown.
 unsigned long long blocks(const std::string& text) {
-    const long number = std::strtol(text.c_str(), nullptr, 10);
-    return static_cast<unsigned long long>(static_cast<long long>(number));
+    return static_cast<unsigned long long>(std::clamp<long long>(
+        leadingDecimal(text), std::numeric_limits<long>::min(), std::numeric_limits<long>::max()));
 }
 
 std::unique_ptr<MutableNode> buildPartition(NodeTree& tree, const std::string& line, unsigned int index,
