@@ -8,7 +8,7 @@
 
 namespace IC {
 
-/// Runs work that others have a hand in: what it throws is logged and goes no further.
+/// Runs what calls the agent or asks its nodes: an exception is logged and goes no further.
 template <class Work>
 void contained(Work work) {
     try {

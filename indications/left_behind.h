@@ -5,10 +5,10 @@
 
 namespace IC {
 
-/// Asked wherever the network monitor comes back from what can hang: whether the stop has gone on without its
-/// thread. Then it ends the thread's log, and the thread has only to end: the agent takes the plug-in for
-/// stopped, and in a process that ends the plug-in's globals go before the thread does. The log itself does
-/// not ask: a callback that stops the plug-in runs on this thread, and that stop has lines to write.
+/// Whether a stop has given up waiting for the calling thread. To be asked after every call that can hang. If
+/// so, the thread logs nothing more and has to end without touching anything: to the agent the plug-in has
+/// stopped, and when the process ends, the plug-in's globals go before this thread does. The log cannot ask
+/// by itself: a callback may stop the plug-in on this very thread, and that stop writes to the log.
 inline bool isLeftBehind() {
     if (!QX::Thread::isLeft()) {
         return false;

@@ -68,8 +68,8 @@ void NetworkMonitor::pass(Pass& own) const {
 
 void Indications::enableIndications() {
     const LogScope scope("enableIndications", indicationsLogSource);
-    // Made after every global, so gone before them: a library that is closed without an unload has no monitor
-    // left that uses them.
+    // A library that is closed without an unload ends its monitor here: an object made this late is destroyed
+    // before the globals that the monitor uses.
     static const struct AtTheEnd {
         Indications& indications;
         ~AtTheEnd() {

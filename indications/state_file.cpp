@@ -40,7 +40,7 @@ void writePrevNetNodeMap(const Pass& pass) {
     try {
         QX::PropertyFile file{QX::File::Path(stateFilePath())};
         file.open(QX::PropertyFile::forWriting);
-        // What is not visited stays: an interface that comes back is compared with what it was.
+        // The keys of interfaces that have gone stay: one that comes back is compared with what it was.
         for (const auto& [name, state] : pass.now.current) {
             file.setValue(QX::make_wstring(name), std::to_wstring(state));
         }

@@ -1,5 +1,5 @@
-// The fixed upper levels of the tree. The network controller hangs under the chassis and the disk controller,
-// with index 1, under the planar: agents know them by these places.
+// The tree and its fixed upper levels. The network controller hangs under the chassis and the disk
+// controller, with index 1, under the planar: agents know them by these places.
 #include "mi/node_tree.h"
 
 #include <stdexcept>

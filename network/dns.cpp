@@ -21,7 +21,8 @@ constexpr char kServers[] = "nameserver";
 constexpr char kSuffixes[] = "search";
 constexpr char kPolicy[] = "NETCONFIG_DNS_POLICY=";
 
-/// The writers go by a keyword's first six letters: "namese" begins a server line.
+/// Six letters of the keyword are enough: a line with a misspelt one ("nameservers") is replaced, too, where
+/// it would otherwise stay beside the new one.
 bool isLineOf(const char* keyword, const std::string& line) {
     return line.starts_with(std::string_view(keyword).substr(0, 6));
 }

@@ -50,6 +50,7 @@ Then writeSubnetMask(const Change& change) {
 
 Then writeIPv6Address(const Change& change) {
     setIPv6Address(change.interface(), change.text(), change.mac);
+    // The host's entry in /etc/hosts moves to the new address.
     const std::string host = change.current(Config::hostName);
     executeDomainandHostnameChanges(host, change.current(Config::domainName), false, change.text());
     return Then::store;
@@ -63,7 +64,7 @@ Then writeIPv4Gateway(const Change& change) {
 
 Then writeIPv6Gateway(const Change& change) {
     if (!change.text().empty()) {
-        // Two calls in a row: without an address first, then with the node's.
+        // The second finds the route that the first has made. Readers of the log expect both.
         setIPv6Gateway(change.interface(), change.text(), "");
         setIPv6Gateway(change.interface(), change.text(), change.current(Config::ipv6Address));
     }

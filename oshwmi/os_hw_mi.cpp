@@ -58,10 +58,10 @@ OsHwMI::~OsHwMI() = default;
 Error OsHwMI::initialize(unsigned int miId, const Number& ownNodeId, const Number& firstNodeId) {
     const LogScope scope;
     if (hasInventory()) {
-        stopMonitors();  // an agent that starts twice without a stop: they use what is made anew here
+        stopMonitors();  // the agent starts twice without a stop: they work on what is made anew here
     }
-    // As at the first start, so also after an unload: the builders fill nodes, they must not write what they
-    // read back to the host; and the drive monitor must run.
+    // An unload has left both set: nodes would write to the host what their builders fill in, and the drive
+    // monitor would end at once.
     OSHWMI::bInitflag = false;
     HardDriveNodeUpdate = false;
     beginInventory();
@@ -94,7 +94,7 @@ Error OsHwMI::unload() {
 }
 
 Error OsHwMI::emptyTree() {
-    // A walk that a write of the agent has begun still hangs its nodes under those that go here.
+    // A write of the agent may have begun a walk, which still hangs its nodes under those that go here.
     const std::lock_guard noWalk(building);
     forgetStorageNodes();
     fixed = {};

@@ -59,6 +59,7 @@ std::unique_ptr<MutableNode> buildHardDrive(NodeTree& tree, const std::string& l
 
 constexpr StorageKind kDriveKind = {
     .listing = "cat /tmp/fdisk_tmp | grep ^Disk",
+    // Misspelt: readers of the log search for it as it is.
     .withdrawnText = "Delete a Hrad Drive entry: ",
     .publishedText = "Updated Hard Drive Node Published",
     .build = buildHardDrive,

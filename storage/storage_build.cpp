@@ -11,13 +11,13 @@ namespace IC {
 
 namespace {
 
-/// Whether a line did not fit the buffer it was read into: its rest comes next.
+/// Whether a line did not fit the buffer: the next read then gives its rest.
 bool isCut(const std::string& line) {
     return line.size() == kCommandBuffer - 1 && line.back() != '\n';
 }
 
-/// The next line of a listing, without its line break. Of one that is too long the rest is passed over: it
-/// would be taken for a line of its own, and so for a device that the host does not have.
+/// The next line of a listing, without its line break. The rest of a line that is too long is skipped, or it
+/// would be taken for the line of another device.
 std::optional<std::string> nextEntry(HostCommand& listing) {
     const std::optional<std::string> line = listing.nextLine();
     for (std::optional<std::string> part = line; part && isCut(*part);) {
@@ -30,8 +30,8 @@ void withdrawStorageNodes(NodeTree& tree, const StorageKind& kind, std::vector<N
     while (!nodes.empty()) {
         Node* const old = nodes.front();
         log(kProgress) << kind.withdrawnText << old->getDescription();
-        // The framework owns the nodes and frees one when its last reader has gone: the list never holds one
-        // that has been withdrawn, nor loses one that has not, whatever the agent throws.
+        // Off the list before deleteNode, in which the agent may throw: a node that is withdrawn is freed
+        // with its last reader, so the list must not hold it any more.
         nodes.erase(nodes.begin());
         if (const Error result = tree.deleteNode(old); result.getStatus() != 0) {
             log(kError) << "deleteNode error = " << result;
@@ -51,7 +51,7 @@ void handOver(NodeTree& tree, std::unique_ptr<MutableNode> node, const StorageKi
             tree.appendNode(node.release());
         }
     } catch (...) {
-        // It is listed or it is gone already; in no case may a later update meet it.
+        // Whether the agent has it or not: a later update must not find it in the list.
         nodes.pop_back();
         tree.deleteNode(built);
         throw;

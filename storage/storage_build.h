@@ -10,7 +10,7 @@
 
 namespace IC {
 
-/// What the builders of drives and of partitions differ in; the frame around it is buildStorageNodes.
+/// What differs between drives and partitions; buildStorageNodes does what they have in common.
 struct StorageKind {
     Command listing;            ///< the command that prints one line per candidate
     const char* withdrawnText;  ///< logged before the description of a node that goes

@@ -234,7 +234,6 @@ HOST_TEST(NetworkMonitor, IsLeftWhenACallbackHangsForEver) {
         EXPECT_GE(std::chrono::steady_clock::now() - start, 490ms);
         EXPECT_LT(std::chrono::steady_clock::now() - start, 5s);
     }
-    EXPECT_TRUE(Interfaces::previous().empty()) << "what the pass works on is its thread's alone";
     EXPECT_THAT(capture.ownMessages(), Contains("eventThreadNetIndications termination failed."));
     EXPECT_THAT(capture.ownMessages(),
                 Contains(testing::StartsWith("eventThreadNetIndications: Waiting for thread ")).Times(10));
