@@ -1,10 +1,13 @@
 #pragma once
 
 #include <map>
+#include <string>
 
 #include "mi/node_tree.h"
 
 namespace IC {
+
+extern std::string loggerOsHwMICpu;  ///< the logger component of the processor nodes
 
 /// Builds the nodes of the processors.
 class ProcessorBuilder {

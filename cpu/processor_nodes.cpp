@@ -1,15 +1,23 @@
 // One node for each logical processor the kernel lists, under the planar.
 #include <fstream>
 
-#include "cpu/globals.h"
 #include "cpu/processor_builder.h"
 #include "mi/command.h"
+#include "mi/log.h"
 #include "mi/node_types.h"
 #include "mi/text.h"
 
 namespace IC {
 
+std::string loggerOsHwMICpu = "Corvista.IC.MI.OsHwMICpu";
+
 namespace {
+
+const LogSource processorsLogSource{"OsHwMICpu_ix86", &loggerOsHwMICpu};
+
+LogLine logCpu(int level, const char* function = __builtin_FUNCTION(), int line = __builtin_LINE()) {
+    return {processorsLogSource, level, Operation::nameOr(function), line};
+}
 
 /// Properties of a processor node.
 enum ProcessorProperty : unsigned int {

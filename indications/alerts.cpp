@@ -1,9 +1,7 @@
 // What a pass tells the agent: one alert for each interface whose state is not what it was.
 #include "indications/contained.h"
 #include "indications/globals.h"
-#include "indications/left_behind.h"
-#include "indications/link_state.h"
-#include "indications/pass.h"
+#include "indications/network_monitor.h"
 
 namespace IC {
 
@@ -55,9 +53,9 @@ void checkAndSendNetAlert(const NodeTree& tree, const Pass& pass) {
                          indicationsLogSource);
     for (const Compared& compared : compare(pass.previous, pass.now.current, pass.now.slaves)) {
         logInd(kProgress) << "Slaves Map Size : " << static_cast<unsigned int>(pass.now.slaves.size());
-        if (compared.verdict == Compared::Verdict::member) {
+        if (compared.isMember) {
             logInd(kProgress) << "Slaves Found in the Map";
-        } else if (compared.verdict == Compared::Verdict::changed) {
+        } else if (compared.hasChanged) {
             tell(tree, compared);
             if (isLeftBehind()) {
                 return;

@@ -3,8 +3,6 @@
 #include <algorithm>
 #include <iterator>
 
-#include "indications/link_state.h"
-
 namespace IC {
 
 namespace {
@@ -77,13 +75,8 @@ std::vector<Compared> compare(const LinkStates& previous, const LinkStates& curr
     std::vector<Compared> all;
     for (const auto& [name, before] : previous) {
         const unsigned int now = stateOf(current, name).value_or(before);
-        if (std::ranges::find(slaves, name) != slaves.end()) {
-            all.push_back({name, Compared::Verdict::member, now, nullptr});
-        } else if (now == before) {
-            all.push_back({name, Compared::Verdict::unchanged, now, nullptr});
-        } else {
-            all.push_back({name, Compared::Verdict::changed, now, alertKind(now)});
-        }
+        const bool isMember = std::ranges::find(slaves, name) != slaves.end();
+        all.push_back({name, isMember, now != before, now, alertKind(now)});
     }
     return all;
 }

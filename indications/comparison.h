@@ -8,6 +8,21 @@
 
 namespace IC {
 
+namespace LinkState {
+
+// What an interface's state is in the state maps, the state file and property 123.
+constexpr unsigned int up = 1;
+constexpr unsigned int down = 12;
+constexpr unsigned int switchedOver = 32;  ///< a member of the bond has gone down since the last pass
+constexpr unsigned int switchedBack = 33;  ///< a member of the bond has come back since the last pass
+constexpr unsigned int noVerdict = 34;     ///< the bond's members tell of no fail-over
+
+// Properties the states are read from.
+constexpr unsigned int nameProperty = 108;
+constexpr unsigned int stateProperty = 123;
+
+}  // namespace LinkState
+
 // What the states of two passes come to. Nothing here asks the host, logs or keeps anything.
 
 using LinkStates = std::map<std::string, unsigned int>;            ///< by interface
@@ -49,15 +64,14 @@ struct AlertKind {
 
 /// One interface of the last pass.
 struct Compared {
-    enum class Verdict { member, unchanged, changed };
-
     const std::string& name;
-    Verdict verdict;
+    bool isMember;          ///< of a bond, which tells in its place
+    bool hasChanged;        ///< false when it has disappeared
     unsigned int state;     ///< the new one
-    const AlertKind* kind;  ///< null unless it has changed to a state that is told
+    const AlertKind* kind;  ///< null for a state that is not told
 };
 
-/// In the order of the names. What is seen for the first time, and what has disappeared, counts as unchanged.
+/// All interfaces of the last pass, in the order of their names.
 /// @param previous must outlive the result
 std::vector<Compared> compare(const LinkStates& previous, const LinkStates& current,
                               const std::vector<std::string>& slaves);

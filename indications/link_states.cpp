@@ -2,8 +2,7 @@
 #include <optional>
 
 #include "indications/globals.h"
-#include "indications/link_state.h"
-#include "indications/pass.h"
+#include "indications/network_monitor.h"
 #include "mi/command.h"
 #include "mi/text.h"
 

@@ -5,8 +5,6 @@
 
 #include "indications/contained.h"
 #include "indications/globals.h"
-#include "indications/indications.h"
-#include "indications/left_behind.h"
 #include "mi/stopped_thread.h"
 
 namespace IC {

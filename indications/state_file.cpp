@@ -8,7 +8,7 @@
 #include "framework/qx/property_file.h"
 #include "framework/qx/strings.h"
 #include "indications/globals.h"
-#include "indications/pass.h"
+#include "indications/network_monitor.h"
 #include "mi/text.h"
 
 namespace IC {

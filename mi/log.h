@@ -1,6 +1,7 @@
 #pragma once
 
 #include <concepts>
+#include <exception>
 #include <string>
 
 #include "framework/cvlog/message_buffer.h"
@@ -86,6 +87,18 @@ private:
 /// A line of the main source. The last two arguments are the caller's function name and line: leave them out.
 inline LogLine log(int level, const char* function = __builtin_FUNCTION(), int line = __builtin_LINE()) {
     return {mainLogSource, level, Operation::nameOr(function), line};
+}
+
+/// Runs one step of several; an exception is logged under the step's name and goes no further.
+template <class Work>
+void guarded(const char* name, Work work) {
+    try {
+        work();
+    } catch (const std::exception& failure) {
+        log(kError) << name << " failed: " << failure.what();
+    } catch (...) {
+        log(kError) << name << " failed: unknown exception";
+    }
 }
 
 /// The calling thread's lines go nowhere from now on.

@@ -36,8 +36,6 @@ unsigned int commandsCutOff() {
     return cutOff;
 }
 
-MyProcess::MyProcess() : pipe_(nullptr) {}
-
 MyProcess::~MyProcess() {
     if (pipe_ != nullptr) {
         closePipe(pipe_);

@@ -13,7 +13,7 @@ public:
     /// never counted down, as readers of the log know it.
     static std::atomic<int> cnt;
 
-    MyProcess();
+    MyProcess() = default;
     MyProcess(const MyProcess&) = delete;
     MyProcess& operator=(const MyProcess&) = delete;
     ~MyProcess();
@@ -30,7 +30,7 @@ public:
     static void logOpenPipes();
 
 private:
-    FILE* pipe_;
+    FILE* pipe_ = nullptr;
 };
 
 /// Starts a command whose output is read. An aborted thread starts none; that counts as a command cut off.

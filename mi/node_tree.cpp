@@ -85,29 +85,23 @@ void NodeTree::publishNode(Node* node) {
 unsigned int NodeTree::drawNodeId() {
     const std::lock_guard lock(inventoryGuard_);
     const unsigned int id = takeNodeId();
-    if (inventory_) {
-        inventory_->drawnIds.push_back(id);
+    if (keepsInventory_) {
+        drawnIds_.push_back(id);
     }
     return id;
 }
 
 void NodeTree::rememberByName(const std::string& name, MutableNode* node) {
     const std::lock_guard lock(inventoryGuard_);
-    if (inventory_) {
-        auto& known = inventory_->nodesByName[name];
-        if (known.expired()) {
-            known = node->weak_from_this();
-        }
+    if (keepsInventory_ && nodesByName_[name].expired()) {
+        nodesByName_[name] = node->weak_from_this();
     }
 }
 
 std::map<std::string, std::shared_ptr<MutableNode>> NodeTree::nodesByName() const {
     std::map<std::string, std::shared_ptr<MutableNode>> held;
     const std::lock_guard lock(inventoryGuard_);
-    if (!inventory_) {
-        return held;
-    }
-    for (const auto& [name, known] : inventory_->nodesByName) {
+    for (const auto& [name, known] : nodesByName_) {
         if (auto node = known.lock()) {  // the agent has not withdrawn it
             held.emplace(name, std::move(node));
         }
@@ -124,21 +118,15 @@ bool NodeTree::findNetworkPort(std::string name, MutableNode** node) const {
 std::shared_ptr<MutableNode> NodeTree::findNetworkPort(const std::string& name) const {
     const LogScope scope;
     const std::lock_guard lock(inventoryGuard_);
-    if (!inventory_) {
-        return nullptr;
-    }
-    const auto found = inventory_->nodesByName.find(name);
-    return found == inventory_->nodesByName.end() ? nullptr : found->second.lock();
+    const auto found = nodesByName_.find(name);
+    return found == nodesByName_.end() ? nullptr : found->second.lock();
 }
 
-void NodeTree::beginInventory() {
+void NodeTree::resetInventory(bool keeps) {
     const std::lock_guard lock(inventoryGuard_);
-    inventory_.emplace();
-}
-
-void NodeTree::endInventory() {
-    const std::lock_guard lock(inventoryGuard_);
-    inventory_.reset();
+    keepsInventory_ = keeps;
+    drawnIds_.clear();
+    nodesByName_.clear();
 }
 
 }  // namespace IC

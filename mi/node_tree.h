@@ -1,9 +1,9 @@
 #pragma once
 
+#include <atomic>
 #include <map>
 #include <memory>
 #include <mutex>
-#include <optional>
 #include <string>
 #include <utility>
 #include <vector>
@@ -68,23 +68,21 @@ public:
     std::mutex building;
 
 protected:
-    void beginInventory();
-    void endInventory();
-    bool hasInventory() const { return inventory_.has_value(); }
+    /// Forgets the nodes' ids and names.
+    /// @param keeps whether new ones are remembered: from initialize to unload
+    void resetInventory(bool keeps);
+    bool hasInventory() const { return keepsInventory_; }
 
 private:
     friend struct OsHwMITestAccess;
 
-    struct Inventory {
-        std::vector<unsigned int> drawnIds;                             ///< every id taken from the counter
-        std::map<std::string, std::weak_ptr<MutableNode>> nodesByName;  ///< by interface, bonds included
-    };
-
     MutableNode* createStaticNode(const MutableNode* parent, unsigned int type, unsigned int index,
                                   const char* description);
 
-    mutable std::mutex inventoryGuard_;   ///< guards what is in the inventory
-    std::optional<Inventory> inventory_;  ///< from initialize to unload; the nodes are the framework's
+    mutable std::mutex inventoryGuard_;  ///< guards everything below
+    std::atomic<bool> keepsInventory_{false};
+    std::vector<unsigned int> drawnIds_;                             ///< every id taken from the counter
+    std::map<std::string, std::weak_ptr<MutableNode>> nodesByName_;  ///< by interface, bonds included
 };
 
 }  // namespace IC

@@ -31,18 +31,6 @@ constexpr Step kStartUp[] = {
     {"startHDDThread", [](OsHwMI& mi) { mi.startHDDThread(); }},
 };
 
-/// Runs one step; what it throws is logged and goes no further.
-template <class Work>
-void guarded(const char* name, Work work) {
-    try {
-        work();
-    } catch (const std::exception& failure) {
-        log(kError) << name << " failed: " << failure.what();
-    } catch (...) {
-        log(kError) << name << " failed: unknown exception";
-    }
-}
-
 }  // namespace
 
 OsHwMI myoshwmi;
@@ -64,7 +52,7 @@ Error OsHwMI::initialize(unsigned int miId, const Number& ownNodeId, const Numbe
     // monitor would end at once.
     OSHWMI::bInitflag = false;
     HardDriveNodeUpdate = false;
-    beginInventory();
+    resetInventory(true);
     guarded("updateHostAndDomainName", [&] { updateHostAndDomainName(); });
     OSHWMI::myerr = {Error::failure, Number(), ""};  // what stays when the base throws
     guarded("ManagementInterface::initialize", [&] {
@@ -89,7 +77,7 @@ Error OsHwMI::unload() {
     Error result = emptyTree();
     guarded("deleteSavedConfigurations", [] { deleteSavedConfigurations(); });
     guarded("deleteFdiskTmp", [] { deleteFdiskTmp(); });
-    endInventory();
+    resetInventory(false);
     return result;
 }
 
@@ -111,3 +99,12 @@ void OsHwMI::stopMonitors() {
 }
 
 }  // namespace IC
+
+/// The plug-in's one entry: hands out the plug-in object and the record of the last initialize's result.
+/// @return 0
+extern "C" __attribute__((visibility("default"))) int OpenMI(IC::ManagementInterface** mi, IC::Error** err) {
+    const IC::LogScope scope;
+    *mi = &IC::myoshwmi;
+    *err = &IC::OSHWMI::myerr;
+    return 0;
+}

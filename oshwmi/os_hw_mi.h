@@ -2,7 +2,7 @@
 
 #include "computer/computer_builder.h"
 #include "cpu/processor_builder.h"
-#include "indications/indications.h"
+#include "indications/network_monitor.h"
 #include "mi/node_tree.h"
 #include "network/network_builder.h"
 #include "storage/storage_builder.h"

@@ -43,7 +43,7 @@ void* HardDriveUpdateMonitor::run(void*) {
         while (!ending()) {
             waitOneMinute();
             // Also after a stop that came during this wait: a loop once begun ends with its comparison.
-            pass();
+            guarded("HDDThreadProcess", [this] { builder_.HDDThreadProcess(); });
         }
     }
     done = true;
@@ -62,16 +62,6 @@ void HardDriveUpdateMonitor::waitOneMinute() const {
         if (!ending()) {
             QX::Thread::sleep(kSliceMilliseconds);
         }
-    }
-}
-
-void HardDriveUpdateMonitor::pass() {
-    try {
-        builder_.HDDThreadProcess();
-    } catch (const std::exception& failure) {
-        log(kError) << "HDDThreadProcess failed: " << failure.what();
-    } catch (...) {
-        log(kError) << "HDDThreadProcess failed: unknown exception";
     }
 }
 

@@ -30,7 +30,6 @@ public:
 private:
     bool ending() const;
     void waitOneMinute() const;
-    void pass();
 
     QX::Event stopSignal_{true};
     QX::Event* const completed_;

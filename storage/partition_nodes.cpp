@@ -1,11 +1,9 @@
 #include <algorithm>
 #include <limits>
 
-#include "mi/command.h"
 #include "mi/log.h"
 #include "mi/node_types.h"
 #include "mi/text.h"
-#include "storage/storage_build.h"
 #include "storage/storage_builder.h"
 #include "storage/storage_nodes.h"
 

@@ -1,8 +1,7 @@
-#include "storage/storage_build.h"
+#include "storage/storage_builder.h"
 
 #include <utility>
 
-#include "framework/qx/thread.h"
 #include "mi/disk_snapshot.h"
 #include "mi/log.h"
 #include "mi/text.h"

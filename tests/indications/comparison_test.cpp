@@ -87,7 +87,7 @@ const std::vector<TwoPasses> kPasses = {
 Texts alertsOf(const LinkStates& previous, const IC::Settled& now) {
     Texts told;
     for (const IC::Compared& compared : IC::compare(previous, now.current, now.slaves)) {
-        if (compared.verdict == IC::Compared::Verdict::changed) {
+        if (compared.hasChanged && !compared.isMember) {
             const std::string message = compared.kind != nullptr ? compared.kind->message : "";
             told.push_back(compared.name + (message.empty() ? "" : ": " + message));
         }

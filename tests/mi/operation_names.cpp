@@ -17,12 +17,10 @@ const std::set<std::string> kHelpers = {
     "mi/log.h",
     "mi/property_table.h",
     "mi/text.h",
-    "indications/contained.h",
     "network/port_walk.h",
     "network/routes_file.h",
     "network/interface_file.h",
     "network/ip_facts.h",
-    "storage/storage_build.h",
 };
 
 std::string sourceOf(const std::string& room) {

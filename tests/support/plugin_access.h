@@ -16,9 +16,9 @@ namespace IC {
 /// is about the one there is, myoshwmi.
 struct OsHwMITestAccess {
     /// The containers as initialize makes them, without a tree and without monitors.
-    static void makeInventory(OsHwMI& mi) { mi.beginInventory(); }
+    static void makeInventory(OsHwMI& mi) { mi.resetInventory(true); }
     static bool hasInventory() { return myoshwmi.hasInventory(); }
-    static std::vector<unsigned int> drawnIds() { return myoshwmi.inventory_->drawnIds; }
+    static std::vector<unsigned int> drawnIds() { return myoshwmi.drawnIds_; }
     static MutableNode* computer(OsHwMI& mi) { return mi.fixed.computer; }
 
     /// The host's names as they were read last, line breaks included.
