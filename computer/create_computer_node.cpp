@@ -2,11 +2,11 @@
 #include <string>
 #include <vector>
 
+#include "computer/computer_builder.h"
 #include "computer/computer_node.h"
 #include "mi/command.h"
 #include "mi/log.h"
 #include "mi/node_types.h"
-#include "mi/os_hw_mi.h"
 #include "mi/text.h"
 
 namespace IC {
@@ -54,11 +54,11 @@ void prime(MutableNode& computer) {
 
 }  // namespace
 
-void OsHwMI::createComputerNodes() {
+void ComputerBuilder::createComputerNodes() {
     const LogScope scope;
-    auto* computer = makeNode<ComputerNode>(tree_.root, NodeType::computer, 0);
-    appendNode(computer);
-    tree_.computer = computer;
+    auto* computer = tree_.makeNode<ComputerNode>(tree_.fixed.root, NodeType::computer, 0);
+    tree_.appendNode(computer);
+    tree_.fixed.computer = computer;
     prime(*computer);
     computer->setStatus(kStatusGood);
     computer->setDescription("Computer");

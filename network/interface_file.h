@@ -17,9 +17,9 @@ inline constexpr char kInterfaceFileOpened[] = "File open '/etc/sysconfig/networ
 struct KeyLine {
     /// What a line that holds the key becomes.
     enum class Held {
-        replaced,       ///< `line`; the keys behind this one look at the new text
-        kept,           ///< it stays; the keys behind this one look at it too
-        keptUntouched,  ///< it stays, whatever other keys it holds
+        replaced,       ///< `line`; the keys behind this one are looked for in the new text
+        kept,           ///< it stays, unless a key behind this one stands in it too
+        keptUntouched,  ///< it stays, even if a key behind this one stands in it too
     };
 
     const char* key;   ///< looked for anywhere in a line: "IPADDR_" finds every secondary address

@@ -106,7 +106,6 @@ void fillIPConfig(IPConfigNode& node, const HostFacts& host, Settings& settings)
     fillNames(node, host);
     fillOrigin(node, settings);
     fillGateways(node, settings);
-    node.complete();
 }
 
 }  // namespace IC

@@ -8,6 +8,8 @@
 
 namespace IC {
 
+class NetworkBuilder;
+
 /// One interface's IP configuration. A read asks the host, a write changes it.
 class IPConfigNode : public MutableNode {
 public:
@@ -51,12 +53,13 @@ public:
     /// only stored: the builder's own filling must never change the host.
     Error setProperty(const unsigned int& id, const PropertyValue& value) override;
 
-    /// The builder is done; from now on writes act on the host.
-    void complete() { complete_ = true; }
+    /// The builder is done; from now on writes act on the host, and it is who looks for new interfaces.
+    void complete(NetworkBuilder* builder) { builder_ = builder; }
+    NetworkBuilder* builder() const { return builder_; }  ///< null until the node is complete
 
 private:
     const std::string name_;
-    std::atomic<bool> complete_{false};
+    std::atomic<NetworkBuilder*> builder_{nullptr};
 };
 
 /// The IPOrigin code of a BOOTPROTO keyword: 1 for "dhcp" and "dhcp4", 3 for "static" and "none", 2 for

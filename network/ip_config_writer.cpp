@@ -2,7 +2,6 @@
 #include "mi/globals.h"
 #include "mi/host_name.h"
 #include "mi/log.h"
-#include "mi/os_hw_mi.h"
 #include "mi/property_table.h"
 #include "network/dns.h"
 #include "network/esx.h"
@@ -11,6 +10,7 @@
 #include "network/ipv4_writer.h"
 #include "network/ipv6_writer.h"
 #include "network/link_queries.h"
+#include "network/network_builder.h"
 
 namespace IC {
 
@@ -50,6 +50,7 @@ Then writeSubnetMask(const Change& change) {
 
 Then writeIPv6Address(const Change& change) {
     setIPv6Address(change.interface(), change.text(), change.mac);
+    // The host's entry in /etc/hosts moves to the new address.
     const std::string host = change.current(Config::hostName);
     executeDomainandHostnameChanges(host, change.current(Config::domainName), false, change.text());
     return Then::store;
@@ -63,7 +64,7 @@ Then writeIPv4Gateway(const Change& change) {
 
 Then writeIPv6Gateway(const Change& change) {
     if (!change.text().empty()) {
-        // Two calls in a row: without an address first, then with the node's.
+        // The second finds the route that the first has made. Readers of the log expect both.
         setIPv6Gateway(change.interface(), change.text(), "");
         setIPv6Gateway(change.interface(), change.text(), change.current(Config::ipv6Address));
     }
@@ -87,7 +88,7 @@ Then reenumerate(const Change& change) {
     if (change.number() != 1) {
         return Then::store;
     }
-    myoshwmi.createNetworkPortNodes(true);
+    change.config.builder()->createNetworkPortNodes(true);
     return Then::forget;
 }
 
@@ -168,7 +169,7 @@ Error IPConfigNode::setProperty(const unsigned int& id, const PropertyValue& val
     log(kProgress) << "IPConfigNode::setProperty : IPOrigin Value :" << origin;
     std::string mac;
     getHardwareAddress(name_, mac);
-    const bool acts = OSHWMI::bInitflag && complete_;
+    const bool acts = OSHWMI::bInitflag && builder() != nullptr;
     if (!acts || act(id, originCode(origin) == IPOrigin::fixed, {*this, value, mac}) == Then::store) {
         MutableNode::setProperty(id, value);
     }

@@ -4,7 +4,6 @@
 #include "mi/text.h"
 #include "network/address_parse.h"
 #include "network/dhcp_queries.h"
-#include "network/ipv6_writer.h"
 #include "network/route_queries.h"
 
 namespace IC {

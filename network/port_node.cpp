@@ -1,10 +1,10 @@
 #include "network/port_node.h"
 
-#include <cstdlib>
 #include <utility>
 
 #include "mi/log.h"
 #include "mi/property_table.h"
+#include "mi/text.h"
 #include "network/link_codes.h"
 #include "network/link_queries.h"
 #include "network/port_queries.h"
@@ -54,7 +54,7 @@ PropertyValue isActive(const std::string& fact) {
 }
 
 PropertyValue failureCount(const std::string& fact) {
-    return {Number(static_cast<unsigned int>(std::strtoul(fact.c_str(), nullptr, 10))), true};
+    return {Number(static_cast<unsigned int>(leadingDecimal(fact))), true};
 }
 
 using Port = NetworkPortNode;

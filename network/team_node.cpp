@@ -4,8 +4,8 @@
 
 #include "mi/log.h"
 #include "mi/node_types.h"
-#include "mi/os_hw_mi.h"
 #include "mi/property_table.h"
+#include "network/network_builder.h"
 #include "network/teaming_queries.h"
 
 namespace IC {
@@ -77,7 +77,7 @@ Error NetworkTeamingNode::setProperty(unsigned int const& id, PropertyValue cons
     return MutableNode::setProperty(id, value);
 }
 
-void OsHwMI::createNetworkTeamingNodes() {
+void NetworkBuilder::createNetworkTeamingNodes() {
     const LogScope scope;
     std::vector<std::string> teams;
     getNICTeams(teams);
@@ -85,8 +85,9 @@ void OsHwMI::createNetworkTeamingNodes() {
     for (const std::string& team : teams) {
         ++index;
         try {
-            auto* node = makeNode<NetworkTeamingNode>(tree_.computer, NodeType::networkTeam, index, team);
-            appendNode(node);
+            auto* node =
+                tree_.makeNode<NetworkTeamingNode>(tree_.fixed.computer, NodeType::networkTeam, index, team);
+            tree_.appendNode(node);
             storeSnapshot(*node);
         } catch (const std::exception&) {
             log(kError) << "NetworkTeaming node error";
