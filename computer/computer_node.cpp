@@ -6,8 +6,7 @@
 #include <array>
 #include <cstring>
 #include <ctime>
-#include <string>
-#include <utility>
+#include <stdexcept>
 
 #include "computer/owner_data.h"
 #include "computer/time_zone.h"
@@ -15,58 +14,54 @@
 #include "framework/qx/date_time.h"
 #include "mi/command.h"
 #include "mi/globals.h"
-#include "mi/log.h"
-#include "mi/property_table.h"
 #include "mi/text.h"
 
 namespace IC {
 
 namespace {
 
-Error readHostName(const ComputerNode&, PropertyValue& out) {
+// A read or a change that the host does not grant throws: the node answers status 1.
+
+PropertyValue hostNameOf(const std::string&) {
     log(kProgress) << "ComputerNode::getProperty Name Inside Case";
     std::array<char, 256> name{};
     if (gethostname(name.data(), name.size()) == -1) {
         log(kError) << "ComputerNode::getProperty Name::GetHostname Failed";
-        return result(false);
+        throw std::runtime_error("no host name");
     }
-    const std::string text(name.data(), strnlen(name.data(), name.size()));
-    out = PropertyValue(trimEnd(text), true);
-    return result(true);
+    return {trimEnd(std::string(name.data(), strnlen(name.data(), name.size()))), true};
 }
 
 template <const wchar_t* key>
-Error readOwner(const ComputerNode&, PropertyValue& out) {
+PropertyValue readOwner(const std::string&) {
     const char* directory = QX::CorvistaUtilities::getMoraineDataDir();
     if (directory == nullptr) {
         log(kNoAnswer) << "ComputerNode::getProperty : OwnerContact/OwnerName - NULL returned by "
                           "CorvistaUtilities::getMoraineDataDir();";
-        return result(false);
+        throw std::runtime_error("no data directory");
     }
     try {
-        out = PropertyValue(OwnerData(directory).read(key), true);
+        return {OwnerData(directory).read(key), true};
     } catch (...) {
         log(kNoAnswer) << "ComputerNode::getProperty : OwnerContact/OwnerName - Cannot read asset dat file.";
-        return result(false);
+        throw;
     }
-    return result(true);
 }
 
-template <const wchar_t* key, unsigned int id>
-Error writeOwner(ComputerNode& node, const PropertyValue& value) {
+template <const wchar_t* key>
+void writeOwner(Change& change) {
     const char* directory = QX::CorvistaUtilities::getMoraineDataDir();
     if (directory == nullptr) {
         log(kNoAnswer) << "ComputerNode::setProperty : OwnerContact/OwnerName - NULL returned by "
                           "CorvistaUtilities::getMoraineDataDir()";
-        return result(false);
+        throw std::runtime_error("no data directory");
     }
     try {
-        OwnerData(directory).write(key, static_cast<std::string>(value));
+        OwnerData(directory).write(key, change.text());
     } catch (...) {
         log(kNoAnswer) << "ComputerNode::setProperty : OwnerContact/OwnerName - Cannot write asset dat file.";
-        return result(false);
+        throw;
     }
-    return node.MutableNode::setProperty(id, value);
 }
 
 void runAndForget(const Command& command) {
@@ -74,8 +69,8 @@ void runAndForget(const Command& command) {
 }
 
 /// The result does not tell whether the host is going down: a reader asks whether it still answers.
-Error writePowerAction(ComputerNode& node, const PropertyValue& value) {
-    switch (static_cast<unsigned int>(value)) {
+void writePowerAction(Change& change) {
+    switch (change.number()) {
         case PowerAction::restart:
             runAndForget("shutdown -r now");
             break;
@@ -85,22 +80,23 @@ Error writePowerAction(ComputerNode& node, const PropertyValue& value) {
         default:
             break;
     }
-    return node.MutableNode::setProperty(ComputerProperty::powerAction, value);
 }
 
-Error readCurrentTime(const ComputerNode&, PropertyValue& out) {
-    out = PropertyValue(Number(static_cast<long>(time(nullptr)), 0), true);
-    return result(true);
+PropertyValue currentTimeOf(const std::string&) {
+    return {Number(static_cast<long>(time(nullptr)), 0), true};
 }
 
 /// A time that a long cannot hold (on 32 bits those beyond January 2038) throws and leaves the clock alone.
-Error writeCurrentTime(ComputerNode&, const PropertyValue& value) {
-    const QX::DateTime wanted(static_cast<std::string>(value), 3);
+void writeCurrentTime(Change& change) {
+    const QX::DateTime wanted(change.text(), 3);
     const timeval seconds{static_cast<long>(wanted), 0};
-    return result(settimeofday(&seconds, nullptr) == 0);
+    if (settimeofday(&seconds, nullptr) != 0) {
+        throw std::runtime_error("the clock was not set");
+    }
+    change.isStored = false;
 }
 
-Error readTimeZoneOffset(const ComputerNode&, PropertyValue& out) {
+PropertyValue timeZoneOffsetOf(const std::string&) {
     // localtime_r alone looks at /etc/localtime once in the life of a process.
     tzset();
     const time_t now = time(nullptr);
@@ -108,66 +104,61 @@ Error readTimeZoneOffset(const ComputerNode&, PropertyValue& out) {
     localtime_r(&now, &local);
     constexpr long kSecondsPerMinute = 60;
     const long minutes = local.tm_gmtoff / kSecondsPerMinute;
-    out = PropertyValue(Number(static_cast<double>(minutes)), true);
-    return result(true);
+    return {Number(static_cast<double>(minutes)), true};
 }
 
-Error writeTimeZoneOffset(ComputerNode&, const PropertyValue& value) {
-    return result(setTimezone(static_cast<unsigned int>(value)));
+void writeTimeZoneOffset(Change& change) {
+    if (!setTimezone(change.number())) {
+        throw std::runtime_error("the zone was not set");
+    }
+    change.isStored = false;
 }
 
-Error readConstant200(const ComputerNode&, PropertyValue& out) {
-    out = PropertyValue(Number(1U), true);
-    return result(true);
+PropertyValue constant200(const std::string&) {
+    return {Number(1U), true};
 }
 
 // The clock reads as a number and is set by a text, the zone reads with daylight saving included and is set
 // by its standard offset: agents rely on both.
-constexpr Property<ComputerNode> kProperties[] = {
-    {ComputerProperty::hostName, "HostName", readHostName},
-    {ComputerProperty::ownerContact, "OwnerContact", readOwner<OwnerData::contact>,
-     writeOwner<OwnerData::contact, ComputerProperty::ownerContact>},
-    {ComputerProperty::ownerName, "OwnerName", readOwner<OwnerData::name>,
-     writeOwner<OwnerData::name, ComputerProperty::ownerName>},
-    {ComputerProperty::powerAction, "PowerAction", nullptr, writePowerAction},
-    {ComputerProperty::currentTime, "CurrentTime", readCurrentTime, writeCurrentTime},
-    {ComputerProperty::timeZoneOffset, "TimeZoneOffset", readTimeZoneOffset, writeTimeZoneOffset},
-    {ComputerProperty::constant200, "ComputerConstant200", readConstant200},
+constexpr Property kComputerProperties[] = {
+    {ComputerProperty::hostName, hostNameOf},
+    {ComputerProperty::ownerContact, readOwner<OwnerData::contact>, writeOwner<OwnerData::contact>},
+    {ComputerProperty::ownerName, readOwner<OwnerData::name>, writeOwner<OwnerData::name>},
+    {ComputerProperty::powerAction, nullptr, writePowerAction},
+    {ComputerProperty::currentTime, currentTimeOf, writeCurrentTime},
+    {ComputerProperty::timeZoneOffset, timeZoneOffsetOf, writeTimeZoneOffset},
+    {ComputerProperty::constant200, constant200},
 };
-static_assert(idsAscend(kProperties));
+static_assert(idsAscend(kComputerProperties));
+
+Error failed() {
+    return {Error::failure, Number(), ""};
+}
 
 }  // namespace
 
-ComputerNode::ComputerNode(unsigned int nodeId, unsigned int linkedId, std::vector<unsigned int> miIds,
-                           unsigned int nodeType, unsigned int index)
-    : MutableNode(nodeId, linkedId, std::move(miIds), nodeType, index) {
-    const LogScope scope("ComputerNode::ComputerNode");
-}
-
-ComputerNode::~ComputerNode() {
-    const LogScope scope("ComputerNode::~ComputerNode");
-}
+constinit const NodeClass computerClass{"~ComputerNode", kComputerProperties};
 
 Error ComputerNode::getProperty(unsigned int id, PropertyValue& out) const {
-    const LogScope scope("ComputerNode::getProperty");
     out = PropertyValue();
-    const auto* property = findProperty(kProperties, id);
     try {
-        return property != nullptr && property->read != nullptr ? property->read(*this, out)
-                                                                : MutableNode::getProperty(id, out);
+        return HostNode::getProperty(id, out);
     } catch (...) {
-        return result(false);
+        return failed();
     }
 }
 
 Error ComputerNode::setProperty(const unsigned int& id, const PropertyValue& value) {
-    const LogScope scope("ComputerNode::setProperty");
-    const auto* property = OSHWMI::bInitflag ? findProperty(kProperties, id) : nullptr;
+    const LogScope scope = enter();
+    const Property* row = OSHWMI::bInitflag ? computerClass.find(id) : nullptr;
     try {
-        return property != nullptr && property->write != nullptr ? property->write(*this, value)
-                                                                 : MutableNode::setProperty(id, value);
+        Change change{*this, name(), value};
+        if (row != nullptr && row->write != nullptr) {
+            row->write(change);
+        }
+        return change.isStored ? MutableNode::setProperty(id, value) : Error();
     } catch (...) {
-        return result(false);
+        return failed();
     }
 }
 

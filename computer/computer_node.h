@@ -1,6 +1,6 @@
 #pragma once
 
-#include "framework/ic/mutable_node.h"
+#include "mi/host_node.h"
 
 namespace IC {
 
@@ -23,12 +23,12 @@ constexpr unsigned int restart = 9;
 constexpr unsigned int halt = 12;
 }  // namespace PowerAction
 
+extern const NodeClass computerClass;
+
 /// The computer system as a whole: names, owner, clock, power.
-class ComputerNode : public MutableNode {
+class ComputerNode : public NodeOf<computerClass> {
 public:
-    ComputerNode(unsigned int nodeId, unsigned int linkedId, std::vector<unsigned int> miIds,
-                 unsigned int nodeType, unsigned int index);
-    ~ComputerNode() override;
+    using NodeOf::NodeOf;
 
     /// Asks the host: its name (gethostname), the owner's data (asset file), the clock in seconds since
     /// 1970-01-01 UTC, the offset from UTC in force in minutes (east positive). Every other id gives what was

@@ -1,10 +1,7 @@
 #include "network/lan_endpoint_node.h"
 
-#include <utility>
-
 #include "framework/netinfo/ip_interface_info.h"
 #include "mi/globals.h"
-#include "mi/log.h"
 #include "mi/node_types.h"
 #include "mi/os_hw_mi.h"
 #include "mi/text.h"
@@ -12,43 +9,7 @@
 
 namespace IC {
 
-namespace {
-
-void storeAddress(IPConfigNode& node, const CIPInfo& address) {
-    node.setProperty(IPConfigNode::interfaceName, {node.name(), true});
-    node.setProperty(IPConfigNode::interfaceLabel, {node.name(), true});
-    if (address.ipv6) {
-        node.setProperty(IPConfigNode::ipv6Address, {address.address, true});
-        node.setProperty(IPConfigNode::ipv6PrefixLength, {Number(address.prefixLength), true});
-    } else {
-        node.setProperty(IPConfigNode::ipv4Address, {address.address, true});
-        node.setProperty(IPConfigNode::subnetMask, {address.mask, true});
-    }
-    node.complete();
-}
-
-}  // namespace
-
-CLANEndPointNode::CLANEndPointNode(unsigned int nodeId, unsigned int linkedId,
-                                   std::vector<unsigned int> miIds, unsigned int nodeType, unsigned int index,
-                                   std::string name)
-    : MutableNode(nodeId, linkedId, std::move(miIds), nodeType, index), name_(std::move(name)) {
-    const LogScope scope("CLANEndPointNode::CLANEndPointNode");
-}
-
-CLANEndPointNode::~CLANEndPointNode() {
-    const LogScope scope("CLANEndPointNode::~CLANEndPointNode");
-}
-
-Error CLANEndPointNode::getProperty(unsigned int id, PropertyValue& value) const {
-    const LogScope scope("CLANEndPointNode::getProperty");
-    return MutableNode::getProperty(id, value);
-}
-
-Error CLANEndPointNode::setProperty(const unsigned int& id, const PropertyValue& value) {
-    const LogScope scope("CLANEndPointNode::setProperty");
-    return MutableNode::setProperty(id, value);
-}
+constinit const NodeClass lanEndPointClass{"~CLANEndPointNode"};
 
 bool getParentLANEndPointNode(std::string name, unsigned int& id) {
     const std::string entry = "In getParentLANEndPointNode " + name;
@@ -94,8 +55,9 @@ CLANEndPointNode* OsHwMI::createLANEndPoint(const std::string& name, unsigned in
     auto* node = new CLANEndPointNode(drawNodeId(), parent, miIds(), NodeType::lanEndPoint, index, name);
     appendNode(node);
     node->setDescription("LAN EndPoint node");
-    node->setStatus(1);
-    node->setProperty(CLANEndPointNode::interfaceName, {name, true});
+    node->setStatus(kStatusGood);
+    constexpr unsigned int kInterfaceName = 108;
+    node->setProperty(kInterfaceName, {name, true});
     return node;
 }
 
@@ -106,8 +68,8 @@ void OsHwMI::createIPConfigNodes(std::vector<CIPInfo*>* addresses, std::string n
         auto* config = makeNode<IPConfigNode>(parent, NodeType::ipConfiguration, ++index, name);
         appendNode(config);
         config->setDescription("IP Configuration");
-        config->setStatus(1);
-        storeAddress(*config, *address);
+        config->setStatus(kStatusGood);
+        config->fill(*address);
     }
 }
 

@@ -93,7 +93,7 @@ MutableNode* OsHwMI::createIPConfig(const ListedInterface& interface, const Muta
     appendNode(config);
     log(kProgress) << "Size of Inteface  " << static_cast<unsigned int>(walk.bridgeMemberCount());
     config->setDescription(interface.isBridge ? "Bridge" : "IP Configuration");
-    fillIPConfig(*config, walk.host(), settings);
+    config->fill(walk.host(), settings);
     return config;
 }
 

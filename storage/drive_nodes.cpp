@@ -26,11 +26,11 @@ unsigned long long thousandsOfBytes(const std::string& text) {
 
 void fillDrive(HardDriveNode& node, const std::string& sizeInBytes) {
     const std::string& device = node.name();
-    node.setProperty(HardDriveNode::devicePath, PropertyValue(device, true));
-    node.setProperty(HardDriveNode::driveSize, PropertyValue(Number(thousandsOfBytes(sizeInBytes)), true));
+    node.setProperty(StorageProperty::devicePath, PropertyValue(device, true));
+    node.setProperty(StorageProperty::driveSize, PropertyValue(Number(thousandsOfBytes(sizeInBytes)), true));
     PropertyValue health;
-    node.getProperty(HardDriveNode::healthState, health);
-    node.setProperty(HardDriveNode::healthState, health);
+    node.getProperty(StorageProperty::healthState, health);
+    node.setProperty(StorageProperty::healthState, health);
     if (health == PropertyValue(Number(1U), true)) {
         log(kProgress) << "Hard Drive Node::Normal " << device;
     }

@@ -44,8 +44,8 @@ std::unique_ptr<MutableNode> OsHwMI::buildPartition(const std::string& line, uns
         makeNode<DiskPartition>(tree_.diskController, NodeType::partition, index, device));
     node->setStatus(kStatusGood);
     node->setDescription("Partition");
-    node->setProperty(DiskPartition::devicePath, PropertyValue(device, true));
-    node->setProperty(DiskPartition::partitionName, PropertyValue(device, true));
+    node->setProperty(StorageProperty::devicePath, PropertyValue(device, true));
+    node->setProperty(StorageProperty::partitionName, PropertyValue(device, true));
     const auto answer = askAboutLine(formatCommand("echo \"%s\" |  tr -s '*' ' '  | cut -d ' ' -f4", line));
     if (!answer) {
         return nullptr;
@@ -54,7 +54,7 @@ std::unique_ptr<MutableNode> OsHwMI::buildPartition(const std::string& line, uns
     log(kProgress) << "Partition blocksize : " << size;
     const unsigned long long number = blocks(size);
     log(kProgress) << "Partition blocksize in Uint64 : " << number;
-    node->setProperty(DiskPartition::partitionBlocks, PropertyValue(Number(number), true));
+    node->setProperty(StorageProperty::partitionBlocks, PropertyValue(Number(number), true));
     return node;
 }
 

@@ -4,6 +4,7 @@
 #include <gmock/gmock.h>
 
 #include "network/ip_facts.h"
+#include "network/ip_origin.h"
 #include "tests/network/port_host.h"
 #include "tests/support/command_lines.h"
 #include "tests/support/log_capture.h"
