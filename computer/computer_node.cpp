@@ -6,6 +6,7 @@
 #include <array>
 #include <cstring>
 #include <ctime>
+#include <initializer_list>
 #include <stdexcept>
 
 #include "computer/owner_data.h"
@@ -14,11 +15,33 @@
 #include "framework/qx/date_time.h"
 #include "mi/command.h"
 #include "mi/globals.h"
+#include "mi/node_types.h"
+#include "mi/os_hw_mi.h"
 #include "mi/text.h"
 
 namespace IC {
 
 namespace {
+
+namespace ComputerProperty {
+enum : unsigned int {
+    hostName = 108,        ///< text
+    ownerContact = 115,    ///< text
+    ownerName = 116,       ///< text
+    powerAction = 123,     ///< enumeration: PowerAction; stored, not asked
+    powerActions = 125,    ///< list of numbers: the values powerAction may have
+    currentTime = 126,     ///< number: seconds since 1970; written as an ISO 8601 text
+    timeZoneOffset = 127,  ///< number: minutes east of UTC
+    constant200 = 200,     ///< number: 1
+};
+}  // namespace ComputerProperty
+
+/// Values of ComputerProperty::powerAction.
+namespace PowerAction {
+constexpr unsigned int running = 1;  ///< the state of a host that answers; writing it does nothing
+constexpr unsigned int restart = 9;
+constexpr unsigned int halt = 12;
+}  // namespace PowerAction
 
 // A read or a change that the host does not grant throws: the node answers status 1.
 
@@ -131,6 +154,47 @@ constexpr Property kComputerProperties[] = {
 };
 static_assert(idsAscend(kComputerProperties));
 
+/// Stores what the host answers now.
+bool storeAnswer(MutableNode& computer, unsigned int id) {
+    PropertyValue value;
+    if (computer.getProperty(id, value).getStatus() != 0) {
+        return false;
+    }
+    computer.setProperty(id, value);
+    return true;
+}
+
+void primeOwner(MutableNode& computer) {
+    for (const unsigned int id : {ComputerProperty::ownerName, ComputerProperty::ownerContact}) {
+        if (!storeAnswer(computer, id)) {
+            // Without their file neither is known: both are shown, and are empty.
+            computer.setProperty(ComputerProperty::ownerName, PropertyValue("", true));
+            computer.setProperty(ComputerProperty::ownerContact, PropertyValue("", true));
+        }
+    }
+}
+
+/// What is stored is the tool's answer; a reader gets the kernel's, which no tool is needed for.
+void primeHostName(MutableNode& computer) {
+    HostCommand command("hostname 2> /dev/null");
+    const auto line = command.nextLine();
+    if (line && !contains(*line, "Unknown")) {
+        computer.setProperty(ComputerProperty::hostName, PropertyValue(trimEnd(*line), true));
+    }
+}
+
+/// Fills the store of a new node, so that a reader of all its properties finds them there. Before the end of
+/// start-up writing a property only stores it.
+void prime(MutableNode& computer) {
+    computer.setProperty(ComputerProperty::powerAction, PropertyValue(EnumValue(PowerAction::running), true));
+    const std::vector<Number> accepted{PowerAction::running, PowerAction::restart, PowerAction::halt};
+    computer.setProperty(ComputerProperty::powerActions, PropertyValue(accepted, true));
+    primeOwner(computer);
+    storeAnswer(computer, ComputerProperty::currentTime);
+    storeAnswer(computer, ComputerProperty::timeZoneOffset);
+    primeHostName(computer);
+}
+
 Error failed() {
     return {Error::failure, Number(), ""};
 }
@@ -160,6 +224,16 @@ Error ComputerNode::setProperty(const unsigned int& id, const PropertyValue& val
     } catch (...) {
         return failed();
     }
+}
+
+void OsHwMI::createComputerNodes() {
+    const LogScope scope;
+    auto* computer = makeNode<ComputerNode>(tree_.root, NodeType::computer, 0);
+    appendNode(computer);
+    tree_.computer = computer;
+    prime(*computer);
+    computer->setStatus(kStatusGood);
+    computer->setDescription("Computer");
 }
 
 }  // namespace IC

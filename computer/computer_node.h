@@ -4,25 +4,6 @@
 
 namespace IC {
 
-/// Property ids of the computer node.
-namespace ComputerProperty {
-constexpr unsigned int hostName = 108;
-constexpr unsigned int ownerContact = 115;
-constexpr unsigned int ownerName = 116;
-constexpr unsigned int powerAction = 123;
-constexpr unsigned int powerActions = 125;  ///< the values powerAction may have; stored, not asked
-constexpr unsigned int currentTime = 126;
-constexpr unsigned int timeZoneOffset = 127;
-constexpr unsigned int constant200 = 200;
-}  // namespace ComputerProperty
-
-/// Values of ComputerProperty::powerAction.
-namespace PowerAction {
-constexpr unsigned int running = 1;  ///< the state of a host that answers; writing it does nothing
-constexpr unsigned int restart = 9;
-constexpr unsigned int halt = 12;
-}  // namespace PowerAction
-
 extern const NodeClass computerClass;
 
 /// The computer system as a whole: names, owner, clock, power.

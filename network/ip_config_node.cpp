@@ -157,7 +157,7 @@ void writeIPv4Gateway(Change& change) {
 
 void writeIPv6Gateway(Change& change) {
     if (!change.text().empty()) {
-        // Two calls in a row: without an address first, then with the node's.
+        // Asked for twice: whether the route could be added is told nobody, and the second call tries again.
         setIPv6Gateway(change.name, change.text(), "");
         setIPv6Gateway(change.name, change.text(), change.current(ConfigId::ipv6Address));
     }

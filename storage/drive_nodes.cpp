@@ -11,6 +11,19 @@ namespace IC {
 
 namespace {
 
+namespace DriveId {
+enum : unsigned int {
+    driveSize = 37,     ///< number, 64 bits: thousands of bytes
+    devicePath = 89,    ///< text
+    healthState = 123,  ///< number: always 1
+};
+}  // namespace DriveId
+
+constexpr Property kDriveProperties[] = {
+    {DriveId::healthState, healthOf},
+};
+static_assert(idsAscend(kDriveProperties));
+
 /// Disks proper. Software RAID and mapper devices are listed like disks but are none.
 bool isDrive(const std::string& device) {
     return contains(device, "/dev/sd") || contains(device, "/dev/hd");
@@ -26,17 +39,19 @@ unsigned long long thousandsOfBytes(const std::string& text) {
 
 void fillDrive(HardDriveNode& node, const std::string& sizeInBytes) {
     const std::string& device = node.name();
-    node.setProperty(StorageProperty::devicePath, PropertyValue(device, true));
-    node.setProperty(StorageProperty::driveSize, PropertyValue(Number(thousandsOfBytes(sizeInBytes)), true));
+    node.setProperty(DriveId::devicePath, PropertyValue(device, true));
+    node.setProperty(DriveId::driveSize, PropertyValue(Number(thousandsOfBytes(sizeInBytes)), true));
     PropertyValue health;
-    node.getProperty(StorageProperty::healthState, health);
-    node.setProperty(StorageProperty::healthState, health);
+    node.getProperty(DriveId::healthState, health);
+    node.setProperty(DriveId::healthState, health);
     if (health == PropertyValue(Number(1U), true)) {
         log(kProgress) << "Hard Drive Node::Normal " << device;
     }
 }
 
 }  // namespace
+
+constinit const NodeClass hardDriveClass{"~HardDriveNode", kDriveProperties};
 
 void OsHwMI::createHardDriveNodes(bool update) {
     const LogScope scope;

@@ -11,6 +11,20 @@ namespace IC {
 
 namespace {
 
+namespace PartitionId {
+enum : unsigned int {
+    devicePath = 89,        ///< text
+    partitionName = 108,    ///< text: the device path again
+    partitionBlocks = 112,  ///< number, 64 bits: blocks of 1024 bytes
+    healthState = 123,      ///< number: always 1
+};
+}  // namespace PartitionId
+
+constexpr Property kPartitionProperties[] = {
+    {PartitionId::healthState, healthOf},
+};
+static_assert(idsAscend(kPartitionProperties));
+
 std::string firstToken(const std::string& line) {
     const std::string text = trimStart(line);
     return text.substr(0, text.find(' '));
@@ -25,6 +39,8 @@ unsigned long long blocks(const std::string& text) {
 }
 
 }  // namespace
+
+constinit const NodeClass diskPartitionClass{"~DiskPartition", kPartitionProperties};
 
 void OsHwMI::createPartitionNodes(bool update) {
     const LogScope scope;
@@ -44,8 +60,8 @@ std::unique_ptr<MutableNode> OsHwMI::buildPartition(const std::string& line, uns
         makeNode<DiskPartition>(tree_.diskController, NodeType::partition, index, device));
     node->setStatus(kStatusGood);
     node->setDescription("Partition");
-    node->setProperty(StorageProperty::devicePath, PropertyValue(device, true));
-    node->setProperty(StorageProperty::partitionName, PropertyValue(device, true));
+    node->setProperty(PartitionId::devicePath, PropertyValue(device, true));
+    node->setProperty(PartitionId::partitionName, PropertyValue(device, true));
     const auto answer = askAboutLine(formatCommand("echo \"%s\" |  tr -s '*' ' '  | cut -d ' ' -f4", line));
     if (!answer) {
         return nullptr;
@@ -54,7 +70,7 @@ std::unique_ptr<MutableNode> OsHwMI::buildPartition(const std::string& line, uns
     log(kProgress) << "Partition blocksize : " << size;
     const unsigned long long number = blocks(size);
     log(kProgress) << "Partition blocksize in Uint64 : " << number;
-    node->setProperty(StorageProperty::partitionBlocks, PropertyValue(Number(number), true));
+    node->setProperty(PartitionId::partitionBlocks, PropertyValue(Number(number), true));
     return node;
 }
 

@@ -4,18 +4,8 @@
 
 namespace IC {
 
-// A drive and a partition: their name is the device path, "/dev/sda". All but a health that is always good is
-// stored when the node is built; nothing is asked of the host, and writing changes nothing there.
-
-namespace StorageProperty {
-enum Id : unsigned int {
-    driveSize = 37,         ///< unsigned 64-bit, thousands of bytes; drives only
-    devicePath = 89,        ///< text
-    partitionName = 108,    ///< text: the device path again; partitions only
-    partitionBlocks = 112,  ///< unsigned 64-bit, blocks of 1024 bytes; partitions only
-    healthState = 123,      ///< live: always 1
-};
-}  // namespace StorageProperty
+// The name of a drive and of a partition is the device path, "/dev/sda". All but their health is stored when
+// the node is built; writing changes nothing on the host.
 
 extern const NodeClass hardDriveClass;
 extern const NodeClass diskPartitionClass;
@@ -31,5 +21,10 @@ class DiskPartition : public NodeOf<diskPartitionClass> {
 public:
     using NodeOf::NodeOf;
 };
+
+/// A device that is listed counts as healthy, 1: the listing says nothing more about it.
+inline PropertyValue healthOf(const std::string& /*device*/) {
+    return {Number(1U), true};
+}
 
 }  // namespace IC

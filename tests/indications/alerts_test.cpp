@@ -90,7 +90,7 @@ void expectAlert(const Change& expected) {
     EXPECT_EQ(alert.message(), expected.message);
     EXPECT_EQ(alert.firstCode(), expected.firstCode);
     EXPECT_EQ(alert.secondCode(), 0);
-    EXPECT_EQ(alert.nodeId(), expected.eventCode);
+    EXPECT_EQ(alert.eventCode(), expected.eventCode);
     EXPECT_THAT(alert.substitutions(), TextsAre("/ports/eth0"));
     IC::PropertyValue state;
     change.node.getProperty(123, state);

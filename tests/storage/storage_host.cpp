@@ -17,7 +17,7 @@ std::unique_ptr<CommandLines> started;
 
 std::string pathOf(const IC::Node& node) {
     IC::PropertyValue path;
-    node.getProperty(IC::StorageProperty::devicePath, path);
+    node.getProperty(89, path);
     return std::string(path);
 }
 
@@ -127,11 +127,11 @@ void StorageHost::tearDownHost(FakeHost&) {
 }
 
 std::vector<Seen> StorageHost::drives() {
-    return look(IC::NodeType::hardDrive, IC::StorageProperty::driveSize);
+    return look(IC::NodeType::hardDrive, 37);
 }
 
 std::vector<Seen> StorageHost::partitions() {
-    return look(IC::NodeType::partition, IC::StorageProperty::partitionBlocks);
+    return look(IC::NodeType::partition, 112);
 }
 
 std::vector<std::shared_ptr<IC::MutableNode>> StorageHost::nodesOfType(unsigned int type) {
