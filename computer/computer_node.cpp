@@ -9,6 +9,7 @@
 #include <initializer_list>
 #include <stdexcept>
 
+#include "computer/computer_builder.h"
 #include "computer/owner_data.h"
 #include "computer/time_zone.h"
 #include "framework/qx/corvista_utilities.h"
@@ -16,7 +17,6 @@
 #include "mi/command.h"
 #include "mi/globals.h"
 #include "mi/node_types.h"
-#include "mi/os_hw_mi.h"
 #include "mi/text.h"
 
 namespace IC {
@@ -226,11 +226,11 @@ Error ComputerNode::setProperty(const unsigned int& id, const PropertyValue& val
     }
 }
 
-void OsHwMI::createComputerNodes() {
+void ComputerBuilder::createComputerNodes() {
     const LogScope scope;
-    auto* computer = makeNode<ComputerNode>(tree_.root, NodeType::computer, 0);
-    appendNode(computer);
-    tree_.computer = computer;
+    auto* computer = tree_.makeNode<ComputerNode>(tree_.fixed.root, NodeType::computer, 0);
+    tree_.appendNode(computer);
+    tree_.fixed.computer = computer;
     prime(*computer);
     computer->setStatus(kStatusGood);
     computer->setDescription("Computer");

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <concepts>
+#include <exception>
 #include <string>
 
 #include "framework/cvlog/message_buffer.h"
@@ -36,9 +37,7 @@ struct LogSource {
     const std::string* component;
 };
 
-extern const LogSource mainLogSource;         ///< "OsHwMI_ix86"
-extern const LogSource indicationsLogSource;  ///< "OsHwMIInd_ix86"
-extern const LogSource processorsLogSource;   ///< "OsHwMICpu_ix86"
+extern const LogSource mainLogSource;  ///< "OsHwMI_ix86"
 
 /// One log line: collects what is streamed into it and goes out at the end of the statement, first to the
 /// log, then to the trace. Errors of a thread that is being aborted go nowhere. Never throws.
@@ -85,15 +84,21 @@ private:
     const char* outer_;
 };
 
-// A line of each source. The last two arguments are the caller's function name and line: leave them out.
+/// A line of the main source. The last two arguments are the caller's function name and line: leave them out.
 inline LogLine log(int level, const char* function = __builtin_FUNCTION(), int line = __builtin_LINE()) {
     return {mainLogSource, level, Operation::nameOr(function), line};
 }
-inline LogLine logInd(int level, const char* function = __builtin_FUNCTION(), int line = __builtin_LINE()) {
-    return {indicationsLogSource, level, Operation::nameOr(function), line};
-}
-inline LogLine logCpu(int level, const char* function = __builtin_FUNCTION(), int line = __builtin_LINE()) {
-    return {processorsLogSource, level, Operation::nameOr(function), line};
+
+/// Runs one step of several; an exception is logged under the step's name and goes no further.
+template <class Work>
+void guarded(const char* name, Work work) {
+    try {
+        work();
+    } catch (const std::exception& failure) {
+        log(kError) << name << " failed: " << failure.what();
+    } catch (...) {
+        log(kError) << name << " failed: unknown exception";
+    }
 }
 
 /// The calling thread's lines go nowhere from now on.

@@ -4,7 +4,6 @@
 #include "mi/command.h"
 #include "mi/globals.h"
 #include "mi/host_name.h"
-#include "mi/os_hw_mi.h"
 #include "mi/text.h"
 #include "network/address_queries.h"
 #include "network/dhcp_queries.h"
@@ -15,6 +14,7 @@
 #include "network/ipv4_writer.h"
 #include "network/ipv6_writer.h"
 #include "network/link_queries.h"
+#include "network/network_builder.h"
 #include "network/route_queries.h"
 
 namespace IC {
@@ -146,6 +146,7 @@ void writeSubnetMask(Change& change) {
 
 void writeIPv6Address(Change& change) {
     setIPv6Address(change.name, change.text(), change.mac);
+    // The host's entry in /etc/hosts moves to the new address.
     const std::string host = change.current(ConfigId::hostName);
     executeDomainandHostnameChanges(host, change.current(ConfigId::domainName), false, change.text());
 }
@@ -176,7 +177,7 @@ void reenumerate(Change& change) {
     log(kProgress) << "IPConfigNode::CreateUser :setProperty:";
     log(kProgress) << "IPConfigNode::CreateUser :PropertyValue:" << change.number();
     if (change.number() == 1) {
-        myoshwmi.createNetworkPortNodes(true);
+        static_cast<const IPConfigNode&>(change.node).builder()->createNetworkPortNodes(true);
         change.isStored = false;
     }
 }
@@ -325,7 +326,7 @@ Error IPConfigNode::setProperty(const unsigned int& id, const PropertyValue& val
     log(kProgress) << "IPConfigNode::setProperty : IPOrigin Value :" << origin;
     Change change{*this, name(), value};
     getHardwareAddress(name(), change.mac);
-    if (OSHWMI::bInitflag && complete_) {
+    if (OSHWMI::bInitflag && builder() != nullptr) {
         act(id, originCode(origin) == IPOrigin::fixed, change);
     }
     if (change.isStored) {
@@ -341,7 +342,6 @@ void IPConfigNode::fill(const HostFacts& host, Settings& settings) {
     fillHost(*this, host);
     fillOrigin(*this, settings);
     fillGateways(*this, settings);
-    complete_ = true;
 }
 
 void IPConfigNode::fill(const CIPInfo& address) {
@@ -353,7 +353,6 @@ void IPConfigNode::fill(const CIPInfo& address) {
         setProperty(ConfigId::ipv4Address, {address.address, true});
         setProperty(ConfigId::subnetMask, {address.mask, true});
     }
-    complete_ = true;
 }
 
 }  // namespace IC

@@ -18,6 +18,8 @@ struct HostFacts {
     std::vector<std::string> dnsSuffixes;
 };
 
+class NetworkBuilder;
+
 extern const NodeClass ipConfigClass;
 
 /// One interface's IP configuration: a read asks the host, a write changes it. Its name is the interface's. A
@@ -27,9 +29,14 @@ public:
     using NodeOf::NodeOf;
 
     /// Changes the host, then stores the value. Always a success; failures are only logged.
-    /// Until the plug-in has started, and until the node is filled, values are only stored: filling it must
+    /// Until the plug-in has started, and until the node is complete, values are only stored: filling it must
     /// never change the host.
     Error setProperty(const unsigned int& id, const PropertyValue& value) override;
+
+    /// Filling is over; from now on writes act on the host, and it is `builder` that looks for new
+    /// interfaces.
+    void complete(NetworkBuilder* builder) { builder_ = builder; }
+    NetworkBuilder* builder() const { return builder_; }  ///< null until the node is complete
 
     /// Asks the host for everything an IP configuration shows and stores it.
     /// @param settings receives what is saved of the interface: its addresses, gateways and boot protocol
@@ -38,7 +45,7 @@ public:
     void fill(const CIPInfo& address);
 
 private:
-    std::atomic<bool> complete_{false};
+    std::atomic<NetworkBuilder*> builder_{nullptr};
 };
 
 }  // namespace IC

@@ -5,7 +5,6 @@
 #include "network/address_parse.h"
 #include "network/address_queries.h"
 #include "network/dhcp_queries.h"
-#include "network/ipv6_writer.h"
 #include "network/route_queries.h"
 
 namespace IC {

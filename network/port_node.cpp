@@ -1,8 +1,7 @@
 #include "network/port_node.h"
 
-#include <cstdlib>
-
 #include "framework/ic/link_state.h"
+#include "mi/text.h"
 #include "network/link_queries.h"
 #include "network/port_queries.h"
 #include "network/port_type.h"
@@ -83,7 +82,7 @@ PropertyValue memberFact(const std::string& name, unsigned int id, std::string t
         case PortId::isActiveMember:
             return {Number(!fact.empty()), true};
         case PortId::memberLinkFailures:
-            return {Number(static_cast<unsigned int>(std::strtoul(fact.c_str(), nullptr, 10))), true};
+            return {Number(static_cast<unsigned int>(leadingDecimal(fact))), true};
         default:
             return {fact, true};
     }

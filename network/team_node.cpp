@@ -1,7 +1,7 @@
 #include "network/team_node.h"
 
 #include "mi/node_types.h"
-#include "mi/os_hw_mi.h"
+#include "network/network_builder.h"
 #include "network/teaming_queries.h"
 
 namespace IC {
@@ -56,7 +56,7 @@ Error NetworkTeamingNode::getProperty(unsigned int id, PropertyValue& out) const
     return {};
 }
 
-void OsHwMI::createNetworkTeamingNodes() {
+void NetworkBuilder::createNetworkTeamingNodes() {
     const LogScope scope;
     std::vector<std::string> teams;
     getNICTeams(teams);
@@ -64,8 +64,9 @@ void OsHwMI::createNetworkTeamingNodes() {
     for (const std::string& team : teams) {
         ++index;
         try {
-            auto* node = makeNode<NetworkTeamingNode>(tree_.computer, NodeType::networkTeam, index, team);
-            appendNode(node);
+            auto* node =
+                tree_.makeNode<NetworkTeamingNode>(tree_.fixed.computer, NodeType::networkTeam, index, team);
+            tree_.appendNode(node);
             storeSnapshot(*node);
         } catch (const std::exception&) {
             log(kError) << "NetworkTeaming node error";

@@ -7,8 +7,8 @@
 
 namespace IC {
 
-/// An indication for the agent: two codes, the texts to substitute (node paths), the event code that
-/// receivers key on and a message for people. A plain value.
+/// An indication for the agent: two codes, the texts to substitute (node paths), the event code that the
+/// receiver goes by, and a message for people. A plain value.
 class CORVISTA_API Alert {
 public:
     Alert(unsigned char firstCode, unsigned char secondCode, std::vector<std::string> substitutions,

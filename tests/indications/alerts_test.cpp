@@ -156,7 +156,7 @@ HOST_TEST(Alerts, AreNoneForAnInterfaceWithoutANode) {
 HOST_TEST(Alerts, AreNoneForAMemberOfABondWhateverItsState) {
     for (const unsigned int now : {1U, 12U, 32U, 33U}) {
         OneChange change(99, now);
-        IC::OSHWMI_IND::pass().slaves = {"eth5", "eth0"};
+        Interfaces::slaves() = {"eth5", "eth0"};
         LogCapture capture;
         change.check();
         EXPECT_THAT(change.agent.alerts, IsEmpty());

@@ -18,12 +18,10 @@ const std::set<std::string> kHelpers = {
     "mi/log.h",
     "mi/property_table.h",
     "mi/text.h",
-    "indications/contained.h",
     "network/port_walk.h",
     "network/routes_file.h",
     "network/interface_file.h",
     "network/ip_facts.h",
-    "storage/storage_build.h",
 };
 
 std::string sourceOf(const std::string& room) {
@@ -135,7 +133,7 @@ private:
 
 Names operationNames(const fs::path& tree) {
     Names names;
-    for (const char* room : {"mi", "computer", "storage", "network", "indications", "cpu"}) {
+    for (const char* room : {"mi", "computer", "storage", "network", "indications", "cpu", "oshwmi"}) {
         for (const auto& entry : fs::directory_iterator(tree / room)) {
             const std::string name = fs::relative(entry.path(), tree);
             if (name.ends_with(".h") && !kHelpers.contains(name)) {

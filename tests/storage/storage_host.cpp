@@ -1,4 +1,5 @@
 #include "tests/storage/storage_host.h"
+#include "oshwmi/os_hw_mi.h"
 
 #include <chrono>
 #include <fstream>

@@ -5,7 +5,7 @@
 #include "mi/command.h"
 #include "mi/line_file.h"
 #include "mi/log.h"
-#include "mi/os_hw_mi.h"
+#include "mi/node_tree.h"
 #include "mi/text.h"
 
 namespace IC {
@@ -58,10 +58,10 @@ bool replaceHostsEntry(const std::string& address, const std::string& hostName, 
 
 }  // namespace
 
-void OsHwMI::updateHostAndDomainName() {
+void NodeTree::updateHostAndDomainName() {
     const LogScope scope;
-    updateName("hostname -s 2> /dev/null", hostName_);
-    updateName("hostname -d 2> /dev/null", domainName_);
+    updateName("hostname -s 2> /dev/null", hostName);
+    updateName("hostname -d 2> /dev/null", domainName);
 }
 
 void executeDomainandHostnameChanges(std::string hostName, std::string domainName, bool operation,

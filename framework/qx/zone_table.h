@@ -1,16 +1,21 @@
-#include "computer/zone_table.h"
+#pragma once
 
 #include <algorithm>
 #include <iterator>
 
-namespace IC {
+namespace QX {
 
-namespace {
+/// The one zone that stands for an offset from UTC, on hosts and for the agent that is to set one.
+struct Zone {
+    int offset;        ///< minutes, east of UTC positive
+    const char* file;  ///< below /usr/share/zoneinfo
+    const char* name;  ///< the text of the TIMEZONE key in /etc/sysconfig/clock
+};
 
 // Which zone stands for an offset that several share (Brisbane, not Sydney) is a choice that hosts rely on.
 // The key's text is not always the file's name: the classic abbreviations are what the host's own tools
 // write.
-constexpr Zone kZones[] = {
+inline constexpr Zone zoneTable[] = {
     {-660, "Pacific/Midway", "Pacific/Midway"},
     {-600, "HST", "HST"},
     {-540, "America/Anchorage", "America/Anchorage"},
@@ -41,15 +46,15 @@ constexpr Zone kZones[] = {
     {660, "Asia/Magadan", "Asia/Magadan"},
     {720, "Asia/Kamchatka", "Asia/Kamchatka"},
 };
-static_assert(std::ranges::adjacent_find(kZones, std::ranges::greater_equal{}, &Zone::offset) ==
-              std::end(kZones));
+static_assert(std::ranges::adjacent_find(zoneTable, std::ranges::greater_equal{}, &Zone::offset) ==
+              std::end(zoneTable));
 
-}  // namespace
-
-const Zone* findZone(unsigned int offset) {
+/// @param offset minutes; west of UTC in two's complement
+/// @return null for an offset that no zone stands for
+constexpr const Zone* findZone(unsigned int offset) {
     const auto* zone = std::ranges::find(
-        kZones, offset, [](const Zone& entry) { return static_cast<unsigned int>(entry.offset); });
-    return zone == std::end(kZones) ? nullptr : zone;
+        zoneTable, offset, [](const Zone& entry) { return static_cast<unsigned int>(entry.offset); });
+    return zone == std::end(zoneTable) ? nullptr : zone;
 }
 
-}  // namespace IC
+}  // namespace QX
