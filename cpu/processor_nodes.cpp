@@ -25,7 +25,7 @@ enum ProcessorProperty : unsigned int {
 };
 
 constexpr char kListProcessors[] = "cat /proc/cpuinfo 2> /dev/null |grep processor 2> /dev/null ";
-constexpr std::size_t kLongestLine = 127;
+constexpr std::size_t kLongestLine = 127;  // the rest of a longer row is judged as a row of its own
 
 /// Whether a row that `grep` found is a processor's: the word also stands in the names of models ("Common KVM
 /// processor").
@@ -34,7 +34,8 @@ bool isProcessor(const std::string& row) {
     return key.substr(0, key.find_last_not_of(" \t") + 1) == "processor";
 }
 
-/// The k-th speed that the kernel tells is the k-th processor's.
+/// The k-th speed that the kernel tells is the k-th processor's. One without a speed is left undescribed:
+/// agents have always been shown it so.
 void describeProcessors(const std::map<unsigned int, MutableNode*>& processors) {
     std::ifstream cpuinfo("/proc/cpuinfo");
     auto processor = processors.begin();

@@ -104,6 +104,11 @@ void guarded(const char* name, Work work) {
 /// The calling thread's lines go nowhere from now on.
 void endLogOfThisThread();
 
+/// The class whose member a LogScope is for.
+struct ClassName {
+    const char* text;
+};
+
 /// Writes "<name>: entry" now and "<name>: exit" when the scope is left. Without a name it takes the
 /// function's.
 class LogScope {
@@ -114,11 +119,17 @@ public:
     /// texts.
     LogScope(const char* entry, const char* exit, const LogSource& source = mainLogSource,
              const char* function = __builtin_FUNCTION(), int line = __builtin_LINE());
+    /// For the members of a class: the name is "<class>::<function>".
+    LogScope(ClassName owner, const char* function, int line);
     LogScope(const LogScope&) = delete;
     LogScope& operator=(const LogScope&) = delete;
     ~LogScope();
 
 private:
+    /// @param end what follows the text
+    void write(const char* text, const char* end) const;
+
+    const char* owner_ = nullptr;
     const char* exit_;
     const char* exitEnd_;
     const LogSource& source_;

@@ -1,12 +1,12 @@
 #include "network/ipv4_writer.h"
 
+#include "framework/ic/link_state.h"
 #include "mi/command.h"
 #include "mi/line_file.h"
 #include "mi/log.h"
 #include "mi/text.h"
 #include "network/interface_file.h"
 #include "network/ip_origin.h"
-#include "network/link_codes.h"
 #include "network/routes_file.h"
 
 namespace IC {
@@ -28,11 +28,11 @@ std::string bootProtoLine(unsigned int origin, bool dhcpv6Known) {
 /// The command that takes an interface to a status; "" for a status that is none.
 Command statusCommand(const std::string& ifName, unsigned int status) {
     switch (status) {
-        case 1:
-        case 9:
+        case LinkState::up:
+        case LinkState::bringUp:
             return textCommand("ifconfig %s up", ifName);
-        case 12:
-        case 16:
+        case LinkState::down:
+        case LinkState::takeDown:
             return textCommand("ifconfig %s down", ifName);
         default:
             return "";
@@ -116,7 +116,7 @@ void setIPv4GatewayForSuSe10(std::string const& ifName, std::string const& gatew
 
 void setInterfaceStatus(const std::string& ifName, unsigned int status) {
     log(kProgress) << "Status Value : " << status;
-    const bool isFailOver = status == LinkCode::switchedOver || status == LinkCode::switchedBack;
+    const bool isFailOver = status == LinkState::switchedOver || status == LinkState::switchedBack;
     if (contains(ifName, "bond") && isFailOver) {
         log(kProgress) << "Status updation for bonded interface. New status is: " << status;
         return;

@@ -1,7 +1,5 @@
 #include "network/lan_endpoint_node.h"
 
-#include <utility>
-
 #include "framework/netinfo/ip_interface_info.h"
 #include "mi/log.h"
 #include "mi/node_types.h"
@@ -11,19 +9,9 @@
 
 namespace IC {
 
-namespace {
+constinit const NodeClass lanEndPointClass{"~CLANEndPointNode"};
 
-void storeAddress(IPConfigNode& node, const CIPInfo& address) {
-    node.setProperty(IPConfigNode::interfaceName, {node.name(), true});
-    node.setProperty(IPConfigNode::interfaceLabel, {node.name(), true});
-    if (address.ipv6) {
-        node.setProperty(IPConfigNode::ipv6Address, {address.address, true});
-        node.setProperty(IPConfigNode::ipv6PrefixLength, {Number(address.prefixLength), true});
-    } else {
-        node.setProperty(IPConfigNode::ipv4Address, {address.address, true});
-        node.setProperty(IPConfigNode::subnetMask, {address.mask, true});
-    }
-}
+namespace {
 
 CLANEndPointNode* createLANEndPoint(NodeTree& tree, const std::string& name, unsigned int parent,
                                     unsigned int index) {
@@ -31,35 +19,15 @@ CLANEndPointNode* createLANEndPoint(NodeTree& tree, const std::string& name, uns
         new CLANEndPointNode(tree.drawNodeId(), parent, tree.miIds(), NodeType::lanEndPoint, index, name);
     tree.appendNode(node);
     node->setDescription("LAN EndPoint node");
-    node->setStatus(1);
-    node->setProperty(CLANEndPointNode::interfaceName, {name, true});
+    node->setStatus(kStatusGood);
+    constexpr unsigned int kInterfaceName = 108;
+    node->setProperty(kInterfaceName, {name, true});
     return node;
 }
 
 }  // namespace
 
 std::map<std::string, CEthernetPort*>* m_mapEthernetPorts = nullptr;
-
-CLANEndPointNode::CLANEndPointNode(unsigned int nodeId, unsigned int linkedId,
-                                   std::vector<unsigned int> miIds, unsigned int nodeType, unsigned int index,
-                                   std::string name)
-    : MutableNode(nodeId, linkedId, std::move(miIds), nodeType, index), name_(std::move(name)) {
-    const LogScope scope("CLANEndPointNode::CLANEndPointNode");
-}
-
-CLANEndPointNode::~CLANEndPointNode() {
-    const LogScope scope("CLANEndPointNode::~CLANEndPointNode");
-}
-
-Error CLANEndPointNode::getProperty(unsigned int id, PropertyValue& value) const {
-    const LogScope scope("CLANEndPointNode::getProperty");
-    return MutableNode::getProperty(id, value);
-}
-
-Error CLANEndPointNode::setProperty(const unsigned int& id, const PropertyValue& value) {
-    const LogScope scope("CLANEndPointNode::setProperty");
-    return MutableNode::setProperty(id, value);
-}
 
 bool getParentLANEndPointNode(std::string name, unsigned int& id) {
     const std::string entry = "In getParentLANEndPointNode " + name;
@@ -108,8 +76,8 @@ void NetworkBuilder::createIPConfigNodes(std::vector<CIPInfo*>* addresses, std::
         auto* config = tree_.makeNode<IPConfigNode>(parent, NodeType::ipConfiguration, ++index, name);
         tree_.appendNode(config);
         config->setDescription("IP Configuration");
-        config->setStatus(1);
-        storeAddress(*config, *address);
+        config->setStatus(kStatusGood);
+        config->fill(*address);
         config->complete(this);
     }
 }

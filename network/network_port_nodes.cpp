@@ -94,7 +94,7 @@ MutableNode* NetworkBuilder::createIPConfig(const ListedInterface& interface, co
     tree_.appendNode(config);
     log(kProgress) << "Size of Inteface  " << static_cast<unsigned int>(walk.bridgeMemberCount());
     config->setDescription(interface.isBridge ? "Bridge" : "IP Configuration");
-    fillIPConfig(*config, walk.host(), settings);
+    config->fill(walk.host(), settings);
     config->complete(this);
     return config;
 }

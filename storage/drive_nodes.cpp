@@ -10,6 +10,19 @@ namespace IC {
 
 namespace {
 
+namespace DriveId {
+enum : unsigned int {
+    driveSize = 37,     ///< number, 64 bits: thousands of bytes
+    devicePath = 89,    ///< text
+    healthState = 123,  ///< number: always 1
+};
+}  // namespace DriveId
+
+constexpr Property kDriveProperties[] = {
+    {DriveId::healthState, healthOf},
+};
+static_assert(idsAscend(kDriveProperties));
+
 /// Disks proper. Software RAID and mapper devices are listed like disks but are none.
 bool isDrive(const std::string& device) {
     return contains(device, "/dev/sd") || contains(device, "/dev/hd");
@@ -25,11 +38,11 @@ unsigned long long thousandsOfBytes(const std::string& text) {
 
 void fillDrive(HardDriveNode& node, const std::string& sizeInBytes) {
     const std::string& device = node.name();
-    node.setProperty(HardDriveNode::devicePath, PropertyValue(device, true));
-    node.setProperty(HardDriveNode::driveSize, PropertyValue(Number(thousandsOfBytes(sizeInBytes)), true));
+    node.setProperty(DriveId::devicePath, PropertyValue(device, true));
+    node.setProperty(DriveId::driveSize, PropertyValue(Number(thousandsOfBytes(sizeInBytes)), true));
     PropertyValue health;
-    node.getProperty(HardDriveNode::healthState, health);
-    node.setProperty(HardDriveNode::healthState, health);
+    node.getProperty(DriveId::healthState, health);
+    node.setProperty(DriveId::healthState, health);
     if (health == PropertyValue(Number(1U), true)) {
         log(kProgress) << "Hard Drive Node::Normal " << device;
     }
@@ -64,6 +77,8 @@ constexpr StorageKind kDriveKind = {
 };
 
 }  // namespace
+
+constinit const NodeClass hardDriveClass{"~HardDriveNode", kDriveProperties};
 
 void StorageBuilder::createHardDriveNodes(bool update) {
     const LogScope scope;

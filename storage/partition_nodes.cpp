@@ -11,6 +11,20 @@ namespace IC {
 
 namespace {
 
+namespace PartitionId {
+enum : unsigned int {
+    devicePath = 89,        ///< text
+    partitionName = 108,    ///< text: the device path again
+    partitionBlocks = 112,  ///< number, 64 bits: blocks of 1024 bytes
+    healthState = 123,      ///< number: always 1
+};
+}  // namespace PartitionId
+
+constexpr Property kPartitionProperties[] = {
+    {PartitionId::healthState, healthOf},
+};
+static_assert(idsAscend(kPartitionProperties));
+
 std::string firstToken(const std::string& line) {
     const std::string text = trimStart(line);
     return text.substr(0, text.find(' '));
@@ -31,8 +45,8 @@ std::unique_ptr<MutableNode> buildPartition(NodeTree& tree, const std::string& l
         tree.makeNode<DiskPartition>(tree.fixed.diskController, NodeType::partition, index, device));
     node->setStatus(kStatusGood);
     node->setDescription("Partition");
-    node->setProperty(DiskPartition::devicePath, PropertyValue(device, true));
-    node->setProperty(DiskPartition::partitionName, PropertyValue(device, true));
+    node->setProperty(PartitionId::devicePath, PropertyValue(device, true));
+    node->setProperty(PartitionId::partitionName, PropertyValue(device, true));
     const auto answer = askAboutLine(formatCommand("echo \"%s\" |  tr -s '*' ' '  | cut -d ' ' -f4", line));
     if (!answer) {
         return nullptr;
@@ -41,7 +55,7 @@ std::unique_ptr<MutableNode> buildPartition(NodeTree& tree, const std::string& l
     log(kProgress) << "Partition blocksize : " << size;
     const unsigned long long number = blocks(size);
     log(kProgress) << "Partition blocksize in Uint64 : " << number;
-    node->setProperty(DiskPartition::partitionBlocks, PropertyValue(Number(number), true));
+    node->setProperty(PartitionId::partitionBlocks, PropertyValue(Number(number), true));
     return node;
 }
 
@@ -53,6 +67,8 @@ constexpr StorageKind kPartitionKind = {
 };
 
 }  // namespace
+
+constinit const NodeClass diskPartitionClass{"~DiskPartition", kPartitionProperties};
 
 void StorageBuilder::createPartitionNodes(bool update) {
     const LogScope scope;

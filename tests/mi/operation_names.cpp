@@ -13,6 +13,7 @@ using Names = std::map<std::string, std::set<std::string>>;
 // What the rooms' operations are made of: nobody outside calls it, and no log line carries its name.
 const std::set<std::string> kHelpers = {
     "mi/command.h",
+    "mi/host_node.h",
     "mi/line_file.h",
     "mi/log.h",
     "mi/property_table.h",
@@ -77,6 +78,11 @@ private:
     void open() {
         static const std::regex scope(
             R"re(^\s*(template <.*>\s*)?(namespace|class|struct|extern)\b[^(=]*$)re");
+        static const std::regex nodeClass(R"re(class (\w+) :+ public NodeOf<)re");
+        if (std::smatch node; std::regex_search(statement_, node, nodeClass)) {
+            names_[node[1]].insert(sourceOf(room_));
+            names_['~' + node[1].str()].insert(sourceOf(room_));
+        }
         if (std::regex_search(statement_, scope)) {
             isPublic_.push_back(isPublic_.back() && statement_.find("class ") == std::string::npos);
             statement_.clear();
