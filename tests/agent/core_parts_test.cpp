@@ -251,25 +251,27 @@ TEST(Facts, KeepTheLastValueOfWhatWasCutOff) {
     EXPECT_FALSE(facts.known(node, 5).stale);
 }
 
-TEST(Facts, AnOlderAnswerThatComesLateChangesNothing) {
-    const IC::MutableNode node(7, 0, {1}, 40, 0);
+/// A node whose property 5 has answered "young" to a read that began a second after `earlier`.
+class FactsOfAYoungAnswer : public testing::Test {
+protected:
+    FactsOfAYoungAnswer() {
+        facts.meet(7);
+        Reading young{5, {}, IC::PropertyValue("young", true), {}};
+        facts.judge(node, young, earlier + 1s);
+    }
+
+    const IC::MutableNode node{7, 0, {1}, 40, 0};
+    const Facts::Clock::time_point earlier = Facts::Clock::now();
     Facts facts;
-    facts.meet(7);
-    const auto earlier = Facts::Clock::now();
-    Reading young{5, {}, IC::PropertyValue("young", true), {}};
-    facts.judge(node, young, earlier + 1s);
+};
+
+TEST_F(FactsOfAYoungAnswer, DoNotChangeByAnOlderAnswerThatComesLate) {
     Reading old{5, {}, IC::PropertyValue("old", true), {}};
     facts.judge(node, old, earlier);
     EXPECT_EQ(static_cast<std::string>(facts.known(node, 5).value), "young");
 }
 
-TEST(Facts, AnOlderReadThatIsCutOffLeavesAYoungerAnswerGood) {
-    const IC::MutableNode node(7, 0, {1}, 40, 0);
-    Facts facts;
-    facts.meet(7);
-    const auto earlier = Facts::Clock::now();
-    Reading young{5, {}, IC::PropertyValue("young", true), {}};
-    facts.judge(node, young, earlier + 1s);
+TEST_F(FactsOfAYoungAnswer, StayGoodWhenAnOlderReadIsCutOff) {
     Reading cut{5, {}, {}, "timed out", false, true};
     facts.judge(node, cut, earlier);
     EXPECT_EQ(static_cast<std::string>(cut.value), "young");

@@ -43,15 +43,3 @@ corvista_test(network_ports SOURCES
   LIBRARIES plugin_code test_support)
 # The links of a real kernel are asked with our own classic tools too.
 add_dependencies(network_queries_test corvista-hosttools)
-
-# Compiled by themselves in every preset: they have names of their own for the same files and recordings.
-set_source_files_properties(
-  network/ipv4_writer_test.cpp
-  network/ipv6_writer_test.cpp
-  network/recorded_addresses_test.cpp
-  network/recorded_ethtool_test.cpp
-  network/recorded_ifconfig_test.cpp
-  network/routes_file_test.cpp
-  network/saved_settings_test.cpp
-  network/teaming_queries_test.cpp
-  PROPERTIES SKIP_UNITY_BUILD_INCLUSION ON)
