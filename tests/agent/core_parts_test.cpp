@@ -308,13 +308,21 @@ public:
     }
 };
 
-TEST(Announcer, TellsOfANodeOnceWhoeverSeesItFirst) {
+/// An announcer that knows of one port, eth0.
+class Announcer : public testing::Test {
+protected:
+    Announcer() {
+        ports.addPort("eth0");
+        announcer.takeStock(ports.holdAll());
+    }
+
     Ports ports;
     EventLog log;
     Facts facts;
-    cvagent::Announcer announcer(log, facts);
-    ports.addPort("eth0");
-    announcer.takeStock(ports.holdAll());
+    cvagent::Announcer announcer{log, facts};
+};
+
+TEST_F(Announcer, TellsOfANodeOnceWhoeverSeesItFirst) {
     announcer.announceNew(ports);
     EXPECT_EQ(log.last(), 0U);
     const IC::MutableNode* const made = ports.addPort("eth1");
@@ -327,13 +335,7 @@ TEST(Announcer, TellsOfANodeOnceWhoeverSeesItFirst) {
     EXPECT_EQ(log.last(), 2U);
 }
 
-TEST(Announcer, AnAlertTellsTheStateBeforeAndAfter) {
-    Ports ports;
-    EventLog log;
-    Facts facts;
-    cvagent::Announcer announcer(log, facts);
-    ports.addPort("eth0");
-    announcer.takeStock(ports.holdAll());
+TEST_F(Announcer, AnAlertTellsTheStateBeforeAndAfter) {
     for (const auto& [code, message] : std::vector<std::pair<unsigned int, std::string>>{
              {12, "NIC is Offline "}, {1, "NIC is Online "}, {32, "NIC has Switched Over "}}) {
         announcer.hear(

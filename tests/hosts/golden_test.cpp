@@ -91,8 +91,24 @@ std::string logOfTheStart(const std::string& log) {
     return kept;
 }
 
-Seen look(FakeHost& host, const std::string& name, bool json, const std::string& commands) {
+/// Of forty network cards of one kind five, eth1 and eth10 among them: hundreds of shells for each of the
+/// others would tell nothing more.
+void leaveOutMostCards(FakeHost& host) {
+    static const std::regex others(" *eth([3-9]|1[1-9]|[2-9][0-9]):[^\n]*\n");
+    const std::string devices = host.read("/proc/net/dev").value_or("");
+    if (std::ranges::count(devices, '\n') > 40) {
+        host.file("/proc/net/dev", std::regex_replace(devices, others, ""));
+    }
+}
+
+using HostChange = void (*)(FakeHost&);
+
+Seen look(FakeHost& host, const std::string& name, bool json, const std::string& commands,
+          HostChange changeHost) {
     host.copyTree(name);
+    if (changeHost != nullptr) {
+        changeHost(host);
+    }
     std::vector<std::string> words = {
         CVAGENT_PROGRAM, "--host-tools",       "native",  "--commands", commands,
         "--plugin",      CORVISTA_PLUGIN_FILE, "--trace", "/var/trace", "tree"};
@@ -105,12 +121,13 @@ Seen look(FakeHost& host, const std::string& name, bool json, const std::string&
     return {lasting(run.out), logOfTheStart(host.read("/var/trace").value_or(""))};
 }
 
-Seen seenOn(const std::string& name, bool json, const std::string& commands) {
+Seen seenOn(const std::string& name, bool json, const std::string& commands,
+            HostChange changeHost = nullptr) {
     const HandedOut tree;
     const HandedOut log;
     inFakeHost(
         [&](FakeHost& host) {
-            const Seen seen = look(host, name, json, commands);
+            const Seen seen = look(host, name, json, commands, changeHost);
             tree.set(seen.tree);
             log.set(seen.log);
         },
@@ -160,8 +177,8 @@ class RecordedHost : public testing::TestWithParam<std::string> {};
 
 /// The one test that keeps real shells for all of a host's commands.
 TEST_P(RecordedHost, IsTheSameThroughShells) {
-    const Seen direct = seenOn(GetParam(), true, "direct");
-    const Seen shells = seenOn(GetParam(), true, "shell");
+    const Seen direct = seenOn(GetParam(), true, "direct", leaveOutMostCards);
+    const Seen shells = seenOn(GetParam(), true, "shell", leaveOutMostCards);
     EXPECT_EQ(direct.tree, shells.tree);
     EXPECT_EQ(direct.log, shells.log);
     EXPECT_THAT(direct.log, testing::HasSubstr("initialize: exit"));
