@@ -313,6 +313,13 @@ HOST_TEST(NetworkMonitor, MayBeStoppedByTheCallbackThatItCalls) {
 
 HOST_TEST(NetworkMonitor, StartedAgainIsNotTakenForTheOneThatEnded) {
     Interfaces interfaces;
+    LogCapture capture;
+    Waits waits;
+    // A stop has been asked for when it sleeps: let the thread end before anybody waits for that.
+    waits.whenWeWait([&](double seconds) {
+        EXPECT_TRUE(seconds == 0 ||
+                    eventually([&] { return capture.messages().back() == "NetworkMonitor: run exit"; }));
+    });
     for (int start = 0; start < 2; ++start) {
         interfaces.mi().enableIndications();
         EXPECT_FALSE(IC::OsHwMITestAccess::networkMonitorEnded(interfaces.mi()))
