@@ -136,18 +136,18 @@ HOST_TEST(IPConfigNode, AnswersWhatTheHostSaysNow) {
 
 HOST_TEST(IPConfigNode, PrefersAGatewaySetByHandToAnAdvertisedOne) {
     OneNode interface(host, "ipv6-only");
-    EXPECT_EQ(live(*interface.config("eth0"), 101), text("2001:db8:6::1"));
+    EXPECT_EQ(live(*interface.emptyConfig("eth0"), 101), text("2001:db8:6::1"));
 }
 
 HOST_TEST(IPConfigNode, OnAHostWithoutADefaultRouteShowsTheOnLinkMarkAsItsGateway) {
     OneNode interface(host, "suse-two-nics");
     host.tool("route -n", "192.0.2.0 0.0.0.0 255.255.255.0 U 0 0 0 eth0\n");
-    EXPECT_EQ(live(*interface.config("eth0"), 100), text("0.0.0.0"));
+    EXPECT_EQ(live(*interface.emptyConfig("eth0"), 100), text("0.0.0.0"));
 }
 
 HOST_TEST(IPConfigNode, WithoutAnyAddressReadsZerosAndIPv6AloneReadsEmpty) {
     OneNode interface(host, "ipv6-only");
-    const auto config = interface.config("eth0");
+    const auto config = interface.emptyConfig("eth0");
     EXPECT_EQ(live(*config, 25), text(""));
     EXPECT_EQ(live(*config, 26), text(""));
     EXPECT_EQ(live(*config, 28), enumeration(5));
@@ -159,7 +159,7 @@ HOST_TEST(IPConfigNode, WithoutAnyAddressReadsZerosAndIPv6AloneReadsEmpty) {
 
 HOST_TEST(IPConfigNode, KeepsAnAddressWhoseMaskCannotBeRead) {
     OneNode interface(host, "suse-two-nics");
-    const auto config = interface.config("eth0");
+    const auto config = interface.emptyConfig("eth0");
     shell_stub::answerWith([](const std::string& command) -> std::optional<std::string> {
         const bool isNone = command.find("cut -d: -f4") != command.npos || command.starts_with("ip -6");
         return isNone ? std::optional<std::string>("") : std::nullopt;
@@ -174,7 +174,7 @@ HOST_TEST(IPConfigNode, KeepsAnAddressWhoseMaskCannotBeRead) {
 
 HOST_TEST(IPConfigNode, AsksWithTheseCommands) {
     OneNode interface(host, "suse-two-nics");
-    const auto config = interface.config("eth0");
+    const auto config = interface.emptyConfig("eth0");
     const IC::IPConfigNode bond(900, 1, {1}, 29, 1, "bond0");
     const CommandLines commands;
     live(*config, 97);
@@ -190,7 +190,7 @@ HOST_TEST(IPConfigNode, AsksWithTheseCommands) {
 
 HOST_TEST(IPConfigNode, LeavesTheAddressTypeAloneWhenThereIsNone) {
     OneNode interface(host, "ipv6-only");
-    const auto config = interface.config("eth0");
+    const auto config = interface.emptyConfig("eth0");
     host.tool("ifconfig eth0", "eth0 Link encap:Ethernet\n");
     PropertyValue value("untouched", true);
     EXPECT_EQ(config->getProperty(28, value).getStatus(), 0);
@@ -199,13 +199,13 @@ HOST_TEST(IPConfigNode, LeavesTheAddressTypeAloneWhenThereIsNone) {
 
 HOST_TEST(IPConfigNode, IsDownWithTheCableOutAndUpWithALink) {
     OneNode interface(host, "suse-two-nics");
-    EXPECT_EQ(live(*interface.config("eth0"), 123), number(1));
-    EXPECT_EQ(live(*interface.config("eth1"), 123), number(12));
+    EXPECT_EQ(live(*interface.emptyConfig("eth0"), 123), number(1));
+    EXPECT_EQ(live(*interface.emptyConfig("eth1"), 123), number(12));
 }
 
 HOST_TEST(IPConfigNode, OfABondIsUpWhenIfconfigListsIt) {
     OneNode interface(host, "bond-two-members");
-    const auto config = interface.config("bond0");
+    const auto config = interface.emptyConfig("bond0");
     EXPECT_EQ(live(*config, 123), number(1));
     host.tool("ifconfig", "lo Link encap:Local Loopback\n");
     EXPECT_EQ(live(*config, 123), number(12));
@@ -216,7 +216,7 @@ HOST_TEST(IPConfigNode, OfABondIsUpWhenIfconfigListsIt) {
 
 HOST_TEST(IPConfigNode, HasAnEmptyNameWhenHostnamePrintsNothing) {
     OneNode interface(host, "suse-two-nics");
-    const auto config = interface.config("eth0");
+    const auto config = interface.emptyConfig("eth0");
     host.tool("hostname -s", "");
     host.tool("hostname -d", "");
     EXPECT_EQ(live(*config, 97), text(""));
@@ -228,7 +228,7 @@ HOST_TEST(IPConfigNode, HasAnEmptyNameWhenHostnamePrintsNothing) {
 HOST_TEST(IPConfigNode, AnswersAnUnknownIdAsTheFrameworkDoes) {
     OneNode interface(host, "suse-two-nics");
     PropertyValue value("untouched", true);
-    const IC::Error error = interface.config("eth0")->getProperty(999, value);
+    const IC::Error error = interface.emptyConfig("eth0")->getProperty(999, value);
     EXPECT_NE(error.getStatus(), 0);
     EXPECT_EQ(value, text("untouched"));
 }

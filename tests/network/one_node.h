@@ -27,8 +27,12 @@ public:
         host_.clearCalls();
         return node;
     }
+    /// One whose store is empty: enough for what is read live.
+    static std::shared_ptr<IC::IPConfigNode> emptyConfig(const std::string& name) {
+        return make<IC::IPConfigNode>(29, name);
+    }
     std::shared_ptr<IC::IPConfigNode> config(const std::string& name) const {
-        const auto node = make<IC::IPConfigNode>(29, name);
+        const auto node = emptyConfig(name);
         std::map<std::string, std::string> settings;
         IC::fillIPConfig(*node, {"linux-a", "example.com", {"192.0.2.53", "192.0.2.54"}, {"example.com"}},
                          settings);
