@@ -104,21 +104,22 @@ Pool::~Pool() {
 }
 
 void Pool::submit(unsigned int lane, const void* batch, std::function<void()> work) {
-    std::unique_lock lock(state_->guard);
-    if (state_->idle <= state_->queue.size() && state_->threads.size() < state_->most) {
+    const std::shared_ptr<State> state = state_;  // the work may end the pool before this returns
+    std::unique_lock lock(state->guard);
+    if (state->idle <= state->queue.size() && state->threads.size() < state->most) {
         try {
-            state_->threads.emplace_back([state = state_] { state->serve(); });
+            state->threads.emplace_back([state] { state->serve(); });
         } catch (const std::system_error&) {
-            if (state_->threads.empty()) {
+            if (state->threads.empty()) {
                 lock.unlock();
                 work();
                 return;
             }
         }
     }
-    state_->queue.push_back({lane, batch, std::move(work)});
+    state->queue.push_back({lane, batch, std::move(work)});
     lock.unlock();
-    state_->changed.notify_one();
+    state->changed.notify_one();
 }
 
 void Pool::drop(const void* batch) {
