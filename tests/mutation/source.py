@@ -84,49 +84,54 @@ class Source:
     def _read_declaration(self, at, end, scope):
         """Reads one declaration of a namespace or a class; gives what follows it."""
         first, named = at, ""
-        heads = set()  # words before the first bracket
+        heads = set()  # the words so far, outside of brackets
         while at < end:
-            token = self.tokens[at]
-            if token.text == ";":
+            text = self.tokens[at].text
+            if text == ";":
                 self._note(scope, named, first, at + 1)
                 return at + 1
-            if token.text == "template":
-                at = self._behind_angles(at + 1)
-                continue
-            if token.text == ":" and self.tokens[at - 1].text in ("public", "private", "protected"):
+            if text == ":" and self.tokens[at - 1].text in ("public", "private", "protected"):
                 return at + 1
-            if token.text == "{" and not named and "=" not in heads:
+            if text == "{" and not named and "=" not in heads:
                 return self._read_braces(first, at, heads, scope)
-            if token.text == "{":
-                at = self.closing.get(at, end) + 1
-                if "(" not in heads:
-                    continue  # a variable's values; the semicolon follows
+            if text == "{" and "(" in heads:  # a function's body; a variable goes on to its semicolon
+                at = self._behind(at)
                 self._note(scope, named, first, at)
                 return at
-            if token.text == "(" and not named and "=" not in heads:
-                named = self._name_before(at)
-                heads.add("(")
-                at = self._behind_initialisers(self.closing.get(at, end) + 1, end) if named else self.closing.get(at, end) + 1
-                continue
-            if token.text in ("=", "[") and not named and self.tokens[at - 1].kind == "name":
-                named = self._name_before(at)
-                if token.text == "=":
-                    heads.add("=")
-            if token.text == "<" and not named and self.tokens[at - 1].kind == "name":
-                at = self._behind_angles(at)
-                continue
-            if token.text == "operator":
-                named = "operator" + self.tokens[at + 1].text
-                at += 2
-                while at < end and self.tokens[at].text != "(" or self.tokens[at + 1].text == ")" and self.tokens[at + 2].text == "(":
-                    at += 1
-                named = self._qualifier_before(first, named, at)
-                heads.add("(")
-                at = self._behind_initialisers(self.closing.get(at, end) + 1, end)
-                continue
-            heads.add(token.text)
-            at = self.closing[at] + 1 if token.text in PAIRS and at in self.closing else at + 1
+            at, named = self._step(at, end, named, heads)
         return end
+
+    def _step(self, at, end, named, heads):
+        """One step on within a declaration, and its name once that is known."""
+        text = self.tokens[at].text
+        if text == "template":
+            return self._behind_angles(at + 1), named
+        if text == "operator":
+            heads.add("(")
+            return self._read_operator(at, end)
+        if not named and "=" not in heads:
+            if text == "(":
+                heads.add("(")
+                named = self._name_before(at)
+                return self._behind_initialisers(self._behind(at), end) if named else self._behind(at), named
+            if self.tokens[at - 1].kind == "name":
+                if text == "<":
+                    return self._behind_angles(at), named
+                if text in ("=", "["):
+                    named = self._name_before(at)
+        heads.add(text)
+        return self._behind(at), named
+
+    def _read_operator(self, at, end):
+        named = self._qualified(at, "operator" + self.tokens[at + 1].text)
+        at += 2  # of operator() its own brackets are no parameters
+        while at < end and self.tokens[at].text != "(":
+            at += 1
+        return self._behind_initialisers(self._behind(at), end), named
+
+    def _behind(self, at):
+        """What follows a token, or the whole bracket that it opens."""
+        return self.closing.get(at, at) + 1
 
     def _read_braces(self, first, brace, heads, scope):
         """What is in braces without a name and a parameter list before them: a scope or the values of a variable."""
@@ -136,10 +141,10 @@ class Source:
             self._read_scope(brace + 1, end, scope)
             return end + 1
         if heads & {"class", "struct", "union"}:
-            words = [t.text for t in self.tokens[first:brace]]
-            key = next(i for i, word in enumerate(words) if word in ("class", "struct", "union"))
-            names = [w for w in words[key + 1:words.index(":") if ":" in words[key:] else None] if re.match(r"\w", w) and w != "final"]
-            named = names[-1] if names else ""
+            words = [token.text for token in self.tokens[first:brace]]
+            words = words[next(i for i, word in enumerate(words) if word in ("class", "struct", "union")) + 1:]
+            bases = words.index(":") if ":" in words else len(words)
+            named = ([word for word in words[:bases] if re.match(r"\w", word) and word != "final"] or [""])[-1]
             self._note(scope, named, first, end + 1)
             self._read_scope(brace + 1, end, [*scope, named] if named else scope)
             return end + 1
@@ -151,7 +156,7 @@ class Source:
         while at < len(self.tokens):
             text = self.tokens[at].text
             depth += (text == "<") + 2 * (text == "<<") - (text == ">")
-            at = self.closing.get(at, at) + 1 if text in PAIRS else at + 1
+            at = self._behind(at)
             if depth <= 0:
                 return at
         return at
@@ -166,7 +171,7 @@ class Source:
             if text == "=":
                 return at
             colon = colon or text == ":"
-            at = self.closing.get(at, at) + 1 if text in PAIRS else at + 1
+            at = self._behind(at)
         return at
 
     def _name_before(self, at):
@@ -177,12 +182,6 @@ class Source:
         if self.tokens[at - 1].text == "~":
             at, name = at - 1, "~" + name
         return self._qualified(at, name)
-
-    def _qualifier_before(self, first, named, at):
-        for index in range(first, at):
-            if self.tokens[index].text == "operator":
-                return self._qualified(index, named)
-        return named
 
     def _qualified(self, at, name):
         while at >= 2 and self.tokens[at - 1].text == "::" and self.tokens[at - 2].kind == "name":

@@ -66,11 +66,12 @@ class Workshop:
         return result.stdout[-3000:] if result.returncode else ""
 
     def usual_seconds(self, program):
-        """How long a test program takes when nothing is wrong."""
-        start = time.monotonic()
-        if failed := self.test(program, UNPLANTED):
-            raise ListError(f"without a defect {program}_test fails already: {failed}")
-        return time.monotonic() - start
+        """How long a test program takes when nothing is wrong. On a busy machine one may fail once; twice is the tree's fault."""
+        for _ in range(2):
+            start = time.monotonic()
+            if not (failed := self.test(program, UNPLANTED)):
+                return time.monotonic() - start
+        raise ListError(f"without a defect {program}_test fails already: {failed}")
 
     def test(self, program, longest, only=""):
         """What failed first; nothing when all tests pass."""
