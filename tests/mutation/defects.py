@@ -30,6 +30,11 @@ class Tree:
         files = [path] if path.is_file() else sorted(file for file in path.rglob("*") if file.suffix in (".cpp", ".h"))
         return [self.source(file) for file in files]
 
+    def rooms(self):
+        """The sources of all folders with sources, but for the tests' and what is built."""
+        folders = [path for path in sorted(self.folder.iterdir()) if path.is_dir() and path.name[0] != "."]
+        return [source for path in folders if path.name not in ("bench", "build", "tests") for source in self.below(path)]
+
     def split(self, place):
         """A place's folder or file, and the name that is looked for there."""
         path, name = self.folder, place
@@ -37,6 +42,17 @@ class Tree:
             first, _, name = name.partition("/")
             path = path / first
         return path, name
+
+
+def matches_in(sources, name, pattern):
+    """The matches in the definitions of that name by where they begin; and whether there are any such definitions."""
+    matches, is_there = {}, not name
+    for source in sources:
+        for first, last in source.ranges(name):
+            is_there = True
+            for match in pattern.matches(source, first, last):
+                matches[source, match.first] = match
+    return matches, is_there
 
 
 class Defect:
@@ -69,12 +85,11 @@ class Defect:
             raise ListError(f"{self.where} {self.place}: nothing to look for")
         path, name = tree.split(self.place)
         sources = tree.below(path) if path != tree.folder else []
-        matches, is_there = {}, not name
-        for source in sources:
-            for first, last in source.ranges(name):
-                is_there = True
-                for match in pattern.matches(source, first, last):
-                    matches[source, match.first] = match
+        matches, is_there = matches_in(sources, name, pattern)
+        if not is_there:  # it has moved to another room, or is called otherwise
+            matches, is_there = matches_in(tree.rooms(), name, pattern)
+            if not is_there:
+                matches, _ = matches_in(sources, "", pattern)
         if len(matches) == 1:
             (source, _), match = next(iter(matches.items()))
             return source, match
@@ -86,7 +101,7 @@ class Defect:
                              for source, first in list(found)[:5]) or "nowhere there"
 
         shown = " ".join(line.strip() for line in self.before)
-        if matches:
+        if matches and is_there:
             return f"{shown}\n    stands {len(matches)} times: {stands(matches)}"
         elsewhere = [(source, match.first) for source in sources
                      for match in self.pattern.matches(source, 0, len(source.tokens))]

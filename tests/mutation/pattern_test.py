@@ -77,8 +77,9 @@ class Patterns(unittest.TestCase):
 class Lists(unittest.TestCase):
     def found(self, place, *before):
         with tempfile.TemporaryDirectory() as folder:
-            (Path(folder) / "room").mkdir()
-            (Path(folder) / "room/code.cpp").write_text(CODE)
+            for room, code in (("room", CODE), ("other", "int only() { ++count; return one; }"), ("tests", "int gone() { --count; }")):
+                (Path(folder) / room).mkdir()
+                (Path(folder) / room / "code.cpp").write_text(code)
             defect = Defect("room", "room.txt:1", f"{place}: kind")
             defect.before = list(before)
             return defect.found(Tree(Path(folder)))
@@ -86,13 +87,17 @@ class Lists(unittest.TestCase):
     def test_all_definitions_of_a_name_are_looked_at(self):
         self.assertEqual(self.found("room/sum", "return one;")[0].file, "room/code.cpp")
 
+    def test_what_has_moved_or_has_another_name_is_found(self):
+        self.assertEqual(self.found("room/only", "return one;")[0].file, "other/code.cpp")
+        self.assertEqual(self.found("room/gone", "--count;")[0].file, "room/code.cpp")
+
     def test_what_does_not_stand_once_is_told_with_where_it_stands(self):
         for place, before, words in (("room/sum", "return", "stands 4 times: room/code.cpp:13 in sum"),
-                                     ("room/gone", "--count;", "nothing is called gone.*\n.*room/code.cpp:9 in Holder::~Holder"),
+                                     ("room/gone", "return", "nothing is called gone.*\n.*room/code.cpp:7 in made"),
+                                     ("room/only", "--count;", "does not have.*\n.*room/code.cpp:9 in Holder::~Holder"),
                                      ("room/sum", "--count;", "does not have.*\n.*room/code.cpp:9"),
                                      ("room/sum", "no such;", "nowhere"),
                                      ("room", "++count; --count", "nowhere"),
-                                     ("sum", "return one;", "nothing is called"),
                                      ("room/sum", "// a comment", "nothing to look for")):
             with self.assertRaisesRegex(ListError, words, msg=place):
                 self.found(place, before)
