@@ -100,7 +100,7 @@ class Defect:
             return ", ".join(f"{source.file}:{source.line(first)} in {source.place_of(first) or 'no definition'}"
                              for source, first in list(found)[:5]) or "nowhere there"
 
-        shown = " ".join(line.strip() for line in self.before)
+        shown = self.shown()
         if matches and is_there:
             return f"{shown}\n    stands {len(matches)} times: {stands(matches)}"
         elsewhere = [(source, match.first) for source in sources
@@ -108,13 +108,16 @@ class Defect:
         missing = f"does not have: {shown}" if is_there else f"nothing is called {name}; looked for: {shown}"
         return f"{missing}\n    which stands {stands(elsewhere)}"
 
+    def shown(self):
+        return " ".join(line.strip() for line in self.before)
+
     def planted(self, tree):
         """The file it is in, and the file's text with the defect."""
         source, match = self.found(tree)
         return source.file, self.pattern.planted(source, match)
 
     def __str__(self):
-        return f"{self.where} {self.place}: {self.kind}: {self.before[-1].strip()[:70]}"
+        return f"{self.where} {self.place}: {self.kind}: {self.shown()[:70]}"
 
 
 def read_list(path):
