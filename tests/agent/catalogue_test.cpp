@@ -15,16 +15,16 @@ using testing::ElementsAre;
 
 std::vector<unsigned int> ids(NodeType type, bool (*wanted)(const Property&)) {
     std::vector<unsigned int> found;
-    for (const Property& row : propertiesOf(static_cast<unsigned int>(type))) {
-        if (wanted(row)) {
-            found.push_back(row.id);
+    for (const Property* row : propertiesOf(static_cast<unsigned int>(type))) {
+        if (wanted(*row)) {
+            found.push_back(row->id);
         }
     }
     return found;
 }
 
 std::vector<unsigned int> readable(NodeType type) {
-    return ids(type, [](const Property& row) { return row.readable(); });
+    return ids(type, [](const Property& row) { return row.readable; });
 }
 
 std::vector<unsigned int> writable(NodeType type) {
@@ -35,7 +35,7 @@ std::vector<Property> allRows() {
     std::vector<Property> rows;
     for (const cvagent::NodeClass& nodeClass : cvagent::nodeClasses()) {
         const auto own = propertiesOf(static_cast<unsigned int>(nodeClass.type));
-        rows.insert(rows.end(), own.begin(), own.end());
+        std::ranges::transform(own, std::back_inserter(rows), [](const Property* row) { return *row; });
     }
     return rows;
 }
@@ -68,7 +68,7 @@ TEST(Catalogue, IdsAscendInEveryClass) {
     for (const cvagent::NodeClass& nodeClass : cvagent::nodeClasses()) {
         const auto rows = propertiesOf(static_cast<unsigned int>(nodeClass.type));
         for (std::size_t i = 1; i < rows.size(); ++i) {
-            EXPECT_LT(rows[i - 1].id, rows[i].id) << nodeClass.name;
+            EXPECT_LT(rows[i - 1]->id, rows[i]->id) << nodeClass.name;
         }
     }
 }
@@ -119,7 +119,7 @@ TEST(Catalogue, WhatIsWritableSaysWhatItAccepts) {
 TEST(Catalogue, ARowIsFoundByNumberAndByNameInAnyCase) {
     const auto computer = static_cast<unsigned int>(NodeType::computer);
     for (const std::string text : {"115", "OwnerContact", "ownercontact", "OWNERCONTACT"}) {
-        const auto row = cvagent::findProperty(computer, text);
+        const Property* row = cvagent::findProperty(computer, text);
         ASSERT_TRUE(row) << text;
         EXPECT_EQ(row->id, 115U);
     }

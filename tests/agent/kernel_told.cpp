@@ -97,7 +97,10 @@ bool KernelTold::isVisited(const std::string& name) const {
     if (info.value("info_slave_kind", "") == "bridge") {
         return false;
     }
-    return kind(name) == "bridge" || contains(name, "eth") || contains(name, "bond") || contains(name, "usb");
+    const std::string of = kind(name);
+    const bool wired = of == "veth" || of == "vlan" || of == "bond";
+    const bool named = contains(name, "eth") || contains(name, "bond") || contains(name, "usb");
+    return of == "bridge" || wired || (named && of != "vxlan");
 }
 
 bool KernelTold::isPort(const std::string& name) const {

@@ -91,11 +91,23 @@ std::string logOfTheStart(const std::string& log) {
     return kept;
 }
 
+/// Of all others the tools are the host's own, as they were recorded.
+bool needsAdapters(const std::string& name) {
+    return name == "todays-names";
+}
+
 Seen look(FakeHost& host, const std::string& name, bool json, const std::string& commands) {
     host.copyTree(name);
-    std::vector<std::string> words = {
-        CVAGENT_PROGRAM, "--host-tools",       "native",  "--commands", commands,
-        "--plugin",      CORVISTA_PLUGIN_FILE, "--trace", "/var/trace", "tree"};
+    std::vector<std::string> words = {CVAGENT_PROGRAM,
+                                      "--host-tools",
+                                      needsAdapters(name) ? "auto" : "native",
+                                      "--commands",
+                                      commands,
+                                      "--plugin",
+                                      CORVISTA_PLUGIN_FILE,
+                                      "--trace",
+                                      "/var/trace",
+                                      "tree"};
     if (json) {
         words.emplace_back("--json");
     }

@@ -4,8 +4,7 @@
 #include <thread>
 
 #include "framework/qx/thread.h"
-#include "mi/globals.h"
-#include "mi/os_hw_mi.h"
+#include "oshwmi/os_hw_mi.h"
 #include "tests/indications/heard.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/texts_are.h"

@@ -1,5 +1,6 @@
 corvista_test(indications SOURCES
   indications/alerts_test.cpp
+  indications/comparison_test.cpp
   indications/kernel_links_test.cpp
   indications/link_states_test.cpp
   indications/network_monitor_test.cpp

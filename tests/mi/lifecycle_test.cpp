@@ -8,7 +8,7 @@
 #include "mi/disk_snapshot.h"
 #include "mi/globals.h"
 #include "mi/my_process.h"
-#include "mi/os_hw_mi.h"
+#include "oshwmi/os_hw_mi.h"
 #include "tests/support/command_lines.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"

@@ -4,6 +4,7 @@
 #include <gmock/gmock.h>
 
 #include "network/ip_facts.h"
+#include "network/ip_origin.h"
 #include "tests/network/port_host.h"
 #include "tests/support/command_lines.h"
 #include "tests/support/log_capture.h"
@@ -190,8 +191,9 @@ HOST_TEST(IPConfigNode, AsksWithTheseCommands) {
 
 HOST_TEST(IPConfigNode, LeavesTheAddressTypeAloneWhenThereIsNone) {
     PortHost plugin(host, "ipv6-only");
-    const auto config = plugin.build().config("eth0");
     host.tool("ifconfig eth0", "eth0 Link encap:Ethernet\n");
+    const auto config = plugin.build().config("eth0");
+    EXPECT_EQ(PortHost::stored(*config, 28), enumeration(0)) << "so that the agent lists it";
     PropertyValue value("untouched", true);
     EXPECT_EQ(config->getProperty(28, value).getStatus(), 0);
     EXPECT_EQ(value, text("untouched"));

@@ -349,7 +349,7 @@ HOST_TEST(PortWalk, MakesNothingOnceTheTreeIsGone) {
     PortHost plugin(host, "suse-two-nics");
     const auto held = plugin.build().config("eth0");
     plugin.mi().unload();
-    held->setProperty(IC::IPConfigNode::reenumeratePorts, number(1));
+    held->setProperty(74, number(1));
     EXPECT_THAT(plugin.mi().holdAll(), IsEmpty());
     EXPECT_THAT(host.calls(), Not(Contains("ifconfig")));
 }

@@ -1,5 +1,6 @@
 // The thread that watches the layout: when it compares, and how it ends.
 #include "storage/drive_monitor.h"
+#include "oshwmi/os_hw_mi.h"
 
 #include <pthread.h>
 
@@ -189,7 +190,7 @@ HOST_TEST_F(DriveMonitor, UnloadDuringTheFirstWaitEndsItAtOnceWithoutAComparison
 HOST_TEST_F(DriveMonitor, AStopIsSeenWithinOneSlice) {
     QX::setClockSpeed(10);
     QX::Event ended(true);
-    IC::HardDriveUpdateMonitor monitor(&ended);
+    IC::HardDriveUpdateMonitor monitor(&ended, IC::myoshwmi);
     ASSERT_TRUE(monitor.start(nullptr));
     std::this_thread::sleep_for(700ms);
     EXPECT_FALSE(monitor.isDone());
@@ -207,7 +208,7 @@ HOST_TEST_F(DriveMonitor, AStopIsSeenWithinOneSlice) {
 HOST_TEST_F(DriveMonitor, UnloadsFlagAloneEndsIt) {
     QX::setClockSpeed(100);
     QX::Event ended(true);
-    IC::HardDriveUpdateMonitor monitor(&ended);
+    IC::HardDriveUpdateMonitor monitor(&ended, IC::myoshwmi);
     ASSERT_TRUE(monitor.start(nullptr));
     IC::HardDriveNodeUpdate = true;
     EXPECT_TRUE(ended.wait(100));
@@ -283,7 +284,7 @@ HOST_TEST_F(DriveMonitor, MayBeStoppedByTheCallbackThatItCalls) {
 HOST_TEST_F(DriveMonitor, AMonitorThatIsDroppedEndsByItself) {
     QX::Event ended(true);
     {
-        IC::HardDriveUpdateMonitor monitor(&ended);
+        IC::HardDriveUpdateMonitor monitor(&ended, IC::myoshwmi);
         ASSERT_TRUE(monitor.start(nullptr));
         std::this_thread::sleep_for(20ms);
     }

@@ -1,7 +1,7 @@
 // Partitions: given this snapshot, these nodes, after these commands, with these lines in the log.
 #include "mi/disk_snapshot.h"
-#include "mi/globals.h"
 #include "mi/node_types.h"
+#include "oshwmi/os_hw_mi.h"
 #include "storage/storage_nodes.h"
 #include "tests/storage/storage_host.h"
 #include "tests/support/texts_are.h"
