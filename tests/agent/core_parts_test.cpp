@@ -447,12 +447,10 @@ public:
 /// An announcer that knows of one port, eth0.
 class Announcer : public testing::Test {
 protected:
-    Announcer() {
-        ports.addPort("eth0");
-        announcer.takeStock(ports);
-    }
+    Announcer() { announcer.takeStock(ports); }
 
     Ports ports;
+    const IC::MutableNode* const port = ports.addPort("eth0");
     EventLog log;
     Facts facts;
     cvagent::Announcer announcer{log, facts};
@@ -489,8 +487,6 @@ TEST_F(Announcer, AnAlertTellsTheStateBeforeAndAfter) {
 }
 
 TEST_F(Announcer, SuccessiveAlertsAreAChain) {
-    const IC::MutableNode* const port = ports.addPort("eth0");
-    announcer.takeStock(ports);
     const auto alertAgain = [&](unsigned int code, const std::string& message) {
         for (int i = 0; i < 1000; ++i) {
             announcer.hear(
