@@ -123,7 +123,9 @@ void addReaders(CLI::App& app, Options& options) {
         ->type_name("");
     addJson(*get, options);
     get->callback([&options] { options.command = Command::get; });
+}
 
+void addWatch(CLI::App& app, Options& options) {
     CLI::App* watch = app.add_subcommand("watch", "Print alerts, published and withdrawn nodes as they come");
     watch->add_option("--for", options.seconds, "Stop after this time; by default at Ctrl-C")
         ->type_name("SECONDS")
@@ -202,6 +204,7 @@ std::optional<Options> parseCommandLine(int count, const char* const* words, int
     addGlobalOptions(app, options);
     app.add_flag("--json", options.json)->group("");  // accepted in front of the command, too
     addReaders(app, options);
+    addWatch(app, options);
     addSet(app, options);
     addOffline(app, options);
     try {

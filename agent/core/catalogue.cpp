@@ -10,6 +10,7 @@
 #include "agent/core/oshw/tables.h"
 #include "agent/core/text.h"
 #include "agent/core/value_check.h"
+#include "framework/qx/zone_table.h"
 
 namespace cvagent {
 
@@ -179,8 +180,8 @@ std::string acceptedText(const Property& property) {
         text += (text.empty() || text.ends_with(' ') ? "" : ", ") + item;
     };
     if (property.check == check::timeZoneOffset) {
-        for (const int offset : check::zoneOffsets()) {
-            add(std::to_string(offset));
+        for (const QX::Zone& zone : QX::zoneTable) {
+            add(std::to_string(zone.offset));
         }
     }
     for (const Label& label : property.labels) {

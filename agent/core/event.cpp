@@ -51,7 +51,7 @@ Event alertEvent(const IC::Alert& alert, const std::vector<Handle>& nodes) {
     event.message = alert.message();
     event.firstCode = alert.firstCode();
     event.secondCode = alert.secondCode();
-    event.eventCode = alert.nodeId();  // the number that receivers key on
+    event.eventCode = alert.eventCode();
     if (!alert.substitutions().empty()) {
         event.path = alert.substitutions().front();
     }

@@ -25,7 +25,7 @@ PreparedProcess::PreparedProcess(ProcessSettings settings) {
     setUpCommands(settings.commands);
     StopSignals::install();
     if (settings.hostTools != HostTools::native) {
-        putAdaptersFirst(inspectHostTools(settings.hostTools, Look::adapters, adapterDirectory()));
+        putAdaptersOnPath(inspectHostTools(settings.hostTools, Look::adapters, adapterDirectory()));
     }
 }
 

@@ -8,6 +8,7 @@
 #include "agent/core/text.h"
 #include "framework/qx/date_time.h"
 #include "framework/qx/utf8.h"
+#include "framework/qx/zone_table.h"
 
 namespace cvagent::check {
 
@@ -15,10 +16,6 @@ namespace {
 
 constexpr std::size_t kLongestOwnerText = 1024;
 constexpr std::size_t kLongestDateTime = 40;
-
-constexpr int kZoneOffsets[] = {-660, -600, -540, -480, -420, -360, -300, -240, -210, -180,
-                                -120, -60,  0,    60,   120,  180,  210,  240,  270,  300,
-                                330,  360,  420,  480,  540,  570,  600,  660,  720};
 
 /// A number as a person writes it: no needless zeros.
 template <class Number>
@@ -101,14 +98,9 @@ Value dateTime(const Property& /*property*/, Words words) {
 
 Value timeZoneOffset(const Property& /*property*/, Words words) {
     const auto offset = words.size() == 1 ? decimal<int>(words.front()) : std::nullopt;
-    const bool known =
-        offset && std::binary_search(std::begin(kZoneOffsets), std::end(kZoneOffsets), *offset);
+    const bool known = offset && QX::findZone(static_cast<unsigned int>(*offset)) != nullptr;
     // A scaled number keeps the sign that an unsigned one would lose in log lines.
     return known ? Value(IC::PropertyValue(IC::Number(static_cast<long>(*offset), 0), true)) : std::nullopt;
-}
-
-std::span<const int> zoneOffsets() {
-    return kZoneOffsets;
 }
 
 }  // namespace cvagent::check

@@ -8,8 +8,7 @@
 
 #include "agent/cli/json.h"
 #include "agent/core/tree.h"
-#include "mi/globals.h"
-#include "mi/os_hw_mi.h"
+#include "oshwmi/os_hw_mi.h"
 #include "tests/agent/node_list.h"
 #include "tests/indications/heard.h"
 #include "tests/support/fake_host.h"

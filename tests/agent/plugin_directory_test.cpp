@@ -198,6 +198,18 @@ HOST_TEST(StrangersPlugin, ThatBelongsToAnotherIsLeftOut) {
     expectLeftOut(cvagent, "'/home/x' belongs to somebody else");
 }
 
+// Root that runs a user's build trusts that user already.
+HOST_TEST(StrangersPlugin, OfWhoOwnsTheProgramIsNone) {
+    Installed cvagent(host);
+    cvagent.addUptime();
+    if (!host.giveToStranger(kPlugins + "libuptime.so.1") || !host.giveToStranger("/srv/bin/cvagent")) {
+        GTEST_SKIP() << "the tests do not run as root";
+    }
+    const Finished run = cvagent({"tree"});
+    EXPECT_EQ(run.status, 0) << run.err;
+    EXPECT_THAT(run.out, HasSubstr("\nuptime ["));
+}
+
 HOST_TEST(StrangersPlugin, ThatIsNoFileHangsNobody) {
     Installed cvagent(host);
     ASSERT_EQ(mkfifo((kPlugins + "libuptime.so.1").c_str(), 0600), 0);

@@ -27,7 +27,12 @@ constexpr const char* kListings[] = {"ifconfig",
                                      "ifconfig -a | grep two",
                                      "route -n",
                                      "route -A inet6 -n | grep one | tr -s ' ' | cut -d ' ' -f2",
-                                     "fdisk -ls"};
+                                     "fdisk -ls",
+                                     "ethtool lo",
+                                     "ethtool one | grep \"Link detected\"",
+                                     "ethtool one 2> /dev/null | grep Speed | tr -s ' ' | cut -d ' ' -f2",
+                                     "egrep 'eth|bond|usb' /proc/net/dev | tr -s ' ' | cut -d ' ' -f2",
+                                     "brctl show"};
 
 constexpr const char* kChanges[] = {"link add one type veth peer name two",
                                     "link set one up",
@@ -62,7 +67,7 @@ std::size_t processesStarted() {
 void useAdapters() {
     setenv("LC_ALL", "C", 1);
     std::string path;
-    for (const std::string tool : {"fdisk", "ifconfig", "route"}) {
+    for (const std::string tool : {"brctl", "egrep", "ethtool", "fdisk", "ifconfig", "route"}) {
         path += std::string(HOSTTOOLS_LINKS) + "/" + tool + ":";
     }
     setenv("PATH", (path + std::getenv("PATH")).c_str(), 1);
@@ -134,14 +139,14 @@ HOST_TEST(Adapters, NeedNoProcess) {
     host.useKernelNetwork();
     host.realTool("ip");
     useAdapters();
-    for (const char* command : {"ifconfig", "ifconfig lo", "route -n"}) {
+    for (const char* command : {"ifconfig", "ifconfig lo", "route -n", "ethtool lo", "brctl show"}) {
         const auto stream = cvagent::shell::openCommand(command);
         ASSERT_TRUE(stream.has_value());
         EXPECT_EQ(processesStarted(), 0U) << command;
         cvagent::shell::closeCommand(*stream);
     }
-    for (const char* command :
-         {"ifconfig lo up", "route del default", "fdisk -l /dev/sda", "ifconfig nosuch"}) {
+    for (const char* command : {"ifconfig lo up", "route del default", "fdisk -l /dev/sda", "ifconfig nosuch",
+                                "ethtool -i lo", "brctl show br0", "egrep lo /proc/net/dev"}) {
         const auto stream = cvagent::shell::openCommand(command);
         ASSERT_TRUE(stream.has_value());
         EXPECT_EQ(processesStarted(), 1U) << command;

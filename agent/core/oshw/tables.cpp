@@ -1,5 +1,7 @@
 #include "agent/core/oshw/tables.h"
 
+#include "framework/ic/link_state.h"
+
 namespace cvagent::oshw {
 
 namespace {
@@ -36,10 +38,10 @@ constexpr NodeClass kClasses[] = {
 constexpr unsigned int kState = 123;
 
 constexpr AlertRow kAlerts[] = {
-    {"NIC is Online", kState, 1},
-    {"NIC is Offline", kState, 12},
-    {"NIC has Switched Over", kState, 32},
-    {"NIC has Switched Back", kState, 33},
+    {"NIC is Online", kState, IC::LinkState::up},
+    {"NIC is Offline", kState, IC::LinkState::down},
+    {"NIC has Switched Over", kState, IC::LinkState::switchedOver},
+    {"NIC has Switched Back", kState, IC::LinkState::switchedBack},
 };
 
 }  // namespace
