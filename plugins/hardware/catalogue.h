@@ -29,6 +29,8 @@ struct ClassRow {
     Class type;
     const char* name;  ///< as in paths
     bool several;      ///< the name of the node stands behind the class
+    /// Names of properties, a blank between, that tell its nodes apart at a glance.
+    const char* telling = "";
 };
 
 constexpr Id firstId(Class type) {

@@ -16,17 +16,17 @@ namespace {
 
 constexpr ClassRow kClasses[] = {
     {Class::hardware, "hardware", false},
-    {Class::system, "system", false},
-    {Class::memory, "memory", false},
-    {Class::memoryModule, "memory-module", true},
-    {Class::processor, "cpu", true},
-    {Class::drive, "drive", true},
-    {Class::partition, "drive-part", true},
-    {Class::fileSystem, "file-system", true},
-    {Class::array, "array", true},
-    {Class::mapping, "mapping", true},
-    {Class::link, "link", true},
-    {Class::sensor, "sensor", true},
+    {Class::system, "system", false, "Maker Model VirtualKind"},
+    {Class::memory, "memory", false, "TotalMemory"},
+    {Class::memoryModule, "memory-module", true, "Size MemoryType"},
+    {Class::processor, "cpu", true, "Model"},
+    {Class::drive, "drive", true, "Model Size"},
+    {Class::partition, "drive-part", true, "Size Label"},
+    {Class::fileSystem, "file-system", true, "FileSystemType Size MountPoints"},
+    {Class::array, "array", true, "Level State Size"},
+    {Class::mapping, "mapping", true, "MappingName MappingKind Size"},
+    {Class::link, "link", true, "State Speed"},
+    {Class::sensor, "sensor", true, "Label Temperature FanSpeed Voltage Current Power Energy Humidity"},
 };
 
 constexpr Row nameRow(Class type) {

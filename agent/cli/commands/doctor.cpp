@@ -79,13 +79,13 @@ std::string pluginLine(const std::string& file, const Style& style) {
 
 /// They are looked at, not loaded.
 std::string plugins(const Options& options, const Style& style) {
-    std::string text = "\n" + style.strong("PLUG-INS") + "\n";
+    std::string text = style.strong("PLUG-INS") + "\n";
     PluginFiles found{options.plugins, {}};
     if (options.plugins.empty()) {
         try {
             found = pluginsBesideProgram();
         } catch (const Problem& problem) {
-            return text + "  " + style.bad(printable(problem.what())) + "\n";
+            return text + "  " + style.bad(printable(problem.what())) + "\n\n";
         }
     }
     for (const std::string& file : found.files) {
@@ -94,7 +94,7 @@ std::string plugins(const Options& options, const Style& style) {
     for (const LeftOut& one : found.leftOut) {
         text += "  " + style.bad(printable(one.problem.what())) + "\n";
     }
-    return text;
+    return text + "\n";
 }
 
 }  // namespace
@@ -104,7 +104,7 @@ ExitStatus doctor(const Options& options) {
     StopSignals::install();
     const std::vector<ToolReport> reports =
         inspectHostTools(options.hostTools, Look::everything, adapterDirectory());
-    print(options.json ? json::tools(reports) : table(reports, style) + plugins(options, style));
+    print(options.json ? json::tools(reports) : plugins(options, style) + table(reports, style));
     return ExitStatus::done;
 }
 
