@@ -14,10 +14,11 @@ namespace hardware {
 
 /// What all nodes ask with. It lives as long as the last question.
 struct Asking {
-    explicit Asking(Host where) : host(std::move(where)) {}
+    explicit Asking(Host where, std::chrono::milliseconds limit = std::chrono::seconds(2))
+        : host(std::move(where)), patience(limit) {}
 
     Host host;
-    Patience patience{std::chrono::seconds(2)};
+    Patience patience;
 };
 
 /// What is known of a thing, and when the asking for it began.
