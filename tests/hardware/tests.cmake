@@ -1,0 +1,20 @@
+corvista_test(hardware LABELS threads SOURCES
+  hardware/base_test.cpp
+  hardware/host_test.cpp
+  hardware/hosts_test.cpp
+  hardware/memory_test.cpp
+  hardware/patience_test.cpp
+  hardware/processors_test.cpp
+  hardware/recorded_host.cpp
+  hardware/sensors_test.cpp
+  hardware/system_test.cpp
+  hardware/watcher_test.cpp
+  LIBRARIES hardware_code)
+target_compile_definitions(hardware_test PRIVATE CORVISTA_TESTS_DIR="${CMAKE_SOURCE_DIR}/tests")
+
+# In a network of its own, whose links the tests make and take away.
+corvista_test(hardware_links SOURCES
+  hardware/links_test.cpp
+  hardware/recorded_host.cpp
+  hardware/this_host_test.cpp
+  LIBRARIES hardware_code)
