@@ -1,5 +1,6 @@
 #include "tests/hardware/golden.h"
 
+#include <map>
 #include <sstream>
 
 #include "plugins/hardware/hardware_node.h"
@@ -11,6 +12,18 @@ namespace {
 
 std::string label(hardware::Class type, const std::string& name) {
     return hardware::classRow(type).name + (name.empty() ? "" : ":" + name);
+}
+
+std::string text(const IC::PropertyValue& value) {
+    std::ostringstream out;
+    const std::vector<std::string>* const texts = value.asTexts();
+    if (texts == nullptr) {
+        out << value;
+    }
+    for (std::size_t at = 0; texts != nullptr && at < texts->size(); ++at) {
+        out << (at == 0 ? "" : " | ") << (*texts)[at];
+    }
+    return out.str();
 }
 
 void tell(const hardware::Found& found, std::ostream& out) {
@@ -25,13 +38,7 @@ void tell(const hardware::Found& found, std::ostream& out) {
             continue;
         }
         out << "  " << row.name << (row.audience == hardware::Audience::trusted ? " (trusted)" : "") << ": ";
-        const std::vector<std::string>* const texts = fact->second.asTexts();
-        if (texts == nullptr) {
-            out << fact->second;
-        }
-        for (std::size_t at = 0; texts != nullptr && at < texts->size(); ++at) {
-            out << (at == 0 ? "" : " | ") << (*texts)[at];
-        }
+        out << text(fact->second);
         out << (*row.unit == '\0' ? "" : " ") << row.unit << '\n';
     }
 }
@@ -48,6 +55,24 @@ std::string told(const hardware::Host& host) {
         }
     }
     return out.str();
+}
+
+std::map<std::string, std::string> factsOf(const hardware::Host& host, hardware::Class type,
+                                           const std::string& name) {
+    std::map<std::string, std::string> facts;
+    hardware::Found found{type, name};
+    for (const hardware::Source& source : hardware::sources()) {
+        if (source.type == type) {
+            source.describe(host, found);
+        }
+    }
+    for (const hardware::Row& row : hardware::allRows()) {
+        const auto fact = found.facts.all().find(row.id);
+        if (row.type == type && fact != found.facts.all().end()) {
+            facts[row.name] = text(fact->second);
+        }
+    }
+    return facts;
 }
 
 std::filesystem::path recordedHosts() {
