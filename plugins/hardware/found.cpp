@@ -1,5 +1,10 @@
 #include "plugins/hardware/found.h"
 
+#include <algorithm>
+#include <iterator>
+
+#include "plugins/hardware/host.h"
+
 namespace hardware {
 
 void Facts::put(Id id, IC::PropertyValue value) {
@@ -8,13 +13,15 @@ void Facts::put(Id id, IC::PropertyValue value) {
 
 void Facts::text(Id id, const std::optional<std::string>& value) {
     if (value && !value->empty()) {
-        put(id, IC::PropertyValue(*value, true));
+        put(id, IC::PropertyValue(printable(*value), true));
     }
 }
 
 void Facts::texts(Id id, const std::vector<std::string>& values) {
     if (!values.empty()) {
-        put(id, IC::PropertyValue(values, true));
+        std::vector<std::string> shown;
+        std::transform(values.begin(), values.end(), std::back_inserter(shown), printable);
+        put(id, IC::PropertyValue(shown, true));
     }
 }
 

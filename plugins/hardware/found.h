@@ -16,7 +16,7 @@ class Facts {
 public:
     using Map = std::map<unsigned int, IC::PropertyValue>;
 
-    /// An empty text counts as not told.
+    /// An empty text counts as not told; control characters are shown as '?'.
     void text(Id id, const std::optional<std::string>& value);
     void texts(Id id, const std::vector<std::string>& values);
     void number(Id id, std::optional<unsigned long long> value);

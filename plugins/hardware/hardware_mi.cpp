@@ -1,7 +1,7 @@
 #include "plugins/hardware/hardware_mi.h"
 
-#include <algorithm>
 #include <ranges>
+#include <set>
 
 namespace hardware {
 
@@ -11,21 +11,22 @@ HardwareMI::~HardwareMI() = default;
 
 IC::Error HardwareMI::initialize(unsigned int miId, const IC::Number& ownNodeId,
                                  const IC::Number& firstNodeId) {
-    watcher_.reset();
+    if (IC::Error failure = unload();
+        failure.getStatus() != 0) {  // an agent that starts twice without a stop
+        return failure;
+    }
     if (IC::Error failure = ManagementInterface::initialize(miId, ownNodeId, firstNodeId);
         failure.getStatus() != 0) {
         return failure;
     }
-    {
-        const std::lock_guard lock(guard_);
-        asking_ = std::make_shared<Asking>(host_);
-        appendNode(new IC::MutableNode(ownNodeId, 0, miIds(), static_cast<unsigned int>(Class::hardware), 0));
-        for (const Source& source : sources()) {
-            look(source, Moment::start);
-        }
-    }
-    if (host_.live()) {
+    const std::lock_guard lock(guard_);
+    asking_ = std::make_shared<Asking>(host_);
+    if (host_.live()) {  // before the look, so that nothing comes between; its first call waits for the guard
         watcher_ = std::make_unique<Watcher>([this](const std::string& subsystem) { lookAgain(subsystem); });
+    }
+    appendNode(new IC::MutableNode(ownNodeId, 0, miIds(), static_cast<unsigned int>(Class::hardware), 0));
+    for (const Source& source : sources()) {
+        look(source, Moment::start);
     }
     return {};
 }
@@ -49,7 +50,7 @@ void HardwareMI::lookAgain(const std::string& subsystem) {
     };
     for (const Source& source : std::views::reverse(sources())) {  // what hangs under others goes first
         if (concerned(source)) {
-            withdrawGone(source, source.list(host_));
+            withdrawGone(source);
         }
     }
     for (const Source& source : sources()) {
@@ -59,10 +60,12 @@ void HardwareMI::lookAgain(const std::string& subsystem) {
     }
 }
 
-void HardwareMI::withdrawGone(const Source& source, const std::vector<std::string>& names) {
+void HardwareMI::withdrawGone(const Source& source) {
+    const std::vector<std::string> names = source.list(host_);
+    const std::set<std::string> there(names.begin(), names.end());
     std::erase_if(nodes_, [&](const auto& entry) {
         const auto& [key, node] = entry;
-        const bool gone = key.first == source.type && std::ranges::find(names, key.second) == names.end();
+        const bool gone = key.first == source.type && !there.contains(key.second);
         if (gone) {
             deleteNode(node);
         }
@@ -71,13 +74,16 @@ void HardwareMI::withdrawGone(const Source& source, const std::vector<std::strin
 }
 
 void HardwareMI::look(const Source& source, Moment moment) {
-    for (const std::string& name : source.list(host_)) {
-        const std::optional<Found> found = ask(asking_, source, name);
-        const auto known = nodes_.find({source.type, name});
-        if (known == nodes_.end()) {
-            place(source, found.value_or(nameOnly(source.type, name)), moment);
-        } else if (found) {
-            known->second->store(*found);
+    const std::vector<std::string> names = source.list(host_);
+    const std::vector<std::optional<Known>> all = ask(asking_, source, names);
+    for (std::size_t place = 0; place < names.size(); ++place) {
+        const std::optional<Known>& known = all[place];
+        const auto node = nodes_.find({source.type, names[place]});
+        if (node == nodes_.end()) {
+            this->place(source, known.value_or(Known{nameOnly(source.type, names[place])}), moment);
+        } else if (known) {
+            node->second->setParent(parentOf(known->found));
+            node->second->store(*known);
         }
     }
 }
@@ -87,10 +93,11 @@ unsigned int HardwareMI::parentOf(const Found& found) const {
     return parent == nodes_.end() ? ownNodeId() : parent->second->getNodeId();
 }
 
-void HardwareMI::place(const Source& source, const Found& found, Moment moment) {
+void HardwareMI::place(const Source& source, const Known& known, Moment moment) {
+    const Found& found = known.found;
     const HardwareNode::Place where{takeNodeId(), parentOf(found), miIds(), ++count_[source.type]};
     auto node = std::make_unique<HardwareNode>(where, source, found.name, asking_);
-    node->store(found);
+    node->store(known);
     HardwareNode* const placed = node.get();
     if (moment == Moment::start) {
         appendNode(node.release());

@@ -32,8 +32,8 @@ private:
     enum class Moment { start, later };
 
     void look(const Source& source, Moment moment);
-    void withdrawGone(const Source& source, const std::vector<std::string>& names);
-    void place(const Source& source, const Found& found, Moment moment);
+    void withdrawGone(const Source& source);
+    void place(const Source& source, const Known& known, Moment moment);
     unsigned int parentOf(const Found& found) const;
 
     const Host host_;

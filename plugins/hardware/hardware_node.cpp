@@ -24,14 +24,30 @@ Found nameOnly(Class type, const std::string& name) {
     return found;
 }
 
-std::optional<Found> ask(const std::shared_ptr<Asking>& asking, const Source& source,
-                         const std::string& name) {
-    const auto found = std::make_shared<Found>(nameOnly(source.type, name));
-    const bool answered =
-        asking->patience.run(std::to_string(static_cast<unsigned int>(source.type)) + ":" + name,
-                             // Not the asking itself: its end waits for this work.
-                             [found, host = asking->host, &source] { source.describe(host, *found); });
-    return answered ? std::optional(std::move(*found)) : std::nullopt;
+std::vector<std::optional<Known>> ask(const std::shared_ptr<Asking>& asking, const Source& source,
+                                      const std::vector<std::string>& names) {
+    // Owned by the work, too: what hangs fills its own in when nobody waits for it any more.
+    const auto all = std::make_shared<std::vector<Known>>();
+    std::vector<std::string> devices;
+    for (const std::string& name : names) {
+        all->push_back({nameOnly(source.type, name)});
+        devices.push_back(std::to_string(static_cast<unsigned int>(source.type)) + ":" +
+                          (source.device == nullptr ? name : source.device(name)));
+    }
+    // Not the asking itself: its end waits for this work.
+    const auto describe = [all, host = asking->host, &source](std::size_t place) {
+        Known& one = (*all)[place];
+        one.asOf = std::chrono::steady_clock::now();
+        source.describe(host, one.found);
+    };
+    const std::vector<bool> answered = asking->patience.runAll(std::move(devices), describe);
+    std::vector<std::optional<Known>> known(names.size());
+    for (std::size_t place = 0; place < names.size(); ++place) {
+        if (answered[place]) {
+            known[place] = std::move((*all)[place]);
+        }
+    }
+    return known;
 }
 
 HardwareNode::HardwareNode(const Place& place, const Source& source, std::string name,
@@ -42,10 +58,16 @@ HardwareNode::HardwareNode(const Place& place, const Source& source, std::string
       asking_(std::move(asking)),
       known_{{source.type, name_}, {}} {}
 
-void HardwareNode::store(const Found& found) {
-    setDescription(found.description);
+void HardwareNode::store(const Known& known) {
+    setDescription(known.found.description);
+    takeOver(known);
+}
+
+void HardwareNode::takeOver(const Known& known) const {
     const std::lock_guard lock(guard_);
-    known_ = {found, std::chrono::steady_clock::now()};
+    if (known.asOf >= known_.asOf) {
+        known_ = known;
+    }
 }
 
 IC::Error HardwareNode::refresh() const {
@@ -55,12 +77,11 @@ IC::Error HardwareNode::refresh() const {
             return {};
         }
     }
-    const std::optional<Found> found = ask(asking_, source_, name_);
-    if (!found) {
+    const std::optional<Known> known = ask(asking_, source_, {name_}).front();
+    if (!known) {
         return {IC::Error::unanswered, IC::Number(), "the device did not answer in time"};
     }
-    const std::lock_guard lock(guard_);
-    known_ = {*found, std::chrono::steady_clock::now()};
+    takeOver(*known);
     return {};
 }
 

@@ -14,19 +14,26 @@ namespace hardware {
 
 /// What all nodes ask with. It lives as long as the last question.
 struct Asking {
-    explicit Asking(Host where) : host(std::move(where)) {}
+    explicit Asking(Host where, std::chrono::milliseconds limit = std::chrono::seconds(2))
+        : host(std::move(where)), patience(limit) {}
 
     Host host;
-    Patience patience{std::chrono::seconds(2)};
+    Patience patience;
+};
+
+/// What is known of a thing, and when the asking for it began.
+struct Known {
+    Found found;
+    std::chrono::steady_clock::time_point asOf{};
 };
 
 /// What is known of a thing that does not answer.
 Found nameOnly(Class type, const std::string& name);
 
-/// Asks one source for one thing.
-/// @return nothing when it does not answer in time
-std::optional<Found> ask(const std::shared_ptr<Asking>& asking, const Source& source,
-                         const std::string& name);
+/// Asks one source for things of these names.
+/// @return for each what is known; nothing when it does not answer in time
+std::vector<std::optional<Known>> ask(const std::shared_ptr<Asking>& asking, const Source& source,
+                                      const std::vector<std::string>& names);
 
 /// A node of the tree: stores what was found, and looks again when a live property is read.
 class HardwareNode : public IC::MutableNode {
@@ -48,17 +55,13 @@ public:
 
     const Source& source() const { return source_; }
     const std::string& name() const { return name_; }
-    /// Takes over what was found; what is not told any more is forgotten.
-    void store(const Found& found);
+    /// Takes over what was found; what is not told any more is forgotten. What was asked for before what is
+    /// known already is old, and changes nothing.
+    void store(const Known& known);
 
 private:
     IC::Error refresh() const;
-
-    /// What is known, shared by the readers.
-    struct Known {
-        Found found;
-        std::chrono::steady_clock::time_point asOf;
-    };
+    void takeOver(const Known& known) const;
 
     const Source& source_;
     const std::string name_;

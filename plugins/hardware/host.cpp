@@ -8,6 +8,7 @@
 #include <cctype>
 #include <cerrno>
 #include <charconv>
+#include <cstdint>
 #include <filesystem>
 #include <sstream>
 #include <utility>
@@ -45,6 +46,29 @@ std::string digitsAt(const std::string& text, std::size_t place) {
 
 std::size_t endOfDigits(const std::string& text, std::size_t place) {
     return std::min(text.find_first_not_of("0123456789", place), text.size());
+}
+
+/// The bytes of the printable UTF-8 letter at a place; 0 where there is none.
+std::size_t letterAt(const std::string& text, std::size_t place) {
+    const auto byte = [&](std::size_t at) -> std::uint32_t { return static_cast<unsigned char>(text[at]); };
+    const std::uint32_t first = byte(place);
+    if (first < 0x80) {
+        return first >= ' ' && first != 0x7f ? 1 : 0;
+    }
+    const std::size_t length = first >= 0xf0 ? 4 : first >= 0xe0 ? 3 : 2;
+    constexpr std::uint32_t kLeast[] = {0xa0, 0x800, 0x10000};  // below: controls, and longer than needed
+    if (first < 0xc0 || first > 0xf4 || place + length > text.size()) {
+        return 0;
+    }
+    std::uint32_t letter = first & (0xffU >> (length + 1));
+    for (std::size_t at = place + 1; at < place + length; ++at) {
+        if ((byte(at) & 0xc0U) != 0x80) {
+            return 0;
+        }
+        letter = letter << 6U | (byte(at) & 0x3fU);
+    }
+    const bool surrogate = letter >= 0xd800 && letter <= 0xdfff;
+    return letter < kLeast[length - 2] || letter > 0x10ffff || surrogate ? 0 : length;
 }
 
 }  // namespace
@@ -159,8 +183,13 @@ bool comesBefore(const std::string& left, const std::string& right) {
 }
 
 std::string printable(std::string text) {
-    std::replace_if(
-        text.begin(), text.end(), [](unsigned char byte) { return byte < ' ' || byte == 0x7f; }, '?');
+    for (std::size_t at = 0; at < text.size();) {
+        const std::size_t length = letterAt(text, at);
+        if (length == 0) {
+            text[at] = '?';
+        }
+        at += std::max<std::size_t>(length, 1);
+    }
     return text;
 }
 

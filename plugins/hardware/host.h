@@ -56,7 +56,8 @@ private:
 
 /// Whether "eth2" comes before "eth10": runs of digits count as numbers.
 bool comesBefore(const std::string& left, const std::string& right);
-/// The text with a '?' for each control character: it goes to terminals and into JSON.
+/// The text with a '?' for each control character and each byte that is no UTF-8: it goes to terminals and
+/// into JSON.
 std::string printable(std::string text);
 /// The text without blanks and NUL at both ends.
 std::string trimmed(const std::string& text);

@@ -3,18 +3,24 @@
 #include <dlfcn.h>
 #include <link.h>
 
+#include <algorithm>
 #include <condition_variable>
 #include <exception>
 #include <list>
+#include <map>
 #include <mutex>
-#include <set>
 #include <system_error>
 #include <thread>
 #include <utility>
 
+#include "plugins/hardware/quiet_thread.h"
+
 namespace hardware {
 
 namespace {
+
+constexpr std::size_t kMostThreads = 16;
+constexpr int kShortest = 32;  // a limit is never shortened to less than this part of it
 
 /// A thread that hangs in this library's code must find it there when it goes on.
 void keepMapped() {
@@ -29,52 +35,116 @@ void keepMapped() {
     }
 }
 
+std::chrono::steady_clock::time_point now() {
+    return std::chrono::steady_clock::now();
+}
+
 }  // namespace
 
-struct Patience::State {
-    struct Job {
-        std::string device;
-        std::function<void()> work;
-        bool done = false;
-    };
+/// Devices that one thread asks one after the other. Guarded by the state's guard but for the work itself.
+struct Patience::Job {
+    enum class Outcome { open, done, busy };
 
+    std::vector<std::string> devices;
+    std::function<void(std::size_t)> work;
+    std::vector<Outcome> outcomes = std::vector<Outcome>(devices.size(), Outcome::open);
+    std::size_t at = 0;  // the device that is being asked ...
+    Time since = now();  // ... and since when
+    bool abandoned = false;
+    bool ended = false;
+};
+
+struct Patience::State {
     std::mutex guard;
     std::condition_variable changed;
-    std::shared_ptr<Job> next;   // waits for a thread; guarded, like all below
-    std::set<std::string> busy;  // devices that are being asked
+    std::shared_ptr<Job> next;         // waits for a thread; guarded, like all below
+    std::map<std::string, Time> busy;  // devices that are being asked, and since when
     std::list<std::thread> threads;
     unsigned int idle = 0;
     unsigned int running = 0;
     bool ending = false;
 
-    static void serve(const std::shared_ptr<State>& state);
+    /// False when there is no thread to be had in time.
+    bool post(std::unique_lock<std::mutex>& lock, const std::shared_ptr<State>& self,
+              const std::shared_ptr<Job>& job, Time until);
+    /// Waits until the job has ended or one of its devices has taken longer than the limit.
+    /// @return false when no thread got round to it
+    bool await(std::unique_lock<std::mutex>& lock, Job& job, std::chrono::milliseconds limit);
+    void serve();
+    void ask(std::unique_lock<std::mutex>& lock, Job& job);
 };
 
-void Patience::State::serve(const std::shared_ptr<State>& state) {
-    std::unique_lock lock(state->guard);
+void Patience::State::ask(std::unique_lock<std::mutex>& lock, Job& job) {
+    const std::string device = job.devices[job.at];
+    job.since = now();
+    if (!busy.emplace(device, job.since).second) {
+        job.outcomes[job.at] = Job::Outcome::busy;
+        return;
+    }
+    lock.unlock();
+    try {
+        job.work(job.at);
+    } catch (const std::exception&) {
+        // What cannot be read has no facts.
+    }
+    lock.lock();
+    job.outcomes[job.at] = Job::Outcome::done;
+    busy.erase(device);
+}
+
+void Patience::State::serve() {
+    std::unique_lock lock(guard);
     for (;;) {
-        ++state->idle;
-        state->changed.wait(lock, [&] { return state->next != nullptr || state->ending; });
-        --state->idle;
-        if (state->next == nullptr) {
+        ++idle;
+        changed.wait(lock, [this] { return next != nullptr || ending; });
+        --idle;
+        if (next == nullptr) {
             break;
         }
-        const std::shared_ptr<Job> job = std::exchange(state->next, nullptr);
-        state->changed.notify_all();
-        lock.unlock();
-        try {
-            job->work();
-        } catch (const std::exception&) {
-            // What cannot be read has no facts.
+        const std::shared_ptr<Job> job = std::exchange(next, nullptr);
+        changed.notify_all();
+        for (; job->at < job->devices.size() && !job->abandoned; ++job->at) {
+            ask(lock, *job);
         }
-        job->work = nullptr;
-        lock.lock();
-        job->done = true;
-        state->busy.erase(job->device);
-        state->changed.notify_all();
+        job->ended = true;
+        changed.notify_all();
     }
-    --state->running;
-    state->changed.notify_all();
+    --running;
+    changed.notify_all();
+}
+
+bool Patience::State::post(std::unique_lock<std::mutex>& lock, const std::shared_ptr<State>& self,
+                           const std::shared_ptr<Job>& job, Time until) {
+    const auto free = [this] { return next == nullptr && (idle > 0 || running < kMostThreads); };
+    if (!changed.wait_until(lock, until, free)) {
+        return false;
+    }
+    if (idle == 0) {
+        try {
+            threads.push_back(quietThread([self] { self->serve(); }));
+        } catch (const std::system_error&) {
+            return false;
+        }
+        ++running;
+    }
+    job->since = now();
+    next = job;
+    changed.notify_all();
+    return true;
+}
+
+bool Patience::State::await(std::unique_lock<std::mutex>& lock, Job& job, std::chrono::milliseconds limit) {
+    while (!job.ended && now() < job.since + limit) {
+        const Time until = job.since + limit;  // the thread writes it while this one sleeps
+        changed.wait_until(lock, until, [&job] { return job.ended; });
+    }
+    job.abandoned = !job.ended;
+    const bool taken = next.get() != &job;
+    if (!taken) {
+        next = nullptr;
+        changed.notify_all();
+    }
+    return taken;
 }
 
 Patience::Patience(std::chrono::milliseconds limit) : state_(std::make_shared<State>()), limit_(limit) {}
@@ -94,30 +164,60 @@ Patience::~Patience() {
 }
 
 bool Patience::run(const std::string& device, std::function<void()> work) {
-    const auto until = std::chrono::steady_clock::now() + limit_;
+    return runOne(
+        device, [work = std::move(work)](std::size_t /*place*/) { work(); }, 0, limit_);
+}
+
+bool Patience::runOne(const std::string& device, const std::function<void(std::size_t)>& work,
+                      std::size_t place, std::chrono::milliseconds limit) {
+    const Time end = now() + limit;
     std::unique_lock lock(state_->guard);
-    const auto free = [&] { return !state_->busy.contains(device) && state_->next == nullptr; };
-    if (!state_->changed.wait_until(lock, until, free)) {
-        return false;
-    }
-    if (state_->idle == 0) {
-        try {
-            state_->threads.emplace_back(State::serve, state_);
-        } catch (const std::system_error&) {
+    for (;;) {
+        const auto asked = state_->busy.find(device);
+        const Time until = asked == state_->busy.end() ? end : std::min(end, asked->second + limit_);
+        if (!state_->changed.wait_until(lock, until, [&] { return !state_->busy.contains(device); })) {
             return false;
         }
-        ++state_->running;
+        const auto job =
+            std::make_shared<Job>(Job{{device}, [work, place](std::size_t /*first*/) { work(place); }});
+        if (!state_->post(lock, state_, job, end)) {
+            return false;
+        }
+        static_cast<void>(state_->await(lock, *job, limit));
+        if (job->outcomes.front() != Job::Outcome::busy) {
+            return job->outcomes.front() == Job::Outcome::done;
+        }
     }
-    const auto job = std::make_shared<State::Job>(State::Job{device, std::move(work)});
-    state_->busy.insert(device);
-    state_->next = job;
-    state_->changed.notify_all();
-    state_->changed.wait_until(lock, until, [&] { return job->done; });
-    if (state_->next == job) {  // no thread got round to it
-        state_->next = nullptr;
-        state_->busy.erase(device);
+}
+
+std::vector<bool> Patience::runAll(std::vector<std::string> devices,
+                                   const std::function<void(std::size_t)>& work) {
+    std::vector<bool> done(devices.size());
+    std::vector<std::size_t> busy;
+    std::chrono::milliseconds limit = limit_;
+    for (std::size_t first = 0; first < devices.size();) {
+        const auto start = devices.begin() + static_cast<std::ptrdiff_t>(first);
+        const auto job = std::make_shared<Job>(
+            Job{{start, devices.end()}, [work, first](std::size_t place) { work(first + place); }});
+        std::unique_lock lock(state_->guard);
+        if (!state_->post(lock, state_, job, now() + limit) || !state_->await(lock, *job, limit)) {
+            break;
+        }
+        for (std::size_t place = 0; place < job->outcomes.size(); ++place) {
+            done[first + place] = job->outcomes[place] == Job::Outcome::done;
+            if (job->outcomes[place] == Job::Outcome::busy) {
+                busy.push_back(first + place);
+            }
+        }
+        if (!job->ended) {
+            limit = std::max(limit / 2, limit_ / kShortest);
+        }
+        first += job->at + 1;
     }
-    return job->done;
+    for (const std::size_t place : busy) {
+        done[place] = runOne(devices[place], work, place, limit);
+    }
+    return done;
 }
 
 }  // namespace hardware

@@ -44,7 +44,7 @@ const Source kSources[] = {
     {Class::partition, partitionRows(), listPartitions, describePartition, "block"},
     {Class::fileSystem, fileSystemRows(), listFileSystems, describeFileSystem, "block"},
     {Class::link, linkRows(), listLinks, describeLink, "net"},
-    {Class::sensor, sensorRows(), listSensors, describeSensor, "hwmon"},
+    {Class::sensor, sensorRows(), listSensors, describeSensor, "hwmon", chipOf},
 };
 
 }  // namespace

@@ -20,6 +20,8 @@ struct Source {
     void (*describe)(const Host& host, Found& found);
     /// Kernel news that concern it: a subsystem of uevents, "" for none.
     const char* subsystem;
+    /// What is asked for the thing of that name, where several share it; itself without one.
+    std::string (*device)(const std::string& name) = nullptr;
 };
 
 /// All sources, parents before what hangs under them.

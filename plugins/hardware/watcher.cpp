@@ -7,20 +7,23 @@
 #include <sys/socket.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
-#include <csignal>
+#include <exception>
 #include <set>
 #include <string_view>
 #include <system_error>
 #include <utility>
 
+#include "plugins/hardware/quiet_thread.h"
+
 namespace hardware {
 
 namespace {
 
-constexpr int kSettlingMilliseconds = 200;
 constexpr unsigned int kDeviceNews = 1;  // the kernel's own group; udev's is 2
+constexpr int kAtOnce = 1000;            // messages taken from a socket before its clock is looked at
 
 /// -1 where the kernel gives none: the tree then shows what the start has found.
 int openNews(int protocol, unsigned int groups) {
@@ -54,17 +57,23 @@ bool receive(int news, std::string& message, bool& dropped) {
 }
 
 /// Adds what the news of one socket concern; "" stands for everything.
-void collect(int news, const char* fixed, std::set<std::string>& concerned) {
+/// @return how many of its news concern something
+int collect(int news, const char* fixed, std::set<std::string>& concerned) {
     bool dropped = false;
-    for (std::string message; news >= 0 && receive(news, message, dropped);) {
+    int concern = 0;
+    std::string message;
+    for (int count = 0; news >= 0 && count < kAtOnce && receive(news, message, dropped); ++count) {
         const std::string subsystem = fixed != nullptr ? fixed : Watcher::subsystemOf(message);
         if (!message.empty() && !subsystem.empty()) {
             concerned.insert(subsystem);
+            ++concern;
         }
     }
     if (dropped) {
         concerned.insert("");
+        ++concern;
     }
+    return concern;
 }
 
 }  // namespace
@@ -78,51 +87,82 @@ std::string Watcher::subsystemOf(const std::string& message) {
                                             message.find('\0', start + 1) - start - kKey.size()));
 }
 
-Watcher::Watcher(std::function<void(const std::string&)> changed)
+Watcher::News Watcher::kernelNews() {
+    return {openNews(NETLINK_KOBJECT_UEVENT, kDeviceNews), openNews(NETLINK_ROUTE, RTMGRP_LINK)};
+}
+
+Watcher::Watcher(Changed changed) : Watcher(std::move(changed), kernelNews(), Times()) {}
+
+Watcher::Watcher(Changed changed, News news, Times times)
     : changed_(std::move(changed)),
-      devices_(openNews(NETLINK_KOBJECT_UEVENT, kDeviceNews)),
-      links_(openNews(NETLINK_ROUTE, RTMGRP_LINK)),
-      end_(eventfd(0, EFD_CLOEXEC)) {
-    sigset_t all;
-    sigset_t before;
-    sigfillset(&all);
-    pthread_sigmask(SIG_BLOCK, &all, &before);  // signals are the agent's
+      news_(news),
+      times_(times),
+      end_(eventfd(0, EFD_CLOEXEC)),
+      told_(std::chrono::steady_clock::now()),
+      everything_(told_) {
+    if (end_ < 0) {
+        return;  // a thread could not be told to end
+    }
     try {
-        thread_ = std::thread([this] { watch(); });
+        thread_ = quietThread([this] { watch(); });
     } catch (const std::system_error&) {
         // No thread to be had: the tree shows what the start has found.
     }
-    pthread_sigmask(SIG_SETMASK, &before, nullptr);
 }
 
 Watcher::~Watcher() {
-    eventfd_write(end_, 1);
     if (thread_.joinable()) {
+        eventfd_write(end_, 1);
         thread_.join();
     }
-    for (const int descriptor : {devices_, links_, end_}) {
+    for (const int descriptor : {news_.devices, news_.links, end_}) {
         if (descriptor >= 0) {
             close(descriptor);
         }
     }
 }
 
-void Watcher::watch() const {
-    std::set<std::string> concerned;
+int Watcher::waitMilliseconds() const {
+    const auto until = concerned_.empty()
+                           ? everything_ + times_.everything
+                           : std::max(told_ + took_, std::min(first_ + times_.longest, last_ + times_.quiet));
+    const auto left = std::chrono::ceil<std::chrono::milliseconds>(until - std::chrono::steady_clock::now());
+    return static_cast<int>(std::max<std::chrono::milliseconds::rep>(0, left.count()));
+}
+
+void Watcher::tell() {
+    const Time start = std::chrono::steady_clock::now();
+    if (concerned_.contains("") || start >= everything_ + times_.everything) {
+        concerned_ = {""};
+        everything_ = start;
+    }
+    for (const std::string& subsystem : concerned_) {
+        try {
+            changed_(subsystem);
+        } catch (const std::exception&) {
+            // No memory: the next look is another chance.
+        }
+    }
+    concerned_.clear();
+    told_ = std::chrono::steady_clock::now();
+    took_ = told_ - start;
+}
+
+void Watcher::watch() {
     for (;;) {
-        std::array<pollfd, 3> all{{{end_, POLLIN, 0}, {devices_, POLLIN, 0}, {links_, POLLIN, 0}}};
-        const int count = poll(all.data(), all.size(), concerned.empty() ? -1 : kSettlingMilliseconds);
-        if (all[0].revents != 0 || (count < 0 && errno != EINTR)) {
+        if (waitMilliseconds() == 0) {
+            tell();
+        }
+        std::array<pollfd, 3> all{{{end_, POLLIN, 0}, {news_.devices, POLLIN, 0}, {news_.links, POLLIN, 0}}};
+        const int count = poll(all.data(), all.size(), waitMilliseconds());
+        const bool closed = ((all[1].revents | all[2].revents) & POLLNVAL) != 0;  // by somebody else
+        if (all[0].revents != 0 || closed || (count < 0 && errno != EINTR)) {
             return;
         }
-        collect(devices_, nullptr, concerned);
-        collect(links_, "net", concerned);
-        if (count == 0) {
-            const bool everything = concerned.contains("");
-            for (const std::string& subsystem : everything ? std::set<std::string>{""} : concerned) {
-                changed_(subsystem);
-            }
-            concerned.clear();
+        const bool none = concerned_.empty();
+        if (collect(news_.devices, nullptr, concerned_) + collect(news_.links, "net", concerned_) > 0) {
+            last_ = std::chrono::steady_clock::now();
+            first_ = none ? last_ : first_;
         }
     }
 }

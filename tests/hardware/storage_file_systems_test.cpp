@@ -4,11 +4,12 @@
 #include <unistd.h>
 
 #include <chrono>
+#include <filesystem>
+#include <fstream>
 
 #include "plugins/hardware/storage/mounts.h"
 #include "plugins/hardware/storage/own_devices.h"
 #include "plugins/hardware/storage/storage.h"
-#include "tests/hardware/golden.h"
 #include "tests/hardware/storage_host.h"
 
 namespace {
@@ -195,7 +196,7 @@ std::string swapImage() {
     image.replace(kPage - 10, 10, "SWAPSPACE2");
     const std::string path =
         std::filesystem::temp_directory_path() / ("swap-image-" + std::to_string(getpid()));
-    fake_host::writeFile(path, image);
+    std::ofstream(path) << image;
     return path;
 }
 

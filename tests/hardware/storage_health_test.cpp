@@ -2,7 +2,6 @@
 #include <gmock/gmock.h>
 
 #include "plugins/hardware/storage/health.h"
-#include "tests/hardware/golden.h"
 #include "tests/hardware/storage_host.h"
 
 namespace {
@@ -337,7 +336,7 @@ TEST(DriveHealth, OfSeveralControllersThatLeadToADriveTheFirstThatWorksIsAsked) 
          std::map<std::string, std::string>{{"nvme2", "connecting"}, {"nvme10", "live"}}) {
         host.file("/sys/devices/ctl/" + name + "/state", state);
         host.file("/sys/devices/ctl/" + name + "/dev", "241:" + name.substr(4));
-        host.link("/sys/devices/virtual/nvme-subsystem/nvme-subsys0/" + name, "/sys/devices/ctl/" + name);
+        host.link("/sys/devices/virtual/nvme-subsystem/nvme-subsys0/" + name, "../../../ctl/" + name);
     }
     factsOf(host.asRoot(), Class::drive, "nvme0n1");
     EXPECT_THAT(host.devices->asked(), ElementsAre("nvme log 2 of 512 bytes: /dev/nvme10 241:10 character"));

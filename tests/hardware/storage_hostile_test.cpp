@@ -5,7 +5,6 @@
 #include <chrono>
 
 #include "plugins/hardware/storage/storage.h"
-#include "tests/hardware/golden.h"
 #include "tests/hardware/storage_host.h"
 
 namespace {
@@ -63,14 +62,14 @@ TEST(HostileStorage, LinksThatLeadInRingsEnd) {
     StorageHost host;
     host.file("/sys/devices/virtual/block/dm-0/dm/name", "a");
     host.file("/sys/devices/virtual/block/dm-1/dm/name", "b");
-    host.link("/sys/class/block/dm-0", "/sys/devices/virtual/block/dm-0");
-    host.link("/sys/class/block/dm-1", "/sys/devices/virtual/block/dm-1");
-    host.link("/sys/devices/virtual/block/dm-0/slaves/dm-1", "/sys/devices/virtual/block/dm-1");
-    host.link("/sys/devices/virtual/block/dm-1/slaves/dm-0", "/sys/devices/virtual/block/dm-0");
-    host.link("/sys/class/block/sdz", "/sys/class/block/sdz");
-    host.link("/sys/class/block/sdy/device", "/sys/class/block/sdy/device");
+    host.link("/sys/class/block/dm-0", "../../../sys/devices/virtual/block/dm-0");
+    host.link("/sys/class/block/dm-1", "../../../sys/devices/virtual/block/dm-1");
+    host.link("/sys/devices/virtual/block/dm-0/slaves/dm-1", "../../dm-1");
+    host.link("/sys/devices/virtual/block/dm-1/slaves/dm-0", "../../dm-0");
+    host.link("/sys/class/block/sdz", "sdz");
+    host.link("/sys/class/block/sdy/device", "device");
     host.file("/sys/class/block/odd/partition", "1");
-    host.link("/sys/class/block/odd/odd", "/sys/class/block/odd");
+    host.link("/sys/class/block/odd/odd", "../odd");
     EXPECT_EQ(factsOf(host.asRoot(), Class::mapping, "dm-0").at("Members"), "dm-1");
     EXPECT_THAT(hardware::listDrives(host.asRoot()), IsEmpty());
     EXPECT_THAT(hardware::listPartitions(host.asRoot()), IsEmpty());

@@ -1,5 +1,7 @@
 #include "plugins/hardware/memory/memory.h"
 
+#include <climits>
+
 namespace hardware {
 
 namespace {
@@ -35,7 +37,7 @@ std::optional<unsigned long long> counted(const std::vector<std::string>& lines,
     for (const std::string& line : lines) {
         if (line.starts_with(key + ":") && line.ends_with(" kB")) {
             const auto count = asNumber(trimmed(line.substr(key.size() + 1, line.size() - key.size() - 4)));
-            return count ? std::optional(*count * 1024) : std::nullopt;
+            return count && *count <= ULLONG_MAX / 1024 ? std::optional(*count * 1024) : std::nullopt;
         }
     }
     return std::nullopt;

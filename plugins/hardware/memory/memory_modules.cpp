@@ -41,7 +41,8 @@ struct Sort {
     const char* name;
 };
 
-constexpr std::array<Sort, 17> kSorts = {{{0x03, "DRAM"},
+constexpr std::array<Sort, 19> kSorts = {{{0x03, "DRAM"},
+                                          {0x07, "RAM"},
                                           {0x0f, "SDRAM"},
                                           {0x12, "DDR"},
                                           {0x13, "DDR2"},
@@ -57,7 +58,8 @@ constexpr std::array<Sort, 17> kSorts = {{{0x03, "DRAM"},
                                           {0x20, "HBM"},
                                           {0x21, "HBM2"},
                                           {0x22, "DDR5"},
-                                          {0x23, "LPDDR5"}}};
+                                          {0x23, "LPDDR5"},
+                                          {0x24, "HBM3"}}};
 
 /// In bytes; nothing for an empty slot and for a size that the firmware does not know.
 std::optional<unsigned long long> sizeOf(const SmbiosRecord& record) {
@@ -68,12 +70,13 @@ std::optional<unsigned long long> sizeOf(const SmbiosRecord& record) {
     if (size == 0 || size == kUnknown) {
         return std::nullopt;
     }
+    unsigned long long bytes = static_cast<unsigned long long>(size) << 20U;
     if (size == kElsewhere) {
-        const auto large = record.doubleWord(0x1c);
-        return large ? std::optional((*large & 0x7fffffffULL) << 20U) : std::nullopt;
+        bytes = (record.doubleWord(0x1c).value_or(0) & 0x7fffffffULL) << 20U;
+    } else if ((size & kInKibibytes) != 0) {
+        bytes = (size & 0x7fffULL) << 10U;
     }
-    return (size & kInKibibytes) != 0 ? (size & 0x7fffULL) << 10U
-                                      : static_cast<unsigned long long>(size) << 20U;
+    return bytes == 0 ? std::nullopt : std::optional(bytes);
 }
 
 /// The speed it is run with, else the one it could be run with.
@@ -81,8 +84,8 @@ std::optional<unsigned long long> speedOf(const SmbiosRecord& record) {
     for (const auto& [offset, larger] : {std::pair<std::size_t, std::size_t>{0x20, 0x58}, {0x15, 0x54}}) {
         const std::uint16_t speed = record.word(offset).value_or(0);
         if (speed == 0xffff) {
-            const auto large = record.doubleWord(larger);
-            return large ? std::optional<unsigned long long>(*large & 0x7fffffffU) : std::nullopt;
+            const std::uint32_t large = record.doubleWord(larger).value_or(0) & 0x7fffffffU;
+            return large == 0 ? std::nullopt : std::optional<unsigned long long>(large);
         }
         if (speed != 0) {
             return speed;

@@ -13,11 +13,29 @@ namespace {
 
 constexpr std::size_t kHeader = 4;  // type, length, handle
 constexpr std::uint8_t kEnd = 127;
+// A table that lies costs no more than this.
+constexpr std::size_t kMostRecords = 4096;
+constexpr std::size_t kMostTexts = 255;  // a byte names them
 
 // What firmware writes where its maker has filled nothing in.
-constexpr std::array<std::string_view, 10> kNothing = {
-    "Not Specified", "Unknown", "None",           "NO DIMM",       "To Be Filled By O.E.M.",
-    "Not Provided",  "N/A",     "Default string", "Not Available", "Empty"};
+constexpr std::array<std::string_view, 18> kNothing = {"Not Specified",
+                                                       "Unknown",
+                                                       "UNKNOWN",
+                                                       "None",
+                                                       "NO DIMM",
+                                                       "To Be Filled By O.E.M.",
+                                                       "To be filled by O.E.M.",
+                                                       "Not Provided",
+                                                       "Not Applicable",
+                                                       "N/A",
+                                                       "Default string",
+                                                       "Not Available",
+                                                       "Empty",
+                                                       "System manufacturer",
+                                                       "System Product Name",
+                                                       "System Serial Number",
+                                                       "Undefined",
+                                                       "0000000000000000"};
 
 std::uint8_t byteAt(const std::string& bytes, std::size_t place) {
     return static_cast<std::uint8_t>(bytes[place]);
@@ -33,7 +51,9 @@ std::size_t readTexts(const std::string& table, std::size_t at, std::vector<std:
         if (end == std::string::npos) {
             return end;
         }
-        texts.push_back(printable(trimmed(table.substr(at, end - at))));
+        if (texts.size() < kMostTexts) {
+            texts.push_back(printable(trimmed(table.substr(at, end - at))));
+        }
         at = end + 1;
     }
     return at < table.size() ? at + 1 : std::string::npos;
@@ -74,14 +94,21 @@ std::optional<std::string> SmbiosRecord::text(std::size_t offset) const {
     if (place == 0 || place > texts_.size()) {
         return std::nullopt;
     }
-    const std::string& text = texts_[place - 1];
-    const bool nothing = text.empty() || std::find(kNothing.begin(), kNothing.end(), text) != kNothing.end();
-    return nothing ? std::nullopt : std::optional(text);
+    return firmwareText(texts_[place - 1]);
+}
+
+std::optional<std::string> firmwareText(const std::optional<std::string>& text) {
+    const bool nothing =
+        !text || text->empty() || std::find(kNothing.begin(), kNothing.end(), *text) != kNothing.end();
+    return nothing ? std::nullopt : text;
 }
 
 std::vector<SmbiosRecord> readSmbios(const std::string& table) {
     std::vector<SmbiosRecord> records;
     for (std::size_t at = 0; at != std::string::npos && at + kHeader <= table.size();) {
+        if (records.size() == kMostRecords) {
+            break;
+        }
         const std::uint8_t type = byteAt(table, at);
         const std::size_t length = byteAt(table, at + 1);
         if (type == kEnd || length < kHeader || at + length > table.size()) {

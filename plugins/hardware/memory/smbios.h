@@ -29,7 +29,11 @@ private:
     std::vector<std::string> texts_;
 };
 
-/// The structures of a table as /sys/firmware/dmi/tables/DMI has it; ends at the first that is damaged.
+/// A text of the firmware; nothing for words that stand for none.
+std::optional<std::string> firmwareText(const std::optional<std::string>& text);
+
+/// The structures of a table as /sys/firmware/dmi/tables/DMI has it; ends at the first that is damaged,
+/// and after 4096.
 std::vector<SmbiosRecord> readSmbios(const std::string& table);
 
 }  // namespace hardware

@@ -1,8 +1,10 @@
 #include "plugins/hardware/processor/processors.h"
 
 #include <algorithm>
+#include <array>
 #include <map>
 #include <set>
+#include <utility>
 
 namespace hardware {
 
@@ -54,25 +56,33 @@ constexpr Row kRows[] = {
 
 using Fields = std::map<std::string, std::string>;
 
-/// The section of one processor; where there are none, what stands for all.
-Fields sectionOf(const Host& host, const std::string& processor) {
+/// The sections of these processors in /proc/cpuinfo, one after the other; where there are none, what stands
+/// for all.
+std::vector<Fields> sectionsOf(const Host& host, const std::vector<std::string>& processors) {
+    static const std::set<std::string> kWanted = {"processor", "vendor_id",       "model name", "cpu MHz",
+                                                  "microcode", "CPU implementer", "CPU part",   "cpu"};
+    const std::set<std::string> asked(processors.begin(), processors.end());
+    std::vector<Fields> sections;
     Fields fields;
+    const auto keep = [&] {
+        if (fields.contains("processor") && asked.contains(fields["processor"])) {
+            sections.push_back(fields);
+        }
+    };
     for (const std::string& line : host.lines("/proc/cpuinfo")) {
-        const std::size_t colon = line.find(':');
-        if (colon == std::string::npos) {
+        const std::size_t colon = std::min(line.find(':'), line.size());
+        const std::string key = trimmed(line.substr(0, colon));
+        if (!kWanted.contains(key)) {
             continue;
         }
-        const std::string key = trimmed(line.substr(0, colon));
-        const std::string value = printable(trimmed(line.substr(colon + 1)));
         if (key == "processor") {
-            if (fields.contains(key) && fields[key] == processor) {
-                break;
-            }
+            keep();
             fields.clear();
         }
-        fields[key] = value;
+        fields[key] = printable(trimmed(line.substr(std::min(colon + 1, line.size()))));
     }
-    return fields;
+    keep();
+    return sections.empty() ? std::vector{fields} : sections;
 }
 
 std::optional<std::string> field(const Fields& fields, const std::string& key) {
@@ -80,30 +90,41 @@ std::optional<std::string> field(const Fields& fields, const std::string& key) {
     return found == fields.end() ? std::nullopt : std::optional(found->second);
 }
 
-bool isProcessor(const std::string& name) {
-    return name.starts_with("cpu") && asNumber(name.substr(3));
+/// The package of a processor that is in use; nothing for others. Where the kernel knows no packages, there
+/// is one.
+std::optional<std::string> packageOf(const Host& host, const std::string& name) {
+    const bool processor = name.starts_with("cpu") && asNumber(name.substr(3));
+    if (!processor || host.flag(kAll + name + "/online") == false) {
+        return std::nullopt;
+    }
+    const std::string package = host.line(kAll + name + "/topology/physical_package_id").value_or("0");
+    return package.starts_with('-') ? "0" : package;
 }
 
-/// The processors of a package, by their numbers; one without a topology counts as package 0.
+/// The processors of a package, by their numbers.
 std::vector<std::string> processorsOf(const Host& host, const std::string& package) {
     std::vector<std::string> numbers;
     for (const std::string& name : host.entries(kAll)) {
-        const bool used = isProcessor(name) && host.flag(kAll + name + "/online").value_or(true);
-        if (used && host.line(kAll + name + "/topology/physical_package_id").value_or("0") == package) {
+        if (packageOf(host, name) == package) {
             numbers.push_back(name.substr(3));
         }
     }
     return numbers;
 }
 
-unsigned long long coresOf(const Host& host, const std::vector<std::string>& processors) {
-    std::set<std::string> cores;
+/// Of each core its first processor.
+std::vector<std::string> coresOf(const Host& host, const std::vector<std::string>& processors) {
+    std::set<std::string> known;
+    std::vector<std::string> cores;
     for (const std::string& number : processors) {
         const std::string topology = kAll + "cpu" + number + "/topology/";
-        cores.insert(host.line(topology + "core_cpus_list")
-                         .value_or(host.line(topology + "thread_siblings_list").value_or(number)));
+        const auto siblings = host.line(topology + "core_cpus_list");
+        if (known.insert(siblings ? *siblings : host.line(topology + "thread_siblings_list").value_or(number))
+                .second) {
+            cores.push_back(number);
+        }
     }
-    return cores.size();
+    return cores;
 }
 
 /// "32K", in bytes.
@@ -112,15 +133,15 @@ std::optional<unsigned long long> cacheSize(const std::string& text) {
     return size ? std::optional(*size * 1024) : std::nullopt;
 }
 
-/// Sizes by property; a cache that several processors share counts once.
-std::map<Id, unsigned long long> cachesOf(const Host& host, const std::vector<std::string>& processors) {
+/// Sizes by property; a cache that several cores share counts once.
+std::map<Id, unsigned long long> cachesOf(const Host& host, const std::vector<std::string>& cores) {
     static const std::map<std::string, Id> kSorts = {{"1Data", kLevel1Data},
                                                      {"1Instruction", kLevel1Instructions},
                                                      {"2Unified", kLevel2},
                                                      {"3Unified", kLevel3}};
     std::map<Id, unsigned long long> sizes;
     std::set<std::string> counted;
-    for (const std::string& number : processors) {
+    for (const std::string& number : cores) {
         const std::string caches = kAll + "cpu" + number + "/cache/";
         for (const std::string& index : host.entries(caches)) {
             const std::string cache = caches + index + "/";
@@ -161,21 +182,61 @@ constexpr Part kParts[] = {
     {"0x41", "0xd49", "Neoverse-N2"}, {"0x41", "0xd4f", "Neoverse-V2"}, {"0xc0", "0xac3", "Ampere-1"},
 };
 
+// Those who make processors after the same architecture.
+constexpr std::array<std::pair<const char*, const char*>, 10> kImplementers = {{{"0x41", "ARM"},
+                                                                                {"0x42", "Broadcom"},
+                                                                                {"0x43", "Cavium"},
+                                                                                {"0x46", "Fujitsu"},
+                                                                                {"0x48", "HiSilicon"},
+                                                                                {"0x4e", "NVIDIA"},
+                                                                                {"0x50", "APM"},
+                                                                                {"0x51", "Qualcomm"},
+                                                                                {"0x61", "Apple"},
+                                                                                {"0xc0", "Ampere"}}};
+
 std::optional<std::string> modelOf(const Fields& fields) {
-    if (const auto name = field(fields, "model name")) {
-        return name;
-    }
     for (const Part& part : kParts) {
         if (field(fields, "CPU implementer") == part.implementer && field(fields, "CPU part") == part.part) {
             return part.name;
         }
     }
-    return field(fields, "cpu");  // PowerPC
+    const auto name = field(fields, "model name");
+    return name ? name : field(fields, "cpu");  // PowerPC
+}
+
+/// The model; a processor with cores of several kinds is named after all of them.
+std::string modelsOf(const std::vector<Fields>& sections) {
+    std::vector<std::string> models;
+    for (const Fields& fields : sections) {
+        const std::optional<std::string> model = modelOf(fields);
+        if (model && std::find(models.begin(), models.end(), *model) == models.end()) {
+            models.push_back(*model);
+        }
+    }
+    std::string text;
+    for (const std::string& model : models) {
+        text += (text.empty() ? "" : ", ") + model;
+    }
+    return text;
 }
 
 std::optional<std::string> makerOf(const Fields& fields) {
     const auto implementer = field(fields, "CPU implementer");
-    return implementer == "0x41" ? "ARM" : implementer ? implementer : field(fields, "vendor_id");
+    const auto known = std::find_if(kImplementers.begin(), kImplementers.end(),
+                                    [&](const auto& one) { return implementer == one.first; });
+    if (known != kImplementers.end()) {
+        return known->second;
+    }
+    return implementer ? implementer : field(fields, "vendor_id");
+}
+
+/// The fastest of them, in kilohertz.
+std::optional<unsigned long long> topFrequency(const Host& host, const std::vector<std::string>& cores) {
+    std::optional<unsigned long long> top;
+    for (const std::string& number : cores) {
+        top = std::max(top, host.number(kAll + "cpu" + number + "/cpufreq/cpuinfo_max_freq"));
+    }
+    return top;
 }
 
 std::vector<std::string> weaknesses(const Host& host) {
@@ -199,8 +260,8 @@ Rows processorRows() {
 std::vector<std::string> listProcessors(const Host& host) {
     std::set<std::string, decltype(&comesBefore)> packages(comesBefore);
     for (const std::string& name : host.entries(kAll)) {
-        if (isProcessor(name)) {
-            packages.insert(host.line(kAll + name + "/topology/physical_package_id").value_or("0"));
+        if (const auto package = packageOf(host, name)) {
+            packages.insert(*package);
         }
     }
     return {packages.begin(), packages.end()};
@@ -211,20 +272,21 @@ void describeProcessor(const Host& host, Found& found) {
     if (processors.empty()) {
         return;
     }
-    const Fields fields = sectionOf(host, processors.front());
-    const std::string frequency = kAll + "cpu" + processors.front() + "/cpufreq/";
+    const std::vector<Fields> sections = sectionsOf(host, processors);
+    const Fields& first = sections.front();
+    const std::vector<std::string> cores = coresOf(host, processors);
     Facts& facts = found.facts;
-    facts.text(kMaker, makerOf(fields));
-    facts.text(kModel, modelOf(fields));
-    facts.number(kCores, coresOf(host, processors));
+    facts.text(kMaker, makerOf(first));
+    facts.text(kModel, modelsOf(sections));
+    facts.number(kCores, cores.size());
     facts.number(kThreads, processors.size());
-    for (const auto& [property, size] : cachesOf(host, processors)) {
+    for (const auto& [property, size] : cachesOf(host, cores)) {
         facts.number(property, size);
     }
-    const auto scaled = host.number(frequency + "scaling_cur_freq");
-    facts.number(kFrequency, scaled ? scaled : kilohertz(field(fields, "cpu MHz")));
-    facts.number(kTopFrequency, host.number(frequency + "cpuinfo_max_freq"));
-    facts.text(kMicrocode, field(fields, "microcode"));
+    const auto scaled = host.number(kAll + "cpu" + processors.front() + "/cpufreq/scaling_cur_freq");
+    facts.number(kFrequency, scaled ? scaled : kilohertz(field(first, "cpu MHz")));
+    facts.number(kTopFrequency, topFrequency(host, cores));
+    facts.text(kMicrocode, field(first, "microcode"));
     facts.texts(kWeaknesses, weaknesses(host));
 }
 

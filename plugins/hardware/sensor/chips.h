@@ -11,6 +11,7 @@ namespace hardware {
 /// A chip with sensors.
 struct Chip {
     std::string name;       ///< "coretemp-isa-0000": the chip and where it sits, the same after a restart
+    std::string sort;       ///< "coretemp"
     std::string directory;  ///< where its files are
 };
 

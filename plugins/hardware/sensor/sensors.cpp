@@ -27,6 +27,7 @@ enum : Id {
     kHigh,
     kCritical,
     kAlarm,
+    kFault,
 };
 
 constexpr Row row(Id id, const char* name, Kind kind, const char* unit, const char* source,
@@ -48,7 +49,9 @@ constexpr Row kRows[] = {
     row(kLow, "LowLimit", Kind::number, "as the value", "*_min", "what is too low"),
     row(kHigh, "HighLimit", Kind::number, "as the value", "*_max", "what is too high"),
     row(kCritical, "CriticalLimit", Kind::number, "as the value", "*_crit", "what does harm"),
-    row(kAlarm, "Alarm", Kind::flag, "", "*_alarm", "whether the chip gives an alarm"),
+    row(kAlarm, "Alarm", Kind::flag, "", "*_alarm, *_min_alarm, *_max_alarm, *_crit_alarm",
+        "whether the chip gives an alarm"),
+    row(kFault, "Fault", Kind::flag, "", "*_fault", "whether the sensor is broken; it then has no value"),
 };
 
 struct Sort {
@@ -88,11 +91,14 @@ std::vector<std::string> sensorsOf(const Host& host, const Chip& chip) {
     return names;
 }
 
-bool isLoneZone(const Host& host, const std::string& name) {
-    const std::vector<std::string> entries = host.entries(kZones + name);
-    return name.starts_with("thermal_zone") &&
-           std::none_of(entries.begin(), entries.end(),
-                        [](const std::string& entry) { return entry.starts_with("hwmon"); });
+/// Whether a chip shows the zone's temperature. Zones of one type share a chip, which is named after the type
+/// and sits at the first of them; the package's zone is a sensor of coretemp.
+bool isCovered(const Host& host, const std::string& zone, const std::vector<std::string>& chipSorts) {
+    std::string type = host.line(kZones + zone + "/type").value_or("");
+    std::replace(type.begin(), type.end(), '-', '_');
+    return std::any_of(chipSorts.begin(), chipSorts.end(), [&type](const std::string& sort) {
+        return sort == type || (type == "x86_pkg_temp" && sort == "coretemp");
+    });
 }
 
 std::optional<double> measured(const Host& host, const std::string& file, double unit) {
@@ -104,6 +110,23 @@ void describeZone(const Host& host, Found& found) {
     const std::string zone = kZones + found.name;
     found.facts.text(kLabel, host.line(zone + "/type"));
     found.facts.real(kTemperature, measured(host, zone + "/temp", 1e-3));
+    for (const std::string& entry : host.entries(zone)) {
+        if (entry.ends_with("_type") && host.line(zone + "/" + entry) == "critical") {
+            const std::string point = entry.substr(0, entry.size() - 5);
+            found.facts.real(kCritical, measured(host, zone + "/" + point + "_temp", 1e-3));
+        }
+    }
+}
+
+/// Some chips give one alarm, others one for each limit. Nothing where there is none.
+std::optional<bool> alarmOf(const Host& host, const std::string& file) {
+    std::optional<bool> any;
+    for (const char* ending : {"_alarm", "_min_alarm", "_max_alarm", "_crit_alarm", "_lcrit_alarm"}) {
+        if (const auto alarm = host.flag(file + ending)) {
+            any = any.value_or(false) || *alarm;
+        }
+    }
+    return any;
 }
 
 }  // namespace
@@ -114,17 +137,23 @@ Rows sensorRows() {
 
 std::vector<std::string> listSensors(const Host& host) {
     std::vector<std::string> names;
+    std::vector<std::string> sorts;
     for (const Chip& chip : chips(host)) {
+        sorts.push_back(chip.sort);
         for (const std::string& sensor : sensorsOf(host, chip)) {
             names.push_back(chip.name + ":" + sensor);
         }
     }
     for (const std::string& zone : host.entries(kZones)) {
-        if (isLoneZone(host, zone)) {
+        if (zone.starts_with("thermal_zone") && !isCovered(host, zone, sorts)) {
             names.push_back(zone);
         }
     }
     return names;
+}
+
+std::string chipOf(const std::string& name) {
+    return name.substr(0, name.rfind(':'));
 }
 
 void describeSensor(const Host& host, Found& found) {
@@ -135,7 +164,7 @@ void describeSensor(const Host& host, Found& found) {
     }
     const std::string sensor = found.name.substr(colon + 1);
     const Sort* const sort = sortOf(sensor);
-    const std::optional<Chip> chip = findChip(host, found.name.substr(0, colon));
+    const std::optional<Chip> chip = findChip(host, chipOf(found.name));
     if (sort == nullptr || !chip) {
         return;
     }
@@ -143,12 +172,16 @@ void describeSensor(const Host& host, Found& found) {
     Facts& facts = found.facts;
     facts.text(kChip, chip->name);
     facts.text(kLabel, host.line(file + "_label"));
-    const auto value = measured(host, file + "_input", sort->unit);
-    facts.real(sort->value, value ? value : measured(host, file + "_average", sort->unit));
+    const std::optional<bool> fault = host.flag(file + "_fault");
+    if (fault != true) {
+        const auto value = measured(host, file + "_input", sort->unit);
+        facts.real(sort->value, value ? value : measured(host, file + "_average", sort->unit));
+    }
     facts.real(kLow, measured(host, file + "_min", sort->unit));
     facts.real(kHigh, measured(host, file + "_max", sort->unit));
     facts.real(kCritical, measured(host, file + "_crit", sort->unit));
-    facts.flag(kAlarm, host.flag(file + "_alarm"));
+    facts.flag(kAlarm, alarmOf(host, file));
+    facts.flag(kFault, fault);
 }
 
 }  // namespace hardware

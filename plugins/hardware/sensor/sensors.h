@@ -9,5 +9,7 @@ namespace hardware {
 Rows sensorRows();
 std::vector<std::string> listSensors(const Host& host);
 void describeSensor(const Host& host, Found& found);
+/// The chip of a sensor: one that hangs would let each of its sensors wait.
+std::string chipOf(const std::string& name);
 
 }  // namespace hardware

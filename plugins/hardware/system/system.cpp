@@ -1,9 +1,14 @@
 #include "plugins/hardware/system/system.h"
 
+#include <sys/utsname.h>
+
 #include <algorithm>
 #include <array>
-#include <set>
+#include <iterator>
 #include <string_view>
+
+#include "plugins/hardware/memory/smbios.h"
+#include "plugins/hardware/processor/processors.h"
 
 namespace hardware {
 
@@ -86,9 +91,10 @@ std::optional<unsigned long long> bootTime(const Host& host) {
 struct Hypervisor {
     std::string_view told;  ///< how the maker or the model begins
     const char* name;
+    bool alsoOfMachines = false;  ///< they give out whole machines, too: the processor decides
 };
 
-constexpr std::array<Hypervisor, 11> kHypervisors = {{{"QEMU", "QEMU"},
+constexpr std::array<Hypervisor, 12> kHypervisors = {{{"QEMU", "QEMU"},
                                                       {"KVM", "KVM"},
                                                       {"VMware", "VMware"},
                                                       {"VirtualBox", "VirtualBox"},
@@ -97,27 +103,12 @@ constexpr std::array<Hypervisor, 11> kHypervisors = {{{"QEMU", "QEMU"},
                                                       {"HVM domU", "Xen"},
                                                       {"Bochs", "Bochs"},
                                                       {"Parallels", "Parallels"},
-                                                      {"Google Compute Engine", "KVM"},
-                                                      {"OpenStack", "KVM"}}};
-
-std::optional<std::string> virtualKind(const Host& host) {
-    if (const auto type = host.line("/sys/hypervisor/type")) {
-        return *type == "xen" ? "Xen" : *type;
-    }
-    for (const char* file : {"product_name", "sys_vendor", "bios_vendor"}) {
-        const std::string told = host.line(std::string("/sys/class/dmi/id/") + file).value_or("");
-        const auto known =
-            std::find_if(kHypervisors.begin(), kHypervisors.end(),
-                         [&told](const Hypervisor& one) { return told.starts_with(one.told); });
-        if (known != kHypervisors.end()) {
-            return known->name;
-        }
-    }
-    return std::nullopt;
-}
+                                                      {"Google Compute Engine", "KVM", true},
+                                                      {"Amazon EC2", "KVM", true},
+                                                      {"OpenStack", "KVM", true}}};
 
 /// The processor says so itself, on x86; nothing where nobody tells.
-std::optional<bool> isVirtual(const Host& host) {
+std::optional<bool> processorIsVirtual(const Host& host) {
     for (const std::string& line : host.lines("/proc/cpuinfo")) {
         if (line.starts_with("flags")) {
             return (line + " ").find(" hypervisor ") != std::string::npos;
@@ -126,15 +117,40 @@ std::optional<bool> isVirtual(const Host& host) {
     return std::nullopt;
 }
 
-std::optional<unsigned long long> sockets(const Host& host) {
-    const std::string all = "/sys/devices/system/cpu/";
-    std::set<std::string> packages;
-    for (const std::string& name : host.entries(all)) {
-        if (const auto package = host.line(all + name + "/topology/physical_package_id")) {
-            packages.insert(*package);
+std::optional<std::string> virtualKind(const Host& host, std::optional<bool> processor) {
+    if (const auto type = host.line("/sys/hypervisor/type")) {
+        // The first domain drives the hardware: it is no guest.
+        const bool guest =
+            host.line("/proc/xen/capabilities").value_or("").find("control_d") == std::string::npos;
+        return !guest ? std::nullopt : *type == "xen" ? "Xen" : type;
+    }
+    for (const char* file : {"product_name", "sys_vendor", "bios_vendor"}) {
+        const std::string told = host.line(std::string("/sys/class/dmi/id/") + file).value_or("");
+        const auto known = std::find_if(kHypervisors.begin(), kHypervisors.end(), [&](const Hypervisor& one) {
+            return told.starts_with(one.told) && (!one.alsoOfMachines || processor == true);
+        });
+        if (known != kHypervisors.end()) {
+            return known->name;
         }
     }
-    return packages.empty() ? std::nullopt : std::optional<unsigned long long>(packages.size());
+    return std::nullopt;
+}
+
+/// A number that nobody has filled in is all 0 or all F.
+std::optional<std::string> uuidOf(const Host& host) {
+    const auto uuid = host.line("/sys/class/dmi/id/product_uuid");
+    const bool told = uuid && uuid->find_first_not_of("0-") != std::string::npos &&
+                      uuid->find_first_not_of("Ff-") != std::string::npos;
+    return told ? uuid : std::nullopt;
+}
+
+std::optional<std::string> architecture(const Host& host) {
+    auto told = host.line("/proc/sys/kernel/arch");
+    utsname names{};
+    if (!told && host.live() && uname(&names) == 0) {  // kernels before 6.1 have no such file
+        told = std::string(std::begin(names.machine));
+    }
+    return told;
 }
 
 template <class Answer>
@@ -153,26 +169,31 @@ std::vector<std::string> listSystem(const Host& /*host*/) {
 }
 
 void describeSystem(const Host& host, Found& found) {
-    const std::string dmi = "/sys/class/dmi/id/";
+    const auto dmi = [&host](const char* file) {
+        return firmwareText(host.line(std::string("/sys/class/dmi/id/") + file));
+    };
     const std::string tree = "/proc/device-tree/";
     Facts& facts = found.facts;
-    facts.text(kMaker, host.line(dmi + "sys_vendor"));
-    facts.text(kModel, firstOf(host.line(dmi + "product_name"), host.line(tree + "model")));
+    facts.text(kMaker, dmi("sys_vendor"));
+    facts.text(kModel, firstOf(dmi("product_name"), host.line(tree + "model")));
     if (host.privileged()) {
-        facts.text(kSerial, firstOf(host.line(dmi + "product_serial"), host.line(tree + "serial-number")));
-        facts.text(kUuid, host.line(dmi + "product_uuid"));
+        facts.text(kSerial, firstOf(dmi("product_serial"), host.line(tree + "serial-number")));
+        facts.text(kUuid, uuidOf(host));
     }
-    facts.text(kFirmwareVersion, host.line(dmi + "bios_version"));
-    facts.text(kFirmwareDate, host.line(dmi + "bios_date"));
-    const std::optional<std::string> kind = virtualKind(host);
-    facts.flag(kVirtual, kind ? std::optional(true) : isVirtual(host));
+    facts.text(kFirmwareVersion, dmi("bios_version"));
+    facts.text(kFirmwareDate, dmi("bios_date"));
+    const std::optional<bool> processor = processorIsVirtual(host);
+    const std::optional<std::string> kind = virtualKind(host, processor);
+    facts.flag(kVirtual, kind ? std::optional(true) : processor);
     facts.text(kVirtualKind, kind);
     facts.number(kBootTime, bootTime(host));
     facts.text(kKernel, host.line("/proc/sys/kernel/osrelease"));
-    facts.text(kArchitecture, host.line("/proc/sys/kernel/arch"));
+    facts.text(kArchitecture, architecture(host));
     facts.text(kDistribution, firstOf(shellValue(host, "/etc/os-release", "PRETTY_NAME"),
                                       shellValue(host, "/usr/lib/os-release", "PRETTY_NAME")));
-    facts.number(kSockets, sockets(host));
+    if (const std::size_t sockets = listProcessors(host).size(); sockets > 0) {
+        facts.number(kSockets, sockets);
+    }
 }
 
 }  // namespace hardware
