@@ -33,6 +33,7 @@ constexpr const char* kMounts = "/proc/1/mountinfo";
 void addDrive(const StorageHost& host) {
     host.block("sda", "pci0/ata1/host0/target0:0:0/0:0:0:0", "8:0");
     host.partition("sda", "sda1", "8:1");
+    host.file("/proc/1/root/", "");
     host.devices->space = [](const auto&) { return Room{1000, 400}; };
 }
 
@@ -46,23 +47,20 @@ no row at all
 39 35 0:62 /
 40 35 0:63 / /\99\04 rw - x /\999 rw)");
     const auto found = hardware::mounts(host.asNobody());
-    ASSERT_EQ(found.all.size(), 3U);
-    EXPECT_EQ(found.root, "/proc/1/root");
-    EXPECT_EQ(found.all[0].where, "/mnt 2\n\\x");
-    EXPECT_EQ(found.all[0].source, "/dev/ro\tot");
-    EXPECT_EQ(
-        found.all[0].number + " " + found.all[0].type + " " + found.all[0].id + " " + found.all[0].under,
-        "98:0 ext3 36 35");
-    EXPECT_EQ(found.all[1].source, "") << "a source without a name";
-    EXPECT_EQ(found.all[2].where, "/\\99\\04");
+    ASSERT_EQ(found.size(), 3U);
+    EXPECT_EQ(found[0].where, "/mnt 2\n\\x");
+    EXPECT_EQ(found[0].source, "/dev/ro\tot");
+    EXPECT_EQ(found[0].number + " " + found[0].type + " " + found[0].id + " " + found[0].under,
+              "98:0 ext3 36 35");
+    EXPECT_EQ(found[1].source, "") << "a source without a name";
+    EXPECT_EQ(found[2].where, "/\\99\\04");
 }
 
 TEST(Mounts, ThoseOfThisProcessWhereOthersCannotBeRead) {
     StorageHost host;
     host.file("/proc/self/mountinfo", "22 1 8:1 / /home rw - ext4 /dev/sda1 rw");
-    EXPECT_EQ(hardware::mounts(host.asNobody()).root, "");
-    EXPECT_EQ(hardware::mounts(host.asNobody()).all.size(), 1U);
-    EXPECT_THAT(hardware::mounts(StorageHost().asNobody()).all, IsEmpty());
+    EXPECT_EQ(hardware::mounts(host.asNobody()).size(), 1U);
+    EXPECT_THAT(hardware::mounts(StorageHost().asNobody()), IsEmpty());
 }
 
 std::vector<std::string> roomsAskedFor(const std::string& mountinfo) {
@@ -80,6 +78,18 @@ TEST(FileSystemRoom, IsAskedForWhereTheFirstProcessSeesIt) {
     EXPECT_THAT(roomsAskedFor("22 1 8:1 / / rw - ext4 /dev/root rw"), ElementsAre("room: /proc/1/root/"));
     EXPECT_THAT(roomsAskedFor("22 1 0:20 / / rw - tmpfs x rw\n23 22 8:1 / /a\\040b rw - ext4 /dev/sda1 rw"),
                 ElementsAre("room: /proc/1/root/a b"));
+}
+
+TEST(FileSystemRoom, IsAskedForAmongItsOwnMountsWhereTheFirstProcessIsOutOfReach) {
+    StorageHost host;
+    addDrive(host);
+    host.remove("/proc/1/root");
+    host.file(kMounts, "22 1 8:1 / /srv rw - ext4 /dev/sda1 rw");
+    EXPECT_FALSE(factsOf(host.asRoot(), Class::fileSystem, "sda1").contains("Size"));
+    host.file("/proc/self/mountinfo", "99 1 8:1 / /sandbox/srv rw - ext4 /dev/sda1 rw");
+    const auto facts = factsOf(host.asRoot(), Class::fileSystem, "sda1");
+    EXPECT_EQ(facts.at("Size") + " " + facts.at("Free") + " " + facts.at("MountPoints"), "1000 400 /srv");
+    EXPECT_THAT(host.devices->asked(), Contains("room: /sandbox/srv"));
 }
 
 TEST(FileSystemRoom, IsNotAskedForThroughWhatLiesOverIt) {

@@ -24,4 +24,5 @@ corvista_test(hardware_storage LABELS threads SOURCES
   hardware/storage_file_systems_test.cpp
   hardware/storage_health_test.cpp
   hardware/storage_hostile_test.cpp
+  hardware/storage_this_host_test.cpp
   LIBRARIES hardware_code)

@@ -17,7 +17,8 @@ bool isController(const std::string& name) {
 
 /// The controller of a name space; of several that lead to it, the first that works.
 std::optional<DeviceFile> controllerOf(const Host& host, const std::string& device) {
-    const std::string own = host.target(device).value_or("");
+    const std::string way = host.resolved(device).value_or("");
+    const std::string own = way.substr(way.rfind('/') + 1);
     const std::vector<std::string> names =
         isController(own) ? std::vector<std::string>{""} : host.entries(device);
     for (const std::string& name : names) {

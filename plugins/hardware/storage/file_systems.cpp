@@ -74,11 +74,16 @@ std::vector<std::string> places(const std::vector<Mount>& mounted) {
 
 /// By a mount whose path leads there: what lies over others answers for itself, and a server that has gone
 /// does not answer at all.
-std::optional<Room> roomOf(const Host& host, const std::vector<Mount>& mounted, const Mounts& mounts) {
+std::optional<Room> roomOf(const Host& host, const std::string& name) {
     constexpr std::size_t kTries = 8;
-    for (std::size_t at = 0; host.devices() != nullptr && at < std::min(mounted.size(), kTries); ++at) {
-        if (isWithinReach(mounted[at], mounts.all)) {
-            return host.devices()->room(mounts.root + mounted[at].where);
+    if (host.devices() == nullptr) {
+        return std::nullopt;
+    }
+    const Within within = mountsWithinReach(host);
+    const std::vector<Mount> own = mountsOf(host, name, within.mounts);
+    for (std::size_t at = 0; at < std::min(own.size(), kTries); ++at) {
+        if (leadsThere(own[at], within.mounts)) {
+            return host.devices()->room(within.root + own[at].where);
         }
     }
     return std::nullopt;
@@ -92,7 +97,7 @@ Rows fileSystemRows() {
 
 std::vector<std::string> listFileSystems(const Host& host) {
     std::set<std::string> used;
-    for (const Mount& mount : mounts(host).all) {
+    for (const Mount& mount : mounts(host)) {
         used.insert(isOnSeveralDevices(mount) ? mount.source : mount.number);
     }
     std::vector<std::string> names = block::all(host);
@@ -111,8 +116,7 @@ void describeFileSystem(const Host& host, Found& found) {
         return;
     }
     found.parent = {*holder, found.name};
-    const Mounts mounted = mounts(host);
-    const std::vector<Mount> own = mountsOf(host, found.name, mounted.all);
+    const std::vector<Mount> own = mountsOf(host, found.name, mounts(host));
     const DeviceContents contents = contentsOf(host, found.name, !own.empty());
     const bool driverTells = !own.empty() && (!own.front().type.starts_with("fuse") || !contents.type);
     Facts& facts = found.facts;
@@ -122,7 +126,7 @@ void describeFileSystem(const Host& host, Found& found) {
         facts.text(kUuid, contents.uuid);
     }
     facts.texts(kMountPoints, places(own));
-    if (const auto room = roomOf(host, own, mounted)) {
+    if (const auto room = own.empty() ? std::nullopt : roomOf(host, found.name)) {
         facts.number(kSize, room->size);
         facts.number(kFree, room->free);
     }

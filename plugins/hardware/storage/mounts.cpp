@@ -4,6 +4,7 @@
 #include <array>
 #include <map>
 #include <optional>
+#include <set>
 #include <string_view>
 
 namespace hardware {
@@ -67,28 +68,36 @@ bool hasServer(const std::string& type) {
            std::find(kWithServer.begin(), kWithServer.end(), type) != kWithServer.end();
 }
 
-}  // namespace
+constexpr const char* kFirst = "/proc/1/mountinfo";
+constexpr const char* kOwn = "/proc/self/mountinfo";
 
-Mounts mounts(const Host& host) {
+std::vector<Mount> rowsOf(const Host& host, const char* file) {
     constexpr std::size_t kLongest = 16UL << 20;  // a host with many containers has tens of thousands
-    Mounts found{{}, "/proc/1/root"};
-    std::optional<std::string> text = host.text("/proc/1/mountinfo", kLongest);
-    if (!text || text->empty()) {
-        text = host.text("/proc/self/mountinfo", kLongest);
-        found.root.clear();
-    }
-    std::string_view rest = text ? std::string_view(*text) : std::string_view();
-    while (!rest.empty()) {
+    std::vector<Mount> found;
+    const std::string text = host.text(file, kLongest).value_or("");
+    for (std::string_view rest = text; !rest.empty();) {
         const std::string_view line = rest.substr(0, rest.find('\n'));
         rest.remove_prefix(std::min(line.size() + 1, rest.size()));
         if (auto mount = parsed(line)) {
-            found.all.push_back(std::move(*mount));
+            found.push_back(std::move(*mount));
         }
     }
     return found;
 }
 
-bool isWithinReach(const Mount& mount, const std::vector<Mount>& all) {
+}  // namespace
+
+std::vector<Mount> mounts(const Host& host) {
+    std::vector<Mount> all = rowsOf(host, kFirst);
+    return all.empty() ? rowsOf(host, kOwn) : all;
+}
+
+Within mountsWithinReach(const Host& host) {
+    const bool allowed = host.exists("/proc/1/root/.");
+    return allowed ? Within{rowsOf(host, kFirst), "/proc/1/root"} : Within{rowsOf(host, kOwn), ""};
+}
+
+bool leadsThere(const Mount& mount, const std::vector<Mount>& all) {
     std::map<std::string_view, const Mount*> byId;
     for (const Mount& one : all) {
         byId[one.id] = &one;

@@ -1,6 +1,5 @@
 #pragma once
 
-#include <set>
 #include <string>
 #include <vector>
 
@@ -18,18 +17,20 @@ struct Mount {
     std::string source;
 };
 
-/// The mounts of the host in their order, and whose they are.
-struct Mounts {
-    std::vector<Mount> all;
-    /// What leads to them from here: the mounts are those of the first process, and this one may see others.
-    /// "" where only those of this process may be read.
+/// The mounts of the host in their order: those of the first process, for this one may have others of its
+/// own.
+std::vector<Mount> mounts(const Host& host);
+
+/// Mounts that this process can go to, and what leads there: those of the first process below "/proc/1/root",
+/// or where that is not allowed its own.
+struct Within {
+    std::vector<Mount> mounts;
     std::string root;
 };
-
-Mounts mounts(const Host& host);
+Within mountsWithinReach(const Host& host);
 
 /// Whether the path of a mount leads to it, and by no file system whose server could be gone: nothing lies
 /// over it.
-bool isWithinReach(const Mount& mount, const std::vector<Mount>& all);
+bool leadsThere(const Mount& mount, const std::vector<Mount>& all);
 
 }  // namespace hardware
