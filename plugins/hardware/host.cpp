@@ -17,10 +17,8 @@ namespace hardware {
 
 namespace {
 
-constexpr std::size_t kMost = 1UL << 20;
-
 /// Never blocks on a FIFO that somebody put in the place of a file.
-std::optional<std::string> readFile(const std::string& path) {
+std::optional<std::string> readFile(const std::string& path, std::size_t most) {
     const int file = open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY);
     if (file < 0) {
         return std::nullopt;
@@ -28,7 +26,7 @@ std::optional<std::string> readFile(const std::string& path) {
     std::string text;
     std::array<char, 4096> piece{};
     ssize_t count = 0;
-    while (text.size() < kMost &&
+    while (text.size() < most &&
            ((count = read(file, piece.data(), piece.size())) > 0 || (count < 0 && errno == EINTR))) {
         text.append(piece.data(), count > 0 ? static_cast<std::size_t>(count) : 0);
     }
@@ -75,10 +73,11 @@ std::size_t letterAt(const std::string& text, std::size_t place) {
 
 }  // namespace
 
-Host::Host(std::string root, bool privileged) : root_(std::move(root)), privileged_(privileged) {}
+Host::Host(std::string root, bool privileged, std::shared_ptr<Devices> devices)
+    : root_(std::move(root)), privileged_(privileged), devices_(std::move(devices)) {}
 
-std::optional<std::string> Host::text(const std::string& path) const {
-    return readFile(root_ + path);
+std::optional<std::string> Host::text(const std::string& path, std::size_t most) const {
+    return readFile(root_ + path, most);
 }
 
 std::optional<std::string> Host::line(const std::string& path) const {

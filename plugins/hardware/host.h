@@ -1,29 +1,36 @@
 #pragma once
 
+#include <memory>
 #include <optional>
 #include <string>
 #include <vector>
 
 namespace hardware {
 
+class Devices;
+
 /// The host as the kernel's files show it: /sys, /proc, /run/udev, /etc. Everything is read below one root,
 /// so that a recorded host can stand in for this one. No process is started, nothing is written, no device is
-/// opened here.
+/// opened here: what only devices know has a way of its own.
 class Host {
 public:
     /// @param root "" for this host, else the directory that holds its sys, proc, etc and run
-    explicit Host(std::string root = "", bool privileged = false);
+    /// @param devices what may be asked besides; none: nothing
+    explicit Host(std::string root = "", bool privileged = false, std::shared_ptr<Devices> devices = nullptr);
 
     /// Whether devices may be asked: a recorded host has none.
     bool live() const { return root_.empty(); }
     /// Whether serial numbers and the like may be told.
     bool privileged() const { return privileged_; }
+    /// The devices themselves; a null pointer where only files may be read.
+    Devices* devices() const { return devices_.get(); }
 
     /// The first line without blanks at its ends; nothing when the file cannot be read or the line is empty.
     /// Bytes that are no printable text are shown as '?'.
     std::optional<std::string> line(const std::string& path) const;
-    /// The whole file, up to 1 MiB.
-    std::optional<std::string> text(const std::string& path) const;
+    static constexpr std::size_t kUsualMost = 1UL << 20;
+    /// The whole file, up to `most` bytes.
+    std::optional<std::string> text(const std::string& path, std::size_t most = kUsualMost) const;
     std::vector<std::string> lines(const std::string& path) const;
     /// The first line as a decimal number, or with 0x as a hexadecimal one.
     std::optional<unsigned long long> number(const std::string& path) const;
@@ -44,6 +51,7 @@ public:
 private:
     std::string root_;
     bool privileged_;
+    std::shared_ptr<Devices> devices_;
 };
 
 /// Whether "eth2" comes before "eth10": runs of digits count as numbers.

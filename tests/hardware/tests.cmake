@@ -18,3 +18,11 @@ corvista_test(hardware_links SOURCES
   hardware/recorded_host.cpp
   hardware/this_host_test.cpp
   LIBRARIES hardware_code)
+
+corvista_test(hardware_storage LABELS threads SOURCES
+  hardware/recorded_host.cpp
+  hardware/storage_file_systems_test.cpp
+  hardware/storage_health_test.cpp
+  hardware/storage_hostile_test.cpp
+  hardware/storage_this_host_test.cpp
+  LIBRARIES hardware_code)

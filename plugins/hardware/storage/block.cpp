@@ -1,6 +1,7 @@
 #include "plugins/hardware/storage/block.h"
 
 #include <algorithm>
+#include <limits>
 #include <sstream>
 
 namespace hardware::block {
@@ -41,7 +42,13 @@ std::string directory(const std::string& name) {
 std::optional<Class> classOf(const Host& host, const std::string& name) {
     const std::string path = directory(name);
     if (host.exists(path + "/partition")) {
-        return Class::partition;
+        const auto holder = holderOf(host, name);
+        const bool known = holder && holder != name && !host.exists(directory(*holder) + "/partition") &&
+                           classOf(host, *holder);
+        return known ? std::optional(Class::partition) : std::nullopt;
+    }
+    if (host.flag(path + "/hidden").value_or(false)) {
+        return std::nullopt;
     }
     if (host.exists(path + "/md")) {
         return Class::array;
@@ -58,9 +65,33 @@ std::vector<std::string> ofClass(const Host& host, Class type) {
     return names;
 }
 
+std::optional<std::string> holderOf(const Host& host, const std::string& partition) {
+    const std::string way = host.resolved(directory(partition) + "/..").value_or("");
+    const std::string holder = way.substr(way.rfind('/') + 1);
+    return holder.empty() ? std::nullopt : std::optional(holder);
+}
+
+DeviceFile fileOf(const Host& host, const std::string& name) {
+    DeviceFile file{"/dev/" + name, number(host, name).value_or(""),
+                    host.line(directory(name) + "/diskseq").value_or("")};
+    std::replace(file.path.begin(), file.path.end(), '!', '/');
+    return file;
+}
+
+bool isSuspended(const Host& host, const std::string& name) {
+    const std::string path = directory(name);
+    const std::string drive = host.exists(path + "/partition") ? path + "/.." : path;
+    return host.line(drive + "/device/power/runtime_status") == "suspended";
+}
+
+std::optional<unsigned long long> bytes(std::optional<unsigned long long> sectors) {
+    const bool fits = sectors && *sectors <= std::numeric_limits<unsigned long long>::max() / kSector;
+    return fits ? std::optional(*sectors * kSector) : std::nullopt;
+}
+
 std::optional<unsigned long long> sizeOf(const Host& host, const std::string& name) {
     const auto sectors = host.number(directory(name) + "/size");
-    return sectors && *sectors != 0 ? std::optional(*sectors * kSector) : std::nullopt;
+    return sectors != 0ULL ? bytes(sectors) : std::nullopt;
 }
 
 std::optional<std::string> number(const Host& host, const std::string& name) {
@@ -69,6 +100,10 @@ std::optional<std::string> number(const Host& host, const std::string& name) {
 
 std::vector<std::string> slaves(const Host& host, const std::string& name) {
     return host.entries(directory(name) + "/slaves");
+}
+
+bool hasUdev(const Host& host) {
+    return host.exists("/run/udev/data");
 }
 
 UdevFacts udevFacts(const Host& host, const std::string& name) {
@@ -100,9 +135,9 @@ void count(const Host& host, const std::string& name, const Counters& ids, Facts
     unsigned long long other = 0;
     if (stream >> reads >> other >> readSectors >> other >> writes >> other >> writtenSectors) {
         facts.number(ids.reads, reads);
-        facts.number(ids.readBytes, readSectors * kSector);
+        facts.number(ids.readBytes, bytes(readSectors));
         facts.number(ids.writes, writes);
-        facts.number(ids.writtenBytes, writtenSectors * kSector);
+        facts.number(ids.writtenBytes, bytes(writtenSectors));
     }
 }
 

@@ -3,6 +3,8 @@
 #include <string_view>
 
 #include "plugins/hardware/storage/block.h"
+#include "plugins/hardware/storage/drive_health.h"
+#include "plugins/hardware/storage/identity.h"
 #include "plugins/hardware/storage/storage.h"
 
 namespace hardware {
@@ -29,6 +31,12 @@ enum : Id {
     kWrites,
     kWrittenBytes,
     kErrors,
+    kPower,
+    kTemperature,
+    kWorn,
+    kSpare,
+    kHours,
+    kWarnings,
 };
 
 constexpr Row row(Id id, const char* name, Kind kind, const char* unit, const char* source,
@@ -36,15 +44,20 @@ constexpr Row row(Id id, const char* name, Kind kind, const char* unit, const ch
     return {kType, id, name, kind, unit, source, meaning, Audience::everybody, live};
 }
 
+constexpr const char* kHealth =
+    "NVMe log page 2, ATA SMART and device statistics, SCSI log pages, device/life_time";
+
 constexpr Row kRows[] = {
     row(kTransport, "Transport", Kind::text, "", "where /sys/class/block/DRIVE/device leads",
         "how the drive is attached: nvme, sata, sas, usb, virtio and others"),
     row(kMaker, "Maker", Kind::text, "", "device/vendor", "who made it"),
-    row(kModel, "Model", Kind::text, "", "device/model or device/name", "the model"),
+    row(kModel, "Model", Kind::text, "", "device/vpd_pg89, ID_MODEL_ENC of udev, device/model or device/name",
+        "the model"),
     {kType, kSerial, "SerialNumber", Kind::text, "",
-     "device/serial, serial, device/vpd_pg80 or ID_SERIAL_SHORT of udev", "the serial number",
+     "device/serial, serial, device/vpd_pg80, ID_SERIAL_SHORT of udev", "the serial number",
      Audience::trusted},
-    row(kFirmware, "FirmwareVersion", Kind::text, "", "device/firmware_rev, device/rev or device/fwrev",
+    row(kFirmware, "FirmwareVersion", Kind::text, "",
+        "device/firmware_rev, device/vpd_pg89, ID_REVISION of udev, device/rev, device/fwrev",
         "version of its firmware"),
     {kType, kWwn, "WWN", Kind::text, "", "wwid, device/wwid or ID_WWN of udev", "the world-wide name",
      Audience::trusted},
@@ -61,6 +74,15 @@ constexpr Row kRows[] = {
     row(kWrites, "Writes", Kind::number, "", "stat", "writes completed", true),
     row(kWrittenBytes, "WrittenBytes", Kind::number, "bytes", "stat", "bytes written", true),
     row(kErrors, "Errors", Kind::number, "", "device/ioerr_cnt", "commands that failed", true),
+    row(kPower, "PowerState", Kind::text, "",
+        "device/power/runtime_status, ATA CHECK POWER MODE, SCSI REQUEST SENSE",
+        "active, idle, standby or not ready; what sleeps is asked nothing", true),
+    row(kTemperature, "Temperature", Kind::number, "degrees Celsius", kHealth, "how warm it is inside", true),
+    row(kWorn, "Worn", Kind::number, "percent", kHealth,
+        "part of its life that is used up, as its maker counts it", true),
+    row(kSpare, "Spare", Kind::number, "percent", "NVMe log page 2", "spare blocks that are left", true),
+    row(kHours, "PowerOnHours", Kind::number, "hours", kHealth, "how long it has been running", true),
+    row(kWarnings, "Warnings", Kind::texts, "", kHealth, "what is wrong with it, as it says itself", true),
 };
 
 struct Attachment {
@@ -76,50 +98,29 @@ constexpr std::array<Attachment, 11> kAttachments = {{{"/usb", "usb"},
                                                       {"/end_device-", "sas"},
                                                       {"/rport-", "fibre channel"},
                                                       {"/session", "iscsi"},
-                                                      {"/ata", "sata"},
+                                                      {"/ata", "ata"},
                                                       {"/vbd-", "xen"},
                                                       {"/ide", "ide"},
                                                       {"/host", "scsi"}}};
+
+/// Whose bus it is, of the two that look the same: by the driver of the controller.
+bool isSerialAta(const Host& host, const std::string& way) {
+    const std::size_t start = way.find("/host");
+    const std::string controller =
+        start == std::string::npos ? "" : way.substr(start + 1, way.find('/', start + 1) - start - 1);
+    const std::string driver = host.line("/sys/class/scsi_host/" + controller + "/proc_name").value_or("");
+    return driver == "ahci" || driver.starts_with("sata");
+}
 
 std::optional<std::string> transportOf(const Host& host, const std::string& name) {
     const std::string way = host.resolved(block::directory(name)).value_or("");
     const auto found = std::find_if(kAttachments.begin(), kAttachments.end(), [&way](const Attachment& one) {
         return way.find(one.part) != std::string::npos;
     });
-    return found == kAttachments.end() ? std::nullopt : std::optional<std::string>(found->transport);
-}
-
-/// The first of the files that says something.
-std::optional<std::string> firstLine(const Host& host, const std::string& directory,
-                                     std::initializer_list<const char*> files) {
-    for (const char* file : files) {
-        if (auto line = host.line(directory + "/" + file)) {
-            return line;
-        }
+    if (found == kAttachments.end()) {
+        return std::nullopt;
     }
-    return std::nullopt;
-}
-
-/// The serial number behind the four bytes of its head.
-std::optional<std::string> serialPage(const Host& host, const std::string& directory) {
-    constexpr std::size_t kHead = 4;
-    const std::string page = host.text(directory + "/device/vpd_pg80").value_or("");
-    return page.size() > kHead ? std::optional(printable(trimmed(page.substr(kHead)))) : std::nullopt;
-}
-
-/// Numbers of a vendor (PCI's, an eMMC's) are no names.
-std::optional<std::string> makerOf(const Host& host, const std::string& directory) {
-    const auto maker = host.line(directory + "/device/vendor");
-    return maker && (maker->starts_with("0x") || *maker == "ATA") ? std::nullopt : maker;
-}
-
-void identify(const Host& host, const std::string& directory, Found& found) {
-    const block::UdevFacts udev = block::udevFacts(host, found.name);
-    auto serial = firstLine(host, directory, {"device/serial", "serial"});
-    serial = serial ? serial : serialPage(host, directory);
-    const auto wwn = firstLine(host, directory, {"wwid", "device/wwid"});
-    found.facts.text(kSerial, serial ? serial : block::fact(udev, "ID_SERIAL_SHORT"));
-    found.facts.text(kWwn, wwn ? wwn : block::fact(udev, "ID_WWN"));
+    return found->part == "/ata" && isSerialAta(host, way) ? "sata" : found->transport;
 }
 
 }  // namespace
@@ -135,13 +136,16 @@ std::vector<std::string> listDrives(const Host& host) {
 void describeDrive(const Host& host, Found& found) {
     const std::string directory = block::directory(found.name);
     Facts& facts = found.facts;
-    facts.text(kTransport, transportOf(host, found.name));
-    facts.text(kMaker, makerOf(host, directory));
-    facts.text(kModel, firstLine(host, directory, {"device/model", "device/name"}));
+    const std::optional<std::string> transport = transportOf(host, found.name);
+    const DriveIdentity identity = identify(host, found.name);
+    facts.text(kTransport, transport);
+    facts.text(kMaker, identity.maker);
+    facts.text(kModel, identity.model);
     if (host.privileged()) {
-        identify(host, directory, found);
+        facts.text(kSerial, identity.serial);
+        facts.text(kWwn, identity.wwn);
     }
-    facts.text(kFirmware, firstLine(host, directory, {"device/firmware_rev", "device/rev", "device/fwrev"}));
+    facts.text(kFirmware, identity.firmware);
     facts.number(kSize, block::sizeOf(host, found.name));
     facts.number(kLogicalBlock, host.number(directory + "/queue/logical_block_size"));
     facts.number(kPhysicalBlock, host.number(directory + "/queue/physical_block_size"));
@@ -150,6 +154,8 @@ void describeDrive(const Host& host, Found& found) {
     facts.flag(kReadOnly, host.flag(directory + "/ro"));
     block::count(host, found.name, {kReads, kReadBytes, kWrites, kWrittenBytes}, facts);
     facts.number(kErrors, host.number(directory + "/device/ioerr_cnt"));
+    addHealth(host, found.name, transport.value_or(""),
+              {kPower, kTemperature, kWorn, kSpare, kHours, kWarnings}, facts);
 }
 
 }  // namespace hardware

@@ -1,8 +1,10 @@
-#include <sys/statvfs.h>
-
 #include <algorithm>
+#include <iterator>
+#include <set>
 
 #include "plugins/hardware/storage/block.h"
+#include "plugins/hardware/storage/contents.h"
+#include "plugins/hardware/storage/devices.h"
 #include "plugins/hardware/storage/mounts.h"
 #include "plugins/hardware/storage/storage.h"
 
@@ -22,11 +24,11 @@ enum : Id {
 };
 
 constexpr Row kRows[] = {
-    {kType, kSort, "FileSystemType", Kind::text, "", "/proc/1/mountinfo, else ID_FS_TYPE of udev",
+    {kType, kSort, "FileSystemType", Kind::text, "", "/proc/1/mountinfo, else ID_FS_TYPE of udev or libblkid",
      "ext4, xfs, swap and others"},
-    {kType, kLabel, "Label", Kind::text, "", "ID_FS_LABEL_ENC of udev", "its label"},
-    {kType, kUuid, "UUID", Kind::text, "", "ID_FS_UUID of udev", "the number that no other file system has",
-     Audience::trusted},
+    {kType, kLabel, "Label", Kind::text, "", "ID_FS_LABEL_ENC of udev, else libblkid", "its label"},
+    {kType, kUuid, "UUID", Kind::text, "", "ID_FS_UUID of udev, else libblkid",
+     "the number that no other file system has", Audience::trusted},
     {kType, kMountPoints, "MountPoints", Kind::texts, "", "/proc/1/mountinfo", "where it is mounted",
      Audience::everybody, true},
     {kType, kSize, "Size", Kind::number, "bytes", "statvfs", "how much it holds; told while it is mounted",
@@ -35,30 +37,56 @@ constexpr Row kRows[] = {
      Audience::everybody, true},
 };
 
-/// Where the device is mounted. Some file systems have numbers of their own and name the device only.
+/// File systems on several devices have numbers of their own and name one of the devices. What others write
+/// there is their own idea: a user's FUSE file system can name any device.
+bool isOnSeveralDevices(const Mount& mount) {
+    return mount.type == "btrfs" || mount.type == "bcachefs";
+}
+
+/// What a mount can call a device by.
+std::set<std::string> handles(const Host& host, const std::string& name) {
+    std::set<std::string> names{"/dev/" + name};
+    if (const auto number = block::number(host, name)) {
+        names.insert(*number);
+    }
+    if (const auto mapped = host.line(block::directory(name) + "/dm/name")) {
+        names.insert("/dev/mapper/" + *mapped);
+    }
+    return names;
+}
+
 std::vector<Mount> mountsOf(const Host& host, const std::string& name, const std::vector<Mount>& all) {
-    const std::string number = block::number(host, name).value_or("");
-    const std::string mapped = host.line(block::directory(name) + "/dm/name").value_or("");
-    std::vector<Mount> found = all;
-    std::erase_if(found, [&](const Mount& mount) {
-        const bool named =
-            mount.source == "/dev/" + name || (!mapped.empty() && mount.source == "/dev/mapper/" + mapped);
-        return mount.number != number && !(mount.number.starts_with("0:") && named);
+    const std::set<std::string> own = handles(host, name);
+    std::vector<Mount> found;
+    std::copy_if(all.begin(), all.end(), std::back_inserter(found), [&own](const Mount& mount) {
+        return own.contains(mount.number) || (isOnSeveralDevices(mount) && own.contains(mount.source));
     });
     return found;
 }
 
-bool isFileSystem(const block::UdevFacts& udev) {
-    const auto usage = block::fact(udev, "ID_FS_USAGE");
-    return usage == "filesystem" || block::fact(udev, "ID_FS_TYPE") == "swap";
+std::vector<std::string> places(const std::vector<Mount>& mounted) {
+    std::vector<std::string> texts;
+    for (const Mount& mount : mounted) {
+        texts.push_back(printable(mount.where));
+    }
+    return texts;
 }
 
-void measure(const std::string& where, Facts& facts) {
-    struct statvfs room {};
-    if (statvfs(where.c_str(), &room) == 0 && room.f_blocks != 0) {
-        facts.number(kSize, static_cast<unsigned long long>(room.f_blocks) * room.f_frsize);
-        facts.number(kFree, static_cast<unsigned long long>(room.f_bavail) * room.f_frsize);
+/// By a mount whose path leads there: what lies over others answers for itself, and a server that has gone
+/// does not answer at all.
+std::optional<Room> roomOf(const Host& host, const std::string& name) {
+    constexpr std::size_t kTries = 8;
+    if (host.devices() == nullptr) {
+        return std::nullopt;
     }
+    const Within within = mountsWithinReach(host);
+    const std::vector<Mount> own = mountsOf(host, name, within.mounts);
+    for (std::size_t at = 0; at < std::min(own.size(), kTries); ++at) {
+        if (leadsThere(own[at], within.mounts)) {
+            return host.devices()->room(within.root + own[at].where);
+        }
+    }
+    return std::nullopt;
 }
 
 }  // namespace
@@ -68,32 +96,39 @@ Rows fileSystemRows() {
 }
 
 std::vector<std::string> listFileSystems(const Host& host) {
-    const std::vector<Mount> all = mounts(host);
+    std::set<std::string> used;
+    for (const Mount& mount : mounts(host)) {
+        used.insert(isOnSeveralDevices(mount) ? mount.source : mount.number);
+    }
     std::vector<std::string> names = block::all(host);
     std::erase_if(names, [&](const std::string& name) {
-        return !block::classOf(host, name) ||
-               (mountsOf(host, name, all).empty() && !isFileSystem(block::udevFacts(host, name)));
+        const std::set<std::string> own = handles(host, name);
+        const bool mounted = std::any_of(own.begin(), own.end(),
+                                         [&used](const std::string& one) { return used.contains(one); });
+        return !block::classOf(host, name) || (!mounted && !contentsOf(host, name, false).isFileSystem);
     });
     return names;
 }
 
 void describeFileSystem(const Host& host, Found& found) {
-    const block::UdevFacts udev = block::udevFacts(host, found.name);
-    const std::vector<Mount> mounted = mountsOf(host, found.name, mounts(host));
-    found.parent = {block::classOf(host, found.name).value_or(Class::drive), found.name};
-    Facts& facts = found.facts;
-    facts.text(kSort,
-               mounted.empty() ? block::fact(udev, "ID_FS_TYPE") : std::optional(mounted.front().type));
-    facts.text(kLabel, block::fact(udev, "ID_FS_LABEL_ENC"));
-    if (host.privileged()) {
-        facts.text(kUuid, block::fact(udev, "ID_FS_UUID"));
+    const auto holder = block::classOf(host, found.name);
+    if (!holder) {
+        return;
     }
-    std::vector<std::string> places;
-    std::transform(mounted.begin(), mounted.end(), std::back_inserter(places),
-                   [](const Mount& mount) { return printable(mount.where); });
-    facts.texts(kMountPoints, places);
-    if (host.live() && !mounted.empty()) {
-        measure(mounted.front().where, facts);
+    found.parent = {*holder, found.name};
+    const std::vector<Mount> own = mountsOf(host, found.name, mounts(host));
+    const DeviceContents contents = contentsOf(host, found.name, !own.empty());
+    const bool driverTells = !own.empty() && (!own.front().type.starts_with("fuse") || !contents.type);
+    Facts& facts = found.facts;
+    facts.text(kSort, driverTells ? std::optional(own.front().type) : contents.type);
+    facts.text(kLabel, contents.label);
+    if (host.privileged()) {
+        facts.text(kUuid, contents.uuid);
+    }
+    facts.texts(kMountPoints, places(own));
+    if (const auto room = own.empty() ? std::nullopt : roomOf(host, found.name)) {
+        facts.number(kSize, room->size);
+        facts.number(kFree, room->free);
     }
 }
 

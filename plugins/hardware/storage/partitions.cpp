@@ -28,14 +28,6 @@ constexpr Row kRows[] = {
      "what it is for, as the partition table says it"},
 };
 
-/// The device whose directory holds the partition's.
-std::optional<std::string> holderOf(const Host& host, const std::string& name) {
-    const std::string way = host.resolved(block::directory(name)).value_or("");
-    const std::size_t end = way.rfind('/');
-    const std::size_t start = end == std::string::npos || end == 0 ? end : way.rfind('/', end - 1);
-    return start == std::string::npos ? std::nullopt : std::optional(way.substr(start + 1, end - start - 1));
-}
-
 }  // namespace
 
 Rows partitionRows() {
@@ -47,16 +39,14 @@ std::vector<std::string> listPartitions(const Host& host) {
 }
 
 void describePartition(const Host& host, Found& found) {
-    constexpr unsigned long long kSector = 512;
     const std::string directory = block::directory(found.name);
     const block::UdevFacts udev = block::udevFacts(host, found.name);
-    if (const auto holder = holderOf(host, found.name)) {
+    if (const auto holder = block::holderOf(host, found.name)) {
         found.parent = {block::classOf(host, *holder).value_or(Class::drive), *holder};
     }
     Facts& facts = found.facts;
     facts.number(kNumber, host.number(directory + "/partition"));
-    const auto start = host.number(directory + "/start");
-    facts.number(kStart, start ? std::optional(*start * kSector) : std::nullopt);
+    facts.number(kStart, block::bytes(host.number(directory + "/start")));
     facts.number(kSize, block::sizeOf(host, found.name));
     const auto label = host.field(directory + "/uevent", "PARTNAME");
     facts.text(kLabel, label ? label : block::fact(udev, "ID_PART_ENTRY_NAME"));

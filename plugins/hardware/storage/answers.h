@@ -1,0 +1,80 @@
+#pragma once
+
+#include <chrono>
+#include <functional>
+#include <map>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <string>
+#include <utility>
+
+#include "plugins/hardware/patience.h"
+
+namespace hardware {
+
+/// Answers of devices, kept for a while. A device is asked at most once in that time; one that does not
+/// answer soon is left alone for as long, and its answer counts when it comes. Any thread.
+template <class Answer>
+class Answers {
+public:
+    struct Times {
+        std::chrono::milliseconds patience;
+        std::chrono::milliseconds kept;
+    };
+    explicit Answers(Times times) : kept_(times.kept), patience_(times.patience) {}
+
+    /// @param question owns all that it uses: it may return long after its caller has gone
+    /// @return nothing when the device has not answered
+    std::optional<Answer> of(const std::string& device, std::function<Answer()> question) {
+        if (isDue(device)) {
+            const bool answered =
+                patience_.run(device, [state = state_, device, question = std::move(question)] {
+                    Answer answer = question();
+                    const std::lock_guard lock(state->guard);
+                    state->known[device] = {std::move(answer), Clock::now()};
+                });
+            if (!answered) {
+                const std::lock_guard lock(state_->guard);
+                state_->known[device] = {std::nullopt, Clock::now()};
+            }
+        }
+        const std::lock_guard lock(state_->guard);
+        return state_->known[device].answer;
+    }
+
+private:
+    using Clock = std::chrono::steady_clock;
+    static constexpr std::size_t kMost = 1000;
+    struct Known {
+        std::optional<Answer> answer;
+        std::optional<Clock::time_point> asOf;
+    };
+    struct State {
+        std::mutex guard;
+        std::map<std::string, Known> known;  // guarded
+    };
+
+    /// Whether it is time to ask; who is told so does it, others make do with what is known.
+    bool isDue(const std::string& device) {
+        const std::lock_guard lock(state_->guard);
+        const auto isOld = [this](const Known& known) {
+            return !known.asOf || Clock::now() - *known.asOf >= kept_;
+        };
+        if (state_->known.size() >= kMost) {  // devices come and go
+            std::erase_if(state_->known, [&](const auto& entry) { return isOld(entry.second); });
+        }
+        Known& known = state_->known[device];
+        const bool due = isOld(known);
+        if (due) {
+            known.asOf = Clock::now();
+        }
+        return due;
+    }
+
+    const std::chrono::milliseconds kept_;
+    const std::shared_ptr<State> state_ = std::make_shared<State>();
+    Patience patience_;
+};
+
+}  // namespace hardware

@@ -1,0 +1,40 @@
+#pragma once
+
+#include <memory>
+#include <string>
+
+#include "plugins/hardware/storage/answers.h"
+#include "plugins/hardware/storage/device_access.h"
+#include "plugins/hardware/storage/health.h"
+
+namespace hardware {
+
+/// What only the devices know, asked with patience and kept for a while. Any thread.
+class Devices {
+public:
+    /// How long a device is waited for: shorter than what a source may take, so that a device that hangs
+    /// costs what only it knows and not what the kernel knows of it. A minute is soon enough for
+    /// temperatures; the room of a file system changes faster.
+    struct Times {
+        std::chrono::milliseconds patience{700};
+        std::chrono::milliseconds health{60'000};
+        std::chrono::milliseconds room{400};
+        std::chrono::milliseconds contents{60'000};
+    };
+    explicit Devices(std::shared_ptr<const DeviceAccess> access) : Devices(std::move(access), Times()) {}
+    Devices(std::shared_ptr<const DeviceAccess> access, const Times& times);
+
+    /// Nothing when the drive does not answer, cannot tell or must not be asked.
+    std::optional<Health> health(const HealthSource& source);
+    std::optional<Room> room(const std::string& where);
+    /// Empty when nothing is known.
+    DeviceAccess::Contents contents(const DeviceFile& device);
+
+private:
+    const std::shared_ptr<const DeviceAccess> access_;
+    Answers<Health> health_;
+    Answers<std::optional<Room>> room_;
+    Answers<DeviceAccess::Contents> contents_;
+};
+
+}  // namespace hardware

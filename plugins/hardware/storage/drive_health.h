@@ -1,0 +1,26 @@
+#pragma once
+
+#include <optional>
+#include <string>
+
+#include "plugins/hardware/found.h"
+#include "plugins/hardware/host.h"
+
+namespace hardware {
+
+/// The rows of a drive's health.
+struct HealthIds {
+    Id power;
+    Id temperature;
+    Id worn;
+    Id spare;
+    Id hours;
+    Id warnings;
+};
+
+/// What the drive says of its health, for those who may ask it. One that the kernel lets sleep is not asked.
+/// @param transport how it is attached: some cases with a drive in them do not stand the question
+void addHealth(const Host& host, const std::string& name, const std::string& transport, const HealthIds& ids,
+               Facts& facts);
+
+}  // namespace hardware
