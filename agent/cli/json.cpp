@@ -63,10 +63,14 @@ const char* kindOf(const IC::PropertyValue& value) {
     return kNames.at(value.kind());
 }
 
-/// A failed read has the kind the catalogue promises, since it brought no value.
+/// A failed read has the kind the catalogue promises, since it brought no value. That a property can only be
+/// written is no failure.
 Json readingObject(const Reading& reading) {
     Json object{{"name", reading.name()}};
-    if (reading.failed()) {
+    if (reading.row != nullptr && !reading.row->readable) {
+        object["kind"] = kindName(reading.row->kind);
+        object["value"] = nullptr;
+    } else if (reading.failed()) {
         object["kind"] = reading.row != nullptr ? kindName(reading.row->kind) : "none";
         object["error"] = reading.error;
     } else {

@@ -148,6 +148,7 @@ void Plugin::start(bool processors) {
             setPaths(*interface_);
         });
     } catch (...) {
+        events_.abandon();
         stop();
         throw;
     }
