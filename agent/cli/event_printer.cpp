@@ -51,23 +51,59 @@ int millisecondsTo(const std::optional<Clock::time_point>& end) {
 
 }  // namespace
 
-void EventPrinter::printAll() const {
+void complainOfAlert(const Event& alert) {
+    std::string text = alert.message;
+    text.erase(text.find_last_not_of(' ') + 1);
+    complain("alert: " + (alert.path.empty() ? "(node without a path)" : printable(alert.path)) + ": " +
+             printable(text));
+}
+
+void EventPrinter::printAll() {
+    const std::lock_guard lock(guard_);
     const Subscription::Taken taken = events_.take();
     if (taken.dropped > 0) {
         complain(std::to_string(taken.dropped) + " events came faster than they could be printed");
     }
     for (const Event& event : taken.events) {
-        print(asJson_ ? json::event(event) : line(event, Style::detect()));
+        show(event);
     }
 }
 
-void EventPrinter::follow(const std::optional<double>& seconds) const {
+/// With the guard.
+void EventPrinter::show(const Event& event) {
+    try {
+        if (!failure_) {
+            print(asJson_ ? json::event(event) : line(event, Style::detect()));
+            return;
+        }
+    } catch (const Failure& failure) {
+        failure_ = failure;
+        events_.wake();  // whoever follows is to end
+    }
+    if (event.kind == Event::Kind::alert) {
+        complainOfAlert(event);
+    }
+}
+
+bool EventPrinter::hasFailed() const {
+    const std::lock_guard lock(guard_);
+    return failure_.has_value();
+}
+
+void EventPrinter::throwFailure() const {
+    const std::lock_guard lock(guard_);
+    if (failure_) {
+        throw Failure(*failure_);
+    }
+}
+
+void EventPrinter::follow(const std::optional<double>& seconds) {
     std::optional<Clock::time_point> end;
     if (seconds) {
         end = Clock::now() +
               std::chrono::duration_cast<Clock::duration>(std::chrono::duration<double>(*seconds));
     }
-    while (StopSignals::received() == 0 && (!end || Clock::now() < *end)) {
+    while (StopSignals::received() == 0 && !hasFailed() && (!end || Clock::now() < *end)) {
         pollfd ready[] = {{events_.descriptor(), POLLIN, 0}, {StopSignals::descriptor(), POLLIN, 0}};
         if (poll(ready, 2, millisecondsTo(end)) < 0 && errno != EINTR) {
             throw Failure(ExitStatus::failed, "cannot wait for events");

@@ -1,25 +1,38 @@
 #pragma once
 
+#include <mutex>
 #include <optional>
 
+#include "agent/cli/failure.h"
 #include "agent/core/event_log.h"
 
 namespace cvagent {
 
-/// Prints the events of a subscription, which outlives it, as lines for people or as JSON.
+/// One line on standard error.
+void complainOfAlert(const Event& alert);
+
+/// Prints the events of a subscription, which outlives it, as lines for people or as JSON. Once standard
+/// output takes no more, alerts are told on standard error: the plug-in tells each but once. Any thread.
 class EventPrinter {
 public:
     EventPrinter(Subscription& events, bool asJson) : events_(events), asJson_(asJson) {}
 
-    /// What waits to be printed.
-    void printAll() const;
-    /// Prints events as they come.
+    /// What waits to be printed. Never throws for an output that fails.
+    void printAll();
+    /// Prints events as they come, until the output fails.
     /// @param seconds for how long; nothing: until a signal to stop comes. Throws Failure.
-    void follow(const std::optional<double>& seconds) const;
+    void follow(const std::optional<double>& seconds);
+    /// Throws the Failure of the output, if there was one.
+    void throwFailure() const;
 
 private:
+    void show(const Event& event);
+    bool hasFailed() const;
+
     Subscription& events_;
-    bool asJson_;
+    const bool asJson_;
+    mutable std::mutex guard_;  // guards everything below, and the order of what is printed
+    std::optional<Failure> failure_;
 };
 
 }  // namespace cvagent

@@ -63,13 +63,17 @@ const char* kindOf(const IC::PropertyValue& value) {
     return kNames.at(value.kind());
 }
 
-/// A failed read has the kind the catalogue promises, since it brought no value.
+/// A failed read has the kind the catalogue promises, since it brought no value. That a property can only be
+/// written is no failure.
 Json readingObject(const Reading& reading) {
     Json object{{"name", reading.name()}};
     if (reading.row != nullptr && reading.row->source != nullptr && *unitName(*reading.row) != '\0') {
         object["unit"] = unitName(*reading.row);
     }
-    if (reading.failed()) {
+    if (reading.row != nullptr && !reading.row->readable) {
+        object["kind"] = kindName(reading.row->kind);
+        object["value"] = nullptr;
+    } else if (reading.failed()) {
         object["kind"] = reading.row != nullptr ? kindName(reading.row->kind) : "none";
         object["error"] = reading.error;
     } else {

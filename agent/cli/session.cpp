@@ -1,9 +1,11 @@
 #include "agent/cli/session.h"
 
+#include <mutex>
+
+#include "agent/cli/event_printer.h"
 #include "agent/core/catalogue_file.h"
 #include "agent/core/node_classes.h"
 #include "agent/core/plugin_files.h"
-#include "agent/core/signals.h"
 #include "agent/core/surroundings.h"
 
 namespace cvagent {
@@ -60,6 +62,33 @@ void findPlugins(Options& options) {
     }
 }
 
+/// Where alerts go. The plug-in takes for told what it has told any agent: so whatever the command is, each
+/// is shown, even one of what happened while no agent ran.
+struct Session::Alerts {
+    std::mutex guard;  // guards everything below
+    std::function<void(const Event&)> receiver;
+
+    void tell(const Event& alert) {
+        const std::lock_guard lock(guard);
+        if (receiver) {
+            receiver(alert);
+        }
+    }
+    void set(std::function<void(const Event&)> next) {
+        const std::lock_guard lock(guard);
+        receiver = std::move(next);
+    }
+};
+
+Session::AlertsTo::AlertsTo(Session& session, std::function<void(const Event&)> receiver)
+    : session_(session) {
+    session.alerts_->set(std::move(receiver));
+}
+
+Session::AlertsTo::~AlertsTo() {
+    session_.alerts_->set(complainOfAlert);
+}
+
 ProcessSettings processSettings(Options& options) {
     options.processors = needsProcessors(options);
     findPlugins(options);
@@ -80,14 +109,21 @@ ProcessSettings processSettings(Options& options) {
 
 Session::Session(const PreparedProcess& process, const Options& options, WantMessages& wants)
     : errors_(process.errors()),
+      alerts_(std::make_shared<Alerts>()),
       answersForAll_(options.pluginsNamed || options.command == Command::tree ||
                      options.command == Command::watch),
       pluginMissing_(options.pluginMissing) {
+    if (options.command == Command::watch) {
+        watching_.emplace();
+    } else {
+        alerts_->set(complainOfAlert);
+    }
     AgentSettings settings = process.agentSettings();
     settings.plugins = options.plugins;
     settings.commandTime = std::chrono::duration<double>(options.commandSeconds);
     settings.processors = options.processors;
     settings.tell = complain;
+    settings.alertTold = [alerts = alerts_](const Event& alert) { alerts->tell(alert); };
     hint(limitsOfUser(process.data()), "\nTo see everything run: sudo cvagent");
     hint(limitsOfData(process.data()));
     try {

@@ -1,12 +1,15 @@
 #pragma once
 
+#include <functional>
 #include <memory>
+#include <optional>
 
 #include "agent/cli/failure.h"
 #include "agent/cli/options.h"
 #include "agent/cli/print.h"
 #include "agent/cli/want_messages.h"
 #include "agent/core/process.h"
+#include "agent/core/signals.h"
 
 namespace cvagent {
 
@@ -33,6 +36,17 @@ public:
     void showErrors(const Request& request);
     /// Stops the agent and shows what it reports on its way.
     void end();
+    /// While it lives, alerts go there, on whatever thread brings them, and not to standard error.
+    class AlertsTo {
+    public:
+        AlertsTo(Session& session, std::function<void(const Event&)> receiver);
+        AlertsTo(const AlertsTo&) = delete;
+        AlertsTo& operator=(const AlertsTo&) = delete;
+        ~AlertsTo();
+
+    private:
+        Session& session_;
+    };
     /// What the command's own status comes to when a plug-in is missing: one that was named, or one whose
     /// nodes the answer should hold. A question for a node of another one has its whole answer.
     ExitStatus statusAfter(ExitStatus own) const;
@@ -40,7 +54,11 @@ public:
 private:
     void start(const AgentSettings& settings, WantMessages& wants);
 
+    struct Alerts;
+
     ErrorLines& errors_;
+    const std::shared_ptr<Alerts> alerts_;  // a plug-in's thread that hangs at the end keeps it
+    std::optional<OrderlyEnd> watching_;    // what waits to be printed at a signal is printed
     std::unique_ptr<Agent> agent_;
     bool answersForAll_;  // the answer is about every plug-in
     bool pluginMissing_;

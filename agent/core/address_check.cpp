@@ -2,6 +2,7 @@
 #include <arpa/inet.h>
 
 #include <algorithm>
+#include <array>
 #include <string_view>
 
 #include "agent/core/text.h"
@@ -123,9 +124,15 @@ Value ipv6Address(const Property& /*property*/, Words words) {
     return asText(words, words.size() == 1 && isIpv6Host(words.front()));
 }
 
+/// In the kernel's spelling: the plug-in takes a route to another one for an old route, and removes it.
 Value ipv6Gateway(const Property& /*property*/, Words words) {
     const auto address = words.size() == 1 ? parseIpv6(words.front()) : std::nullopt;
-    return asText(words, address && isIpv6Unicast(*address));
+    if (!address || !isIpv6Unicast(*address)) {
+        return std::nullopt;
+    }
+    std::array<char, INET6_ADDRSTRLEN> text{};
+    inet_ntop(AF_INET6, &*address, text.data(), text.size());
+    return IC::PropertyValue(text.data(), true);
 }
 
 Value prefixLength(const Property& /*property*/, Words words) {

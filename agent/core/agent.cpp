@@ -43,7 +43,7 @@ struct Agent::Engine {
     CommandDeadline deadline;
     EventLog events;
     Facts facts;
-    Announcer announcer{events, facts};
+    Announcer announcer;
     std::vector<std::unique_ptr<Plugin>> plugins;
     std::vector<FailedPlugin> failed;
     Pool pool;
@@ -57,7 +57,8 @@ Agent::Engine::Engine(const AgentSettings& settings)
       tell(settings.tell),
       log(settings.log ? settings.log
                        : std::make_shared<LogOutput>(LogSettings(), std::make_shared<ErrorLines>())),
-      deadline(settings.commandTime, settings.tell) {
+      deadline(settings.commandTime, settings.tell),
+      announcer(events, facts, settings.alertTold) {
     if (!data) {
         throw std::invalid_argument("an agent needs a data directory");
     }

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <chrono>
+#include <functional>
 #include <memory>
 #include <string>
 #include <vector>
@@ -31,6 +32,9 @@ struct AgentSettings {
     std::shared_ptr<DataDirectory> data;
     /// Hears of what belongs to no call. Any thread.
     Tell tell = tellNobody;
+    /// Hears each alert before the plug-in takes it for told, on the plug-in's thread: what nobody has heard
+    /// when the process is ended is told by the next agent. Null: subscriptions alone hear of alerts.
+    std::function<void(const Event&)> alertTold;
 };
 
 /// Plug-ins at work: the one agent behind every front end. It owns data directory, log, deadline of commands,

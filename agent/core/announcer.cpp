@@ -59,6 +59,9 @@ void Announcer::tellAlert(Event event) {
         told_[{event.nodeId, event.property}] = event.after;
     }
     events_.hear(event);
+    if (alertTold_) {
+        alertTold_(event);
+    }
 }
 
 void Announcer::takeStock(const IC::ManagementInterface& interface) {

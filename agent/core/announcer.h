@@ -1,5 +1,6 @@
 #pragma once
 
+#include <functional>
 #include <map>
 #include <mutex>
 #include <set>
@@ -18,7 +19,10 @@ namespace cvagent {
 class Announcer : public Listener {
 public:
     /// Both outlive it.
-    Announcer(EventLog& events, Facts& facts) : events_(events), facts_(facts) {}
+    /// @param alertTold hears each alert on the thread that brings it, before the plug-in goes on; null:
+    /// nobody
+    Announcer(EventLog& events, Facts& facts, std::function<void(const Event&)> alertTold = nullptr)
+        : events_(events), facts_(facts), alertTold_(std::move(alertTold)) {}
 
     void hear(const Event& event) override;
     /// The nodes of a start: no news, but known from now on.
@@ -37,6 +41,7 @@ private:
 
     EventLog& events_;
     Facts& facts_;
+    const std::function<void(const Event&)> alertTold_;
     std::mutex guard_;  // guards everything below, and that events are told in the order of states
     std::set<unsigned int> early_;     // told before the plug-in did
     std::map<Key, std::string> told_;  // the state that the last event told

@@ -139,6 +139,12 @@ const AlertRow* findAlert(const std::string& message) {
     return findRow(&CatalogueTable::alerts, [&text](const AlertRow& row) { return row.message == text; });
 }
 
+const Effect* findEffect(const Property& property) {
+    return findRow(&CatalogueTable::effects, [&property](const Effect& row) {
+        return row.type == property.type && row.id == property.id;
+    });
+}
+
 std::vector<const Property*> propertiesOf(unsigned int nodeType) {
     std::vector<const Property*> rows;
     forEachOf(nodeType, [&rows](const Property& row) {

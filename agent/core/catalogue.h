@@ -89,12 +89,29 @@ struct AlertRow {
 /// Null for an alert that says nothing of the kind.
 const AlertRow* findAlert(const std::string& message);
 
+/// A value that a plug-in took without complaint, and what the property reads now: null when it does not.
+struct Taken {
+    const IC::MutableNode& node;
+    const IC::PropertyValue& written;
+    const IC::PropertyValue* read;
+};
+/// What is to be seen on the host once a property is written. A plug-in's writers report little.
+struct Effect {
+    NodeType type;
+    unsigned int id;
+    /// What is not to be seen, for people; "" when the value has taken effect.
+    std::string (*lacking)(const Taken& taken);
+};
+/// Null for a property of which nothing can be said.
+const Effect* findEffect(const Property& property);
+
 /// What one plug-in brings to the catalogue; it stands in a folder of its own.
 struct CatalogueTable {
     const char* owner;
     std::span<const NodeClass> classes;
     std::vector<std::span<const Property>> properties;
     std::span<const AlertRow> alerts;
+    std::span<const Effect> effects{};
 };
 /// Adds a plug-in's table to the catalogue; it is used until the program ends. Throws std::logic_error when
 /// another table has such a class or property already, or when there are too many tables. Any thread; the

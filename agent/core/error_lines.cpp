@@ -14,6 +14,7 @@ thread_local ErrorLines* ownerHere = nullptr;
 
 void ErrorLines::add(const std::string& text) {
     const std::lock_guard lock(guard_);
+    ++count_;
     const auto known = std::find_if(errors_.begin(), errors_.end(),
                                     [&text](const auto& error) { return error.first == text; });
     if (known != errors_.end()) {
@@ -34,6 +35,11 @@ ErrorLines::Taken ErrorLines::take() {
     taken.lost = std::exchange(lost_, 0);
     errors_.clear();
     return taken;
+}
+
+std::size_t ErrorLines::count() const {
+    const std::lock_guard lock(guard_);
+    return count_;
 }
 
 ErrorScope::ErrorScope(ErrorLines& owner) : outer_(std::exchange(ownerHere, &owner)) {}

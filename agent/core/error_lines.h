@@ -19,11 +19,14 @@ public:
     void add(const std::string& text);
     /// Everything since the last call.
     Taken take();
+    /// How many were ever added.
+    std::size_t count() const;
 
 private:
-    std::mutex guard_;
+    mutable std::mutex guard_;
     std::vector<std::pair<std::string, std::size_t>> errors_;  // text and how often; guarded by guard_
     std::size_t lost_ = 0;                                     // guarded by guard_
+    std::size_t count_ = 0;                                    // guarded by guard_
 };
 
 /// From here to the end of the scope the errors reported on this thread are those of one call.

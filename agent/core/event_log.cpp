@@ -75,6 +75,10 @@ Subscription::Taken Subscription::take() {
     return {events_.takeAll(), std::exchange(dropped_, 0)};
 }
 
+void Subscription::wake() const {
+    eventfd_write(ready_, 1);
+}
+
 /// The subscribers' queues are filled under the log's lock, so that all see the events in one order.
 void EventLog::hear(const Event& event) {
     const std::lock_guard lock(guard_);

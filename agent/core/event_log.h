@@ -55,6 +55,8 @@ public:
     Taken take();
     /// Readable when there is something to take. Only take() reads it.
     int descriptor() const { return ready_; }
+    /// Makes the descriptor readable although there may be nothing to take.
+    void wake() const;
 
 private:
     friend class EventLog;

@@ -130,7 +130,12 @@ void Plugin::takePlace() {
 
 void Plugin::start(bool processors) {
     begun_ = true;
-    guarded("initialize of " + inQuotes(file_), [this, processors] { initialize(processors); });
+    try {
+        guarded("initialize of " + inQuotes(file_), [this, processors] { initialize(processors); });
+    } catch (...) {
+        events_.abandon();
+        throw;
+    }
     events_.release();
 }
 

@@ -6,14 +6,20 @@ void WithheldEvents::hear(const Event& event) {
     if (listener_ == nullptr) {
         return;
     }
-    {
-        const std::lock_guard lock(guard_);
-        if (!released_) {
-            kept_.push_back(event);
-            return;
-        }
+    if (!isKept(event)) {
+        listener_->hear(event);
     }
-    listener_->hear(event);
+}
+
+bool WithheldEvents::isKept(const Event& event) {
+    std::unique_lock lock(guard_);
+    if (event.kind == Event::Kind::alert && std::this_thread::get_id() != starter_) {
+        decided_.wait_for(lock, kLongestWait, [this] { return released_ || abandoned_; });
+    }
+    if (!released_) {
+        kept_.push_back(event);
+    }
+    return !released_;
 }
 
 /// Under the lock, so that nothing that comes meanwhile overtakes what was kept.
@@ -24,6 +30,13 @@ void WithheldEvents::release() {
     }
     kept_.clear();
     released_ = true;
+    decided_.notify_all();
+}
+
+void WithheldEvents::abandon() {
+    const std::lock_guard lock(guard_);
+    abandoned_ = true;
+    decided_.notify_all();
 }
 
 }  // namespace cvagent

@@ -43,6 +43,13 @@ WriteResult::Outcome compare(const Property& row, const IC::PropertyValue& writt
     return row.labels.empty() ? WriteResult::differs : WriteResult::notKnown;
 }
 
+/// What the catalogue knows to be seen of the value and is not.
+std::string lackingEffect(const IC::MutableNode& node, const Property& row, const IC::PropertyValue& written,
+                          const Reading& after) {
+    const Effect* effect = findEffect(row);
+    return effect == nullptr ? "" : effect->lacking({node, written, after.failed() ? nullptr : &after.value});
+}
+
 }  // namespace
 
 struct Writer::Job {
@@ -161,7 +168,9 @@ WriteResult Writer::perform(const Job& job, const Request& request) {
     if (row.readable) {
         result.before = facts_.ask(*job.node, row.id);
     }
+    const std::size_t errorsBefore = request.errors().count();
     result.problem = setGuarded(*job.node, row, job.value);
+    result.complained = request.errors().count() > errorsBefore;
     tree_.refresh();
     if (result.problem && result.problem->kind() == Problem::failed) {
         result.after = {row.id, &row, {}, "not asked"};
@@ -171,6 +180,7 @@ WriteResult Writer::perform(const Job& job, const Request& request) {
     if (!result.problem && row.readable) {
         result.after = facts_.ask(*job.node, row.id);
         result.outcome = compare(row, job.value, result.after);
+        result.lacking = lackingEffect(*job.node, row, job.value, result.after);
     }
     announcer_.announceWrite(*job.node, result.before, result.after, request.caller());
     return result;

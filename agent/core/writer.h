@@ -26,6 +26,8 @@ struct WriteResult {
     Reading before;  ///< of a property that can only be written: nothing was read
     Reading after;   ///< failed when nothing was read, as after a write that failed
     Outcome outcome = notKnown;
+    bool complained = false;         ///< the plug-in reported errors of the write, though it took the value
+    std::string lacking;             ///< what is not to be seen on the host, for people; "" when nothing is
     std::optional<Problem> problem;  ///< why it failed, or was cut off; nothing when the plug-in took it
 };
 

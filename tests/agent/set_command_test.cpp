@@ -16,10 +16,18 @@ using Json = nlohmann::ordered_json;
 
 const std::string kUntouched = "initialize 1 1 2\nunload\n";
 
-HOST_TEST(SetCommand, WritesReadsBackAndShowsThePluginsErrors) {
+HOST_TEST(SetCommand, WritesAndReadsBack) {
+    CvagentRun cvagent(host);
+    const Finished run = cvagent({"set", "computer", "OwnerContact", "room 6"});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.out, EndsWith("    old  (empty)\n    new  room 6\n"));
+    EXPECT_THAT(run.err, IsEmpty());
+}
+
+HOST_TEST(SetCommand, AnErrorOfThePluginIsShownAndEndsWithStatusOne) {
     CvagentRun cvagent(host);
     const Finished run = cvagent({"set", "computer", "OwnerContact", "room 5"});
-    EXPECT_EQ(run.status, 0);
+    EXPECT_EQ(run.status, 1);
     EXPECT_EQ(run.out,
               "/oshw/root/computer\n"
               "  OwnerContact\n"
@@ -103,6 +111,11 @@ HOST_TEST(SetCommand, WritesWhatCannotBeRead) {
     EXPECT_EQ(run.status, 0);
     EXPECT_THAT(run.out, HasSubstr("EnumeratePorts\n    done\n"));
     EXPECT_THAT(cvagent.diary(), HasSubstr("74=1\n"));
+    const Finished asJson = cvagent({"set", "ip-config:eth0", "EnumeratePorts", "1", "--json"});
+    EXPECT_EQ(asJson.status, 0);
+    const std::string nothing = R"({"name":"EnumeratePorts","kind":"number","value":null})";
+    EXPECT_EQ(Json::parse(asJson.out)["property"]["old"].dump(), nothing);
+    EXPECT_EQ(Json::parse(asJson.out)["property"]["new"].dump(), nothing);
 }
 
 HOST_TEST(SetCommand, RefusedValuesNeverReachThePlugin) {

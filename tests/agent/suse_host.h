@@ -52,6 +52,15 @@ public:
     }
     std::string read(const std::string& path) const { return host_.read(path).value_or("(no file)"); }
     FakeHost& host() { return host_; }
+    /// From here on one command of the host changes what another one answers.
+    void follows(const std::string& question, const std::string& now, const std::string& change,
+                 const std::string& then) const {
+        const std::string answer = "/var/answers/" + std::to_string(answers_++);
+        host_.file(answer, now);
+        host_.file(answer + ".then", then);
+        host_.tool(question, ToolAnswer{.out = "", .action = "cat " + answer});
+        host_.tool(change, ToolAnswer{.out = "", .action = "cat " + answer + ".then > " + answer});
+    }
 
     static constexpr const char* kInterfaceFile = "/etc/sysconfig/network/ifcfg-eth-id-02:00:00:aa:bb:01";
 
@@ -107,5 +116,6 @@ private:
     }
 
     FakeHost& host_;
+    mutable int answers_ = 0;
     std::set<std::string> looks_;
 };

@@ -16,6 +16,10 @@ using testing::StartsWith;
 using Json = nlohmann::ordered_json;
 
 constexpr const char* kIp = "ip-config:eth0";
+constexpr const char* kPort =
+    "eth0      Link encap:Ethernet  HWaddr 02:00:00:AA:BB:01  \n"
+    "          inet addr:192.0.2.10  Bcast:192.0.2.255  Mask:255.255.255.0\n"
+    "          UP BROADCAST RUNNING MULTICAST  MTU:1500  Metric:1\n\n";
 
 /// Writes a property and expects it to be done.
 Finished write(SuseHost& suse, const std::string& node, const std::string& property,
@@ -97,7 +101,8 @@ HOST_TEST(SuseHost, TheAddressIsWrittenAndTheHostsOwnStillShown) {
 
 HOST_TEST(SuseHost, TheMaskIsWrittenAndApplied) {
     SuseHost suse(host);
-    host.tool("ifconfig eth0 netmask 255.255.0.0", "");
+    suse.follows("ifconfig eth0", kPort, "ifconfig eth0 netmask 255.255.0.0",
+                 std::string(kPort).replace(std::string(kPort).find("255.255.255.0\n"), 13, "255.255.0.0"));
     write(suse, kIp, "SubnetMask", {"255.255.0.0"});
     EXPECT_EQ(
         suse.read(SuseHost::kInterfaceFile),
@@ -144,7 +149,7 @@ HOST_TEST(SuseHost, SearchSuffixesAreWrittenInPlace) {
 
 HOST_TEST(SuseHost, TheHostNameIsSetAndWritten) {
     SuseHost suse(host);
-    host.tool("hostname earth.example.com", "");
+    suse.follows("hostname -s", "linux\n", "hostname earth.example.com", "earth\n");
     write(suse, kIp, "HostName", {"earth"});
     EXPECT_THAT(suse.changes(), TextsAre("hostname earth.example.com"));
     EXPECT_EQ(suse.read("/etc/hosts"), "127.0.0.1\tlocalhost\n192.0.2.10\tearth.example.com\tearth\n");
@@ -153,7 +158,7 @@ HOST_TEST(SuseHost, TheHostNameIsSetAndWritten) {
 
 HOST_TEST(SuseHost, TheDomainNameIsSetAndWritten) {
     SuseHost suse(host);
-    host.tool("hostname linux.example.org", "");
+    suse.follows("hostname -d", "example.com\n", "hostname linux.example.org", "example.org\n");
     write(suse, kIp, "DomainName", {"example.org"});
     EXPECT_THAT(suse.changes(), TextsAre("hostname linux.example.org"));
     EXPECT_EQ(suse.read("/etc/HOSTNAME"), "linux.example.org");
@@ -170,10 +175,10 @@ HOST_TEST(SuseHost, TheIpv4GatewayIsWritten) {
 
 HOST_TEST(SuseHost, TheIpv6GatewayIsWritten) {
     SuseHost suse(host);
-    for (const std::string command : {"ip -6 route add default via fe80::2 dev eth0",
-                                      "ip -6 route delete default via fe80::1 dev eth0"}) {
-        host.tool(command, "");
-    }
+    host.tool("ip -6 route add default via fe80::2 dev eth0", "");
+    suse.follows("route -A inet6 -n", "Kernel IPv6 routing table\n::/0   fe80::1  UG   1024   0  0 eth0\n",
+                 "ip -6 route delete default via fe80::1 dev eth0",
+                 "Kernel IPv6 routing table\n::/0   fe80::2  UG   1024   0  0 eth0\n");
     write(suse, kIp, "IPv6Gateway", {"fe80::2"});
     EXPECT_THAT(suse.changes(), testing::Contains("ip -6 route add default via fe80::2 dev eth0"));
     EXPECT_EQ(suse.read("/etc/sysconfig/network/routes"), "default\t192.0.2.1\t-\ndefault\tfe80::2\t-\n");
@@ -181,8 +186,9 @@ HOST_TEST(SuseHost, TheIpv6GatewayIsWritten) {
 
 HOST_TEST(SuseHost, TheInterfaceIsBroughtUpAndDown) {
     SuseHost suse(host);
-    host.tool("ifconfig eth0 up", "");
-    host.tool("ifconfig eth0 down", "");
+    const std::string flags = " > /sys/class/net/eth0/flags";
+    host.tool("ifconfig eth0 up", ToolAnswer{.out = "", .action = "echo 0x1003" + flags});
+    host.tool("ifconfig eth0 down", ToolAnswer{.out = "", .action = "echo 0x1002" + flags});
     write(suse, kIp, "InterfaceState", {"12"});
     EXPECT_THAT(suse.changes(), TextsAre("ifconfig eth0 down"));
     write(suse, kIp, "InterfaceState", {"up"});
@@ -198,10 +204,11 @@ HOST_TEST(SuseHost, PortsAreEnumeratedAgain) {
 HOST_TEST(SuseHost, TheWritersErrorsAreShown) {
     SuseHost suse(host);
     host.readOnly("/etc/resolv.conf");
-    const Finished run = write(suse, kIp, "DNSServers", {"192.0.2.54"});
+    const Finished run = suse.run({"set", kIp, "DNSServers", "192.0.2.54"});
+    EXPECT_EQ(run.status, 1);
     EXPECT_THAT(run.err, HasSubstr("Can not open '/etc/resolv.conf' in write mode."));
     EXPECT_THAT(run.out, HasSubstr("new  192.0.2.53\n"));
-    EXPECT_THAT(run.err, HasSubstr("the host still has another value"));
+    EXPECT_THAT(run.err, HasSubstr("DNSServers was not changed, or only in part: it reads '192.0.2.53'; "));
 }
 
 HOST_TEST(SuseHost, RefusedValuesLeaveTheHostUntouched) {

@@ -45,7 +45,9 @@ target_compile_definitions(agent_signals_test PRIVATE ${agent_test_programs} FEW
 add_dependencies(agent_signals_test cvagent fake_plugin fewprocesses vantrelcvicoshwmi)
 
 corvista_test(agent_suse_host LIBRARIES test_support SOURCES
-  agent/suse_host_test.cpp)
+  agent/alerts_told_test.cpp
+  agent/suse_host_test.cpp
+  agent/write_effects_test.cpp)
 target_compile_definitions(agent_suse_host_test PRIVATE ${agent_test_programs})
 add_dependencies(agent_suse_host_test cvagent vantrelcvicoshwmi)
 

@@ -19,6 +19,17 @@ std::string report(const IC::MutableNode& node, const WriteResult& result, bool 
                             : "    done\n");
 }
 
+/// Says why the write cannot count as done.
+bool isDone(const WriteResult& result, const Property& row) {
+    if (!result.lacking.empty()) {
+        complain(std::string(row.name) + " was not changed, or only in part: " + result.lacking + "; " +
+                 row.meaning);
+    } else if (result.outcome == WriteResult::differs) {
+        complain(std::string("the host still has another value: ") + row.meaning);
+    }
+    return result.lacking.empty() && !result.complained && !result.after.timedOut;
+}
+
 }  // namespace
 
 ExitStatus set(Session& session, const Options& options) {
@@ -36,10 +47,7 @@ ExitStatus set(Session& session, const Options& options) {
     }
     print(options.json ? json::change(*node, row.readable ? result.before : result.after, result.after)
                        : report(*node, result, row.readable, Style::detect()));
-    if (result.outcome == WriteResult::differs) {
-        complain(std::string("the host still has another value: ") + row.meaning);
-    }
-    return result.after.timedOut ? ExitStatus::failed : ExitStatus::done;
+    return isDone(result, row) ? ExitStatus::done : ExitStatus::failed;
 }
 
 }  // namespace cvagent::commands

@@ -4,13 +4,11 @@
 #include "agent/cli/event_printer.h"
 #include "agent/cli/event_program.h"
 #include "agent/cli/print.h"
-#include "agent/core/signals.h"
 
 namespace cvagent::commands {
 
 ExitStatus watch(Session& session, const Options& options) {
-    print("");                 // an output that is closed is told now, not at the first event
-    const OrderlyEnd waiting;  // to the end of the plug-in and of its last events
+    print("");  // an output that is closed is told now, not at the first event
     const auto events = session.agent().subscribe(0);
     std::optional<EventProgram> program;
     if (!options.program.empty()) {
@@ -19,10 +17,12 @@ ExitStatus watch(Session& session, const Options& options) {
     }
     complain("watching " + std::to_string(session.agent().nodes().size()) + " nodes" +
              (options.seconds ? "" : "; Ctrl-C ends it"));
-    const EventPrinter printer(*events, options.json);
+    EventPrinter printer(*events, options.json);
+    const Session::AlertsTo shown(session, [&printer](const Event&) { printer.printAll(); });
     printer.follow(options.seconds);
     session.end();
     printer.printAll();  // what came while the plug-ins were stopped
+    printer.throwFailure();
     return ExitStatus::done;
 }
 

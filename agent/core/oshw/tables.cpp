@@ -51,7 +51,8 @@ const CatalogueTable& table() {
         "the OS/hardware plug-in",
         kClasses,
         {hostProperties(), storageProperties(), networkPortProperties(), ipConfigProperties()},
-        kAlerts};
+        kAlerts,
+        effects()};
     return all;
 }
 

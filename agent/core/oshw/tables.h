@@ -12,5 +12,6 @@ std::span<const Property> hostProperties();
 std::span<const Property> storageProperties();
 std::span<const Property> networkPortProperties();
 std::span<const Property> ipConfigProperties();
+std::span<const Effect> effects();
 
 }  // namespace cvagent::oshw
