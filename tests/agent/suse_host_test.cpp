@@ -5,6 +5,7 @@
 #include <gmock/gmock.h>
 #include <signal.h>
 #include <sys/stat.h>
+#include <regex>
 
 #include <nlohmann/json.hpp>
 
@@ -286,6 +287,12 @@ HOST_TEST(SuseMonitors, AStateChangeAcrossARestartRaisesOneAlert) {
     EXPECT_THAT(suse.run({"watch", "--json", "--for", "2"}).out, IsEmpty());
 }
 
+/// A listing without the clock, which goes on from one question to the next.
+std::string withoutClock(const std::string& listing) {
+    static const std::regex clock(" +126  CurrentTime [^\n]*\n");
+    return std::regex_replace(listing, clock, "");
+}
+
 /// With the plug-in that lies beside the program.
 Finished ask(FakeHost& host, std::vector<std::string> words) {
     words.insert(words.begin(), {CVAGENT_PROGRAM, "--host-tools", "native"});
@@ -299,7 +306,7 @@ HOST_TEST(SuseHost, TellsTheSameOfANodeWithAndWithoutTheProcessors) {
                                    "/oshw/root/computer/chassis/planar", "processor:2", "", ":1"}) {
         const Finished quick = ask(host, {"get", node});
         const Finished whole = ask(host, {"--log", "/tmp/log", "get", node});
-        EXPECT_EQ(quick.out, whole.out) << node;
+        EXPECT_EQ(withoutClock(quick.out), withoutClock(whole.out)) << node;
         EXPECT_EQ(quick.err, whole.err) << node;
         EXPECT_EQ(quick.status, whole.status) << node;
     }
