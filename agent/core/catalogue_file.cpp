@@ -22,15 +22,15 @@ namespace {
 namespace fs = std::filesystem;
 
 constexpr std::size_t kLongestFile = 1UL << 20U;
-constexpr std::string_view kLibrary = ".so";
+constexpr std::string_view kLibraryEnding = ".so";
 
-struct Content {
+struct CatalogueContent {
     std::optional<std::string> text;  ///< nothing where there is no file, or it cannot be used
     std::string complaint;
 };
 
 /// @return one byte more than the longest when there is more
-std::string readAll(int file) {
+std::string readWhole(int file) {
     struct stat found {};
     const bool sized = fstat(file, &found) == 0 && found.st_size < static_cast<off_t>(kLongestFile);
     std::string text(sized ? static_cast<std::size_t>(found.st_size) : kLongestFile + 1, '\0');
@@ -43,7 +43,7 @@ std::string readAll(int file) {
 }
 
 /// Nothing of a pipe or a device is waited for.
-Content readCatalogue(const std::string& path) {
+CatalogueContent readCatalogue(const std::string& path) {
     std::error_code error;
     const std::string target = fs::canonical(path, error);
     if (error) {
@@ -57,7 +57,7 @@ Content readCatalogue(const std::string& path) {
     if (file < 0) {
         return {std::nullopt, std::string("it cannot be read: ") + std::strerror(errno)};
     }
-    Content content{readAll(file), ""};
+    CatalogueContent content{readWhole(file), ""};
     close(file);
     if (content.text->size() > kLongestFile) {
         return {std::nullopt, "it has more than a MiB"};
@@ -65,7 +65,7 @@ Content readCatalogue(const std::string& path) {
     return content;
 }
 
-std::string joined(const std::vector<std::string>& complaints) {
+std::string complaintsText(const std::vector<std::string>& complaints) {
     std::string all;
     for (const std::string& complaint : complaints) {
         all += (all.empty() ? "" : "; ") + complaint;
@@ -78,7 +78,7 @@ std::string joined(const std::vector<std::string>& complaints) {
 std::string catalogueFileOf(const std::string& plugin) {
     const fs::path file = plugin;
     const std::string name = file.filename();
-    const std::size_t end = name.rfind(kLibrary);
+    const std::size_t end = name.rfind(kLibraryEnding);
     return file.parent_path() / (name.substr(0, end) + ".json");
 }
 
@@ -87,7 +87,7 @@ void loadCatalogueOf(const std::string& plugin, const Tell& tell) {
     static std::set<std::string> loaded;  // another agent in the process finds it there
     const std::lock_guard lock(guard);
     const std::string path = catalogueFileOf(plugin);
-    const Content content = readCatalogue(path);
+    const CatalogueContent content = readCatalogue(path);
     const std::string head = "the names in '" + printable(path) + "' are ";
     if (!content.complaint.empty()) {
         tell(head + "left out: " + content.complaint);
@@ -98,7 +98,7 @@ void loadCatalogueOf(const std::string& plugin, const Tell& tell) {
     const ParsedCatalogue parsed = parseCatalogue(path, *content.text);
     if (!parsed.complaints.empty()) {
         tell(head + (parsed.table == nullptr ? "left out: " : "used but for some: ") +
-             joined(parsed.complaints));
+             complaintsText(parsed.complaints));
     }
     if (parsed.table != nullptr) {
         addToCatalogue(*parsed.table);

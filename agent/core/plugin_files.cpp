@@ -15,12 +15,12 @@ namespace {
 
 namespace fs = std::filesystem;
 
-constexpr const char* kFirst = "libvantrelcvicoshwmi.so.1";
-constexpr const char* kDirectory = "corvista/plug-ins";
-constexpr const char* kEnding = ".so.1";
+constexpr const char* kFirstPlugin = "libvantrelcvicoshwmi.so.1";
+constexpr const char* kPluginDirectory = "corvista/plug-ins";
+constexpr const char* kPluginEnding = ".so.1";
 
 /// Whole, however long.
-std::string named(const fs::path& place) {
+std::string placeName(const fs::path& place) {
     return "'" + printable(place) + "'";
 }
 
@@ -34,13 +34,14 @@ bool ownsTheProgram(uid_t user) {
 std::string whyUnsafePlace(const std::string& place, bool isGoal) {
     struct stat found {};
     if (lstat(place.c_str(), &found) != 0) {
-        return named(place) + " cannot be looked at";
+        return placeName(place) + " cannot be looked at";
     }
     if (isSomebodyElses(found) && !ownsTheProgram(found.st_uid)) {
-        return named(place) + " belongs to somebody else (user " + std::to_string(found.st_uid) + ")";
+        return placeName(place) + " belongs to somebody else (user " + std::to_string(found.st_uid) + ")";
     }
     const Writers writers = isGoal ? Writers::groupsToo : Writers::everybody;
-    return othersCanReplace(place, found, isGoal, writers) ? named(place) + " can be written by others" : "";
+    return othersCanReplace(place, found, isGoal, writers) ? placeName(place) + " can be written by others"
+                                                           : "";
 }
 
 /// Of a directory and all those above it.
@@ -57,13 +58,13 @@ Problem notBeside() {
     const std::string directory = programDirectory();
     return {Problem::failed,
             directory.empty() ? "cannot tell where this program lies, for there is no /proc"
-                              : std::string("there is no ") + kFirst +
+                              : std::string("there is no ") + kFirstPlugin +
                                     " beside this program, which lies in " + inQuotes(directory),
             Problem::pluginSearch};
 }
 
 bool isPluginName(const std::string& name) {
-    return name.ends_with(kEnding) && !name.starts_with('.');
+    return name.ends_with(kPluginEnding) && !name.starts_with('.');
 }
 
 std::vector<fs::path> pluginsIn(const fs::path& directory) {
@@ -95,7 +96,7 @@ void addPluginsIn(const fs::path& directory, PluginFiles& all) {
             all.files.push_back(file);
             continue;
         }
-        const std::string text = "the plug-in " + named(file) + " is left out: " + reason;
+        const std::string text = "the plug-in " + placeName(file) + " is left out: " + reason;
         all.leftOut.push_back({file, Problem(Problem::failed, text, Problem::pluginOwner)});
     }
 }
@@ -113,12 +114,12 @@ std::string whyUnsafe(const std::string& file) {
 
 PluginFiles pluginsBesideProgram() {
     PluginFiles all;
-    if (auto first = besideProgram({"../" CORVISTA_LIBDIR, "../lib"}, kFirst)) {
+    if (auto first = besideProgram({"../" CORVISTA_LIBDIR, "../lib"}, kFirstPlugin)) {
         all.files.push_back(*std::move(first));
     } else {
-        all.leftOut.push_back({kFirst, notBeside()});
+        all.leftOut.push_back({kFirstPlugin, notBeside()});
     }
-    if (const auto directory = besideProgram({"../" CORVISTA_LIBDIR, "../lib"}, kDirectory)) {
+    if (const auto directory = besideProgram({"../" CORVISTA_LIBDIR, "../lib"}, kPluginDirectory)) {
         addPluginsIn(*directory, all);
     }
     if (all.files.empty()) {
