@@ -1,10 +1,10 @@
 #include "tests/hardware/recorded_host.h"
 
+#include <unistd.h>
+
 #include <algorithm>
 #include <filesystem>
 #include <fstream>
-#include <regex>
-#include <sstream>
 #include <stdexcept>
 
 #include "tests/hardware/golden.h"
@@ -48,23 +48,42 @@ void make(const RecordedHost& host, const Entry& entry) {
 
 /// A range of numbers in the path stands for as many entries.
 void makeAll(const RecordedHost& host, const Entry& entry) {
-    static const std::regex range(R"(\{(\d+)-(\d+)\})");
-    std::smatch found;
-    if (!std::regex_search(entry.path, found, range)) {
+    const std::size_t start = entry.path.find('{');
+    const std::size_t end = entry.path.find('}', std::min(start, entry.path.size()));
+    const std::size_t dash = entry.path.find('-', std::min(start, entry.path.size()));
+    if (end == std::string::npos || dash > end) {
         make(host, entry);
         return;
     }
-    for (int number = std::stoi(found[1]); number <= std::stoi(found[2]); ++number) {
-        const std::string path = found.prefix().str() + std::to_string(number) + found.suffix().str();
+    const int last = std::stoi(entry.path.substr(dash + 1));
+    for (int number = std::stoi(entry.path.substr(start + 1)); number <= last; ++number) {
+        const std::string path =
+            entry.path.substr(0, start) + std::to_string(number) + entry.path.substr(end + 1);
         makeAll(host, {withNumber(path, number), entry.sign, withNumber(entry.text, number)});
     }
 }
 
+/// "/path: text", "/path -> target", "/path = bytes"; nothing for other lines.
+std::optional<Entry> entryOf(const std::string& line) {
+    const std::size_t blank = std::min(line.find(' '), line.size());
+    const std::string path = line.substr(0, blank);
+    if (path.starts_with('/') && path.ends_with(':')) {
+        return Entry{path.substr(0, path.size() - 1), ":", line.substr(std::min(blank + 1, line.size()))};
+    }
+    const std::size_t next = std::min(line.find(' ', blank + 1), line.size() - 1);
+    const std::string sign = blank < line.size() ? line.substr(blank + 1, next - blank - 1) : "";
+    const bool known = path.starts_with('/') && (sign == "->" || sign == "=");
+    return known ? std::optional(Entry{path, sign, line.substr(next + 1)}) : std::nullopt;
+}
+
+/// Thousands of small files are made: in memory, where there is room for them.
+fs::path directory() {
+    return access("/dev/shm", W_OK) == 0 ? "/dev/shm" : fs::temp_directory_path();
+}
+
 }  // namespace
 
-RecordedHost::RecordedHost() {
-    const bool memory = fs::is_directory("/dev/shm");  // many small files, made and removed
-    root_ = (memory ? fs::path("/dev/shm") : fs::temp_directory_path()) / "hardware-host-XXXXXX";
+RecordedHost::RecordedHost() : root_(directory() / "hardware-host-XXXXXX") {
     if (mkdtemp(root_.data()) == nullptr) {
         throw std::runtime_error("no directory for a recorded host");
     }
@@ -91,25 +110,19 @@ void RecordedHost::remove(const std::string& path) const {
 }
 
 void RecordedHost::unpack(const std::string& list) const {
-    static const std::regex line(R"((/\S*)(:| ->| =)(?: (.*))?)");
     std::ifstream in(list);
-    std::optional<Entry> entry;
+    std::vector<Entry> all;
     for (std::string text; std::getline(in, text);) {
-        std::smatch parts;
-        if (text.starts_with('|') && entry) {
-            entry->text += (entry->text.empty() ? "" : "\n") + text.substr(1);
-        } else if (std::regex_match(text, parts, line)) {
-            if (entry) {
-                makeAll(*this, *entry);
-            }
-            const std::string sign = parts[2];
-            entry = {parts[1], sign == ":" ? sign : sign.substr(1), parts[3]};
+        if (text.starts_with('|') && !all.empty()) {
+            all.back().text += (all.back().text.empty() ? "" : "\n") + text.substr(1);
+        } else if (const auto entry = entryOf(text)) {
+            all.push_back(*entry);
         } else if (!text.empty() && !text.starts_with('#')) {
             throw std::runtime_error(list + ": not understood: " + text);
         }
     }
-    if (entry) {
-        makeAll(*this, *entry);
+    for (const Entry& entry : all) {
+        makeAll(*this, entry);
     }
 }
 

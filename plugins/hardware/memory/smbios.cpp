@@ -65,7 +65,7 @@ SmbiosRecord::SmbiosRecord(std::uint8_t type, std::string fixed, std::vector<std
     : type_(type), fixed_(std::move(fixed)), texts_(std::move(texts)) {}
 
 std::optional<std::uint32_t> SmbiosRecord::number(std::size_t offset, std::size_t size) const {
-    if (offset + size > fixed_.size()) {
+    if (offset > fixed_.size() || size > fixed_.size() - offset) {
         return std::nullopt;
     }
     std::uint32_t value = 0;

@@ -57,16 +57,16 @@ constexpr Row kRows[] = {
 struct Sort {
     std::string_view prefix;  ///< of its files
     Id value;
-    double unit;  ///< what the kernel counts, in the unit of the row
+    double perUnit;  ///< how many of what the kernel counts make the unit of the row
 };
 
-constexpr std::array<Sort, 7> kSorts = {{{"temp", kTemperature, 1e-3},
+constexpr std::array<Sort, 7> kSorts = {{{"temp", kTemperature, 1e3},
                                          {"fan", kFan, 1},
-                                         {"in", kVoltage, 1e-3},
-                                         {"curr", kCurrent, 1e-3},
-                                         {"power", kPower, 1e-6},
-                                         {"energy", kEnergy, 1e-6},
-                                         {"humidity", kHumidity, 1e-3}}};
+                                         {"in", kVoltage, 1e3},
+                                         {"curr", kCurrent, 1e3},
+                                         {"power", kPower, 1e6},
+                                         {"energy", kEnergy, 1e6},
+                                         {"humidity", kHumidity, 1e3}}};
 
 /// "temp12": the sort of sensor; null for what is none.
 const Sort* sortOf(const std::string& sensor) {
@@ -101,19 +101,19 @@ bool isCovered(const Host& host, const std::string& zone, const std::vector<std:
     });
 }
 
-std::optional<double> measured(const Host& host, const std::string& file, double unit) {
+std::optional<double> measured(const Host& host, const std::string& file, double perUnit) {
     const auto count = host.signedNumber(file);
-    return count ? std::optional(static_cast<double>(*count) * unit) : std::nullopt;
+    return count ? std::optional(static_cast<double>(*count) / perUnit) : std::nullopt;
 }
 
 void describeZone(const Host& host, Found& found) {
     const std::string zone = kZones + found.name;
     found.facts.text(kLabel, host.line(zone + "/type"));
-    found.facts.real(kTemperature, measured(host, zone + "/temp", 1e-3));
+    found.facts.real(kTemperature, measured(host, zone + "/temp", 1e3));
     for (const std::string& entry : host.entries(zone)) {
         if (entry.ends_with("_type") && host.line(zone + "/" + entry) == "critical") {
             const std::string point = entry.substr(0, entry.size() - 5);
-            found.facts.real(kCritical, measured(host, zone + "/" + point + "_temp", 1e-3));
+            found.facts.real(kCritical, measured(host, zone + "/" + point + "_temp", 1e3));
         }
     }
 }
@@ -174,12 +174,12 @@ void describeSensor(const Host& host, Found& found) {
     facts.text(kLabel, host.line(file + "_label"));
     const std::optional<bool> fault = host.flag(file + "_fault");
     if (fault != true) {
-        const auto value = measured(host, file + "_input", sort->unit);
-        facts.real(sort->value, value ? value : measured(host, file + "_average", sort->unit));
+        const auto value = measured(host, file + "_input", sort->perUnit);
+        facts.real(sort->value, value ? value : measured(host, file + "_average", sort->perUnit));
     }
-    facts.real(kLow, measured(host, file + "_min", sort->unit));
-    facts.real(kHigh, measured(host, file + "_max", sort->unit));
-    facts.real(kCritical, measured(host, file + "_crit", sort->unit));
+    facts.real(kLow, measured(host, file + "_min", sort->perUnit));
+    facts.real(kHigh, measured(host, file + "_max", sort->perUnit));
+    facts.real(kCritical, measured(host, file + "_crit", sort->perUnit));
     facts.flag(kAlarm, alarmOf(host, file));
     facts.flag(kFault, fault);
 }
