@@ -12,8 +12,7 @@
 #include <string>
 #include <vector>
 
-#include "mi/globals.h"
-#include "mi/os_hw_mi.h"
+#include "oshwmi/os_hw_mi.h"
 #include "tests/support/command_lines.h"
 #include "tests/support/fake_host.h"
 

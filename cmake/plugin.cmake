@@ -7,9 +7,9 @@ endforeach()
 add_library(vantrelcvicoshwmi SHARED ${objects})
 target_link_libraries(vantrelcvicoshwmi PRIVATE corvista_framework)
 target_link_options(vantrelcvicoshwmi PRIVATE
-  -Wl,--version-script=${CMAKE_SOURCE_DIR}/mi/plugin.map -Wl,--no-undefined -Wl,--as-needed)
+  -Wl,--version-script=${CMAKE_SOURCE_DIR}/oshwmi/plugin.map -Wl,--no-undefined -Wl,--as-needed)
 set_target_properties(vantrelcvicoshwmi PROPERTIES
-  VERSION 1.0.0 SOVERSION 1 BUILD_WITH_INSTALL_RPATH ON INSTALL_RPATH "$ORIGIN" LINK_DEPENDS ${CMAKE_SOURCE_DIR}/mi/plugin.map)
+  VERSION 1.0.0 SOVERSION 1 BUILD_WITH_INSTALL_RPATH ON INSTALL_RPATH "$ORIGIN" LINK_DEPENDS ${CMAKE_SOURCE_DIR}/oshwmi/plugin.map)
 if(CORVISTA_SANITIZE)
   target_link_options(vantrelcvicoshwmi PRIVATE -Wl,--undefined-version -Wl,-z,undefs)
 endif()

@@ -6,67 +6,85 @@
 #include <array>
 #include <cstring>
 #include <ctime>
-#include <string>
-#include <utility>
+#include <initializer_list>
+#include <stdexcept>
 
+#include "computer/computer_builder.h"
 #include "computer/owner_data.h"
 #include "computer/time_zone.h"
 #include "framework/qx/corvista_utilities.h"
 #include "framework/qx/date_time.h"
 #include "mi/command.h"
 #include "mi/globals.h"
-#include "mi/log.h"
-#include "mi/property_table.h"
+#include "mi/node_types.h"
 #include "mi/text.h"
 
 namespace IC {
 
 namespace {
 
-Error readHostName(const ComputerNode&, PropertyValue& out) {
+namespace ComputerProperty {
+enum : unsigned int {
+    hostName = 108,        ///< text
+    ownerContact = 115,    ///< text
+    ownerName = 116,       ///< text
+    powerAction = 123,     ///< enumeration: PowerAction; stored, not asked
+    powerActions = 125,    ///< list of numbers: the values powerAction may have
+    currentTime = 126,     ///< number: seconds since 1970; written as an ISO 8601 text
+    timeZoneOffset = 127,  ///< number: minutes east of UTC
+    constant200 = 200,     ///< number: 1
+};
+}  // namespace ComputerProperty
+
+/// Values of ComputerProperty::powerAction.
+namespace PowerAction {
+constexpr unsigned int running = 1;  ///< the state of a host that answers; writing it does nothing
+constexpr unsigned int restart = 9;
+constexpr unsigned int halt = 12;
+}  // namespace PowerAction
+
+// A read or a change that the host does not grant throws: the node answers status 1.
+
+PropertyValue hostNameOf(const std::string&) {
     log(kProgress) << "ComputerNode::getProperty Name Inside Case";
     std::array<char, 256> name{};
     if (gethostname(name.data(), name.size()) == -1) {
         log(kError) << "ComputerNode::getProperty Name::GetHostname Failed";
-        return result(false);
+        throw std::runtime_error("no host name");
     }
-    const std::string text(name.data(), strnlen(name.data(), name.size()));
-    out = PropertyValue(trimEnd(text), true);
-    return result(true);
+    return {trimEnd(std::string(name.data(), strnlen(name.data(), name.size()))), true};
 }
 
 template <const wchar_t* key>
-Error readOwner(const ComputerNode&, PropertyValue& out) {
+PropertyValue readOwner(const std::string&) {
     const char* directory = QX::CorvistaUtilities::getMoraineDataDir();
     if (directory == nullptr) {
         log(kNoAnswer) << "ComputerNode::getProperty : OwnerContact/OwnerName - NULL returned by "
                           "CorvistaUtilities::getMoraineDataDir();";
-        return result(false);
+        throw std::runtime_error("no data directory");
     }
     try {
-        out = PropertyValue(OwnerData(directory).read(key), true);
+        return {OwnerData(directory).read(key), true};
     } catch (...) {
         log(kNoAnswer) << "ComputerNode::getProperty : OwnerContact/OwnerName - Cannot read asset dat file.";
-        return result(false);
+        throw;
     }
-    return result(true);
 }
 
-template <const wchar_t* key, unsigned int id>
-Error writeOwner(ComputerNode& node, const PropertyValue& value) {
+template <const wchar_t* key>
+void writeOwner(Change& change) {
     const char* directory = QX::CorvistaUtilities::getMoraineDataDir();
     if (directory == nullptr) {
         log(kNoAnswer) << "ComputerNode::setProperty : OwnerContact/OwnerName - NULL returned by "
                           "CorvistaUtilities::getMoraineDataDir()";
-        return result(false);
+        throw std::runtime_error("no data directory");
     }
     try {
-        OwnerData(directory).write(key, static_cast<std::string>(value));
+        OwnerData(directory).write(key, change.text());
     } catch (...) {
         log(kNoAnswer) << "ComputerNode::setProperty : OwnerContact/OwnerName - Cannot write asset dat file.";
-        return result(false);
+        throw;
     }
-    return node.MutableNode::setProperty(id, value);
 }
 
 void runAndForget(const Command& command) {
@@ -74,8 +92,8 @@ void runAndForget(const Command& command) {
 }
 
 /// The result does not tell whether the host is going down: a reader asks whether it still answers.
-Error writePowerAction(ComputerNode& node, const PropertyValue& value) {
-    switch (static_cast<unsigned int>(value)) {
+void writePowerAction(Change& change) {
+    switch (change.number()) {
         case PowerAction::restart:
             runAndForget("shutdown -r now");
             break;
@@ -85,22 +103,23 @@ Error writePowerAction(ComputerNode& node, const PropertyValue& value) {
         default:
             break;
     }
-    return node.MutableNode::setProperty(ComputerProperty::powerAction, value);
 }
 
-Error readCurrentTime(const ComputerNode&, PropertyValue& out) {
-    out = PropertyValue(Number(static_cast<long>(time(nullptr)), 0), true);
-    return result(true);
+PropertyValue currentTimeOf(const std::string&) {
+    return {Number(static_cast<long>(time(nullptr)), 0), true};
 }
 
 /// A time that a long cannot hold (on 32 bits those beyond January 2038) throws and leaves the clock alone.
-Error writeCurrentTime(ComputerNode&, const PropertyValue& value) {
-    const QX::DateTime wanted(static_cast<std::string>(value), 3);
+void writeCurrentTime(Change& change) {
+    const QX::DateTime wanted(change.text(), 3);
     const timeval seconds{static_cast<long>(wanted), 0};
-    return result(settimeofday(&seconds, nullptr) == 0);
+    if (settimeofday(&seconds, nullptr) != 0) {
+        throw std::runtime_error("the clock was not set");
+    }
+    change.isStored = false;
 }
 
-Error readTimeZoneOffset(const ComputerNode&, PropertyValue& out) {
+PropertyValue timeZoneOffsetOf(const std::string&) {
     // localtime_r alone looks at /etc/localtime once in the life of a process.
     tzset();
     const time_t now = time(nullptr);
@@ -108,67 +127,113 @@ Error readTimeZoneOffset(const ComputerNode&, PropertyValue& out) {
     localtime_r(&now, &local);
     constexpr long kSecondsPerMinute = 60;
     const long minutes = local.tm_gmtoff / kSecondsPerMinute;
-    out = PropertyValue(Number(static_cast<double>(minutes)), true);
-    return result(true);
+    return {Number(static_cast<double>(minutes)), true};
 }
 
-Error writeTimeZoneOffset(ComputerNode&, const PropertyValue& value) {
-    return result(setTimezone(static_cast<unsigned int>(value)));
+void writeTimeZoneOffset(Change& change) {
+    if (!setTimezone(change.number())) {
+        throw std::runtime_error("the zone was not set");
+    }
+    change.isStored = false;
 }
 
-Error readConstant200(const ComputerNode&, PropertyValue& out) {
-    out = PropertyValue(Number(1U), true);
-    return result(true);
+PropertyValue constant200(const std::string&) {
+    return {Number(1U), true};
 }
 
 // The clock reads as a number and is set by a text, the zone reads with daylight saving included and is set
 // by its standard offset: agents rely on both.
-constexpr Property<ComputerNode> kProperties[] = {
-    {ComputerProperty::hostName, "HostName", readHostName},
-    {ComputerProperty::ownerContact, "OwnerContact", readOwner<OwnerData::contact>,
-     writeOwner<OwnerData::contact, ComputerProperty::ownerContact>},
-    {ComputerProperty::ownerName, "OwnerName", readOwner<OwnerData::name>,
-     writeOwner<OwnerData::name, ComputerProperty::ownerName>},
-    {ComputerProperty::powerAction, "PowerAction", nullptr, writePowerAction},
-    {ComputerProperty::currentTime, "CurrentTime", readCurrentTime, writeCurrentTime},
-    {ComputerProperty::timeZoneOffset, "TimeZoneOffset", readTimeZoneOffset, writeTimeZoneOffset},
-    {ComputerProperty::constant200, "ComputerConstant200", readConstant200},
+constexpr Property kComputerProperties[] = {
+    {ComputerProperty::hostName, hostNameOf},
+    {ComputerProperty::ownerContact, readOwner<OwnerData::contact>, writeOwner<OwnerData::contact>},
+    {ComputerProperty::ownerName, readOwner<OwnerData::name>, writeOwner<OwnerData::name>},
+    {ComputerProperty::powerAction, nullptr, writePowerAction},
+    {ComputerProperty::currentTime, currentTimeOf, writeCurrentTime},
+    {ComputerProperty::timeZoneOffset, timeZoneOffsetOf, writeTimeZoneOffset},
+    {ComputerProperty::constant200, constant200},
 };
-static_assert(idsAscend(kProperties));
+static_assert(idsAscend(kComputerProperties));
+
+/// Stores what the host answers now.
+bool storeAnswer(MutableNode& computer, unsigned int id) {
+    PropertyValue value;
+    if (computer.getProperty(id, value).getStatus() != 0) {
+        return false;
+    }
+    computer.setProperty(id, value);
+    return true;
+}
+
+void primeOwner(MutableNode& computer) {
+    for (const unsigned int id : {ComputerProperty::ownerName, ComputerProperty::ownerContact}) {
+        if (!storeAnswer(computer, id)) {
+            // Without their file neither is known: both are shown, and are empty.
+            computer.setProperty(ComputerProperty::ownerName, PropertyValue("", true));
+            computer.setProperty(ComputerProperty::ownerContact, PropertyValue("", true));
+        }
+    }
+}
+
+/// What is stored is the tool's answer; a reader gets the kernel's, which no tool is needed for.
+void primeHostName(MutableNode& computer) {
+    HostCommand command("hostname 2> /dev/null");
+    const auto line = command.nextLine();
+    if (line && !contains(*line, "Unknown")) {
+        computer.setProperty(ComputerProperty::hostName, PropertyValue(trimEnd(*line), true));
+    }
+}
+
+/// Fills the store of a new node, so that a reader of all its properties finds them there. Before the end of
+/// start-up writing a property only stores it.
+void prime(MutableNode& computer) {
+    computer.setProperty(ComputerProperty::powerAction, PropertyValue(EnumValue(PowerAction::running), true));
+    const std::vector<Number> accepted{PowerAction::running, PowerAction::restart, PowerAction::halt};
+    computer.setProperty(ComputerProperty::powerActions, PropertyValue(accepted, true));
+    primeOwner(computer);
+    storeAnswer(computer, ComputerProperty::currentTime);
+    storeAnswer(computer, ComputerProperty::timeZoneOffset);
+    primeHostName(computer);
+}
+
+Error failed() {
+    return {Error::failure, Number(), ""};
+}
 
 }  // namespace
 
-ComputerNode::ComputerNode(unsigned int nodeId, unsigned int linkedId, std::vector<unsigned int> miIds,
-                           unsigned int nodeType, unsigned int index)
-    : MutableNode(nodeId, linkedId, std::move(miIds), nodeType, index) {
-    const LogScope scope("ComputerNode::ComputerNode");
-}
-
-ComputerNode::~ComputerNode() {
-    const LogScope scope("ComputerNode::~ComputerNode");
-}
+constinit const NodeClass computerClass{"~ComputerNode", kComputerProperties};
 
 Error ComputerNode::getProperty(unsigned int id, PropertyValue& out) const {
-    const LogScope scope("ComputerNode::getProperty");
     out = PropertyValue();
-    const auto* property = findProperty(kProperties, id);
     try {
-        return property != nullptr && property->read != nullptr ? property->read(*this, out)
-                                                                : MutableNode::getProperty(id, out);
+        return HostNode::getProperty(id, out);
     } catch (...) {
-        return result(false);
+        return failed();
     }
 }
 
 Error ComputerNode::setProperty(const unsigned int& id, const PropertyValue& value) {
-    const LogScope scope("ComputerNode::setProperty");
-    const auto* property = OSHWMI::bInitflag ? findProperty(kProperties, id) : nullptr;
+    const LogScope scope = enter();
+    const Property* row = OSHWMI::bInitflag ? computerClass.find(id) : nullptr;
     try {
-        return property != nullptr && property->write != nullptr ? property->write(*this, value)
-                                                                 : MutableNode::setProperty(id, value);
+        Change change{*this, name(), value};
+        if (row != nullptr && row->write != nullptr) {
+            row->write(change);
+        }
+        return change.isStored ? MutableNode::setProperty(id, value) : Error();
     } catch (...) {
-        return result(false);
+        return failed();
     }
+}
+
+void ComputerBuilder::createComputerNodes() {
+    const LogScope scope;
+    auto* computer = tree_.makeNode<ComputerNode>(tree_.fixed.root, NodeType::computer, 0);
+    tree_.appendNode(computer);
+    tree_.fixed.computer = computer;
+    prime(*computer);
+    computer->setStatus(kStatusGood);
+    computer->setDescription("Computer");
 }
 
 }  // namespace IC

@@ -1,34 +1,15 @@
 #pragma once
 
-#include "framework/ic/mutable_node.h"
+#include "mi/host_node.h"
 
 namespace IC {
 
-/// Property ids of the computer node.
-namespace ComputerProperty {
-constexpr unsigned int hostName = 108;
-constexpr unsigned int ownerContact = 115;
-constexpr unsigned int ownerName = 116;
-constexpr unsigned int powerAction = 123;
-constexpr unsigned int powerActions = 125;  ///< the values powerAction may have; stored, not asked
-constexpr unsigned int currentTime = 126;
-constexpr unsigned int timeZoneOffset = 127;
-constexpr unsigned int constant200 = 200;
-}  // namespace ComputerProperty
-
-/// Values of ComputerProperty::powerAction.
-namespace PowerAction {
-constexpr unsigned int running = 1;  ///< the state of a host that answers; writing it does nothing
-constexpr unsigned int restart = 9;
-constexpr unsigned int halt = 12;
-}  // namespace PowerAction
+extern const NodeClass computerClass;
 
 /// The computer system as a whole: names, owner, clock, power.
-class ComputerNode : public MutableNode {
+class ComputerNode : public NodeOf<computerClass> {
 public:
-    ComputerNode(unsigned int nodeId, unsigned int linkedId, std::vector<unsigned int> miIds,
-                 unsigned int nodeType, unsigned int index);
-    ~ComputerNode() override;
+    using NodeOf::NodeOf;
 
     /// Asks the host: its name (gethostname), the owner's data (asset file), the clock in seconds since
     /// 1970-01-01 UTC, the offset from UTC in force in minutes (east positive). Every other id gives what was

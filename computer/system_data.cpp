@@ -5,9 +5,9 @@
 #include <array>
 #include <cstring>
 
+#include "computer/computer_builder.h"
 #include "mi/command.h"
 #include "mi/log.h"
-#include "mi/os_hw_mi.h"
 
 namespace IC {
 
@@ -72,7 +72,7 @@ std::string getSystemName() {
 }
 
 /// Refreshes the system's vital-product-data database. Hosts have one of the two tools, or none.
-void OsHwMI::vpdUpdate() {
+void ComputerBuilder::vpdUpdate() {
     const LogScope scope;
     for (const Command& tool :
          {Command("/usr/sbin/vpdupdate 2> /dev/null"), Command("/sbin/update-lsvpd-db 2> /dev/null")}) {

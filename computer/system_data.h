@@ -4,7 +4,7 @@
 
 namespace IC {
 
-// Operations on the host's own data that no node offers; OsHwMI::vpdUpdate stands beside them.
+// Operations on the host's own data that no node offers; ComputerBuilder::vpdUpdate stands beside them.
 
 /// Writes the nine characters ABCDEFGHI of a host's firmware version as AB-CD.EF.GH-I.
 /// @param ver_in       nine characters and the zero behind them: ten bytes are read

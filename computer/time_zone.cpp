@@ -8,7 +8,7 @@
 #include <string>
 #include <system_error>
 
-#include "computer/zone_table.h"
+#include "framework/qx/zone_table.h"
 #include "mi/command.h"
 #include "mi/line_file.h"
 #include "mi/log.h"
@@ -81,7 +81,7 @@ bool switchLocalTime(const std::string& zoneFile) {
 bool setTimezone(unsigned int offset) {
     const Operation operation;
     log(kProgress) << "setTimezone: enter";
-    const Zone* zone = findZone(offset);
+    const QX::Zone* zone = QX::findZone(offset);
     if (zone == nullptr) {
         return false;
     }

@@ -4,6 +4,9 @@ namespace hosttools {
 namespace {
 
 constexpr Applet all[] = {
+    {"brctl", runBrctl, "brctl show"},
+    {"egrep", runEgrep, "egrep 'eth|bond|usb' /proc/net/dev"},
+    {"ethtool", runEthtool, "ethtool INTERFACE"},
     {"fdisk", runFdisk, "fdisk -l[su] [DISK]..."},
     {"ifconfig", runIfconfig,
      "ifconfig [-a] [INTERFACE [up|down|ADDRESS|netmask MASK|broadcast ADDRESS|pointopoint ADDRESS]...]"},
@@ -26,6 +29,16 @@ std::optional<std::vector<Disk>> Host::disks() {
 
 void Answer::complain(std::string_view tool, std::string_view message) {
     errors.add(tool).add(": ").add(message).add('\n');
+}
+
+int Answer::leaveToHost(std::string_view tool, std::string_view word) {
+    beyond = true;
+    complain(tool, Text().add("not done here: '").add(word).add("', and there is no other ").add(tool));
+    return 1;
+}
+
+std::string_view firstOf(Arguments words) {
+    return words.empty() ? std::string_view() : words.front();
 }
 
 std::span<const Applet> applets() {

@@ -34,9 +34,15 @@ public:
 struct Answer {
     Text out;
     Text errors;
+    /// Asked for what is not done here, and nothing has been done: it is for the host's own tool. What is
+    /// among the errors is said where there is none.
+    bool beyond = false;
 
     /// "<tool>: <message>" among the errors.
     void complain(std::string_view tool, std::string_view message);
+    /// Leaves the whole call to the host's own tool, for a word that means nothing here.
+    /// @return the exit status where there is none
+    int leaveToHost(std::string_view tool, std::string_view word);
 };
 
 /// One tool. None of them ends the program or prints by itself.
@@ -47,11 +53,20 @@ struct Applet {
     const char* usage;
 };
 
+/// The first of the words; "" when there is none.
+std::string_view firstOf(Arguments words);
+
 /// All of them.
 std::span<const Applet> applets();
 /// @return null when there is none of that name
 const Applet* findApplet(std::string_view name);
 
+/// `brctl show`: the bridges and their members.
+int runBrctl(Arguments arguments, Host& host, Answer& answer);
+/// `egrep 'eth|bond|usb' /proc/net/dev`: the wired interfaces, whatever they are called.
+int runEgrep(Arguments arguments, Host& host, Answer& answer);
+/// `ethtool INTERFACE`: speed, duplex, link modes, Wake-on-LAN and link of an interface.
+int runEthtool(Arguments arguments, Host& host, Answer& answer);
 /// `fdisk -l [DISK...]`: the disks and their partitions.
 int runFdisk(Arguments arguments, Host& host, Answer& answer);
 /// `ifconfig [-a] [INTERFACE [CHANGE...]]`: the interfaces that are up (-a: all), one, or a change of one.

@@ -73,8 +73,7 @@ void print(const std::vector<Disk>& disks, Answer& answer) {
 int runFdisk(Arguments arguments, Host& host, Answer& answer) {
     Request request;
     if (!readRequest(arguments, request)) {
-        answer.complain(toolName, "only lists disks here: fdisk -l[su] [DISK]...");
-        return 1;
+        return answer.leaveToHost(toolName, firstOf(arguments));
     }
     auto disks = host.disks();
     if (!disks) return 1;

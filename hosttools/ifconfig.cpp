@@ -28,7 +28,8 @@ int listAll(bool downToo, Host& host, Answer& answer) {
 
 int listOne(std::string_view name, Host& host, Answer& answer) {
     std::shared_ptr<const Interfaces> interfaces;
-    const int error = host.interfaces(name.substr(0, name.find(':')), interfaces);
+    const std::string_view link = name.substr(0, name.find(':'));
+    const int error = link.empty() ? ENODEV : host.interfaces(link, interfaces);
     const auto stanza = error == 0 ? makeStanza(*interfaces, name) : std::nullopt;
     if (!stanza) {
         const char* reason = error == ENODEV || error == 0 ? "Device not found" : std::strerror(error);
@@ -46,6 +47,7 @@ int runIfconfig(Arguments arguments, Host& host, Answer& answer) {
     const bool all = !arguments.empty() && std::string_view(arguments.front()) == "-a";
     const Arguments words = all ? arguments.subspan(1) : arguments;
     if (words.empty()) return listAll(all, host, answer);
+    if (*words.front() == '-') return answer.leaveToHost(toolName, words.front());
     if (words.size() == 1) return listOne(words.front(), host, answer);
     return changeInterface(words.front(), words.subspan(1), answer);
 }

@@ -6,6 +6,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
+#include <vector>
 
 #include "hosttools/addresses.h"
 #include "hosttools/files.h"
@@ -37,7 +38,6 @@ public:
         std::memcpy(&request.ifr_addr, &address, sizeof address);
         return call(number, name, request);
     }
-    void complain(std::string_view message) { answer_.complain(toolName, message); }
 
 private:
     ifreq emptyRequest() const {
@@ -47,7 +47,7 @@ private:
     }
     bool call(unsigned long number, const char* name, ifreq& request) {
         if (ioctl(socket_.get(), number, &request) == 0) return true;
-        complain(Text().add(name).add(": ").add(std::strerror(errno)));
+        answer_.complain(toolName, Text().add(name).add(": ").add(std::strerror(errno)));
         return false;
     }
 
@@ -80,46 +80,95 @@ constexpr AddressWord addressWords[] = {
     {"dstaddr", SIOCSIFDSTADDR, "SIOCSIFDSTADDR"},
 };
 
-bool readAddress(Change& change, const char* word, in_addr& address) {
-    if (parseInet(word, address)) return true;
-    change.complain(Text().add("bad address '").add(word).add("'"));
-    return false;
-}
+/// An address that stands alone. It also brings the interface up.
+constexpr AddressWord ownAddress = {"an address", SIOCSIFADDR, "SIOCSIFADDR"};
 
-bool setAddress(Change& change, unsigned long number, const char* name, const char* word) {
+/// One thing to be done: flags, or an address.
+struct Step {
+    const FlagWord* flags = nullptr;
+    const AddressWord* kind = nullptr;
     in_addr address{};
-    return readAddress(change, word, address) && change.address(number, name, address);
+};
+
+template <typename Known>
+const Known* findWord(std::span<const Known> known, std::string_view word) {
+    const auto found = std::ranges::find(known, word, &Known::word);
+    return found != known.end() ? &*found : nullptr;
 }
 
-/// Carries out the first word, with its argument when it has one.
-/// @param words what is left; what was carried out is taken off
-bool changeNext(Change& change, Arguments& words) {
-    const char* word = words.front();
-    words = words.subspan(1);
-    if (const auto* flag = std::ranges::find(flagWords, word, &FlagWord::word); flag != std::end(flagWords)) {
-        return change.flags(flag->set, flag->clear);
+/// Reads all words before the first of them is carried out: of a call that is not understood nothing is done.
+class Reader {
+public:
+    Reader(Arguments words, Answer& answer) : words_(words), answer_(answer) {}
+
+    /// @return whether all of it can be done here
+    bool read(std::vector<Step>& steps) {
+        while (!words_.empty()) {
+            Step step;
+            if (!readNext(step) || !isNew(step, steps)) return false;
+            steps.push_back(step);
+        }
+        return true;
     }
-    const auto* address = std::ranges::find(addressWords, word, &AddressWord::word);
-    if (address == std::end(addressWords)) {
-        return setAddress(change, SIOCSIFADDR, "SIOCSIFADDR", word) && change.flags(IFF_UP | IFF_RUNNING, 0);
+
+private:
+    bool readNext(Step& step) {
+        const char* const word = take();
+        step.flags = findWord<FlagWord>(flagWords, word);
+        if (step.flags != nullptr) return true;
+        step.kind = findWord<AddressWord>(addressWords, word);
+        if (step.kind == nullptr) {
+            step.kind = &ownAddress;
+            return parseInet(word, step.address) || leaveToHost(word);
+        }
+        if (words_.empty()) return refuse(Text().add(word).add(" needs an address"));
+        const char* const value = take();
+        return parseInet(value, step.address) || leaveToHost(value);
     }
-    if (words.empty()) {
-        change.complain(Text().add(word).add(" needs an address"));
+    bool isNew(const Step& step, const std::vector<Step>& steps) {
+        const bool again = step.kind != nullptr && std::ranges::any_of(steps, [&](const Step& before) {
+                               return before.kind != nullptr && before.kind->number == step.kind->number;
+                           });
+        return !again || refuse(Text().add(step.kind->word).add(" is given twice"));
+    }
+    const char* take() {
+        const char* const word = words_.front();
+        words_ = words_.subspan(1);
+        return word;
+    }
+    /// Names of hosts, and words such as mtu, hw or 10.0.0.1/24. The empty word is nobody's.
+    bool leaveToHost(std::string_view word) {
+        if (word.empty()) return refuse("an empty word is no address");
+        answer_.leaveToHost(toolName, word);
         return false;
     }
-    const char* value = words.front();
-    words = words.subspan(1);
-    return setAddress(change, address->number, address->name, value);
+    bool refuse(std::string_view message) {
+        answer_.complain(toolName, message);
+        return false;
+    }
+
+    Arguments words_;
+    Answer& answer_;
+};
+
+bool carryOut(Change& change, const Step& step) {
+    if (step.flags != nullptr) return change.flags(step.flags->set, step.flags->clear);
+    return change.address(step.kind->number, step.kind->name, step.address) &&
+           (step.kind != &ownAddress || change.flags(IFF_UP | IFF_RUNNING, 0));
 }
 
 }  // namespace
 
 int changeInterface(const char* interface, Arguments words, Answer& answer) {
-    Change change(interface, answer);
-    while (!words.empty()) {
-        if (!changeNext(change, words)) return 1;
+    std::vector<Step> steps;
+    if (!Reader(words, answer).read(steps)) return 1;
+    // The calls would take the beginning of a longer name for the whole.
+    if (*interface == '\0' || std::string_view(interface).size() >= IFNAMSIZ) {
+        answer.complain(toolName, Text().add(interface).add(": ").add(std::strerror(ENODEV)));
+        return 1;
     }
-    return 0;
+    Change change(interface, answer);
+    return std::ranges::all_of(steps, [&](const Step& step) { return carryOut(change, step); }) ? 0 : 1;
 }
 
 }  // namespace hosttools

@@ -51,6 +51,13 @@ void setCard(const rtnl_link_ifmap& map, CardMap& card) {
     card.dma = map.dma;
 }
 
+void setKinds(std::string_view attributes, Link& link) {
+    eachAttribute(attributes, [&](unsigned type, std::string_view data) {
+        if (type == IFLA_INFO_KIND) link.kind = untilZero(data);
+        if (type == IFLA_INFO_SLAVE_KIND) link.memberOf = untilZero(data);
+    });
+}
+
 void setLinkAttribute(unsigned type, std::string_view data, Link& link) {
     switch (type) {
         case IFLA_IFNAME:
@@ -67,6 +74,9 @@ void setLinkAttribute(unsigned type, std::string_view data, Link& link) {
             break;
         case IFLA_MAP:
             setCard(readPadded<rtnl_link_ifmap>(data), link.card);
+            break;
+        case IFLA_LINKINFO:
+            setKinds(data, link);
             break;
         case IFLA_STATS64:
             setCounters(readPadded<rtnl_link_stats64>(data), link);

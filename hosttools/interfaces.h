@@ -42,6 +42,8 @@ struct Link {
     Counters received;
     Counters sent;
     std::uint64_t collisions = 0;
+    std::string kind;      ///< "veth", "vlan", "bond" and so on; empty for hardware
+    std::string memberOf;  ///< kind of the link that it is a member of, "bridge" and so on
 };
 
 struct InetAddress {

@@ -1,6 +1,7 @@
 #include <unistd.h>
 
 #include "hosttools/applet.h"
+#include "hosttools/host_tool.h"
 #include "hosttools/text.h"
 
 namespace hosttools {
@@ -29,13 +30,15 @@ int run(const Applet& applet, Arguments words) {
     Host host;
     Answer answer;
     const int status = applet.run(words, host, answer);
+    if (answer.beyond) becomeHostTool(applet.name, words);
     return print(answer, status);
 }
 
 int printHelp() {
     Answer answer;
     Text& text = answer.out;
-    text.add(programName).add(" prints the classic formats of host tools whose own output has changed.\n\n");
+    text.add(programName).add(" stands in for host tools that are missing or whose output has changed.\n");
+    text.add("What it is asked for besides goes to the host's own tool where there is one.\n\n");
     text.add("Usage: ").add(programName).add(" TOOL [ARGUMENT]...\n");
     text.add("   or: TOOL [ARGUMENT]...   (through a link with the tool's name)\n\nTools:\n");
     for (const Applet& applet : applets()) text.add("  ").add(applet.usage).add("\n");

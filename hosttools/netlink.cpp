@@ -19,33 +19,6 @@ constexpr std::size_t aligned(std::size_t length) {
     return (length + 3) & ~std::size_t{3};
 }
 
-template <typename Plain>
-std::string_view bytesOf(const Plain& plain) {
-    return {reinterpret_cast<const char*>(&plain), sizeof plain};
-}
-
-template <typename Body>
-std::string makeRequest(std::uint16_t type, std::uint16_t flags, const Body& body,
-                        std::string_view attributes = {}) {
-    nlmsghdr header{};
-    header.nlmsg_type = type;
-    header.nlmsg_flags = static_cast<std::uint16_t>(NLM_F_REQUEST | flags);
-    header.nlmsg_len = static_cast<std::uint32_t>(aligned(sizeof header + sizeof body) + attributes.size());
-    std::string request(bytesOf(header));
-    request += bytesOf(body);
-    request.resize(aligned(request.size()));
-    request += attributes;
-    return request;
-}
-
-std::string makeAttribute(std::uint16_t type, std::string_view data) {
-    const nlattr header{static_cast<std::uint16_t>(sizeof header + data.size()), type};
-    std::string attribute(bytesOf(header));
-    attribute += data;
-    attribute.resize(aligned(attribute.size()));
-    return attribute;
-}
-
 /// Takes one length-prefixed object off the front. Empty when it is damaged.
 template <typename Header>
 std::string_view takeObject(std::string_view& bytes, std::size_t length) {
@@ -92,15 +65,37 @@ int eachMessage(std::string_view datagram, const MessageVisitor& visit, bool& do
     return error;
 }
 
-Netlink::Netlink()
-    : socket_(socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC, NETLINK_ROUTE)),
-      problem_(socket_.valid() ? 0 : errno) {
-    // Lets a request for addresses name a link.
-    const int on = 1;
-    setsockopt(socket_.get(), SOL_NETLINK, NETLINK_GET_STRICT_CHK, &on, sizeof on);
+std::string makeRequest(unsigned type, unsigned flags, std::string_view body, std::string_view attributes) {
+    nlmsghdr header{};
+    header.nlmsg_type = static_cast<std::uint16_t>(type);
+    header.nlmsg_flags = static_cast<std::uint16_t>(NLM_F_REQUEST | flags);
+    header.nlmsg_len = static_cast<std::uint32_t>(aligned(sizeof header + body.size()) + attributes.size());
+    std::string request(bytesOf(header));
+    request += body;
+    request.resize(aligned(request.size()));
+    request += attributes;
+    return request;
 }
 
-int Netlink::ask(std::string_view request, const MessageVisitor& visit) {
+std::string makeAttribute(unsigned type, std::string_view data) {
+    const nlattr header{static_cast<std::uint16_t>(sizeof header + data.size()),
+                        static_cast<std::uint16_t>(type)};
+    std::string attribute(bytesOf(header));
+    attribute += data;
+    attribute.resize(aligned(attribute.size()));
+    return attribute;
+}
+
+NetlinkSocket::NetlinkSocket(int protocol)
+    : socket_(socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC, protocol)), problem_(socket_.valid() ? 0 : errno) {}
+
+void NetlinkSocket::enable(int option) {
+    const int on = 1;
+    setsockopt(socket_.get(), SOL_NETLINK, option, &on, sizeof on);
+}
+
+int NetlinkSocket::ask(std::string_view request, const MessageVisitor& visit,
+                       const std::function<void(std::string_view)>& datagrams) {
     if (problem_ != 0) return problem_;
     if (send(socket_.get(), request.data(), request.size(), 0) < 0) return errno;
     const auto buffer = std::make_unique_for_overwrite<char[]>(datagramBytes);
@@ -109,28 +104,35 @@ int Netlink::ask(std::string_view request, const MessageVisitor& visit) {
         const ssize_t got = recv(socket_.get(), buffer.get(), datagramBytes, 0);
         if (got < 0 && errno == EINTR) continue;
         if (got <= 0) return got < 0 ? errno : EPROTO;
-        const int error = eachMessage({buffer.get(), static_cast<std::size_t>(got)}, visit, done);
+        const std::string_view datagram(buffer.get(), static_cast<std::size_t>(got));
+        if (datagrams) datagrams(datagram);
+        const int error = eachMessage(datagram, visit, done);
         if (error == EPROTO) return error;
         if (error != 0) result = error;
     }
     return result;
 }
 
+Netlink::Netlink() : socket_(NETLINK_ROUTE) {
+    // Lets a request for addresses name a link.
+    socket_.enable(NETLINK_GET_STRICT_CHK);
+}
+
 int Netlink::links(const MessageVisitor& visit) {
-    return ask(makeRequest(RTM_GETLINK, NLM_F_DUMP, ifinfomsg{}), visit);
+    return socket_.ask(makeRequest(RTM_GETLINK, NLM_F_DUMP, bytesOf(ifinfomsg{})), visit);
 }
 
 int Netlink::addresses(int link, const MessageVisitor& visit) {
     ifaddrmsg address{};
     address.ifa_family = AF_INET;
     address.ifa_index = static_cast<std::uint32_t>(link);
-    return ask(makeRequest(RTM_GETADDR, NLM_F_DUMP, address), visit);
+    return socket_.ask(makeRequest(RTM_GETADDR, NLM_F_DUMP, bytesOf(address)), visit);
 }
 
 int Netlink::link(std::string_view name, const MessageVisitor& visit) {
     if (name.empty() || name.size() >= IFNAMSIZ) return ENODEV;
     const std::string attribute = makeAttribute(IFLA_IFNAME, std::string(name) + '\0');
-    return ask(makeRequest(RTM_GETLINK, 0, ifinfomsg{}, attribute), visit);
+    return socket_.ask(makeRequest(RTM_GETLINK, 0, bytesOf(ifinfomsg{}), attribute), visit);
 }
 
 }  // namespace hosttools

@@ -42,7 +42,38 @@ using MessageVisitor = std::function<void(unsigned, std::string_view)>;
 /// @return 0, or the error number that the kernel answered (EINTR: the answer changed while it was read)
 int eachMessage(std::string_view datagram, const MessageVisitor& visit, bool& done);
 
-/// A routing netlink socket. One question at a time.
+/// A message. @param body what stands between the header and the attributes
+std::string makeRequest(unsigned type, unsigned flags, std::string_view body,
+                        std::string_view attributes = {});
+std::string makeAttribute(unsigned type, std::string_view data);
+
+/// The bytes of a plain structure.
+template <typename Plain>
+std::string_view bytesOf(const Plain& plain) {
+    static_assert(std::is_trivially_copyable_v<Plain>);
+    return {reinterpret_cast<const char*>(&plain), sizeof plain};
+}
+
+/// A netlink socket. One question at a time.
+class NetlinkSocket {
+public:
+    /// @param protocol NETLINK_ROUTE and so on
+    explicit NetlinkSocket(int protocol);
+
+    /// Sends a request and calls visit for each message of the answer.
+    /// @param datagrams when given, called with each whole datagram first
+    /// @return 0 or an error number
+    int ask(std::string_view request, const MessageVisitor& visit,
+            const std::function<void(std::string_view)>& datagrams = {});
+    /// Switches one of NETLINK_GET_STRICT_CHK and so on, on; a kernel without it does without.
+    void enable(int option);
+
+private:
+    Descriptor socket_;
+    int problem_;  ///< why there is no socket, or 0
+};
+
+/// A routing netlink socket.
 class Netlink {
 public:
     Netlink();
@@ -61,10 +92,7 @@ public:
     int addresses(int link, const MessageVisitor& visit);
 
 private:
-    int ask(std::string_view request, const MessageVisitor& visit);
-
-    Descriptor socket_;
-    int problem_;  ///< why there is no socket, or 0
+    NetlinkSocket socket_;
 };
 
 }  // namespace hosttools

@@ -53,11 +53,9 @@ int runRoute(Arguments arguments, Host&, Answer& answer) {
     Arguments words = arguments;
     const bool known = readOptions(words, request);
     if (known && !words.empty() && !request.inet6) return changeRoute(words, answer);
+    // Without -n names would be looked up.
     if (!known || !words.empty() || !request.numeric) {
-        answer.complain(
-            toolName,
-            "only numeric listings and changes of IPv4 routes here: route [-A inet6] -n, route add|del ...");
-        return 1;
+        return answer.leaveToHost(toolName, words.empty() ? "a listing with names" : words.front());
     }
     return request.inet6 ? list("/proc/net/ipv6_route", listInet6Routes, answer)
                          : list("/proc/net/route", listRoutes, answer);

@@ -1,10 +1,13 @@
 #include "hosttools/route_change.h"
 
+#include <net/if.h>
 #include <net/route.h>
 #include <sys/ioctl.h>
 #include <sys/socket.h>
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
+#include <set>
 #include <string>
 
 #include "hosttools/addresses.h"
@@ -21,6 +24,10 @@ struct Change {
     rtentry entry{};
     std::string interface;
 };
+
+/// What the classic tool knows besides. Anything else is the name of an interface.
+constexpr std::string_view otherWords[] = {"reject", "mod",  "dyn",      "reinstate", "mss",
+                                           "window", "irtt", "hopcount", "tunnel",    "scope"};
 
 void setAddress(sockaddr& place, in_addr value) {
     sockaddr_in address{};
@@ -45,10 +52,11 @@ public:
 private:
     bool readTarget(Change& change) {
         change.entry.rt_flags = RTF_UP;
-        const std::string_view kind = words_.empty() ? "" : words_.front();
+        const std::string_view kind = firstOf(words_);
         setAddress(change.entry.rt_genmask, {});
         if (kind == "default") return readAddress(change.entry.rt_dst);
-        if (kind != "-host" && kind != "-net") return refuse();
+        if (kind.empty()) return refuse("add or del of which route?");
+        if (kind != "-host" && kind != "-net") return leaveToHost(kind);
         take();
         if (kind == "-host") {
             change.entry.rt_flags |= RTF_HOST;
@@ -58,31 +66,49 @@ private:
     }
     bool readDetail(Change& change) {
         const std::string_view word = take();
+        const bool named = word == "gw" || word == "netmask" || word == "metric" || word == "dev";
+        const bool isOther = std::ranges::find(otherWords, word) != std::end(otherWords);
+        if (isOther || word.starts_with('-')) return leaveToHost(word);
+        const std::string_view kind = named ? word : "dev";
+        if (!seen_.insert(kind).second) return refuse(Text().add(kind).add(" is given twice"));
+        if (named && words_.empty()) return refuse(Text().add(word).add(" needs a word behind it"));
+        if (kind == "dev") return readInterface(named ? take() : word, change.interface);
+        return readNamed(word, change.entry);
+    }
+    bool readNamed(std::string_view word, rtentry& entry) {
+        if (word == "metric") return readMetric(entry.rt_metric);
         if (word == "gw") {
-            change.entry.rt_flags |= RTF_GATEWAY;
-            return readAddress(change.entry.rt_gateway);
+            entry.rt_flags |= RTF_GATEWAY;
+            return readAddress(entry.rt_gateway);
         }
-        if (word == "netmask" && !(change.entry.rt_flags & RTF_HOST))
-            return readAddress(change.entry.rt_genmask);
-        if (word == "metric") return readMetric(change.entry.rt_metric);
-        if (!change.interface.empty() || (word == "dev" && words_.empty())) return refuse();
-        change.interface = word == "dev" ? take() : word;
+        if ((entry.rt_flags & RTF_HOST) != 0) return refuse("a route to a host has no netmask");
+        return readAddress(entry.rt_genmask);
+    }
+    bool readInterface(std::string_view word, std::string& interface) {
+        // The call would take the beginning of a longer name for the whole.
+        if (word.empty() || word.size() >= IFNAMSIZ) {
+            return refuse(Text().add("no name of an interface: '").add(word).add("'"));
+        }
+        interface = word;
         return true;
     }
     bool readAddress(sockaddr& place) {
-        if (words_.empty()) return refuse();
+        if (words_.empty()) return refuse("an address is missing");
         const char* word = take();
         in_addr address{};
-        if (!parseInet(word, address)) {
-            answer_.complain(toolName, Text().add("resolving ").add(word));
-            return false;
-        }
+        // Names of hosts and networks, and 10.0.0.0/8.
+        if (!parseInet(word, address))
+            return *word == '\0' ? refuse("an empty word is no address") : leaveToHost(word);
         setAddress(place, address);
         return true;
     }
     bool readMetric(short& metric) {
-        const auto number = words_.empty() ? std::nullopt : parseNumber(take());
-        if (!number || *number > 32766) return refuse();
+        constexpr unsigned most = 32766;
+        const std::string_view word = take();
+        const auto number = parseNumber(word);
+        const bool isNumber = !word.empty() && word.find_first_not_of("0123456789") == word.npos;
+        if (!isNumber || !number || *number > most)
+            return refuse(Text().add("no metric: '").add(word).add("'"));
         // The call counts from 1, 0 being "none given".
         metric = static_cast<short>(*number + 1);
         return true;
@@ -92,15 +118,18 @@ private:
         words_ = words_.subspan(1);
         return word;
     }
-    bool refuse() {
-        answer_.complain(
-            toolName,
-            "cannot be read: add|del -host A|-net A netmask M|default [gw G] [metric N] [[dev] INTERFACE]");
+    bool leaveToHost(std::string_view word) {
+        answer_.leaveToHost(toolName, word);
+        return false;
+    }
+    bool refuse(std::string_view message) {
+        answer_.complain(toolName, message);
         return false;
     }
 
     Arguments words_;
     Answer& answer_;
+    std::set<std::string_view> seen_;
 };
 
 }  // namespace
@@ -109,8 +138,7 @@ int changeRoute(Arguments words, Answer& answer) {
     const std::string_view verb = words.front();
     Change change;
     if (verb != "add" && verb != "del") {
-        answer.complain(toolName, Text().add("neither add nor del: ").add(verb));
-        return 1;
+        return answer.leaveToHost(toolName, verb);
     }
     if (!Reader(words.subspan(1), answer).read(change)) return 1;
     if (!change.interface.empty()) change.entry.rt_dev = change.interface.data();

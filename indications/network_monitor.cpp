@@ -5,10 +5,6 @@
 
 #include "indications/contained.h"
 #include "indications/globals.h"
-#include "indications/left_behind.h"
-#include "mi/globals.h"
-#include "mi/log.h"
-#include "mi/os_hw_mi.h"
 #include "mi/stopped_thread.h"
 
 namespace IC {
@@ -20,7 +16,7 @@ constexpr unsigned int kLongestWait = 10;  // seconds for the thread to end
 
 }  // namespace
 
-NetworkMonitor::NetworkMonitor(QX::Event* ended) : ended_(ended) {
+NetworkMonitor::NetworkMonitor(QX::Event* ended, const NodeTree& tree) : ended_(ended), tree_(tree) {
     const LogScope scope("NetworkMonitor::NetworkMonitor", indicationsLogSource);
 }
 
@@ -37,11 +33,10 @@ void NetworkMonitor::stop() {
 }
 
 void* NetworkMonitor::run(void*) {
-    const OSHWMI_IND::OwnPass own;
     const LogScope scope("NetworkMonitor: run entry", "NetworkMonitor: run exit", indicationsLogSource);
+    Pass own;
     while (!ending()) {
-        contained([this] { pass(); });
-        OSHWMI_IND::pass().slaves.clear();
+        contained([&] { pass(own); });
         if (!ending()) {
             wake_.wait(kSecondsBetweenPasses);
         }
@@ -53,38 +48,40 @@ void* NetworkMonitor::run(void*) {
     return nullptr;
 }
 
-void NetworkMonitor::pass() {
-    myoshwmi.readPrevNetNodeMap();
-    myoshwmi.createCurNetNodeMap();
+void NetworkMonitor::pass(Pass& own) const {
+    readPrevNetNodeMap(own);
+    createCurNetNodeMap(tree_, own);
     if (isLeftBehind() || stopRequested_) {
         return;  // the stop may have ended commands: what they answered is not the host's state
     }
-    for (const std::string& name : OSHWMI_IND::pass().untold) {
+    for (const std::string& name : own.now.untold) {
         logInd(kError) << "Link state of " << name << " not told, a command was ended: it stays as it was";
     }
-    myoshwmi.checkAndSendNetAlert();
+    checkAndSendNetAlert(tree_, own);
     if (isLeftBehind()) {
         return;  // the file is a later monitor's
     }
-    myoshwmi.writePrevNetNodeMap();
+    writePrevNetNodeMap(own);
 }
 
-void OsHwMI::enableIndications() {
+void Indications::enableIndications() {
     const LogScope scope("enableIndications", indicationsLogSource);
-    // Made after every global, so gone before them: a library that is closed without an unload has no monitor
-    // left that uses them.
+    // A library that is closed without an unload ends its monitor here: an object made this late is destroyed
+    // before the globals that the monitor uses.
     static const struct AtTheEnd {
+        Indications& indications;
         ~AtTheEnd() {
             leaveNoThreads();
-            if (myoshwmi.networkMonitor_ != nullptr) {
-                myoshwmi.disableIndications();
+            if (indications.networkMonitor_ != nullptr) {
+                indications.disableIndications();
             }
         }
-    } atTheEnd;
+    } atTheEnd{*this};
     contained([this] {
         logInd(kProgress) << "Creating NetworkMonitor thread.";
         networkMonitorEnded_.wait(0);  // an earlier monitor's end is not this one's
-        networkMonitor_ = new NetworkMonitor(&networkMonitorEnded_);  // first: what it calls may stop it
+        networkMonitor_ =
+            new NetworkMonitor(&networkMonitorEnded_, tree_);  // first: what it calls may stop it
         if (!networkMonitor_->start(nullptr)) {
             logInd(kError) << "NetworkMonitor thread failed.";
             delete std::exchange(networkMonitor_, nullptr);
@@ -94,7 +91,7 @@ void OsHwMI::enableIndications() {
     });
 }
 
-void OsHwMI::disableIndications() {
+void Indications::disableIndications() {
     const LogScope scope("disableIndications", indicationsLogSource);
     if (networkMonitor_ == nullptr) {
         return;

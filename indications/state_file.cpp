@@ -1,6 +1,6 @@
 // The link states of the last pass, kept across restarts of the agent: one key an interface, its state in
 // decimal.
-#include <charconv>
+#include <climits>
 #include <optional>
 #include <stdexcept>
 
@@ -8,8 +8,8 @@
 #include "framework/qx/property_file.h"
 #include "framework/qx/strings.h"
 #include "indications/globals.h"
-#include "mi/log.h"
-#include "mi/os_hw_mi.h"
+#include "indications/network_monitor.h"
+#include "mi/text.h"
 
 namespace IC {
 
@@ -25,22 +25,23 @@ std::string stateFilePath() {
     return std::string(directory) + "oshwminetind.dat";
 }
 
-std::optional<unsigned int> decimal(const std::string& text) {
-    unsigned int number = 0;
-    const char* end = text.data() + text.size();
-    const auto [stopped, failure] = std::from_chars(text.data(), end, number);
-    return failure == std::errc() && stopped == end ? std::optional(number) : std::nullopt;
+/// Digits alone, as they were written; nothing for a line that was damaged.
+std::optional<unsigned int> keptState(const std::string& text) {
+    const bool digits = text.find_first_not_of("0123456789") == text.npos && !text.empty();
+    const long long number = digits ? leadingDecimal(text) : -1;
+    return number >= 0 && number <= UINT_MAX ? std::optional(static_cast<unsigned int>(number))
+                                             : std::nullopt;
 }
 
 }  // namespace
 
-void OsHwMI::writePrevNetNodeMap() {
+void writePrevNetNodeMap(const Pass& pass) {
     const LogScope scope("writePrevNetNodeMap", indicationsLogSource);
     try {
         QX::PropertyFile file{QX::File::Path(stateFilePath())};
         file.open(QX::PropertyFile::forWriting);
-        // What is not visited stays: an interface that comes back is compared with what it was.
-        for (const auto& [name, state] : OSHWMI_IND::pass().current) {
+        // The keys of interfaces that have gone stay: one that comes back is compared with what it was.
+        for (const auto& [name, state] : pass.now.current) {
             file.setValue(QX::make_wstring(name), std::to_wstring(state));
         }
         file.close();
@@ -49,15 +50,15 @@ void OsHwMI::writePrevNetNodeMap() {
     }
 }
 
-void OsHwMI::readPrevNetNodeMap() {
+void readPrevNetNodeMap(Pass& pass) {
     const LogScope scope("readPrevNetNodeMap", indicationsLogSource);
-    OSHWMI_IND::pass().previous.clear();
+    pass.previous.clear();
     try {
         QX::PropertyFile file{QX::File::Path(stateFilePath())};
         file.open(QX::PropertyFile::forReading);
         for (const std::wstring& key : file.enumerateKeys()) {
-            if (const auto state = decimal(QX::make_string(file.getValue(key)))) {
-                OSHWMI_IND::pass().previous[QX::make_string(key)] = *state;
+            if (const auto state = keptState(QX::make_string(file.getValue(key)))) {
+                pass.previous[QX::make_string(key)] = *state;
             }
         }
         file.close();
@@ -65,7 +66,7 @@ void OsHwMI::readPrevNetNodeMap() {
     } catch (...) {
         // The first start of all has no file: an empty map raises no alert.
         logInd(kProgress) << "OSHWMI_NET_IND_DAT_FILE: Not available";
-        OSHWMI_IND::pass().previous.clear();
+        pass.previous.clear();
         OSHWMI_IND::datFileAvailable = false;
     }
 }

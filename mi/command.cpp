@@ -13,8 +13,8 @@ namespace {
 
 using Place = TextSlot::Place;
 
-/// What is judged of a text: the blanks around it only part words, the line breaks at its end only end a
-/// line.
+/// The part of a text that the gate looks at. To the shell the blanks around it only separate words, and the
+/// line breaks at its end only end a line.
 std::string_view judged(std::string_view text) {
     text = text.substr(0, text.find_last_not_of('\n') + 1);
     text = text.substr(0, text.find_last_not_of(' ') + 1);
@@ -37,7 +37,7 @@ bool isMeant(char letter, Place place) {
            isBetween(letter, '0', '9') || kMarks.find(letter) != kMarks.npos;
 }
 
-/// The first letter that makes more of a text than a text; nothing when it may enter.
+/// The first letter for which the gate refuses a text; nothing when the text may enter.
 std::optional<char> firstWrong(std::string_view text, Place place) {
     if (place != Place::quoted && text.starts_with('-')) {
         return '-';  // an option
@@ -69,7 +69,7 @@ Command::Command(std::string_view format, Slots slots, Texts texts, Length lengt
     made_->append(format, from);
     if (wrong) {
         refused_ = true;
-        // People look for the text, and cvagent reads it from here: up to the next quote it is one.
+        // For people, and for cvagent, which takes the text from this line up to the next quote.
         log(kError, function) << "Command refused for its text \"" << printable(wrong->first, '"')
                               << "\" (the \"" << printable({&wrong->second, 1}, '"')
                               << "\"), not run: " << shown();
@@ -100,7 +100,8 @@ std::optional<std::string> OutputReader::nextLine(FILE* pipe, std::size_t longes
         return std::nullopt;
     }
     std::string line(buffer.data());
-    // Without a line break it was a long line, or one that holds a zero and was longer than it looks.
+    // Without a line break the line was long, or held a zero and was longer than it looks: the whole buffer
+    // counts as read.
     const std::size_t read = line.ends_with('\n') ? line.size() : size;
     left_ -= std::min(left_, read);
     if (left_ == 0) {

@@ -17,14 +17,14 @@ namespace IC {
 constexpr std::size_t kCommandBuffer =
     512;  ///< bytes of a command line and of a line read, the final zero included
 
-/// A command that may be run: one that stands in the source as it is, or one whose texts the gate has judged.
-/// Nothing else can be made into one.
+/// A command that may be run: a constant of the source, or a format of the source whose texts the gate has
+/// checked. There is no other way to make one.
 ///
-/// The gate: no text of the host or of a caller reaches the shell that the shell could read as anything but
-/// that text. Judged is the text without line breaks at its end and without blanks at both ends. Bare it may
-/// hold letters, digits, bytes above 127 and ._:@%+=,/- and not begin with "-"; between double quotes
-/// anything but control characters (tabs and line breaks are fine), ", $, ` and \. The empty text passes. A
-/// text enters as it came, but where it stands bare before more of the command the line breaks at its end are
+/// The gate keeps every text of the host or of a caller from being more than a text to the shell. Line breaks
+/// at its end and blanks at both ends are not looked at. Outside quotes a text may hold letters, digits,
+/// bytes above 127 and ._:@%+=,/- and may not begin with "-". Between double quotes it may hold anything but
+/// ", $, `, \ and control characters other than tabs and line breaks. The empty text passes. A text is put in
+/// unchanged, except that outside quotes, with more of the command behind it, the line breaks at its end are
 /// cut.
 class Command {
 public:

@@ -14,13 +14,13 @@ inline constexpr char diskSnapshotCommand[] = "fdisk -ls 2>/dev/null > /tmp/fdis
 /// lock has been released.
 HostCommand startUnderFileLock(const Command& command);
 
-/// Writes the snapshot, in a file of its own. Leaving waits for fdisk.
-/// @return whether it is whole, that is, ends with a line break, or is empty on a disk with room. False also
-/// when its file could not be made, fdisk could not be started or was ended by force
+/// Makes the snapshot's file anew, has fdisk fill it and waits for that.
+/// @return whether the snapshot is complete: it ends with a line break, or is empty though the disk has room.
+///         False also when its file could not be made, and when fdisk could not be started or was cut off
 bool takeDiskSnapshot();
 
-/// Whether the snapshot may be read. When it may not, a command that would read it is not run and counts as
-/// one that printed nothing.
+/// Whether the snapshot may be read (TemporaryFile::isOurs). If not, the commands that read it are not run;
+/// they count as having printed nothing.
 bool isDiskSnapshotOurs();
 
 /// Removes the snapshot; one that is not there is no failure.

@@ -1,24 +1,15 @@
 #pragma once
 
 #include <atomic>
-#include <map>
 #include <string>
 
 #include "framework/ic/error.h"
-#include "framework/netinfo/records.h"
 #include "framework/qx/mutex.h"
 
 namespace IC {
 
-class OsHwMI;
-
-/// The one plug-in object; its address is all the agent gets.
-extern OsHwMI myoshwmi;
 /// Set when unload begins; ends the drive monitor's loop.
 extern std::atomic<bool> HardDriveNodeUpdate;
-
-/// Port records by interface name, for looking up the parents of LAN endpoints; null while nobody keeps any.
-extern std::map<std::string, CEthernetPort*>* m_mapEthernetPorts;
 
 namespace OSHWMI {
 

@@ -5,7 +5,7 @@
 namespace IC {
 
 /// Gives the running system a host and a domain name (`hostname`), and rewrites the host's entry in
-/// /etc/hosts and the whole of /etc/HOSTNAME. Implemented in computer/; the network writers call it. Line
+/// /etc/hosts and the whole of /etc/HOSTNAME. Line
 /// breaks at the end of a name are cut. With a name that could be more than a name to the shell the command
 /// is refused, before any file is touched. A step that fails is logged at level 6000 and ends the operation;
 /// what was done before stays done.

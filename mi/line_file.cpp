@@ -32,14 +32,14 @@ public:
 
     bool opened() const { return descriptor_ >= 0; }
 
-    /// Whether there is room for `size` bytes; nothing is changed. A file system that cannot tell is taken at
-    /// its word later.
+    /// Whether there is room for `size` bytes; nothing is changed. True where the file system cannot tell:
+    /// then the write itself shows it.
     bool hasRoom(std::size_t size) const { return size == 0 || (fitsTheLimit(size) && isThereRoom(size)); }
 
-    /// Empties the file and writes the content: whoever is killed in between leaves the beginning of the new
-    /// content, never the end of the old one.
+    /// Empties the file, then writes the content. A process that is killed in between leaves the beginning of
+    /// the new content and nothing of the old one.
     bool put(std::string_view content) const {
-        // What is no regular file has no length to cut.
+        // Fails where there is no regular file, which has no length either.
         [[maybe_unused]] const int ignored = ftruncate(descriptor_, 0);
         while (!content.empty()) {
             const ssize_t written = ::write(descriptor_, content.data(), content.size());
@@ -55,7 +55,8 @@ public:
     }
 
 private:
-    /// A process that writes beyond its limit is ended by SIGXFSZ, with the file cut already.
+    /// Asked first: a process that writes beyond its limit is ended by SIGXFSZ, when the file is empty
+    /// already.
     static bool fitsTheLimit(std::size_t size) {
         rlimit limit{};
         return getrlimit(RLIMIT_FSIZE, &limit) != 0 || limit.rlim_cur == RLIM_INFINITY ||

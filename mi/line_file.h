@@ -16,9 +16,8 @@ public:
     enum class Fate { keep, drop };
 
     LineFile() = default;  ///< no lines
-    /// The lines of a file, however long; nothing when it cannot be opened for reading, or not read to its
-    /// end: rewriting it would lose the rest. A directory opens and has no lines: what is in its way is told
-    /// by whoever then writes.
+    /// The lines of a file, however long. Nothing when it cannot be opened for reading, or not be read to its
+    /// end, for rewriting it would then lose the rest. A directory has no lines; writing to it fails.
     static std::optional<LineFile> read(const std::string& path);
 
     /// Calls `rule(std::string& line)` for every line in order. The line carries its line break, which the
@@ -48,9 +47,9 @@ public:
     /// What became of a file that was to be written.
     enum class Written { notOpened, notWhole, whole };
 
-    /// Replaces the content of the file, created when it is missing. A full disk is found out first and
-    /// leaves the file as it was; where the file system cannot tell, a failure half-way leaves what was
-    /// written so far. Both are logged at level 6000.
+    /// Replaces the content of the file, created when it is missing. A full disk is noticed before the old
+    /// content goes; where the file system cannot tell, a failed write leaves the file with a part of the new
+    /// content. Both are logged at level 6000.
     /// @param opened called once the file is open for writing, before anything is written
     Written replace(const std::string& path, const std::function<void()>& opened = {}) const;
     /// The same for writers that go on either way.

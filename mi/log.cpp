@@ -51,17 +51,36 @@ LogScope::LogScope(const char* name, const LogSource& source, const char* functi
       function_(function),
       line_(line),
       operation_(function) {
-    LogLine(source_, kProgress, function_, line_) << exit_ << ": entry";
+    write(exit_, ": entry");
 }
 
 LogScope::LogScope(const char* entry, const char* exit, const LogSource& source, const char* function,
                    int line)
     : exit_(exit), exitEnd_(""), source_(source), function_(function), line_(line), operation_(function) {
-    LogLine(source_, kProgress, function_, line_) << entry;
+    write(entry, "");
+}
+
+LogScope::LogScope(ClassName owner, const char* function, int line)
+    : owner_(owner.text),
+      exit_(function),
+      exitEnd_(": exit"),
+      source_(mainLogSource),
+      function_(function),
+      line_(line),
+      operation_(function) {
+    write(exit_, ": entry");
 }
 
 LogScope::~LogScope() {
-    LogLine(source_, kProgress, function_, line_) << exit_ << exitEnd_;
+    write(exit_, exitEnd_);
+}
+
+void LogScope::write(const char* text, const char* end) const {
+    LogLine entry(source_, kProgress, function_, line_);
+    if (owner_ != nullptr) {
+        entry << owner_ << "::";
+    }
+    entry << text << end;
 }
 
 }  // namespace IC

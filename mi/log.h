@@ -1,6 +1,7 @@
 #pragma once
 
 #include <concepts>
+#include <exception>
 #include <string>
 
 #include "framework/cvlog/message_buffer.h"
@@ -36,9 +37,7 @@ struct LogSource {
     const std::string* component;
 };
 
-extern const LogSource mainLogSource;         ///< "OsHwMI_ix86"
-extern const LogSource indicationsLogSource;  ///< "OsHwMIInd_ix86"
-extern const LogSource processorsLogSource;   ///< "OsHwMICpu_ix86"
+extern const LogSource mainLogSource;  ///< "OsHwMI_ix86"
 
 /// One log line: collects what is streamed into it and goes out at the end of the statement, first to the
 /// log, then to the trace. Errors of a thread that is being aborted go nowhere. Never throws.
@@ -85,19 +84,30 @@ private:
     const char* outer_;
 };
 
-// A line of each source. The last two arguments are the caller's function name and line: leave them out.
+/// A line of the main source. The last two arguments are the caller's function name and line: leave them out.
 inline LogLine log(int level, const char* function = __builtin_FUNCTION(), int line = __builtin_LINE()) {
     return {mainLogSource, level, Operation::nameOr(function), line};
 }
-inline LogLine logInd(int level, const char* function = __builtin_FUNCTION(), int line = __builtin_LINE()) {
-    return {indicationsLogSource, level, Operation::nameOr(function), line};
-}
-inline LogLine logCpu(int level, const char* function = __builtin_FUNCTION(), int line = __builtin_LINE()) {
-    return {processorsLogSource, level, Operation::nameOr(function), line};
+
+/// Runs one step of several; an exception is logged under the step's name and goes no further.
+template <class Work>
+void guarded(const char* name, Work work) {
+    try {
+        work();
+    } catch (const std::exception& failure) {
+        log(kError) << name << " failed: " << failure.what();
+    } catch (...) {
+        log(kError) << name << " failed: unknown exception";
+    }
 }
 
 /// The calling thread's lines go nowhere from now on.
 void endLogOfThisThread();
+
+/// The class whose member a LogScope is for.
+struct ClassName {
+    const char* text;
+};
 
 /// Writes "<name>: entry" now and "<name>: exit" when the scope is left. Without a name it takes the
 /// function's.
@@ -109,11 +119,17 @@ public:
     /// texts.
     LogScope(const char* entry, const char* exit, const LogSource& source = mainLogSource,
              const char* function = __builtin_FUNCTION(), int line = __builtin_LINE());
+    /// For the members of a class: the name is "<class>::<function>".
+    LogScope(ClassName owner, const char* function, int line);
     LogScope(const LogScope&) = delete;
     LogScope& operator=(const LogScope&) = delete;
     ~LogScope();
 
 private:
+    /// @param end what follows the text
+    void write(const char* text, const char* end) const;
+
+    const char* owner_ = nullptr;
     const char* exit_;
     const char* exitEnd_;
     const LogSource& source_;

@@ -25,8 +25,8 @@ FILE* openPipe(const char* command, const char* mode) {
 
 void closePipe(FILE* pipe) {
     const int status = pipe != nullptr ? pclose(pipe) : 0;
-    // All that is asked of an end. What a shell tells of its tools by its own status is not: tools exit with
-    // numbers of their own, those of signals among them.
+    // Nothing else is asked of a status: a shell passes on that of its last tool, and tools exit with any
+    // number, those that stand for signals among them.
     if (status != -1 && WIFSIGNALED(status) && WTERMSIG(status) == SIGKILL) {
         ++cutOff;
     }
@@ -35,8 +35,6 @@ void closePipe(FILE* pipe) {
 unsigned int commandsCutOff() {
     return cutOff;
 }
-
-MyProcess::MyProcess() : pipe_(nullptr) {}
 
 MyProcess::~MyProcess() {
     if (pipe_ != nullptr) {

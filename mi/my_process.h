@@ -9,11 +9,11 @@ namespace IC {
 /// One command pipe for the length of a scope: closed on every way out of it.
 class MyProcess {
 public:
-    /// Pipes opened and not yet closed, in the whole plug-in. A pipe that could not be opened counts for
-    /// good: the number is read in logs and decides nothing.
+    /// Pipes opened and not yet closed, in the whole plug-in, for the log. One that could not be opened is
+    /// never counted down, as readers of the log know it.
     static std::atomic<int> cnt;
 
-    MyProcess();
+    MyProcess() = default;
     MyProcess(const MyProcess&) = delete;
     MyProcess& operator=(const MyProcess&) = delete;
     ~MyProcess();
@@ -26,21 +26,21 @@ public:
     /// The same; the number of open pipes is logged.
     FILE* mypopen(std::string command, const char* mode);
 
-    /// The line of a command that was handed over as a string.
+    /// Logs the number of open pipes.
     static void logOpenPipes();
 
 private:
-    FILE* pipe_;
+    FILE* pipe_ = nullptr;
 };
 
-/// Starts a command whose output is read, or in an aborted thread none: that counts as one cut off.
+/// Starts a command whose output is read. An aborted thread starts none; that counts as a command cut off.
 FILE* openPipe(const char* command, const char* mode);
 
 /// Ends a command's output and waits for the command; a null pipe is fine.
 void closePipe(FILE* pipe);
 
-/// How many of the calling thread's commands were ended by force so far, that is, by a SIGKILL that hit the
-/// shell itself, as an agent's deadline and an abort send it: what they printed is not what they had to tell.
+/// How many commands of the calling thread have been cut off so far: their shell was ended by SIGKILL, as by
+/// an agent's deadline or an abort. What such a command has printed is no answer.
 unsigned int commandsCutOff();
 
 }  // namespace IC

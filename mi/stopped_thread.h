@@ -6,14 +6,14 @@
 
 namespace IC {
 
-/// Waits for a thread of the plug-in's. After ten seconds its commands are ended.
+/// Waits for a thread of the plug-in's to end. After ten seconds it is aborted, which ends its commands.
 void joinWithPatience(QX::Thread& thread);
 
-/// Deletes a thread of the plug-in's that was stopped. One that still runs, the calling thread included, goes
-/// when it ends, and this library stays mapped as long as the process lives.
+/// Deletes a stopped thread's object. While the thread still runs (it may be the calling one), the object is
+/// left to it, and this library stays mapped until the process ends.
 void dropStopped(std::unique_ptr<QX::Thread> thread);
 
-/// From now on no thread may outlive the library, since it is being closed: dropStopped waits.
+/// To be called when the library is being closed: from now on dropStopped waits for a thread that runs.
 void leaveNoThreads();
 
 }  // namespace IC

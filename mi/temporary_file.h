@@ -4,9 +4,8 @@
 
 namespace IC {
 
-/// A file in /tmp that a command writes and others read. Its name is known to everybody on the host, and
-/// anybody can put there before us what he likes: a link to a file that only we may write, a pipe, lines of
-/// his own.
+/// A file in /tmp that a command writes and others read. Any user of the host knows its name and may have put
+/// something else there first: a link to a file that only we may write, a pipe, lines of his own.
 class TemporaryFile {
 public:
     /// @param path kept, not copied
@@ -18,8 +17,8 @@ public:
     /// @return false when something could not be removed or the file not created: the command must not run
     bool removeAndCreate();
 
-    /// Whether what stands there may be read: a regular file of our user's, under one name, that nobody else
-    /// can write. What an earlier run left is none when removeAndCreate could not replace it.
+    /// Whether what stands there may be read: a regular file of our user's, without a second link, that
+    /// nobody else can write. Not after a removeAndCreate that failed: then it is an earlier run's.
     bool isOurs() const;
 
 private:

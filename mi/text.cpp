@@ -1,5 +1,6 @@
 #include "mi/text.h"
 
+#include <cstdlib>
 #include <cstring>
 
 namespace IC {
@@ -38,6 +39,15 @@ std::string trimEnd(std::string text, char unwanted) {
 std::string trimStart(std::string text, char unwanted) {
     text.erase(0, text.find_first_not_of(unwanted));
     return text;
+}
+
+long long leadingDecimal(const std::string& text, std::string* rest) {
+    char* end = nullptr;
+    const long long number = std::strtoll(text.c_str(), &end, 10);
+    if (rest != nullptr) {
+        *rest = text.substr(static_cast<std::size_t>(end - text.c_str()));
+    }
+    return number;
 }
 
 std::string printable(std::string_view text, char also) {

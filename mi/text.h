@@ -20,6 +20,12 @@ std::string trimEnd(std::string text, char unwanted = '\n');
 /// `text` without the `unwanted` characters at its start.
 std::string trimStart(std::string text, char unwanted = ' ');
 
+/// The decimal number at the start of a text, with blanks and a sign before it; 0 when there is none, the
+/// nearest there is for one that does not fit. Sizes that fdisk prints are no such numbers: they are read as
+/// floating point.
+/// @param rest receives what stands behind it: all of the text when there is no number
+long long leadingDecimal(const std::string& text, std::string* rest = nullptr);
+
 /// A number as "%d" prints it: what an int does not hold comes out negative, as the readers of these files
 /// have always found it.
 inline std::string signedDecimal(unsigned int number) {

@@ -5,9 +5,9 @@
 
 #include "mi/line_file.h"
 #include "mi/log.h"
-#include "mi/os_hw_mi.h"
 #include "mi/text.h"
 #include "network/ip_origin.h"
+#include "network/network_builder.h"
 
 namespace IC {
 
@@ -21,7 +21,8 @@ constexpr char kServers[] = "nameserver";
 constexpr char kSuffixes[] = "search";
 constexpr char kPolicy[] = "NETCONFIG_DNS_POLICY=";
 
-/// The writers go by a keyword's first six letters: "namese" begins a server line.
+/// Six letters of the keyword are enough: a line with a misspelt one ("nameservers") is replaced, too, where
+/// it would otherwise stay beside the new one.
 bool isLineOf(const char* keyword, const std::string& line) {
     return line.starts_with(std::string_view(keyword).substr(0, 6));
 }
@@ -148,7 +149,7 @@ void getDNSDetails(std::vector<std::string>& servers, std::vector<std::string>& 
     }
 }
 
-void OsHwMI::stringFormatForDNSServersAndSuffixes(std::string& servers, std::string& suffixes) {
+void NetworkBuilder::stringFormatForDNSServersAndSuffixes(std::string& servers, std::string& suffixes) {
     const LogScope scope;
     appendAll(servers, dnsServers_);
     appendAll(suffixes, dnsSuffixes_);

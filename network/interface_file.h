@@ -15,11 +15,12 @@ inline constexpr char kInterfaceFileOpened[] = "File open '/etc/sysconfig/networ
 
 /// The one line that a writer of interface files gives a key.
 struct KeyLine {
-    /// What a line that holds the key becomes.
+    /// What a line that holds the key becomes. Keys share a line only in a file that was edited by hand; each
+    /// writer goes on treating such a line as it always has, so that the file comes out as its owner expects.
     enum class Held {
-        replaced,       ///< `line`; the keys behind this one look at the new text
-        kept,           ///< it stays; the keys behind this one look at it too
-        keptUntouched,  ///< it stays, whatever other keys it holds
+        replaced,  ///< `line`; the keys behind this one look at the new text
+        kept,      ///< it stays, for a file that tells its origin keeps it; the keys behind look at it too
+        keptUntouched,  ///< as kept, but no key behind looks at it: the mask is never written over an origin
     };
 
     const char* key;   ///< looked for anywhere in a line: "IPADDR_" finds every secondary address

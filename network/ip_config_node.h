@@ -1,66 +1,51 @@
 #pragma once
 
 #include <atomic>
+#include <map>
 #include <string>
 #include <vector>
 
-#include "framework/ic/mutable_node.h"
+#include "framework/netinfo/records.h"
+#include "mi/host_node.h"
 
 namespace IC {
 
-/// One interface's IP configuration. A read asks the host, a write changes it.
-class IPConfigNode : public MutableNode {
-public:
-    enum PropertyId : unsigned int {
-        ipOrigin = 24,              ///< enumeration: IPOrigin code; writing 1 or 3 edits the interface file
-        ipv4Address = 25,           ///< text; written while the origin is fixed
-        subnetMask = 26,            ///< text; written while the origin is fixed
-        ipv6Address = 27,           ///< text; written while the origin is fixed
-        ipv6AddressType = 28,       ///< enumeration
-        ipv6InterfaceId = 29,       ///< text: fourth group of the IPv6 address
-        protocol = 47,              ///< number: ProtocolCode
-        reenumeratePorts = 74,      ///< number: writing 1 looks for new interfaces; never stored then
-        dhcpServers = 93,           ///< list of texts
-        dnsServers = 94,            ///< list of texts, the host's
-        originsSupported = 95,      ///< list of numbers: 1, 3
-        addressOrigin = 96,         ///< enumeration: 1 with a DHCP lease, else 3
-        hostName = 97,              ///< text, the host's
-        domainName = 98,            ///< text, the host's
-        dnsSuffixes = 99,           ///< list of texts, the host's
-        ipv4Gateway = 100,          ///< text; written while the origin is fixed
-        ipv6Gateway = 101,          ///< text; written while the origin is fixed
-        ipv6PrefixLength = 102,     ///< number of bits; written while the origin is fixed
-        interfaceName = 108,        ///< text
-        interfaceLabel = 121,       ///< text: the name again
-        linkState = 123,            ///< number: 1 up, 12 down; written: 1 or 9 up, 12 or 16 down
-        linkStatesSupported = 125,  ///< list of numbers: 0, 1, 12
-        usesDhcp = 186,             ///< boolean: a DHCP lease file exists
-    };
-
-    /// @param name the interface's
-    IPConfigNode(unsigned int nodeId, unsigned int linkedId, std::vector<unsigned int> miIds,
-                 unsigned int nodeType, unsigned int index, std::string name);
-    ~IPConfigNode() override;
-
-    const std::string& name() const { return name_; }
-    /// Asks the host for what it can change at any time, the store for the rest. Always a success for the
-    /// former: a tool that answers nothing gives an empty text, 0, or 12 for the link state.
-    Error getProperty(unsigned int id, PropertyValue& value) const override;
-    /// Changes the host, then stores the value. Always a success; failures are only logged.
-    /// Until the plug-in has started, and until the builder has said that the node is complete, values are
-    /// only stored: the builder's own filling must never change the host.
-    Error setProperty(const unsigned int& id, const PropertyValue& value) override;
-
-    /// The builder is done; from now on writes act on the host.
-    void complete() { complete_ = true; }
-
-private:
-    const std::string name_;
-    std::atomic<bool> complete_{false};
+/// What every interface of the host shares, read once for a walk over the interfaces.
+struct HostFacts {
+    std::string hostName;
+    std::string domainName;
+    std::vector<std::string> dnsServers;
+    std::vector<std::string> dnsSuffixes;
 };
 
-/// The IPOrigin code of a BOOTPROTO keyword: 1 for "dhcp" and "dhcp4", 3 for "static" and "none", 2 for
-/// "bootp", 0 for any other.
-unsigned int originOfKeyword(const std::string& keyword);
+class NetworkBuilder;
+
+extern const NodeClass ipConfigClass;
+
+/// One interface's IP configuration: a read asks the host, a write changes it. Its name is the interface's. A
+/// tool that answers nothing gives an empty text, 0, or LinkState::down.
+class IPConfigNode : public NodeOf<ipConfigClass> {
+public:
+    using NodeOf::NodeOf;
+
+    /// Changes the host, then stores the value. Always a success; failures are only logged.
+    /// Until the plug-in has started, and until the node is complete, values are only stored: filling it must
+    /// never change the host.
+    Error setProperty(const unsigned int& id, const PropertyValue& value) override;
+
+    /// Filling is over; from now on writes act on the host, and it is `builder` that looks for new
+    /// interfaces.
+    void complete(NetworkBuilder* builder) { builder_ = builder; }
+    NetworkBuilder* builder() const { return builder_; }  ///< null until the node is complete
+
+    /// Asks the host for everything an IP configuration shows and stores it.
+    /// @param settings receives what is saved of the interface: its addresses, gateways and boot protocol
+    void fill(const HostFacts& host, std::map<std::string, std::string>& settings);
+    /// Stores the names and one address, without asking the host.
+    void fill(const CIPInfo& address);
+
+private:
+    std::atomic<NetworkBuilder*> builder_{nullptr};
+};
 
 }  // namespace IC

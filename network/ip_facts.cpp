@@ -3,11 +3,34 @@
 #include "mi/command.h"
 #include "mi/text.h"
 #include "network/address_parse.h"
+#include "network/address_queries.h"
 #include "network/dhcp_queries.h"
-#include "network/ipv6_writer.h"
 #include "network/route_queries.h"
 
 namespace IC {
+
+IPv4 ipv4Of(const std::string& name) {
+    IPv4 ip;
+    ip.isWhole = getIPv4Details(name, ip.address, ip.mask);
+    return ip;
+}
+
+IPv6 ipv6Of(const std::string& name) {
+    IPv6 ip;
+    getIPv6Address(name, ip.address, ip.prefixLength);
+    return ip;
+}
+
+std::string bootProtoOf(const std::string& name) {
+    std::string keyword;
+    getBootProto(name, keyword);
+    return keyword;
+}
+
+bool isBondListed(const std::string& bond) {
+    return firstLine(HostCommand::fromText(textCommand("ifconfig | grep %s 2> /dev/null", bond)))
+        .line.has_value();
+}
 
 std::string preferredIPv6Gateway(const std::string& name) {
     std::vector<std::string> gateways;

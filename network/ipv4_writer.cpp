@@ -1,12 +1,12 @@
 #include "network/ipv4_writer.h"
 
+#include "framework/ic/link_state.h"
 #include "mi/command.h"
 #include "mi/line_file.h"
 #include "mi/log.h"
 #include "mi/text.h"
 #include "network/interface_file.h"
 #include "network/ip_origin.h"
-#include "network/link_codes.h"
 #include "network/routes_file.h"
 
 namespace IC {
@@ -28,11 +28,11 @@ std::string bootProtoLine(unsigned int origin, bool dhcpv6Known) {
 /// The command that takes an interface to a status; "" for a status that is none.
 Command statusCommand(const std::string& ifName, unsigned int status) {
     switch (status) {
-        case 1:
-        case 9:
+        case LinkState::up:
+        case LinkState::bringUp:
             return textCommand("ifconfig %s up", ifName);
-        case 12:
-        case 16:
+        case LinkState::down:
+        case LinkState::takeDown:
             return textCommand("ifconfig %s down", ifName);
         default:
             return "";
@@ -43,7 +43,8 @@ Command statusCommand(const std::string& ifName, unsigned int status) {
 
 void setIPOrigin(std::string, PropertyValue origin, std::string mac) {
     const LogScope scope;
-    // Any answer counts, so on a host with a shell this is always "known".
+    // What rpm prints is not read, so this is always true where there is a shell: hosts without DHCPv6 have
+    // had BOOTPROTO=dhcp all along and depend on it.
     const bool dhcpv6Known = HostCommand("rpm -qa | grep dhcpv6*").started();
     log(kProgress) << "File open " << InterfaceFile::pathOf(mac) << " in read mode.";
     InterfaceFile file(mac);
@@ -54,7 +55,8 @@ void setIPOrigin(std::string, PropertyValue origin, std::string mac) {
     KeyLine startMode{"STARTMODE=", "STARTMODE='auto'\n"};
     file.replace({&bootProto, &startMode});
     if (bootProto.line.empty()) {
-        bootProto.line = file.lastLine();  // an origin that has no line of its own repeats the last one
+        // Agents send no such origin; a file that gets one must still come out as on every other host.
+        bootProto.line = file.lastLine();
     }
     file.appendMissing({&bootProto, &startMode});
     log(kChange) << "IP Origin  = " << origin;
@@ -63,6 +65,8 @@ void setIPOrigin(std::string, PropertyValue origin, std::string mac) {
 
 void setIPv4Address(std::string, std::string address, std::string mac) {
     const LogScope scope("Entering setIPv4Address", "Exiting setIPv4Address");
+    // A line with both keys becomes the address alone, while the mask's writer leaves such a line: the files
+    // of running hosts must come out of every version alike.
     KeyLine bootProto{kBootProto, kStaticBootProto, KeyLine::Held::kept};
     KeyLine ipAddress{"IPADDR=", "IPADDR=" + address + '\n'};
     InterfaceFile file(mac);
@@ -112,7 +116,7 @@ void setIPv4GatewayForSuSe10(std::string const& ifName, std::string const& gatew
 
 void setInterfaceStatus(const std::string& ifName, unsigned int status) {
     log(kProgress) << "Status Value : " << status;
-    const bool isFailOver = status == LinkCode::switchedOver || status == LinkCode::switchedBack;
+    const bool isFailOver = status == LinkState::switchedOver || status == LinkState::switchedBack;
     if (contains(ifName, "bond") && isFailOver) {
         log(kProgress) << "Status updation for bonded interface. New status is: " << status;
         return;
@@ -121,7 +125,8 @@ void setInterfaceStatus(const std::string& ifName, unsigned int status) {
     if (command.shown().empty()) {
         log(kError) << "IPConfigNode::setProperty: Invalid status request.";
     }
-    HostCommand::fromText(command);  // an empty command is run as well: it changes nothing
+    // An empty command is run as well: it changes nothing, and the log shows it among the open pipes.
+    HostCommand::fromText(command);
 }
 
 void restartNetwork() {

@@ -4,6 +4,7 @@
 #include "mi/log.h"
 #include "mi/text.h"
 #include "network/interface_file.h"
+#include "network/route_queries.h"
 #include "network/routes_file.h"
 
 namespace IC {
@@ -52,20 +53,6 @@ void setIPv6GatewayForSuSe10(std::string const& ifName, std::string const& gatew
     if (replaceDefaultRoute(AddressFamily::ipv6, gateway) == RoutesRewrite::notWritten) {
         log(kError) << "Can not open '/etc/sysconfig/network/routes' in write mode.";
     }
-}
-
-bool getStaticIPV6GatewaysOnSuSe10(std::string const& ifName, std::vector<std::string>& gateways) {
-    const LogScope scope;
-    HostCommand routes(
-        formatCommand("route -A inet6 -n 2> /dev/null | grep %s | grep UG | grep -v UGDA"
-                      " | tr -s ' ' | cut -d ' ' -f2 2> /dev/null",
-                      ifName));
-    bool any = false;
-    while (const auto line = routes.nextLine()) {
-        gateways.push_back(trimEnd(*line));
-        any = true;
-    }
-    return any;
 }
 
 void deleteStaticIPv6GatewayOnSuSe10(std::string const& ifName, std::vector<std::string> const& gateways) {

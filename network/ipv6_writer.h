@@ -25,12 +25,6 @@ void setIPv6Gateway(std::string ifName, std::string gateway, std::string address
 /// was.
 void setIPv6GatewayForSuSe10(std::string const& ifName, std::string const& gateway);
 
-/// The next hops of the interface's IPv6 gateway routes that no router advertised, from `route`. The lines
-/// are chosen by substring: eth1 also sees the routes of eth10.
-/// @param gateways is appended to, in the order of the routing table
-/// @return whether there was one
-bool getStaticIPV6GatewaysOnSuSe10(std::string const& ifName, std::vector<std::string>& gateways);
-
 /// Deletes the default routes via these gateways, in order.
 void deleteStaticIPv6GatewayOnSuSe10(std::string const& ifName, std::vector<std::string> const& gateways);
 

@@ -1,54 +1,33 @@
 #include "network/lan_endpoint_node.h"
 
-#include <utility>
-
 #include "framework/netinfo/ip_interface_info.h"
-#include "mi/globals.h"
 #include "mi/log.h"
 #include "mi/node_types.h"
-#include "mi/os_hw_mi.h"
 #include "mi/text.h"
 #include "network/ip_config_node.h"
+#include "network/network_builder.h"
 
 namespace IC {
 
+constinit const NodeClass lanEndPointClass{"~CLANEndPointNode"};
+
 namespace {
 
-void storeAddress(IPConfigNode& node, const CIPInfo& address) {
-    node.setProperty(IPConfigNode::interfaceName, {node.name(), true});
-    node.setProperty(IPConfigNode::interfaceLabel, {node.name(), true});
-    if (address.ipv6) {
-        node.setProperty(IPConfigNode::ipv6Address, {address.address, true});
-        node.setProperty(IPConfigNode::ipv6PrefixLength, {Number(address.prefixLength), true});
-    } else {
-        node.setProperty(IPConfigNode::ipv4Address, {address.address, true});
-        node.setProperty(IPConfigNode::subnetMask, {address.mask, true});
-    }
-    node.complete();
+CLANEndPointNode* createLANEndPoint(NodeTree& tree, const std::string& name, unsigned int parent,
+                                    unsigned int index) {
+    auto* node =
+        new CLANEndPointNode(tree.drawNodeId(), parent, tree.miIds(), NodeType::lanEndPoint, index, name);
+    tree.appendNode(node);
+    node->setDescription("LAN EndPoint node");
+    node->setStatus(kStatusGood);
+    constexpr unsigned int kInterfaceName = 108;
+    node->setProperty(kInterfaceName, {name, true});
+    return node;
 }
 
 }  // namespace
 
-CLANEndPointNode::CLANEndPointNode(unsigned int nodeId, unsigned int linkedId,
-                                   std::vector<unsigned int> miIds, unsigned int nodeType, unsigned int index,
-                                   std::string name)
-    : MutableNode(nodeId, linkedId, std::move(miIds), nodeType, index), name_(std::move(name)) {
-    const LogScope scope("CLANEndPointNode::CLANEndPointNode");
-}
-
-CLANEndPointNode::~CLANEndPointNode() {
-    const LogScope scope("CLANEndPointNode::~CLANEndPointNode");
-}
-
-Error CLANEndPointNode::getProperty(unsigned int id, PropertyValue& value) const {
-    const LogScope scope("CLANEndPointNode::getProperty");
-    return MutableNode::getProperty(id, value);
-}
-
-Error CLANEndPointNode::setProperty(const unsigned int& id, const PropertyValue& value) {
-    const LogScope scope("CLANEndPointNode::setProperty");
-    return MutableNode::setProperty(id, value);
-}
+std::map<std::string, CEthernetPort*>* m_mapEthernetPorts = nullptr;
 
 bool getParentLANEndPointNode(std::string name, unsigned int& id) {
     const std::string entry = "In getParentLANEndPointNode " + name;
@@ -64,7 +43,7 @@ bool getParentLANEndPointNode(std::string name, unsigned int& id) {
     return true;
 }
 
-void OsHwMI::createLANEndPointNodes() {
+void NetworkBuilder::createLANEndPointNodes() {
     const LogScope scope("In OsHwMI::createLANEndPointNodes", "Exit OsHwMI::createLANEndPointNodes");
     CIPInterfaceInfo interfaces;
     const IPInfoByInterface* addresses = interfaces.getInterfaceIPsInfo();
@@ -77,37 +56,29 @@ void OsHwMI::createLANEndPointNodes() {
     unsigned int endPoints = 0;
     unsigned int configs = 0;
     for (const auto& [name, ofInterface] : *addresses) {
-        CLANEndPointNode* endPoint = createLANEndPoint(name, idOf(tree_.networkController), ++endPoints);
+        CLANEndPointNode* endPoint =
+            createLANEndPoint(tree_, name, idOf(tree_.fixed.networkController), ++endPoints);
         std::vector<CIPInfo*> infos = ofInterface;
         createIPConfigNodes(&infos, name, endPoint, configs);
     }
     for (const auto& [name, ofInterface] : *addresses) {
         unsigned int parent = 0;
         if (contains(name, "#") && getParentLANEndPointNode(name, parent)) {
-            createLANEndPoint(name, parent, ++endPoints);
+            createLANEndPoint(tree_, name, parent, ++endPoints);
         }
     }
 }
 
-CLANEndPointNode* OsHwMI::createLANEndPoint(const std::string& name, unsigned int parent,
-                                            unsigned int index) {
-    auto* node = new CLANEndPointNode(drawNodeId(), parent, miIds(), NodeType::lanEndPoint, index, name);
-    appendNode(node);
-    node->setDescription("LAN EndPoint node");
-    node->setStatus(1);
-    node->setProperty(CLANEndPointNode::interfaceName, {name, true});
-    return node;
-}
-
-void OsHwMI::createIPConfigNodes(std::vector<CIPInfo*>* addresses, std::string name, MutableNode* parent,
-                                 unsigned int& index) {
+void NetworkBuilder::createIPConfigNodes(std::vector<CIPInfo*>* addresses, std::string name,
+                                         MutableNode* parent, unsigned int& index) {
     const LogScope scope;
     for (const CIPInfo* address : *addresses) {
-        auto* config = makeNode<IPConfigNode>(parent, NodeType::ipConfiguration, ++index, name);
-        appendNode(config);
+        auto* config = tree_.makeNode<IPConfigNode>(parent, NodeType::ipConfiguration, ++index, name);
+        tree_.appendNode(config);
         config->setDescription("IP Configuration");
-        config->setStatus(1);
-        storeAddress(*config, *address);
+        config->setStatus(kStatusGood);
+        config->fill(*address);
+        config->complete(this);
     }
 }
 

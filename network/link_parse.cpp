@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <cstdint>
-#include <cstdlib>
 #include <limits>
 #include <string_view>
 
@@ -26,9 +25,8 @@ std::string withoutSlaveLabel(std::string line, std::size_t length) {
 }  // namespace
 
 int leadingNumber(const std::string& text) {
-    const long long number = std::strtoll(text.c_str(), nullptr, 10);
-    return static_cast<int>(
-        std::clamp<long long>(number, std::numeric_limits<int>::min(), std::numeric_limits<int>::max()));
+    return static_cast<int>(std::clamp<long long>(leadingDecimal(text), std::numeric_limits<int>::min(),
+                                                  std::numeric_limits<int>::max()));
 }
 
 unsigned long long networkSpeed(const std::string& line) {

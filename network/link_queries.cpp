@@ -30,8 +30,8 @@ bool isMiiStatusUp(const std::string& bond) {
     return status.line && parse::isMiiUp(*status.line);
 }
 
-/// While it lives, this thread asks the members of one bond more. The kernel nests none, but what is taken
-/// for a member's file can name the bond that it is asked for.
+/// Counts how deep a thread is in asking members of bonds. The kernel nests no bonds, but what is read as a
+/// bond's file may name the bond itself as its member.
 class BondDepth {
 public:
     BondDepth() { ++depth; }

@@ -1,11 +1,7 @@
 #include "network/port_node.h"
 
-#include <cstdlib>
-#include <utility>
-
-#include "mi/log.h"
-#include "mi/property_table.h"
-#include "network/link_codes.h"
+#include "framework/ic/link_state.h"
+#include "mi/text.h"
 #include "network/link_queries.h"
 #include "network/port_queries.h"
 #include "network/port_type.h"
@@ -15,18 +11,46 @@ namespace IC {
 
 namespace {
 
-PropertyValue numberOf(bool flag) {
-    return {Number(flag), true};
-}
+namespace PortId {
+enum : unsigned int {
+    portNames = 0,              ///< list of one text: the interface
+    connectorSpeed = 38,        ///< number: Mb/s of the first supported link mode, 0 when it tells none
+    speed = 57,                 ///< number, 64 bits: kb/s; 0 for no link or an unknown speed
+    autoNegotiation = 67,       ///< boolean
+    fullDuplex = 82,            ///< boolean
+    interfaceName = 108,        ///< text
+    enabledState = 110,         ///< enumeration: always 1
+    requestedState = 111,       ///< enumeration: always 1
+    interfaceLabel = 121,       ///< text: the name again
+    linkState = 123,            ///< number: LinkState::up or down
+    linkStatesSupported = 125,  ///< list of numbers: 0, up, down
+    wakeOnLanSupported = 182,   ///< list of numbers: 3 (magic packet); unset when ethtool tells nothing
+    wakeOnLanEnabled = 183,     ///< list of numbers: 3 (magic packet); unset when ethtool tells nothing
+    portType = 185,             ///< number: code of the first supported link mode (getPortType)
+    isTeamMember = 193,         ///< boolean: SLAVE of the interface file is yes
+    isActiveMember = 194,       ///< boolean: the team sends through this port (or, of eth1, eth10)
+    memberLinkStatus = 195,     ///< text: the MII status word, from the team's status file
+    memberLinkFailures = 196,   ///< number: link failure count, from the team's status file
+    team = 199,                 ///< text: MASTER of the interface file
+};
+}  // namespace PortId
 
-unsigned long long speedOf(const std::string& name) {
+PropertyValue speedOf(const std::string& name) {
     unsigned long long speed = 0;
     getNetworkSpeed(name, speed);
-    return speed;
+    return {Number(speed), true};
 }
 
-unsigned int linkStateOf(const std::string& name) {
-    return isNICUp(name) ? LinkCode::up : LinkCode::down;
+PropertyValue autoNegotiationOf(const std::string& name) {
+    return {Number(getAutoSense(name)), true};
+}
+
+PropertyValue duplexOf(const std::string& name) {
+    return {Number(getNetworkDuplex(name)), true};
+}
+
+PropertyValue portStateOf(const std::string& name) {
+    return {Number(isNICUp(name) ? LinkState::up : LinkState::down), true};
 }
 
 /// What the interface file says of the port's place in a team.
@@ -42,147 +66,93 @@ TeamRole roleOf(const std::string& name) {
     return {slave == "yes", master};
 }
 
-/// An answer from the status file of the team the port belongs to.
-std::string memberFact(const std::string& name, unsigned int id, std::string team) {
+PropertyValue isTeamMember(const std::string& name) {
+    return {Number(roleOf(name).isMember), true};
+}
+
+PropertyValue teamOfPort(const std::string& name) {
+    return {roleOf(name).team, true};
+}
+
+/// What the status file of a port's team says of the port.
+PropertyValue memberFact(const std::string& name, unsigned int id, std::string team) {
     std::string fact;
     getNICTeamingInformation(name, id, fact, team);
-    return fact;
+    switch (id) {
+        case PortId::isActiveMember:
+            return {Number(!fact.empty()), true};
+        case PortId::memberLinkFailures:
+            return {Number(static_cast<unsigned int>(leadingDecimal(fact))), true};
+        default:
+            return {fact, true};
+    }
 }
 
-PropertyValue isActive(const std::string& fact) {
-    return numberOf(!fact.empty());
+template <unsigned int id>
+PropertyValue memberFactOf(const std::string& name) {
+    return memberFact(name, id, roleOf(name).team);
 }
 
-PropertyValue failureCount(const std::string& fact) {
-    return {Number(static_cast<unsigned int>(std::strtoul(fact.c_str(), nullptr, 10))), true};
-}
-
-using Port = NetworkPortNode;
-
-Error readSpeed(const Port& port, PropertyValue& out) {
-    out = {Number(speedOf(port.name())), true};
-    return {};
-}
-
-Error readAutoNegotiation(const Port& port, PropertyValue& out) {
-    out = numberOf(getAutoSense(port.name()));
-    return {};
-}
-
-Error readDuplex(const Port& port, PropertyValue& out) {
-    out = numberOf(getNetworkDuplex(port.name()));
-    return {};
-}
-
-Error readLinkState(const Port& port, PropertyValue& out) {
-    out = {Number(linkStateOf(port.name())), true};
-    return {};
-}
-
-Error readIsMember(const Port& port, PropertyValue& out) {
-    out = numberOf(roleOf(port.name()).isMember);
-    return {};
-}
-
-Error readIsActive(const Port& port, PropertyValue& out) {
-    out = isActive(memberFact(port.name(), TeamingProperty::activeMember, roleOf(port.name()).team));
-    return {};
-}
-
-Error readLinkStatus(const Port& port, PropertyValue& out) {
-    out = {memberFact(port.name(), TeamingProperty::miiStatus, roleOf(port.name()).team), true};
-    return {};
-}
-
-Error readLinkFailures(const Port& port, PropertyValue& out) {
-    out = failureCount(memberFact(port.name(), TeamingProperty::linkFailures, roleOf(port.name()).team));
-    return {};
-}
-
-Error readTeam(const Port& port, PropertyValue& out) {
-    out = {roleOf(port.name()).team, true};
-    return {};
-}
-
-constexpr Property<Port> kPortProperties[] = {
-    {Port::speed, "speed", readSpeed},
-    {Port::autoNegotiation, "auto-negotiation", readAutoNegotiation},
-    {Port::fullDuplex, "full duplex", readDuplex},
-    {Port::linkState, "link state", readLinkState},
-    {Port::isTeamMember, "is a team member", readIsMember},
-    {Port::isActiveMember, "is the active member", readIsActive},
-    {Port::memberLinkStatus, "member link status", readLinkStatus},
-    {Port::memberLinkFailures, "member link failures", readLinkFailures},
-    {Port::team, "team", readTeam},
+constexpr Property kPortProperties[] = {
+    {PortId::speed, speedOf},
+    {PortId::autoNegotiation, autoNegotiationOf},
+    {PortId::fullDuplex, duplexOf},
+    {PortId::linkState, portStateOf},
+    {PortId::isTeamMember, isTeamMember},
+    {PortId::isActiveMember, memberFactOf<PortId::isActiveMember>},
+    {PortId::memberLinkStatus, memberFactOf<PortId::memberLinkStatus>},
+    {PortId::memberLinkFailures, memberFactOf<PortId::memberLinkFailures>},
+    {PortId::team, teamOfPort},
 };
 static_assert(idsAscend(kPortProperties));
 
-}  // namespace
-
-NetworkPortNode::NetworkPortNode(unsigned int nodeId, unsigned int linkedId, std::vector<unsigned int> miIds,
-                                 unsigned int nodeType, unsigned int index, std::string name)
-    : MutableNode(nodeId, linkedId, std::move(miIds), nodeType, index), name_(std::move(name)) {
-    const LogScope scope("NetworkPortNode::NetworkPortNode");
+void fillPortLink(NetworkPortNode& port) {
+    const PropertyValue state = portStateOf(port.name());
+    port.setStatus(static_cast<unsigned int>(state));
+    port.setProperty(PortId::linkState, state);
+    port.setProperty(PortId::speed, speedOf(port.name()));
+    port.setProperty(PortId::fullDuplex, duplexOf(port.name()));
+    port.setProperty(PortId::autoNegotiation, autoNegotiationOf(port.name()));
 }
 
-NetworkPortNode::~NetworkPortNode() {
-    const LogScope scope("NetworkPortNode::~NetworkPortNode");
-}
-
-Error NetworkPortNode::getProperty(unsigned int id, PropertyValue& value) const {
-    const LogScope scope("NetworkPortNode::getProperty");
-    const auto* live = findProperty(kPortProperties, id);
-    return live != nullptr ? live->read(*this, value) : MutableNode::getProperty(id, value);
-}
-
-Error NetworkPortNode::setProperty(const unsigned int& id, const PropertyValue& value) {
-    const LogScope scope("NetworkPortNode::setProperty");
-    return MutableNode::setProperty(id, value);
-}
-
-void NetworkPortNode::fill() {
-    setProperty(interfaceName, {name_, true});
-    setProperty(interfaceLabel, {name_, true});
-    setProperty(portNames, {std::vector<std::string>{name_}, true});
-    setProperty(enabledState, {EnumValue(1), true});
-    setProperty(requestedState, {EnumValue(1), true});
-    setProperty(linkStatesSupported, {std::vector<Number>{0U, LinkCode::up, LinkCode::down}, true});
-    fillLink();
-    fillCapabilities();
-    fillTeam();
-}
-
-void NetworkPortNode::fillLink() {
-    const unsigned int state = linkStateOf(name_);
-    setStatus(state);
-    setProperty(linkState, {Number(state), true});
-    setProperty(speed, {Number(speedOf(name_)), true});
-    setProperty(fullDuplex, numberOf(getNetworkDuplex(name_)));
-    setProperty(autoNegotiation, numberOf(getAutoSense(name_)));
-}
-
-void NetworkPortNode::fillCapabilities() {
-    const std::string mode = getSupportedLinkMode(name_);
-    setProperty(portType, {Number(getPortType(mode.c_str())), true});
-    setProperty(connectorSpeed, {Number(parse::baseTSpeed(mode)), true});
-    const WakeOnLan wakeOnLan = getWakeOnLan(name_);
+void fillCapabilities(NetworkPortNode& port) {
+    const std::string mode = getSupportedLinkMode(port.name());
+    port.setProperty(PortId::portType, {Number(getPortType(mode.c_str())), true});
+    port.setProperty(PortId::connectorSpeed, {Number(parse::baseTSpeed(mode)), true});
+    const WakeOnLan wakeOnLan = getWakeOnLan(port.name());
     const PropertyValue magicPacket(std::vector<Number>{3U}, true);
     if (wakeOnLan.supported) {
-        setProperty(wakeOnLanSupported, magicPacket);
+        port.setProperty(PortId::wakeOnLanSupported, magicPacket);
     }
     if (wakeOnLan.enabled) {
-        setProperty(wakeOnLanEnabled, magicPacket);
+        port.setProperty(PortId::wakeOnLanEnabled, magicPacket);
     }
 }
 
-void NetworkPortNode::fillTeam() {
-    const TeamRole role = roleOf(name_);
-    setProperty(isTeamMember, numberOf(role.isMember));
-    setProperty(team, {role.team, true});
-    setProperty(isActiveMember, isActive(memberFact(name_, TeamingProperty::activeMember, role.team)));
-    setProperty(memberLinkStatus, {memberFact(name_, TeamingProperty::miiStatus, role.team), true});
-    setProperty(memberLinkFailures,
-                failureCount(memberFact(name_, TeamingProperty::linkFailures, role.team)));
+void fillTeam(NetworkPortNode& port) {
+    const TeamRole role = roleOf(port.name());  // asked once for all of them
+    port.setProperty(PortId::isTeamMember, {Number(role.isMember), true});
+    port.setProperty(PortId::team, {role.team, true});
+    for (const unsigned int id :
+         {PortId::isActiveMember, PortId::memberLinkStatus, PortId::memberLinkFailures}) {
+        port.setProperty(id, memberFact(port.name(), id, role.team));
+    }
+}
+
+}  // namespace
+
+constinit const NodeClass networkPortClass{"~NetworkPortNode", kPortProperties};
+
+void NetworkPortNode::fill() {
+    setProperty(PortId::interfaceName, {name(), true});
+    setProperty(PortId::interfaceLabel, {name(), true});
+    setProperty(PortId::portNames, {std::vector<std::string>{name()}, true});
+    setProperty(PortId::enabledState, {EnumValue(1), true});
+    setProperty(PortId::requestedState, {EnumValue(1), true});
+    setProperty(PortId::linkStatesSupported, {std::vector<Number>{0U, LinkState::up, LinkState::down}, true});
+    fillPortLink(*this);
+    fillCapabilities(*this);
+    fillTeam(*this);
 }
 
 }  // namespace IC

@@ -1,7 +1,5 @@
 #include "network/port_queries.h"
 
-#include <cstdlib>
-
 #include "mi/command.h"
 #include "mi/log.h"
 #include "mi/text.h"
@@ -14,9 +12,9 @@ std::string parse::linkMode(const std::string& line) {
 }
 
 unsigned int parse::baseTSpeed(const std::string& mode) {
-    char* end = nullptr;
-    const unsigned long number = std::strtoul(mode.c_str(), &end, 10);
-    return std::string(end).starts_with("baseT") ? static_cast<unsigned int>(number) : 0;
+    std::string rest;
+    const auto number = static_cast<unsigned int>(leadingDecimal(mode, &rest));
+    return rest.starts_with("baseT") ? number : 0;
 }
 
 std::string getSupportedLinkMode(const std::string& name) {

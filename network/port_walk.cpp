@@ -85,7 +85,7 @@ std::set<std::string> PortWalk::bridgesOf(const std::vector<std::string>& listin
     std::set<std::string> bridges;
     for (const std::string& line : listing) {
         if (isOfBridgeListing(line)) {
-            // "" in the rows of a bridge's second member and of those behind it: nobody's name.
+            // The rows of a bridge's further members begin with a tab: their "" is no interface's name.
             bridges.insert(firstColumn(line));
         }
     }
@@ -96,7 +96,7 @@ ListedInterface PortWalk::interfaceOf(const std::string& line, const std::set<st
     ListedInterface found;
     getNICString(trimStart(trimStart(line), '\t'), found.name);
     if (isOfBridgeListing(line)) {
-        // A bridge whose name has no "br" in it came with its whole row.
+        // getNICString cuts a row of the bridge listing only when it holds "br".
         found.name = firstColumn(found.name);
     }
     found.isBridge = bridges.contains(found.name);

@@ -7,7 +7,7 @@
 
 #include "framework/netinfo/ip_interface_info.h"
 #include "framework/netinfo/network_info.h"
-#include "network/ip_config_builder.h"
+#include "network/ip_config_node.h"
 
 namespace IC {
 

@@ -55,6 +55,20 @@ bool getIPV6Gateway(const std::string& name, std::string& gateway) {
                          gateway);
 }
 
+bool getStaticIPV6GatewaysOnSuSe10(std::string const& ifName, std::vector<std::string>& gateways) {
+    const LogScope scope;
+    HostCommand routes(
+        formatCommand("route -A inet6 -n 2> /dev/null | grep %s | grep UG | grep -v UGDA"
+                      " | tr -s ' ' | cut -d ' ' -f2 2> /dev/null",
+                      ifName));
+    bool any = false;
+    while (const auto line = routes.nextLine()) {
+        gateways.push_back(trimEnd(*line));
+        any = true;
+    }
+    return any;
+}
+
 bool isIPv6GatewayAddressPresent(const std::string& address) {
     const LogScope scope;
     return contains(address, ":");

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <string>
+#include <vector>
 
 namespace IC {
 
@@ -17,6 +18,11 @@ bool getIPV4Gateway(const std::string& name, std::string& gateway);
 /// @param gateway emptied first
 /// @return whether one was found
 bool getIPV6Gateway(const std::string& name, std::string& gateway);
+
+/// The next hops of the interface's IPv6 gateway routes that no router advertised, from `route`.
+/// @param gateways is appended to, in the order of the routing table
+/// @return whether there was one
+bool getStaticIPV6GatewaysOnSuSe10(std::string const& ifName, std::vector<std::string>& gateways);
 
 /// Whether the text holds a colon, as every IPv6 address does.
 bool isIPv6GatewayAddressPresent(const std::string& address);

@@ -30,7 +30,7 @@ RoutesRewrite replaceDefaultRoute(AddressFamily family, const std::string& gatew
             return stays ? LineFile::Fate::keep : LineFile::Fate::drop;
         });
     } else {
-        file->clear();
+        file->clear();  // hosts come with a file of comments alone: it counts as empty, as it always has
     }
     const std::string route = "default\t" + gateway + "\t-\n";
     isIPv6 ? file->append(route) : file->prepend(route);

@@ -15,13 +15,13 @@ std::string pathOf(const std::string& name) {
     return std::string(kDirectory) + "/ifcfg-" + name;
 }
 
-/// Whether a file of this name would be somewhere else.
+/// Whether a file of this name would be in another directory.
 bool leadsAway(const std::string& name) {
     return contains(name, "/") || contains(name, "..");
 }
 
-/// Whether a line that `ls` printed is one of our files. Of a directory it lists what is in there, and a name
-/// with a line break comes as two lines: none of that may be removed from wherever the agent stands.
+/// Whether a line that `ls` printed is the path of one of our files. It may also be a file in a directory, or
+/// part of a name with a line break, which would be removed from the agent's working directory.
 bool isSavedFile(const std::string& path) {
     const std::string start = pathOf("");
     return path.starts_with(start) && !contains(path.substr(start.size()), "/");

@@ -1,51 +1,46 @@
 #include "network/team_node.h"
 
-#include <utility>
-
-#include "mi/log.h"
 #include "mi/node_types.h"
-#include "mi/os_hw_mi.h"
-#include "mi/property_table.h"
+#include "network/network_builder.h"
 #include "network/teaming_queries.h"
 
 namespace IC {
 
 namespace {
 
-Error readMembers(const NetworkTeamingNode& node, PropertyValue& out) {
-    std::vector<std::string> members;
-    if (getBondingMembers(node.name(), members)) {
-        out = PropertyValue(members, true);
-    }
-    return {};
-}
-
-Error readName(const NetworkTeamingNode& node, PropertyValue& out) {
-    out = PropertyValue(node.name(), true);
-    return {};
-}
-
-Error readMode(const NetworkTeamingNode& node, PropertyValue& out) {
-    std::string mode;
-    if (getBondingMode(node.name(), mode)) {
-        out = PropertyValue(mode, true);
-    }
-    return {};
-}
-
-constexpr Property<NetworkTeamingNode> kProperties[] = {
-    {NetworkTeamingNode::teamMembers, "team members", readMembers},
-    {NetworkTeamingNode::teamName, "team name", readName},
-    {NetworkTeamingNode::bondingMode, "bonding mode", readMode},
+namespace TeamId {
+enum : unsigned int {
+    members = 165,      ///< list of texts; unset while the team has none
+    name = 197,         ///< text: the bonding interface
+    bondingMode = 198,  ///< text: the driver's words
 };
-static_assert(idsAscend(kProperties));
+}  // namespace TeamId
+
+PropertyValue membersOfTeam(const std::string& team) {
+    std::vector<std::string> members;
+    return getBondingMembers(team, members) ? PropertyValue(members, true) : PropertyValue();
+}
+
+PropertyValue nameOfTeam(const std::string& team) {
+    return {team, true};
+}
+
+PropertyValue modeOfTeam(const std::string& team) {
+    std::string mode;
+    return getBondingMode(team, mode) ? PropertyValue(mode, true) : PropertyValue();
+}
+
+constexpr Property kTeamProperties[] = {
+    {TeamId::members, membersOfTeam},
+    {TeamId::name, nameOfTeam},
+    {TeamId::bondingMode, modeOfTeam},
+};
+static_assert(idsAscend(kTeamProperties));
 
 /// Stores what is known of the team now.
 void storeSnapshot(NetworkTeamingNode& node) {
-    for (const unsigned int id :
-         {NetworkTeamingNode::teamName, NetworkTeamingNode::bondingMode, NetworkTeamingNode::teamMembers}) {
-        PropertyValue value;
-        findProperty(kProperties, id)->read(node, value);
+    for (const unsigned int id : {TeamId::name, TeamId::bondingMode, TeamId::members}) {
+        const PropertyValue value = networkTeamingClass.find(id)->read(node.name());
         if (!value.empty()) {
             node.setProperty(id, value);
         }
@@ -54,30 +49,14 @@ void storeSnapshot(NetworkTeamingNode& node) {
 
 }  // namespace
 
-NetworkTeamingNode::NetworkTeamingNode(unsigned int nodeId, unsigned int linkedId,
-                                       std::vector<unsigned int> miIds, unsigned int nodeType,
-                                       unsigned int index, std::string name)
-    : MutableNode(nodeId, linkedId, std::move(miIds), nodeType, index), name_(std::move(name)) {
-    const LogScope scope("NetworkTeamingNode::NetworkTeamingNode");
-}
+constinit const NodeClass networkTeamingClass{"~NetworkTeamingNode", kTeamProperties};
 
-NetworkTeamingNode::~NetworkTeamingNode() {
-    const LogScope scope("NetworkTeamingNode::~NetworkTeamingNode");
-}
-
-Error NetworkTeamingNode::getProperty(unsigned int id, PropertyValue& value) const {
-    const LogScope scope("NetworkTeamingNode::getProperty");
-    const auto* property = findProperty(kProperties, id);
-    property != nullptr ? property->read(*this, value) : MutableNode::getProperty(id, value);
+Error NetworkTeamingNode::getProperty(unsigned int id, PropertyValue& out) const {
+    HostNode::getProperty(id, out);
     return {};
 }
 
-Error NetworkTeamingNode::setProperty(unsigned int const& id, PropertyValue const& value) {
-    const LogScope scope("NetworkTeamingNode::setProperty");
-    return MutableNode::setProperty(id, value);
-}
-
-void OsHwMI::createNetworkTeamingNodes() {
+void NetworkBuilder::createNetworkTeamingNodes() {
     const LogScope scope;
     std::vector<std::string> teams;
     getNICTeams(teams);
@@ -85,8 +64,9 @@ void OsHwMI::createNetworkTeamingNodes() {
     for (const std::string& team : teams) {
         ++index;
         try {
-            auto* node = makeNode<NetworkTeamingNode>(tree_.computer, NodeType::networkTeam, index, team);
-            appendNode(node);
+            auto* node =
+                tree_.makeNode<NetworkTeamingNode>(tree_.fixed.computer, NodeType::networkTeam, index, team);
+            tree_.appendNode(node);
             storeSnapshot(*node);
         } catch (const std::exception&) {
             log(kError) << "NetworkTeaming node error";

@@ -19,7 +19,7 @@ namespace {
 
 constexpr char kBonding[] = "/proc/net/bonding";
 
-/// As the commands below name it: a team called "/etc/x" is none of /etc.
+/// The same path as in the commands below: of a team called "/etc/x", too, it stays below the directory.
 std::string statusFile(const std::string& team) {
     return std::string(kBonding) + '/' + team;
 }
@@ -29,7 +29,7 @@ std::string answer(const Command& command) {
     return trimEnd(firstLine(command).line.value_or(""));
 }
 
-/// What stands behind the colon of a line that `cut` has opened.
+/// What `cut` has left of a line behind its colon, without the blanks before it.
 std::string behindColon(const std::string& line) {
     return trimStart(trimEnd(line));
 }
@@ -81,7 +81,7 @@ std::string linkFailures(const std::string& team, const std::string& port, const
     if (!count.empty()) {
         return count;
     }
-    // The state may have changed since it was asked for: then this is not the section that was meant.
+    // The command looks for a section with this status; a member whose status has changed since has none.
     const parse::BondingMember section = sectionOf(team, port);
     return section.miiStatus == status ? section.linkFailures : "";
 }

@@ -2,8 +2,8 @@
 
 #include "mi/globals.h"
 #include "mi/log.h"
-#include "mi/os_hw_mi.h"
 #include "mi/stopped_thread.h"
+#include "storage/storage_builder.h"
 
 namespace IC {
 
@@ -14,7 +14,8 @@ constexpr unsigned int kSliceMilliseconds = 5000;
 
 }  // namespace
 
-HardDriveUpdateMonitor::HardDriveUpdateMonitor(QX::Event* completed) : completed_(completed) {
+HardDriveUpdateMonitor::HardDriveUpdateMonitor(QX::Event* completed, StorageBuilder& builder)
+    : completed_(completed), builder_(builder) {
     const Operation operation;
     log(kProgress) << "HardDriveUpdateMonitor::const: entry";
     log(kProgress) << "HardDriveUpdateMonitor::Const: exit";
@@ -42,7 +43,7 @@ void* HardDriveUpdateMonitor::run(void*) {
         while (!ending()) {
             waitOneMinute();
             // Also after a stop that came during this wait: a loop once begun ends with its comparison.
-            pass();
+            guarded("HDDThreadProcess", [this] { builder_.HDDThreadProcess(); });
         }
     }
     done = true;
@@ -64,17 +65,7 @@ void HardDriveUpdateMonitor::waitOneMinute() const {
     }
 }
 
-void HardDriveUpdateMonitor::pass() {
-    try {
-        myoshwmi.HDDThreadProcess();
-    } catch (const std::exception& failure) {
-        log(kError) << "HDDThreadProcess failed: " << failure.what();
-    } catch (...) {
-        log(kError) << "HDDThreadProcess failed: unknown exception";
-    }
-}
-
-void OsHwMI::startHDDThread() {
+void StorageBuilder::startHDDThread() {
     const LogScope scope;
     // An earlier monitor would take what it has just published for known to this one.
     driveMonitor_.reset();
@@ -83,7 +74,7 @@ void OsHwMI::startHDDThread() {
     driveFingerprints_ = {};
     partitionFingerprints_ = {};
     try {
-        driveMonitor_ = std::make_unique<HardDriveUpdateMonitor>(&driveMonitorEnded_);
+        driveMonitor_ = std::make_unique<HardDriveUpdateMonitor>(&driveMonitorEnded_, *this);
         if (driveMonitor_->start(nullptr)) {
             driveMonitorRuns_ = true;
             log(kProgress) << "HardDriveUpdateThread thread created.";
@@ -93,6 +84,18 @@ void OsHwMI::startHDDThread() {
     } catch (...) {
         log(kError) << "HardDriveUpdateThread Caught unknown exception";
     }
+}
+
+void StorageBuilder::stopHardDriveMonitor() {
+    if (!driveMonitorRuns_) {
+        return;
+    }
+    driveMonitorRuns_ = false;
+    driveMonitor_->stop();
+    log(kProgress) << "disable Hard Drive updates: waiting for HardDriveUpdateMonitor Termination ";
+    joinWithPatience(*driveMonitor_);
+    log(kProgress) << "disable Hard Drive updates: HardDriveUpdateMonitor terminated.";
+    dropStopped(std::move(driveMonitor_));
 }
 
 }  // namespace IC

@@ -7,12 +7,15 @@
 
 namespace IC {
 
+class StorageBuilder;
+
 /// The thread that watches the disk layout: about two minutes after its start, and every minute from then on,
-/// it has the plug-in object compare the layout with the one last seen.
+/// it has the builder compare the layout with the one last seen.
 class HardDriveUpdateMonitor : public QX::Thread {
 public:
-    /// @param completed signalled when run returns; the caller's, and must outlive the monitor
-    explicit HardDriveUpdateMonitor(QX::Event* completed);
+    /// Both are the caller's and must outlive the monitor.
+    /// @param completed signalled when run returns
+    HardDriveUpdateMonitor(QX::Event* completed, StorageBuilder& builder);
     /// Stops and joins a monitor that still runs.
     ~HardDriveUpdateMonitor() override;
 
@@ -27,10 +30,10 @@ public:
 private:
     bool ending() const;
     void waitOneMinute() const;
-    static void pass();
 
     QX::Event stopSignal_{true};
     QX::Event* const completed_;
+    StorageBuilder& builder_;
     std::atomic<bool> done{false};
     std::atomic<bool> stopRequested{false};
 };

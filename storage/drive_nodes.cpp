@@ -1,15 +1,27 @@
 #include <cstdlib>
 
-#include "mi/command.h"
 #include "mi/log.h"
 #include "mi/node_types.h"
 #include "mi/text.h"
-#include "storage/storage_build.h"
+#include "storage/storage_builder.h"
 #include "storage/storage_nodes.h"
 
 namespace IC {
 
 namespace {
+
+namespace DriveId {
+enum : unsigned int {
+    driveSize = 37,     ///< number, 64 bits: thousands of bytes
+    devicePath = 89,    ///< text
+    healthState = 123,  ///< number: always 1
+};
+}  // namespace DriveId
+
+constexpr Property kDriveProperties[] = {
+    {DriveId::healthState, healthOf},
+};
+static_assert(idsAscend(kDriveProperties));
 
 /// Disks proper. Software RAID and mapper devices are listed like disks but are none.
 bool isDrive(const std::string& device) {
@@ -26,39 +38,25 @@ unsigned long long thousandsOfBytes(const std::string& text) {
 
 void fillDrive(HardDriveNode& node, const std::string& sizeInBytes) {
     const std::string& device = node.name();
-    node.setProperty(HardDriveNode::devicePath, PropertyValue(device, true));
-    node.setProperty(HardDriveNode::driveSize, PropertyValue(Number(thousandsOfBytes(sizeInBytes)), true));
+    node.setProperty(DriveId::devicePath, PropertyValue(device, true));
+    node.setProperty(DriveId::driveSize, PropertyValue(Number(thousandsOfBytes(sizeInBytes)), true));
     PropertyValue health;
-    node.getProperty(HardDriveNode::healthState, health);
-    node.setProperty(HardDriveNode::healthState, health);
+    node.getProperty(DriveId::healthState, health);
+    node.setProperty(DriveId::healthState, health);
     if (health == PropertyValue(Number(1U), true)) {
         log(kProgress) << "Hard Drive Node::Normal " << device;
     }
 }
 
-}  // namespace
-
-void OsHwMI::createHardDriveNodes(bool update) {
-    const LogScope scope;
-    static constexpr StorageKind drives = {
-        .listing = "cat /tmp/fdisk_tmp | grep ^Disk",
-        .withdrawnText = "Delete a Hrad Drive entry: ",
-        .publishedText = "Updated Hard Drive Node Published",
-        .nodes = &OsHwMI::driveNodes_,
-        .build = &OsHwMI::buildHardDrive,
-    };
-    buildStorageNodes(drives, update);
-}
-
-std::unique_ptr<MutableNode> OsHwMI::buildHardDrive(const std::string& line, unsigned int index,
-                                                    bool update) {
+std::unique_ptr<MutableNode> buildHardDrive(NodeTree& tree, const std::string& line, unsigned int index,
+                                            bool update) {
     const auto answer = askAboutLine(formatCommand("echo \"%s\" | cut -d \" \" -f2", line));
     const std::string device = trimEnd(answer.value_or(""), ':');
     if (!isDrive(device)) {
         return nullptr;
     }
     std::unique_ptr<HardDriveNode> node(
-        makeNode<HardDriveNode>(tree_.diskController, NodeType::hardDrive, index, device));
+        tree.makeNode<HardDriveNode>(tree.fixed.diskController, NodeType::hardDrive, index, device));
     log(kProgress) << (update ? "Hard Drive Update created " : "New Hard Drive Node created ") << device;
     node->setDescription("Hard Drive");
     node->setStatus(kStatusGood);
@@ -68,6 +66,23 @@ std::unique_ptr<MutableNode> OsHwMI::buildHardDrive(const std::string& line, uns
     }
     fillDrive(*node, *size);
     return node;
+}
+
+constexpr StorageKind kDriveKind = {
+    .listing = "cat /tmp/fdisk_tmp | grep ^Disk",
+    // Misspelt: readers of the log search for it as it is.
+    .withdrawnText = "Delete a Hrad Drive entry: ",
+    .publishedText = "Updated Hard Drive Node Published",
+    .build = buildHardDrive,
+};
+
+}  // namespace
+
+constinit const NodeClass hardDriveClass{"~HardDriveNode", kDriveProperties};
+
+void StorageBuilder::createHardDriveNodes(bool update) {
+    const LogScope scope;
+    buildStorageNodes(tree_, kDriveKind, driveNodes_, update);
 }
 
 }  // namespace IC

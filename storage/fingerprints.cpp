@@ -2,8 +2,8 @@
 #include "mi/disk_snapshot.h"
 #include "mi/log.h"
 #include "mi/my_process.h"
-#include "mi/os_hw_mi.h"
 #include "mi/text.h"
+#include "storage/storage_builder.h"
 
 namespace IC {
 
@@ -79,19 +79,19 @@ void rebuildIfDifferent(const Extract& extract, FingerprintPair& pair, Rebuild r
 
 }  // namespace
 
-void OsHwMI::HardDrive_Checksum(bool keepCurrent) {
+void StorageBuilder::HardDrive_Checksum(bool keepCurrent) {
     const LogScope scope("Hard Drive Check Sum : Entry", "Hard Drive Check Sum : Exit");
     takeFingerprints(kDrives, driveFingerprints_, keepCurrent);
 }
 
-void OsHwMI::Partition_Checksum(bool keepCurrent) {
+void StorageBuilder::Partition_Checksum(bool keepCurrent) {
     const LogScope scope("Partition Check Sum : Entry", "Partition Check Sum : Exit");
     takeFingerprints(kPartitions, partitionFingerprints_, keepCurrent);
 }
 
 // The references start empty, so that the first pass always rebuilds both kinds: agents rely on seeing every
 // drive and partition published once after start.
-void OsHwMI::HDDThreadProcess() {
+void StorageBuilder::HDDThreadProcess() {
     const LogScope scope("Hard Drive ThreadProcess :: Entry", "Hard Drive ThreadProcess :: Exit");
     if (!takeDiskSnapshot()) {
         return;  // an old one, half of one or none: none is the layout of now
@@ -100,6 +100,11 @@ void OsHwMI::HDDThreadProcess() {
     Partition_Checksum(true);
     rebuildIfDifferent(kDrives, driveFingerprints_, [this] { createHardDriveNodes(true); });
     rebuildIfDifferent(kPartitions, partitionFingerprints_, [this] { createPartitionNodes(true); });
+}
+
+void StorageBuilder::forgetStorageNodes() {
+    driveNodes_.clear();
+    partitionNodes_.clear();
 }
 
 }  // namespace IC

@@ -1,15 +1,29 @@
-#include <cstdlib>
+#include <algorithm>
+#include <limits>
 
-#include "mi/command.h"
 #include "mi/log.h"
 #include "mi/node_types.h"
 #include "mi/text.h"
-#include "storage/storage_build.h"
+#include "storage/storage_builder.h"
 #include "storage/storage_nodes.h"
 
 namespace IC {
 
 namespace {
+
+namespace PartitionId {
+enum : unsigned int {
+    devicePath = 89,        ///< text
+    partitionName = 108,    ///< text: the device path again
+    partitionBlocks = 112,  ///< number, 64 bits: blocks of 1024 bytes
+    healthState = 123,      ///< number: always 1
+};
+}  // namespace PartitionId
+
+constexpr Property kPartitionProperties[] = {
+    {PartitionId::healthState, healthOf},
+};
+static_assert(idsAscend(kPartitionProperties));
 
 std::string firstToken(const std::string& line) {
     const std::string text = trimStart(line);
@@ -20,32 +34,19 @@ std::string firstToken(const std::string& line) {
 /// partition of 2 TiB or more stays at 2147483647, the number that agents of such hosts have always been
 /// shown.
 unsigned long long blocks(const std::string& text) {
-    const long number = std::strtol(text.c_str(), nullptr, 10);
-    return static_cast<unsigned long long>(static_cast<long long>(number));
+    return static_cast<unsigned long long>(std::clamp<long long>(
+        leadingDecimal(text), std::numeric_limits<long>::min(), std::numeric_limits<long>::max()));
 }
 
-}  // namespace
-
-void OsHwMI::createPartitionNodes(bool update) {
-    const LogScope scope;
-    static constexpr StorageKind partitions = {
-        .listing = "cat /tmp/fdisk_tmp | grep ^/dev",
-        .withdrawnText = "Delete a Partition entry: ",
-        .publishedText = "Partition Node Published",
-        .nodes = &OsHwMI::partitionNodes_,
-        .build = &OsHwMI::buildPartition,
-    };
-    buildStorageNodes(partitions, update);
-}
-
-std::unique_ptr<MutableNode> OsHwMI::buildPartition(const std::string& line, unsigned int index, bool) {
+std::unique_ptr<MutableNode> buildPartition(NodeTree& tree, const std::string& line, unsigned int index,
+                                            bool) {
     const std::string device = firstToken(line);
     std::unique_ptr<DiskPartition> node(
-        makeNode<DiskPartition>(tree_.diskController, NodeType::partition, index, device));
+        tree.makeNode<DiskPartition>(tree.fixed.diskController, NodeType::partition, index, device));
     node->setStatus(kStatusGood);
     node->setDescription("Partition");
-    node->setProperty(DiskPartition::devicePath, PropertyValue(device, true));
-    node->setProperty(DiskPartition::partitionName, PropertyValue(device, true));
+    node->setProperty(PartitionId::devicePath, PropertyValue(device, true));
+    node->setProperty(PartitionId::partitionName, PropertyValue(device, true));
     const auto answer = askAboutLine(formatCommand("echo \"%s\" |  tr -s '*' ' '  | cut -d ' ' -f4", line));
     if (!answer) {
         return nullptr;
@@ -54,8 +55,24 @@ std::unique_ptr<MutableNode> OsHwMI::buildPartition(const std::string& line, uns
     log(kProgress) << "Partition blocksize : " << size;
     const unsigned long long number = blocks(size);
     log(kProgress) << "Partition blocksize in Uint64 : " << number;
-    node->setProperty(DiskPartition::partitionBlocks, PropertyValue(Number(number), true));
+    node->setProperty(PartitionId::partitionBlocks, PropertyValue(Number(number), true));
     return node;
+}
+
+constexpr StorageKind kPartitionKind = {
+    .listing = "cat /tmp/fdisk_tmp | grep ^/dev",
+    .withdrawnText = "Delete a Partition entry: ",
+    .publishedText = "Partition Node Published",
+    .build = buildPartition,
+};
+
+}  // namespace
+
+constinit const NodeClass diskPartitionClass{"~DiskPartition", kPartitionProperties};
+
+void StorageBuilder::createPartitionNodes(bool update) {
+    const LogScope scope;
+    buildStorageNodes(tree_, kPartitionKind, partitionNodes_, update);
 }
 
 }  // namespace IC

@@ -1,4 +1,4 @@
-#include "storage/storage_build.h"
+#include "storage/storage_builder.h"
 
 #include <utility>
 
@@ -10,19 +10,51 @@ namespace IC {
 
 namespace {
 
-/// Whether a line did not fit the buffer it was read into: its rest comes next.
+/// Whether a line did not fit the buffer: the next read then gives its rest.
 bool isCut(const std::string& line) {
     return line.size() == kCommandBuffer - 1 && line.back() != '\n';
 }
 
-/// The next line of a listing, without its line break. Of one that is too long the rest is passed over: it
-/// would be taken for a line of its own, and so for a device that the host does not have.
+/// The next line of a listing, without its line break. The rest of a line that is too long is skipped, or it
+/// would be taken for the line of another device.
 std::optional<std::string> nextEntry(HostCommand& listing) {
     const std::optional<std::string> line = listing.nextLine();
     for (std::optional<std::string> part = line; part && isCut(*part);) {
         part = listing.nextLine();
     }
     return line ? std::optional(trimEnd(*line)) : std::nullopt;
+}
+
+void withdrawStorageNodes(NodeTree& tree, const StorageKind& kind, std::vector<Node*>& nodes) {
+    while (!nodes.empty()) {
+        Node* const old = nodes.front();
+        log(kProgress) << kind.withdrawnText << old->getDescription();
+        // Off the list before deleteNode, in which the agent may throw: a node that is withdrawn is freed
+        // with its last reader, so the list must not hold it any more.
+        nodes.erase(nodes.begin());
+        if (const Error result = tree.deleteNode(old); result.getStatus() != 0) {
+            log(kError) << "deleteNode error = " << result;
+        }
+    }
+}
+
+void handOver(NodeTree& tree, std::unique_ptr<MutableNode> node, const StorageKind& kind,
+              std::vector<Node*>& nodes, bool update) {
+    Node* const built = node.get();
+    nodes.push_back(built);
+    try {
+        if (update) {
+            tree.publishNode(node.release());
+            log(kProgress) << kind.publishedText;
+        } else {
+            tree.appendNode(node.release());
+        }
+    } catch (...) {
+        // Whether the agent has it or not: a later update must not find it in the list.
+        nodes.pop_back();
+        tree.deleteNode(built);
+        throw;
+    }
 }
 
 }  // namespace
@@ -36,24 +68,9 @@ std::optional<std::string> askAboutLine(const Command& command) {
     return trimEnd(answer.nextLine().value_or(""));
 }
 
-void OsHwMI::withdrawStorageNodes(const StorageKind& kind) {
-    std::vector<Node*>& nodes = this->*kind.nodes;
-    while (!nodes.empty()) {
-        Node* const old = nodes.front();
-        log(kProgress) << kind.withdrawnText << old->getDescription();
-        // The framework owns the nodes and frees one when its last reader has gone: the list never holds one
-        // that has been withdrawn, nor loses one that has not, whatever the agent throws.
-        nodes.erase(nodes.begin());
-        if (const Error result = deleteNode(old); result.getStatus() != 0) {
-            log(kError) << "deleteNode error = " << result;
-        }
-    }
-}
-
-void OsHwMI::buildStorageNodes(const StorageKind& kind, bool update) {
-    std::vector<Node*>& nodes = this->*kind.nodes;
+void buildStorageNodes(NodeTree& tree, const StorageKind& kind, std::vector<Node*>& nodes, bool update) {
     if (update) {
-        withdrawStorageNodes(kind);
+        withdrawStorageNodes(tree, kind, nodes);
     }
     nodes.clear();
     if (!isDiskSnapshotOurs()) {
@@ -69,29 +86,9 @@ void OsHwMI::buildStorageNodes(const StorageKind& kind, bool update) {
             return;  // the agent has stopped us in the middle of our call to it
         }
         const auto index = static_cast<unsigned int>(nodes.size() + 1);
-        std::unique_ptr<MutableNode> node = (this->*kind.build)(*line, index, update);
-        if (node) {
-            handOver(std::move(node), kind, update);
+        if (std::unique_ptr<MutableNode> node = kind.build(tree, *line, index, update)) {
+            handOver(tree, std::move(node), kind, nodes, update);
         }
-    }
-}
-
-void OsHwMI::handOver(std::unique_ptr<MutableNode> node, const StorageKind& kind, bool update) {
-    std::vector<Node*>& nodes = this->*kind.nodes;
-    Node* const built = node.get();
-    nodes.push_back(built);
-    try {
-        if (update) {
-            publishNode(node.release());
-            log(kProgress) << kind.publishedText;
-        } else {
-            appendNode(node.release());
-        }
-    } catch (...) {
-        // It is listed or it is gone already; in no case may a later update meet it.
-        nodes.pop_back();
-        deleteNode(built);
-        throw;
     }
 }
 

@@ -20,6 +20,8 @@ namespace cvagent {
 namespace {
 
 constexpr std::chrono::milliseconds kLook{10};
+// What dies at all dies sooner; and a signal to stop leaves 0.6 s for everything.
+constexpr std::chrono::milliseconds kToDie{300};
 
 /// Every signal at its default and none blocked: what the agent was started with is not for others. A session
 /// of its own: Ctrl-C is for the agent.
@@ -72,8 +74,13 @@ Child::~Child() {
         close(input_);
     }
     if (error_ == 0 && process_ > 0) {
-        kill();
-        waitpid(process_, nullptr, 0);
+        if (!hasEnded()) {
+            kill();
+            if (!isLeft_) {
+                endsInTime();
+            }
+        }
+        waitpid(process_, nullptr, WNOHANG);
     }
 }
 
@@ -109,27 +116,42 @@ void Child::kill() const {
     ::kill(-process_, SIGKILL);  // what has lost its parent but not its session
 }
 
-std::string Child::wait(const std::function<bool()>& isOver) {
-    bool killed = false;
-    while (!hasEnded()) {
-        if (isOver()) {
-            kill();
-            killed = true;
-            break;
+/// After a kill.
+bool Child::endsInTime() const {
+    for (const auto end = std::chrono::steady_clock::now() + kToDie; !hasEnded();) {
+        if (std::chrono::steady_clock::now() >= end) {
+            return false;
         }
         std::this_thread::sleep_for(kLook);
     }
-    int status = 0;
-    while (waitpid(process_, &status, 0) < 0 && errno == EINTR) {
+    return true;
+}
+
+Child::End Child::wait(const std::function<bool()>& isOver) {
+    End end = End::byItself;
+    while (end == End::byItself && !hasEnded()) {
+        if (isOver()) {
+            kill();
+            end = End::killed;
+        } else {
+            std::this_thread::sleep_for(kLook);
+        }
+    }
+    if (end == End::killed && !endsInTime()) {
+        isLeft_ = true;
+        return End::unkillable;
+    }
+    while (waitpid(process_, &status_, 0) < 0 && errno == EINTR) {
     }
     process_ = -1;
-    if (killed) {
-        return "took too long and was ended";
+    return end;
+}
+
+std::string Child::complaint() const {
+    if (WIFSIGNALED(status_)) {
+        return "was ended by signal " + std::to_string(WTERMSIG(status_));
     }
-    if (WIFSIGNALED(status)) {
-        return "was ended by signal " + std::to_string(WTERMSIG(status));
-    }
-    return WEXITSTATUS(status) == 0 ? "" : "failed with status " + std::to_string(WEXITSTATUS(status));
+    return WEXITSTATUS(status_) == 0 ? "" : "failed with status " + std::to_string(WEXITSTATUS(status_));
 }
 
 }  // namespace cvagent

@@ -3,6 +3,7 @@
 #include <CLI/CLI.hpp>
 #include <cmath>
 #include <iostream>
+#include <sstream>
 
 #include "agent/cli/failure.h"
 #include "agent/cli/print.h"
@@ -120,7 +121,9 @@ void addReaders(CLI::App& app, Options& options) {
         ->type_name("");
     addJson(*get, options);
     get->callback([&options] { options.command = Command::get; });
+}
 
+void addWatch(CLI::App& app, Options& options) {
     CLI::App* watch = app.add_subcommand("watch", "Print alerts, published and withdrawn nodes as they come");
     watch->add_option("--for", options.seconds, "Stop after this time; by default at Ctrl-C")
         ->type_name("SECONDS")
@@ -199,6 +202,7 @@ std::optional<Options> parseCommandLine(int count, const char* const* words, int
     addGlobalOptions(app, options);
     app.add_flag("--json", options.json)->group("");  // accepted in front of the command, too
     addReaders(app, options);
+    addWatch(app, options);
     addSet(app, options);
     addOffline(app, options);
     try {
@@ -206,7 +210,9 @@ std::optional<Options> parseCommandLine(int count, const char* const* words, int
         unmark(options);
         return options;
     } catch (const CLI::Success& help) {
-        status = app.exit(help);
+        std::ostringstream text;
+        status = app.exit(help, text, text);
+        print(text.str());
     } catch (const CLI::RequiredError& error) {
         const bool noCommand = app.get_subcommands().empty();
         std::cerr << "cvagent: " << (noCommand ? "which command? Try: cvagent tree" : error.what())

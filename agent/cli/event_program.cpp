@@ -8,7 +8,6 @@
 #include <cstring>
 #include <filesystem>
 
-#include "agent/cli/child.h"
 #include "agent/cli/failure.h"
 #include "agent/cli/json.h"
 #include "agent/cli/print.h"
@@ -19,6 +18,8 @@
 namespace cvagent {
 
 namespace {
+
+constexpr std::size_t kMostLeft = 8;  // runs that could not be killed; with more, none is begun
 
 /// As an errno; 0 when nothing speaks against it.
 int whyNotRun(const std::string& program) {
@@ -52,7 +53,7 @@ EventProgram::~EventProgram() {
 }
 
 void EventProgram::serve() {
-    const Errand ours(Errand::ours);
+    const CommandScope ours(CommandScope::ours);
     for (bool more = true; more;) {
         pollfd ready[] = {{events_->descriptor(), POLLIN, 0}, {stop_, POLLIN, 0}};
         if (poll(ready, 2, -1) < 0) {
@@ -72,7 +73,7 @@ void EventProgram::runAll(Clock::time_point last) {
         if (now >= last || StopSignals::received() != 0) {
             ++missed;
         } else {
-            run(event, std::min(last, now + longest_));
+            missed += run(event, std::min(last, now + longest_)) ? 0 : 1;
         }
     }
     if (missed > 0) {
@@ -80,19 +81,38 @@ void EventProgram::runAll(Clock::time_point last) {
     }
 }
 
-void EventProgram::run(const Event& event, Clock::time_point deadline) {
+/// @return false when it was not tried
+bool EventProgram::run(const Event& event, Clock::time_point deadline) {
+    std::erase_if(left_, [](const auto& child) { return child->hasEnded(); });
+    if (left_.size() >= kMostLeft) {
+        return false;
+    }
     const std::string what = inQuotes(program_) + " for event " + std::to_string(event.number);
-    Child child(program_, messageDescriptor());
-    if (child.error() != 0) {
-        complain("cannot run " + what + ": " + std::strerror(child.error()));
-        return;
+    auto child = std::make_unique<Child>(program_, messageDescriptor());
+    if (child->error() != 0) {
+        complain("cannot run " + what + ": " + std::strerror(child->error()));
+        return true;
     }
     const auto isOver = [deadline] { return Clock::now() >= deadline || StopSignals::received() != 0; };
-    child.feed(json::event(event), isOver);
-    const std::string end = child.wait(isOver);
-    if (!end.empty()) {
-        complain(what + " " + end);
+    child->feed(json::event(event), isOver);
+    const Child::End end = child->wait(isOver);
+    if (const std::string told = outcome(std::move(child), end); !told.empty()) {
+        complain(what + " " + told);
     }
+    return true;
+}
+
+/// What there is to tell of a run.
+std::string EventProgram::outcome(std::unique_ptr<Child> child, Child::End end) {
+    if (end == Child::End::byItself) {
+        return child->complaint();
+    }
+    const bool stopping = StopSignals::received() != 0;
+    if (end == Child::End::killed) {
+        return stopping ? "was ended, for cvagent was told to stop" : "took too long and was ended";
+    }
+    left_.push_back(std::move(child));
+    return std::string(stopping ? "" : "took too long and ") + "cannot be killed; it is left behind";
 }
 
 }  // namespace cvagent

@@ -6,7 +6,9 @@
 #include <memory>
 #include <string>
 #include <thread>
+#include <vector>
 
+#include "agent/cli/child.h"
 #include "agent/core/event_log.h"
 
 namespace cvagent {
@@ -14,7 +16,8 @@ namespace cvagent {
 /// The administrator's program: run for each event of a subscription, one at a time, with the event as JSON
 /// on its standard input. It runs in "/" with the environment of the plug-in's commands, in a session of its
 /// own, with every signal at its default; what it prints goes to standard error. One that takes too long is
-/// killed with what it has started. Whatever goes wrong with it is told and stops nothing.
+/// killed with what it has started; one that cannot even be killed is left behind. Whatever goes wrong with
+/// it is told and stops nothing.
 class EventProgram {
 public:
     using Seconds = std::chrono::duration<double>;
@@ -33,12 +36,14 @@ private:
 
     void serve();
     void runAll(Clock::time_point last);
-    void run(const Event& event, Clock::time_point deadline);
+    bool run(const Event& event, Clock::time_point deadline);
+    std::string outcome(std::unique_ptr<Child> child, Child::End end);
 
     std::string program_;
     Clock::duration longest_;
     std::shared_ptr<Subscription> events_;
-    int stop_;  ///< readable when no more events come
+    int stop_;                                  ///< readable when no more events come
+    std::vector<std::unique_ptr<Child>> left_;  // runs that could not be killed; the server's
     std::thread server_;
 };
 

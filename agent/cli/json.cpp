@@ -1,5 +1,6 @@
 #include "agent/cli/json.h"
 
+#include <array>
 #include <nlohmann/json.hpp>
 
 #include "agent/cli/print.h"
@@ -58,28 +59,15 @@ Json plainValue(const IC::PropertyValue& value) {
 }
 
 const char* kindOf(const IC::PropertyValue& value) {
-    switch (value.kind()) {
-        case IC::PropertyValue::number:
-            return "number";
-        case IC::PropertyValue::text:
-            return "text";
-        case IC::PropertyValue::enumeration:
-            return "enum";
-        case IC::PropertyValue::texts:
-            return "texts";
-        case IC::PropertyValue::numbers:
-            return "numbers";
-        case IC::PropertyValue::none:
-            break;
-    }
-    return "none";
+    static constexpr std::array kNames = {"none", "number", "text", "enum", "texts", "numbers"};
+    return kNames.at(value.kind());
 }
 
 /// A failed read has the kind the catalogue promises, since it brought no value.
 Json readingObject(const Reading& reading) {
     Json object{{"name", reading.name()}};
     if (reading.failed()) {
-        object["kind"] = reading.row ? kindName(reading.row->kind) : "none";
+        object["kind"] = reading.row != nullptr ? kindName(reading.row->kind) : "none";
         object["error"] = reading.error;
     } else {
         object["kind"] = kindOf(reading.value);
@@ -123,9 +111,9 @@ void addProperty(Json& object, const Event& event) {
 
 }  // namespace
 
-std::string tree(const std::vector<std::string>& plugins, const std::vector<Handle>& nodes) {
+std::string tree(const std::vector<std::string>& plugins, const std::vector<NodeRef>& nodes) {
     Json list = Json::array();
-    for (const Handle& node : nodes) {
+    for (const NodeRef& node : nodes) {
         list.push_back(nodeObject(*node, storedReadings(*node)));
     }
     Json whole{{"plugin", plugins.front()}};
@@ -169,15 +157,19 @@ std::string event(const Event& event) {
         object["description"] = event.message;
     }
     addProperty(object, event);
+    if (!event.caller.empty()) {
+        object["caller"] = event.caller;
+    }
     if (event.number != 0) {
         object["number"] = event.number;
     }
     return document(object, -1);
 }
 
-std::string catalogue(const std::vector<Property>& rows) {
+std::string catalogue(const std::vector<const Property*>& rows) {
     Json list = Json::array();
-    for (const Property& row : rows) {
+    for (const Property* each : rows) {
+        const Property& row = *each;
         const auto type = static_cast<unsigned int>(row.type);
         Json object{{"class", className(type)},
                     {"type", type},
@@ -185,7 +177,7 @@ std::string catalogue(const std::vector<Property>& rows) {
                     {"name", row.name},
                     {"kind", kindName(row.kind)},
                     {"unit", unitName(row.unit)},
-                    {"readable", row.readable()},
+                    {"readable", row.readable},
                     {"writable", row.writable()}};
         object["values"] = labelList(row);
         object["accepts"] = row.writable() ? Json(acceptedText(row)) : Json(nullptr);

@@ -5,6 +5,7 @@
 
 #include "agent/core/event.h"
 #include "agent/core/host_tools.h"
+#include "agent/core/node_ref.h"
 #include "agent/core/reading.h"
 
 /// The program's JSON. Text that is no UTF-8 has its damaged bytes replaced. Each function returns a whole
@@ -13,17 +14,17 @@ namespace cvagent::json {
 
 /// {"plugin": FILE, "nodes": [NODE...]} with the stored properties of each node; of several plug-ins
 /// "plugins": [FILE...] stands behind the first one.
-std::string tree(const std::vector<std::string>& plugins, const std::vector<Handle>& nodes);
+std::string tree(const std::vector<std::string>& plugins, const std::vector<NodeRef>& nodes);
 /// {"id", "parent", "type", "class", "index", "path", "description", "status", "properties": {"108": {"name",
 /// "kind", "value"}}}; a property whose read failed has "error" in place of "value".
 std::string node(const IC::MutableNode& node, const std::vector<Reading>& readings);
 /// {"id", "path", "property": {"id", "name", "old", "new"}}, both as in a node.
 std::string change(const IC::MutableNode& node, const Reading& before, const Reading& after);
-/// One line: {"time", "event", "path", ...}; with "number" when the agent has given one, and "property":
-/// {"id", "name", "before", "after"} when the event is about one.
+/// One line: {"time", "event", "path", ...}; with "number" when the agent has given one, "property":
+/// {"id", "name", "before", "after"} when the event is about one, and "caller" when somebody has written it.
 std::string event(const Event& event);
 /// [{"class", "type", "id", "name", "kind", "unit", "readable", "writable", "values", "accepts", "meaning"}]
-std::string catalogue(const std::vector<Property>& rows);
+std::string catalogue(const std::vector<const Property*>& rows);
 /// [{"tool", "host", "classic", "adapter", "used", "package", "purpose"}]
 std::string tools(const std::vector<ToolReport>& reports);
 

@@ -1,12 +1,12 @@
+#include <array>
 #include <exception>
+#include <optional>
 
 #include "agent/cli/command_line.h"
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/print.h"
 #include "agent/cli/session.h"
 #include "agent/core/signals.h"
-#include "agent/core/surroundings.h"
-#include "agent/core/want.h"
 
 namespace {
 
@@ -16,29 +16,17 @@ using cvagent::Options;
 
 using Question = ExitStatus (*)(cvagent::Session& session, const Options& options);
 
-/// What needs an agent; null for what does not.
-Question questionOf(Command command) {
-    switch (command) {
-        case Command::tree:
-            return cvagent::commands::tree;
-        case Command::get:
-            return cvagent::commands::get;
-        case Command::set:
-            return cvagent::commands::set;
-        case Command::watch:
-            return cvagent::commands::watch;
-        case Command::properties:
-        case Command::doctor:
-            break;
-    }
-    return nullptr;
-}
+/// What needs an agent, in the order of Command; null for what does not.
+constexpr std::array<Question, 6> kQuestions = {cvagent::commands::tree, cvagent::commands::get,
+                                                cvagent::commands::set, cvagent::commands::watch};
 
-ExitStatus run(const Options& options) {
-    if (const Question ask = questionOf(options.command)) {
-        cvagent::Session session(options);
+ExitStatus run(Options& options, cvagent::WantMessages& wants) {
+    if (const Question ask = kQuestions.at(static_cast<std::size_t>(options.command))) {
+        const cvagent::PreparedProcess process(cvagent::processSettings(options));
+        cvagent::Session session(process, options, wants);
         return session.statusAfter(ask(session, options));
     }
+    cvagent::prepareSurroundings({});
     return options.command == Command::doctor ? cvagent::commands::doctor(options)
                                               : cvagent::commands::properties(options);
 }
@@ -50,25 +38,10 @@ ExitStatus endWith(const cvagent::Failure& failure) {
     return failure.status();
 }
 
-/// Files that the command line names; they are meant from where the program was started.
-std::vector<std::string*> filesIn(Options& options) {
-    std::vector<std::string*> files{&options.program};
-    for (std::string& plugin : options.plugins) {
-        files.push_back(&plugin);
-    }
-    for (std::optional<std::string>* file : {&options.logFile, &options.traceFile}) {
-        if (*file) {
-            files.push_back(&**file);
-        }
-    }
-    return files;
-}
-
-ExitStatus runGuarded(Options& options) {
+ExitStatus runGuarded(Options& options, cvagent::WantMessages& wants) {
     try {
         cvagent::Style::detect();  // before the locale goes
-        cvagent::prepareSurroundings(filesIn(options));
-        return run(options);
+        return run(options, wants);
     } catch (const cvagent::Failure& failure) {
         return endWith(failure);
     } catch (const cvagent::Problem& problem) {
@@ -82,23 +55,35 @@ ExitStatus runGuarded(Options& options) {
     }
 }
 
+std::optional<Options> parsed(int count, char** words, int& status) {
+    try {
+        return cvagent::parseCommandLine(count, words, status);
+    } catch (const cvagent::Failure& failure) {
+        status = static_cast<int>(endWith(failure));
+        return std::nullopt;
+    }
+}
+
 /// What is not shown or not found can be what was wanting.
-ExitStatus judged(ExitStatus status, Command command) {
-    const bool wanting = command != Command::properties && cvagent::tellWant(nullptr, cvagent::complain);
+ExitStatus runAndJudge(Options& options) {
+    cvagent::WantMessages wants;
+    const ExitStatus status = runGuarded(options, wants);
+    const bool wanting = options.command != Command::properties && wants.tell();
     const bool good = status == ExitStatus::done || status == ExitStatus::notFound;
     return wanting && good ? ExitStatus::failed : status;
 }
 
 /// Before the tables of the program are made, which need memory.
 [[gnu::constructor(101)]] void beforeEverything() {
-    cvagent::failPlainlyWithoutMemory(static_cast<int>(ExitStatus::failed));
+    cvagent::failPlainlyWithoutMemory();
 }
 
 }  // namespace
 
 int main(int count, char** words) {
     cvagent::openStandardDescriptors();
+    cvagent::StopSignals::becomeWriteErrors();
     int status = 0;
-    auto options = cvagent::parseCommandLine(count, words, status);
-    return options ? static_cast<int>(judged(runGuarded(*options), options->command)) : status;
+    auto options = parsed(count, words, status);
+    return options ? static_cast<int>(runAndJudge(*options)) : status;
 }

@@ -14,6 +14,7 @@ enum class Command { tree, get, set, watch, properties, doctor };
 struct Options {
     Command command = Command::tree;
     std::vector<std::string> plugins;  ///< none: looked for beside the program
+    bool processors = true;            ///< whether they can be meant; not typed
     std::optional<std::string> logFile;
     std::optional<std::string> traceFile;
     std::optional<int> logLevel;

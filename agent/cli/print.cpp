@@ -1,5 +1,6 @@
 #include "agent/cli/print.h"
 
+#include <poll.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -67,17 +68,17 @@ std::string inLargerUnits(Unit unit, const IC::Number& number) {
     }
 }
 
-std::string withLabel(const std::optional<Property>& property, const std::string& code, unsigned int number) {
-    const char* label = property ? labelOf(*property, number) : nullptr;
-    return label == nullptr ? code : code + " (" + label + ")";
+std::string withLabel(const Property* property, const std::string& code, unsigned int number) {
+    const Label* label = property != nullptr ? findLabel(*property, number) : nullptr;
+    return label == nullptr ? code : code + " (" + label->text + ")";
 }
 
-std::string numberText(const std::optional<Property>& property, const IC::Number& number) {
+std::string numberText(const Property* property, const IC::Number& number) {
     std::string text = number.toString();
-    if (!property || number.empty() || number.kind() == IC::Number::boolean) {
+    if (property == nullptr || number.empty() || number.kind() == IC::Number::boolean) {
         return text;
     }
-    if (labelOf(*property, number) != nullptr) {
+    if (findLabel(*property, number) != nullptr) {
         return withLabel(property, text, number);
     }
     if (property->unit != Unit::none) {
@@ -96,7 +97,7 @@ std::string joined(const List& list, ToText toText) {
     return text;
 }
 
-std::string plainText(const std::optional<Property>& property, const IC::PropertyValue& value) {
+std::string plainText(const Property* property, const IC::PropertyValue& value) {
     if (const IC::Number* number = value.asNumber()) {
         return numberText(property, *number);
     }
@@ -123,6 +124,22 @@ bool isUtf8Locale() {
     return false;
 }
 
+/// @return 0, or an errno
+int writeAll(int descriptor, const std::string& text) {
+    for (std::size_t done = 0; done < text.size();) {
+        const ssize_t size = write(descriptor, text.data() + done, text.size() - done);
+        if (size > 0) {
+            done += static_cast<std::size_t>(size);
+        } else if (errno == EAGAIN) {  // whoever shares the pipe may have made it so
+            pollfd room{descriptor, POLLOUT, 0};
+            poll(&room, 1, -1);
+        } else if (errno != EINTR) {
+            return errno;
+        }
+    }
+    return 0;
+}
+
 Style look() {
     const char* noColour = std::getenv("NO_COLOR");
     const char* terminal = std::getenv("TERM");
@@ -144,13 +161,13 @@ std::string Style::paint(const std::string& text, const char* code) const {
     return colour && !text.empty() ? std::string("\x1b[") + code + "m" + text + "\x1b[0m" : text;
 }
 
+/// A reader that has seen enough (head, less) needs no message.
 void print(const std::string& text) {
-    const bool written = std::fwrite(text.data(), 1, text.size(), stdout) == text.size();
-    if (!written || std::fflush(stdout) != 0) {
-        // A reader that has seen enough (head, less) needs no message.
+    const int error = standardOutputWasClosed() ? EBADF : writeAll(STDOUT_FILENO, text);
+    if (error != 0) {
         throw Failure(
             ExitStatus::failed,
-            errno == EPIPE ? "" : std::string("cannot write to standard output: ") + std::strerror(errno));
+            error == EPIPE ? "" : std::string("cannot write to standard output: ") + std::strerror(error));
     }
 }
 
@@ -168,7 +185,7 @@ void ask(const std::string& question) {
     [[maybe_unused]] const ssize_t written = write(messageDescriptor(), question.data(), question.size());
 }
 
-std::string valueText(const std::optional<Property>& property, const IC::PropertyValue& value) {
+std::string valueText(const Property* property, const IC::PropertyValue& value) {
     if (value.empty()) {
         return "not known";
     }

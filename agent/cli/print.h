@@ -1,6 +1,5 @@
 #pragma once
 
-#include <optional>
 #include <string>
 
 #include "agent/core/catalogue.h"
@@ -24,7 +23,8 @@ private:
     std::string paint(const std::string& text, const char* code) const;
 };
 
-/// Writes text to standard output. Throws Failure when it cannot be written.
+/// Writes text to standard output. Throws Failure when it cannot be written, without a text when nobody reads
+/// it any more.
 void print(const std::string& text);
 /// One message of the program to the standard error it was started with.
 void complain(const std::string& text);
@@ -32,8 +32,8 @@ void complain(const std::string& text);
 void ask(const std::string& question);
 
 /// A value for people: with its unit, its label, a size in GB and GiB.
-/// @param property its row of the catalogue; none for a property that is not in it
-std::string valueText(const std::optional<Property>& property, const IC::PropertyValue& value);
+/// @param property its row of the catalogue; null for a property that is not in it
+std::string valueText(const Property* property, const IC::PropertyValue& value);
 
 /// "80.0 GB (74.5 GiB)"
 std::string sizeText(unsigned long long bytes);

@@ -1,18 +1,16 @@
 #include "agent/cli/session.h"
 
-#include <filesystem>
-
-#include "agent/core/environment.h"
-#include "agent/core/host_tools.h"
-#include "agent/core/private_tmp.h"
-#include "agent/core/program_path.h"
+#include "agent/core/node_classes.h"
 #include "agent/core/signals.h"
 #include "agent/core/surroundings.h"
-#include "agent/core/want.h"
 
 namespace cvagent {
 
 namespace {
+
+constexpr const char* kRenameAdvice =
+    "; rename the interface, bridge, team, disk or host of that name, or correct the file that names it: "
+    "letters, digits, dots, dashes and underscores are fine";
 
 void hint(const std::string& text, const std::string& advice = "") {
     if (!text.empty()) {
@@ -31,84 +29,80 @@ void show(ErrorLines& errors) {
     }
 }
 
+/// A question for one node needs the processors only if it can mean one of them: by a path, by an id, by a
+/// bare number. Another plug-in's builder may build anything, and a log is to be whole.
+bool needsProcessors(const Options& options) {
+    const bool ofOneNode = options.command == Command::get || options.command == Command::set;
+    if (!ofOneNode || !options.plugins.empty() || options.logFile || options.traceFile || options.logLevel) {
+        return true;
+    }
+    const std::string last = options.node.substr(options.node.rfind('/') + 1);
+    return last.starts_with(className(static_cast<unsigned int>(NodeType::processor))) ||
+           last.find_first_not_of("0123456789") == std::string::npos;
+}
+
 }  // namespace
 
-Session::Session(const Options& options) {
-    AgentSettings settings = settingsOf(options);
-    hint(hintAtRoot(*data_), "\nTo see everything run: sudo cvagent");
-    hint(hintAtReadOnly(*data_));
-    makeTmpPrivate(ownPlaces(options, settings));
-    setUpCommands(options.commands);
-    StopSignals::install();
-    if (options.hostTools != HostTools::native) {
-        putAdaptersFirst(inspectHostTools(options.hostTools, Look::adapters, adapterDirectory()));
+ProcessSettings processSettings(Options& options) {
+    options.processors = needsProcessors(options);
+    if (options.plugins.empty()) {
+        options.plugins.push_back(pluginBesideProgram());
     }
+    ProcessSettings settings;
+    settings.files.push_back(&options.program);
+    for (std::string& plugin : options.plugins) {
+        settings.files.push_back(&plugin);
+    }
+    const bool shown = options.command == Command::watch || options.logLevel;
+    settings.log = {options.logFile, options.traceFile,          options.logLevel.value_or(kErrorLevel),
+                    shown,           shown && !options.logLevel, kRenameAdvice};
+    settings.commands = options.commands;
+    settings.hostTools = options.hostTools;
+    return settings;
+}
+
+Session::Session(const PreparedProcess& process, const Options& options, WantMessages& wants)
+    : errors_(process.errors()) {
+    AgentSettings settings = process.agentSettings();
+    settings.plugins = options.plugins;
+    settings.commandTime = std::chrono::duration<double>(options.commandSeconds);
+    settings.processors = options.processors;
+    settings.tell = complain;
+    hint(limitsOfUser(process.data()), "\nTo see everything run: sudo cvagent");
+    hint(limitsOfData(process.data()));
     try {
-        start(settings);
+        start(settings, wants);
     } catch (const Problem&) {
-        show(*errors_);
+        show(errors_);
         throw;
     }
-    show(*errors_);
+    show(errors_);
 }
 
 Session::~Session() {
     end();
 }
 
-void Session::start(const AgentSettings& settings) {
+void Session::start(const AgentSettings& settings, WantMessages& wants) {
     agent_ = std::make_unique<Agent>(settings);
     for (const Agent::FailedPlugin& failed : agent_->failedPlugins()) {
         complain(Failure(failed.problem).what());
         pluginMissing_ = true;
     }
-    hint(hintAtTemporaryFiles());
-    const std::vector<Handle> nodes = handlesOf(agent_->nodes());
-    tellWant(&nodes, complain);
-}
-
-/// The log is opened here, before /tmp becomes another one.
-AgentSettings Session::settingsOf(const Options& options) {
-    const bool live = options.command == Command::watch || options.logLevel;
-    AgentSettings settings;
-    settings.plugins = options.plugins;
-    if (settings.plugins.empty()) {
-        settings.plugins.push_back(pluginBesideProgram());
-    }
-    data_ = std::make_shared<DataDirectory>();
-    quiet_ = std::make_unique<QuietCommands>();
-    const LogSettings log{options.logFile,
-                          options.traceFile,
-                          options.logLevel.value_or(kErrorLevel),
-                          live ? messageDescriptor() : -1,
-                          live,
-                          live && !options.logLevel};
-    settings.log = std::make_shared<LogOutput>(log, errors_);
-    settings.commandTime = std::chrono::duration<double>(options.commandSeconds);
-    settings.data = data_;
-    settings.tell = complain;
-    return settings;
-}
-
-/// What the agent needs of the /tmp that everybody sees, should it lie there.
-std::vector<std::string> Session::ownPlaces(const Options& options, const AgentSettings& settings) const {
-    std::vector<std::string> places = directoriesOnPath();
-    const std::filesystem::path adapters = adapterDirectory().value_or("");
-    places.insert(places.end(), settings.plugins.begin(), settings.plugins.end());
-    places.insert(places.end(), {options.program, programDirectory(), data_->path(), adapters.parent_path(),
-                                 options.logFile.value_or(""), options.traceFile.value_or("")});
-    return places;
+    hint(limitsOfTmp());
+    const std::vector<NodeRef> nodes = agent_->nodes();
+    wants.tell(&nodes, settings.processors);
 }
 
 void Session::end() {
     const OrderlyEnd unloading;
     agent_.reset();
-    show(*errors_);
+    show(errors_);
 }
 
 void Session::showErrors(const Request& request) {
     show(request.errors());
-    show(*errors_);
+    show(errors_);
 }
 
 ExitStatus Session::statusAfter(ExitStatus own) const {

@@ -5,15 +5,21 @@
 #include "agent/cli/failure.h"
 #include "agent/cli/options.h"
 #include "agent/cli/print.h"
-#include "agent/core/agent.h"
+#include "agent/cli/want_messages.h"
+#include "agent/core/process.h"
 
 namespace cvagent {
 
-/// The agent as the command line needs it: built from the options, with its errors and warnings on standard
-/// error. Making it prepares the whole process, so it is made in main, before any thread.
+/// The process as the command line needs it; the plug-in beside the program becomes the options' when they
+/// name none. Throws Problem.
+/// @param options outlive the settings; names of files in them become absolute with the process
+ProcessSettings processSettings(Options& options);
+
+/// The agent as the command line needs it, with its errors and warnings on standard error.
 class Session {
 public:
-    explicit Session(const Options& options);
+    /// Both outlive it.
+    Session(const PreparedProcess& process, const Options& options, WantMessages& wants);
     Session(const Session&) = delete;
     Session& operator=(const Session&) = delete;
     /// As end().
@@ -28,13 +34,9 @@ public:
     ExitStatus statusAfter(ExitStatus own) const;
 
 private:
-    AgentSettings settingsOf(const Options& options);
-    std::vector<std::string> ownPlaces(const Options& options, const AgentSettings& settings) const;
-    void start(const AgentSettings& settings);
+    void start(const AgentSettings& settings, WantMessages& wants);
 
-    std::shared_ptr<DataDirectory> data_;
-    std::shared_ptr<ErrorLines> errors_ = std::make_shared<ErrorLines>();
-    std::unique_ptr<QuietCommands> quiet_;
+    ErrorLines& errors_;
     std::unique_ptr<Agent> agent_;
     bool pluginMissing_ = false;
 };

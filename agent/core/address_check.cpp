@@ -2,9 +2,9 @@
 #include <arpa/inet.h>
 
 #include <algorithm>
-#include <charconv>
 #include <string_view>
 
+#include "agent/core/text.h"
 #include "agent/core/value_check.h"
 
 namespace cvagent::check {
@@ -132,11 +132,9 @@ Value prefixLength(const Property& /*property*/, Words words) {
     if (words.size() != 1 || words.front().empty() || words.front().front() == '0') {
         return std::nullopt;
     }
-    const std::string& text = words.front();
-    unsigned int bits = 0;
-    const auto [stop, error] = std::from_chars(text.data(), text.data() + text.size(), bits);
-    const bool good = error == std::errc() && stop == text.data() + text.size() && bits >= 1 && bits <= 128;
-    return good ? Value(IC::PropertyValue(IC::Number(bits), true)) : std::nullopt;
+    const auto bits = wholeNumber<unsigned int>(words.front());
+    const bool good = bits && *bits >= 1 && *bits <= 128;
+    return good ? Value(IC::PropertyValue(IC::Number(*bits), true)) : std::nullopt;
 }
 
 Value dnsServers(const Property& /*property*/, Words words) {

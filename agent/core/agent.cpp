@@ -1,5 +1,7 @@
 #include "agent/core/agent.h"
 
+#include <algorithm>
+#include <stdexcept>
 #include <utility>
 
 #include "agent/core/announcer.h"
@@ -19,8 +21,9 @@ struct Agent::Engine {
     explicit Engine(const AgentSettings& settings);
 
     std::vector<Handle> handles() const;
-    void load(const std::string& file);
+    void load(const std::string& file, bool processors);
     void refresh();
+    bool lists(const Handle& node) const;
 
     std::shared_ptr<DataDirectory> data;
     Tell tell;
@@ -33,27 +36,31 @@ struct Agent::Engine {
     std::vector<FailedPlugin> failed;
     Pool pool;
     Reader reader{pool, facts};
-    Writer writer{pool, facts, announcer, [this] { refresh(); }};
+    Writer writer{
+        pool, facts, announcer, {[this] { refresh(); }, [this](const Handle& node) { return lists(node); }}};
 };
 
 Agent::Engine::Engine(const AgentSettings& settings)
-    : data(settings.data ? settings.data : std::make_shared<DataDirectory>()),
+    : data(settings.data),
       tell(settings.tell),
       log(settings.log ? settings.log
                        : std::make_shared<LogOutput>(LogSettings(), std::make_shared<ErrorLines>())),
       deadline(settings.commandTime, settings.tell) {
+    if (!data) {
+        throw std::invalid_argument("an agent needs a data directory");
+    }
     for (const std::string& file : settings.plugins) {
-        load(file);
+        load(file, settings.processors);
     }
     if (plugins.empty() && !failed.empty()) {
         throw Problem(failed.front().problem);
     }
 }
 
-void Agent::Engine::load(const std::string& file) {
+void Agent::Engine::load(const std::string& file, bool processors) {
     try {
-        plugins.push_back(std::make_unique<Plugin>(file, &announcer, tell));
-        announcer.takeStock(plugins.back()->interface().holdAll());
+        plugins.push_back(std::make_unique<Plugin>(file, &announcer, tell, processors));
+        announcer.takeStock(plugins.back()->interface());
     } catch (const Problem& problem) {
         failed.push_back({file, problem});
     }
@@ -73,6 +80,12 @@ void Agent::Engine::refresh() {
         setPaths(plugin->interface());
         announcer.announceNew(plugin->interface());
     }
+}
+
+bool Agent::Engine::lists(const Handle& node) const {
+    return std::any_of(plugins.begin(), plugins.end(), [&node](const auto& plugin) {
+        return plugin->interface().hold(node->getNodeId()).get() == node.get();
+    });
 }
 
 Agent::Agent(const AgentSettings& settings) : engine_(std::make_shared<Engine>(settings)) {}
@@ -117,10 +130,6 @@ WriteResult Agent::write(const NodeRef& node, const Property& row, const IC::Pro
 
 std::shared_ptr<Subscription> Agent::subscribe(std::uint64_t after, std::optional<Event::Kind> only) const {
     return engine_->events.subscribe(after, EventLog::kMost, only);
-}
-
-EventLog::Since Agent::events(std::uint64_t after) const {
-    return engine_->events.since(after);
 }
 
 }  // namespace cvagent

@@ -16,27 +16,28 @@
 
 namespace cvagent {
 
-/// What an agent is made of.
+/// What an agent is made of; see PreparedProcess::agentSettings.
 struct AgentSettings {
     std::vector<std::string> plugins;  ///< files; each brings its nodes into the one tree
     /// Opened before; null: the plug-ins' lines go nowhere.
     std::shared_ptr<LogOutput> log;
+    /// Whether the plug-ins build their nodes of processors, which is asked of them apart from their start.
+    bool processors = true;
     /// How long a command of a plug-in may take, in a write ten times as long; 0 for ever.
     std::chrono::duration<double> commandTime{10};
-    /// Null: the agent takes the one of this process's surroundings.
+    /// Held for as long as the agent is; there is none without.
     std::shared_ptr<DataDirectory> data;
     /// Hears of what belongs to no call. Any thread.
     Tell tell = tellNobody;
 };
 
 /// Plug-ins at work: the one agent behind every front end. It owns data directory, log, deadline of commands,
-/// threads and plug-ins. It changes nothing of the process, but for the variable that names a data directory
-/// of its own making: the rest is main's, before any thread. All operations may be called from many threads
-/// at once.
+/// threads and plug-ins. It changes nothing of the process: that is done before, by PreparedProcess. All
+/// operations may be called from many threads at once.
 class Agent {
 public:
-    /// Loads every plug-in. One that fails costs nothing of the others; when all fail, the first one's
-    /// Problem is thrown.
+    /// Loads every plug-in. Throws std::invalid_argument without a data directory. One that fails costs
+    /// nothing of the others; when all fail, the first one's Problem is thrown.
     explicit Agent(const AgentSettings& settings);
     Agent(const Agent&) = delete;
     Agent& operator=(const Agent&) = delete;
@@ -60,13 +61,12 @@ public:
     /// See Reader::read.
     std::vector<Reading> read(const NodeRef& node, const std::vector<unsigned int>& ids, Freshness freshness,
                               const Request& request) const;
-    /// See Writer::write. What may be written is judged before: see operations.h.
+    /// See Writer::write. What may be written is judged before: see property_words.h.
     WriteResult write(const NodeRef& node, const Property& row, const IC::PropertyValue& value,
                       const Request& request) const;
 
     /// See EventLog. A subscription outlives the agent: the last events come while the plug-ins stop.
     std::shared_ptr<Subscription> subscribe(std::uint64_t after, std::optional<Event::Kind> only = {}) const;
-    EventLog::Since events(std::uint64_t after) const;
 
 private:
     struct Engine;

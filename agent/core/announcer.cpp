@@ -1,5 +1,7 @@
 #include "agent/core/announcer.h"
 
+#include <limits>
+
 namespace cvagent {
 
 namespace {
@@ -11,40 +13,60 @@ std::string stateText(const Reading& reading) {
 }  // namespace
 
 void Announcer::hear(const Event& event) {
-    if (event.kind == Event::Kind::alert) {
-        hearAlert(event);
-        return;
+    const std::lock_guard lock(guard_);
+    switch (event.kind) {
+        case Event::Kind::published:
+            tellPublished(event);
+            break;
+        case Event::Kind::withdrawn:
+            tellWithdrawn(event);
+            break;
+        case Event::Kind::alert:
+            tellAlert(event);
+            break;
+        case Event::Kind::written:
+            events_.hear(event);
+            break;
     }
-    if (event.kind == Event::Kind::published) {
-        const std::lock_guard lock(guard_);
-        facts_.meet(event.nodeId);
-        if (early_.erase(event.nodeId) > 0) {
-            return;
-        }
+}
+
+void Announcer::tellPublished(const Event& event) {
+    facts_.meet(event.nodeId);
+    if (early_.erase(event.nodeId) == 0) {
         events_.hear(event);
-        return;
     }
-    {
-        const std::lock_guard lock(guard_);
-        early_.erase(event.nodeId);
-        facts_.forget(event.nodeId);
-    }
+}
+
+void Announcer::tellWithdrawn(const Event& event) {
+    early_.erase(event.nodeId);
+    facts_.forget(event.nodeId);
+    told_.erase(told_.lower_bound({event.nodeId, 0}),
+                told_.upper_bound({event.nodeId, std::numeric_limits<unsigned int>::max()}));
     events_.hear(event);
 }
 
-void Announcer::hearAlert(Event event) {
+/// What a read has brought since the last event is not in the chain: its reader knows it.
+void Announcer::tellAlert(Event event) {
     if (!event.propertyName.empty()) {
         const IC::PropertyValue after(IC::Number(static_cast<unsigned int>(std::stoul(event.after))), true);
-        if (const auto before = facts_.note(event.nodeId, event.property, after)) {
-            event.before = static_cast<std::string>(*before);
+        const auto known = facts_.note(event.nodeId, event.property, after);
+        const auto told = told_.find({event.nodeId, event.property});
+        if (told != told_.end()) {
+            event.before = told->second;
+        } else if (known) {
+            event.before = static_cast<std::string>(*known);
         }
+        told_[{event.nodeId, event.property}] = event.after;
     }
     events_.hear(event);
 }
 
-void Announcer::takeStock(const std::vector<Handle>& nodes) {
-    for (const Handle& node : nodes) {
-        facts_.meet(node->getNodeId());
+void Announcer::takeStock(const IC::ManagementInterface& interface) {
+    for (const Handle& node : interface.holdAll()) {
+        const std::lock_guard lock(guard_);
+        if (interface.hold(node->getNodeId())) {  // as below
+            facts_.meet(node->getNodeId());
+        }
     }
 }
 
@@ -60,12 +82,18 @@ void Announcer::announceNew(const IC::ManagementInterface& interface) {
     }
 }
 
-void Announcer::announceWrite(const IC::MutableNode& node, const Reading& before, const Reading& after) {
+void Announcer::announceWrite(const IC::MutableNode& node, const Reading& before, const Reading& after,
+                              const std::string& caller) {
     Event event = nodeEvent(Event::Kind::written, node);
     event.property = after.id;
     event.propertyName = after.name();
     event.before = stateText(before);
     event.after = stateText(after);
+    event.caller = caller;
+    const std::lock_guard lock(guard_);
+    if (const auto told = told_.find({event.nodeId, event.property}); told != told_.end()) {
+        told->second = event.after;
+    }
     events_.hear(event);
 }
 

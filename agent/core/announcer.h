@@ -1,7 +1,10 @@
 #pragma once
 
+#include <map>
 #include <mutex>
 #include <set>
+#include <string>
+#include <utility>
 
 #include "agent/core/event_log.h"
 #include "agent/core/facts.h"
@@ -10,7 +13,8 @@
 namespace cvagent {
 
 /// Makes events of what the plug-ins tell and of what writes bring about, and keeps the facts in step with
-/// them. Any thread.
+/// them. Successive events about one property are a chain: each begins with the state that the one before has
+/// told. Any thread.
 class Announcer : public Listener {
 public:
     /// Both outlive it.
@@ -18,18 +22,24 @@ public:
 
     void hear(const Event& event) override;
     /// The nodes of a start: no news, but known from now on.
-    void takeStock(const std::vector<Handle>& nodes);
+    void takeStock(const IC::ManagementInterface& interface);
     /// Nodes that have appeared without the plug-in's telling are told. A write can make some.
     void announceNew(const IC::ManagementInterface& interface);
-    void announceWrite(const IC::MutableNode& node, const Reading& before, const Reading& after);
+    void announceWrite(const IC::MutableNode& node, const Reading& before, const Reading& after,
+                       const std::string& caller);
 
 private:
-    void hearAlert(Event event);
+    using Key = std::pair<unsigned int, unsigned int>;  // node and property
+
+    void tellPublished(const Event& event);
+    void tellWithdrawn(const Event& event);
+    void tellAlert(Event event);
 
     EventLog& events_;
     Facts& facts_;
-    std::mutex guard_;
-    std::set<unsigned int> early_;  // told before the plug-in did; guarded by guard_
+    std::mutex guard_;  // guards everything below, and that events are told in the order of states
+    std::set<unsigned int> early_;     // told before the plug-in did
+    std::map<Key, std::string> told_;  // the state that the last event told
 };
 
 }  // namespace cvagent

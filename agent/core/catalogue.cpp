@@ -2,11 +2,13 @@
 
 #include <strings.h>
 #include <algorithm>
-#include <charconv>
+#include <array>
 #include <stdexcept>
 
 #include "agent/core/oshw/tables.h"
+#include "agent/core/text.h"
 #include "agent/core/value_check.h"
+#include "framework/qx/zone_table.h"
 
 namespace cvagent {
 
@@ -23,6 +25,22 @@ Tables& tables() {
     throw std::logic_error("the catalogue of " + std::string(table.owner) + " has " + what +
                            ", which is there already");
 }
+
+/// The first row of any table of which something is true; null for none.
+template <class Row, class Predicate>
+const Row* findRow(std::span<const Row> CatalogueTable::*rows, const Predicate& isMeant) {
+    for (const CatalogueTable* table : tables()) {
+        const auto found = std::ranges::find_if(table->*rows, isMeant);
+        if (found != (table->*rows).end()) {
+            return &*found;
+        }
+    }
+    return nullptr;
+}
+
+// In the order of the enumerations.
+constexpr std::array kKindNames = {"number", "enum", "text", "texts", "numbers"};
+constexpr std::array kUnitNames = {"", "kB", "KiB", "kbit/s", "Mbit/s", "MHz", "s since 1970", "min", "bits"};
 
 }  // namespace
 
@@ -51,119 +69,61 @@ std::vector<NodeClass> nodeClasses() {
 }
 
 const NodeClass* findClass(unsigned int nodeType) {
-    for (const CatalogueTable* table : tables()) {
-        for (const NodeClass& row : table->classes) {
-            if (static_cast<unsigned int>(row.type) == nodeType) {
-                return &row;
-            }
-        }
-    }
-    return nullptr;
+    return findRow(&CatalogueTable::classes, [nodeType](const NodeClass& row) {
+        return static_cast<unsigned int>(row.type) == nodeType;
+    });
 }
 
 const NodeClass* findClass(const std::string& name) {
-    for (const CatalogueTable* table : tables()) {
-        for (const NodeClass& row : table->classes) {
-            if (row.name == name) {
-                return &row;
-            }
-        }
-    }
-    return nullptr;
+    return findRow(&CatalogueTable::classes, [&name](const NodeClass& row) { return row.name == name; });
 }
 
 const AlertRow* findAlert(const std::string& message) {
     const std::string text = message.substr(0, message.find_last_not_of(' ') + 1);
-    for (const CatalogueTable* table : tables()) {
-        for (const AlertRow& row : table->alerts) {
-            if (row.message == text) {
-                return &row;
-            }
-        }
-    }
-    return nullptr;
+    return findRow(&CatalogueTable::alerts, [&text](const AlertRow& row) { return row.message == text; });
 }
 
-std::vector<Property> propertiesOf(unsigned int nodeType) {
-    std::vector<Property> rows;
+std::vector<const Property*> propertiesOf(unsigned int nodeType) {
+    std::vector<const Property*> rows;
     for (const CatalogueTable* table : tables()) {
         for (const auto part : table->properties) {
-            std::copy_if(part.begin(), part.end(), std::back_inserter(rows), [nodeType](const Property& row) {
-                return static_cast<unsigned int>(row.type) == nodeType;
-            });
+            for (const Property& row : part) {
+                if (static_cast<unsigned int>(row.type) == nodeType) {
+                    rows.push_back(&row);
+                }
+            }
         }
     }
     return rows;
 }
 
-std::optional<Property> findProperty(unsigned int nodeType, unsigned int id) {
-    for (const Property& row : propertiesOf(nodeType)) {
-        if (row.id == id) {
-            return row;
-        }
-    }
-    return std::nullopt;
+const Property* findProperty(unsigned int nodeType, unsigned int id) {
+    const auto rows = propertiesOf(nodeType);
+    const auto found = std::ranges::find(rows, id, &Property::id);
+    return found == rows.end() ? nullptr : *found;
 }
 
-std::optional<Property> findProperty(unsigned int nodeType, const std::string& text) {
-    unsigned int id = 0;
-    const char* end = text.data() + text.size();
-    const auto [stop, error] = std::from_chars(text.data(), end, id);
-    if (error == std::errc() && stop == end) {
-        return findProperty(nodeType, id);
+const Property* findProperty(unsigned int nodeType, const std::string& text) {
+    if (const auto id = wholeNumber<unsigned int>(text)) {
+        return findProperty(nodeType, *id);
     }
-    for (const Property& row : propertiesOf(nodeType)) {
-        if (strcasecmp(row.name, text.c_str()) == 0) {
-            return row;
-        }
-    }
-    return std::nullopt;
+    const auto rows = propertiesOf(nodeType);
+    const auto found = std::ranges::find_if(
+        rows, [&text](const Property* row) { return strcasecmp(row->name, text.c_str()) == 0; });
+    return found == rows.end() ? nullptr : *found;
 }
 
 const char* kindName(Kind kind) {
-    switch (kind) {
-        case Kind::number:
-            return "number";
-        case Kind::enumeration:
-            return "enum";
-        case Kind::text:
-            return "text";
-        case Kind::texts:
-            return "texts";
-        case Kind::numbers:
-            return "numbers";
-    }
-    return "none";
+    return kKindNames.at(static_cast<std::size_t>(kind));
 }
 
 const char* unitName(Unit unit) {
-    switch (unit) {
-        case Unit::none:
-            return "";
-        case Unit::thousandBytes:
-            return "kB";
-        case Unit::kibibytes:
-            return "KiB";
-        case Unit::kilobitsPerSecond:
-            return "kbit/s";
-        case Unit::megabitsPerSecond:
-            return "Mbit/s";
-        case Unit::megahertz:
-            return "MHz";
-        case Unit::secondsSinceEpoch:
-            return "s since 1970";
-        case Unit::minutes:
-            return "min";
-        case Unit::bits:
-            return "bits";
-    }
-    return "";
+    return kUnitNames.at(static_cast<std::size_t>(unit));
 }
 
-const char* labelOf(const Property& property, unsigned int code) {
-    const auto found = std::find_if(property.labels.begin(), property.labels.end(),
-                                    [code](const Label& label) { return label.code == code; });
-    return found == property.labels.end() ? nullptr : found->text;
+const Label* findLabel(const Property& property, unsigned int code) {
+    const auto found = std::ranges::find(property.labels, code, &Label::code);
+    return found == property.labels.end() ? nullptr : &*found;
 }
 
 std::string acceptedText(const Property& property) {
@@ -172,8 +132,8 @@ std::string acceptedText(const Property& property) {
         text += (text.empty() || text.ends_with(' ') ? "" : ", ") + item;
     };
     if (property.check == check::timeZoneOffset) {
-        for (const int offset : check::zoneOffsets()) {
-            add(std::to_string(offset));
+        for (const QX::Zone& zone : QX::zoneTable) {
+            add(std::to_string(zone.offset));
         }
     }
     for (const Label& label : property.labels) {

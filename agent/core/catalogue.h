@@ -30,6 +30,7 @@ struct Label {
     const char* text;
     unsigned int code;
     bool writable = false;  ///< the code may be written
+    bool drastic = false;   ///< writing it stops the host: front ends ask twice
 };
 
 struct Property;
@@ -50,24 +51,25 @@ struct Property {
     const char* meaning;
     Check check = nullptr;          ///< set for what can be written
     const char* accepts = nullptr;  ///< what check lets pass, in words; null: told from the labels
-    bool writeOnly = false;
+    bool readable = true;
 
-    bool readable() const { return !writeOnly; }
     bool writable() const { return check != nullptr; }
 };
 
+// The rows stay where they are until the program ends.
+
 /// The rows of one class, ids ascending.
-std::vector<Property> propertiesOf(unsigned int nodeType);
-/// The row with that id; nothing when the class has none.
-std::optional<Property> findProperty(unsigned int nodeType, unsigned int id);
-/// The row a person means by a number or a name, upper or lower case.
-std::optional<Property> findProperty(unsigned int nodeType, const std::string& text);
+std::vector<const Property*> propertiesOf(unsigned int nodeType);
+/// The row with that id; null when the class has none.
+const Property* findProperty(unsigned int nodeType, unsigned int id);
+/// The row a person means by a number or a name, upper or lower case; null for none.
+const Property* findProperty(unsigned int nodeType, const std::string& text);
 
 const char* kindName(Kind kind);
 /// "" for Unit::none.
 const char* unitName(Unit unit);
-/// The meaning of a code; null when it has none.
-const char* labelOf(const Property& property, unsigned int code);
+/// The label of a code; null when it has none.
+const Label* findLabel(const Property& property, unsigned int code);
 /// What the property accepts, for a message.
 std::string acceptedText(const Property& property);
 

@@ -26,13 +26,13 @@ constexpr Seconds kSlowestLook{1};
 constexpr Seconds kFastestLook{0.01};
 
 /// The calls into the plug-in that are under way, by their threads.
-struct Errands {
+struct CommandScopes {
     std::mutex guard;
-    std::map<pid_t, Errand*> all;  // guarded by guard
+    std::map<pid_t, CommandScope*> all;  // guarded by guard
 };
 
-Errands& errands() {
-    static Errands list;
+CommandScopes& scopes() {
+    static CommandScopes list;
     return list;
 }
 
@@ -114,51 +114,51 @@ void CommandDeadline::watch() {
 }
 
 Seconds CommandDeadline::limitOf(pid_t thread) const {
-    const std::lock_guard lock(errands().guard);
-    const auto errand = errands().all.find(thread);
-    if (errand == errands().all.end()) {
+    const std::lock_guard lock(scopes().guard);
+    const auto scope = scopes().all.find(thread);
+    if (scope == scopes().all.end()) {
         return longest_;
     }
-    switch (errand->second->kind_) {
-        case Errand::write:
+    switch (scope->second->kind_) {
+        case CommandScope::write:
             return longest_ * kWritePatience;
-        case Errand::ours:
+        case CommandScope::ours:
             return Seconds::max();
-        case Errand::read:
+        case CommandScope::read:
             break;
     }
     return longest_;
 }
 
-/// The errand that waits for the command goes on only after it has been told why.
+/// The thread that waits for the command goes on only after it has been told why.
 void CommandDeadline::end(pid_t thread, const QX::ChildProcess& command) {
     const Seconds limit = limitOf(thread);
-    const std::lock_guard lock(errands().guard);
+    const std::lock_guard lock(scopes().guard);
     const std::string text = commandText(command.id);
     if (!QX::killChild(thread, command)) {
         return;
     }
-    const auto errand = errands().all.find(thread);
-    if (errand == errands().all.end()) {
+    const auto scope = scopes().all.find(thread);
+    if (scope == scopes().all.end()) {
         tell_("a command of the plug-in was ended after " + secondsText(limit) +
               "; what it would have told is missing: " + text);
-    } else if (errand->second->complaint_.empty()) {
-        errand->second->complaint_ = "timed out after " + secondsText(limit) + ": " + text;
+    } else if (scope->second->complaint_.empty()) {
+        scope->second->complaint_ = "timed out after " + secondsText(limit) + ": " + text;
     }
 }
 
-Errand::Errand(Kind kind) : kind_(kind), thread_(gettid()) {
-    const std::lock_guard lock(errands().guard);
-    errands().all[thread_] = this;
+CommandScope::CommandScope(Kind kind) : kind_(kind), thread_(gettid()) {
+    const std::lock_guard lock(scopes().guard);
+    scopes().all[thread_] = this;
 }
 
-Errand::~Errand() {
-    const std::lock_guard lock(errands().guard);
-    errands().all.erase(thread_);
+CommandScope::~CommandScope() {
+    const std::lock_guard lock(scopes().guard);
+    scopes().all.erase(thread_);
 }
 
-std::string Errand::complaint() const {
-    const std::lock_guard lock(errands().guard);
+std::string CommandScope::complaint() const {
+    const std::lock_guard lock(scopes().guard);
     return complaint_;
 }
 

@@ -42,20 +42,20 @@ private:
     std::thread watcher_;
 };
 
-/// One call into the plug-in, from here to the end of the scope on this thread: it hears of the commands that
-/// were killed because of it. Those of threads without an errand (the start, the monitors) are told to the
-/// user as warnings. One a thread at a time.
-class Errand {
+/// Whose commands this thread starts from here to the end of the scope: those of one call into the plug-in,
+/// which hears when one of them was killed, or the agent's own. Those of threads without a scope (the start,
+/// the monitors) are told to the user as warnings. One a thread at a time.
+class CommandScope {
 public:
     /// A write may take ten times as long: it brings interfaces up and walks over all of them, and cut off in
     /// its middle it leaves the host half changed.
     /// What the agent itself starts has a deadline of its own.
     enum Kind { read, write, ours };
 
-    explicit Errand(Kind kind);
-    Errand(const Errand&) = delete;
-    Errand& operator=(const Errand&) = delete;
-    ~Errand();
+    explicit CommandScope(Kind kind);
+    CommandScope(const CommandScope&) = delete;
+    CommandScope& operator=(const CommandScope&) = delete;
+    ~CommandScope();
 
     /// "timed out after 10 s: ethtool eth0" of the first command that was killed; empty when none was.
     std::string complaint() const;
@@ -65,7 +65,7 @@ private:
 
     Kind kind_;
     pid_t thread_;
-    std::string complaint_;  // guarded by the list of errands
+    std::string complaint_;  // guarded by the list of scopes
 };
 
 }  // namespace cvagent

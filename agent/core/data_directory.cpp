@@ -34,9 +34,9 @@ constexpr const char* kLockFile = ".lock";
 /// made or trusted behind a place where somebody else could put something of his own.
 class Way {
 public:
-    /// @param otherwise ends what the user is advised to do
-    Way(const std::string& path, const std::string& otherwise)
-        : otherwise_(otherwise), whole_(path), left_(names(path)) {}
+    /// @param role what a refusal is about
+    Way(const std::string& path, const HeldDirectory::Role& role)
+        : role_(role), whole_(path), left_(names(path)) {}
 
     /// Makes what is missing. @return the path without symbolic links
     std::string walk() {
@@ -94,11 +94,10 @@ private:
         }
     }
     void judge(const std::string& place, const struct stat& found, bool isGoal) const {
-        if (found.st_uid != geteuid() && (isGoal || !isTheSystem(found.st_uid))) {
+        if (isGoal ? found.st_uid != geteuid() : isSomebodyElses(found)) {
             refuse(place, "belongs to somebody else (user " + std::to_string(found.st_uid) + ")");
         }
-        const bool onlyOwnFiles = (found.st_mode & S_ISVTX) != 0 && !isGoal;
-        if (!S_ISLNK(found.st_mode) && !onlyOwnFiles && othersCanWrite(place, found)) {
+        if (othersCanReplace(place, found, isGoal, Writers::groupsToo)) {
             refuse(place, "can be written by others");
         }
     }
@@ -115,13 +114,13 @@ private:
         }
     }
     [[noreturn]] void refuse(const std::string& place, const std::string& reason) const {
-        throw Problem(Problem::failed,
-                      "the data directory " + inQuotes(whole_) + " is not safe: " + inQuotes(place) + " " +
-                          reason + "\nMake all of the way to it yours or root's and writable by nobody else" +
-                          otherwise_);
+        throw Problem(
+            Problem::failed,
+            "the data directory " + inQuotes(whole_) + " is not safe: " + inQuotes(place) + " " + reason,
+            role_.subject, role_.reason);
     }
 
-    std::string otherwise_;
+    const HeldDirectory::Role& role_;
     std::string whole_;
     std::deque<std::string> left_;
     std::string reached_;  // without a slash at its end; the root is empty
@@ -168,14 +167,14 @@ std::string fixedDirectory() {
 
 }  // namespace
 
-HeldDirectory::HeldDirectory(const std::string& path, const std::string& otherwise)
-    : path_(Way(path, otherwise).walk()), lock_(openLock(path_ + kLockFile)) {
+HeldDirectory::HeldDirectory(const std::string& path, const Role& role)
+    : path_(Way(path, role).walk()), lock_(openLock(path_ + kLockFile)) {
     if (lock_ >= 0) {
-        hold(otherwise);
+        hold(role);
     }
 }
 
-void HeldDirectory::hold(const std::string& otherwise) const {
+void HeldDirectory::hold(const Role& role) const {
     struct stat found {};
     const bool isOurs = fstat(lock_, &found) == 0 && S_ISREG(found.st_mode) && found.st_uid == geteuid();
     if (isOurs && (found.st_mode & 077U) != 0) {
@@ -189,8 +188,8 @@ void HeldDirectory::hold(const std::string& otherwise) const {
     if (error != EWOULDBLOCK) {
         failWith(error);
     }
-    throw Problem(Problem::busy, "another agent holds the data directory " + inQuotes(path_) +
-                                     "\nStop it first" + otherwise);
+    throw Problem(Problem::busy, "another agent holds the data directory " + inQuotes(path_), role.subject,
+                  role.reason);
 }
 
 HeldDirectory::~HeldDirectory() {
@@ -202,30 +201,29 @@ HeldDirectory::~HeldDirectory() {
 DataDirectory::DataDirectory() {
     const char* chosen = std::getenv(kDataVariable);
     if (chosen != nullptr && *chosen == '\0') {
-        throw Problem(Problem::refused,
-                      std::string(kDataVariable) + " is empty; set it to a directory or unset it",
-                      Problem::environment);
+        throw Problem(Problem::refused, std::string(kDataVariable) + " is empty", Problem::dataVariable);
     }
     const bool isUsers = chosen == nullptr && geteuid() != 0;
     const std::string path = isUsers ? userDirectory() : standardDirectory();
     if (path.empty()) {
-        throw Problem(Problem::failed, std::string("there is no place for data; set ") + kDataVariable +
-                                           "=DIRECTORY or run as root");
+        throw Problem(Problem::failed, "there is no place for data", Problem::dataPlace);
     }
     // Root is held to the standard directory anyway, for the settings that are saved there.
-    const bool hasChoice = chosen != nullptr || isUsers;
+    isStandard_ = chosen == nullptr && !isUsers;
     try {
-        own_.emplace(
-            path, hasChoice ? std::string(", or name another one with ") + kDataVariable + "=DIRECTORY" : "");
+        own_.emplace(path, HeldDirectory::Role{isStandard_ ? Problem::dataFixed : Problem::dataOwn, ""});
     } catch (const std::system_error& error) {
         throw Problem(Problem::failed,
-                      "cannot use the data directory " + inQuotes(path) + ": " + error.code().message() +
-                          "\nRun as root, or name another one with " + kDataVariable + "=DIRECTORY");
-    }
-    if (hasChoice) {
-        setenv(kDataVariable, own_->path().c_str(), 1);
+                      "cannot use the data directory " + inQuotes(path) + ": " + error.code().message(),
+                      Problem::dataUse);
     }
     holdSettings();
+}
+
+void DataDirectory::nameInEnvironment() const {
+    if (!isStandard_) {
+        setenv(kDataVariable, own_->path().c_str(), 1);
+    }
 }
 
 void DataDirectory::holdSettings() {
@@ -237,7 +235,7 @@ void DataDirectory::holdSettings() {
     const std::string why = fixed == kSettings ? "; settings of interfaces are saved there whatever "
                                                : "; files in /tmp have the same names whatever ";
     try {
-        settings_.emplace(fixed, why + kDataVariable + " is");
+        settings_.emplace(fixed, HeldDirectory::Role{Problem::dataFixed, why + kDataVariable + " is"});
     } catch (const std::system_error&) {
         // Where it cannot be made, no agent saves or removes settings.
     } catch (const Problem& problem) {

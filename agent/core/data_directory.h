@@ -3,6 +3,8 @@
 #include <optional>
 #include <string>
 
+#include "agent/core/problem.h"
+
 namespace cvagent {
 
 /// Names another data directory.
@@ -13,10 +15,15 @@ inline constexpr const char* kDataVariable = "CORVISTA_DATA_DIR";
 /// made, the last directory with mode 0700. Where nothing can be written (EROFS) there is nothing to hold.
 class HeldDirectory {
 public:
+    /// What the directory is to the agent: the subject of a Problem with it, and why it is used.
+    struct Role {
+        Problem::Subject subject;
+        std::string reason;
+    };
+
     /// Throws Problem when somebody else could change the directory and, as `busy`, when another agent holds
     /// it; std::system_error when it cannot be made or opened.
-    /// @param otherwise ends what the user is advised to do then
-    HeldDirectory(const std::string& path, const std::string& otherwise);
+    HeldDirectory(const std::string& path, const Role& role);
     HeldDirectory(const HeldDirectory&) = delete;
     HeldDirectory& operator=(const HeldDirectory&) = delete;
     ~HeldDirectory();
@@ -25,7 +32,7 @@ public:
     const std::string& path() const { return path_; }
 
 private:
-    void hold(const std::string& otherwise) const;
+    void hold(const Role& role) const;
 
     std::string path_;
     int lock_;
@@ -39,12 +46,15 @@ public:
     /// Throws Problem; busy when another agent holds one of them.
     DataDirectory();
 
+    /// Has the plug-ins find it. To be called before any thread.
+    void nameInEnvironment() const;
     /// With a slash at its end.
     const std::string& path() const { return own_->path(); }
 
 private:
     void holdSettings();
 
+    bool isStandard_ = false;  ///< the one that plug-ins use where none is named
     std::optional<HeldDirectory> own_;
     std::optional<HeldDirectory> settings_;
 };

@@ -57,11 +57,8 @@ bool isOpenToOthers(const fs::path& directory) {
     for (const fs::path& name : directory) {
         way /= name;
         struct stat found {};
-        if (stat(way.c_str(), &found) != 0 || (found.st_uid != geteuid() && !isTheSystem(found.st_uid))) {
-            return true;
-        }
-        const bool onlyOwnFiles = (found.st_mode & S_ISVTX) != 0 && way != directory;
-        if ((found.st_mode & S_IWOTH) != 0 && !onlyOwnFiles) {
+        if (stat(way.c_str(), &found) != 0 || isSomebodyElses(found) ||
+            othersCanReplace(way, found, way == directory, Writers::everybody)) {
             return true;
         }
     }

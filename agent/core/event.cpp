@@ -1,6 +1,7 @@
 #include "agent/core/event.h"
 
 #include <algorithm>
+#include <array>
 
 #include "agent/core/catalogue.h"
 
@@ -11,8 +12,8 @@ namespace {
 /// The state that an alert tells, and the one that the node stores.
 void tellState(Event& event, const IC::MutableNode& node) {
     const AlertRow* row = findAlert(event.message);
-    const auto property = row != nullptr ? findProperty(node.nodeType(), row->property) : std::nullopt;
-    if (!property) {
+    const Property* property = row != nullptr ? findProperty(node.nodeType(), row->property) : nullptr;
+    if (property == nullptr) {
         return;
     }
     event.property = property->id;
@@ -27,17 +28,8 @@ void tellState(Event& event, const IC::MutableNode& node) {
 }  // namespace
 
 const char* eventName(Event::Kind kind) {
-    switch (kind) {
-        case Event::Kind::published:
-            return "published";
-        case Event::Kind::withdrawn:
-            return "withdrawn";
-        case Event::Kind::written:
-            return "written";
-        case Event::Kind::alert:
-            break;
-    }
-    return "alert";
+    static constexpr std::array kNames = {"published", "withdrawn", "alert", "written"};
+    return kNames.at(static_cast<std::size_t>(kind));
 }
 
 Event nodeEvent(Event::Kind kind, const IC::Node& node) {
@@ -59,7 +51,7 @@ Event alertEvent(const IC::Alert& alert, const std::vector<Handle>& nodes) {
     event.message = alert.message();
     event.firstCode = alert.firstCode();
     event.secondCode = alert.secondCode();
-    event.eventCode = alert.nodeId();  // the number that receivers key on
+    event.eventCode = alert.eventCode();
     if (!alert.substitutions().empty()) {
         event.path = alert.substitutions().front();
     }

@@ -29,11 +29,14 @@ struct Event {
     std::string propertyName;  ///< empty: the event is about no property
     std::string before;        ///< the value as text; empty when it is not known
     std::string after;
+    std::string caller;  ///< who has written; empty for what nobody asked for
     // of alerts
     unsigned int firstCode = 0;
     unsigned int secondCode = 0;
     unsigned int eventCode = 0;
 };
+
+constexpr std::size_t kEventKinds = 4;
 
 /// "published", "withdrawn", "alert" or "written".
 const char* eventName(Event::Kind kind);

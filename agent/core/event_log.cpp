@@ -12,8 +12,38 @@
 
 namespace cvagent {
 
+namespace {
+
+std::size_t bytesOf(const Event& event) {
+    return sizeof(Event) + event.path.size() + event.message.size() + event.before.size() +
+           event.after.size();
+}
+
+std::size_t placeOf(Event::Kind kind) {
+    return static_cast<std::size_t>(kind);
+}
+
+}  // namespace
+
+void EventQueue::add(Event event) {
+    bytes_ += bytesOf(event);
+    events_.push_back(std::move(event));
+}
+
+Event EventQueue::dropOldest() {
+    Event oldest = std::move(events_.front());
+    events_.pop_front();
+    bytes_ -= bytesOf(oldest);
+    return oldest;
+}
+
+std::deque<Event> EventQueue::takeAll() {
+    bytes_ = 0;
+    return std::exchange(events_, {});
+}
+
 Subscription::Subscription(std::size_t most, std::optional<Event::Kind> only)
-    : most_(most), only_(only), ready_(eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)) {
+    : only_(only), ready_(eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)), events_(most) {
     if (ready_ < 0) {
         throw Problem(Problem::failed, std::string("cannot wait for events: ") + std::strerror(errno));
     }
@@ -29,11 +59,11 @@ void Subscription::put(const Event& event) {
     }
     {
         const std::lock_guard lock(guard_);
-        if (events_.size() >= most_) {
-            events_.pop_front();
+        events_.add(event);
+        while (events_.isTooLong()) {
+            events_.dropOldest();
             ++dropped_;
         }
-        events_.push_back(event);
     }
     eventfd_write(ready_, 1);
 }
@@ -42,7 +72,7 @@ Subscription::Taken Subscription::take() {
     eventfd_t count = 0;
     eventfd_read(ready_, &count);
     const std::lock_guard lock(guard_);
-    return {std::exchange(events_, {}), std::exchange(dropped_, 0)};
+    return {events_.takeAll(), std::exchange(dropped_, 0)};
 }
 
 /// The subscribers' queues are filled under the log's lock, so that all see the events in one order.
@@ -55,19 +85,28 @@ void EventLog::hear(const Event& event) {
             listening->put(numbered);
         }
     }
-    kept_.push_back(std::move(numbered));
-    if (kept_.size() > most_) {
-        kept_.pop_front();
+    kept_.add(std::move(numbered));
+    while (kept_.isTooLong()) {
+        const Event oldest = kept_.dropOldest();
+        Gone& gone = gone_.at(placeOf(oldest.kind));
+        gone = {gone.count + 1, oldest.number};
     }
 }
 
 EventLog::Since EventLog::sinceLocked(std::uint64_t number) const {
-    const std::uint64_t gone = last_ - kept_.size();  // the last one that is kept no more
+    const std::deque<Event>& kept = kept_.events();
+    const std::uint64_t gone = last_ - kept.size();  // the last one that is kept no more
     Since since;
     since.missing = number < gone ? gone - number : 0;
-    std::copy_if(kept_.begin(), kept_.end(), std::back_inserter(since.events),
+    std::copy_if(kept.begin(), kept.end(), std::back_inserter(since.events),
                  [number](const Event& event) { return event.number > number; });
     return since;
+}
+
+/// How many of a kind are lost to who wants those after a number; at most, where that number is lost itself.
+std::uint64_t EventLog::missingOf(Event::Kind kind, std::uint64_t after) const {
+    const Gone& gone = gone_.at(placeOf(kind));
+    return gone.last > after ? std::min(gone.count, gone.last - after) : 0;
 }
 
 EventLog::Since EventLog::since(std::uint64_t number) const {
@@ -75,17 +114,12 @@ EventLog::Since EventLog::since(std::uint64_t number) const {
     return sinceLocked(number);
 }
 
-std::uint64_t EventLog::last() const {
-    const std::lock_guard lock(guard_);
-    return last_;
-}
-
 std::shared_ptr<Subscription> EventLog::subscribe(std::uint64_t after, std::size_t most,
                                                   std::optional<Event::Kind> only) {
     auto subscription = std::make_shared<Subscription>(most, only);
     const std::lock_guard lock(guard_);
     const Since past = sinceLocked(after);
-    subscription->dropped_ = past.missing;
+    subscription->dropped_ = only ? missingOf(*only, after) : past.missing;
     for (const Event& event : past.events) {
         subscription->put(event);
     }

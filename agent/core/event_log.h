@@ -1,5 +1,6 @@
 #pragma once
 
+#include <array>
 #include <cstdint>
 #include <deque>
 #include <memory>
@@ -11,12 +12,35 @@
 
 namespace cvagent {
 
+/// Events in their order, as many as are allowed. Texts come from the host and may be long, so the bytes are
+/// bounded, too; the newest event is kept however long it is. One thread at a time.
+class EventQueue {
+public:
+    static constexpr std::size_t kMostBytes = std::size_t{16} << 20;
+
+    explicit EventQueue(std::size_t most) : most_(most) {}
+
+    void add(Event event);
+    bool isTooLong() const { return events_.size() > most_ || (bytes_ > kMostBytes && events_.size() > 1); }
+    Event dropOldest();
+    const std::deque<Event>& events() const { return events_; }
+    std::deque<Event> takeAll();
+
+private:
+    std::size_t most_;
+    std::size_t bytes_ = 0;
+    std::deque<Event> events_;
+};
+
 /// What one subscriber has not taken yet. It may outlive the agent. Any thread.
 class Subscription {
 public:
     struct Taken {
         std::deque<Event> events;
-        std::uint64_t dropped = 0;  ///< events lost since the last call, older than those that are here
+        /// Events that he would have got and that are lost, since the last call; older than those that are
+        /// here. Exact, but for a subscription to one kind that began at a number which the log keeps no
+        /// more: then some of them may have been before that number.
+        std::uint64_t dropped = 0;
     };
 
     /// @param most events that are kept for the subscriber; the oldest goes first
@@ -36,11 +60,10 @@ private:
     friend class EventLog;
     void put(const Event& event);
 
-    const std::size_t most_;
     const std::optional<Event::Kind> only_;
     int ready_;
     std::mutex guard_;
-    std::deque<Event> events_;   // guarded by guard_
+    EventQueue events_;          // guarded by guard_
     std::uint64_t dropped_ = 0;  // guarded by guard_
 };
 
@@ -56,24 +79,29 @@ public:
     };
 
     /// @param most how many past events are kept
-    explicit EventLog(std::size_t most = kMost) : most_(most) {}
+    explicit EventLog(std::size_t most = kMost) : kept_(most) {}
 
     void hear(const Event& event) override;
     /// The events after a number, the oldest first; 0 asks for all that are kept.
     Since since(std::uint64_t number) const;
-    /// The number of the last event.
-    std::uint64_t last() const;
     /// A queue of the events after a number, those that have happened included.
     std::shared_ptr<Subscription> subscribe(std::uint64_t after, std::size_t most = kMost,
                                             std::optional<Event::Kind> only = std::nullopt);
 
 private:
-    Since sinceLocked(std::uint64_t number) const;
+    /// Events of one kind that are kept no more.
+    struct Gone {
+        std::uint64_t count = 0;
+        std::uint64_t last = 0;  ///< number of the last one
+    };
 
-    const std::size_t most_;
+    Since sinceLocked(std::uint64_t number) const;
+    std::uint64_t missingOf(Event::Kind kind, std::uint64_t after) const;
+
     mutable std::mutex guard_;  // guards everything below
     std::uint64_t last_ = 0;
-    std::deque<Event> kept_;
+    EventQueue kept_;
+    std::array<Gone, kEventKinds> gone_;  // by kind
     std::vector<std::weak_ptr<Subscription>> subscribers_;
 };
 

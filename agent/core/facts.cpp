@@ -16,6 +16,13 @@ void Facts::forget(unsigned int node) {
                  facts_.upper_bound({node, std::numeric_limits<unsigned int>::max()}));
 }
 
+Reading Facts::ask(const IC::MutableNode& node, unsigned int id) {
+    const auto begun = Clock::now();
+    Reading reading = readProperty(node, id);
+    judge(node, reading, begun);
+    return reading;
+}
+
 void Facts::judge(const IC::MutableNode& node, Reading& reading, Clock::time_point begun) {
     if (reading.timedOut) {
         attachLast(node, reading, begun);

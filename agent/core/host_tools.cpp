@@ -10,6 +10,7 @@
 #include "agent/core/environment.h"
 #include "agent/core/probe.h"
 #include "agent/core/program_path.h"
+#include "agent/shell/adapters.h"
 #include "agent/shell/child.h"
 #include "agent/shell/programs.h"
 #include "agent/shell/runner.h"
@@ -22,14 +23,24 @@ namespace {
 namespace fs = std::filesystem;
 
 constexpr std::chrono::milliseconds kLongestProbe{3000};
+/// Finds the interfaces by their names.
+constexpr const char* kListingTool = "egrep";
+
+enum class Adapter { none, exists };
+
+/// How to see whether a tool gives what the plug-in's commands understand.
+struct Format {
+    const char* probeArgument = nullptr;
+    bool (*classic)(bool succeeded, std::string_view output) = nullptr;
+};
 
 struct Tool {
     const char* name;
     const char* package;
     const char* purpose;
-    /// How to see whether it prints the classic format; null for tools whose format has not changed.
-    const char* probeArgument = nullptr;
-    bool (*classic)(bool succeeded, std::string_view output) = nullptr;
+    Adapter adapter = Adapter::none;
+    /// Empty for tools whose format has not changed.
+    Format format = {};
 };
 
 bool contains(std::string_view text, std::string_view part) {
@@ -37,20 +48,30 @@ bool contains(std::string_view text, std::string_view part) {
 }
 
 constexpr Tool kTools[] = {
-    {"ifconfig", "net-tools", "IPv4 addresses, hardware addresses; bringing interfaces up and down", "lo",
-     [](bool, std::string_view output) { return contains(output, "Link encap:"); }},
-    {"route", "net-tools", "gateways", "-n",
-     [](bool, std::string_view output) { return contains(output, "Kernel IP routing table"); }},
+    {"ifconfig",
+     "net-tools",
+     "IPv4 addresses, hardware addresses; bringing interfaces up and down",
+     Adapter::exists,
+     {"lo", [](bool, std::string_view output) { return contains(output, "Link encap:"); }}},
+    {"route",
+     "net-tools",
+     "gateways",
+     Adapter::exists,
+     {"-n", [](bool, std::string_view output) { return contains(output, "Kernel IP routing table"); }}},
     // A host without disks has nothing to list; a usage error is no listing.
-    {"fdisk", "fdisk", "drives and partitions", "-ls",
-     [](bool succeeded, std::string_view output) {
-         return succeeded || output.starts_with("Disk") || contains(output, "\nDisk ");
-     }},
-    {"ethtool", "ethtool", "speed, duplex, link state, Wake-on-LAN"},
+    {"fdisk",
+     "fdisk",
+     "drives and partitions",
+     Adapter::exists,
+     {"-ls",
+      [](bool succeeded, std::string_view output) {
+          return succeeded || output.starts_with("Disk") || contains(output, "\nDisk ");
+      }}},
+    {"ethtool", "ethtool", "speed, duplex, link state, Wake-on-LAN", Adapter::exists},
+    {"brctl", "bridge-utils", "bridges and their members", Adapter::exists},
+    {kListingTool, "grep", "network interfaces", Adapter::exists},
     {"ip", "iproute2", "IPv6 addresses, IPv6 routes"},
-    {"brctl", "bridge-utils", "bridges and their members"},
     {"hostname", "hostname", "host name and domain name"},
-    {"egrep", "grep", "network interfaces"},
     {"awk", "mawk", "changes of disks, settings of interfaces"},
     {"md5sum", "coreutils", "noticing changes of disks"},
     {"sha1sum", "coreutils", "noticing changes of disks"},
@@ -73,25 +94,38 @@ std::string findOnPath(const std::string& name) {
 }
 
 ToolReport lookFor(const Tool& tool, const std::optional<std::string>& adapters) {
-    ToolReport report{tool.name, tool.package, tool.purpose, findOnPath(tool.name), true, {}, false};
-    if (adapters && tool.classic != nullptr) {
+    ToolReport report;
+    report.tool = tool.name;
+    report.package = tool.package;
+    report.purpose = tool.purpose;
+    report.native = findOnPath(tool.name);
+    if (adapters && tool.adapter == Adapter::exists) {
         const std::string adapter = *adapters + "/" + tool.name + "/" + tool.name;
         report.adapter = isProgram(adapter) ? adapter : "";
     }
     return report;
 }
 
+void setClassic(ToolReport& report, bool classic, const char* flaw) {
+    report.classic = classic;
+    report.flaw = classic ? "" : flaw;
+}
+
 void probeFormats(std::vector<ToolReport>& reports) {
     std::vector<std::pair<std::size_t, Probe>> running;
     for (std::size_t i = 0; i < reports.size(); ++i) {
         const Tool& tool = kTools[i];
-        if (tool.classic != nullptr && !reports[i].native.empty()) {
-            running.emplace_back(i, Probe({reports[i].native, tool.probeArgument}));
+        if (tool.format.classic != nullptr && !reports[i].native.empty()) {
+            running.emplace_back(i, Probe({reports[i].native, tool.format.probeArgument}));
+        }
+        if (reports[i].tool == kListingTool && !reports[i].native.empty()) {
+            setClassic(reports[i], shell::haveClassicNames(),
+                       "finds no interfaces with names such as enp3s0");
         }
     }
     for (auto& [i, probe] : running) {
         const bool succeeded = probe.finish(kLongestProbe);
-        reports[i].classic = kTools[i].classic(succeeded, probe.output());
+        setClassic(reports[i], kTools[i].format.classic(succeeded, probe.output()), "not the classic format");
     }
 }
 
@@ -106,7 +140,7 @@ std::vector<ToolReport> inspectHostTools(HostTools choice, Look look,
                                          const std::optional<std::string>& adapters) {
     std::vector<ToolReport> reports;
     for (const Tool& tool : kTools) {
-        if (look == Look::everything || tool.classic != nullptr) {
+        if (look == Look::everything || tool.adapter == Adapter::exists) {
             reports.push_back(lookFor(tool, adapters));
         }
     }
@@ -117,6 +151,7 @@ std::vector<ToolReport> inspectHostTools(HostTools choice, Look look,
         const bool wanted = choice == HostTools::classic ||
                             (choice == HostTools::automatic && (report.native.empty() || !report.classic));
         report.useAdapter = wanted && !report.adapter.empty();
+        report.standsBy = choice != HostTools::native && !report.adapter.empty() && !report.useAdapter;
     }
     return reports;
 }
@@ -126,16 +161,22 @@ void setUpCommands(Commands commands) {
     QX::setKillWitness(shell::noteKill);
 }
 
-void putAdaptersFirst(const std::vector<ToolReport>& reports) {
-    std::string path;
+void putAdaptersOnPath(const std::vector<ToolReport>& reports) {
+    const char* const hosts = std::getenv("PATH");
+    std::string front;
+    std::string path = hosts != nullptr ? hosts : "";
     for (const ToolReport& report : reports) {
+        const std::string directory = fs::path(report.adapter).parent_path();
         if (report.useAdapter) {
-            path += fs::path(report.adapter).parent_path().string() + ":";
+            front += directory + ":";
+        } else if (report.standsBy) {
+            path += (path.empty() ? "" : ":") + directory;
+        }
+        if (report.useAdapter || report.standsBy) {
             shell::setHostTools(report.adapter);  // all of them are one program
         }
     }
-    const char* hosts = std::getenv("PATH");
-    setenv("PATH", (path + (hosts != nullptr ? hosts : "")).c_str(), 1);
+    setenv("PATH", (front + path).c_str(), 1);
 }
 
 }  // namespace cvagent

@@ -23,9 +23,11 @@ struct ToolReport {
     std::string package;  ///< the Debian package to install for the host's own
     std::string purpose;  ///< what is not known without it
     std::string native;   ///< path of the host's own; empty when it is missing
-    bool classic = true;  ///< the host's own prints the classic format
+    bool classic = true;  ///< the host's own gives what the plug-in's commands understand
+    std::string flaw;     ///< what it gives instead, when it does not
     std::string adapter;  ///< path of our adapter; empty when there is none
     bool useAdapter = false;
+    bool standsBy = false;  ///< the adapter is to answer while the host's own is away
 
     bool missing() const { return native.empty() && !useAdapter; }
     /// What the plug-in's commands will run; empty when there is nothing.
@@ -41,8 +43,9 @@ enum class Look { adapters, everything };
 std::vector<ToolReport> inspectHostTools(HostTools choice, Look look,
                                          const std::optional<std::string>& adapters);
 
-/// Puts the directories of the adapters that are to be used in front of PATH.
-void putAdaptersFirst(const std::vector<ToolReport>& reports);
+/// Puts the directories of the adapters that are to be used in front of PATH. Those that stand by come at its
+/// very end: a tool can vanish for a moment while the program runs, when its package is upgraded.
+void putAdaptersOnPath(const std::vector<ToolReport>& reports);
 
 /// Where the adapters are, in the build tree or installed, each in a directory of its own name; nothing when
 /// they are not.

@@ -14,6 +14,7 @@
 #include <utility>
 
 #include "agent/core/problem.h"
+#include "agent/core/surroundings.h"
 #include "agent/core/text.h"
 #include "agent/core/want.h"
 #include "framework/cvlog/logger.h"
@@ -79,11 +80,9 @@ std::optional<std::string> refusedText(const CVLog::LogRecord& record) {
     return message.substr(kRefusal.size(), message.find('"', kRefusal.size()) - kRefusal.size());
 }
 
-std::string advice(const std::string& refused) {
+std::string explanation(const std::string& refused) {
     return "no command is run with \"" + printable(refused) +
-           "\", for a shell could read more than a name in it, so what it would tell is missing; rename the "
-           "interface, bridge, team, disk or host of that name, or correct the file that names it: letters, "
-           "digits, dots, dashes and underscores are fine";
+           "\", for a shell could read more than a name in it, so what it would tell is missing";
 }
 
 }  // namespace
@@ -110,8 +109,9 @@ public:
 
     void keepErrors(std::shared_ptr<ErrorLines> unowned, const LogSettings& settings) {
         unowned_ = std::move(unowned);
-        seen_ = settings.seen && !settings.file;
+        seen_ = settings.shown && !settings.file;
         advises_ = settings.advises && !settings.file;
+        advice_ = settings.advice;
     }
 
     void write(const CVLog::LogRecord& record) override {
@@ -138,7 +138,7 @@ private:
         if (!unowned_ || !isNew(refused)) {
             return;
         }
-        const std::string text = advice(refused);
+        const std::string text = explanation(refused) + advice_;
         if (lines_ && advises_) {
             lines_->write({record.function, record.source, record.line, record.component, record.level,
                            record.reserved1, record.reserved2, record.reserved3, text});
@@ -165,12 +165,14 @@ private:
     std::shared_ptr<ErrorLines> unowned_;  ///< none: errors are not kept
     bool seen_ = false;                    ///< what lines_ gets, the user sees
     bool advises_ = false;                 ///< what lines_ gets, the user has not asked for
+    std::string advice_;
     std::mutex guard_;
     std::set<std::string> told_;  // refused names; guarded by guard_
 };
 
 LogOutput::LogOutput(const LogSettings& settings, std::shared_ptr<ErrorLines> unowned)
-    : log_(std::make_unique<Sink>(settings.file, settings.descriptor, settings.lowest)) {
+    : log_(
+          std::make_unique<Sink>(settings.file, settings.shown ? messageDescriptor() : -1, settings.lowest)) {
     log_->keepErrors(std::move(unowned), settings);
     if (settings.traceFile) {
         trace_ = std::make_unique<Sink>(settings.traceFile, -1, 0);

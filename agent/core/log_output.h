@@ -15,18 +15,18 @@ struct LogSettings {
     std::optional<std::string> file;
     std::optional<std::string> traceFile;  ///< gets every line, whatever its level
     int lowest = kErrorLevel;              ///< level of the lines that are logged
-    /// Where lines go as they come when no file is named; -1: nowhere.
-    int descriptor = -1;
-    /// Who asks reads the descriptor: the errors that went there are not kept for him as well.
-    bool seen = false;
-    /// Of lines that were not asked for: a name that the plug-in refuses is shown once, with what to do.
+    /// Without a file lines go where the program's own messages go, as they come, and the errors among them
+    /// are not kept as well.
+    bool shown = false;
+    /// Of lines that were not asked for: a name that the plug-in refuses is shown once.
     bool advises = false;
+    std::string advice;  ///< what is told behind that name
 };
 
 /// Where the plug-ins' log and trace lines go while this object lives. An error that is reported on the
 /// thread of a call belongs to that call; the others, those of starts, monitors and stops, belong to
 /// nobody's. Of several such objects the one that was made last gets the lines.
-/// A name that the plug-in refuses to put into a command is among the errors once, with what to do about it.
+/// A name that the plug-in refuses to put into a command is among the errors once, with the advice.
 class LogOutput {
 public:
     /// @param unowned takes the errors that belong to no call. Throws Problem when a file cannot be opened.

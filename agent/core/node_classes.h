@@ -2,6 +2,7 @@
 
 #include <map>
 #include <memory>
+#include <span>
 #include <string>
 #include <vector>
 
@@ -39,6 +40,9 @@ struct NodeClass {
     const char* name;
     enum class Naming { single, byIndex, byProperty } naming;
     unsigned int nameProperty;  ///< the property that holds the node's name
+    /// The properties that tell the nodes of the class apart at a glance.
+    std::span<const unsigned int> telling{};
+    bool everywhere = false;  ///< every host has nodes of the class
 };
 
 /// All classes, in the order in which the tree and the catalogue show them.

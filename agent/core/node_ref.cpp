@@ -19,13 +19,4 @@ NodeRef::NodeRef(std::shared_ptr<void> agent, Handle node) {
     node_ = Handle(std::make_shared<Kept>(Kept{std::move(agent), std::move(node)}), shown);
 }
 
-std::vector<Handle> handlesOf(const std::vector<NodeRef>& nodes) {
-    std::vector<Handle> handles;
-    handles.reserve(nodes.size());
-    for (const NodeRef& node : nodes) {
-        handles.push_back(node.node_);
-    }
-    return handles;
-}
-
 }  // namespace cvagent

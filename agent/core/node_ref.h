@@ -1,7 +1,6 @@
 #pragma once
 
 #include <memory>
-#include <vector>
 
 #include "agent/core/node_classes.h"
 
@@ -22,15 +21,12 @@ public:
 
 private:
     friend class Agent;
-    friend std::vector<Handle> handlesOf(const std::vector<NodeRef>& nodes);
+    friend struct NodeRefOfTest;  // for lists without an agent
 
     /// @param agent what must live as long as the node
     NodeRef(std::shared_ptr<void> agent, Handle node);
 
     Handle node_;  // owns the agent, too
 };
-
-/// The same nodes for what works on lists of them; each handle keeps the agent as the NodeRef does.
-std::vector<Handle> handlesOf(const std::vector<NodeRef>& nodes);
 
 }  // namespace cvagent

@@ -3,6 +3,7 @@
 #include <grp.h>
 #include <pwd.h>
 #include <sys/xattr.h>
+#include <unistd.h>
 
 #include <fstream>
 
@@ -64,6 +65,18 @@ bool hasAccessList(const std::string& place) {
 
 bool isTheSystem(uid_t owner) {
     return owner == 0 || (owner == kUnmappedOwner && isInUserNamespace());
+}
+
+bool isSomebodyElses(const struct stat& found) {
+    return found.st_uid != geteuid() && !isTheSystem(found.st_uid);
+}
+
+bool othersCanReplace(const std::string& place, const struct stat& found, bool isGoal, Writers writers) {
+    const bool onlyOwnFiles = (found.st_mode & S_ISVTX) != 0 && !isGoal;
+    if (S_ISLNK(found.st_mode) || onlyOwnFiles) {
+        return false;
+    }
+    return writers == Writers::groupsToo ? othersCanWrite(place, found) : (found.st_mode & S_IWOTH) != 0;
 }
 
 bool othersCanWrite(const std::string& place, const struct stat& found) {

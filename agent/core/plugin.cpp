@@ -70,16 +70,17 @@ std::string pluginBesideProgram() {
 
 void tellNobody(const std::string& /*text*/) {}
 
-Plugin::Plugin(const std::string& file, Listener* listener, Tell tell)
-    : file_(file), listener_(listener), tell_(std::move(tell)) {
+Plugin::Plugin(const std::string& file, Listener* listener, Tell tell, bool processors)
+    : file_(file), events_(listener), tell_(std::move(tell)) {
     try {
         load();
         open();
-        start();
+        start(processors);
     } catch (...) {
         close();
         throw;
     }
+    events_.release();
 }
 
 Plugin::~Plugin() {
@@ -122,14 +123,14 @@ void Plugin::open() {
     }
 }
 
-void Plugin::start() {
+void Plugin::start(bool processors) {
     try {
         running_.emplace(*interface_);
     } catch (const Problem& problem) {
         throw Problem(problem.kind(), inQuotes(file_) + ": " + problem.what());
     }
     try {
-        guarded("initialize of " + inQuotes(file_), [this] {
+        guarded("initialize of " + inQuotes(file_), [this, processors] {
             const IdRange ids = running_->ids();
             interface_->setLoadCallBack(nodeLoaded, this, running_->finder());
             interface_->setWithdrawCallBack(nodeWithdrawn, this);
@@ -139,7 +140,8 @@ void Plugin::start() {
             if (result.getStatus() != 0) {
                 fail("the plug-in " + inQuotes(file_) + " did not initialize: " + errorText(result));
             }
-            if (const auto create = symbol<Builder>(library_, kProcessorBuilder)) {
+            const auto create = symbol<Builder>(library_, kProcessorBuilder);
+            if (create != nullptr && processors) {
                 create(interface_);
             }
             checkIds();
@@ -195,25 +197,19 @@ IC::Error Plugin::nodeLoaded(IC::Node* const& node, const void* plugin) {
         return {IC::Error::failure, IC::Number(), "the id of another plug-in's node"};
     }
     known->setPath(makePath(*self->interface_, *known));
-    if (self->listener_ != nullptr) {
-        self->listener_->hear(nodeEvent(Event::Kind::published, *known));
-    }
+    self->events_.hear(nodeEvent(Event::Kind::published, *known));
     return {};
 }
 
 void Plugin::nodeWithdrawn(const IC::Node& node, const void* plugin) {
     const auto* self = static_cast<const Plugin*>(plugin);
-    if (self->listener_ != nullptr) {
-        self->listener_->hear(nodeEvent(Event::Kind::withdrawn, node));
-    }
+    self->events_.hear(nodeEvent(Event::Kind::withdrawn, node));
 }
 
 IC::Error Plugin::alertsCame(const std::vector<IC::Alert>& alerts, const void* plugin) {
     const auto* self = static_cast<const Plugin*>(plugin);
     for (const IC::Alert& alert : alerts) {
-        if (self->listener_ != nullptr) {
-            self->listener_->hear(alertEvent(alert, self->interface_->holdAll()));
-        }
+        self->events_.hear(alertEvent(alert, self->interface_->holdAll()));
     }
     return {};
 }

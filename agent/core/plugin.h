@@ -6,6 +6,7 @@
 
 #include "agent/core/event.h"
 #include "agent/core/running_plugins.h"
+#include "agent/core/withheld_events.h"
 #include "framework/ic/management_interface.h"
 
 namespace cvagent {
@@ -24,10 +25,12 @@ class Plugin {
 public:
     /// Loads the library, hands over the callbacks, initializes it, gives every node its path.
     /// @param file its path; one without a slash would be looked for at the loader's own places
-    /// @param listener hears of alerts, published and withdrawn nodes; null for none. Outlives the object.
+    /// @param listener hears of alerts, published and withdrawn nodes, from the moment when the start has
+    ///                 succeeded: what came before it hears then. Null for none. Outlives the object.
     /// @param tell     hears of a stop that went wrong
+    /// @param processors whether its builder of processor nodes is called
     /// Throws Problem, with a text of its own for each way in which a file can be no plug-in.
-    Plugin(const std::string& file, Listener* listener, Tell tell = tellNobody);
+    Plugin(const std::string& file, Listener* listener, Tell tell = tellNobody, bool processors = true);
     Plugin(const Plugin&) = delete;
     Plugin& operator=(const Plugin&) = delete;
     /// Unloads the plug-in and closes the library.
@@ -43,14 +46,14 @@ private:
 
     void load();
     void open();
-    void start();
+    void start(bool processors);
     void checkIds() const;
     bool isOwnId(const IC::MutableNode& node) const;
     void stop();
     void close();
 
     std::string file_;
-    Listener* listener_;
+    mutable WithheldEvents events_;  // the callbacks have their context as const
     Tell tell_;
     void* library_ = nullptr;
     IC::ManagementInterface* interface_ = nullptr;

@@ -11,7 +11,7 @@ class Problem : public std::runtime_error {
 public:
     enum Kind {
         notFound,   ///< no such node or property
-        ambiguous,  ///< the text lists what could be meant
+        ambiguous,  ///< the detail lists what could be meant
         refused,    ///< the question itself cannot be granted
         busy,       ///< another agent or another write is in the way
         timedOut,   ///< no answer until the deadline
@@ -27,21 +27,27 @@ public:
         pluginLoad,
         pluginEntry,
         logFile,
-        environment
+        currentDirectory,
+        dataVariable,  ///< names no directory
+        dataPlace,     ///< no directory is named and there is none by default
+        dataUse,       ///< the directory cannot be made or opened
+        dataOwn,       ///< a directory that another one could be named for: held (busy) or not safe
+        dataFixed,     ///< the same of one that is used whatever is named
     };
 
-    Problem(Kind kind, const std::string& text, Subject subject = none, std::string nodeClass = {})
-        : std::runtime_error(text), kind_(kind), subject_(subject), nodeClass_(std::move(nodeClass)) {}
+    Problem(Kind kind, const std::string& text, Subject subject = none, std::string detail = {})
+        : std::runtime_error(text), kind_(kind), subject_(subject), detail_(std::move(detail)) {}
 
     Kind kind() const { return kind_; }
     Subject subject() const { return subject_; }
-    /// The class of nodes that a problem with a property is about.
-    const std::string& nodeClass() const { return nodeClass_; }
+    /// What belongs behind advice: the class that a property is looked for in, what could be meant, why a
+    /// directory is used.
+    const std::string& detail() const { return detail_; }
 
 private:
     Kind kind_;
     Subject subject_;
-    std::string nodeClass_;
+    std::string detail_;
 };
 
 }  // namespace cvagent

@@ -1,5 +1,6 @@
 #include "agent/core/reader.h"
 
+#include <algorithm>
 #include <condition_variable>
 #include <mutex>
 #include <utility>
@@ -23,9 +24,9 @@ public:
         changed_.notify_one();
     }
     /// What has come until the deadline; nothing at a place means that it has not.
-    std::vector<std::optional<Reading>> takeAt(Request::Clock::time_point deadline) {
+    std::vector<std::optional<Reading>> takeAt(Request::Clock::time_point deadline, Pool& pool) {
         std::unique_lock lock(guard_);
-        waitFor(changed_, lock, deadline, [this] { return left_ == 0; });
+        pool.wait(changed_, lock, deadline, [this] { return left_ == 0; });
         return readings_;
     }
 
@@ -52,33 +53,48 @@ std::vector<Reading> Reader::read(const Handle& node, const std::vector<unsigned
 }
 
 /// The errors of a stop of the agent, which may come next on this thread, are not the request's.
-Reading Reader::ask(const IC::MutableNode& node, unsigned int id, const Request& request) {
+Reading Reader::askHere(const IC::MutableNode& node, unsigned int id, const Request& request) {
     const ErrorScope scope(request.errors());
-    const auto begun = Facts::Clock::now();
-    Reading reading = readProperty(node, id);
-    facts_.judge(node, reading, begun);
-    return reading;
+    return facts_.ask(node, id);
+}
+
+/// Whether there is no use in asking: nobody would wait for the answer, or the node has not answered others
+/// for long. One who waits for as long as it takes is given the time.
+bool Reader::isHopeless(const IC::MutableNode& node, const Request& request) const {
+    return request.deadline() != Request::Clock::time_point::max() &&
+           (request.deadline() <= Request::Clock::now() || pool_.isStuck(node.getNodeId()));
 }
 
 std::vector<Reading> Reader::readNow(const Handle& node, const std::vector<unsigned int>& ids,
                                      const Request& request) {
     const auto asked = Facts::Clock::now();
-    const auto answers = std::make_shared<Answers>(ids.size());
-    for (std::size_t i = 0; i < ids.size(); ++i) {
-        pool_.submit(node->getNodeId(), answers.get(),
-                     [held = node, id = ids[i], i, answers, request, this]() mutable {
-                         Reading reading = ask(*held, id, request);
-                         held.reset();  // whoever has his answer may end the agent and know that it has ended
-                         answers->put(i, std::move(reading));
-                     });
+    std::vector<std::optional<Reading>> come(ids.size());
+    if (!isHopeless(*node, request)) {
+        come = ask(node, ids, request);
     }
-    auto come = answers->takeAt(request.deadline());
-    pool_.drop(answers.get());
     std::vector<Reading> readings;
     for (std::size_t i = 0; i < ids.size(); ++i) {
         readings.push_back(come[i] ? *std::move(come[i]) : facts_.overdue(*node, ids[i], asked));
     }
     return readings;
+}
+
+std::vector<std::optional<Reading>> Reader::ask(const Handle& node, const std::vector<unsigned int>& ids,
+                                                const Request& request) {
+    const auto answers = std::make_shared<Answers>(ids.size());
+    for (std::size_t i = 0; i < ids.size(); ++i) {
+        pool_.submit(node->getNodeId(), answers.get(),
+                     [held = node, id = ids[i], i, answers, request, this]() mutable {
+                         Reading reading = askHere(*held, id, request);
+                         held.reset();  // whoever has his answer may end the agent and know that it has ended
+                         answers->put(i, std::move(reading));
+                     });
+    }
+    auto come = answers->takeAt(request.deadline(), pool_);
+    if (!std::all_of(come.begin(), come.end(), [](const auto& reading) { return reading.has_value(); })) {
+        pool_.giveUp(answers.get());
+    }
+    return come;
 }
 
 }  // namespace cvagent

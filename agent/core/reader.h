@@ -1,6 +1,7 @@
 #pragma once
 
 #include <memory>
+#include <optional>
 #include <vector>
 
 #include "agent/core/facts.h"
@@ -23,14 +24,19 @@ public:
 
     /// @param node kept by the work until it is done
     /// @return one reading an id, in the order of the ids. What the host does not tell until the request's
-    ///         deadline is the last known value, stale. Never throws for what a read does.
+    ///         deadline is the last known value, stale; at once when a node that others have given up has
+    ///         not answered for a second. Never throws for what a read does.
     std::vector<Reading> read(const Handle& node, const std::vector<unsigned int>& ids, Freshness freshness,
                               const Request& request);
 
 private:
     std::vector<Reading> readNow(const Handle& node, const std::vector<unsigned int>& ids,
                                  const Request& request);
-    Reading ask(const IC::MutableNode& node, unsigned int id, const Request& request);
+    bool isHopeless(const IC::MutableNode& node, const Request& request) const;
+    /// What comes until the request's deadline.
+    std::vector<std::optional<Reading>> ask(const Handle& node, const std::vector<unsigned int>& ids,
+                                            const Request& request);
+    Reading askHere(const IC::MutableNode& node, unsigned int id, const Request& request);
 
     Pool& pool_;
     Facts& facts_;

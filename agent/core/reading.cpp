@@ -13,12 +13,12 @@ std::string errorText(const IC::Error& error) {
 
 Reading readProperty(const IC::MutableNode& node, unsigned int id) {
     Reading reading{id, findProperty(node.nodeType(), id), {}, {}};
-    const Errand errand(Errand::read);
+    const CommandScope scope(CommandScope::read);
     try {
         const IC::Error result = node.getProperty(id, reading.value);
         if (result.getStatus() != 0) {
             reading.error = errorText(result);
-            reading.missing = result.text() == "no such property: " + std::to_string(id);
+            reading.missing = result.code() == IC::Number(IC::Error::kNoSuchProperty);
         }
     } catch (const std::exception& exception) {
         reading.error = std::string("the plug-in threw: ") + exception.what();
@@ -26,7 +26,7 @@ Reading readProperty(const IC::MutableNode& node, unsigned int id) {
         reading.error = "the plug-in threw an unknown exception";
     }
     // Whatever the plug-in made of a command that was cut off, it is not what the host says.
-    if (std::string complaint = errand.complaint(); !complaint.empty()) {
+    if (std::string complaint = scope.complaint(); !complaint.empty()) {
         reading.value = {};
         reading.error = std::move(complaint);
         reading.missing = false;

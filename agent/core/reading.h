@@ -13,7 +13,7 @@ namespace cvagent {
 /// What reading one property gave.
 struct Reading {
     unsigned int id = 0;
-    std::optional<Property> row;  ///< none: the catalogue does not know the property
+    const Property* row = nullptr;  ///< null: the catalogue does not know the property
     IC::PropertyValue value;
     std::string error;      ///< empty when the read succeeded
     bool missing = false;   ///< it failed because the node has no such property
@@ -26,8 +26,10 @@ struct Reading {
     bool failed() const { return !error.empty(); }
     /// Why there is no value, for people: a property that every node of the class could have is just not
     /// known here.
-    std::string complaint() const { return missing && row ? "not known" : "not known (" + error + ")"; }
-    std::string name() const { return row ? row->name : std::to_string(id); }
+    std::string complaint() const {
+        return missing && row != nullptr ? "not known" : "not known (" + error + ")";
+    }
+    std::string name() const { return row != nullptr ? row->name : std::to_string(id); }
 };
 
 /// Reads one property through the plug-in, on the calling thread. Never throws for what a read does.

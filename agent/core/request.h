@@ -14,7 +14,7 @@ class Request {
 public:
     using Clock = std::chrono::steady_clock;
 
-    /// @param caller for the record: a user, a connection
+    /// @param caller for the record, events of writes carry it: a user, a connection
     /// @param deadline when the caller wants an answer, whatever it is; the default waits for as long as it
     ///                 takes
     explicit Request(std::string caller, Clock::time_point deadline = Clock::time_point::max())

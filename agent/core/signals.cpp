@@ -111,9 +111,13 @@ void waitForSignal() {
 
 }  // namespace
 
-void StopSignals::install() {
+void StopSignals::becomeWriteErrors() {
     handle(SIGPIPE, passOver);
     handle(SIGXFSZ, passOver);
+}
+
+void StopSignals::install() {
+    becomeWriteErrors();
     sem_init(&arrived, 0, 0);
     try {
         std::thread(waitForSignal).detach();

@@ -8,14 +8,15 @@ namespace cvagent {
 /// - at any other time, and when that takes too long, no command begins any more, those that run are killed
 ///   with all they have started, and the program dies by the signal. Nobody waits for the other threads: what
 ///   they hang in may never return.
-/// A second signal changes nothing. SIGHUP stays ignored where the caller ignores it (nohup). SIGPIPE and
-/// SIGXFSZ are made errors of the write. Handlers, unlike ignored or blocked signals, do not reach the
-/// commands the plug-in starts.
+/// A second signal changes nothing. SIGHUP stays ignored where the caller ignores it (nohup). Handlers,
+/// unlike ignored or blocked signals, do not reach the commands the plug-in starts.
 class StopSignals {
 public:
-    /// Installs the handlers and starts the thread that ends the process. To be called once, before the first
-    /// command begins and after what a process does before its first thread. Where the system gives no
-    /// thread, signals keep ending the program at once.
+    /// Makes SIGPIPE and SIGXFSZ errors of the write.
+    static void becomeWriteErrors();
+    /// Installs the handlers, those as well, and starts the thread that ends the process. To be called once,
+    /// before the first command begins and after what a process does before its first thread. Where the
+    /// system gives no thread, signals keep ending the program at once.
     static void install();
     /// The signal that came first, 0 for none yet.
     static int received();

@@ -26,14 +26,15 @@ namespace {
 namespace fs = std::filesystem;
 
 std::atomic<int> keptStandardError{STDERR_FILENO};
+std::atomic<bool> standardOutputClosed{false};
 
 /// The path as it is meant in the directory the program was started in.
 fs::path fromHere(const std::string& path) {
     std::error_code error;
     fs::path whole = fs::absolute(path, error);
     if (error) {
-        throw Problem(Problem::failed, "cannot tell the current directory (" + error.message() +
-                                           "); give the whole path of " + inQuotes(path));
+        throw Problem(Problem::failed, "cannot tell the current directory (" + error.message() + ")",
+                      Problem::currentDirectory, inQuotes(path));
     }
     return whole;
 }
@@ -99,6 +100,7 @@ void forgetSignalsOfTheCaller() {
 }  // namespace
 
 void openStandardDescriptors() {
+    standardOutputClosed = fcntl(STDOUT_FILENO, F_GETFD) < 0;
     int opened = -1;
     do {
         opened = open("/dev/null", O_RDWR);
@@ -109,6 +111,10 @@ void openStandardDescriptors() {
     if (opened > STDERR_FILENO) {
         close(opened);
     }
+}
+
+bool standardOutputWasClosed() {
+    return standardOutputClosed;
 }
 
 void prepareSurroundings(const std::vector<std::string*>& files) {
@@ -169,7 +175,7 @@ int temporaryFileProblem() {
 
 }  // namespace
 
-std::string hintAtReadOnly(const DataDirectory& data) {
+std::string limitsOfData(const DataDirectory& data) {
     if (access(data.path().c_str(), W_OK) == 0) {
         return {};
     }
@@ -177,14 +183,14 @@ std::string hintAtReadOnly(const DataDirectory& data) {
            "; the owner's data cannot be changed, and a change of a link is told again and again";
 }
 
-std::string hintAtTemporaryFiles() {
+std::string limitsOfTmp() {
     const int error = temporaryFileProblem();
     return error == 0 ? std::string()
                       : std::string("cannot write to /tmp: ") + std::strerror(error) +
                             "; drives, partitions and network ports can be missing";
 }
 
-std::string hintAtRoot(const DataDirectory& data) {
+std::string limitsOfUser(const DataDirectory& data) {
     if (geteuid() == 0) {
         return {};
     }

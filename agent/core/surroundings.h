@@ -10,6 +10,8 @@ namespace cvagent {
 /// Opens the descriptors 0 to 2 that the program was started without (to /dev/null): the next file opened
 /// would be taken for one of them. To be called before anything else.
 void openStandardDescriptors();
+/// Whether standard output was one of them: what is written there reaches nobody.
+bool standardOutputWasClosed();
 
 /// Gives the process what the plug-in's commands need, and takes from it what would let others turn them: an
 /// environment of a few variables, a PATH with the sbin directories behind what is there, "/" as the current
@@ -33,16 +35,16 @@ public:
 /// Where the program's own messages go.
 int messageDescriptor();
 
-// What the user is told of the surroundings; "" when there is nothing to tell.
+// What the surroundings leave out; "" when that is nothing.
 
 /// What will be missing without root.
-std::string hintAtRoot(const DataDirectory& data);
+std::string limitsOfUser(const DataDirectory& data);
 
 /// What does not work when nothing can be written to the data directory.
-std::string hintAtReadOnly(const DataDirectory& data);
+std::string limitsOfData(const DataDirectory& data);
 
 /// What is missing when nothing can be written to /tmp, where the plug-in's commands keep their listings. To
 /// be asked after a start: a listing can be what has filled it.
-std::string hintAtTemporaryFiles();
+std::string limitsOfTmp();
 
 }  // namespace cvagent

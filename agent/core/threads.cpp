@@ -1,12 +1,8 @@
 #include "agent/core/threads.h"
 
-#include <dirent.h>
 #include <unistd.h>
 
 #include <algorithm>
-#include <charconv>
-#include <memory>
-#include <string_view>
 
 namespace cvagent {
 
@@ -37,17 +33,7 @@ std::vector<QX::ChildProcess> commandsOf(pid_t thread) {
 }
 
 std::vector<pid_t> ownThreads() {
-    std::vector<pid_t> ids;
-    // Not by the iterators of libstdc++: those end the program when they find no memory.
-    const std::unique_ptr<DIR, int (*)(DIR*)> directory(opendir("/proc/self/task"), closedir);
-    while (const dirent* task = directory != nullptr ? readdir(directory.get()) : nullptr) {
-        const std::string_view name = task->d_name;
-        pid_t id = 0;
-        if (std::from_chars(name.data(), name.data() + name.size(), id).ec == std::errc()) {
-            ids.push_back(id);
-        }
-    }
-    return ids;
+    return QX::numbersIn("/proc/self/task");
 }
 
 }  // namespace cvagent

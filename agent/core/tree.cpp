@@ -1,12 +1,12 @@
 #include "agent/core/tree.h"
 
 #include <algorithm>
-#include <charconv>
 #include <functional>
 #include <optional>
 #include <set>
 
 #include "agent/core/problem.h"
+#include "agent/core/text.h"
 
 namespace cvagent {
 
@@ -20,13 +20,6 @@ std::string pathOf(const IC::MutableNode& node, const Finder& parentOf, int dept
     const Handle parent = depth < kDeepest ? parentOf(node.getLinkedId()) : nullptr;
     const std::string above = parent ? pathOf(*parent, parentOf, depth + 1) : std::string();
     return above + "/" + pathComponent(node);
-}
-
-std::optional<unsigned int> asId(const std::string& text) {
-    unsigned int id = 0;
-    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), id);
-    const bool whole = error == std::errc() && end == text.data() + text.size() && !text.empty();
-    return whole ? std::optional(id) : std::nullopt;
 }
 
 /// Whether a person's word means the node: its whole path or the last part of it.
@@ -54,12 +47,13 @@ Handle withId(const std::vector<Handle>& nodes, unsigned int id) {
 }
 
 [[noreturn]] void failAmbiguous(const std::string& text, const std::vector<Handle>& candidates) {
-    std::string message = "'" + text + "' is the name of " + std::to_string(candidates.size()) +
-                          " nodes; give the id or the path of one of them:";
+    std::string list;
     for (const Handle& node : candidates) {
-        message += "\n  " + std::to_string(node->getNodeId()) + "  " + node->getPath();
+        list += "\n  " + std::to_string(node->getNodeId()) + "  " + node->getPath();
     }
-    throw Problem(Problem::ambiguous, message);
+    throw Problem(Problem::ambiguous,
+                  "'" + text + "' is the name of " + std::to_string(candidates.size()) + " nodes",
+                  Problem::node, list);
 }
 
 }  // namespace
@@ -84,7 +78,7 @@ void setPaths(const IC::ManagementInterface& interface) {
 }
 
 Handle findNode(const std::vector<Handle>& nodes, const std::string& text) {
-    if (const std::optional<unsigned int> id = asId(text)) {
+    if (const std::optional<unsigned int> id = wholeNumber<unsigned int>(text)) {
         if (Handle node = withId(nodes, *id)) {
             return node;
         }
@@ -107,13 +101,13 @@ Handle findNode(const IC::ManagementInterface& interface, const std::string& tex
     return findNode(interface.holdAll(), text);
 }
 
-std::vector<Placed> drawingOrder(const std::vector<Handle>& nodes) {
+std::vector<Placed> drawingOrder(const std::vector<NodeRef>& nodes) {
     std::set<unsigned int> ids;
-    for (const Handle& node : nodes) {
+    for (const NodeRef& node : nodes) {
         ids.insert(node->getNodeId());
     }
-    std::map<unsigned int, std::vector<Handle>> children;  // of parent 0: the nodes at the top
-    for (const Handle& node : nodes) {
+    std::map<unsigned int, std::vector<NodeRef>> children;  // of parent 0: the nodes at the top
+    for (const NodeRef& node : nodes) {
         const unsigned int parent = node->getLinkedId();
         const bool hangs = ids.contains(parent) && parent != node->getNodeId();
         children[hangs ? parent : 0].push_back(node);
@@ -121,9 +115,9 @@ std::vector<Placed> drawingOrder(const std::vector<Handle>& nodes) {
     std::vector<Placed> order;
     const std::function<void(unsigned int, const std::vector<bool>&)> place =
         [&](unsigned int parent, const std::vector<bool>& above) {
-            const std::vector<Handle> siblings = std::move(children[parent]);  // a circle is walked once
+            const std::vector<NodeRef> siblings = std::move(children[parent]);  // a circle is walked once
             children[parent].clear();
-            for (const Handle& node : siblings) {
+            for (const NodeRef& node : siblings) {
                 std::vector<bool> last = above;
                 last.push_back(node == siblings.back());
                 order.push_back({node, last});

@@ -3,7 +3,7 @@
 #include <string>
 #include <vector>
 
-#include "agent/core/node_classes.h"
+#include "agent/core/node_ref.h"
 #include "framework/ic/management_interface.h"
 
 namespace cvagent {
@@ -20,12 +20,12 @@ Handle findNode(const IC::ManagementInterface& interface, const std::string& tex
 
 /// A node with its place in the drawing.
 struct Placed {
-    Handle node;
+    NodeRef node;
     std::vector<bool> last;  ///< for each level down to this node: whether it is the last of its siblings
 };
 
 /// The nodes in the order of the drawing: each under its parent, siblings in the order of the list. A node
 /// whose parent is not listed stands at the top.
-std::vector<Placed> drawingOrder(const std::vector<Handle>& nodes);
+std::vector<Placed> drawingOrder(const std::vector<NodeRef>& nodes);
 
 }  // namespace cvagent

@@ -2,10 +2,13 @@
 
 #include <algorithm>
 #include <cctype>
-#include <charconv>
 #include <stdexcept>
+#include <string_view>
 
+#include "agent/core/text.h"
 #include "framework/qx/date_time.h"
+#include "framework/qx/utf8.h"
+#include "framework/qx/zone_table.h"
 
 namespace cvagent::check {
 
@@ -14,18 +17,11 @@ namespace {
 constexpr std::size_t kLongestOwnerText = 1024;
 constexpr std::size_t kLongestDateTime = 40;
 
-constexpr int kZoneOffsets[] = {-660, -600, -540, -480, -420, -360, -300, -240, -210, -180,
-                                -120, -60,  0,    60,   120,  180,  210,  240,  270,  300,
-                                330,  360,  420,  480,  540,  570,  600,  660,  720};
-
-/// A decimal number as a person writes it: ASCII digits, a minus, nothing else, no needless zeros.
+/// A number as a person writes it: no needless zeros.
 template <class Number>
 std::optional<Number> decimal(const std::string& text) {
-    Number number{};
-    const char* end = text.data() + text.size();
-    const auto [stop, error] = std::from_chars(text.data(), end, number);
-    const bool whole = !text.empty() && error == std::errc() && stop == end;
-    return whole && std::to_string(number) == text ? std::optional(number) : std::nullopt;
+    const auto number = wholeNumber<Number>(text);
+    return number && std::to_string(*number) == text ? number : std::nullopt;
 }
 
 bool sameWord(const std::string& left, const char* right) {
@@ -47,36 +43,6 @@ std::optional<unsigned int> writableCode(const Property& property, Words words) 
     return std::nullopt;
 }
 
-/// The length of the UTF-8 sequence that begins with `lead`; 0 when none can.
-std::size_t sequenceLength(unsigned char lead) {
-    if (lead < 0x80) return 1;
-    if (lead >= 0xC2 && lead < 0xE0) return 2;
-    if (lead >= 0xE0 && lead < 0xF0) return 3;
-    if (lead >= 0xF0 && lead < 0xF5) return 4;
-    return 0;
-}
-
-/// The next character of UTF-8 text; nothing when it is damaged. Advances `at`.
-std::optional<char32_t> nextCharacter(const std::string& text, std::size_t& at) {
-    constexpr char32_t smallest[] = {0, 0, 0x80, 0x800, 0x10000};
-    const auto byte = [&text](std::size_t i) { return static_cast<unsigned char>(text[i]); };
-    const std::size_t length = sequenceLength(byte(at));
-    if (length == 0 || at + length > text.size()) {
-        return std::nullopt;
-    }
-    char32_t character = length == 1 ? byte(at) : byte(at) & (0x7FU >> length);
-    for (std::size_t i = 1; i < length; ++i) {
-        if ((byte(at + i) & 0xC0U) != 0x80U) {
-            return std::nullopt;
-        }
-        character = (character << 6U) | (byte(at + i) & 0x3FU);
-    }
-    at += length;
-    const bool surrogate = character >= 0xD800 && character <= 0xDFFF;
-    const bool valid = character >= smallest[length] && character <= 0x10FFFF && !surrogate;
-    return valid ? std::optional(character) : std::nullopt;
-}
-
 /// Control characters, line and paragraph separators, and those that turn the direction of writing.
 bool isControl(char32_t character) {
     return character < 0x20 || (character >= 0x7F && character < 0xA0) || character == 0x2028 ||
@@ -84,12 +50,13 @@ bool isControl(char32_t character) {
            (character >= 0x2066 && character <= 0x2069);
 }
 
-bool isPlainText(const std::string& text) {
-    for (std::size_t at = 0; at < text.size();) {
-        const std::optional<char32_t> character = nextCharacter(text, at);
-        if (!character || isControl(*character)) {
+bool isPlainText(std::string_view text) {
+    while (!text.empty()) {
+        const QX::Utf8Character next = QX::firstUtf8Character(text);
+        if (next.length == 0 || isControl(next.code)) {
             return false;
         }
+        text.remove_prefix(next.length);
     }
     return true;
 }
@@ -131,14 +98,9 @@ Value dateTime(const Property& /*property*/, Words words) {
 
 Value timeZoneOffset(const Property& /*property*/, Words words) {
     const auto offset = words.size() == 1 ? decimal<int>(words.front()) : std::nullopt;
-    const bool known =
-        offset && std::binary_search(std::begin(kZoneOffsets), std::end(kZoneOffsets), *offset);
+    const bool known = offset && QX::findZone(static_cast<unsigned int>(*offset)) != nullptr;
     // A scaled number keeps the sign that an unsigned one would lose in log lines.
     return known ? Value(IC::PropertyValue(IC::Number(static_cast<long>(*offset), 0), true)) : std::nullopt;
-}
-
-std::span<const int> zoneOffsets() {
-    return kZoneOffsets;
 }
 
 }  // namespace cvagent::check

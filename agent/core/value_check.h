@@ -39,7 +39,4 @@ Value domainName(const Property& property, Words words);
 /// Domain names that together fit a search line; one empty word empties the list.
 Value dnsSuffixes(const Property& property, Words words);
 
-/// The offsets of timeZoneOffset, ascending.
-std::span<const int> zoneOffsets();
-
 }  // namespace cvagent::check

@@ -9,13 +9,8 @@
 #include <array>
 #include <atomic>
 #include <cerrno>
-#include <cstdlib>
 #include <cstring>
-#include <exception>
 #include <mutex>
-#include <new>
-#include <set>
-#include <string_view>
 
 #include "agent/shell/starts.h"
 
@@ -65,85 +60,35 @@ bool fewProcesses() {
     return error == EAGAIN;
 }
 
-/// What the system does not give, and what to do about it.
-struct Want {
+struct Cause {
     int error;
     const char* text;
-    const char* advice;
 };
 
-constexpr std::array<Want, 4> kWants = {
-    {{EMFILE, "there are too few descriptors", "Raise the limit: ulimit -n 256"},
-     {ENFILE, "the system has too many open files", "Raise its limit: sysctl fs.file-max"},
-     {EAGAIN, "the system gives no more processes or threads",
-      "Raise the limits of processes and memory: ulimit -u, ulimit -v, or TasksMax= and MemoryMax= of the "
-      "service"},
-     {ENOMEM, "the system gives no more memory",
-      "Raise the limit of memory: ulimit -v, or MemoryMax= of the service"}}};
+constexpr std::array<Cause, 4> kCauses = {{{EMFILE, "there are too few descriptors"},
+                                           {ENFILE, "the system has too many open files"},
+                                           {EAGAIN, "the system gives no more processes or threads"},
+                                           {ENOMEM, "the system gives no more memory"}}};
 
-const Want* findWant(int error) {
-    const auto row =
-        std::find_if(kWants.begin(), kWants.end(), [error](const Want& want) { return want.error == error; });
-    return row == kWants.end() ? nullptr : &*row;
-}
-
-/// What was wanting, as an errno; 0 for nothing. Looks once for what nobody would tell.
-int cause(const shell::NotStarted& commands) {
-    static const int silent = fewDescriptors() ? EMFILE : (fewProcesses() ? EAGAIN : 0);
-    if (commands.count != 0) {
-        return commands.error;
-    }
-    return noted != 0 ? noted.load() : silent;
+const Cause* findCause(int error) {
+    const auto row = std::ranges::find(kCauses, error, &Cause::error);
+    return row == kCauses.end() ? nullptr : &*row;
 }
 
 std::string causeText(int error) {
-    const Want* want = findWant(error);
-    if (want == nullptr) {
+    const Cause* cause = findCause(error);
+    if (cause == nullptr) {
         return std::string("/bin/sh cannot be started: ") + std::strerror(error);
     }
     rlimit limit{};
     const bool limited = error == EMFILE && getrlimit(RLIMIT_NOFILE, &limit) == 0;
-    return want->text + (limited ? " (limit " + std::to_string(limit.rlim_cur) + ")" : "") + "\n" +
-           want->advice;
-}
-
-/// The classes that every host has nodes of and this tree has none of.
-std::string gaps(const std::vector<Handle>& tree) {
-    std::set<unsigned int> present;
-    for (const Handle& node : tree) {
-        present.insert(node->nodeType());
-    }
-    std::string text;
-    for (const NodeType type :
-         {NodeType::hardDrive, NodeType::networkPort, NodeType::ipConfig, NodeType::processor}) {
-        if (const auto number = static_cast<unsigned int>(type); !present.contains(number)) {
-            text += (text.empty() ? "" : ", ") + className(number);
-        }
-    }
-    return text;
+    return cause->text + (limited ? " (limit " + std::to_string(limit.rlim_cur) + ")" : "");
 }
 
 }  // namespace
 
-void failPlainlyWithoutMemory(int status) {
-    static const int end = status;
-    static const std::terminate_handler other = std::set_terminate([] {
-        try {
-            if (std::current_exception() != nullptr) {
-                throw;
-            }
-        } catch (const std::bad_alloc&) {
-        } catch (...) {
-            other();
-        }
-        constexpr std::string_view kText = "cvagent: the system gives no more memory\n";
-        [[maybe_unused]] const ssize_t written = write(STDERR_FILENO, kText.data(), kText.size());
-        std::_Exit(end);
-    });
-}
-
 void noteWant(int error) {
-    if (findWant(error) != nullptr) {
+    if (findCause(error) != nullptr) {
         noted = error;
     }
 }
@@ -156,26 +101,29 @@ void noteWant(const std::string& errorLine) {
     }
 }
 
-bool tellWant(const std::vector<Handle>* tree, const std::function<void(const std::string&)>& tell) {
-    static int told = 0;
+Want findWant() {
+    static const int silent = fewDescriptors() ? EMFILE : (fewProcesses() ? EAGAIN : 0);
     const shell::NotStarted commands = shell::notStarted();
-    const int error = cause(commands);
-    if (error == 0 || error == told) {
-        return told != 0;
-    }
-    told = error;
-    std::string text;
-    if (const std::string missing = tree != nullptr ? gaps(*tree) : ""; !missing.empty()) {
-        text = "the tree has no " + missing + ", and more can be missing: ";
-    } else if (tree != nullptr) {
-        text = "some of the tree can be missing: ";
-    }
+    Want want{noted != 0 ? noted.load() : silent, commands.count, {}};
     if (commands.count != 0) {
-        text += std::to_string(commands.count) + (commands.count == 1 ? " command" : " commands") +
-                " could not be started, ";
+        want.error = commands.error;
     }
-    tell(text + causeText(error));
-    return true;
+    want.cause = want.error != 0 ? causeText(want.error) : "";
+    return want;
+}
+
+std::vector<std::string> missingClasses(const std::vector<NodeRef>& nodes, bool processors) {
+    std::vector<std::string> missing;
+    for (const NodeClass& nodeClass : nodeClasses()) {
+        const auto isOfIt = [&nodeClass](const NodeRef& node) {
+            return node->nodeType() == static_cast<unsigned int>(nodeClass.type);
+        };
+        const bool wanted = nodeClass.everywhere && (processors || nodeClass.type != NodeType::processor);
+        if (wanted && std::ranges::none_of(nodes, isOfIt)) {
+            missing.emplace_back(nodeClass.name);
+        }
+    }
+    return missing;
 }
 
 }  // namespace cvagent

@@ -20,9 +20,9 @@ IC::Error callSetProperty(IC::MutableNode& node, unsigned int id, const IC::Prop
 
 std::optional<Problem> setGuarded(IC::MutableNode& node, const Property& row,
                                   const IC::PropertyValue& value) {
-    const Errand errand(Errand::write);
+    const CommandScope scope(CommandScope::write);
     const IC::Error result = callSetProperty(node, row.id, value);
-    if (const std::string complaint = errand.complaint(); !complaint.empty()) {
+    if (const std::string complaint = scope.complaint(); !complaint.empty()) {
         return Problem(Problem::timedOut,
                        std::string(row.name) + " may be changed only in part: " + complaint);
     }
@@ -47,7 +47,7 @@ WriteResult::Outcome compare(const Property& row, const IC::PropertyValue& writt
 
 struct Writer::Job {
     Handle node;
-    Property row;
+    const Property& row;
     IC::PropertyValue value;
 };
 
@@ -56,21 +56,29 @@ class Writer::Turn {
 public:
     Turn(Writer& writer, Request::Clock::time_point deadline) : writer_(writer) {
         std::unique_lock lock(writer_.guard_);
-        if (!waitFor(writer_.turnOver_, lock, deadline, [this] { return !writer_.busy_; })) {
+        const bool patient = deadline == Request::Clock::time_point::max();
+        waitFor(writer_.turnOver_, lock, deadline,
+                [&] { return !writer_.busy_ || (patient && writer_.givenUp_); });
+        if (writer_.busy_) {
             throw Problem(Problem::busy, "another write is at work");
         }
         writer_.busy_ = true;
+        number_ = ++writer_.turns_;
     }
     Turn(const Turn&) = delete;
     Turn& operator=(const Turn&) = delete;
     ~Turn() {
         const std::lock_guard lock(writer_.guard_);
         writer_.busy_ = false;
+        writer_.givenUp_ = false;
         writer_.turnOver_.notify_one();
     }
 
+    std::uint64_t number() const { return number_; }
+
 private:
     Writer& writer_;
+    std::uint64_t number_ = 0;
 };
 
 /// Where the result of a write goes, whether somebody still waits for it or not.
@@ -91,7 +99,11 @@ struct Writer::Pending {
 
 WriteResult Writer::write(const Handle& node, const Property& row, const IC::PropertyValue& value,
                           const Request& request) {
+    if (request.deadline() <= Request::Clock::now()) {
+        return timedOut(*node, row, false);
+    }
     auto turn = std::make_shared<Turn>(*this, request.deadline());
+    const std::uint64_t number = turn->number();
     const auto pending = std::make_shared<Pending>();
     pool_.submit(kWrites, pending.get(),
                  [job = Job{node, row, value}, turn = std::move(turn), pending, request, this]() mutable {
@@ -106,18 +118,31 @@ WriteResult Writer::write(const Handle& node, const Property& row, const IC::Pro
                      pending->come.notify_one();
                  });
     std::unique_lock lock(pending->guard);
-    if (waitFor(pending->come, lock, request.deadline(),
-                [&pending] { return pending->result.has_value(); })) {
+    if (pool_.wait(pending->come, lock, request.deadline(),
+                   [&pending] { return pending->result.has_value(); })) {
         return *std::move(pending->result);
     }
     pending->givenUp = true;
     const bool begun = pending->begun;
+    if (begun) {
+        giveUp(number);
+    }
     lock.unlock();
-    pool_.drop(pending.get());
+    pool_.giveUp(pending.get());
+    return timedOut(*node, row, begun);
+}
+
+void Writer::giveUp(std::uint64_t turn) {
+    const std::lock_guard lock(guard_);
+    givenUp_ = givenUp_ || (busy_ && turn == turns_);  // it may have ended just now, and another one begun
+    turnOver_.notify_all();
+}
+
+WriteResult Writer::timedOut(const IC::MutableNode& node, const Property& row, bool begun) {
     const char* const came = begun ? " may be changed later or in part" : " was not changed";
     const auto doubtful = begun ? Facts::Clock::now() : Facts::Clock::time_point::min();
     WriteResult result;
-    result.before = result.after = facts_.overdue(*node, row.id, doubtful);
+    result.before = result.after = facts_.overdue(node, row.id, doubtful);
     result.problem = Problem(Problem::timedOut, row.name + std::string(came) + ": no answer in time");
     return result;
 }
@@ -126,30 +151,29 @@ WriteResult Writer::perform(const Job& job, const Request& request) {
     const ErrorScope scope(request.errors());
     const Property& row = job.row;
     WriteResult result;
-    result.before.id = row.id;
-    if (row.readable()) {
-        result.before = readHere(*job.node, row.id);
-    }
-    result.problem = setGuarded(*job.node, row, job.value);
-    refresh_();
-    if (result.problem && result.problem->kind() == Problem::failed) {
-        result.after = {row.id, row, {}, "not asked"};
+    result.before = {row.id, &row, {}, "not asked"};
+    if (!tree_.lists(job.node)) {
+        result.after = result.before;
+        result.problem =
+            Problem(Problem::notFound, row.name + std::string(" was not changed: the node is gone"));
         return result;
     }
-    result.after = {row.id, row, {}, result.problem ? "cut off" : "can only be written"};
-    if (!result.problem && row.readable()) {
-        result.after = readHere(*job.node, row.id);
+    if (row.readable) {
+        result.before = facts_.ask(*job.node, row.id);
+    }
+    result.problem = setGuarded(*job.node, row, job.value);
+    tree_.refresh();
+    if (result.problem && result.problem->kind() == Problem::failed) {
+        result.after = {row.id, &row, {}, "not asked"};
+        return result;
+    }
+    result.after = {row.id, &row, {}, result.problem ? "cut off" : "can only be written"};
+    if (!result.problem && row.readable) {
+        result.after = facts_.ask(*job.node, row.id);
         result.outcome = compare(row, job.value, result.after);
     }
-    announcer_.announceWrite(*job.node, result.before, result.after);
+    announcer_.announceWrite(*job.node, result.before, result.after, request.caller());
     return result;
-}
-
-Reading Writer::readHere(const IC::MutableNode& node, unsigned int id) {
-    const auto begun = Facts::Clock::now();
-    Reading reading = readProperty(node, id);
-    facts_.judge(node, reading, begun);
-    return reading;
 }
 
 }  // namespace cvagent

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <condition_variable>
+#include <cstdint>
 #include <functional>
 #include <memory>
 #include <mutex>
@@ -32,15 +33,23 @@ struct WriteResult {
 /// two at once would lose lines. Reads go on beside it. Any thread.
 class Writer {
 public:
-    /// All outlive the writer. @param refresh what to do after each write, before its event is told
-    Writer(Pool& pool, Facts& facts, Announcer& announcer, std::function<void()> refresh)
-        : pool_(pool), facts_(facts), announcer_(announcer), refresh_(std::move(refresh)) {}
+    /// The tree that is written to.
+    struct Tree {
+        std::function<void()> refresh;  ///< what to do after each write, before its event is told
+        std::function<bool(const Handle&)> lists;
+    };
+
+    /// All outlive the writer.
+    Writer(Pool& pool, Facts& facts, Announcer& announcer, Tree tree)
+        : pool_(pool), facts_(facts), announcer_(announcer), tree_(std::move(tree)) {}
     Writer(const Writer&) = delete;
     Writer& operator=(const Writer&) = delete;
 
     /// @param node kept until the write is done. A write that hangs at its caller's deadline goes on, and no
-    ///             other one begins before its end; one that has not begun by then never does.
-    /// Throws Problem (busy) when another write is at work until the deadline.
+    ///             other one begins before its end; one that has not begun by then never does. A node
+    ///             that was withdrawn before the turn of the write is not written to (notFound).
+    /// Throws Problem (busy) when another write is at work until the deadline; without a deadline, when the
+    /// other one's caller has given it up, for it may hang for ever.
     WriteResult write(const Handle& node, const Property& row, const IC::PropertyValue& value,
                       const Request& request);
 
@@ -50,15 +59,18 @@ private:
     class Turn;
 
     WriteResult perform(const Job& job, const Request& request);
-    Reading readHere(const IC::MutableNode& node, unsigned int id);
+    void giveUp(std::uint64_t turn);
+    WriteResult timedOut(const IC::MutableNode& node, const Property& row, bool begun);
 
     Pool& pool_;
     Facts& facts_;
     Announcer& announcer_;
-    std::function<void()> refresh_;
-    std::mutex guard_;
+    Tree tree_;
+    std::mutex guard_;  // guards everything below
     std::condition_variable turnOver_;
-    bool busy_ = false;  // guarded by guard_
+    bool busy_ = false;
+    std::uint64_t turns_ = 0;
+    bool givenUp_ = false;  // the write at work is
 };
 
 }  // namespace cvagent

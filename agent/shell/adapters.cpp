@@ -13,6 +13,7 @@
 
 #include "agent/shell/kernel_news.h"
 #include "hosttools/applet.h"
+#include "hosttools/wired.h"
 
 namespace cvagent::shell {
 
@@ -84,7 +85,7 @@ std::shared_ptr<const Printed> run(const std::string& name, Arguments words, Kno
     std::ranges::transform(words, std::back_inserter(texts), &std::string::c_str);
     hosttools::Answer answer;
     const int status = tool->run(texts, host, answer);
-    if (host.hasRefused()) {
+    if (host.hasRefused() || answer.beyond) {
         return nullptr;
     }
     return std::make_shared<const Printed>(Printed{answer.out.str(), status, answer.errors.size() > 0});
@@ -110,7 +111,8 @@ public:
             return known->second;
         }
         auto answer = run(name, words, host_);
-        if (constexpr std::size_t kMost = 4096; answer->status == 0 && answers_.size() < kMost) {
+        if (constexpr std::size_t kMost = 4096;
+            answer != nullptr && answer->status == 0 && answers_.size() < kMost) {
             answers_.emplace(std::move(key), answer);
         }
         return answer;
@@ -145,8 +147,14 @@ bool isNetworkListing(const std::string& name, Arguments words) {
     return name == "route" && (ipv6 || (words.size() == 1 && words.front() == "-n"));
 }
 
-bool isDiskListing(const std::string& name, Arguments words) {
-    return name == "fdisk" && words.size() == 1 && words.front().starts_with("-l");
+/// What is asked anew each time: news of a disk there are none, and those of a carrier may lag behind it.
+bool isFreshListing(const std::string& name, Arguments words) {
+    if (words.size() == 1) {
+        return (name == "fdisk" && words.front().starts_with("-l")) ||
+               (name == "ethtool" && !words.front().starts_with('-')) ||
+               (name == "brctl" && words.front() == "show");
+    }
+    return name == "egrep" && words.size() == 2 && words[0] == "eth|bond|usb" && words[1] == "/proc/net/dev";
 }
 
 }  // namespace
@@ -156,12 +164,16 @@ std::unique_ptr<Source> askAdapter(const std::string& name, std::span<const std:
     if (isNetworkListing(name, words)) {
         static NetworkAnswers answers;
         printed = answers.ask(name, words);
-    } else if (isDiskListing(name, words)) {
+    } else if (isFreshListing(name, words)) {
         KnownHost host;
         printed = run(name, words, host);
     }
     const bool fits = printed != nullptr && (silent || !printed->complains);
     return fits ? std::make_unique<SharedText>(std::move(printed)) : nullptr;
+}
+
+bool haveClassicNames() {
+    return hosttools::haveClassicNames();
 }
 
 }  // namespace cvagent::shell

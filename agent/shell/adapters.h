@@ -14,4 +14,7 @@ namespace cvagent::shell {
 /// complaint that somebody may see, and where a disk would have to be opened
 std::unique_ptr<Source> askAdapter(const std::string& name, std::span<const std::string> words, bool silent);
 
+/// Whether the host's own tools find all wired interfaces by the names that these classically have.
+bool haveClassicNames();
+
 }  // namespace cvagent::shell

@@ -17,7 +17,9 @@ namespace {
 
 constexpr int kShellFailure = 2;
 constexpr unsigned kStatusShift = 8;
-constexpr auto kChangeTools = std::to_array<const char*>({"GREP_OPTIONS", "MAWKBINMODE", "POSIXLY_CORRECT"});
+constexpr auto kChangeTools =
+    std::to_array<const char*>({"AWKBUFSIZE", "GAWK_PERSIST_FILE", "GAWK_READ_TIMEOUT", "GREP_OPTIONS",
+                                "MAWKBINMODE", "POSIXLY_CORRECT"});
 
 /// The value of the first of these variables that has one.
 std::string_view firstSet(std::initializer_list<const char*> variables) {
@@ -56,6 +58,17 @@ Outcome Command::startNext() {
     return outcome;
 }
 
+/// A shell that cannot start a tool ends there.
+bool Command::startFurther() {
+    if (startNext().kind == Outcome::started) {
+        return true;
+    }
+    current_.reset();
+    next_ = plan_.size();
+    status_ = kShellFailure;
+    return false;
+}
+
 Outcome Command::begin() noexcept {
     try {
         auto plan = toolsAreAsUsual() ? readPlan(text_) : std::nullopt;
@@ -90,11 +103,10 @@ ssize_t Command::read(char* buffer, std::size_t size) noexcept {
                 break;
             }
             // The last pipeline is waited for when its output is closed, not when it ends.
-            ended_ = !hasMore() || killed_;
+            ended_ = !hasMore();
             if (!ended_) {
                 endCurrent(false);
-                ended_ = killed_ || startNext().kind != Outcome::started;
-                status_ = ended_ ? kShellFailure : status_;
+                ended_ = killed_ || !startFurther();
             }
         }
         const std::size_t given = std::min(size, pending_.size());
@@ -113,10 +125,8 @@ int Command::finish() noexcept {
     try {
         endCurrent(!ended_);
         while (hasMore() && !killed_) {
-            if (startNext().kind == Outcome::started) {
+            if (startFurther()) {
                 endCurrent(true);
-            } else {
-                status_ = kShellFailure;
             }
         }
     } catch (const std::exception&) {

@@ -31,6 +31,7 @@ public:
 private:
     bool hasMore() const { return next_ < plan_.size(); }
     Outcome startNext();
+    bool startFurther();
     void endCurrent(bool unread);
 
     std::string text_;

@@ -8,12 +8,12 @@
 #include <array>
 #include <cerrno>
 #include <cstdlib>
+#include <cstring>
 #include <utility>
 
 #include "agent/shell/adapters.h"
 #include "agent/shell/filters/filters.h"
 #include "agent/shell/local_file.h"
-#include "agent/shell/programs.h"
 #include "agent/shell/starts.h"
 
 namespace cvagent::shell {
@@ -42,21 +42,33 @@ FirstStage answered(std::unique_ptr<Source> source) {
 
 class FileSource : public Source {
 public:
-    explicit FileSource(Descriptor file) : file_(std::move(file)) {}
+    /// @param complaint what the tool says before the reason when it cannot read on; "" for nothing
+    /// @param isGreps grep reads it itself, and ends by it
+    FileSource(Descriptor file, std::string complaint, bool isGreps)
+        : file_(std::move(file)), complaint_(std::move(complaint)), isGreps_(isGreps) {}
     bool pull(std::string& out) override {
         const std::size_t before = out.size();
         out.resize(before + kChunk);
         const ssize_t got = read(file_.get(), out.data() + before, kChunk);
+        failed_ = got < 0;
+        if (failed_ && !complaint_.empty()) {
+            const std::string text = complaint_ + std::strerror(errno) + '\n';
+            [[maybe_unused]] const ssize_t written = write(STDERR_FILENO, text.data(), text.size());
+        }
         out.resize(before + (got > 0 ? static_cast<std::size_t>(got) : 0));
         read_ += std::max<ssize_t>(got, 0);
         // What grows while it is read must not hold this thread, which nobody can kill.
-        status_ = got < 0 || read_ > kLargestFile ? 1 : 0;
+        status_ = failed_ || read_ > kLargestFile ? 1 : 0;
         return got > 0 && read_ <= kLargestFile;
     }
+    bool failed() const override { return failed_ && isGreps_; }
     int status() const override { return status_; }
 
 private:
     Descriptor file_;
+    std::string complaint_;
+    bool isGreps_;
+    bool failed_ = false;
     off_t read_ = 0;
     int status_ = 0;
 };
@@ -78,10 +90,15 @@ bool isPlainPath(const std::string& path) {
     return path.starts_with('/') && !path.starts_with("/proc/self") && !path.starts_with("/proc/thread-self");
 }
 
-FirstStage fileOr(const std::string& path, std::unique_ptr<Filter> filter, bool silent, int statusWhenMissing,
-                  off_t most) {
+FirstStage fileOr(const std::string& path, std::unique_ptr<Filter> filter, Manner manner,
+                  int statusWhenMissing, off_t most) {
+    if (manner.busybox && !manner.silent) {
+        return {};
+    }
     LocalFile file = openForReading(path, most);
-    if (file.outcome == LocalFile::missing && silent) {
+    // Why there is nothing to read decides how busybox's grep ends.
+    const bool sameEnd = filter == nullptr || !manner.busybox;
+    if (file.outcome == LocalFile::missing && manner.silent && sameEnd) {
         return answered(std::make_unique<TextSource>("", statusWhenMissing));
     }
     if (file.outcome == LocalFile::large) {
@@ -90,7 +107,9 @@ FirstStage fileOr(const std::string& path, std::unique_ptr<Filter> filter, bool 
     if (file.outcome != LocalFile::opened) {
         return refused();
     }
-    auto source = std::make_unique<FileSource>(std::move(file.descriptor));
+    const bool isGreps = filter != nullptr;
+    const std::string complaint = manner.silent ? "" : (isGreps ? "grep: " : "cat: ") + path + ": ";
+    auto source = std::make_unique<FileSource>(std::move(file.descriptor), complaint, isGreps);
     if (filter == nullptr) {
         return answered(std::move(source));
     }
@@ -98,31 +117,31 @@ FirstStage fileOr(const std::string& path, std::unique_ptr<Filter> filter, bool 
     return answered(std::move(filter));
 }
 
-FirstStage catFile(Words words, bool silent) {
+FirstStage catFile(Words words, Manner manner) {
     return words.size() == 1 && isPlainPath(words.front())
-               ? fileOr(words.front(), nullptr, silent, 1, kLargestFile)
+               ? fileOr(words.front(), nullptr, manner, 1, kLargestFile)
                : FirstStage{};
 }
 
-FirstStage grepFile(Words words, bool silent, Dialect dialect) {
+FirstStage grepFile(Words words, Manner manner, Dialect dialect) {
     if (words.size() < 2 || !isPlainPath(words.back())) {
         return {};
     }
-    auto filter = makeGrepOf(words.back(), words.first(words.size() - 1), dialect, silent);
-    return filter != nullptr ? fileOr(words.back(), std::move(filter), silent, 2, kLargestForGrep)
+    auto filter = makeGrepOf(words.back(), words.first(words.size() - 1), dialect, manner);
+    return filter != nullptr ? fileOr(words.back(), std::move(filter), manner, 2, kLargestForGrep)
                              : FirstStage{};
 }
 
-FirstStage basicGrepFile(Words words, bool silent) {
-    return grepFile(words, silent, Dialect::basic);
+FirstStage basicGrepFile(Words words, Manner manner) {
+    return grepFile(words, manner, Dialect::basic);
 }
 
-FirstStage extendedGrepFile(Words words, bool silent) {
-    return grepFile(words, silent, Dialect::extended);
+FirstStage extendedGrepFile(Words words, Manner manner) {
+    return grepFile(words, manner, Dialect::extended);
 }
 
 /// `rm FILE` and `rm -rf FILE`. What rm would ask before is not done here.
-FirstStage removeFile(Words words, bool silent) {
+FirstStage removeFile(Words words, Manner manner) {
     const bool force = !words.empty() && words.front() == "-rf";
     words = words.subspan(force ? 1 : 0);
     if (words.size() != 1 || !isPlainPath(words.front())) {
@@ -130,7 +149,7 @@ FirstStage removeFile(Words words, bool silent) {
     }
     const std::string& path = words.front();
     const LocalFile::Outcome found = removable(path);
-    if (found == LocalFile::missing && (force || silent)) {
+    if (found == LocalFile::missing && (force || manner.silent)) {
         return answered(std::make_unique<TextSource>("", force ? 0 : 1));
     }
     const bool asks = !force && isatty(STDIN_FILENO) != 0 && access(path.c_str(), W_OK) != 0;
@@ -142,7 +161,7 @@ FirstStage removeFile(Words words, bool silent) {
 
 struct FileTool {
     std::string_view name;
-    FirstStage (*stage)(Words words, bool silent);
+    FirstStage (*stage)(Words words, Manner manner);
 };
 constexpr auto kFileTools = std::to_array<FileTool>(
     {{"cat", catFile}, {"egrep", extendedGrepFile}, {"grep", basicGrepFile}, {"rm", removeFile}});
@@ -157,8 +176,10 @@ FirstStage standIn(const FirstStageRequest& request, const Program& program, boo
         return {{}, askAdapter(request.words.front(), words, silent)};
     }
     for (const FileTool& tool : kFileTools) {
-        if (program.kind == Program::known && tool.name == request.words.front()) {
-            return tool.stage(words, silent);
+        // What busybox says of a write that fails is its own.
+        const bool busybox = program.kind == Program::busybox && request.output < 0;
+        if ((busybox || program.kind == Program::known) && tool.name == request.words.front()) {
+            return tool.stage(words, {silent, busybox});
         }
     }
     return {};
@@ -192,12 +213,12 @@ bool nullDeviceIsThere() {
     return stat("/dev/null", &file) == 0 && isNullDevice(file);
 }
 
-FirstStage startFirstStage(const FirstStageRequest& request) {
+FirstStage startFirstStage(const FirstStageRequest& request, ProgramSearch& programs) {
     if (request.words.front() == "echo") {
         return !request.isRead ? refused() : echo(Words(request.words).subspan(1));
     }
     const bool silent = request.silent || complaintsGoNowhere();
-    const Program program = findProgram(request.words.front());
+    const Program program = programs.find(request.words.front());
     if (program.kind == Program::missing && silent) {
         return answered(std::make_unique<TextSource>("", kNotFound));
     }

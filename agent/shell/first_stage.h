@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "agent/shell/child.h"
+#include "agent/shell/programs.h"
 #include "agent/shell/source.h"
 
 namespace cvagent::shell {
@@ -36,7 +37,7 @@ struct FirstStageRequest {
 };
 
 /// Starts a tool, or stands in for it.
-FirstStage startFirstStage(const FirstStageRequest& request);
+FirstStage startFirstStage(const FirstStageRequest& request, ProgramSearch& programs);
 
 /// Starts a shell for a text.
 /// @param argument its $1

@@ -55,6 +55,9 @@ public:
                 return false;
             }
         } while (take('|'));
+        if (pipeline.stages.size() == 1 && !pipeline.stages.front().pattern.empty()) {
+            return false;
+        }
         pipeline.text = text_.substr(begin, at_ - begin);
         if (insertedEnd_ > begin) {
             pipeline.behindInserted = text_.substr(insertedEnd_, at_ - insertedEnd_);
@@ -67,10 +70,18 @@ public:
 private:
     bool readStage(Pipeline& pipeline, std::size_t begin) {
         Stage& stage = pipeline.stages.emplace_back();
+        const std::size_t start = at_;
+        hasPattern_ = false;
         for (passBlanks(); !atEnd() && text_[at_] != '|' && text_[at_] != ';'; passBlanks()) {
             const bool known = text_[at_] == '>' || text_.substr(at_, 2) == "2>" ? readRedirection(stage)
                                                                                  : readWord(pipeline, begin);
             if (!known) {
+                return false;
+            }
+        }
+        if (hasPattern_) {
+            stage.pattern = text_.substr(start, at_ - start);
+            if (pipeline.stages.size() > 1 || insertedEnd_ > begin) {
                 return false;
             }
         }
@@ -110,7 +121,7 @@ private:
     bool readWord(Pipeline& pipeline, std::size_t begin) {
         Word& word = pipeline.stages.back().words.emplace_back();
         const std::size_t start = at_;
-        while (readPiece(word.text)) {
+        while (readPiece(word.text) || readPattern(pipeline.stages.back())) {
         }
         if (!atEnd() && text_[at_] == '`') {
             const bool first = pipeline.stages.size() == 1 && pipeline.beforeInserted.empty();
@@ -161,6 +172,13 @@ private:
         }
         text += text_.substr(begin, at_ - begin);
         return at_ > begin;
+    }
+
+    /// A tool's name is no pattern, and neither is a file to write to.
+    bool readPattern(const Stage& stage) {
+        const bool found = stage.words.size() > 1 && take('*');
+        hasPattern_ = hasPattern_ || found;
+        return found;
     }
 
     /// A quote that does not end, or holds what the shell would read, is left where it is: no word ends
@@ -215,6 +233,7 @@ private:
     std::string_view text_;
     std::size_t at_ = 0;
     std::size_t insertedEnd_ = 0;
+    bool hasPattern_ = false;  ///< in the stage that is being read
 };
 
 }  // namespace

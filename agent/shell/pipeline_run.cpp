@@ -12,7 +12,6 @@
 
 #include "agent/shell/filters/filters.h"
 #include "agent/shell/local_file.h"
-#include "agent/shell/programs.h"
 
 namespace cvagent::shell {
 
@@ -23,7 +22,7 @@ constexpr std::size_t kMostInserted = 1UL << 20U;
 
 struct FilterTool {
     std::string_view name;
-    std::unique_ptr<Filter> (*make)(Words words, bool silent);
+    std::unique_ptr<Filter> (*make)(Words words, Manner manner);
 };
 constexpr auto kFilters = std::to_array<FilterTool>({{"awk", makeAwk},
                                                      {"cat", makeCat},
@@ -40,13 +39,19 @@ std::vector<std::string> textsOf(const std::vector<Word>& words) {
     return texts;
 }
 
-std::unique_ptr<Filter> makeFilter(const Stage& stage) {
+std::unique_ptr<Filter> makeFilter(const Stage& stage, ProgramSearch& programs) {
     const std::vector<std::string> words = textsOf(stage.words);
     const auto* const tool = std::ranges::find(kFilters, words.front(), &FilterTool::name);
-    if (tool == kFilters.end() || findProgram(words.front()).kind != Program::known) {
+    if (tool == kFilters.end()) {
         return nullptr;
     }
-    return tool->make(Words(words).subspan(1), stage.silent);
+    const Program::Kind kind = programs.find(words.front()).kind;
+    const bool busybox = kind == Program::busybox;
+    // What it says of a write that fails is its own.
+    if ((!busybox && kind != Program::known) || (busybox && stage.output)) {
+        return nullptr;
+    }
+    return tool->make(Words(words).subspan(1), {stage.silent, busybox});
 }
 
 /// The words that a shell makes of a word with something inserted: divided at blanks.
@@ -74,7 +79,7 @@ bool writeAll(int descriptor, std::string_view text) {
 
 }  // namespace
 
-Outcome PipelineRun::makeFilters() {
+Outcome PipelineRun::makeFilters(ProgramSearch& programs) {
     for (const Stage& stage : pipeline_->stages) {
         if (stage.silent && !nullDeviceIsThere()) {
             return {Outcome::refused};
@@ -82,7 +87,7 @@ Outcome PipelineRun::makeFilters() {
         if (&stage == &pipeline_->stages.front()) {
             continue;
         }
-        filters_.push_back(makeFilter(stage));
+        filters_.push_back(makeFilter(stage, programs));
         if (filters_.back() == nullptr) {
             return {Outcome::refused};
         }
@@ -110,20 +115,25 @@ Outcome PipelineRun::start(const Pipeline& pipeline) {
     if (last.output && (last.words.front().text == "echo" || last.words.front().text == "awk")) {
         return {Outcome::refused};
     }
-    if (const Outcome made = makeFilters(); made.kind != Outcome::started) {
+    ProgramSearch programs;
+    if (const Outcome made = makeFilters(programs); made.kind != Outcome::started) {
         return made;
     }
-    const auto& words = pipeline.stages.front().words;
+    const Stage& first = pipeline.stages.front();
+    if (!first.pattern.empty()) {
+        return startPattern(first, programs);
+    }
+    const auto& words = first.words;
     const auto inserted =
         std::ranges::find_if(words, [](const Word& word) { return word.inserted != nullptr; });
     if (inserted == words.end()) {
-        return startFirst(textsOf(words));
+        return startFirst(textsOf(words), programs);
     }
     inner_ = std::make_unique<PipelineRun>(command_, -1);
     return inner_->start(*inserted->inserted);
 }
 
-Outcome PipelineRun::startFirst(std::vector<std::string> words) {
+Outcome PipelineRun::startFirst(std::vector<std::string> words, ProgramSearch& programs) {
     if (const Outcome opened = openOutput(); opened.kind != Outcome::started) {
         return opened;
     }
@@ -133,8 +143,22 @@ Outcome PipelineRun::startFirst(std::vector<std::string> words) {
     // A tool notices, or is killed, that reads what it prints.
     const bool isOwn = written && std::ranges::find(words, written->path) != words.end();
     const bool isRead = !isOwn && (standardOutput_ < 0 || file_.isOpen());
-    return take(
-        startFirstStage({std::move(words), pipeline_->stages.front().silent, command_, output, isRead}));
+    return take(startFirstStage(
+        {std::move(words), pipeline_->stages.front().silent, command_, output, isRead}, programs));
+}
+
+/// A shell finds the files, then becomes the tool.
+Outcome PipelineRun::startPattern(const Stage& stage, ProgramSearch& programs) {
+    const Program program = programs.find(stage.words.front().text);
+    // A shell's own echo is not the tool.
+    if (program.kind == Program::missing || program.kind == Program::unclear ||
+        stage.words.front().text == "echo") {
+        return {Outcome::refused};
+    }
+    const Outcome opened = openOutput();
+    return opened.kind != Outcome::started
+               ? opened
+               : take(startShell({{}, false, command_, -1}, "exec " + stage.pattern));
 }
 
 Outcome PipelineRun::startInShell(const Pipeline& pipeline) {
@@ -190,7 +214,8 @@ void PipelineRun::substitute(const std::string& printed) {
         }
     }
     const bool plain = text.find_first_of("*?[\\") == std::string::npos;
-    const Outcome outcome = plain ? startFirst(std::move(words)) : Outcome{Outcome::refused};
+    ProgramSearch programs;
+    const Outcome outcome = plain ? startFirst(std::move(words), programs) : Outcome{Outcome::refused};
     if (outcome.kind == Outcome::refused) {
         // The tool in backquotes has run and is not run again: a shell gets what it printed.
         filters_.clear();

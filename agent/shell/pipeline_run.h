@@ -33,9 +33,10 @@ public:
     Child::End finish(bool unread);
 
 private:
-    Outcome makeFilters();
+    Outcome makeFilters(ProgramSearch& programs);
     Outcome openOutput();
-    Outcome startFirst(std::vector<std::string> words);
+    Outcome startFirst(std::vector<std::string> words, ProgramSearch& programs);
+    Outcome startPattern(const Stage& stage, ProgramSearch& programs);
     Outcome take(FirstStage first);
     bool resolve();
     void substitute(const std::string& printed);

@@ -28,6 +28,7 @@ struct Stage {
     std::vector<Word> words;
     std::optional<Redirection> output;
     bool silent = false;  ///< standard error goes to /dev/null
+    std::string pattern;  ///< the stage as it was written, if it has a pattern of file names in it
 };
 
 struct Pipeline {
@@ -43,9 +44,10 @@ using Plan = std::vector<Pipeline>;
 
 /// Reads a command line: pipelines divided by `;`, stages by `|`; at the end of the last stage of a pipeline
 /// `> FILE` or `>> FILE`, in any stage `2> /dev/null`; words bare, in 'quotes' or in "quotes"; in one word of
-/// a pipeline's first stage a pipeline in backquotes.
-/// @return nothing for whatever else a shell would understand: variables, patterns of file names, conditions,
-/// its own words and commands. That is for the shell to run.
+/// a pipeline's first stage a pipeline in backquotes; in the words of a first stage with others behind it `*`
+/// among bare letters.
+/// @return nothing for whatever else a shell would understand: variables, other patterns of file names,
+/// conditions, its own words and commands. That is for the shell to run.
 std::optional<Plan> readPlan(std::string_view text);
 
 }  // namespace cvagent::shell

@@ -7,11 +7,12 @@
 #include <algorithm>
 #include <array>
 #include <cerrno>
+#include <chrono>
 #include <cstdlib>
+#include <ctime>
 #include <map>
 #include <mutex>
-#include <optional>
-#include <tuple>
+#include <utility>
 
 #include "agent/shell/descriptor.h"
 
@@ -34,7 +35,11 @@ constexpr std::string_view kCoreutils("\0GNU coreutils\0", 15);
 /// Older releases print this complaint, worded otherwise, among what they find.
 constexpr std::string_view kGrep = ": binary file matches";
 constexpr std::string_view kEgrepScript = "exec grep -E \"$@\"\n";
+/// Its own tools differ from release to release and from build to build.
+constexpr std::string_view kBusybox("\0BusyBox v1.35.0 (Debian ", 25);
+constexpr std::string_view kGawk("\0GNU Awk ", 9);
 constexpr auto kKnown = std::to_array<Known>({{"awk", "Thomas E. Dickey"},
+                                              {"awk", kGawk},
                                               {"cat", kCoreutils},
                                               {"cut", kCoreutils},
                                               {"egrep", kGrep},
@@ -44,8 +49,7 @@ constexpr auto kKnown = std::to_array<Known>({{"awk", "Thomas E. Dickey"},
                                               {"sha1sum", kCoreutils},
                                               {"tr", kCoreutils}});
 
-/// A file by what changes when another one takes its place.
-using Identity = std::tuple<dev_t, ino_t, off_t, time_t, long, time_t, long>;
+using Identity = FileIdentity;
 
 Identity identityOf(const struct stat& file) {
     return {file.st_dev,          file.st_ino,         file.st_size,        file.st_mtim.tv_sec,
@@ -76,18 +80,25 @@ bool isEgrepScript(std::string_view content) {
            content.ends_with(kEgrepScript) && content.find("obsolescent") == std::string_view::npos;
 }
 
-bool holds(const Known& known, std::string_view content) {
+Program::Kind kindIn(const std::string& name, std::string_view content) {
     if (content.starts_with(kScript)) {
-        return known.name == "egrep" && isEgrepScript(content);
+        return name == "egrep" && isEgrepScript(content) ? Program::known : Program::tool;
     }
-    return content.starts_with(kBinary) && content.find(known.mark) != std::string::npos;
+    if (!content.starts_with(kBinary)) {
+        return Program::tool;
+    }
+    const bool known = std::ranges::any_of(kKnown, [&](const Known& one) {
+        return one.name == name && content.find(one.mark) != std::string::npos;
+    });
+    const bool busybox = content.find(kBusybox) != std::string::npos;
+    return known ? Program::known : busybox ? Program::busybox : Program::tool;
 }
 
 /// What was found out about files, by what identifies them.
 class Memory {
 public:
-    bool isKnown(const Known& known, const std::string& path, const struct stat& file) {
-        const auto key = std::pair(known.name, identityOf(file));
+    Program::Kind kindOf(const std::string& name, const std::string& path, const struct stat& file) {
+        const auto key = std::pair(name, identityOf(file));
         {
             const std::lock_guard lock(guard_);
             if (const auto found = answers_.find(key); found != answers_.end()) {
@@ -95,7 +106,7 @@ public:
             }
         }
         const std::string content = beginningOf(path);
-        const bool answer = holds(known, content);
+        const Program::Kind answer = kindIn(name, content);
         const std::lock_guard lock(guard_);
         constexpr std::size_t kMost = 1000;
         // A file that could not be read for want of descriptors can be read later.
@@ -116,10 +127,25 @@ public:
         return adapters_ == identityOf(file);
     }
 
+    /// A directory that is the same as then has no such file yet.
+    bool isAbsent(const std::string& path, const Identity& directory) {
+        const std::lock_guard lock(guard_);
+        const auto found = absent_.find(path);
+        return found != absent_.end() && found->second == directory;
+    }
+    void noteAbsent(const std::string& path, const Identity& directory) {
+        constexpr std::size_t kMost = 1000;
+        const std::lock_guard lock(guard_);
+        if (absent_.size() < kMost || absent_.count(path) > 0) {
+            absent_[path] = directory;
+        }
+    }
+
 private:
     std::mutex guard_;
-    std::map<std::pair<std::string_view, Identity>, bool> answers_;
+    std::map<std::pair<std::string, Identity>, Program::Kind> answers_;
     std::optional<Identity> adapters_;
+    std::map<std::string, Identity> absent_;  // files, with the directory in which they were missing
 };
 
 Memory& memory() {
@@ -127,23 +153,54 @@ Memory& memory() {
     return only;
 }
 
-Program::Kind kindOf(const std::string& name, const std::string& path, const struct stat& file) {
+bool isNothing(const std::string& path) {
+    struct stat file {};
+    return lstat(path.c_str(), &file) != 0 && errno == ENOENT;  // a link may lead somewhere later
+}
+
+std::chrono::nanoseconds timeOf(const timespec& time) {
+    return std::chrono::seconds(time.tv_sec) + std::chrono::nanoseconds(time.tv_nsec);
+}
+
+/// What is changed within a tick of a file system's clock bears the same time.
+bool isSettled(const struct stat& directory) {
+    constexpr std::chrono::seconds kLongestTick{2};
+    timespec now{};
+    clock_gettime(CLOCK_REALTIME, &now);
+    return std::max(timeOf(directory.st_mtim), timeOf(directory.st_ctim)) + kLongestTick < timeOf(now);
+}
+
+}  // namespace
+
+ProgramSearch::ProgramSearch() {
+    const char* const variable = std::getenv("PATH");
+    std::string_view rest = variable != nullptr ? variable : "";
+    for (bool more = true; more;) {
+        const std::size_t end = rest.find(':');
+        directories_.push_back({std::string(rest.substr(0, end)), false, std::nullopt});
+        more = end != std::string_view::npos;
+        rest.remove_prefix(more ? end + 1 : rest.size());
+    }
+}
+
+Program::Kind ProgramSearch::kindOf(const std::string& name, const std::string& path,
+                                    const struct stat& file) {
     if (memory().isAdapter(file)) {
         return Program::adapter;
     }
-    const auto* const known = std::ranges::find(kKnown, name, &Known::name);
+    const bool filtered = std::ranges::find(kKnown, name, &Known::name) != kKnown.end();
     const std::string_view directory = std::string_view(path).substr(0, path.rfind('/') + 1);
     const bool standard = std::ranges::find(kSystemDirectories, directory) != kSystemDirectories.end();
-    if (known == kKnown.end() || !standard || !memory().isKnown(*known, path, file)) {
+    if (!filtered || !standard) {
         return Program::tool;
     }
+    const Program::Kind kind = memory().kindOf(name, path, file);
     // The one may be a script that runs the other.
-    return name == "egrep" ? (findProgram("grep").kind == Program::known ? Program::known : Program::tool)
-                           : Program::known;
+    const bool asGrep = kind != Program::known || name != "egrep" || find("grep").kind == Program::known;
+    return asGrep ? kind : Program::tool;
 }
 
-/// @return nothing when there is no such file
-std::optional<Program> lookAt(const std::string& name, const std::string& path) {
+std::optional<Program> ProgramSearch::lookAt(const std::string& name, const std::string& path) {
     struct stat file {};
     if (stat(path.c_str(), &file) != 0) {
         return errno == ENOENT || errno == ENOTDIR ? std::nullopt : std::optional(Program{Program::unclear});
@@ -154,23 +211,33 @@ std::optional<Program> lookAt(const std::string& name, const std::string& path) 
     return Program{kindOf(name, path, file), path};
 }
 
-}  // namespace
+std::optional<Program> ProgramSearch::lookIn(Directory& directory, const std::string& name) {
+    if (!std::exchange(directory.looked, true)) {
+        struct stat found {};
+        if (stat(directory.path.c_str(), &found) == 0 && S_ISDIR(found.st_mode) && isSettled(found)) {
+            directory.settled = identityOf(found);
+        }
+    }
+    const std::string path = directory.path + '/' + name;
+    if (directory.settled && memory().isAbsent(path, *directory.settled)) {
+        return std::nullopt;
+    }
+    auto found = lookAt(name, path);
+    if (!found && directory.settled && isNothing(path)) {
+        memory().noteAbsent(path, *directory.settled);
+    }
+    return found;
+}
 
-Program findProgram(const std::string& name) {
+Program ProgramSearch::find(const std::string& name) {
     if (name.find('/') != std::string::npos) {
         return name.front() == '/' ? lookAt(name, name).value_or(Program{}) : Program{Program::unclear};
     }
-    const char* const variable = std::getenv("PATH");
-    std::string_view rest = variable != nullptr ? variable : "";
-    for (bool more = true; more;) {
-        const std::size_t end = rest.find(':');
-        const std::string_view directory = rest.substr(0, end);
-        more = end != std::string_view::npos;
-        rest.remove_prefix(more ? end + 1 : rest.size());
-        if (!directory.starts_with('/')) {
+    for (Directory& directory : directories_) {
+        if (!directory.path.starts_with('/')) {
             return {Program::unclear};
         }
-        if (auto found = lookAt(name, std::string(directory) + '/' + name)) {
+        if (auto found = lookIn(directory, name)) {
             return *found;
         }
     }

@@ -23,6 +23,8 @@ public:
     virtual bool pull(std::string& out) = 0;
     /// Whether the tool it stands for prints to a pipe when its buffer is full, or at its end.
     virtual bool printsInBlocks() const { return false; }
+    /// Whether it ended because it could not be read further.
+    virtual bool failed() const { return false; }
     /// The stage's exit status, once its end was reached.
     virtual int status() const { return 0; }
 };

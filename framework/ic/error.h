@@ -13,6 +13,8 @@ namespace IC {
 class CORVISTA_API Error {
 public:
     enum StatusType : unsigned char { success = 0, failure = 1, unanswered = 2 };
+    /// The code of a failure to read a property that was never stored.
+    static constexpr unsigned int kNoSuchProperty = 1;
 
     Error() = default;
     Error(unsigned char status, Number code, std::string text);

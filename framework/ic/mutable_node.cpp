@@ -16,7 +16,7 @@ Error MutableNode::getProperty(unsigned int id, PropertyValue& out) const {
     const std::shared_lock lock(guard_);
     const auto found = properties_.find(id);
     if (found == properties_.end()) {
-        return {Error::failure, Number(), "no such property: " + std::to_string(id)};
+        return {Error::failure, Number(Error::kNoSuchProperty), "no such property: " + std::to_string(id)};
     }
     out = found->second;
     return {};

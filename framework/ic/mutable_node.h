@@ -20,8 +20,8 @@ public:
                 unsigned int nodeType, unsigned int index);
 
     ~MutableNode() override;
-    /// What was stored last; an id that was never stored gives status 1 and "no such property: <id>", `out`
-    /// untouched.
+    /// What was stored last; an id that was never stored gives status 1, Error::kNoSuchProperty and "no such
+    /// property: <id>", `out` untouched.
     Error getProperty(unsigned int id, PropertyValue& out) const override;
     Error getProperties(std::map<unsigned int, PropertyValue>& out) const override;
     /// Stores a copy.

@@ -54,21 +54,6 @@ std::vector<pid_t> readIds(const std::string& listing) {
     return ids;
 }
 
-/// The numbers among the names in a directory: processes, threads, descriptors. None when it is gone.
-std::vector<int> numbersIn(const std::string& path) {
-    std::vector<int> numbers;
-    // Not by the iterators of libstdc++: those end the program when they find no memory.
-    const std::unique_ptr<DIR, int (*)(DIR*)> directory(opendir(path.c_str()), closedir);
-    while (const dirent* entry = directory != nullptr ? readdir(directory.get()) : nullptr) {
-        const std::string name = entry->d_name;
-        int number = 0;
-        if (std::from_chars(name.data(), name.data() + name.size(), number).ec == std::errc()) {
-            numbers.push_back(number);
-        }
-    }
-    return numbers;
-}
-
 /// What the kernel tells of a process.
 struct Status {
     char state = 'X';  ///< as it is when there is no such process
@@ -315,6 +300,20 @@ bool killChild(pid_t thread, const ChildProcess& child) {
     }
     condemned.addAll(childrenOfProcess(child.id));
     return true;
+}
+
+std::vector<int> numbersIn(const std::string& directory) {
+    std::vector<int> numbers;
+    // Not by the iterators of libstdc++: those end the program when they find no memory.
+    const std::unique_ptr<DIR, int (*)(DIR*)> listing(opendir(directory.c_str()), closedir);
+    while (const dirent* entry = listing != nullptr ? readdir(listing.get()) : nullptr) {
+        const std::string name = entry->d_name;
+        int number = 0;
+        if (std::from_chars(name.data(), name.data() + name.size(), number).ec == std::errc()) {
+            numbers.push_back(number);
+        }
+    }
+    return numbers;
 }
 
 }  // namespace QX

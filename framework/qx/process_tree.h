@@ -49,6 +49,10 @@ CORVISTA_API void killChildrenOf(pid_t thread, const std::vector<ChildProcess>& 
 /// @return false when it had ended before
 CORVISTA_API bool killChild(pid_t thread, const ChildProcess& child);
 
+/// The numbers among the names in a directory of /proc: processes, threads, descriptors. None when it is
+/// gone.
+CORVISTA_API std::vector<int> numbersIn(const std::string& directory);
+
 /// Has a function called with each process right before one of the functions above kills it, on the thread
 /// that kills: who waits for it can tell such an end from any other. To be set once, before there are
 /// threads.

@@ -9,7 +9,7 @@
 #include <set>
 #include <thread>
 
-#include "agent/core/operations.h"
+#include "agent/core/property_words.h"
 #include "framework/cvlog/logger.h"
 #include "tests/agent/suse_host.h"
 #include "tests/support/fake_host.h"
@@ -36,6 +36,7 @@ constexpr const char* kHold = "/tmp/hold";
 AgentSettings settingsOf(const std::vector<std::string>& plugins) {
     AgentSettings settings;
     settings.plugins = plugins;
+    settings.data = std::make_shared<cvagent::DataDirectory>();
     return settings;
 }
 
@@ -90,7 +91,6 @@ HOST_TEST(AgentNodes, ANodeRefKeepsThePluginAtWork) {
 HOST_TEST(AgentNodes, AReferenceCanBeGivenANodeOfAnotherAgent) {
     const cvagent::QuietCommands quiet;
     AgentSettings settings = settingsOf({FAKE_PLUGIN_FILE});
-    settings.data = std::make_shared<cvagent::DataDirectory>();
     auto first = std::make_unique<Agent>(settings);
     NodeRef node = first->find("computer");
     first.reset();
@@ -148,6 +148,32 @@ HOST_TEST(AgentPlugins, OneThatFailsCostsNothingOfTheOthers) {
         EXPECT_THAT(pathsOf(agent), testing::Contains("/oshw/root/computer"));
     }
     EXPECT_THROW(Agent(settingsOf({"/nowhere.so"})), Problem);
+}
+
+HOST_TEST(AgentPlugins, NothingIsToldOfOneThatDoesNotStart) {
+    const cvagent::QuietCommands quiet;
+    host.file("/proc/cpuinfo", "processor\t: 0\n");
+    const auto pathsAndEvents = [](const std::string& words) {
+        setenv("CORVISTA_FAKE_PLUGIN", words.c_str(), 1);
+        const Agent agent(settingsOf({CORVISTA_PLUGIN_FILE, FAKE_PLUGIN_FILE}));
+        std::vector<std::string> events;
+        for (const Event& event : agent.subscribe(0)->take().events) {
+            events.push_back(eventName(event.kind) + (" " + event.path));
+        }
+        return std::pair(pathsOf(agent), events);
+    };
+    const std::string drive = "/oshw/root/computer/chassis/planar/disk-controller/hard-drive:sdc";
+    const std::string port = "/oshw/root/computer/chassis/network-controller/network-port:eth0";
+    EXPECT_THAT(pathsAndEvents("early publish").second, ElementsAre("alert " + port, "published " + drive));
+    const auto failed = pathsAndEvents("early publish late badstart");
+    EXPECT_THAT(failed.second, IsEmpty());
+    EXPECT_THAT(failed.first, testing::Not(testing::Contains(HasSubstr("hard-drive"))));
+}
+
+HOST_TEST(AgentPlugins, AreLoadedWithADataDirectoryOnly) {
+    AgentSettings settings = settingsOf({FAKE_PLUGIN_FILE});
+    settings.data = nullptr;
+    EXPECT_THROW(Agent{settings}, std::invalid_argument);
 }
 
 HOST_TEST(AgentPlugins, TheSameOneTwiceIsRefused) {
@@ -210,6 +236,92 @@ HOST_TEST(AgentReads, WhatHangsIsStaleInTimeAndNothingElseIsLate) {
     EXPECT_LT(static_cast<unsigned int>(now.value), 20U);  // what nobody waits for is not begun
 }
 
+HOST_TEST(AgentReads, AnyNumberOfNodesThatHangMakesNothingElseLate) {
+    Fake fake("drives");
+    host.file(kHold, "");
+    const NodeRef computer = fake.agent->find("computer");
+    std::vector<NodeRef> stuck;
+    for (int i = 0; i < 20; ++i) {
+        stuck.push_back(fake.agent->find("hard-drive:x" + std::to_string(i)));
+    }
+    const std::vector<unsigned int> ids(10, 904);
+    for (int round = 0; round < 3; ++round) {
+        for (const NodeRef& node : stuck) {
+            EXPECT_THAT(fake.agent->read(node, ids, Freshness::now, within(round == 0 ? 50ms : 5ms)),
+                        Each(testing::Field(&Reading::timedOut, true)));
+        }
+        const auto start = std::chrono::steady_clock::now();
+        EXPECT_FALSE(fake.agent->read(computer, {108}, Freshness::now, within(5s)).front().failed());
+        EXPECT_LT(std::chrono::steady_clock::now() - start, 3s);
+    }
+    // Once a node has hung for long its readings are stale at once.
+    std::this_thread::sleep_for(1s);
+    const auto start = std::chrono::steady_clock::now();
+    for (const NodeRef& node : stuck) {
+        const Reading reading = fake.agent->read(node, {89}, Freshness::now, within(5s)).front();
+        EXPECT_TRUE(reading.stale && reading.timedOut);
+        EXPECT_THAT(static_cast<std::string>(reading.value), testing::StartsWith("/dev/x"));
+    }
+    EXPECT_LT(std::chrono::steady_clock::now() - start, 3s);
+    host.remove(kHold);
+    EXPECT_FALSE(fake.agent->read(stuck.front(), {89}, Freshness::now, Request("test")).front().failed());
+}
+
+HOST_TEST(AgentReads, TwentyNodesThatHangAtOnceMakeNothingElseLate) {
+    Fake fake("drives");
+    host.file(kHold, "");
+    std::vector<std::jthread> askers;
+    for (int i = 0; i < 20; ++i) {
+        askers.emplace_back([&fake, i] {
+            const NodeRef node = fake.agent->find("hard-drive:x" + std::to_string(i));
+            fake.agent->read(node, std::vector<unsigned int>(10, 904), Freshness::now, within(3s));
+        });
+    }
+    std::this_thread::sleep_for(20ms);
+    EXPECT_FALSE(fake.read(108, within(2500ms)).failed());
+    host.remove(kHold);
+}
+
+HOST_TEST(AgentReads, OneThatNobodyWaitsForAsksNobody) {
+    Fake fake;
+    const Reading reading = fake.read(904, Request("test", Request::Clock::time_point()));
+    EXPECT_TRUE(reading.timedOut && reading.failed());
+    EXPECT_EQ(static_cast<unsigned int>(fake.read(904, Request("test")).value), 1U);
+}
+
+HOST_TEST(AgentReads, TheAgentMayGoWhileTheyHang) {
+    Fake fake;
+    host.file(kHold, "");
+    fake.read(904, within(10ms));
+    std::jthread end([&fake] { fake.agent.reset(); });
+    std::this_thread::sleep_for(20ms);
+    host.remove(kHold);
+    end.join();
+    EXPECT_EQ(dlopen(FAKE_PLUGIN_FILE, RTLD_LAZY | RTLD_NOLOAD), nullptr);
+}
+
+HOST_TEST(AgentWrites, OneThatNobodyWaitsForChangesNothing) {
+    Fake fake;
+    const WriteResult late = fake.write("late", Request("test", Request::Clock::time_point()));
+    ASSERT_TRUE(late.problem);
+    EXPECT_STREQ(late.problem->what(), "OwnerContact was not changed: no answer in time");
+    EXPECT_EQ(static_cast<std::string>(fake.read(115, Request("test")).value), "");
+}
+
+HOST_TEST(AgentWrites, NobodyWaitsForEverForOneThatHangs) {
+    Fake fake;
+    host.file(kHold, "");
+    EXPECT_TRUE(fake.write("hold", within(20ms)).problem);
+    try {
+        fake.write("second", Request("test"));
+        ADD_FAILURE() << "two writes at once";
+    } catch (const Problem& problem) {
+        EXPECT_EQ(problem.kind(), Problem::busy);
+    }
+    host.remove(kHold);
+    EXPECT_EQ(fake.write("third", within(5s)).outcome, WriteResult::applied);
+}
+
 HOST_TEST(AgentReads, WhatIsKnownAsksNobody) {
     host.file(kHold, "");
     Fake fake;
@@ -231,12 +343,13 @@ HOST_TEST(AgentWrites, TellWhatCameOfThem) {
     ASSERT_TRUE(bad.problem);
     EXPECT_EQ(bad.problem->kind(), Problem::failed);
     EXPECT_EQ(bad.outcome, WriteResult::notKnown);
-    const auto events = fake.agent->events(0).events;
+    const auto events = fake.agent->subscribe(0)->take().events;
     ASSERT_EQ(events.size(), 1U);
     EXPECT_EQ(events[0].kind, Event::Kind::written);
     EXPECT_EQ(events[0].path, "/oshw/root/computer");
     EXPECT_EQ(events[0].propertyName, "OwnerContact");
     EXPECT_EQ(events[0].after, "room 5");
+    EXPECT_EQ(events[0].caller, "test");
 }
 
 HOST_TEST(AgentWrites, NodesThatAWriteMadeAppearAreTold) {
@@ -246,7 +359,7 @@ HOST_TEST(AgentWrites, NodesThatAWriteMadeAppearAreTold) {
                                                  IC::PropertyValue(IC::Number(1U), true), Request("test"));
     EXPECT_EQ(result.outcome, WriteResult::notKnown);
     std::vector<std::string> told;
-    for (const Event& event : fake.agent->events(0).events) {
+    for (const Event& event : fake.agent->subscribe(0)->take().events) {
         if (event.path.find("hard-drive") == std::string::npos) {
             told.push_back(eventName(event.kind) + (" " + event.path));
         }
@@ -329,6 +442,27 @@ HOST_TEST(AgentWrites, TwoWritersOfOneFileLoseNothing) {
     EXPECT_EQ(lost, 0) << "of " << rounds << " rounds";
 }
 
+HOST_TEST(AgentThreads, SixtyFourReadWhileNodesComeAndGo) {
+    Fake fake("churn alert");
+    const auto deaf = fake.agent->subscribe(0);  // never read
+    std::atomic<int> read{0};
+    {
+        std::vector<std::jthread> readers;
+        for (int i = 0; i < 64; ++i) {
+            readers.emplace_back([&fake, &read, i] {
+                for (int round = 0; round < 3; ++round) {
+                    const auto nodes = fake.agent->nodes();
+                    const NodeRef& node = nodes[static_cast<std::size_t>(i) % nodes.size()];
+                    const auto deadline = i % 2 == 0 ? within(5s) : Request("test");
+                    read += fake.agent->read(node, {89, 108}, Freshness::now, deadline).size() == 2 ? 1 : 0;
+                    fake.agent->subscribe(0, Event::Kind::alert)->take();
+                }
+            });
+        }
+    }
+    EXPECT_EQ(read, 64 * 3);
+}
+
 HOST_TEST(AgentThreads, EverythingAtOnce) {
     Fake fake("churn alert chatter");
     const auto all = fake.agent->subscribe(0);
@@ -351,7 +485,7 @@ HOST_TEST(AgentThreads, EverythingAtOnce) {
             });
         }
         repeat([&] {
-            const auto events = fake.agent->subscribe(fake.agent->events(0).missing);
+            const auto events = fake.agent->subscribe(0);
             fake.agent->read(fake.agent->find("computer"), {108}, Freshness::known, Request("test"));
             events->take();
             pathsOf(*fake.agent);

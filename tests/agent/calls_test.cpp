@@ -35,8 +35,10 @@ struct WriterParts {
     EventLog events;
     cvagent::Announcer announcer{events, facts};
     int refreshed = 0;
+    bool listed = true;
     Pool pool{1, 1};
-    cvagent::Writer writer{pool, facts, announcer, [this] { ++refreshed; }};
+    cvagent::Writer writer{
+        pool, facts, announcer, {[this] { ++refreshed; }, [this](const Handle&) { return listed; }}};
 };
 
 TEST(Writer, AWriteThatHasNotBegunAtItsDeadlineNeverDoes) {
@@ -53,6 +55,20 @@ TEST(Writer, AWriteThatHasNotBegunAtItsDeadlineNeverDoes) {
     EXPECT_TRUE(parts.pool.settle(5s));
     EXPECT_EQ(static_cast<std::string>(cvagent::readProperty(*node, 115).value), "old");
     EXPECT_EQ(parts.write(node, "next", 5s).outcome, cvagent::WriteResult::applied);
+}
+
+TEST(Writer, ANodeThatIsGoneIsNotWrittenTo) {
+    const auto node = std::make_shared<IC::MutableNode>(7, 0, std::vector<unsigned int>{1}, 40, 0);
+    node->setProperty(115, IC::PropertyValue("old", true));
+    WriterParts parts;
+    parts.listed = false;
+    const auto result = parts.write(node, "new", 5s);
+    ASSERT_TRUE(result.problem);
+    EXPECT_EQ(result.problem->kind(), Problem::notFound);
+    EXPECT_STREQ(result.problem->what(), "OwnerContact was not changed: the node is gone");
+    EXPECT_TRUE(result.after.failed());
+    EXPECT_TRUE(parts.events.since(0).events.empty());
+    EXPECT_EQ(static_cast<std::string>(cvagent::readProperty(*node, 115).value), "old");
 }
 
 /// Refuses to be written.

@@ -17,54 +17,54 @@ namespace {
 
 using namespace std::chrono_literals;
 using cvagent::CommandDeadline;
-using cvagent::Errand;
+using cvagent::CommandScope;
 using testing::IsEmpty;
 
 constexpr int kKilled = 128 + SIGKILL;
 
 HOST_TEST(CommandDeadline, EndsAPipelineThatHangsAndTellsItsReader) {
     const CommandDeadline deadline(0.3s, cvagent::complain);
-    const Errand errand(Errand::read);
+    const CommandScope scope(CommandScope::read);
     const auto start = std::chrono::steady_clock::now();
     EXPECT_EQ(shell("sleep 1000 | cat").status, kKilled);
     EXPECT_GE(std::chrono::steady_clock::now() - start, 0.3s);
-    EXPECT_EQ(errand.complaint(), "timed out after 0.3 s: sleep 1000 | cat");
+    EXPECT_EQ(scope.complaint(), "timed out after 0.3 s: sleep 1000 | cat");
     EXPECT_TRUE(eventually([&] { return !isRunning(host, "sleep"); }));
 }
 
 HOST_TEST(CommandDeadline, GivesEveryCommandTheWholeTime) {
     const CommandDeadline deadline(1s, cvagent::complain);
-    const Errand errand(Errand::read);
+    const CommandScope scope(CommandScope::read);
     for (int i = 0; i < 3; ++i) {
         EXPECT_EQ(shell("sleep 0.4; true").status, 0);
     }
-    EXPECT_THAT(errand.complaint(), IsEmpty());
+    EXPECT_THAT(scope.complaint(), IsEmpty());
 }
 
 HOST_TEST(CommandDeadline, TellsNobodyElse) {
     const CommandDeadline deadline(0.5s, cvagent::complain);
     std::string other = "not asked";
     std::thread quick([&other] {
-        const Errand errand(Errand::read);
+        const CommandScope scope(CommandScope::read);
         for (int i = 0; i < 7; ++i) {
             shell("sleep 0.1; true");
         }
-        other = errand.complaint();
+        other = scope.complaint();
     });
-    const Errand errand(Errand::read);
+    const CommandScope scope(CommandScope::read);
     shell("sleep 1000");
     quick.join();
-    EXPECT_EQ(errand.complaint(), "timed out after 0.5 s: sleep 1000");
+    EXPECT_EQ(scope.complaint(), "timed out after 0.5 s: sleep 1000");
     EXPECT_THAT(other, IsEmpty());
 }
 
 HOST_TEST(CommandDeadline, AWriteMayTakeTenTimesAsLong) {
     const CommandDeadline deadline(0.1s, cvagent::complain);
-    const Errand errand(Errand::write);
+    const CommandScope scope(CommandScope::write);
     EXPECT_EQ(shell("sleep 0.4; true").status, 0);
-    EXPECT_THAT(errand.complaint(), IsEmpty());
+    EXPECT_THAT(scope.complaint(), IsEmpty());
     EXPECT_EQ(shell("sleep 1000; true").status, kKilled);
-    EXPECT_EQ(errand.complaint(), "timed out after 1 s: sleep 1000; true");
+    EXPECT_EQ(scope.complaint(), "timed out after 1 s: sleep 1000; true");
 }
 
 HOST_TEST(CommandDeadline, WarnsTheUserOfWhatHasNoReader) {

@@ -2,6 +2,8 @@
 #include <gmock/gmock.h>
 #include <poll.h>
 
+#include <algorithm>
+#include <atomic>
 #include <barrier>
 #include <latch>
 #include <limits>
@@ -11,7 +13,8 @@
 #include "agent/cli/failure.h"
 #include "agent/core/agent.h"
 #include "agent/core/announcer.h"
-#include "agent/core/operations.h"
+#include "agent/core/property_words.h"
+#include "agent/core/running_plugins.h"
 #include "tests/agent/node_list.h"
 
 namespace {
@@ -51,6 +54,16 @@ static_assert(GivesItsNode<const NodeRef&> && PointsToItsNode<const NodeRef&>);
 static_assert(!GivesItsNode<NodeRef> && !PointsToItsNode<NodeRef>);
 static_assert(std::is_same_v<decltype(*std::declval<const NodeRef&>()), const IC::MutableNode&>);
 
+template <class Call>
+Problem problemOf(const Call& call) {
+    try {
+        call();
+    } catch (const Problem& problem) {
+        return problem;
+    }
+    return {Problem::failed, "no problem"};
+}
+
 Event eventOf(Event::Kind kind, unsigned int node = 7) {
     Event event;
     event.kind = kind;
@@ -71,7 +84,6 @@ TEST(EventLog, NumbersEventsAndKeepsTheLastOnes) {
     for (int i = 0; i < 5; ++i) {
         log.hear(eventOf(Event::Kind::alert));
     }
-    EXPECT_EQ(log.last(), 5U);
     EXPECT_THAT(numbersOf(log.since(0).events), ElementsAre(3, 4, 5));
     EXPECT_EQ(log.since(0).missing, 2U);
     EXPECT_EQ(log.since(1).missing, 1U);
@@ -119,6 +131,68 @@ TEST(EventLog, ASubscriberGetsWhatHasHappenedAndWhatComes) {
     EXPECT_THAT(numbersOf(taken.events), ElementsAre(2, 3, 4));
     EXPECT_THAT(numbersOf(later->take().events), ElementsAre(3, 4));
     EXPECT_THAT(numbersOf(alerts->take().events), ElementsAre(4));
+}
+
+TEST(EventLog, WhatASubscriberWouldNotHaveGotIsNotDropped) {
+    EventLog log(3);
+    for (int i = 0; i < 2; ++i) {
+        log.hear(eventOf(Event::Kind::alert));
+    }
+    for (int i = 0; i < 8; ++i) {
+        log.hear(eventOf(Event::Kind::published));
+    }
+    const auto droppedAfter = [&log](std::uint64_t number, std::optional<Event::Kind> only) {
+        return log.subscribe(number, 10, only)->take().dropped;
+    };
+    EXPECT_EQ(droppedAfter(0, std::nullopt), 7U);
+    EXPECT_EQ(droppedAfter(0, Event::Kind::alert), 2U);
+    EXPECT_EQ(droppedAfter(1, Event::Kind::alert), 1U);
+    EXPECT_EQ(droppedAfter(2, Event::Kind::alert), 0U);
+    EXPECT_EQ(droppedAfter(0, Event::Kind::published), 5U);
+    EXPECT_EQ(droppedAfter(5, Event::Kind::published), 2U);
+    EXPECT_EQ(droppedAfter(0, Event::Kind::withdrawn), 0U);
+}
+
+TEST(EventLog, LongTextsDoNotFillTheMemory) {
+    EventLog log;
+    const auto slow = log.subscribe(0);
+    Event event = eventOf(Event::Kind::alert);
+    event.message = std::string(1 << 20, 'x');
+    for (int i = 0; i < 40; ++i) {
+        log.hear(event);
+    }
+    const auto taken = slow->take();
+    EXPECT_EQ(taken.events.size() + taken.dropped, 40U);
+    EXPECT_EQ(taken.events.size(), 15U);
+    EXPECT_EQ(taken.events.back().number, 40U);
+    EXPECT_EQ(log.since(0).events.size(), 15U);
+    EXPECT_EQ(log.since(0).missing, 25U);
+    event.message = std::string(20 << 20, 'x');
+    log.hear(event);
+    EXPECT_THAT(numbersOf(slow->take().events), ElementsAre(41));
+}
+
+TEST(EventLog, SubscribersGoWhileEventsArrive) {
+    EventLog log;
+    std::atomic<bool> over{false};
+    {
+        std::vector<std::jthread> hearers;
+        for (int i = 0; i < 2; ++i) {
+            hearers.emplace_back([&] {
+                while (!over) {
+                    log.hear(eventOf(Event::Kind::alert));
+                }
+            });
+        }
+        for (int i = 0; i < 300; ++i) {
+            const auto one = log.subscribe(1, 10);
+            const auto events = one->take().events;
+            EXPECT_TRUE(std::is_sorted(
+                events.begin(), events.end(),
+                [](const Event& left, const Event& right) { return left.number < right.number; }));
+        }
+        over = true;
+    }
 }
 
 TEST(EventLog, TheDescriptorTellsWhenThereIsSomething) {
@@ -192,13 +266,75 @@ TEST(Pool, ALaneThatHangsLeavesTheOthersTheirThreads) {
     stuck.waitFor(10);
 }
 
+TEST(Pool, ThreadsThatHangAreReplacedAndALaneThatHangsGetsNoMore) {
+    Held stuck;
+    Pool pool(2, 2);
+    for (unsigned int lane = 1; lane <= 20; ++lane) {
+        const int before = stuck.begun;
+        stuck.submitTo(pool, lane, 3);
+        stuck.waitFor(before + 1);
+        pool.giveUp(&stuck);
+    }
+    std::latch done(1);
+    pool.submit(99, nullptr, [&done] { done.count_down(); });
+    done.wait();
+    EXPECT_LE(stuck.begun, 40);
+    EXPECT_LE(pool.threads(), 42U);
+    const int before = stuck.begun;
+    const int other = 0;
+    std::atomic<bool> ran{false};
+    pool.submit(7, &other, [&ran] { ran = true; });
+    EXPECT_FALSE(pool.settle(20ms));
+    EXPECT_FALSE(ran);
+    EXPECT_EQ(stuck.begun, before);
+    stuck.release();
+    EXPECT_TRUE(pool.settle(10s));
+    EXPECT_TRUE(ran);
+    for (int i = 0; i < 1000 && pool.threads() > 2; ++i) {
+        std::this_thread::sleep_for(1ms);
+    }
+    EXPECT_LE(pool.threads(), 2U);
+}
+
+TEST(Pool, WhoWaitsSeesThatSlowThreadsAreReplaced) {
+    Held slow;
+    Pool pool(1, 1, {10ms, 1s});
+    slow.submitTo(pool, 7, 1);
+    std::mutex guard;
+    std::condition_variable changed;
+    bool done = false;
+    pool.submit(8, nullptr, [&] {
+        const std::lock_guard lock(guard);
+        done = true;
+        changed.notify_one();
+    });
+    std::unique_lock lock(guard);
+    EXPECT_TRUE(pool.wait(changed, lock, Pool::Clock::now() + 10s, [&done] { return done; }));
+    slow.release();
+}
+
+TEST(Pool, ALaneIsStuckWhenItsWorkWasGivenUpLongAgo) {
+    Held held;
+    Pool pool(1, 1, {10ms, 30ms});
+    held.submitTo(pool, 7, 1);
+    held.waitFor(1);
+    std::this_thread::sleep_for(40ms);
+    EXPECT_FALSE(pool.isStuck(7));
+    pool.giveUp(&held);
+    EXPECT_TRUE(pool.isStuck(7));
+    EXPECT_FALSE(pool.isStuck(8));
+    held.release();
+    EXPECT_TRUE(pool.settle(10s));
+    EXPECT_FALSE(pool.isStuck(7));
+}
+
 TEST(Pool, WhatWasNotBegunCanBeTakenBack) {
     Held stuck;
     {
         Pool pool(1, 1);
         stuck.submitTo(pool, 7, 3);
         stuck.waitFor(1);
-        pool.drop(&stuck);
+        pool.giveUp(&stuck);
         std::latch done(1);
         pool.submit(8, nullptr, [&done] { done.count_down(); });
         stuck.release();
@@ -251,25 +387,27 @@ TEST(Facts, KeepTheLastValueOfWhatWasCutOff) {
     EXPECT_FALSE(facts.known(node, 5).stale);
 }
 
-TEST(Facts, AnOlderAnswerThatComesLateChangesNothing) {
-    const IC::MutableNode node(7, 0, {1}, 40, 0);
+/// A node whose property 5 has answered "young" to a read that began a second after `earlier`.
+class FactsOfAYoungAnswer : public testing::Test {
+protected:
+    FactsOfAYoungAnswer() {
+        facts.meet(7);
+        Reading young{5, {}, IC::PropertyValue("young", true), {}};
+        facts.judge(node, young, earlier + 1s);
+    }
+
+    const IC::MutableNode node{7, 0, {1}, 40, 0};
+    const Facts::Clock::time_point earlier = Facts::Clock::now();
     Facts facts;
-    facts.meet(7);
-    const auto earlier = Facts::Clock::now();
-    Reading young{5, {}, IC::PropertyValue("young", true), {}};
-    facts.judge(node, young, earlier + 1s);
+};
+
+TEST_F(FactsOfAYoungAnswer, DoNotChangeByAnOlderAnswerThatComesLate) {
     Reading old{5, {}, IC::PropertyValue("old", true), {}};
     facts.judge(node, old, earlier);
     EXPECT_EQ(static_cast<std::string>(facts.known(node, 5).value), "young");
 }
 
-TEST(Facts, AnOlderReadThatIsCutOffLeavesAYoungerAnswerGood) {
-    const IC::MutableNode node(7, 0, {1}, 40, 0);
-    Facts facts;
-    facts.meet(7);
-    const auto earlier = Facts::Clock::now();
-    Reading young{5, {}, IC::PropertyValue("young", true), {}};
-    facts.judge(node, young, earlier + 1s);
+TEST_F(FactsOfAYoungAnswer, StayGoodWhenAnOlderReadIsCutOff) {
     Reading cut{5, {}, {}, "timed out", false, true};
     facts.judge(node, cut, earlier);
     EXPECT_EQ(static_cast<std::string>(cut.value), "young");
@@ -306,32 +444,32 @@ public:
     }
 };
 
-TEST(Announcer, TellsOfANodeOnceWhoeverSeesItFirst) {
+/// An announcer that knows of one port, eth0.
+class Announcer : public testing::Test {
+protected:
+    Announcer() { announcer.takeStock(ports); }
+
     Ports ports;
+    const IC::MutableNode* const port = ports.addPort("eth0");
     EventLog log;
     Facts facts;
-    cvagent::Announcer announcer(log, facts);
-    ports.addPort("eth0");
-    announcer.takeStock(ports.holdAll());
+    cvagent::Announcer announcer{log, facts};
+};
+
+TEST_F(Announcer, TellsOfANodeOnceWhoeverSeesItFirst) {
     announcer.announceNew(ports);
-    EXPECT_EQ(log.last(), 0U);
+    EXPECT_THAT(log.since(0).events, IsEmpty());
     const IC::MutableNode* const made = ports.addPort("eth1");
     announcer.announceNew(ports);
     announcer.announceNew(ports);
     announcer.hear(cvagent::nodeEvent(Event::Kind::published, *made));
-    ASSERT_EQ(log.last(), 1U);
+    ASSERT_EQ(log.since(0).events.size(), 1U);
     EXPECT_EQ(log.since(0).events.front().path, "/network-port:eth1");
     announcer.hear(cvagent::nodeEvent(Event::Kind::withdrawn, *made));
-    EXPECT_EQ(log.last(), 2U);
+    EXPECT_EQ(log.since(0).events.size(), 2U);
 }
 
-TEST(Announcer, AnAlertTellsTheStateBeforeAndAfter) {
-    Ports ports;
-    EventLog log;
-    Facts facts;
-    cvagent::Announcer announcer(log, facts);
-    ports.addPort("eth0");
-    announcer.takeStock(ports.holdAll());
+TEST_F(Announcer, AnAlertTellsTheStateBeforeAndAfter) {
     for (const auto& [code, message] : std::vector<std::pair<unsigned int, std::string>>{
              {12, "NIC is Offline "}, {1, "NIC is Online "}, {32, "NIC has Switched Over "}}) {
         announcer.hear(
@@ -346,6 +484,54 @@ TEST(Announcer, AnAlertTellsTheStateBeforeAndAfter) {
     }
     EXPECT_THAT(changes, ElementsAre("network-port LinkState 1 12", "network-port LinkState 12 1",
                                      "network-port LinkState 1 32", "   "));
+}
+
+TEST_F(Announcer, SuccessiveAlertsAreAChain) {
+    const auto alertAgain = [&](unsigned int code, const std::string& message) {
+        for (int i = 0; i < 1000; ++i) {
+            announcer.hear(
+                cvagent::alertEvent(IC::Alert(1, 0, {"/network-port:eth0"}, code, message), ports.holdAll()));
+        }
+    };
+    {
+        const std::jthread one(alertAgain, 12, "NIC is Offline ");
+        const std::jthread other(alertAgain, 1, "NIC is Online ");
+        const std::jthread reader([&] {
+            for (int i = 0; i < 1000; ++i) {
+                Reading reading{123, {}, IC::PropertyValue(IC::Number(7U), true), {}};
+                facts.judge(*port, reading, Facts::Clock::now());
+            }
+        });
+    }
+    const auto events = log.since(0).events;
+    ASSERT_EQ(events.size(), 2000U);
+    for (std::size_t i = 1; i < events.size(); ++i) {
+        ASSERT_EQ(events[i].before, events[i - 1].after) << i;
+    }
+}
+
+/// What a plug-in's threads ask while others come and go: each look at a name leads to looks at paths.
+TEST(RunningPlugins, LooksGoOnWhileOthersComeAndGo) {
+    Ports ports;
+    ports.add(40, 0);  // no path was made for it
+    const cvagent::RunningPlugin running(ports);
+    std::atomic<bool> over{false};
+    std::vector<std::jthread> askers;
+    std::atomic<int> found{0};
+    for (int i = 0; i < 3; ++i) {
+        askers.emplace_back([&] {
+            while (!over) {
+                IC::Node* node = nullptr;
+                found += running.finder()("/computer", &node).getStatus() == 0 ? 1 : 0;
+            }
+        });
+    }
+    for (int i = 0; i < 500 || found == 0; ++i) {
+        NodeList other;
+        const cvagent::RunningPlugin comesAndGoes(other);
+        EXPECT_EQ(comesAndGoes.ids().interfaceId, 2U);
+    }
+    over = true;
 }
 
 TEST(Problems, HaveTheirExitStatusAndAdviceAtTheEdgeAlone) {
@@ -367,6 +553,46 @@ TEST(Problems, HaveTheirExitStatusAndAdviceAtTheEdgeAlone) {
         EXPECT_STREQ(Failure(problem).what(),
                      "a computer has no property 'NoSuch'; see: cvagent properties computer");
     }
+}
+
+TEST(Failures, HaveTheAdviceForTheirKindAndSubject) {
+    const auto shown = [](Problem::Kind kind, Problem::Subject subject, const std::string& detail = "") {
+        return std::string(cvagent::Failure(Problem(kind, "it", subject, detail)).what());
+    };
+    EXPECT_EQ(shown(Problem::notFound, Problem::node), "it; see: cvagent tree");
+    EXPECT_EQ(shown(Problem::ambiguous, Problem::node, "\n  5  /a"),
+              "it; give the id or the path of one of them:\n  5  /a");
+    EXPECT_EQ(shown(Problem::busy, Problem::dataFixed, "; why"), "it\nStop it first; why");
+    EXPECT_EQ(shown(Problem::busy, Problem::dataOwn),
+              "it\nStop it first, or name another one with CORVISTA_DATA_DIR=DIRECTORY");
+    EXPECT_EQ(
+        shown(Problem::failed, Problem::dataOwn),
+        "it\nMake all of the way to it yours or root's and writable by nobody else, or name another one "
+        "with CORVISTA_DATA_DIR=DIRECTORY");
+    EXPECT_EQ(shown(Problem::busy, Problem::none), "it");
+}
+
+TEST(PropertyWords, NameAClassWithItsArticle) {
+    const IC::MutableNode node(7, 0, {1}, 29, 0);
+    EXPECT_EQ(cvagent::Failure(problemOf([&] { cvagent::writableRow(node, "NoSuch"); })).what(),
+              std::string("an ip-config has no property 'NoSuch'; see: cvagent properties ip-config"));
+    EXPECT_STREQ(problemOf([&] { cvagent::writableRow(node, "DHCPServers"); }).what(),
+                 "DHCPServers of an ip-config cannot be written");
+}
+
+TEST(PropertyWords, WhatStopsTheHostIsKnownByItsCode) {
+    const auto labelOf = [](unsigned int id, unsigned int code) {
+        const cvagent::Label* const label = cvagent::drasticLabel(
+            *cvagent::findProperty(40, id), IC::PropertyValue(IC::EnumValue(code), true));
+        return std::string(label != nullptr ? label->text : "");
+    };
+    EXPECT_EQ(labelOf(123, 9), "restart");
+    EXPECT_EQ(labelOf(123, 12), "halt");
+    EXPECT_EQ(labelOf(123, 1), "");
+    const IC::PropertyValue down(IC::Number(12U), true);
+    EXPECT_EQ(cvagent::drasticLabel(*cvagent::findProperty(29, 123), down), nullptr);
+    const IC::PropertyValue text("2026-11-20T21:03:03Z", true);
+    EXPECT_EQ(cvagent::drasticLabel(*cvagent::findProperty(40, 126), text), nullptr);
 }
 
 TEST(Catalogue, ATableThatCollidesIsRefused) {

@@ -1,6 +1,9 @@
 // watch --exec: the administrator's program on each alert; and several plug-ins on the command line.
 #include <gmock/gmock.h>
 #include <signal.h>
+#include <sys/ptrace.h>
+#include <sys/wait.h>
+#include <unistd.h>
 
 #include <nlohmann/json.hpp>
 #include <sstream>
@@ -102,14 +105,78 @@ HOST_TEST(EventProgram, ThatHangsIsKilledWithItsDescendants) {
 }
 
 HOST_TEST(EventProgram, ASignalEndsItAtOnce) {
-    install(host, "sleep 1000\n");
+    install(host, "echo > /var/started\nsleep 1000\n");
     CvagentRun cvagent(host);
     RunningProgram watch = cvagent.telling("early").start({"watch", "--exec", kProgram});
-    ASSERT_TRUE(watch.waitForOutput("NIC is Offline"));
+    ASSERT_TRUE(eventually([&] { return host.read("/var/started").has_value(); }));
     watch.signal(SIGTERM);
     const Finished run = watch.wait(std::chrono::seconds(10));
     EXPECT_EQ(run.status, 0);
     EXPECT_THAT(cvagent.diary(), testing::EndsWith("unload\n"));
+    EXPECT_THAT(run.err, HasSubstr("for event 1 was ended, for cvagent was told to stop\n"));
+    EXPECT_THAT(run.err, Not(HasSubstr("took too long")));
+}
+
+/// Stands between a process and whoever waits for it: killed, it stays there, as one that waits for a device.
+class Tracer {
+public:
+    explicit Tracer(pid_t traced) : process_(fork()) {
+        if (process_ == 0) {
+            ptrace(PTRACE_SEIZE, traced, nullptr, nullptr);
+            for (;;) {
+                pause();
+            }
+        }
+    }
+    Tracer(const Tracer&) = delete;
+    Tracer& operator=(const Tracer&) = delete;
+    ~Tracer() {
+        kill(process_, SIGKILL);
+        waitpid(process_, nullptr, 0);
+    }
+
+private:
+    pid_t process_;
+};
+
+HOST_TEST(EventProgram, ThatCannotBeKilledHoldsUpNothing) {
+    install(host,
+            "[ -e /var/process ] && exec echo next\n"
+            "echo $$ > /var/new && mv /var/new /var/process\nexec sleep 1000\n");
+    RunningProgram watch = CvagentRun(host)
+                               .telling("early late")
+                               .start({"watch", "--for", "1", "--exec", kProgram, "--exec-timeout", "0.8"});
+    ASSERT_TRUE(eventually([&] { return host.read("/var/process").has_value(); }));
+    const Tracer tracer(std::stoi(*host.read("/var/process")));
+    const Finished run = watch.wait(std::chrono::seconds(10));
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.err, HasSubstr("for event 1 took too long and cannot be killed; it is left behind\n"));
+    EXPECT_THAT(run.err, HasSubstr("next\n"));
+}
+
+HOST_TEST(EventProgram, ThatReadsNothingGetsWhatItTakes) {
+    install(host, "exec 0<&-\nsleep 0.05\n");
+    const Finished run =
+        CvagentRun(host).telling("early longalert late")({"watch", "--for", "0", "--exec", kProgram});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.err, Not(HasSubstr("/opt/on-alert")));
+}
+
+HOST_TEST(EventProgram, ThatVanishesIsTold) {
+    install(host, "rm /opt/on-alert\n");
+    const Finished run = CvagentRun(host).telling("early late")({"watch", "--for", "0", "--exec", kProgram});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.err, HasSubstr("cannot run '/opt/on-alert' for event 2: No such file or directory\n"));
+}
+
+HOST_TEST(EventProgram, ThatForksForEverIsEndedWithAllItHasStarted) {
+    install(host,
+            "for i in 1 2 3 4 5 6 7 8 9; do { while :; do sleep 1000 & sleep 0.01; done; } & done\nwait\n");
+    const Finished run = CvagentRun(host).telling("early late")(
+        {"watch", "--for", "0.2", "--exec", kProgram, "--exec-timeout", "0.2"});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.err, HasSubstr("for event 2 took too long and was ended\n"));
+    EXPECT_TRUE(eventually([&] { return !isRunning(host, "sleep"); }));
 }
 
 HOST_TEST(SeveralPlugins, MakeOneTreeAndOneThatFailsIsTold) {

@@ -17,6 +17,9 @@
 //   alert                   a thread sends one alert
 //   early                   initialize sends one alert, before the agent has seen any node
 //   late                    unload sends one alert
+//   longalert               alerts have a text of a megabyte
+//   publish                 initialize publishes a drive of its own
+//   drives                  there are twenty drives more
 //   chatter                 the thread of churn reports an error each time
 //   foreignids              initialize numbers its nodes from 1, whatever the agent says
 // CORVISTA_FAKE_PLUGIN_HOLD names a file: while it is there, what waits for it hangs.
@@ -223,6 +226,9 @@ public:
         if (told("early")) {
             sendAlert();
         }
+        if (told("publish")) {
+            addNewNode(makeDrive("/dev/sdc"));
+        }
         return told("badstart") ? Error(1, Number(), "no host here") : result;
     }
 
@@ -301,6 +307,9 @@ private:
         planar_ = add(make(chassis, 41, 0, "Planar"));
         disks_ = add(make(planar_, 50, 1, "Disk Controller"));
         add(makeDrive("/dev/sda"));
+        for (int i = 0; told("drives") && i < 20; ++i) {
+            add(makeDrive("/dev/x" + std::to_string(i)));
+        }
         const unsigned int network = add(make(chassis, 49, 0, "Network Controller"));
         auto* port = make(network, 12, 1, "Network Port");
         port->setProperty(108, PropertyValue("eth0", true));
@@ -343,7 +352,8 @@ private:
         }
         const auto [handler, context] = alertHandler();
         if (handler != nullptr) {
-            handler({IC::Alert(1, 0, {path}, 12, "NIC is Offline ")}, context);
+            const std::string text = told("longalert") ? std::string(1 << 20, 'x') : "NIC is Offline ";
+            handler({IC::Alert(1, 0, {path}, 12, text)}, context);
         }
     }
 

@@ -95,17 +95,59 @@ HOST_TEST(HostTools, ForcedChoicesRunNothing) {
     EXPECT_THAT(host.calls(), IsEmpty());
 }
 
-HOST_TEST(HostTools, OnlyTheAdaptersInUseComeFirst) {
+HOST_TEST(HostTools, OnlyTheAdaptersInUseComeFirstAndTheOthersLast) {
     installAdapters(host);
     host.tool("ifconfig lo", kClassicIfconfig);
-    cvagent::putAdaptersFirst(inspectHostTools(HostTools::automatic, Look::adapters, kAdapters));
+    cvagent::putAdaptersOnPath(inspectHostTools(HostTools::automatic, Look::adapters, kAdapters));
     EXPECT_EQ(std::string(std::getenv("PATH")),
-              "/opt/adapters/route:/opt/adapters/fdisk:/tools:/usr/sbin:/usr/bin:/sbin:/bin");
+              "/opt/adapters/route:/opt/adapters/fdisk:/tools:/usr/sbin:/usr/bin:/sbin:/bin:/opt/adapters/"
+              "ifconfig");
 }
 
 HOST_TEST(HostTools, ThePathStaysWhenNoAdapterIsUsed) {
-    cvagent::putAdaptersFirst(inspectHostTools(HostTools::native, Look::adapters, kAdapters));
+    cvagent::putAdaptersOnPath(inspectHostTools(HostTools::native, Look::adapters, kAdapters));
     EXPECT_EQ(std::string(std::getenv("PATH")), "/tools:/usr/sbin:/usr/bin:/sbin:/bin");
+}
+
+/// A link in sysfs, as the kernel shows a card.
+void addCard(FakeHost& host, const std::string& name) {
+    host.file("/sys/class/net/" + name + "/type", "1\n");
+    host.file("/sys/class/net/" + name + "/device/vendor", "0x8086\n");
+}
+
+const std::string kDeviceHeader = "Inter-|   Receive\n face |bytes    packets\n";
+
+HOST_TEST(HostTools, TheListingIsAdaptedWhereAnInterfaceHasOneOfTodaysNames) {
+    installAdapters(host);
+    host.file(std::string(kAdapters) + "/egrep/egrep", "#!/bin/sh\n", 0755);
+    host.tool("ifconfig lo", kClassicIfconfig);
+    host.tool("route -n", kRoute);
+    host.tool("fdisk -ls", kDisks);
+    host.file("/proc/net/dev", kDeviceHeader + "  eth0: 1 2\n");
+    addCard(host, "eth0");
+    EXPECT_THAT(adapted(inspectHostTools(HostTools::automatic, Look::adapters, kAdapters)), IsEmpty());
+    host.file("/proc/net/dev", kDeviceHeader + "  eth0: 1 2\nens18: 1 2\n");
+    addCard(host, "ens18");
+    const auto reports = inspectHostTools(HostTools::automatic, Look::adapters, kAdapters);
+    EXPECT_THAT(adapted(reports), TextsAre("egrep"));
+    EXPECT_EQ(reports.back().flaw, "finds no interfaces with names such as enp3s0");
+    EXPECT_THAT(adapted(inspectHostTools(HostTools::native, Look::adapters, kAdapters)), IsEmpty());
+}
+
+/// As while its package is upgraded.
+HOST_TEST(HostTools, AToolThatVanishesIsAnsweredByItsAdapter) {
+    host.tool("ethtool lo", "the host's own\n");
+    host.tool("brctl show", "the host's own\n");
+    host.tool("ifconfig lo", kClassicIfconfig);
+    const auto reports = inspectHostTools(HostTools::automatic, Look::adapters, cvagent::adapterDirectory());
+    cvagent::putAdaptersOnPath(reports);
+    const auto answers = [&] { return host.run({"sh", "-c", "ethtool lo; brctl show; ifconfig lo"}).out; };
+    EXPECT_EQ(answers(), "the host's own\nthe host's own\n" + kClassicIfconfig);
+    for (const char* tool : {"ethtool", "brctl", "ifconfig"}) {
+        host.toolMissing(tool);
+    }
+    EXPECT_THAT(answers(), testing::AllOf(testing::HasSubstr("Settings for lo:\n"),
+                                          testing::HasSubstr("lo        Link encap:Local Loopback")));
 }
 
 HOST_TEST(HostTools, EverythingIsLookedAtForTheDoctor) {
@@ -182,6 +224,26 @@ HOST_TEST(Doctor, TellsWhichAdaptersAreUsed) {
     EXPECT_THAT(run.out, testing::ContainsRegex("\nroute +not found +our adapter /.*/route\n"));
 }
 
+HOST_TEST(Doctor, NeedsNoPackageOnABareHost) {
+    for (const char* tool : {"ip link", "hostname -s"}) {
+        host.tool(tool, "");
+    }
+    host.tool("route -n", kRoute);
+    host.file("/proc/net/dev", kDeviceHeader + " ens18: 1 2\n");
+    addCard(host, "ens18");
+    const Finished run = host.run({CVAGENT_PROGRAM, "doctor"});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.out, testing::ContainsRegex("\nethtool +not found +our adapter /.*/ethtool\n"));
+    EXPECT_THAT(run.out,
+                testing::ContainsRegex(
+                    "\negrep +/.*egrep \\(finds no interfaces with names such as enp3s0\\) +our adapter "));
+    EXPECT_THAT(run.out,
+                testing::HasSubstr("Our adapters stand in for: ifconfig fdisk ethtool brctl egrep\n"));
+    EXPECT_THAT(run.out,
+                testing::HasSubstr("Our adapters stand by, should the host's own be removed: route\n"));
+    EXPECT_THAT(run.out, testing::EndsWith("Nothing is missing: no package needs to be installed.\n"));
+}
+
 HOST_TEST(Doctor, SpeaksJson) {
     host.tool("ifconfig lo", kModernIfconfig);
     const Finished run = host.run({CVAGENT_PROGRAM, "doctor", "--host-tools", "native", "--json"});
@@ -194,7 +256,8 @@ HOST_TEST(Doctor, SpeaksJson) {
     EXPECT_EQ(tools["ifconfig"]["used"], "/tools/ifconfig");
     EXPECT_EQ(tools["ifconfig"]["classic"], false);
     EXPECT_EQ(tools["brctl"]["host"], nullptr);
-    EXPECT_EQ(tools["brctl"]["adapter"], nullptr);
+    EXPECT_THAT(tools["brctl"]["adapter"], testing::EndsWith("/brctl/brctl"));
+    EXPECT_EQ(tools["ip"]["adapter"], nullptr);
     EXPECT_EQ(tools["brctl"]["used"], nullptr);
     EXPECT_EQ(tools["brctl"]["package"], "bridge-utils");
     EXPECT_NE(tools["brctl"]["purpose"], "");

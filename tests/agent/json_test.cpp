@@ -38,7 +38,7 @@ TEST(Json, TheTreeNamesThePluginAndEveryNode) {
     NodeList list;
     list.add(38, 0);
     list.add(59, 1);
-    const Json tree = Json::parse(cvagent::json::tree({"/lib/plugin.so"}, list.holdAll()));
+    const Json tree = Json::parse(cvagent::json::tree({"/lib/plugin.so"}, list.nodes()));
     EXPECT_EQ(tree["plugin"], "/lib/plugin.so");
     ASSERT_EQ(tree["nodes"].size(), 2U);
     EXPECT_EQ(tree["nodes"][1]["parent"], 1);
@@ -101,8 +101,17 @@ TEST(Json, EventsAreOneLine) {
         "\n");
 }
 
+TEST(Json, AWrittenEventNamesItsCaller) {
+    cvagent::Event event;
+    event.kind = cvagent::Event::Kind::written;
+    event.caller = "somebody";
+    EXPECT_EQ(Json::parse(cvagent::json::event(event))["caller"], "somebody");
+    event.caller.clear();
+    EXPECT_FALSE(Json::parse(cvagent::json::event(event)).contains("caller"));
+}
+
 TEST(Json, TheCatalogueTellsAllOfARow) {
-    const Json json = Json::parse(cvagent::json::catalogue({*cvagent::findProperty(29, 24)}));
+    const Json json = Json::parse(cvagent::json::catalogue({cvagent::findProperty(29, 24)}));
     ASSERT_EQ(json.size(), 1U);
     EXPECT_EQ(json[0]["class"], "ip-config");
     EXPECT_EQ(json[0]["id"], 24);

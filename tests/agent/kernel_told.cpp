@@ -97,7 +97,10 @@ bool KernelTold::isVisited(const std::string& name) const {
     if (info.value("info_slave_kind", "") == "bridge") {
         return false;
     }
-    return kind(name) == "bridge" || contains(name, "eth") || contains(name, "bond") || contains(name, "usb");
+    const std::string of = kind(name);
+    const bool wired = of == "veth" || of == "vlan" || of == "bond";
+    const bool named = contains(name, "eth") || contains(name, "bond") || contains(name, "usb");
+    return of == "bridge" || wired || (named && of != "vxlan");
 }
 
 bool KernelTold::isPort(const std::string& name) const {
@@ -154,6 +157,8 @@ Json KernelTold::port(const std::string& name) const {
                        {"121", name},
                        {"123", liveState(name)},
                        {"125", {0, 1, 12}},
+                       {"182", nullptr},  // no way to wake the host
+                       {"183", nullptr},
                        {"185", 0}};
     addMembership(name, properties);
     return {{"description", "Network Port"}, {"status", liveState(name)}, {"properties", properties}};

@@ -64,8 +64,17 @@ Json values(const Json& node) {
     return found;
 }
 
+/// Of values only those that are told; null for one that is not there.
+Json onlyTold(const Json& values, const Json& told) {
+    Json found = Json::object();
+    for (const auto& [id, value] : told.items()) {
+        found[id] = values.value(id, Json());
+    }
+    return found;
+}
+
 /// A host whose network is the kernel's, in a namespace of its own. The far ends of its cables ("sw0"...)
-/// have names that no tree shows.
+/// are in the same.
 class KernelTree : public HostFixture {
 protected:
     void setUpHost(FakeHost& host) override {
@@ -133,15 +142,23 @@ protected:
     }
     static void expectTreeAsTold(FakeHost& host) {
         const Json expected = KernelTold(host).nodes();
-        const Json found = shown(host);
+        Json found = shown(host);
+        for (const auto& [path, node] : expected.items()) {
+            if (found.contains(path)) {
+                found[path]["properties"] = onlyTold(found[path]["properties"], node["properties"]);
+            }
+        }
         EXPECT_EQ(found, expected) << "the way from what is told to what is shown: "
                                    << Json::diff(expected, found).dump(1);
     }
-    /// The names of the nodes that a tree shows, without the way to them.
+    /// The names of the nodes that a tree shows, without the way to them and the far ends of cables.
     static Lines names(const Json& nodes) {
         Lines found;
         for (const auto& [path, node] : nodes.items()) {
-            found.push_back(path.substr(path.rfind('/') + 1));
+            const std::string name = path.substr(path.rfind('/') + 1);
+            if (name.find(":sw") == std::string::npos) {
+                found.push_back(name);
+            }
         }
         return found;
     }
@@ -157,7 +174,7 @@ HOST_TEST_F(KernelTree, EqualsWhatTheToolsTell) {
                                      "ip-config:eth1", "network-port:eth2", "ip-config:eth2",
                                      "network-port:eth3", "ip-config:eth3", "network-port:eth5",
                                      "ip-config:eth5", "ip-config:br0", "ip-config:br1", "ip-config:ethmac"))
-        << "neither a bridge's member nor the far end of a cable";
+        << "no bridge's member";
 }
 
 HOST_TEST_F(KernelTree, ReadsLiveWhatTheToolsTellNow) {
@@ -170,9 +187,82 @@ HOST_TEST_F(KernelTree, ReadsLiveWhatTheToolsTellNow) {
     for (const auto& [path, node] : nodes.items()) {
         Json expected = node["properties"];
         expected["123"] = 12;
-        EXPECT_EQ(values(cvagent(host, {"get", path})), expected) << path;
+        EXPECT_EQ(onlyTold(values(cvagent(host, {"get", path})), expected), expected) << path;
     }
-    EXPECT_EQ(nodes.size(), 2U);
+    EXPECT_EQ(nodes.size(), 4U) << "both ends of the cable";
+}
+
+/// One interface of each way in which today's systems name theirs, and beside them what has a name that could
+/// be taken for a wired one.
+void wireTodaysNames(FakeHost& host) {
+    for (const char* command :
+         {"link add enp0s31f6 type veth peer name sw0", "link add ens18 type veth peer name sw1",
+          "link add eno1np0 type veth peer name sw2", "link add enx001122334455 type veth peer name sw3",
+          "link add wan0 type veth peer name sw4", "link set enp0s31f6 up", "link set ens18 up",
+          "link set sw0 up", "link add br0 type bridge", "link set wan0 master br0",
+          "link add vethdocker type veth peer name cont0", "link set vethdocker master br0",
+          "link add vxeth0 type vxlan id 5 dstport 4789 remote 192.0.2.1", "link set br0 up",
+          "address add 10.1.2.3/20 broadcast + dev ens18",
+          "address add 10.9.2.3/20 broadcast + dev enp0s31f6", "route add default via 10.1.0.1"}) {
+        const Finished done = host.run({"sh", "-c", std::string("ip ") + command});
+        ASSERT_EQ(done.status, 0) << command << ": " << done.err;
+    }
+}
+
+HOST_TEST_F(KernelTree, ShowsInterfacesWithTodaysNames) {
+    wireTodaysNames(host);
+    expectTreeAsTold(host);
+    EXPECT_THAT(names(shown(host)),
+                UnorderedElementsAre("network-port:enp0s31f6", "ip-config:enp0s31f6", "network-port:ens18",
+                                     "ip-config:ens18", "network-port:eno1np0", "ip-config:eno1np0",
+                                     "network-port:enx001122334455", "ip-config:enx001122334455",
+                                     "network-port:cont0", "ip-config:cont0", "ip-config:br0"));
+}
+
+HOST_TEST_F(KernelTree, WritesAnInterfaceWithOneOfTodaysNames) {
+    wireTodaysNames(host);
+    const std::string start = "BOOTPROTO=static\nIPADDR=10.1.2.3/20\n";
+    interfaceFile(host, "ens18", start);
+    const std::string file =
+        "/etc/sysconfig/network/ifcfg-eth-id-" + KernelTold(host).hardwareAddress("ens18");
+    const auto write = [&](const std::string& property, const std::string& value) {
+        const Finished run = host.run({CVAGENT_PROGRAM, "--plugin", CORVISTA_PLUGIN_FILE, "set",
+                                       "ip-config:ens18", property, value, "--yes"});
+        EXPECT_EQ(run.status, 0) << run.err;
+    };
+    write("IPv4Address", "10.1.2.9");
+    EXPECT_THAT(host.read(file).value_or(""), testing::HasSubstr("IPADDR=10.1.2.9\n"));
+    write("InterfaceState", "12");
+    EXPECT_FALSE(KernelTold(host).nodes().empty());
+    EXPECT_THAT(ip(host, "-o link show ens18").out, testing::Not(testing::HasSubstr("UP")));
+    write("InterfaceState", "1");
+    EXPECT_THAT(ip(host, "-o link show ens18").out, testing::HasSubstr(",UP"));
+}
+
+HOST_TEST_F(KernelTree, TellsOfAnInterfaceWithOneOfTodaysNames) {
+    wireTodaysNames(host);
+    wire(host, {"link set sw1 up", "link set ens18 up"});
+    host.file("/opt/vantrel/corvista/data/oshwminetind.dat", "ens18=12\n");
+    RunningProgram watch = host.start({CVAGENT_PROGRAM, "--plugin", CORVISTA_PLUGIN_FILE, "watch", "--json"});
+    EXPECT_TRUE(watch.waitForOutput("}\n"));
+    watch.signal(SIGTERM);
+    const Json alert = Json::parse(watch.wait().out);
+    EXPECT_EQ(alert["message"], "NIC is Online ");
+    EXPECT_THAT(alert["path"].get<std::string>(), testing::HasSubstr("ens18"));
+}
+
+/// The host without net-tools, ethtool and bridge-utils.
+HOST_TEST_F(KernelTree, IsTheSameOnABareHost) {
+    wireTodaysNames(host);
+    wire(host, cable("eth0", "sw7"));
+    const Json equipped = shown(host);
+    for (const char* tool : {"ethtool", "brctl"}) {
+        host.toolMissing(tool);
+    }
+    EXPECT_EQ(host.run({"sh", "-c", "command -v ethtool brctl ifconfig route"}).out, "");
+    const Json bare = shown(host);
+    EXPECT_EQ(bare, equipped) << Json::diff(equipped, bare).dump(1);
+    EXPECT_GT(equipped.size(), 10U);
 }
 
 /// Links that not every kernel has; their test says so and is skipped there.

@@ -8,8 +8,8 @@
 
 #include "agent/cli/json.h"
 #include "agent/core/tree.h"
-#include "mi/globals.h"
-#include "mi/os_hw_mi.h"
+#include "oshwmi/os_hw_mi.h"
+#include "tests/agent/node_list.h"
 #include "tests/indications/heard.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/plugin_access.h"
@@ -71,7 +71,7 @@ HOST_TEST(AThousandInterfaces, AreShownFoundAndWatched) {
     mi.createNetworkPortNodes(false);
 
     cvagent::setPaths(mi);
-    const auto nodes = mi.holdAll();
+    const auto nodes = cvagent::NodeRefOfTest::all(mi);
     EXPECT_EQ(cvagent::drawingOrder(nodes).size(), nodes.size());
     std::set<std::string> paths;
     const Json tree = Json::parse(cvagent::json::tree({"plug-in"}, nodes));

@@ -1,6 +1,22 @@
 #pragma once
 
+#include "agent/core/node_ref.h"
 #include "framework/ic/management_interface.h"
+
+namespace cvagent {
+
+/// Makes references to nodes that no agent has.
+struct NodeRefOfTest {
+    static std::vector<NodeRef> all(const IC::ManagementInterface& list) {
+        std::vector<NodeRef> nodes;
+        for (const Handle& node : list.holdAll()) {
+            nodes.push_back(NodeRef(nullptr, node));
+        }
+        return nodes;
+    }
+};
+
+}  // namespace cvagent
 
 /// A management interface that holds what a test puts into it.
 class NodeList : public IC::ManagementInterface {
@@ -13,4 +29,5 @@ public:
         appendNode(new IC::MutableNode(id, parent, miIds(), type, index));
         return id;
     }
+    std::vector<cvagent::NodeRef> nodes() const { return cvagent::NodeRefOfTest::all(*this); }
 };

@@ -178,7 +178,7 @@ HOST_TEST(CallersLimits, LeaveNoCoreWithWhatTheProgramKnows) {
     EXPECT_EQ(told(host), "0\n8\n") << "a service that a command restarts can raise it again";
 }
 
-// A limit of 0 is passed over where the kernel hands cores to a program.
+// A limit of 0 is ignored where the kernel hands cores to a program.
 HOST_TEST(CallersLimits, KeepACoreFromAProgramThatCollectsThem) {
     cvagent::prepareSurroundings({});
     rlimit limit{};
@@ -252,11 +252,53 @@ HOST_TEST(ClosedDescriptors, NoFileTakesTheirPlace) {
     cvagent.telling("errors");
     const Finished run = host.run(
         fromDirectory("/", cvagent.commandLine({"--log", "/var/log", "tree"}), "exec 0<&- 1>&- 2>&-"));
-    EXPECT_EQ(run.status, 0);
+    EXPECT_EQ(run.status, 1);  // nobody has seen the tree
     EXPECT_EQ(host.read("/opt/vantrel/corvista/data/.lock").value_or("(no file)"), "");
     EXPECT_THAT(host.read("/var/log").value_or(""), HasSubstr("first error"));
     EXPECT_THAT(host.read("/var/log").value_or(""), Not(HasSubstr("computer")));
     EXPECT_THAT(host.read("/var/log").value_or(""), Not(HasSubstr("the plug-in reports")));
+}
+
+/// Everything that prints.
+const std::vector<std::vector<std::string>> kPrinting = {{"tree"},
+                                                         {"tree", "--json"},
+                                                         {"get", "computer"},
+                                                         {"get", "computer", "--json"},
+                                                         {"set", "computer", "OwnerContact", "room 5"},
+                                                         {"watch", "--for", "0"},
+                                                         {"watch", "--for", "0", "--json"},
+                                                         {"properties"},
+                                                         {"properties", "--json"},
+                                                         {"doctor"},
+                                                         {"doctor", "--json"},
+                                                         {"--help"},
+                                                         {"get", "--help"},
+                                                         {"--version"}};
+
+void expectFailedOutput(FakeHost& host, const std::string& before, const std::string& message) {
+    for (const std::vector<std::string>& words : kPrinting) {
+        const std::vector<std::string> line = CvagentRun(host).telling("early").commandLine(words);
+        const Finished run = host.run(fromDirectory("/", line, before));
+        const std::string what = words.front() + " " + words.back();
+        EXPECT_EQ(run.status, 1) << what;
+        if (message.empty()) {
+            EXPECT_THAT(run.err, Not(HasSubstr("standard output"))) << what;
+        } else {
+            EXPECT_THAT(run.err, HasSubstr("cvagent: cannot write to standard output: " + message)) << what;
+        }
+    }
+}
+
+HOST_TEST(StandardOutput, ThatIsClosedIsAFailure) {
+    expectFailedOutput(host, "exec 1>&-", "Bad file descriptor");
+}
+
+HOST_TEST(StandardOutput, ThatTakesNothingMoreIsAFailure) {
+    expectFailedOutput(host, "exec 1>/dev/full", "No space left on device");
+}
+
+HOST_TEST(StandardOutput, ThatNobodyReadsAnyMoreNeedsNoMessage) {
+    expectFailedOutput(host, "mkfifo /var/fifo; exec 3<>/var/fifo 1>/var/fifo 3>&-; rm /var/fifo", "");
 }
 
 }  // namespace

@@ -9,6 +9,8 @@
 #include <filesystem>
 #include <set>
 
+#include "agent/core/process.h"
+#include "agent/core/signals.h"
 #include "agent/core/surroundings.h"
 #include "tests/agent/cvagent_run.h"
 #include "tests/agent/terminal.h"
@@ -78,6 +80,28 @@ HOST_TEST(Surroundings, SpeakTheLanguageThatTheParsersRead) {
     setenv("LC_ALL", "de_DE.UTF-8", 1);
     cvagent::prepareSurroundings({});
     EXPECT_STREQ(std::getenv("LC_ALL"), "C");
+}
+
+HOST_TEST(PreparedProcess, HasAllThatAnAgentNeeds) {
+    host.directory("/srv/real", 0700);
+    host.symlink("/srv/data", "real");
+    std::filesystem::current_path("/srv");
+    setenv("CORVISTA_DATA_DIR", "data", 1);
+    std::string plugin = "plugin.so";
+    cvagent::ProcessSettings settings;
+    settings.files = {&plugin};
+    settings.log.file = "log";
+    settings.hostTools = cvagent::HostTools::native;
+    const cvagent::PreparedProcess process(settings);
+    EXPECT_EQ(plugin, "/srv/plugin.so");
+    EXPECT_EQ(process.data().path(), "/srv/real/");
+    EXPECT_STREQ(std::getenv("CORVISTA_DATA_DIR"), "/srv/real/") << "where the plug-ins look";
+    EXPECT_TRUE(host.exists("/srv/log"));
+    EXPECT_EQ(process.agentSettings().data->path(), "/srv/real/");
+    EXPECT_NE(process.agentSettings().log, nullptr);
+    EXPECT_NE(cvagent::messageDescriptor(), STDERR_FILENO);
+    EXPECT_NE(cvagent::StopSignals::descriptor(), -1);
+    EXPECT_EQ(std::filesystem::current_path(), "/");
 }
 
 HOST_TEST(DataDirectory, IsMadeForItsOwnerAlone) {

@@ -4,6 +4,7 @@
 
 #include <gmock/gmock.h>
 #include <signal.h>
+#include <sys/stat.h>
 
 #include <nlohmann/json.hpp>
 
@@ -276,6 +277,34 @@ HOST_TEST(SuseMonitors, AStateChangeAcrossARestartRaisesOneAlert) {
     EXPECT_EQ(alert["path"], "/oshw/root/computer/chassis/network-controller/network-port:eth0");
     EXPECT_EQ(alert["codes"].dump(), R"({"first":3,"second":0,"event":1})");
     EXPECT_THAT(suse.run({"watch", "--json", "--for", "2"}).out, IsEmpty());
+}
+
+/// With the plug-in that lies beside the program.
+Finished ask(FakeHost& host, std::vector<std::string> words) {
+    words.insert(words.begin(), {CVAGENT_PROGRAM, "--host-tools", "native"});
+    return host.run(words, std::chrono::seconds(30));
+}
+
+HOST_TEST(SuseHost, TellsTheSameOfANodeWithAndWithoutTheProcessors) {
+    const SuseHost suse(host);
+    for (const std::string node : {"computer", "eth0", "11", "12", "13", "1", "processor:1",
+                                   "/oshw/root/computer/chassis/planar/processor:1",
+                                   "/oshw/root/computer/chassis/planar", "processor:2", "", ":1"}) {
+        const Finished quick = ask(host, {"get", node});
+        const Finished whole = ask(host, {"--log", "/tmp/log", "get", node});
+        EXPECT_EQ(quick.out, whole.out) << node;
+        EXPECT_EQ(quick.err, whole.err) << node;
+        EXPECT_EQ(quick.status, whole.status) << node;
+    }
+    EXPECT_THAT(ask(host, {"get", "processor:1"}).out, HasSubstr("2394"));
+}
+
+HOST_TEST(SuseHost, AsksForNoProcessorsWhereNothingDependsOnThem) {
+    const SuseHost suse(host);
+    host.remove("/proc/cpuinfo");
+    ASSERT_EQ(mkfifo("/proc/cpuinfo", 0600), 0);  // who reads it waits
+    EXPECT_EQ(ask(host, {"get", "computer", "108"}).status, 0);
+    EXPECT_EQ(ask(host, {"set", "computer", "116", "somebody"}).status, 0);
 }
 
 }  // namespace

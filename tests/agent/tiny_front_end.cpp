@@ -2,8 +2,8 @@
 // agent's library.
 #include <cstdio>
 
-#include "agent/core/agent.h"
-#include "agent/core/operations.h"
+#include "agent/core/process.h"
+#include "agent/core/property_words.h"
 
 namespace {
 
@@ -24,9 +24,12 @@ void printOne(const cvagent::Agent& agent, const char* name, const char* propert
 
 int main(int count, char** words) {
     try {
-        cvagent::prepareSurroundings({});
-        cvagent::AgentSettings settings;
-        settings.plugins = {words[1]};
+        std::string plugin = words[1];
+        cvagent::ProcessSettings wanted;
+        wanted.files = {&plugin};
+        const cvagent::PreparedProcess process(wanted);
+        cvagent::AgentSettings settings = process.agentSettings();
+        settings.plugins = {plugin};
         const cvagent::Agent agent(settings);
         count < 4 ? printAll(agent) : printOne(agent, words[2], words[3]);
         return 0;

@@ -22,4 +22,17 @@ HOST_TEST(TinyFrontEnd, HasItsOwnWordsForProblems) {
               "kind 5: there is no plug-in file '/nowhere.so'\n");
 }
 
+HOST_TEST(TinyFrontEnd, HasAPreparedProcess) {
+    host.directory("/srv");
+    const auto run = [&](const std::string& data) {
+        return host.run({"sh", "-c",
+                         "cd /srv && CORVISTA_DATA_DIR=" + data +
+                             " exec '" TINY_FRONT_END "' '" FAKE_PLUGIN_FILE "' computer HostName"});
+    };
+    EXPECT_EQ(run("data").out, "fake\n");
+    EXPECT_TRUE(host.read("/srv/data/.lock")) << "the name is meant from where the program was started";
+    EXPECT_EQ(run("").out, "kind 2: CORVISTA_DATA_DIR is empty\n");
+    EXPECT_EQ(run("").status, 12);
+}
+
 }  // namespace

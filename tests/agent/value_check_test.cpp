@@ -12,7 +12,7 @@ constexpr unsigned int kComputer = 40;
 constexpr unsigned int kIpConfig = 29;
 
 Value given(unsigned int nodeType, const std::string& name, const std::vector<std::string>& words) {
-    const auto row = cvagent::findProperty(nodeType, name);
+    const Property* row = cvagent::findProperty(nodeType, name);
     EXPECT_TRUE(row && row->writable()) << name;
     return row->check(*row, words);
 }
@@ -150,7 +150,8 @@ TEST(ValueCheck, HostileWordsSpoilAWholeList) {
 
 TEST(ValueCheck, OneValueIsOneWord) {
     for (const cvagent::NodeType type : {cvagent::NodeType::computer, cvagent::NodeType::ipConfig}) {
-        for (const Property& row : cvagent::propertiesOf(static_cast<unsigned int>(type))) {
+        for (const Property* each : cvagent::propertiesOf(static_cast<unsigned int>(type))) {
+            const Property& row = *each;
             if (row.writable() && row.kind != cvagent::Kind::texts) {
                 EXPECT_FALSE(row.check(row, {})) << row.name;
                 const std::vector<std::string> two = {"1", "1"};

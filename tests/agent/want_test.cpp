@@ -96,6 +96,7 @@ HOST_TEST(FewDescriptors, WhatIsMissingFromTheTreeIsTold) {
     EXPECT_THAT(run.err, HasSubstr("network-port, ip-config, processor, and more can be missing: "));
     EXPECT_THAT(run.err, HasSubstr("there are too few descriptors (limit 10)\n"
                                    "Raise the limit: ulimit -n 256\n"));
+    EXPECT_EQ(run.err.find("too few descriptors"), run.err.rfind("too few descriptors")) << "it is told once";
 }
 
 HOST_TEST(FewDescriptors, EveryCommandTellsAndFails) {

@@ -3,7 +3,7 @@
 
 #include "computer/time_zone.h"
 #include "mi/host_name.h"
-#include "mi/os_hw_mi.h"
+#include "oshwmi/os_hw_mi.h"
 #include "tests/computer/computer_tools.h"
 #include "tests/support/command_lines.h"
 #include "tests/support/fake_host.h"

@@ -5,7 +5,7 @@
 
 #include "computer/computer_node.h"
 #include "mi/globals.h"
-#include "mi/os_hw_mi.h"
+#include "oshwmi/os_hw_mi.h"
 #include "tests/computer/computer_host.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"

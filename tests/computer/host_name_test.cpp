@@ -3,9 +3,8 @@
 
 #include <gmock/gmock.h>
 
-#include "mi/globals.h"
 #include "mi/my_process.h"
-#include "mi/os_hw_mi.h"
+#include "oshwmi/os_hw_mi.h"
 #include "tests/computer/computer_host.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"

@@ -7,7 +7,7 @@
 #include <cstring>
 
 #include "mi/my_process.h"
-#include "mi/os_hw_mi.h"
+#include "oshwmi/os_hw_mi.h"
 #include "tests/computer/failing_calls.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"

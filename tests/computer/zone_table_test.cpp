@@ -1,4 +1,4 @@
-#include "computer/zone_table.h"
+#include "framework/qx/zone_table.h"
 
 #include <gmock/gmock.h>
 
@@ -56,7 +56,7 @@ unsigned int argument(long minutes) {
 TEST(ZoneTable, HoldsTheTwentyNineZonesRowByRow) {
     ASSERT_EQ(kExpected.size(), 29U);
     for (const Row& row : kExpected) {
-        const IC::Zone* zone = IC::findZone(argument(row.minutes));
+        const QX::Zone* zone = QX::findZone(argument(row.minutes));
         ASSERT_NE(zone, nullptr) << row.minutes;
         EXPECT_EQ(zone->offset, row.minutes);
         EXPECT_EQ(std::string("/usr/share/zoneinfo/") + zone->file, row.file);
@@ -67,7 +67,7 @@ TEST(ZoneTable, HoldsTheTwentyNineZonesRowByRow) {
 TEST(ZoneTable, HoldsNoOtherOffset) {
     std::vector<long> found;
     for (long minutes = -70000; minutes <= 70000; ++minutes) {
-        if (IC::findZone(argument(minutes)) != nullptr) {
+        if (QX::findZone(argument(minutes)) != nullptr) {
             found.push_back(minutes);
         }
     }
@@ -77,12 +77,12 @@ TEST(ZoneTable, HoldsNoOtherOffset) {
     }
     EXPECT_EQ(found, expected);
     for (const unsigned int offset : {UINT_MAX, UINT_MAX / 2, UINT_MAX / 2 + 1}) {
-        EXPECT_EQ(IC::findZone(offset), nullptr) << offset;
+        EXPECT_EQ(QX::findZone(offset), nullptr) << offset;
     }
 }
 
 TEST(ZoneTable, TakesWesternOffsetsInTwosComplement) {
-    const IC::Zone* zone = IC::findZone(4294967236U);
+    const QX::Zone* zone = QX::findZone(4294967236U);
     ASSERT_NE(zone, nullptr);
     EXPECT_STREQ(zone->file, "Atlantic/Azores");
 }

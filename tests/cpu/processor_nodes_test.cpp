@@ -6,8 +6,7 @@
 #include <thread>
 
 #include "framework/cvlog/logger.h"
-#include "mi/globals.h"
-#include "mi/os_hw_mi.h"
+#include "oshwmi/os_hw_mi.h"
 #include "tests/support/command_lines.h"
 #include "tests/support/failing_new.h"
 #include "tests/support/fake_host.h"

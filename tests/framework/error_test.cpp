@@ -38,7 +38,7 @@ TEST(Alert, IsAPlainValue) {
     EXPECT_EQ(copies[1].firstCode(), 3);
     EXPECT_EQ(copies[1].secondCode(), 4);
     EXPECT_EQ(copies[1].substitutions(), (std::vector<std::string>{"/oshw/root", "x"}));
-    EXPECT_EQ(copies[1].nodeId(), 12U);
+    EXPECT_EQ(copies[1].eventCode(), 12U);
     EXPECT_EQ(copies[1].message(), "NIC is Online ");
 }
 

@@ -72,6 +72,7 @@ TEST(MutableNode, AnUnknownPropertyFailsAndLeavesTheValueAlone) {
     const Error error = node.getProperty(999, value);
     EXPECT_EQ(error.getStatus(), Error::failure);
     EXPECT_EQ(error.text(), "no such property: 999");
+    EXPECT_EQ(error.code(), Number(IC::Error::kNoSuchProperty));
     EXPECT_TRUE(value == PropertyValue("before", true));
 }
 

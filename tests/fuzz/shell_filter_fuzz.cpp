@@ -6,6 +6,7 @@
 #include <unistd.h>
 
 #include <array>
+#include <cstdint>
 #include <cstdio>
 #include <cstdlib>
 #include <string>
@@ -20,13 +21,20 @@ using cvagent::shell::TextSource;
 using cvagent::shell::Words;
 
 struct Stage {
-    std::unique_ptr<Filter> (*make)(Words, bool);
+    std::unique_ptr<Filter> (*make)(Words, cvagent::shell::Manner);
     std::vector<std::string> words;  ///< the tool's name first
+    std::string program = {};        ///< another one than that
 };
 
-const std::vector<Stage>& stages() {
+cvagent::shell::Manner mannerOf(const std::string& program) {
+    return {true, program == "/usr/bin/busybox"};
+}
+
+/// The stages of the plug-in's commands; with the system's tools, with gawk and with busybox, where there are
+/// such.
+std::vector<Stage> makeStages() {
     using namespace cvagent::shell;
-    static const std::vector<Stage> all = {
+    std::vector<Stage> all = {
         {makeGrep, {"grep", "Speed"}},
         {makeGrep, {"grep", "^Disk"}},
         {makeGrep, {"grep", "^0.0.0.0"}},
@@ -51,6 +59,21 @@ const std::vector<Stage>& stages() {
         {makeMd5sum, {"md5sum"}},
         {makeSha1sum, {"sha1sum"}},
     };
+    const std::vector<Stage> usual = all;
+    for (const Stage& stage : usual) {
+        for (const std::string program : {"/usr/bin/gawk", "/usr/bin/busybox"}) {
+            const bool fits = stage.words.front() == "awk" || program == "/usr/bin/busybox";
+            if (fits && access(program.c_str(), X_OK) == 0 &&
+                stage.make(Words(stage.words).subspan(1), mannerOf(program)) != nullptr) {
+                all.push_back({stage.make, stage.words, program});
+            }
+        }
+    }
+    return all;
+}
+
+const std::vector<Stage>& stages() {
+    static const std::vector<Stage> all = makeStages();
     return all;
 }
 
@@ -61,7 +84,7 @@ struct Answer {
 };
 
 Answer ours(const Stage& stage, const std::string& input) {
-    const auto filter = stage.make(Words(stage.words).subspan(1), true);
+    const auto filter = stage.make(Words(stage.words).subspan(1), mannerOf(stage.program));
     filter->readFrom(std::make_unique<TextSource>(input));
     Answer answer;
     while (filter->pull(answer.out)) {
@@ -90,7 +113,8 @@ Answer theirs(const Stage& stage, const std::string& input) {
     }
     words.push_back(nullptr);
     pid_t tool = -1;
-    if (posix_spawnp(&tool, words.front(), &actions, nullptr, words.data(), environ) != 0) {
+    const char* const program = stage.program.empty() ? words.front() : stage.program.c_str();
+    if (posix_spawnp(&tool, program, &actions, nullptr, words.data(), environ) != 0) {
         abort();
     }
     posix_spawn_file_actions_destroy(&actions);

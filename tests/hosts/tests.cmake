@@ -6,4 +6,4 @@ target_compile_definitions(golden_test PRIVATE
   CORVISTA_BUILD_DIR="${CMAKE_BINARY_DIR}"
   CVAGENT_PROGRAM="$<TARGET_FILE:cvagent>"
   CORVISTA_PLUGIN_FILE="$<TARGET_FILE:vantrelcvicoshwmi>")
-add_dependencies(golden_test cvagent vantrelcvicoshwmi)
+add_dependencies(golden_test corvista-hosttools cvagent vantrelcvicoshwmi)

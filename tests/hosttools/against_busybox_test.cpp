@@ -166,8 +166,7 @@ INSTANTIATE_TEST_SUITE_P(Kinds, LinksAgainstBusybox, testing::ValuesIn(kKinds),
 
 TEST_F(AgainstBusybox, UnknownInterfaces) {
     setUp("ip link add v0 type veth peer name v1\nip address add 10.0.0.1/24 dev v0");
-    for (const char* name :
-         {"nope", "v0:77", "v", "v00", "nope:1", "averylongname01", "v0:averylongali", "-x"}) {
+    for (const char* name : {"nope", "v0:77", "v", "v00", "nope:1", "averylongname01", "v0:averylongali"}) {
         expectSame({"ifconfig", name});
         EXPECT_EQ(network().run({adapter("ifconfig"), name}).errors,
                   network().run({"busybox", "ifconfig", name}).errors);
@@ -265,7 +264,7 @@ protected:
 
 TEST_P(ChangesAgainstBusybox, LeaveTheSameBehind) {
     const auto busybox = [](const std::string& command) { return "busybox " + command; };
-    EXPECT_EQ(changed(adapter, GetParam()), changed(busybox, GetParam()));
+    EXPECT_EQ(changed(adapterAlone, GetParam()), changed(busybox, GetParam()));
 }
 
 INSTANTIATE_TEST_SUITE_P(
@@ -274,17 +273,15 @@ INSTANTIATE_TEST_SUITE_P(
         "ifconfig v0 up", "ifconfig v0 up;ifconfig v0 down", "ifconfig v2 down", "ifconfig v0 10.1.1.5",
         "ifconfig v0 10.1.1.5 netmask 255.255.255.0 broadcast 10.1.1.255",
         "ifconfig v2 netmask 255.255.255.0", "ifconfig v2 netmask 255.255.0.255",
-        "ifconfig v0 netmask 255.255.255.0", "ifconfig v2 netmask junk..", "ifconfig v0 junk..",
-        "ifconfig nope up", "ifconfig nope down", "ifconfig nope 10.1.1.5", "ifconfig nope netmask 255.0.0.0",
-        "ifconfig v0 10.1.1.5 down", "ifconfig v0:3 10.1.1.6",
+        "ifconfig v0 netmask 255.255.255.0", "ifconfig nope up", "ifconfig nope down",
+        "ifconfig nope 10.1.1.5", "ifconfig nope netmask 255.0.0.0", "ifconfig v0 10.1.1.5 down",
+        "ifconfig v0:3 10.1.1.6",
         "ifconfig v0:3 10.1.1.6;ifconfig v0:3 netmask 255.255.0.0;ifconfig v0:3 down", "ifconfig v2 0.0.0.0",
         "ifconfig v2 default", "ifconfig v0 10.1.1.5 up netmask 255.255.255.252",
-        "ifconfig v2 10.7.0.2 netmask junk.. broadcast 10.7.0.3", "ifconfig v2 broadcast 10.7.7.7",
-        "ifconfig v2 pointopoint 10.7.7.7", "ifconfig v2 dstaddr 10.7.7.7", "ifconfig v0 300.1.1.1..",
+        "ifconfig v2 broadcast 10.7.7.7", "ifconfig v2 pointopoint 10.7.7.7", "ifconfig v2 dstaddr 10.7.7.7",
         "route del -host 10.8.8.8 gw 10.7.0.8 v2", "route del -host 10.8.8.8 gw 10.7.0.7 v2",
         "route del -host 10.8.8.8", "route del -host 10.8.8.9 gw 10.7.0.8 v2",
-        "route del -host 10.8.8.8 gw 10.7.0.8 nope", "route del -host junk.. gw 10.7.0.8 v2",
-        "route del -host 10.8.8.8 gw junk.. v2", "route del default", "route del default gw 10.7.0.9 v2",
+        "route del -host 10.8.8.8 gw 10.7.0.8 nope", "route del default", "route del default gw 10.7.0.9 v2",
         "route del default gw 10.7.0.8", "route add default gw 10.7.0.9",
         "route add default gw 10.7.0.7 metric 5 dev v2;route del default metric 5",
         "route add default gw 10.7.0.7 metric 5 dev v2", "route add -host 10.9.9.9 dev v2",
@@ -298,13 +295,54 @@ TEST_F(AgainstBusybox, UnreadableChangesChangeNothing) {
         "ip link add v0 type veth peer name v1\nip address add 10.0.0.1/24 dev v0\n"
         "ip link set v0 addrgenmode none; ip link set v0 up");
     const std::string state = network().shell("ip address; ip route").output;
-    for (const char* words :
-         {"ifconfig v0 netmask", "ifconfig v0 broadcast", "ifconfig v0 mtu 1400", "route", "route -e",
-          "route add", "route del -host", "route del 10.0.0.5", "route -A inet6 del default",
-          "route -A inet6 add default gw 10.0.0.9", "route -A ipx -n", "route -A", "route change default",
-          "route -n extra", "route add default gw", "route add default metric x v0",
-          "route del default v0 v1"}) {
-        const Outcome outcome = network().shell(adapter(words));
+    for (const char* words : {"ifconfig v0 netmask",
+                              "ifconfig v0 broadcast",
+                              "ifconfig v0 mtu 1400",
+                              "route",
+                              "route -e",
+                              "route add",
+                              "route del -host",
+                              "route del 10.0.0.5",
+                              "route -A inet6 del default",
+                              "route -A inet6 add default gw 10.0.0.9",
+                              "route -A ipx -n",
+                              "route -A",
+                              "route change default",
+                              "route -n extra",
+                              "route add default gw",
+                              "route add default metric x v0",
+                              "route del default v0 v1",
+                              "ifconfig v0 ''",
+                              "ifconfig '' up",
+                              "ifconfig ''",
+                              "ifconfig :1",
+                              "ifconfig -x",
+                              "ifconfig v0 10.0.0.9 mtu 1400",
+                              "ifconfig v0 down hw ether 02:00:00:00:00:09",
+                              "ifconfig v0 10.0.0.9 netmask junk..",
+                              "ifconfig v0 down 300.1.1.1",
+                              "ifconfig v0 down 10.0.0.9/8",
+                              "ifconfig v0 10.0.0.8 10.0.0.9",
+                              "ifconfig v0 down netmask 255.0.0.0 netmask 255.255.0.0",
+                              "ifconfig v0 down broadcast 10.0.0.9 broadcast 10.0.0.8",
+                              "ifconfig v0averyverylongname down",
+                              "route add default gw 10.0.0.8 gw 10.0.0.9",
+                              "route add default gw 10.0.0.8 metric 3x",
+                              "route add default gw 10.0.0.8 metric 3 metric 4",
+                              "route add default gw 10.0.0.8 metric -1",
+                              "route add -net 10.9.0.0 netmask 255.0.0.0 netmask 255.255.0.0 v0",
+                              "route add default gw 10.0.0.8 dev",
+                              "route add -net 10.9.0.0 netmask 255.255.0.0 reject",
+                              "route add -net 10.9.0.0/16 v0",
+                              "route add default gw 10.0.0.8 window 8000",
+                              "route add default gw ''",
+                              "route add ''",
+                              "route del ''",
+                              "route add default gw 10.0.0.8 dev v0averyverylong",
+                              "route add default gw router",
+                              "route add -host 10.9.9.9 netmask 255.255.0.0 v0",
+                              "route add default gw 10.0.0.8 metric ''"}) {
+        const Outcome outcome = network().shell(adapterAlone(words));
         EXPECT_EQ(outcome.status, 1) << words;
         EXPECT_EQ(outcome.output, "") << words;
         EXPECT_NE(outcome.errors, "") << words;

@@ -73,6 +73,10 @@ std::string adapter(const std::string& command) {
     return HOSTTOOLS_ADAPTERS "/" + command.substr(0, command.find(' ')) + "/" + command;
 }
 
+std::string adapterAlone(const std::string& command) {
+    return "HOSTTOOLS_HANDED_OVER=already " + adapter(command);
+}
+
 bool hasProgram(const std::string& name) {
     return shell("command -v " + name).status == 0;
 }

@@ -20,5 +20,7 @@ Outcome run(const Words& words, const std::function<void()>& before = {});
 Outcome shell(const std::string& command);
 /// A command of one of the adapters, or its name alone, with the path of the adapter's link.
 std::string adapter(const std::string& command);
+/// The same on a host that has no other tool of that name.
+std::string adapterAlone(const std::string& command);
 /// @return whether PATH leads to such a program
 bool hasProgram(const std::string& name);

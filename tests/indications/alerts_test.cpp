@@ -90,7 +90,7 @@ void expectAlert(const Change& expected) {
     EXPECT_EQ(alert.message(), expected.message);
     EXPECT_EQ(alert.firstCode(), expected.firstCode);
     EXPECT_EQ(alert.secondCode(), 0);
-    EXPECT_EQ(alert.nodeId(), expected.eventCode);
+    EXPECT_EQ(alert.eventCode(), expected.eventCode);
     EXPECT_THAT(alert.substitutions(), TextsAre("/ports/eth0"));
     IC::PropertyValue state;
     change.node.getProperty(123, state);
@@ -156,7 +156,7 @@ HOST_TEST(Alerts, AreNoneForAnInterfaceWithoutANode) {
 HOST_TEST(Alerts, AreNoneForAMemberOfABondWhateverItsState) {
     for (const unsigned int now : {1U, 12U, 32U, 33U}) {
         OneChange change(99, now);
-        IC::OSHWMI_IND::pass().slaves = {"eth5", "eth0"};
+        Interfaces::slaves() = {"eth5", "eth0"};
         LogCapture capture;
         change.check();
         EXPECT_THAT(change.agent.alerts, IsEmpty());

@@ -7,7 +7,7 @@
 #include "framework/ic/mutable_node.h"
 #include "indications/globals.h"
 #include "mi/command.h"
-#include "mi/globals.h"
+#include "oshwmi/os_hw_mi.h"
 #include "tests/support/plugin_access.h"
 
 /// An interface's node whose state a test sets.
@@ -51,9 +51,11 @@ public:
         return *node;
     }
     IC::OsHwMI& mi() { return mi_; }
-    /// What a pass on this thread works on.
-    static std::map<std::string, unsigned int>& current() { return IC::OSHWMI_IND::pass().current; }
-    static std::map<std::string, unsigned int>& previous() { return IC::OSHWMI_IND::pass().previous; }
+    /// What the steps of a pass work on when a test calls them.
+    static IC::LinkStates& current() { return IC::OsHwMITestAccess::pass().now.current; }
+    static IC::LinkStates& previous() { return IC::OsHwMITestAccess::pass().previous; }
+    static std::vector<std::string>& slaves() { return IC::OsHwMITestAccess::pass().now.slaves; }
+    static std::vector<std::string>& untold() { return IC::OsHwMITestAccess::pass().now.untold; }
 
 private:
     IC::OsHwMI& mi_ = IC::myoshwmi;

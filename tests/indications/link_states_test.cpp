@@ -34,10 +34,7 @@ public:
         return interfaces.current().at("bond0");
     }
     /// As writing and reading the file does it.
-    void nextPass() {
-        interfaces.previous() = interfaces.current();
-        IC::OSHWMI_IND::pass().slaves.clear();
-    }
+    void nextPass() { interfaces.previous() = interfaces.current(); }
 
     Interfaces interfaces;
     InterfaceNode& eth0;
@@ -83,9 +80,9 @@ HOST_TEST(LinkStates, StayAsTheyWereWhereACommandWasEnded) {
     interfaces.mi().createCurNetNodeMap();
     EXPECT_THAT(interfaces.current(), ElementsAre(Pair("eth0", 12), Pair("eth1", 1), Pair("eth3", 12)))
         << "eth2 has none yet";
-    EXPECT_THAT(IC::OSHWMI_IND::pass().untold, TextsAre("eth1", "eth2"));
+    EXPECT_THAT(Interfaces::untold(), TextsAre("eth1", "eth2"));
     interfaces.mi().createCurNetNodeMap();
-    EXPECT_THAT(IC::OSHWMI_IND::pass().untold, TextsAre("eth1", "eth2")) << "those of the last pass alone";
+    EXPECT_THAT(Interfaces::untold(), TextsAre("eth1", "eth2")) << "those of the last pass alone";
 }
 
 HOST_TEST(LinkStates, OfANodeThatCannotBeReadStayToo) {
@@ -166,7 +163,7 @@ HOST_TEST(LinkStates, GatherTheMembersOfAllBonds) {
     bond.interfaces.add("bond1", 1);
     LogCapture capture;
     bond.interfaces.mi().createCurNetNodeMap();
-    EXPECT_THAT(IC::OSHWMI_IND::pass().slaves, TextsAre("eth0", "eth1", "eth7.100", "eth8"));
+    EXPECT_THAT(Interfaces::slaves(), TextsAre("eth0", "eth1", "eth7.100", "eth8"));
     EXPECT_THAT(capture.ownMessages(3000),
                 testing::IsSupersetOf({"Calling bondedNetNodeStatus() for bonded interface: bond0",
                                        "bondedNetNodeStatus: entry",
@@ -227,7 +224,7 @@ HOST_TEST(LinkStates, OfMembersRaiseNoAlertWhenTheirBondDoesNotTellOfThem) {
     bond.nextPass();
     bond.eth0.is(12);
     EXPECT_EQ(bond.state(), 1U);
-    EXPECT_THAT(IC::OSHWMI_IND::pass().slaves, TextsAre("eth0", "eth1"));
+    EXPECT_THAT(Interfaces::slaves(), TextsAre("eth0", "eth1"));
     EXPECT_EQ(bond.interfaces.current().at("eth0"), 1U);
     EXPECT_EQ(bond.interfaces.current().at("eth7"), 12U);
     bond.nextPass();
@@ -242,7 +239,7 @@ HOST_TEST(LinkStates, OfMembersRaiseNoAlertWhenTheirBondItselfCannotBeRead) {
     hanging.hangs = true;
     bond.eth1.is(12);
     bond.state();
-    EXPECT_THAT(IC::OSHWMI_IND::pass().slaves, testing::Contains("eth1"));
+    EXPECT_THAT(Interfaces::slaves(), testing::Contains("eth1"));
     EXPECT_EQ(bond.interfaces.current().at("bond7"), 12U);
     EXPECT_EQ(bond.interfaces.current().at("eth1"), 1U);
 }
@@ -258,7 +255,7 @@ HOST_TEST(LinkStates, OfABondWithoutAStatusFileAreItsOwn) {
     interfaces.add("bond0", 12);
     interfaces.mi().createCurNetNodeMap();
     EXPECT_THAT(interfaces.current(), ElementsAre(Pair("bond0", 12)));
-    EXPECT_THAT(IC::OSHWMI_IND::pass().slaves, IsEmpty());
+    EXPECT_THAT(Interfaces::slaves(), IsEmpty());
 }
 
 }  // namespace

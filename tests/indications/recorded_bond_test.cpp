@@ -33,7 +33,6 @@ public:
         plugin_.mi().createCurNetNodeMap();
         plugin_.mi().checkAndSendNetAlert();
         plugin_.mi().writePrevNetNodeMap();
-        IC::OSHWMI_IND::pass().slaves.clear();
         return heard_.now();
     }
     IC::MutableNode& bond() { return *plugin_.config("bond0"); }

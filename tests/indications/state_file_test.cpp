@@ -64,7 +64,9 @@ HOST_TEST(StateFile, KeepsTheKeysOfInterfacesThatHaveDisappeared) {
 }
 
 HOST_TEST(StateFile, LosesADamagedLineAlone) {
-    host.file(kFile, "eth0=1\nrubbish\neth1=twelve\neth2=12x\neth3=\neth4=33\n");
+    host.file(kFile,
+              "eth0=1\nrubbish\neth1=twelve\neth2=12x\neth3=\neth4=33\neth5=+1\neth6= "
+              "1\neth7=-1\neth9=4294967296\n");
     Interfaces interfaces;
     interfaces.previous() = {{"eth8", 1}};
     interfaces.mi().readPrevNetNodeMap();

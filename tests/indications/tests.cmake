@@ -1,5 +1,6 @@
 corvista_test(indications SOURCES
   indications/alerts_test.cpp
+  indications/comparison_test.cpp
   indications/kernel_links_test.cpp
   indications/link_states_test.cpp
   indications/network_monitor_test.cpp
@@ -7,6 +8,5 @@ corvista_test(indications SOURCES
   indications/state_file_test.cpp
   support/failing_new.cpp
   LIBRARIES plugin_code test_support LABELS threads)
-set_source_files_properties(indications/network_monitor_test.cpp indications/recorded_bond_test.cpp indications/state_file_test.cpp PROPERTIES SKIP_UNITY_BUILD_INCLUSION ON)
 # The links of a real kernel are asked with our own classic tools too.
 add_dependencies(indications_test corvista-hosttools)

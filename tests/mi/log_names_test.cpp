@@ -10,13 +10,13 @@
 #include "computer/system_data.h"
 #include "computer/time_zone.h"
 #include "indications/globals.h"
-#include "mi/os_hw_mi.h"
 #include "network/address_queries.h"
 #include "network/esx.h"
 #include "network/interface_lists.h"
 #include "network/ipv4_writer.h"
 #include "network/lan_endpoint_node.h"
 #include "network/link_queries.h"
+#include "oshwmi/os_hw_mi.h"
 #include "tests/mi/operation_names.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"
@@ -255,7 +255,7 @@ void pass(IC::OsHwMI& mi, IC::Error (*handler)(const std::vector<IC::Alert>&, co
           unsigned int before) {
     mi.registerForAlerts(handler, nullptr);
     mi.readPrevNetNodeMap();
-    IC::OSHWMI_IND::pass().previous = {{"bond0", before}, {"eth0", before}, {"eth1", before}};
+    IC::OsHwMITestAccess::pass().previous = {{"bond0", before}, {"eth0", before}, {"eth1", before}};
     mi.createCurNetNodeMap();
     mi.checkAndSendNetAlert();
     mi.writePrevNetNodeMap();

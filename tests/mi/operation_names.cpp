@@ -13,16 +13,15 @@ using Names = std::map<std::string, std::set<std::string>>;
 // What the rooms' operations are made of: nobody outside calls it, and no log line carries its name.
 const std::set<std::string> kHelpers = {
     "mi/command.h",
+    "mi/host_node.h",
     "mi/line_file.h",
     "mi/log.h",
     "mi/property_table.h",
     "mi/text.h",
-    "indications/contained.h",
     "network/port_walk.h",
     "network/routes_file.h",
     "network/interface_file.h",
     "network/ip_facts.h",
-    "storage/storage_build.h",
 };
 
 std::string sourceOf(const std::string& room) {
@@ -79,6 +78,11 @@ private:
     void open() {
         static const std::regex scope(
             R"re(^\s*(template <.*>\s*)?(namespace|class|struct|extern)\b[^(=]*$)re");
+        static const std::regex nodeClass(R"re(class (\w+) :+ public NodeOf<)re");
+        if (std::smatch node; std::regex_search(statement_, node, nodeClass)) {
+            names_[node[1]].insert(sourceOf(room_));
+            names_['~' + node[1].str()].insert(sourceOf(room_));
+        }
         if (std::regex_search(statement_, scope)) {
             isPublic_.push_back(isPublic_.back() && statement_.find("class ") == std::string::npos);
             statement_.clear();
@@ -129,7 +133,7 @@ private:
 
 Names operationNames(const fs::path& tree) {
     Names names;
-    for (const char* room : {"mi", "computer", "storage", "network", "indications", "cpu"}) {
+    for (const char* room : {"mi", "computer", "storage", "network", "indications", "cpu", "oshwmi"}) {
         for (const auto& entry : fs::directory_iterator(tree / room)) {
             const std::string name = fs::relative(entry.path(), tree);
             if (name.ends_with(".h") && !kHelpers.contains(name)) {

@@ -4,6 +4,7 @@
 
 #include <array>
 #include <cstring>
+#include <limits>
 
 namespace {
 
@@ -59,6 +60,24 @@ TEST(Strreplace, AcceptsAnEmptyText) {
     Buffer buffer("");
     EXPECT_STREQ(IC::strreplace(buffer.data.data(), ':', '-'), "");
     EXPECT_EQ(buffer.data[1], '\0');
+}
+
+TEST(LeadingDecimal, IsTheNearestThatFits) {
+    EXPECT_EQ(IC::leadingDecimal("1000Mb/s"), 1000);
+    EXPECT_EQ(IC::leadingDecimal(" -7\n"), -7);
+    EXPECT_EQ(IC::leadingDecimal("4294967296"), 4294967296);
+    EXPECT_EQ(IC::leadingDecimal("99999999999999999999"), std::numeric_limits<long long>::max());
+    EXPECT_EQ(IC::leadingDecimal("-99999999999999999999"), std::numeric_limits<long long>::min());
+}
+
+TEST(LeadingDecimal, TellsWhatStandsBehindIt) {
+    std::string rest;
+    EXPECT_EQ(IC::leadingDecimal("100baseT", &rest), 100);
+    EXPECT_EQ(rest, "baseT");
+    EXPECT_EQ(IC::leadingDecimal(" x1", &rest), 0);
+    EXPECT_EQ(rest, " x1") << "no number";
+    EXPECT_EQ(IC::leadingDecimal("", &rest), 0);
+    EXPECT_EQ(rest, "");
 }
 
 TEST(SignedDecimal, PrintsWhatNoIntHoldsAsANegativeNumber) {

@@ -1,7 +1,7 @@
 #include "network/dns.h"
 
-#include "mi/os_hw_mi.h"
 #include "network/ip_origin.h"
+#include "oshwmi/os_hw_mi.h"
 #include "tests/network/killed_writer.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/log_capture.h"

@@ -2,6 +2,7 @@
 
 #include <sys/mount.h>
 
+#include "network/route_queries.h"
 #include "tests/network/killed_writer.h"
 #include "tests/support/command_lines.h"
 #include "tests/support/fake_host.h"

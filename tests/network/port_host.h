@@ -5,7 +5,7 @@
 #include <vector>
 
 #include "mi/globals.h"
-#include "mi/os_hw_mi.h"
+#include "oshwmi/os_hw_mi.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/plugin_access.h"
 

@@ -3,6 +3,7 @@
 #include <algorithm>
 
 #include "mi/globals.h"
+#include "oshwmi/os_hw_mi.h"
 #include "tests/network/bonding_files.h"
 #include "tests/support/command_lines.h"
 #include "tests/support/log_capture.h"

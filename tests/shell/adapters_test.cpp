@@ -3,7 +3,9 @@
 
 #include <fstream>
 #include <regex>
+#include <thread>
 
+#include "agent/shell/kernel_news.h"
 #include "agent/shell/programs.h"
 #include "agent/shell/runner.h"
 #include "tests/shell/both_ways.h"
@@ -25,7 +27,12 @@ constexpr const char* kListings[] = {"ifconfig",
                                      "ifconfig -a | grep two",
                                      "route -n",
                                      "route -A inet6 -n | grep one | tr -s ' ' | cut -d ' ' -f2",
-                                     "fdisk -ls"};
+                                     "fdisk -ls",
+                                     "ethtool lo",
+                                     "ethtool one | grep \"Link detected\"",
+                                     "ethtool one 2> /dev/null | grep Speed | tr -s ' ' | cut -d ' ' -f2",
+                                     "egrep 'eth|bond|usb' /proc/net/dev | tr -s ' ' | cut -d ' ' -f2",
+                                     "brctl show"};
 
 constexpr const char* kChanges[] = {"link add one type veth peer name two",
                                     "link set one up",
@@ -60,7 +67,7 @@ std::size_t processesStarted() {
 void useAdapters() {
     setenv("LC_ALL", "C", 1);
     std::string path;
-    for (const std::string tool : {"fdisk", "ifconfig", "route"}) {
+    for (const std::string tool : {"brctl", "egrep", "ethtool", "fdisk", "ifconfig", "route"}) {
         path += std::string(HOSTTOOLS_LINKS) + "/" + tool + ":";
     }
     setenv("PATH", (path + std::getenv("PATH")).c_str(), 1);
@@ -94,18 +101,52 @@ HOST_TEST(Adapters, ListWhatTheKernelHasNow) {
     }
 }
 
+HOST_TEST(Adapters, AreAskedAnewAtOnceWhenARouteGoesWithItsNextHop) {
+    host.useKernelNetwork();
+    host.realTool("ip");
+    useAdapters();
+    for (const std::string change :
+         {"link add one type veth peer name two", "link set one up", "link set two up",
+          "address add 192.0.2.7/24 dev one", "nexthop add id 7 via 192.0.2.1 dev one",
+          "route add 198.51.100.0/24 nhid 7"}) {
+        ASSERT_EQ(inShell("ip " + change, Complaints::seen).err, "");
+    }
+    const auto shown = [] { return direct("route -n", Complaints::unseen).out; };
+    ASSERT_TRUE(eventually([&] { return shown().find("198.51.100.0") != std::string::npos; }));
+    std::this_thread::sleep_for(std::chrono::milliseconds(200));  // until what is told is kept
+    shown();
+    inShell("ip nexthop delete id 7", Complaints::seen);
+    EXPECT_EQ(shown().find("198.51.100.0"), std::string::npos);
+}
+
+HOST_TEST(Adapters, ReadTheKernelAnewWhenNewsWereLost) {
+    host.useKernelNetwork();
+    host.realTool("ip");
+    cvagent::shell::KernelNews news;
+    EXPECT_FALSE(news.isQuiet());
+    EXPECT_TRUE(news.isQuiet());
+    std::string batch = "link add one type veth peer name two\n";
+    for (int i = 0; i < 1000; ++i) {
+        batch += "link set one alias " + std::string(200, static_cast<char>('a' + i % 26)) + '\n';
+    }
+    host.file("/tmp/batch", batch);
+    ASSERT_EQ(inShell("ip -batch /tmp/batch", Complaints::seen).err, "");
+    EXPECT_FALSE(news.isQuiet());
+    EXPECT_TRUE(news.isQuiet());
+}
+
 HOST_TEST(Adapters, NeedNoProcess) {
     host.useKernelNetwork();
     host.realTool("ip");
     useAdapters();
-    for (const char* command : {"ifconfig", "ifconfig lo", "route -n"}) {
+    for (const char* command : {"ifconfig", "ifconfig lo", "route -n", "ethtool lo", "brctl show"}) {
         const auto stream = cvagent::shell::openCommand(command);
         ASSERT_TRUE(stream.has_value());
         EXPECT_EQ(processesStarted(), 0U) << command;
         cvagent::shell::closeCommand(*stream);
     }
-    for (const char* command :
-         {"ifconfig lo up", "route del default", "fdisk -l /dev/sda", "ifconfig nosuch"}) {
+    for (const char* command : {"ifconfig lo up", "route del default", "fdisk -l /dev/sda", "ifconfig nosuch",
+                                "ethtool -i lo", "brctl show br0", "egrep lo /proc/net/dev"}) {
         const auto stream = cvagent::shell::openCommand(command);
         ASSERT_TRUE(stream.has_value());
         EXPECT_EQ(processesStarted(), 1U) << command;

@@ -128,6 +128,7 @@ std::vector<std::string> productCommands(const std::string& name) {
         "ifconfig " + name + " 2> /dev/null | grep \"inet addr:\" | tr -s ' ' | cut -d: -f4 2> /dev/null",
         "ip -6 address show dev " + name + " | grep \"global\"",
         "cat /var/lib/dhcpcd/dhcpcd-" + name + ".info 2> /dev/null",
+        "cat /var/lib/dhcpv6/client6.leases* 2> /dev/null | grep SDUID | cut -d ' ' -f3 2> /dev/null",
         "cat /var/lib/dhcpcd/dhcpcd-" + name +
             ".info 2> /dev/null | grep DHCPSID | cut -d '=' -f2 2> /dev/null",
         "ethtool " + name + " 2> /dev/null | grep Speed | tr -s ' ' | cut -d ' ' -f2 2> /dev/null",

@@ -119,4 +119,95 @@ HOST_TEST(Filters, HandALineThatIsTooLongToNobody) {
     EXPECT_EQ(direct("cat /etc/input | tr -s b", Complaints::seen).out, "b");
 }
 
+/// Has another program stand for a tool, as on a host that has it as its own.
+void install(FakeHost& host, const std::string& tool, const std::string& program) {
+    host.toolMissing(tool);
+    host.symlink("/usr/bin/" + tool, "/.bin/" + program);
+}
+
+void compareAll(FakeHost& host, const std::vector<std::string>& commands) {
+    for (const std::string& input : inputs()) {
+        // What no other tool has made anything else of is left out, for each line here starts a shell.
+        if (input.find_first_of(std::string("\0\t\v_", 4)) == std::string::npos && !input.ends_with('*')) {
+            continue;
+        }
+        host.file("/etc/input", input);
+        for (const std::string& command : commands) {
+            const Ran ours = direct(command, Complaints::unseen);
+            EXPECT_FALSE(ours.inShell) << command;
+            EXPECT_EQ(ours, inShell(command, Complaints::unseen))
+                << command << " of " << input.substr(0, 200);
+        }
+    }
+}
+
+HOST_TEST(Filters, PrintWhatGawkPrints) {
+    if (!host.exists("/.bin/gawk")) {
+        GTEST_SKIP() << "gawk is not installed here";
+    }
+    setenv("LC_ALL", "C", 1);
+    const std::vector<std::string> commands = {
+        "cat /etc/input | awk '{print $1}'", "cat /etc/input | awk '{print $5}'",
+        "cat /etc/input | awk '{print $NF}'", "cat /etc/input | awk '{print $1}' | grep -v b"};
+    if (host.exists("/.bin/mawk")) {  // whichever of the two is the host's own
+        install(host, "awk", "mawk");
+        compareAll(host, commands);
+    }
+    install(host, "awk", "gawk");
+    ASSERT_NE(inShell("awk --version | grep 'GNU Awk'", Complaints::seen).out, "");
+    compareAll(host, commands);
+    for (const char* variable : {"GAWK_READ_TIMEOUT", "GAWK_PERSIST_FILE", "AWKBUFSIZE"}) {
+        setenv(variable, "1", 1);
+        EXPECT_TRUE(direct("echo b | awk '{print $1}'", Complaints::unseen).inShell) << variable;
+        unsetenv(variable);
+    }
+}
+
+/// As on a host that has them all from busybox, of the release that the filters know.
+bool installBusybox(FakeHost& host) {
+    for (const std::string tool :
+         {"awk", "cat", "cut", "egrep", "grep", "head", "md5sum", "rm", "sha1sum", "tr"}) {
+        install(host, tool, "busybox");
+    }
+    return inShell("/.bin/busybox | head -n 1", Complaints::unseen)
+        .out.starts_with("BusyBox v1.35.0 (Debian");
+}
+
+HOST_TEST(Filters, PrintWhatBusyboxPrints) {
+    setenv("LC_ALL", "C", 1);
+    if (!installBusybox(host)) {
+        GTEST_SKIP() << "no busybox is installed here, or another release of it";
+    }
+    std::vector<std::string> commands = {"cat /etc/input", "grep b /etc/input", "grep -v b /etc/input",
+                                         "grep ^b /etc/input", "egrep 'b|x' /etc/input"};
+    for (const std::string stage : kStages) {
+        commands.push_back("cat /etc/input | " + stage);
+    }
+    commands.emplace_back("cat /etc/input | cut -d ' ' -f1 | grep -v x | awk '{print $1}' | cat");
+    compareAll(host, commands);
+}
+
+HOST_TEST(Filters, LeaveToBusyboxWhatItSaysInItsOwnWay) {
+    setenv("LC_ALL", "C", 1);
+    if (!installBusybox(host)) {
+        GTEST_SKIP() << "no busybox is installed here, or another release of it";
+    }
+    host.file("/etc/input", "b c\n");
+    for (const std::string command :
+         {"cat /etc/none", "cat /etc/none 2> /dev/null", "cat /etc 2> /dev/null",
+          "grep b /etc/none 2> /dev/null", "grep b /etc 2> /dev/null", "rm /etc/none 2> /dev/null",
+          "rm -rf /etc/none", "cat /etc/input | grep -P 'b\\nc' 2> /dev/null",
+          "cat /etc/input | cut -d ' ' -f1 > /tmp/out; cat /tmp/out",
+          "cat /etc/input > /tmp/out; cat /tmp/out", "grep b /etc/input > /tmp/out; rm /tmp/out"}) {
+        const Ran theirs = inShell(command, Complaints::seen);
+        const Ran ours = direct(command, Complaints::seen);
+        EXPECT_TRUE(ours.inShell || ours == theirs) << command;
+    }
+    host.directory("/var/full");
+    host.fullDisk("/var/full");
+    EXPECT_TRUE(direct("cat /etc/input | cut -d ' ' -f1 > /var/full/out", Complaints::seen).inShell);
+    EXPECT_EQ(direct("cat /etc/input > /var/full/out", Complaints::seen),
+              inShell("cat /etc/input > /var/full/out", Complaints::seen));
+}
+
 }  // namespace

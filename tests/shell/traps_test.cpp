@@ -1,10 +1,16 @@
 // What a runner that only looks like a shell gets wrong.
+#include <dlfcn.h>
+#include <fcntl.h>
 #include <gmock/gmock.h>
+#include <poll.h>
+#include <spawn.h>
 #include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <atomic>
+#include <cerrno>
 #include <csignal>
 #include <filesystem>
 #include <fstream>
@@ -12,6 +18,7 @@
 
 #include "agent/shell/child.h"
 #include "agent/shell/runner.h"
+#include "agent/shell/starts.h"
 #include "tests/shell/both_ways.h"
 #include "tests/support/fake_host.h"
 
@@ -22,6 +29,9 @@ using both_ways::direct;
 using both_ways::inShell;
 using cvagent::shell::closeCommand;
 using cvagent::shell::openCommand;
+
+/// The error that the system has for whoever wants a process; 0 for none.
+std::atomic<int> spawnFails = 0;
 
 /// A command line that is known to be run without a shell.
 class Running {
@@ -208,6 +218,51 @@ HOST_TEST(Traps, NothingIsOpenedThatCanHang) {
     }
 }
 
+HOST_TEST(Traps, WhoReadsAPipeSeesNoneThatComesAndGoes) {
+    inC();
+    host.file("/etc/lines", "some\n");
+    ASSERT_EQ(mkfifo("/tmp/fifo", 0600), 0);
+    const int reader = open("/tmp/fifo", O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    EXPECT_FALSE(openCommand("cat /etc/lines > /tmp/fifo").has_value());
+    pollfd asked{reader, POLLIN, 0};
+    EXPECT_EQ(poll(&asked, 1, 0), 0) << "its writer has gone";
+    close(reader);
+}
+
+HOST_TEST(Traps, AFileThatCannotBeReadIsToldAsTheToolsTellIt) {
+    inC();
+    const std::string file = "/.proc/" + std::to_string(getpid()) + "/mem";  // EIO at its begin
+    for (const std::string& command : {"cat " + file, "grep x " + file, "grep -v x " + file,
+                                       "cat " + file + " 2> /dev/null | grep x", "egrep 'a|b' " + file}) {
+        const auto ours = direct(command, Complaints::seen);
+        EXPECT_FALSE(ours.inShell) << command;
+        EXPECT_EQ(ours, inShell(command, Complaints::seen)) << command;
+    }
+}
+
+HOST_TEST(Traps, WithoutProcessesThereIsNoCommand) {
+    inC();
+    host.file("/etc/lines", "some\n");
+    const auto before = cvagent::shell::notStarted().count;
+    spawnFails = EAGAIN;
+    for (const char* command : {"seq 3", "seq 3 | cat", "cat `seq 3` | cat", "cat /etc/li* | cat"}) {
+        errno = 0;
+        EXPECT_EQ(openCommand(command), std::optional<FILE*>(nullptr)) << command;
+        EXPECT_EQ(errno, EAGAIN) << command;
+    }
+    EXPECT_EQ(cvagent::shell::runCommand("seq 3"), -1);
+    EXPECT_EQ(cvagent::shell::notStarted().count, before + 5);
+    EXPECT_EQ(Running("cat /etc/lines | grep o").line(), "some\n");
+    {
+        Running running("cat /etc/lines; seq 3; cat /etc/lines");
+        EXPECT_EQ(running.line(), "some\n");
+        EXPECT_EQ(running.line(), "");
+        EXPECT_EQ(running.end(), 2 << 8);
+    }
+    spawnFails = 0;
+    EXPECT_EQ(Running("seq 3").line(), "1\n");
+}
+
 HOST_TEST(Traps, AHugeFileIsReadByWhatCanBeKilled) {
     inC();
     host.file("/etc/huge", "");
@@ -277,6 +332,44 @@ HOST_TEST(Traps, WantOfDescriptorsIsOverWhenThereAreSomeAgain) {
 }
 #endif
 
+/// As long ago as a change must be to be told from one that follows.
+void madeLongAgo(const std::string& directory) {
+    std::filesystem::last_write_time(directory,
+                                     std::filesystem::file_time_type::clock::now() - std::chrono::hours(1));
+}
+
+HOST_TEST(Traps, AToolThatAppearsIsSeenAtOnce) {
+    inC();
+    host.directory("/opt/bin");
+    host.symlink("/opt/bin/cut", "/opt/later");
+    host.directory("/opt/empty");
+    host.symlink("/opt/way", "/opt/empty");
+    host.file("/opt/other/grep", "#!/bin/sh\necho scripted\n", 0755);
+    const std::string before = std::getenv("PATH");
+    setenv("PATH", ("/opt/bin:" + before).c_str(), 1);
+    // A directory's last change is its making, which nobody can set: so it is looked at when that is past.
+    std::this_thread::sleep_for(std::chrono::milliseconds(2050));
+    for (int turn = 0; turn < 2; ++turn) {
+        EXPECT_FALSE(direct("echo b:c | grep b | cut -d : -f1", Complaints::seen).inShell);
+    }
+    host.file("/opt/later", "#!/bin/sh\necho linked\n", 0755);
+    EXPECT_EQ(inShell("echo b:c | cut -d : -f1", Complaints::seen).out, "linked\n");
+    EXPECT_TRUE(direct("echo b:c | cut -d : -f1", Complaints::seen).inShell);
+    host.file("/opt/bin/grep", "#!/bin/sh\necho scripted\n", 0755);
+    EXPECT_TRUE(direct("echo b | grep b", Complaints::seen).inShell);
+    host.remove("/opt/bin/grep");
+    EXPECT_FALSE(direct("echo b | grep b", Complaints::seen).inShell);
+    setenv("PATH", ("/opt/way:" + before).c_str(), 1);
+    EXPECT_FALSE(direct("echo b | grep b", Complaints::seen).inShell);
+    host.remove("/opt/way");
+    host.symlink("/opt/way", "/opt/other");
+    EXPECT_TRUE(direct("echo b | grep b", Complaints::seen).inShell);
+    setenv("PATH", ("/opt/bin:" + before).c_str(), 1);
+    host.file("/opt/bin/grep", "#!/bin/sh\necho scripted\n", 0755);
+    madeLongAgo("/opt/bin");
+    EXPECT_TRUE(direct("echo b | grep b", Complaints::seen).inShell);
+}
+
 HOST_TEST(Traps, AFileLimitEndsNobodyButTheTool) {
     inC();
     host.file("/etc/lines", "some\n");
@@ -338,3 +431,16 @@ HOST_TEST(Traps, ManyThreadsRunCommandsSideBySide) {
 }
 
 }  // namespace
+
+// Stands in front of the C library's for the runner in this program.
+extern "C" __attribute__((visibility("default"))) int posix_spawn(pid_t* process, const char* path,
+                                                                  const posix_spawn_file_actions_t* actions,
+                                                                  const posix_spawnattr_t* attributes,
+                                                                  char* const words[],
+                                                                  char* const variables[]) {
+    using Spawn = int (*)(pid_t*, const char*, const posix_spawn_file_actions_t*, const posix_spawnattr_t*,
+                          char* const[], char* const[]);
+    static const auto next = reinterpret_cast<Spawn>(dlsym(RTLD_NEXT, "posix_spawn"));
+    const int error = spawnFails;
+    return error != 0 ? error : next(process, path, actions, attributes, words, variables);
+}

@@ -11,6 +11,7 @@
 #include "mi/disk_snapshot.h"
 #include "mi/globals.h"
 #include "mi/node_types.h"
+#include "oshwmi/os_hw_mi.h"
 #include "tests/storage/storage_host.h"
 #include "tests/support/texts_are.h"
 

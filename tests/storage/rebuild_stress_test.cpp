@@ -4,8 +4,8 @@
 #include <thread>
 
 #include "mi/disk_snapshot.h"
-#include "mi/globals.h"
 #include "mi/node_types.h"
+#include "oshwmi/os_hw_mi.h"
 #include "tests/storage/storage_host.h"
 
 namespace {

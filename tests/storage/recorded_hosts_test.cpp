@@ -5,7 +5,7 @@
 #include <sstream>
 
 #include "mi/disk_snapshot.h"
-#include "mi/globals.h"
+#include "oshwmi/os_hw_mi.h"
 #include "tests/storage/storage_host.h"
 
 namespace {

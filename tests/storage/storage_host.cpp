@@ -1,4 +1,5 @@
 #include "tests/storage/storage_host.h"
+#include "oshwmi/os_hw_mi.h"
 
 #include <chrono>
 #include <fstream>
@@ -17,7 +18,7 @@ std::unique_ptr<CommandLines> started;
 
 std::string pathOf(const IC::Node& node) {
     IC::PropertyValue path;
-    node.getProperty(IC::HardDriveNode::devicePath, path);
+    node.getProperty(89, path);
     return std::string(path);
 }
 
@@ -127,11 +128,11 @@ void StorageHost::tearDownHost(FakeHost&) {
 }
 
 std::vector<Seen> StorageHost::drives() {
-    return look(IC::NodeType::hardDrive, IC::HardDriveNode::driveSize);
+    return look(IC::NodeType::hardDrive, 37);
 }
 
 std::vector<Seen> StorageHost::partitions() {
-    return look(IC::NodeType::partition, IC::DiskPartition::partitionBlocks);
+    return look(IC::NodeType::partition, 112);
 }
 
 std::vector<std::shared_ptr<IC::MutableNode>> StorageHost::nodesOfType(unsigned int type) {

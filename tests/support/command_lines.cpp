@@ -76,16 +76,21 @@ NoDescriptors::~NoDescriptors() {
 namespace {
 
 using Popen = FILE* (*)(const char*, const char*);
+using System = int (*)(const char*);
 
-/// As cvagent runs the plug-in's commands; CORVISTA_TEST_SHELLS=1 has real shells run them all.
-FILE* run(const char* line, const char* mode) {
-    static const auto next = reinterpret_cast<Popen>(dlsym(RTLD_NEXT, "popen"));
-    static const bool inShells = [] {
+/// Commands run as cvagent runs the plug-in's; CORVISTA_TEST_SHELLS=1 has real shells run them all.
+bool inShells() {
+    static const bool all = [] {
         QX::setKillWitness(cvagent::shell::noteKill);
         const char* const wish = std::getenv("CORVISTA_TEST_SHELLS");
         return wish != nullptr && *wish == '1';
     }();
-    const auto direct = inShells ? std::nullopt : cvagent::shell::openCommand(line);
+    return all;
+}
+
+FILE* run(const char* line, const char* mode) {
+    static const auto next = reinterpret_cast<Popen>(dlsym(RTLD_NEXT, "popen"));
+    const auto direct = inShells() ? std::nullopt : cvagent::shell::openCommand(line);
     return direct ? *direct : next(line, mode);
 }
 
@@ -98,4 +103,11 @@ extern "C" __attribute__((visibility("default"))) FILE* popen(const char* line, 
         return nullptr;
     }
     return shell_stub::open(line, mode, run);
+}
+
+extern "C" __attribute__((visibility("default"))) int system(const char* line) {
+    static const auto next = reinterpret_cast<System>(dlsym(RTLD_NEXT, "system"));
+    const bool shell = line == nullptr || inShells();
+    const auto direct = shell ? std::nullopt : cvagent::shell::runCommand(line);
+    return direct ? *direct : next(line);
 }

@@ -35,7 +35,7 @@ void teaming(Text port, unsigned int id, std::string master) {
 void readLinkState(Text name) {
     const IC::IPConfigNode node(1, 1, {1}, 1, 1, name);
     IC::PropertyValue value;
-    static_cast<void>(node.getProperty(IC::IPConfigNode::linkState, value));
+    static_cast<void>(node.getProperty(123, value));
 }
 
 /// The nodes of an earlier text go first.

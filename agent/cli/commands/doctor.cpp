@@ -14,7 +14,7 @@ std::string found(const ToolReport& report) {
     if (report.native.empty()) {
         return "not found";
     }
-    return report.native + (report.classic ? "" : " (not the classic format)");
+    return report.native + (report.classic ? "" : " (" + report.flaw + ")");
 }
 
 std::string outcome(const ToolReport& report, const Style& style) {
@@ -40,8 +40,21 @@ std::string advice(const std::vector<ToolReport>& reports) {
     for (const std::string& package : packages) {
         text += " " + package;
     }
-    return text.empty() ? "Nothing is missing.\n"
+    return text.empty() ? "Nothing is missing: no package needs to be installed.\n"
                         : "To install what is missing: apt-get install" + text + "\n";
+}
+
+/// Which adapters stand in, and which of them answer only while a tool of the host is away.
+std::string adaptersInUse(const std::vector<ToolReport>& reports) {
+    std::string inUse;
+    std::string standBy;
+    for (const ToolReport& report : reports) {
+        (report.useAdapter ? inUse : standBy) +=
+            report.useAdapter || report.standsBy ? " " + report.tool : "";
+    }
+    return (inUse.empty() ? "" : "Our adapters stand in for:" + inUse + "\n") +
+           (standBy.empty() ? ""
+                            : "Our adapters stand by, should the host's own be removed:" + standBy + "\n");
 }
 
 std::string table(const std::vector<ToolReport>& reports, const Style& style) {
@@ -53,7 +66,7 @@ std::string table(const std::vector<ToolReport>& reports, const Style& style) {
     for (const ToolReport& report : reports) {
         text += padded(report.tool, 10) + padded(found(report), width + 2) + outcome(report, style) + "\n";
     }
-    return text + "\n" + advice(reports);
+    return text + "\n" + adaptersInUse(reports) + advice(reports);
 }
 
 }  // namespace

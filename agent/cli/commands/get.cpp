@@ -3,7 +3,7 @@
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/json.h"
 #include "agent/cli/print.h"
-#include "agent/core/operations.h"
+#include "agent/core/property_words.h"
 
 namespace cvagent::commands {
 
@@ -33,7 +33,7 @@ std::string listing(const IC::MutableNode& node, const std::vector<Reading>& rea
 /// know some, but it must have answered.
 ExitStatus verdict(const IC::MutableNode& node, const std::vector<Reading>& readings, bool named) {
     const auto failed = [](const Reading& reading) { return reading.failed(); };
-    const auto unknown = [](const Reading& reading) { return reading.missing && !reading.row; };
+    const auto unknown = [](const Reading& reading) { return reading.missing && reading.row == nullptr; };
     if (named && std::any_of(readings.begin(), readings.end(), unknown)) {
         complain("there is no such property; see: cvagent properties " + className(node.nodeType()));
         return ExitStatus::notFound;

@@ -23,7 +23,7 @@ std::vector<NodeClass> wantedClasses(const std::string& name) {
 }
 
 const char* accessText(const Property& row) {
-    if (!row.readable()) {
+    if (!row.readable) {
         return "write";
     }
     return row.writable() ? "read, write" : "read";
@@ -59,12 +59,12 @@ std::string describe(const Property& row, const Style& style) {
 
 std::string describeClass(const NodeClass& nodeClass, const Style& style) {
     std::string text = style.strong(nodeClass.name) + "\n";
-    const std::vector<Property> rows = propertiesOf(static_cast<unsigned int>(nodeClass.type));
+    const std::vector<const Property*> rows = propertiesOf(static_cast<unsigned int>(nodeClass.type));
     if (rows.empty()) {
         return text + "  no properties\n";
     }
-    for (const Property& row : rows) {
-        text += describe(row, style);
+    for (const Property* row : rows) {
+        text += describe(*row, style);
     }
     return text;
 }
@@ -73,7 +73,7 @@ std::string describeClass(const NodeClass& nodeClass, const Style& style) {
 
 ExitStatus properties(const Options& options) {
     const Style style = Style::detect();
-    std::vector<Property> rows;
+    std::vector<const Property*> rows;
     std::string text;
     for (const NodeClass& nodeClass : wantedClasses(options.nodeClass)) {
         const auto own = propertiesOf(static_cast<unsigned int>(nodeClass.type));

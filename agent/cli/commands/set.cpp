@@ -1,51 +1,12 @@
-#include <poll.h>
-#include <unistd.h>
-
-#include <cstdio>
-
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/json.h"
 #include "agent/cli/print.h"
-#include "agent/core/operations.h"
-#include "agent/core/signals.h"
+#include "agent/cli/prompt.h"
+#include "agent/core/property_words.h"
 
 namespace cvagent::commands {
 
 namespace {
-
-/// The line that is typed, with its line break. Less at the end of input and when a signal comes.
-std::string typedLine() {
-    const OrderlyEnd waiting;
-    std::string line;
-    for (char typed = 0; typed != '\n' && StopSignals::received() == 0;) {
-        pollfd ready[] = {{STDIN_FILENO, POLLIN, 0}, {StopSignals::descriptor(), POLLIN, 0}};
-        if (poll(ready, 2, -1) < 0 || ready[0].revents == 0) {
-            continue;
-        }
-        if (read(STDIN_FILENO, &typed, 1) != 1) {
-            break;
-        }
-        line += typed;
-    }
-    return line;
-}
-
-/// Restarting and halting are asked for twice.
-void confirm(PowerAction action) {
-    const std::string what = action == PowerAction::restart ? "restart" : "halt";
-    if (isatty(STDIN_FILENO) != 1) {
-        throw Failure(ExitStatus::usage, "this would " + what + " the host; add --yes to do it");
-    }
-    ask("This will " + what + " the host at once. Go on? [y/N] ");
-    const std::string answer = typedLine();
-    if (StopSignals::received() != 0) {
-        ask("\n");
-        throw Interrupted();
-    }
-    if (answer != "y\n" && answer != "Y\n" && answer != "yes\n") {
-        throw Failure(ExitStatus::refused, "nothing was done");
-    }
-}
 
 std::string shown(const Reading& reading) {
     return reading.failed() ? printable(reading.complaint()) : valueText(reading.row, reading.value);
@@ -62,10 +23,10 @@ std::string report(const IC::MutableNode& node, const WriteResult& result, bool 
 
 ExitStatus set(Session& session, const Options& options) {
     const NodeRef node = session.agent().find(options.node);
-    const Property row = writableRow(*node, options.property);
+    const Property& row = writableRow(*node, options.property);
     const IC::PropertyValue value = acceptedValue(row, options.values);
-    if (const PowerAction action = powerAction(row, value); action != PowerAction::none && !options.yes) {
-        confirm(action);
+    if (const Label* drastic = drasticLabel(row, value); drastic != nullptr && !options.yes) {
+        confirm(drastic->text);
     }
     const Request request = ownRequest();
     const WriteResult result = session.agent().write(node, row, value, request);
@@ -73,8 +34,8 @@ ExitStatus set(Session& session, const Options& options) {
     if (result.problem) {
         throw Problem(*result.problem);
     }
-    print(options.json ? json::change(*node, row.readable() ? result.before : result.after, result.after)
-                       : report(*node, result, row.readable(), Style::detect()));
+    print(options.json ? json::change(*node, row.readable ? result.before : result.after, result.after)
+                       : report(*node, result, row.readable, Style::detect()));
     if (result.outcome == WriteResult::differs) {
         complain(std::string("the host still has another value: ") + row.meaning);
     }

@@ -1,36 +1,20 @@
-#include <map>
-
+#include "agent/core/tree.h"
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/json.h"
 #include "agent/cli/print.h"
-#include "agent/core/tree.h"
 
 namespace cvagent::commands {
 
 namespace {
-
-/// The facts that tell nodes of a class apart at a glance.
-std::vector<unsigned int> tellingIds(unsigned int nodeType) {
-    static const std::map<NodeType, std::vector<unsigned int>> ids = {
-        {NodeType::computer, {108}},
-        {NodeType::hardDrive, {37}},
-        {NodeType::partition, {112}},
-        {NodeType::networkPort, {123, 57}},
-        {NodeType::team, {198, 165}},
-        {NodeType::processor, {80}},
-        {NodeType::ipConfig, {123, 25, 26, 27}}};
-    const auto found = ids.find(static_cast<NodeType>(nodeType));
-    return found == ids.end() ? std::vector<unsigned int>() : found->second;
-}
 
 bool saysNothing(const IC::PropertyValue& value) {
     const std::string text = static_cast<std::string>(value);
     return text.empty() || text == "0.0.0.0" || text == "0";
 }
 
-/// A stored value as a fact: the label of a code, the larger of two units.
+/// A stored value in short: the label of a code, the larger of two units.
 std::string fact(const Property& row, const IC::PropertyValue& value) {
-    std::string text = valueText(row, value);
+    std::string text = valueText(&row, value);
     const bool coded = !row.labels.empty() && text.ends_with(')');
     if (coded) {
         const std::size_t start = text.find('(') + 1;
@@ -40,13 +24,18 @@ std::string fact(const Property& row, const IC::PropertyValue& value) {
     return larger == std::string::npos ? text : text.substr(larger + 2);
 }
 
+/// What tells the node from others of its class.
 std::string facts(const IC::MutableNode& node) {
+    const NodeClass* nodeClass = findClass(node.nodeType());
+    if (nodeClass == nullptr) {
+        return {};
+    }
     const Properties stored = storedProperties(node);
     std::string text;
-    for (const unsigned int id : tellingIds(node.nodeType())) {
+    for (const unsigned int id : nodeClass->telling) {
         const auto value = stored.find(id);
-        const auto row = findProperty(node.nodeType(), id);
-        if (value != stored.end() && row && !saysNothing(value->second)) {
+        const Property* row = findProperty(node.nodeType(), id);
+        if (value != stored.end() && row != nullptr && !saysNothing(value->second)) {
             text += (text.empty() ? "" : ", ") + fact(*row, value->second);
         }
     }
@@ -66,7 +55,7 @@ std::string branch(const std::vector<bool>& last, const Style& style) {
     return text;
 }
 
-std::string drawing(const std::vector<Handle>& nodes, const Style& style) {
+std::string drawing(const std::vector<NodeRef>& nodes, const Style& style) {
     std::string text;
     for (const Placed& placed : drawingOrder(nodes)) {
         const IC::MutableNode& node = *placed.node;
@@ -83,7 +72,7 @@ std::string drawing(const std::vector<Handle>& nodes, const Style& style) {
 }  // namespace
 
 ExitStatus tree(Session& session, const Options& options) {
-    const std::vector<Handle> nodes = handlesOf(session.agent().nodes());
+    const std::vector<NodeRef> nodes = session.agent().nodes();
     print(options.json ? json::tree(session.agent().plugins(), nodes) : drawing(nodes, Style::detect()));
     return ExitStatus::done;
 }

@@ -6,7 +6,7 @@ namespace cvagent::oshw {
 
 namespace {
 
-constexpr Label kPower[] = {{"on", 1, true}, {"restart", 9, true}, {"halt", 12, true}};
+constexpr Label kPower[] = {{"on", 1, true}, {"restart", 9, true, true}, {"halt", 12, true, true}};
 
 constexpr auto kOwnerAccepts = "text of up to 1024 bytes without control characters; \"\" removes it";
 

@@ -1,6 +1,7 @@
 // IP configurations: what can be changed on the host's interfaces.
 #include "agent/core/oshw/tables.h"
 #include "agent/core/value_check.h"
+#include "framework/ic/link_state.h"
 
 namespace cvagent::oshw {
 
@@ -8,8 +9,12 @@ namespace {
 
 constexpr Label kOrigins[] = {{"unknown", 0}, {"DHCP", 1, true}, {"BOOTP", 2}, {"static", 3, true}};
 constexpr Label kLeaseOrigins[] = {{"DHCP", 1}, {"static", 3}};
-constexpr Label kStates[] = {{"up", 1, true},    {"up", 9, true},       {"down", 12, true},
-                             {"down", 16, true}, {"switched over", 32}, {"switched back", 33}};
+constexpr Label kStates[] = {{"up", IC::LinkState::up, true},
+                             {"up", IC::LinkState::bringUp, true},
+                             {"down", IC::LinkState::down, true},
+                             {"down", IC::LinkState::takeDown, true},
+                             {"switched over", IC::LinkState::switchedOver},
+                             {"switched back", IC::LinkState::switchedBack}};
 constexpr Label kProtocols[] = {{"IPv4", 4096}, {"IPv6", 4097}, {"IPv4 and IPv6", 4098}};
 constexpr Label kAddressTypes[] = {{"IPv4", 2}, {"IPv6", 5}, {"IPv4 and IPv6", 7}};
 constexpr Label kEnumerate[] = {{"now", 1, true}};
@@ -52,7 +57,7 @@ constexpr Property kIpConfigRows[] = {
     {ip, 29, "IPv6InterfaceId", Kind::text, Unit::none, {}, "fourth group of the IPv6 address"},
     {ip, 47, "Protocol", Kind::number, Unit::none, kProtocols, "the protocols the interface carries"},
     {ip, 74, "EnumeratePorts", Kind::number, Unit::none, kEnumerate,
-     "writing 1 looks for interfaces that have appeared", check::code, nullptr, true},
+     "writing 1 looks for interfaces that have appeared", check::code, nullptr, false},
     {ip, 93, "DHCPServers", Kind::texts, Unit::none, {}, "the servers that leased the addresses"},
     {ip,
      94,

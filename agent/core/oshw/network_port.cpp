@@ -1,11 +1,15 @@
 // Network ports, LAN endpoints and teams.
 #include "agent/core/oshw/tables.h"
+#include "framework/ic/link_state.h"
 
 namespace cvagent::oshw {
 
 namespace {
 
-constexpr Label kLinkStates[] = {{"up", 1}, {"down", 12}, {"switched over", 32}, {"switched back", 33}};
+constexpr Label kLinkStates[] = {{"up", IC::LinkState::up},
+                                 {"down", IC::LinkState::down},
+                                 {"switched over", IC::LinkState::switchedOver},
+                                 {"switched back", IC::LinkState::switchedBack}};
 constexpr Label kPortTypes[] = {
     {"unknown", 0},       {"other", 1},        {"10BaseT", 50},
     {"10-100BaseT", 51},  {"100BaseT", 52},    {"1000BaseT", 53},

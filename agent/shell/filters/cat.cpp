@@ -11,7 +11,7 @@ public:
 
 }  // namespace
 
-std::unique_ptr<Filter> makeCat(Words words, bool /*silent*/) {
+std::unique_ptr<Filter> makeCat(Words words, Manner /*manner*/) {
     return words.empty() ? std::make_unique<Cat>() : nullptr;
 }
 

@@ -11,9 +11,15 @@ namespace {
 /// One field of each line; a line without the delimiter is printed whole.
 class Cut : public LineFilter {
 public:
-    Cut(char delimiter, unsigned field) : delimiter_(delimiter), field_(field) {}
+    Cut(char delimiter, unsigned field, bool busybox)
+        : delimiter_(delimiter), field_(field), zerosEndLines_(busybox) {}
 
 protected:
+    void arrived(std::string& buffer, std::size_t first) override {
+        if (zerosEndLines_) {
+            endLinesAtZeros(buffer, first);
+        }
+    }
     bool takeLine(std::string_view line, std::string& out) override {
         std::size_t end = line.find(delimiter_);
         if (end == std::string_view::npos) {
@@ -33,6 +39,7 @@ protected:
 private:
     char delimiter_;
     unsigned field_;
+    bool zerosEndLines_;
 };
 
 /// The value of an option, joined to its letter or the next word.
@@ -51,7 +58,7 @@ std::optional<std::string> takeOption(Words& words, char letter) {
 
 }  // namespace
 
-std::unique_ptr<Filter> makeCut(Words words, bool /*silent*/) {
+std::unique_ptr<Filter> makeCut(Words words, Manner manner) {
     constexpr unsigned kMostFields = 1000;
     const auto delimiter = takeOption(words, 'd');
     const auto list = takeOption(words, 'f');
@@ -64,7 +71,7 @@ std::unique_ptr<Filter> makeCut(Words words, bool /*silent*/) {
     if (read.ec != std::errc() || read.ptr != end || field < 1 || field > kMostFields) {
         return nullptr;
     }
-    return std::make_unique<Cut>(delimiter->front(), field);
+    return std::make_unique<Cut>(delimiter->front(), field, manner.busybox);
 }
 
 }  // namespace cvagent::shell

@@ -178,11 +178,11 @@ void Digest::workSha1(const Block& block) {
     }
 }
 
-std::unique_ptr<Filter> makeMd5sum(Words words, bool /*silent*/) {
+std::unique_ptr<Filter> makeMd5sum(Words words, Manner /*manner*/) {
     return words.empty() ? std::make_unique<Sum>(Digest::md5) : nullptr;
 }
 
-std::unique_ptr<Filter> makeSha1sum(Words words, bool /*silent*/) {
+std::unique_ptr<Filter> makeSha1sum(Words words, Manner /*manner*/) {
     return words.empty() ? std::make_unique<Sum>(Digest::sha1) : nullptr;
 }
 

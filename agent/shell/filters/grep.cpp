@@ -10,18 +10,18 @@ namespace cvagent::shell {
 
 namespace {
 
-/// grep takes input with a zero in it for no text: the zeros divide lines, nothing of it is printed, and the
-/// first line that fits ends the search with a complaint.
+/// GNU grep takes input with a zero in it for no text: the zeros divide lines, nothing of it is printed, and
+/// the first line that fits ends the search with a complaint.
 class Grep : public LineFilter {
 public:
-    Grep(std::string name, Pattern pattern, bool invert, bool silent)
-        : name_(std::move(name)), pattern_(std::move(pattern)), invert_(invert), silent_(silent) {}
+    Grep(std::string name, Pattern pattern, bool invert, Manner manner)
+        : name_(std::move(name)), pattern_(std::move(pattern)), invert_(invert), manner_(manner) {}
 
     int status() const override { return gaveUp() ? 2 : found_ ? 0 : 1; }
 
 protected:
     void arrived(std::string& buffer, std::size_t first) override {
-        binary_ = binary_ || buffer.find('\0', first) != std::string::npos;
+        binary_ = binary_ || (!manner_.busybox && buffer.find('\0', first) != std::string::npos);
         if (binary_) {
             std::replace(buffer.begin(), buffer.end(), '\0', '\n');
         }
@@ -42,7 +42,7 @@ protected:
 
 private:
     void complain() const {
-        if (!silent_) {
+        if (!manner_.silent) {
             const std::string text = "grep: " + name_ + ": binary file matches\n";
             [[maybe_unused]] const ssize_t written = write(STDERR_FILENO, text.data(), text.size());
         }
@@ -51,7 +51,7 @@ private:
     std::string name_;
     Pattern pattern_;
     bool invert_;
-    bool silent_;
+    Manner manner_;
     bool binary_ = false;
     bool found_ = false;
 };
@@ -69,8 +69,8 @@ public:
 
 /// `-P` with letters, digits and harmless marks and a `\n` among them. The complaint of a grep that was built
 /// without -P must be wanted by nobody.
-bool isNeverFound(Words words, bool silent) {
-    if (!silent || words.size() != 2 || words.front() != "-P") {
+bool isNeverFound(Words words, Manner manner) {
+    if (!manner.silent || manner.busybox || words.size() != 2 || words.front() != "-P") {
         return false;
     }
     const std::string& pattern = words[1];
@@ -105,7 +105,7 @@ bool readOptions(std::string_view letters, Request& request) {
 
 }  // namespace
 
-std::unique_ptr<Filter> makeGrepOf(const std::string& name, Words words, Dialect dialect, bool silent) {
+std::unique_ptr<Filter> makeGrepOf(const std::string& name, Words words, Dialect dialect, Manner manner) {
     Request request;
     while (!words.empty() && words.front().starts_with('-')) {
         if (!readOptions(std::string_view(words.front()).substr(1), request)) {
@@ -117,18 +117,18 @@ std::unique_ptr<Filter> makeGrepOf(const std::string& name, Words words, Dialect
         return nullptr;
     }
     auto pattern = Pattern::read(words.front(), dialect, request.ignoreCase, request.wholeWord);
-    return pattern ? std::make_unique<Grep>(name, std::move(*pattern), request.invert, silent) : nullptr;
+    return pattern ? std::make_unique<Grep>(name, std::move(*pattern), request.invert, manner) : nullptr;
 }
 
-std::unique_ptr<Filter> makeGrep(Words words, bool silent) {
-    if (isNeverFound(words, silent)) {
+std::unique_ptr<Filter> makeGrep(Words words, Manner manner) {
+    if (isNeverFound(words, manner)) {
         return std::make_unique<NeverFound>();
     }
-    return makeGrepOf("(standard input)", words, Dialect::basic, silent);
+    return makeGrepOf("(standard input)", words, Dialect::basic, manner);
 }
 
-std::unique_ptr<Filter> makeEgrep(Words words, bool silent) {
-    return makeGrepOf("(standard input)", words, Dialect::extended, silent);
+std::unique_ptr<Filter> makeEgrep(Words words, Manner manner) {
+    return makeGrepOf("(standard input)", words, Dialect::extended, manner);
 }
 
 }  // namespace cvagent::shell

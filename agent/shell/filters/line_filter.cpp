@@ -1,6 +1,12 @@
 #include "agent/shell/filters/line_filter.h"
 
+#include <algorithm>
+
 namespace cvagent::shell {
+
+void LineFilter::endLinesAtZeros(std::string& buffer, std::size_t first) {
+    std::replace(buffer.begin() + static_cast<std::ptrdiff_t>(first), buffer.end(), '\0', '\n');
+}
 
 /// Whether something came. What the tools see at once is seen at once here, too: grep looks for zeros in it.
 bool LineFilter::fill() {
@@ -17,6 +23,7 @@ bool LineFilter::pull(std::string& out) {
     while (out.size() == before && !ended_) {
         const std::size_t held = buffer_.size();
         if (!fill()) {
+            gaveUp_ = from().failed();
             takeLast(out);
             break;
         }
@@ -42,7 +49,7 @@ void LineFilter::takeLines(std::string& out) {
 
 void LineFilter::takeLast(std::string& out) {
     ended_ = true;
-    if (!buffer_.empty()) {
+    if (!buffer_.empty() && !gaveUp_) {
         takeLine(buffer_, out);
         buffer_.clear();
     }

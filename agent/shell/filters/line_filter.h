@@ -8,7 +8,8 @@
 namespace cvagent::shell {
 
 /// A filter that looks at one line after the other. A line of more than kLongestLine bytes ends it, as a tool
-/// ends that finds no more memory: nothing that a host says is that long.
+/// ends that finds no more memory: nothing that a host says is that long. So does a file that cannot be read
+/// further; the line that was begun is lost.
 class LineFilter : public Filter {
 public:
     static constexpr std::size_t kLongestLine = 8UL << 20U;
@@ -23,6 +24,7 @@ protected:
     virtual bool takeLine(std::string_view line, std::string& out) = 0;
     /// Sees the bytes that have just come before they are taken for lines, and may change them.
     virtual void arrived(std::string& /*buffer*/, std::size_t /*first*/) {}
+    static void endLinesAtZeros(std::string& buffer, std::size_t first);
     bool gaveUp() const { return gaveUp_; }
 
 private:

@@ -70,7 +70,7 @@ std::optional<std::string> readSet(const std::string& text) {
 
 }  // namespace
 
-std::unique_ptr<Filter> makeTr(Words words, bool /*silent*/) {
+std::unique_ptr<Filter> makeTr(Words words, Manner /*manner*/) {
     const bool squeeze = !words.empty() && words.front() == "-s";
     words = words.subspan(squeeze ? 1 : 0);
     if (words.empty() || words.size() > 2 || words.front().starts_with('-') ||

@@ -1,0 +1,79 @@
+#include "agent/cli/event_printer.h"
+
+#include <poll.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <chrono>
+
+#include "agent/cli/failure.h"
+#include "agent/cli/json.h"
+#include "agent/cli/print.h"
+#include "agent/core/signals.h"
+
+namespace cvagent {
+
+namespace {
+
+using Clock = std::chrono::steady_clock;
+
+/// "LinkState: 1 -> 12"; what is not known is left out.
+std::string changeText(const Event& event) {
+    const std::string before = event.before.empty() ? "" : printable(event.before) + " -> ";
+    return event.propertyName + ": " + before + (event.after.empty() ? "not known" : printable(event.after));
+}
+
+std::string line(const Event& event, const Style& style) {
+    std::string text = style.faint(timeText(event.time)) + "  ";
+    const std::string path = event.path.empty() ? "(node without a path)" : printable(event.path);
+    if (event.kind == Event::Kind::alert) {
+        std::string message = event.message;
+        message.erase(message.find_last_not_of(' ') + 1);
+        text += style.bad("alert") + "      " + style.strong(path) + "  " + printable(message) + "  (codes " +
+                std::to_string(event.firstCode) + ", " + std::to_string(event.secondCode) + ", " +
+                std::to_string(event.eventCode) + ")";
+    } else {
+        const bool isWrite = event.kind == Event::Kind::written;
+        text += padded(eventName(event.kind), 11) + style.strong(path) + "  " +
+                (isWrite ? changeText(event) : printable(event.message));
+    }
+    return text + "\n";
+}
+
+/// The time left, as poll takes it; -1 without an end.
+int millisecondsTo(const std::optional<Clock::time_point>& end) {
+    if (!end) {
+        return -1;
+    }
+    const auto left = std::chrono::ceil<std::chrono::milliseconds>(*end - Clock::now()).count();
+    return static_cast<int>(std::clamp<long long>(left, 0, 3600LL * 1000));
+}
+
+}  // namespace
+
+void EventPrinter::printAll() const {
+    const Subscription::Taken taken = events_.take();
+    if (taken.dropped > 0) {
+        complain(std::to_string(taken.dropped) + " events came faster than they could be printed");
+    }
+    for (const Event& event : taken.events) {
+        print(asJson_ ? json::event(event) : line(event, Style::detect()));
+    }
+}
+
+void EventPrinter::follow(const std::optional<double>& seconds) const {
+    std::optional<Clock::time_point> end;
+    if (seconds) {
+        end = Clock::now() +
+              std::chrono::duration_cast<Clock::duration>(std::chrono::duration<double>(*seconds));
+    }
+    while (StopSignals::received() == 0 && (!end || Clock::now() < *end)) {
+        pollfd ready[] = {{events_.descriptor(), POLLIN, 0}, {StopSignals::descriptor(), POLLIN, 0}};
+        if (poll(ready, 2, millisecondsTo(end)) < 0 && errno != EINTR) {
+            throw Failure(ExitStatus::failed, "cannot wait for events");
+        }
+        printAll();
+    }
+}
+
+}  // namespace cvagent

@@ -1,0 +1,25 @@
+#pragma once
+
+#include <optional>
+
+#include "agent/core/event_log.h"
+
+namespace cvagent {
+
+/// Prints the events of a subscription, which outlives it, as lines for people or as JSON.
+class EventPrinter {
+public:
+    EventPrinter(Subscription& events, bool asJson) : events_(events), asJson_(asJson) {}
+
+    /// What waits to be printed.
+    void printAll() const;
+    /// Prints events as they come.
+    /// @param seconds for how long; nothing: until a signal to stop comes. Throws Failure.
+    void follow(const std::optional<double>& seconds) const;
+
+private:
+    Subscription& events_;
+    bool asJson_;
+};
+
+}  // namespace cvagent

@@ -1,0 +1,50 @@
+#include "agent/core/process.h"
+
+#include <filesystem>
+#include <utility>
+
+#include "agent/core/environment.h"
+#include "agent/core/private_tmp.h"
+#include "agent/core/program_path.h"
+#include "agent/core/signals.h"
+
+namespace cvagent {
+
+PreparedProcess::PreparedProcess(ProcessSettings settings) {
+    for (auto* file : {&settings.log.file, &settings.log.traceFile}) {
+        if (*file) {
+            settings.files.push_back(&**file);
+        }
+    }
+    prepareSurroundings(settings.files);
+    data_ = std::make_shared<DataDirectory>();
+    data_->nameInEnvironment();
+    quiet_.emplace();
+    log_ = std::make_shared<LogOutput>(settings.log, errors_);  // before /tmp becomes another one
+    makeTmpPrivate(keptPlaces(settings));
+    setUpCommands(settings.commands);
+    StopSignals::install();
+    if (settings.hostTools != HostTools::native) {
+        putAdaptersOnPath(inspectHostTools(settings.hostTools, Look::adapters, adapterDirectory()));
+    }
+}
+
+AgentSettings PreparedProcess::agentSettings() const {
+    AgentSettings settings;
+    settings.data = data_;
+    settings.log = log_;
+    return settings;
+}
+
+/// What the agent needs of the /tmp that everybody sees, should it lie there.
+std::vector<std::string> PreparedProcess::keptPlaces(const ProcessSettings& settings) const {
+    std::vector<std::string> places = directoriesOnPath();
+    for (const std::string* file : settings.files) {
+        places.push_back(*file);
+    }
+    const std::filesystem::path adapters = adapterDirectory().value_or("");
+    places.insert(places.end(), {programDirectory(), data_->path(), adapters.parent_path()});
+    return places;
+}
+
+}  // namespace cvagent

@@ -1,0 +1,351 @@
+#include "hosttools/ethtool_calls.h"
+
+#include <linux/ethtool.h>
+#include <linux/sockios.h>
+#include <net/if.h>
+#include <sys/ioctl.h>
+#include <sys/socket.h>
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <cstring>
+#include <span>
+
+#include "hosttools/ethtool_words.h"
+#include "hosttools/files.h"
+#include "hosttools/netlink.h"
+
+namespace hosttools {
+namespace {
+
+// The kernel counts its masks in a signed byte.
+constexpr std::size_t mostWords = 127;
+constexpr int masks = 3;
+
+/// The settings and the three masks behind them, as the kernel fills them in.
+class Settings {
+public:
+    ethtool_link_settings& head() { return *reinterpret_cast<ethtool_link_settings*>(room_.data()); }
+    const ethtool_link_settings& head() const {
+        return *reinterpret_cast<const ethtool_link_settings*>(room_.data());
+    }
+    std::size_t wordsOfAMask() const {
+        return static_cast<std::size_t>(std::max<int>(head().link_mode_masks_nwords, 0));
+    }
+    std::uint32_t word(std::size_t number) const {
+        return readPadded<std::uint32_t>(
+            std::string_view(room_.data(), room_.size()).substr(sizeof(ethtool_link_settings) + 4 * number));
+    }
+
+private:
+    alignas(ethtool_link_settings)
+        std::array<char, sizeof(ethtool_link_settings) + masks * mostWords * sizeof(std::uint32_t)> room_{};
+};
+
+enum Mask { supported, advertised, partner };
+
+/// One of the three masks.
+class ModeMask {
+public:
+    ModeMask(const Settings& settings, Mask mask) : settings_(settings), mask_(mask) {}
+
+    bool has(unsigned bit) const { return bit / 32 < size() && (word(bit / 32) >> bit % 32 & 1U) != 0; }
+    bool any() const {
+        for (std::size_t number = 0; number < size(); ++number) {
+            if (word(number) != 0) return true;
+        }
+        return false;
+    }
+
+private:
+    std::size_t size() const { return settings_.wordsOfAMask(); }
+    std::uint32_t word(std::size_t number) const { return settings_.word(mask_ * size() + number); }
+
+    const Settings& settings_;
+    Mask mask_;
+};
+
+struct Named {
+    unsigned bit;
+    std::string_view name;
+};
+
+constexpr Named ports[] = {
+    {ETHTOOL_LINK_MODE_TP_BIT, "TP"},       {ETHTOOL_LINK_MODE_AUI_BIT, "AUI"},
+    {ETHTOOL_LINK_MODE_BNC_BIT, "BNC"},     {ETHTOOL_LINK_MODE_MII_BIT, "MII"},
+    {ETHTOOL_LINK_MODE_FIBRE_BIT, "FIBRE"}, {ETHTOOL_LINK_MODE_Backplane_BIT, "Backplane"},
+};
+
+constexpr Named errorCorrections[] = {
+    {ETHTOOL_LINK_MODE_FEC_NONE_BIT, "None"},
+    {ETHTOOL_LINK_MODE_FEC_BASER_BIT, "BaseR"},
+    {ETHTOOL_LINK_MODE_FEC_RS_BIT, "RS"},
+    {ETHTOOL_LINK_MODE_FEC_LLRS_BIT, "LLRS"},
+};
+
+// As the tool lists them.
+constexpr Named speeds[] = {{0, "10baseT/Half"},
+                            {1, "10baseT/Full"},
+                            {2, "100baseT/Half"},
+                            {3, "100baseT/Full"},
+                            {4, "1000baseT/Half"},
+                            {5, "1000baseT/Full"},
+                            {12, "10000baseT/Full"},
+                            {15, "2500baseX/Full"},
+                            {17, "1000baseKX/Full"},
+                            {18, "10000baseKX4/Full"},
+                            {19, "10000baseKR/Full"},
+                            {20, "10000baseR_FEC"},
+                            {21, "20000baseMLD2/Full"},
+                            {22, "20000baseKR2/Full"},
+                            {23, "40000baseKR4/Full"},
+                            {24, "40000baseCR4/Full"},
+                            {25, "40000baseSR4/Full"},
+                            {26, "40000baseLR4/Full"},
+                            {27, "56000baseKR4/Full"},
+                            {28, "56000baseCR4/Full"},
+                            {29, "56000baseSR4/Full"},
+                            {30, "56000baseLR4/Full"},
+                            {31, "25000baseCR/Full"},
+                            {32, "25000baseKR/Full"},
+                            {33, "25000baseSR/Full"},
+                            {34, "50000baseCR2/Full"},
+                            {35, "50000baseKR2/Full"},
+                            {36, "100000baseKR4/Full"},
+                            {37, "100000baseSR4/Full"},
+                            {38, "100000baseCR4/Full"},
+                            {39, "100000baseLR4_ER4/Full"},
+                            {40, "50000baseSR2/Full"},
+                            {41, "1000baseX/Full"},
+                            {42, "10000baseCR/Full"},
+                            {43, "10000baseSR/Full"},
+                            {44, "10000baseLR/Full"},
+                            {45, "10000baseLRM/Full"},
+                            {46, "10000baseER/Full"},
+                            {47, "2500baseT/Full"},
+                            {48, "5000baseT/Full"},
+                            {52, "50000baseKR/Full"},
+                            {53, "50000baseSR/Full"},
+                            {54, "50000baseCR/Full"},
+                            {55, "50000baseLR_ER_FR/Full"},
+                            {56, "50000baseDR/Full"},
+                            {57, "100000baseKR2/Full"},
+                            {58, "100000baseSR2/Full"},
+                            {59, "100000baseCR2/Full"},
+                            {60, "100000baseLR2_ER2_FR2/Full"},
+                            {61, "100000baseDR2/Full"},
+                            {62, "200000baseKR4/Full"},
+                            {63, "200000baseSR4/Full"},
+                            {64, "200000baseLR4_ER4_FR4/Full"},
+                            {65, "200000baseDR4/Full"},
+                            {66, "200000baseCR4/Full"},
+                            {67, "100baseT1/Full"},
+                            {68, "1000baseT1/Full"},
+                            {69, "400000baseKR8/Full"},
+                            {70, "400000baseSR8/Full"},
+                            {71, "400000baseLR8_ER8_FR8/Full"},
+                            {72, "400000baseDR8/Full"},
+                            {73, "400000baseCR8/Full"},
+                            {75, "100000baseKR/Full"},
+                            {76, "100000baseSR/Full"},
+                            {77, "100000baseLR_ER_FR/Full"},
+                            {79, "100000baseDR/Full"},
+                            {78, "100000baseCR/Full"},
+                            {80, "200000baseKR2/Full"},
+                            {81, "200000baseSR2/Full"},
+                            {82, "200000baseLR2_ER2_FR2/Full"},
+                            {83, "200000baseDR2/Full"},
+                            {84, "200000baseCR2/Full"},
+                            {85, "400000baseKR4/Full"},
+                            {86, "400000baseSR4/Full"},
+                            {87, "400000baseLR4_ER4_FR4/Full"},
+                            {88, "400000baseDR4/Full"},
+                            {89, "400000baseCR4/Full"},
+                            {90, "100baseFX/Half"},
+                            {91, "100baseFX/Full"},
+                            {92, "10baseT1L/Full"}};
+
+void addErrorCorrections(Text& text, const ModeMask& modes) {
+    bool any = false;
+    for (const auto& [bit, name] : errorCorrections) {
+        if (!modes.has(bit)) continue;
+        text.add(any ? " " : "").add(name);
+        any = true;
+    }
+    if (!any) text.add("Not reported");
+}
+
+/// The full duplex of a speed stands on the line of its half duplex, should this be there or not.
+void addSpeeds(Text& text, const ModeMask& modes, std::size_t indent) {
+    bool any = false;
+    bool newLine = false;
+    bool sameLine = false;
+    for (const auto& [bit, name] : speeds) {
+        newLine = newLine || (any && !sameLine);
+        sameLine = name.ends_with("/Half");
+        if (!modes.has(bit)) continue;
+        if (newLine) text.add("\n\t").left("", indent);
+        text.add(name).add(' ');
+        any = true;
+        newLine = false;
+    }
+    text.add(any ? "\n" : "Not reported\n");
+}
+
+struct Labels {
+    std::string_view whose;      ///< "Supported"
+    std::string_view negotiate;  ///< "Supports"
+    std::size_t indent;
+};
+
+constexpr Labels labels[masks] = {{"Supported", "Supports", 24},
+                                  {"Advertised", "Advertised", 24},
+                                  {"Link partner advertised", "Link partner advertised", 37}};
+
+void addModes(Text& text, const ModeMask& modes, const Labels& label) {
+    const std::size_t mark = text.size() + 1;
+    text.add("\t").add(label.whose).add(" link modes:").padLeftAligned(mark, label.indent);
+    addSpeeds(text, modes, label.indent);
+    text.add("\t").add(label.whose).add(" pause frame use: ");
+    addPause(text, modes.has(ETHTOOL_LINK_MODE_Pause_BIT), modes.has(ETHTOOL_LINK_MODE_Asym_Pause_BIT));
+    text.add("\n\t").add(label.negotiate).add(" auto-negotiation: ");
+    text.add(modes.has(ETHTOOL_LINK_MODE_Autoneg_BIT) ? "Yes\n\t" : "No\n\t");
+    text.add(label.whose).add(" FEC modes: ");
+    addErrorCorrections(text, modes);
+    text.add('\n');
+}
+
+void addSettings(Text& text, const Settings& settings) {
+    text.add("\tSupported ports: [ ");
+    for (const auto& [bit, name] : ports) {
+        if (ModeMask(settings, supported).has(bit)) text.add(name).add(' ');
+    }
+    text.add("]\n");
+    for (const Mask mask : {supported, advertised, partner}) {
+        const ModeMask modes(settings, mask);
+        if (mask != partner || modes.any()) addModes(text, modes, labels[mask]);
+    }
+    const ethtool_link_settings& head = settings.head();
+    addSpeed(text.add("\tSpeed: "), head.speed);
+    addDuplex(text.add("\n\tDuplex: "), head.duplex);
+    addPort(text.add("\n\tPort: "), head.port);
+    text.add("\n\tPHYAD: ").number(unsigned{head.phy_address}).add("\n\tTransceiver: ");
+    addTransceiver(text, head.transceiver);
+    text.add("\n\tAuto-negotiation: ").add(head.autoneg == AUTONEG_DISABLE ? "off\n" : "on\n");
+    if (head.port != PORT_TP) return;
+    addCrossover(text.add("\tMDI-X: "), head.eth_tp_mdix, head.eth_tp_mdix_ctrl);
+    text.add('\n');
+}
+
+void addMessageLevel(Text& text, std::uint32_t level) {
+    text.add("\tCurrent message level: 0x").hex(level, 8).add(" (").number(static_cast<int>(level));
+    text.add(")\n\t\t\t      ");
+    std::uint32_t rest = level;
+    for (unsigned bit = 0; bit < 32; ++bit) {
+        if (messageClass(bit).empty() || (level >> bit & 1U) == 0) continue;
+        text.add(' ').add(messageClass(bit));
+        rest &= ~(1U << bit);
+    }
+    if (rest != 0) text.add(" 0x").hex(rest);
+    if (level == 0) text.add(' ');
+    text.add('\n');
+}
+
+/// The calls about one interface. What fails for another reason than that the driver has no answer is
+/// complained of.
+class Calls {
+public:
+    Calls(std::string_view name, Answer& answer)
+        : socket_(socket(AF_INET, SOCK_DGRAM | SOCK_CLOEXEC, 0)), name_(name), answer_(answer) {}
+
+    void run() {
+        addOf("device settings", [this] { return settings(); });
+        addOf("wake-on-lan settings", [this] { return wakeUp(); });
+        addOf("message level", [this] { return messageLevel(); });
+        addOf("link status", [this] { return link(); });
+    }
+    bool haveTold() const { return told_; }
+
+private:
+    template <typename Question>
+    void addOf(std::string_view what, const Question& question) {
+        errno = 0;
+        if (question()) {
+            told_ = true;
+        } else if (errno != EOPNOTSUPP) {
+            answer_.errors.add("Cannot get ").add(what).add(": ").add(std::strerror(errno)).add('\n');
+        }
+    }
+    bool call(void* data) const {
+        ifreq request{};
+        name_.copy(request.ifr_name, IFNAMSIZ - 1);
+        request.ifr_data = static_cast<char*>(data);
+        return ioctl(socket_.get(), SIOCETHTOOL, &request) == 0;
+    }
+    /// @param words how long each of the masks is; 0 asks for that, and is answered with a negative number
+    bool fetch(int words, Settings& settings) const {
+        settings = {};
+        settings.head().cmd = ETHTOOL_GLINKSETTINGS;
+        settings.head().link_mode_masks_nwords = static_cast<std::int8_t>(words);
+        return call(&settings.head());
+    }
+    bool settings() const {
+        Settings settings;
+        if (!fetch(0, settings)) return false;
+        const int words = -settings.head().link_mode_masks_nwords;
+        if (words <= 0) {
+            errno = EOPNOTSUPP;
+            return false;
+        }
+        if (!fetch(words, settings)) return false;
+        addSettings(answer_.out, settings);
+        return true;
+    }
+    bool wakeUp() const {
+        ethtool_wolinfo told{};
+        told.cmd = ETHTOOL_GWOL;
+        if (!call(&told)) return false;
+        addWakeOnLan(answer_.out, told.supported, told.wolopts);
+        const std::string_view password(reinterpret_cast<const char*>(told.sopass), sizeof told.sopass);
+        if ((told.supported & WAKE_MAGICSECURE) != 0) addPassword(answer_.out, password);
+        return true;
+    }
+    bool messageLevel() const {
+        ethtool_value told{};
+        told.cmd = ETHTOOL_GMSGLVL;
+        if (!call(&told)) return false;
+        addMessageLevel(answer_.out, told.data);
+        return true;
+    }
+    bool link() const {
+        ethtool_value told{};
+        told.cmd = ETHTOOL_GLINK;
+        if (!call(&told)) return false;
+        answer_.out.add("\tLink detected: ").add(told.data != 0 ? "yes\n" : "no\n");
+        return true;
+    }
+
+    Descriptor socket_;
+    std::string_view name_;
+    Answer& answer_;
+    bool told_ = false;
+};
+
+}  // namespace
+
+int listLinkByCalls(std::string_view name, Answer& answer) {
+    constexpr int nothingKnown = 75;
+    if (name.size() >= IFNAMSIZ) {
+        answer.errors.add("netlink interface initialization failed, device name longer than ");
+        answer.errors.number(IFNAMSIZ - 1).add(" not supported\n");
+        return 1;
+    }
+    answer.out.add("Settings for ").add(name).add(":\n");
+    Calls calls(name, answer);
+    calls.run();
+    if (calls.haveTold()) return 0;
+    answer.out.add("No data available\n");
+    return nothingKnown;
+}
+
+}  // namespace hosttools
