@@ -1,6 +1,5 @@
 #include "plugins/hardware/hardware_mi.h"
 
-#include <ranges>
 #include <set>
 
 namespace hardware {
@@ -48,12 +47,13 @@ void HardwareMI::lookAgain(const std::string& subsystem) {
     const auto concerned = [&](const Source& source) {
         return subsystem.empty() || source.subsystem == subsystem;
     };
-    for (const Source& source : std::views::reverse(sources())) {  // what hangs under others goes first
-        if (concerned(source)) {
-            withdrawGone(source);
+    const auto all = sources();
+    for (auto source = all.rbegin(); source != all.rend(); ++source) {  // what hangs under others goes first
+        if (concerned(*source)) {
+            withdrawGone(*source);
         }
     }
-    for (const Source& source : sources()) {
+    for (const Source& source : all) {
         if (concerned(source)) {
             look(source, Moment::later);
         }

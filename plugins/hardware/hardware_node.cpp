@@ -95,7 +95,8 @@ IC::Error HardwareNode::getProperty(unsigned int id, IC::PropertyValue& out) con
     const auto& facts = known_.found.facts.all();
     const auto fact = facts.find(id);
     if (fact == facts.end()) {
-        return {IC::Error::failure, IC::Number(), "no such property: " + std::to_string(id)};
+        return {IC::Error::failure, IC::Number(IC::Error::kNoSuchProperty),
+                "no such property: " + std::to_string(id)};
     }
     out = fact->second;
     return {};

@@ -6,6 +6,7 @@
 #include <mutex>
 #include <set>
 #include <thread>
+#include <tuple>
 
 #include "plugins/hardware/hardware_mi.h"
 #include "tests/hardware/golden.h"
@@ -266,6 +267,28 @@ TEST_F(Plugin, NewsOfOtherThingsChangeNothing) {
     EXPECT_THAT(links(), UnorderedElementsAre("eth0", "lo"));
     plugin_.lookAgain("");
     EXPECT_THAT(links(), UnorderedElementsAre("eth0", "eth1", "lo"));
+}
+
+TEST_F(Plugin, ThingsOfAllKindsCanBePluggedIn) {
+    start();
+    const std::string kFirst = "/sys/devices/system/cpu/cpu0/topology/physical_package_id";
+    const std::tuple<const char*, std::string, std::string, Class> kThings[] = {
+        {"hwmon", "/sys/class/hwmon/hwmon0/name", "x", Class::sensor},
+        {"cpu", kFirst, "0", Class::processor},
+    };
+    recorded_.file("/sys/class/hwmon/hwmon0/temp1_input", "1");
+    for (const auto& [subsystem, file, text, type] : kThings) {
+        loaded_.clear();
+        recorded_.file(file, text);
+        plugin_.lookAgain("net");
+        EXPECT_THAT(loaded_, IsEmpty()) << subsystem;
+        plugin_.lookAgain(subsystem);
+        EXPECT_EQ(loaded_.size(), 1U) << subsystem;
+        EXPECT_EQ(plugin_.holdAll().back()->nodeType(), static_cast<unsigned int>(type)) << subsystem;
+    }
+    recorded_.file("/proc/meminfo", "MemTotal: 1 kB");
+    plugin_.lookAgain("memory");
+    EXPECT_THAT(golden::tree(plugin_), HasSubstr("TotalMemory: 1024 bytes"));
 }
 
 TEST_F(Plugin, ASecondStartMakesTheTreeAnew) {
