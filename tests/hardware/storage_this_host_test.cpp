@@ -2,15 +2,18 @@
 #include <gmock/gmock.h>
 #include <unistd.h>
 
+#include <array>
 #include <cstdio>
 #include <filesystem>
 #include <nlohmann/json.hpp>
+#include <set>
 
 #include "tests/hardware/storage_host.h"
 
 namespace {
 
 using hardware::Class;
+using hardware_test::factsOf;
 using Json = nlohmann::json;
 
 std::string output(const std::string& command) {

@@ -5,9 +5,13 @@ import os
 import re
 import shutil
 import subprocess
+import tempfile
 
 HERE = os.path.dirname(os.path.abspath(__file__))
 MODULES = ["e1000", "virtio_pci", "virtio_scsi", "sd_mod", "bonding", "8021q", "bridge"]
+# Loaded by the checks that need them.
+HARDWARE_MODULES = ["nvme", "ahci", "virtio_blk", "sdhci_pci", "mmc_block", "raid1", "dm_mod"]
+ONLY = {"util-linux": ["bin/lsblk", "sbin/blkid"], "util-linux-extra": []}  # of its other tools the guest has busybox's
 # Of the packages only what runs: no documentation, and of the time zones the files, not the variants.
 UNWANTED = ["usr/share/doc", "usr/share/man", "usr/share/locale", "usr/share/lintian", "usr/share/bash-completion",
             "usr/share/zoneinfo/posix", "usr/share/zoneinfo/right", "usr/share/perl5", "usr/share/debconf",
@@ -48,7 +52,15 @@ class Kernel:
 
 def install_packages(packages, root):
     for package in packages:
-        extract(package, root)
+        wanted = ONLY.get(os.path.basename(package).split("_")[0])
+        if wanted is None:
+            extract(package, root)
+            continue
+        with tempfile.TemporaryDirectory() as apart:
+            extract(package, apart)
+            for name in wanted:
+                os.makedirs(os.path.dirname(os.path.join(root, name)), exist_ok=True)
+                shutil.copy(os.path.join(apart, name), os.path.join(root, name))
     for name in UNWANTED:
         shutil.rmtree(os.path.join(root, name), ignore_errors=True)
 
@@ -56,10 +68,13 @@ def install_packages(packages, root):
 def install_modules(kernel, root):
     directory = os.path.join(root, "lib/modules")
     os.makedirs(directory, exist_ok=True)
-    with open(os.path.join(directory, "order"), "w", encoding="utf-8") as order:
-        for name, path in kernel.modules(MODULES).items():
-            shutil.copy(path, os.path.join(directory, name + ".ko"))
-            order.write(name + "\n")
+    always = kernel.modules(MODULES)
+    more = {name: path for name, path in kernel.modules(HARDWARE_MODULES).items() if name not in always}
+    for file, modules in (("order", always), ("order-hardware", more)):
+        with open(os.path.join(directory, file), "w", encoding="utf-8") as order:
+            for name, path in modules.items():
+                shutil.copy(path, os.path.join(directory, name + ".ko"))
+                order.write(name + "\n")
 
 
 def install_ours(build, root):

@@ -9,6 +9,17 @@ import time
 
 NICS = 5
 DISKS = {"sda": 6144, "sdb": 24}  # MiB; the first has more bytes than 32 bits count
+# Of the machine that has drives of every kind, by the names they get there: model, serial number, firmware, QEMU's words.
+# sda and sdb hang on virtio-scsi as in the other machines.
+HARDWARE_DRIVES = {
+    "nvme0n1": ("QEMU NVMe Ctrl", "NVME0001", None, "nvme,serial=NVME0001"),
+    "sdc": ("EXAMPLE MODEL OF MORE THAN 16 LETTERS", "SATA0001", "1.234567",
+            "ide-hd,bus=ahci.0,model=EXAMPLE MODEL OF MORE THAN 16 LETTERS,serial=SATA0001,ver=1.234567"),
+    "vda": (None, "VIRTIO0001", None, "virtio-blk-pci,serial=VIRTIO0001"),
+    "vdb": (None, "VIRTIO0002", None, "virtio-blk-pci,serial=VIRTIO0002"),
+    "vdc": (None, None, None, "virtio-blk-pci"),
+    "mmcblk0": ("QEMU!", "0xdeadbeef", None, "sd-card"),
+}
 # No network names of udev's, fast start, and nothing random in addresses: translated code is used again.
 KERNEL_OPTIONS = ("console=ttyS0,115200 quiet loglevel=4 panic=-1 net.ifnames=0 clocksource=tsc tsc=reliable "
                   "random.trust_cpu=on mitigations=off init_on_alloc=0 apparmor=0 audit=0 nokaslr norandmaps")
@@ -74,15 +85,18 @@ class Machine:
     because the machine underneath is busy.
 
     The disks hang on virtio-scsi for that reason: it is the controller whose commands have no time limit, and the
-    host's files answer in real time.
+    host's files answer in real time. The machine with hardware of every kind has a clock that runs as usual.
     """
 
-    def __init__(self, directory, kernel, initramfs):
+    def __init__(self, directory, kernel, initramfs, hardware=False):
         self.directory = directory
+        self.hardware = HARDWARE_DRIVES if hardware else {}
         self.console = os.path.join(directory, "console.log")
         self.events = []
         for name, megabytes in DISKS.items():
             self.make_disk(name, megabytes)
+        for name in self.hardware:
+            self.make_disk(name, 64)
         self.process = subprocess.Popen(self._command(kernel, initramfs), stdin=subprocess.DEVNULL,
                                         stdout=open(os.path.join(directory, "qemu.log"), "wb"),
                                         stderr=subprocess.STDOUT)
@@ -97,7 +111,8 @@ class Machine:
     def _command(self, kernel, initramfs):
         words = ["setpriv", "--pdeathsig", "TERM",  # whatever ends the test ends the machine, too
                  "qemu-system-i386", "-accel", "tcg", "-smp", "1", "-m", "256", "-cpu", "qemu32",
-                 "-icount", "shift=3,sleep=off", "-nodefaults", "-no-user-config", "-display", "none",
+                 *([] if self.hardware else ["-icount", "shift=3,sleep=off"]),
+                 "-nodefaults", "-no-user-config", "-display", "none",
                  "-action", "reboot=shutdown",  # a guest that panics ends at once
                  "-rtc", "base=2026-01-01T00:00:00,clock=vm",
                  "-kernel", kernel, "-initrd", initramfs,
@@ -113,6 +128,11 @@ class Machine:
         for name in DISKS:
             words += ["-blockdev", json.dumps(self._block_device(name)),
                       "-device", f"scsi-hd,id={name},bus=scsi.0,drive=drive-{name}"]
+        if self.hardware:
+            words += ["-device", "ahci,id=ahci", "-device", "sdhci-pci,id=sdhci"]
+        for name, row in self.hardware.items():
+            words += ["-blockdev", json.dumps(self._block_device(name)),
+                      "-device", f"{row[3]},drive=drive-{name}"]
         return words
 
     def make_disk(self, name, megabytes):

@@ -6,7 +6,8 @@ import subprocess
 import sys
 
 # What the guest runs, apart from the kernel and our own programs; their dependencies come with them.
-TOOLS = ["bridge-utils", "busybox-static", "dash", "ethtool", "hostname", "iproute2", "libstdc++6", "tzdata"]
+TOOLS = ["bridge-utils", "busybox-static", "dash", "dmsetup", "ethtool", "hostname", "iproute2", "libstdc++6", "tzdata",
+         "util-linux"]
 KERNEL = "linux-image-686-pae"
 
 

@@ -19,6 +19,7 @@ import checks_tree  # noqa: F401  each registers its checks, in this order
 import checks_events  # noqa: F401
 import checks_settings  # noqa: F401
 import checks_stress  # noqa: F401
+import checks_hardware  # noqa: F401
 
 
 class Context:
@@ -62,7 +63,7 @@ class Runner(threading.Thread):
     def run(self):
         os.makedirs(self.directory)
         start = time.monotonic()
-        machine = Machine(self.directory, *self.guest_files)
+        machine = Machine(self.directory, *self.guest_files, hardware=self.name == checks_hardware.MACHINE)
         try:
             machine.wait_ready()
             print(f"# the guest for {self.name} is up after {time.monotonic() - start:.0f} s", flush=True)
