@@ -100,13 +100,18 @@ void unmark(std::string& word) {
 }
 
 void unmark(Options& options) {
-    for (std::vector<std::string>* list : {&options.values, &options.properties}) {
+    for (std::vector<std::string>* list : {&options.values, &options.properties, &options.plugins}) {
         for (std::string& word : *list) {
             unmark(word);
         }
     }
-    for (std::string* word : {&options.node, &options.property, &options.nodeClass}) {
+    for (std::string* word : {&options.node, &options.property, &options.nodeClass, &options.program}) {
         unmark(*word);
+    }
+    for (std::optional<std::string>* file : {&options.logFile, &options.traceFile}) {
+        if (*file) {
+            unmark(**file);
+        }
     }
 }
 

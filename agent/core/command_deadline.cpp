@@ -5,7 +5,6 @@
 #include <algorithm>
 #include <cerrno>
 #include <fstream>
-#include <map>
 #include <sstream>
 #include <system_error>
 #include <vector>
@@ -24,6 +23,7 @@ constexpr int kWritePatience = 10;  // times as long as a read
 constexpr int kLooks = 8;           // a deadline, but at least one a second
 constexpr Seconds kSlowestLook{1};
 constexpr Seconds kFastestLook{0.01};
+constexpr unsigned long long kRead = 0;  // no process started then: the reading of one has an age of its own
 
 /// The calls into the plug-in that are under way, by their threads.
 struct CommandScopes {
@@ -92,25 +92,39 @@ bool CommandDeadline::stoppedWithin(Seconds time) {
 /// program did not run, its commands may not have run either.
 void CommandDeadline::watch() {
     const Seconds interval = std::clamp(longest_ / kLooks, kFastestLook, kSlowestLook);
-    std::map<std::pair<pid_t, QX::ChildProcess>, Seconds> ages;
+    Ages ages;
     for (auto last = std::chrono::steady_clock::now(); !stoppedWithin(interval);) {
         const auto now = std::chrono::steady_clock::now();
         const Seconds step = std::min(Seconds(now - last), 2 * interval);
         last = now;
-        std::map<std::pair<pid_t, QX::ChildProcess>, Seconds> present;
-        for (const pid_t thread : ownThreads()) {
-            for (const QX::ChildProcess& command : commandsOf(thread)) {
-                const auto known = ages.find({thread, command});
-                Seconds age = known == ages.end() ? Seconds::zero() : known->second + step;
-                if (age >= limitOf(thread)) {
-                    end(thread, command);
-                    age = Seconds::zero();
-                }
-                present[{thread, command}] = age;
+        ages = look(ages, step, interval);
+    }
+}
+
+/// @return the ages of the commands that run now
+CommandDeadline::Ages CommandDeadline::look(const Ages& ages, Seconds step, Seconds interval) {
+    Ages present;
+    const auto ageOf = [&](pid_t thread, const QX::ChildProcess& command) -> Seconds& {
+        const auto known = ages.find({thread, command});
+        return present[{thread, command}] = known == ages.end() ? Seconds::zero() : known->second + step;
+    };
+    for (const pid_t thread : ownThreads()) {
+        const Seconds limit = limitOf(thread);
+        for (const QX::ChildProcess& command : commandsOf(thread)) {
+            if (Seconds& age = ageOf(thread, command); age >= limit) {
+                end(thread, command.id, [&] { return QX::killChild(thread, command); });
+                age = Seconds::zero();
             }
         }
-        ages = std::move(present);
+        // A process that has ended, or been killed by now, may have left others behind that keep its pipe
+        // open.
+        for (const pid_t process : shell::readBy(thread)) {
+            if (ageOf(thread, {process, kRead}) >= limit + interval) {
+                end(thread, process, [process] { return shell::cutOff(process); });
+            }
+        }
     }
+    return present;
 }
 
 Seconds CommandDeadline::limitOf(pid_t thread) const {
@@ -130,21 +144,25 @@ Seconds CommandDeadline::limitOf(pid_t thread) const {
     return longest_;
 }
 
-/// The thread that waits for the command goes on only after it has been told why.
-void CommandDeadline::end(pid_t thread, const QX::ChildProcess& command) {
+/// The call that waits for the command goes on only after it has been told why. Who is told otherwise may
+/// call into the plug-in.
+void CommandDeadline::end(pid_t thread, pid_t process, const std::function<bool()>& ending) {
     const Seconds limit = limitOf(thread);
-    const std::lock_guard lock(scopes().guard);
-    const std::string text = commandText(command.id);
-    if (!QX::killChild(thread, command)) {
-        return;
+    std::string text;
+    {
+        const std::lock_guard lock(scopes().guard);
+        text = commandText(process);
+        if (!ending()) {
+            return;
+        }
+        if (const auto scope = scopes().all.find(thread); scope != scopes().all.end()) {
+            std::string& complaint = scope->second->complaint_;
+            complaint = complaint.empty() ? "timed out after " + secondsText(limit) + ": " + text : complaint;
+            return;
+        }
     }
-    const auto scope = scopes().all.find(thread);
-    if (scope == scopes().all.end()) {
-        tell_("a command of the plug-in was ended after " + secondsText(limit) +
-              "; what it would have told is missing: " + text);
-    } else if (scope->second->complaint_.empty()) {
-        scope->second->complaint_ = "timed out after " + secondsText(limit) + ": " + text;
-    }
+    tell_("a command of the plug-in was ended after " + secondsText(limit) +
+          "; what it would have told is missing: " + text);
 }
 
 CommandScope::CommandScope(Kind kind) : kind_(kind), thread_(gettid()) {

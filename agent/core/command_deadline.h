@@ -3,9 +3,11 @@
 #include <chrono>
 #include <condition_variable>
 #include <functional>
+#include <map>
 #include <mutex>
 #include <string>
 #include <thread>
+#include <utility>
 
 #include "framework/qx/process_tree.h"
 
@@ -15,8 +17,9 @@ namespace cvagent {
 /// deadline is killed with all it has started, so that whoever waits for its output goes on. The plug-in
 /// knows nothing of it. What does not count: the time that this program was stopped or the machine slept.
 ///
-/// A process that a command leaves behind in the background is nobody's child any more and lives on. One that
-/// the kernel holds in the middle of a device's answer dies when the device lets it.
+/// A process that a command leaves behind in the background is nobody's child any more and lives on; where it
+/// keeps the pipe open, no more is read at the deadline (of what goes to a shell, as long as that runs). One
+/// that the kernel holds in the middle of a device's answer dies when the device lets it.
 class CommandDeadline {
 public:
     /// @param longest how long a command may take; 0 for as long as it likes
@@ -31,7 +34,9 @@ private:
 
     void watch();
     bool stoppedWithin(Seconds time);
-    void end(pid_t thread, const QX::ChildProcess& command);
+    using Ages = std::map<std::pair<pid_t, QX::ChildProcess>, Seconds>;
+    Ages look(const Ages& ages, Seconds step, Seconds interval);
+    void end(pid_t thread, pid_t process, const std::function<bool()>& ending);
     Seconds limitOf(pid_t thread) const;
 
     Seconds longest_;

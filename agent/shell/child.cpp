@@ -46,10 +46,21 @@ public:
             running_.erase(found);
         }
     }
-    std::string commandOf(pid_t process) {
+    std::shared_ptr<RunningProcess> find(pid_t process) {
         const std::lock_guard lock(guard_);
         const auto found = running_.find(process);
-        return found != running_.end() ? found->second->command : "";
+        return found != running_.end() ? found->second : nullptr;
+    }
+    std::vector<pid_t> readBy(pid_t thread) {
+        const std::lock_guard lock(guard_);
+        std::vector<pid_t> read;
+        for (const auto& [process, running] : running_) {
+            const std::lock_guard ofOne(running->guard);
+            if (running->reader == thread && running->output >= 0) {
+                read.push_back(process);
+            }
+        }
+        return read;
     }
     void noteKill(pid_t process) {
         const std::lock_guard lock(guard_);
@@ -73,6 +84,13 @@ private:
 Register& processes() {
     static Register only;
     return only;
+}
+
+/// Whoever reads there goes on. A pipe that is full keeps nobody waiting.
+void wakeReader(int output) {
+    const std::string pipe = "/proc/self/fd/" + std::to_string(output);
+    const Descriptor writing(open(pipe.c_str(), O_WRONLY | O_NONBLOCK | O_CLOEXEC));
+    [[maybe_unused]] const ssize_t written = write(writing.get(), "", 1);
 }
 
 /// What the new process does to its descriptors before it begins.
@@ -161,12 +179,38 @@ Child::End Child::wait() {
     }
     const bool signalled = WIFSIGNALED(status);
     end_.status = signalled ? kSignalStatus + WTERMSIG(status) : WEXITSTATUS(status);
-    end_.forced = running_->forced && signalled && WTERMSIG(status) == SIGKILL;
+    end_.forced = running_->cutOff || (running_->forced && signalled && WTERMSIG(status) == SIGKILL);
     return end_;
 }
 
+void Child::setOutput(int output) {
+    if (running_ != nullptr) {
+        const std::lock_guard lock(running_->guard);
+        running_->output = output;
+    }
+}
+
 std::string commandOf(pid_t process) {
-    return processes().commandOf(process);
+    const auto running = processes().find(process);
+    return running != nullptr ? running->command : "";
+}
+
+std::vector<pid_t> readBy(pid_t thread) {
+    return processes().readBy(thread);
+}
+
+bool cutOff(pid_t process) {
+    const auto running = processes().find(process);
+    if (running == nullptr) {
+        return false;
+    }
+    const std::lock_guard lock(running->guard);
+    if (running->output < 0) {
+        return false;
+    }
+    const bool before = running->cutOff.exchange(true);
+    wakeReader(running->output);  // each time: there may have been no descriptor for it
+    return !before && !running->forced;
 }
 
 void noteKill(pid_t process) {
@@ -175,12 +219,25 @@ void noteKill(pid_t process) {
 
 int ProcessSource::start(const ProcessStart& start) {
     Descriptor writing;
-    const int error = makePipe(output_, writing);
-    return error != 0 ? error : child_.start(start, writing.get());
+    int error = makePipe(output_, writing);
+    error = error != 0 ? error : child_.start(start, writing.get());
+    if (error == 0) {
+        child_.setOutput(output_.get());
+    }
+    return error;
 }
 
 int ProcessSource::startInto(const ProcessStart& start, int output) {
     return child_.start(start, output);
+}
+
+/// @return how much has come; nothing at the end, and of what is cut off
+ssize_t ProcessSource::readOutput(char* buffer) {
+    ssize_t got = -1;
+    do {
+        got = child_.isCutOff() ? 0 : read(output_.get(), buffer, kChunk);
+    } while (got < 0 && errno == EINTR);
+    return child_.isCutOff() ? 0 : got;
 }
 
 bool ProcessSource::pull(std::string& out) {
@@ -189,15 +246,13 @@ bool ProcessSource::pull(std::string& out) {
     }
     const std::size_t before = out.size();
     out.resize(before + kChunk);
-    ssize_t got = 0;
-    do {
-        got = read(output_.get(), out.data() + before, kChunk);
-    } while (got < 0 && errno == EINTR);
+    const ssize_t got = readOutput(out.data() + before);
     out.resize(before + (got > 0 ? static_cast<std::size_t>(got) : 0));
     return got > 0;
 }
 
 Child::End ProcessSource::finish() {
+    child_.setOutput(-1);
     output_.reset();
     end_ = child_.wait();
     return end_;

@@ -1,9 +1,11 @@
 #pragma once
 
 #include <sys/types.h>
+#include <unistd.h>
 
 #include <atomic>
 #include <memory>
+#include <mutex>
 #include <string>
 #include <utility>
 #include <vector>
@@ -24,7 +26,11 @@ struct ProcessStart {
 struct RunningProcess {
     explicit RunningProcess(std::string line) : command(std::move(line)) {}
     const std::string command;  ///< the whole command line
+    const pid_t reader = gettid();
     std::atomic<bool> forced = false;
+    std::atomic<bool> cutOff = false;  ///< its output is read no further
+    std::mutex guard;
+    int output = -1;  ///< where it is read; guarded by guard
 };
 
 /// A process that the calling thread has started, so that it stands among that thread's children. It is
@@ -41,10 +47,13 @@ public:
 
     struct End {
         int status = 0;       ///< as a shell tells it: above 128 the signal that ended it
-        bool forced = false;  ///< it was ended through noteKill
+        bool forced = false;  ///< it was ended through noteKill, or cut off
     };
     /// Waits for its end. Without a process it is that of one that did nothing.
     End wait();
+    /// @param output where its output is read, for cutOff; -1 when it is no longer
+    void setOutput(int output);
+    bool isCutOff() const { return running_ != nullptr && running_->cutOff; }
 
 private:
     pid_t process_ = -1;
@@ -59,9 +68,22 @@ std::string commandOf(pid_t process);
 /// the whole command then counts as killed, as a shell would be.
 void noteKill(pid_t process);
 
+/// The processes that a thread has started and whose output is still read, ended or not.
+std::vector<pid_t> readBy(pid_t thread);
+
+/// Ends the reading of a process's output: what it has left behind may hold the pipe open for ever. The whole
+/// command then counts as killed.
+/// @return false when it was cut off or killed before, or is not read
+bool cutOff(pid_t process);
+
 /// A process whose output is read as it comes.
 class ProcessSource : public Source {
 public:
+    ProcessSource() = default;
+    ProcessSource(const ProcessSource&) = delete;
+    ProcessSource& operator=(const ProcessSource&) = delete;
+    ~ProcessSource() override { finish(); }
+
     /// @return 0, or an error number: then there is no process
     int start(const ProcessStart& start);
     /// The same with its output going to a file, or to a descriptor of the caller's.
@@ -73,6 +95,8 @@ public:
     Child::End finish();
 
 private:
+    ssize_t readOutput(char* buffer);
+
     Child child_;
     Descriptor output_;
     Child::End end_;

@@ -32,6 +32,40 @@ HOST_TEST(CommandDeadline, EndsAPipelineThatHangsAndTellsItsReader) {
     EXPECT_TRUE(eventually([&] { return !isRunning(host, "sleep"); }));
 }
 
+/// What it has left behind keeps its pipe open.
+HOST_TEST(CommandDeadline, EndsTheReadingOfACommandThatHasEnded) {
+    host.tool("leaver", ToolAnswer{.out = "half\n", .action = "sleep 1000 &"});
+    for (const char* const command : {"leaver", "leaver | cat"}) {
+        const CommandDeadline deadline(0.3s, cvagent::complain);
+        const CommandScope scope(CommandScope::read);
+        EXPECT_EQ(shell(command).status, kKilled) << command;
+        EXPECT_EQ(scope.complaint(), std::string("timed out after 0.3 s: ") + command);
+    }
+    EXPECT_TRUE(isRunning(host, "sleep"));
+}
+
+HOST_TEST(CommandDeadline, EndsTheReadingOfACommandThatIsKilledWithoutWhatItHasLeftBehind) {
+    host.tool("leaver", ToolAnswer{.out = "", .action = "(sleep 1000 &) ; sleep 1000"});
+    std::vector<std::string> told;
+    {
+        const CommandDeadline deadline(0.3s, [&told](const std::string& text) { told.push_back(text); });
+        EXPECT_EQ(shell("leaver").status, kKilled);
+    }
+    EXPECT_EQ(told.size(), 1);
+}
+
+HOST_TEST(CommandDeadline, LetsWhoIsToldCallThePlugin) {
+    bool told = false;
+    {
+        const CommandDeadline deadline(0.1s, [&told](const std::string&) {
+            const CommandScope scope(CommandScope::read);
+            told = true;
+        });
+        shell("sleep 1000");
+    }
+    EXPECT_TRUE(told);
+}
+
 HOST_TEST(CommandDeadline, GivesEveryCommandTheWholeTime) {
     const CommandDeadline deadline(1s, cvagent::complain);
     const CommandScope scope(CommandScope::read);

@@ -13,10 +13,12 @@
 #include "agent/core/signals.h"
 #include "agent/core/surroundings.h"
 #include "tests/agent/cvagent_run.h"
+#include "tests/agent/from_directory.h"
 #include "tests/agent/terminal.h"
 
 namespace {
 
+using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::IsEmpty;
 using testing::Not;
@@ -206,6 +208,17 @@ HOST_TEST(Logs, GoToTheFilesNamed) {
     EXPECT_THAT(host.read("/tmp/trace").value_or(""), HasSubstr("first error\n"));
     EXPECT_EQ(modeOf("/tmp/log"), 0600U);
     EXPECT_THAT(run.err, HasSubstr("the plug-in reports: first error"));
+}
+
+HOST_TEST(Logs, GoToFilesWithBracketsInTheirNames) {
+    CvagentRun cvagent(host);
+    const Finished run =
+        host.run(fromDirectory("/tmp", cvagent.commandLine({"--log", "[a,b]", "--trace", "[c]", "tree"})));
+    EXPECT_THAT(host.listDirectory("/tmp"), ElementsAre("[a,b]", "[c]")) << run.err;
+    for (const std::vector<std::string>& words : std::vector<std::vector<std::string>>{
+             {"--plugin", "[d]", "tree"}, {"watch", "--for", "0", "--exec", "[d]"}}) {
+        EXPECT_THAT(host.run(fromDirectory("/tmp", cvagent.commandLine(words))).err, HasSubstr("'/tmp/[d]'"));
+    }
 }
 
 HOST_TEST(Logs, GoToStandardErrorFromTheLevelAskedFor) {

@@ -71,6 +71,24 @@ void waitFor(const std::function<bool()>& condition) {
     EXPECT_TRUE(condition());
 }
 
+/// As when a tool leaves a process behind that keeps its pipe open.
+HOST_TEST(Traps, WhatIsCutOffIsReadNoFurther) {
+    inC();
+    host.tool("leaver", ToolAnswer{.out = "half\n", .action = "sleep 1000 &"});
+    Running command("leaver | cat");
+    EXPECT_EQ(command.line(), "half\n");
+    const std::vector<pid_t> read = cvagent::shell::readBy(gettid());
+    ASSERT_EQ(read.size(), 1);
+    std::thread other([process = read.front()] {
+        EXPECT_TRUE(cvagent::shell::cutOff(process));
+        EXPECT_FALSE(cvagent::shell::cutOff(process));
+    });
+    EXPECT_EQ(command.line(), "");
+    other.join();
+    EXPECT_EQ(command.end(), SIGKILL);
+    EXPECT_THAT(cvagent::shell::readBy(gettid()), testing::IsEmpty());
+}
+
 HOST_TEST(Traps, AScriptedToolIsRun) {
     inC();
     host.tool("grep b", "scripted\n");
