@@ -1,15 +1,18 @@
 #pragma once
 
+#include <memory>
 #include <optional>
+#include <utility>
 
 #include "agent/core/event_log.h"
 
 namespace cvagent {
 
-/// Prints the events of a subscription, which outlives it, as lines for people or as JSON.
+/// Prints the events of a subscription as lines for people or as JSON.
 class EventPrinter {
 public:
-    EventPrinter(Subscription& events, bool asJson) : events_(events), asJson_(asJson) {}
+    EventPrinter(std::shared_ptr<Subscription> events, bool asJson)
+        : events_(std::move(events)), asJson_(asJson) {}
 
     /// What waits to be printed.
     void printAll() const;
@@ -18,7 +21,7 @@ public:
     void follow(const std::optional<double>& seconds) const;
 
 private:
-    Subscription& events_;
+    std::shared_ptr<Subscription> events_;
     bool asJson_;
 };
 

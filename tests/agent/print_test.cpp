@@ -67,7 +67,9 @@ TEST(Print, UncataloguedValuesAreShownPlainly) {
 
 TEST(Print, WhatDoesNotFitItsUnitIsShownPlainly) {
     const PropertyValue large(Number(1e30), true);
-    EXPECT_EQ(shown(11, 37, large), static_cast<std::string>(large));
+    for (const auto& [type, id] : {std::pair(11U, 37U), {40U, 126U}, {40U, 127U}}) {
+        EXPECT_EQ(shown(type, id, large), static_cast<std::string>(large)) << id;
+    }
 }
 
 TEST(Print, ATimeThatHasNoYearIsShownInSeconds) {

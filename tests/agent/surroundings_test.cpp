@@ -62,6 +62,7 @@ HOST_TEST(CommandLine, WrongUsageEndsWithStatusTwoAndSaysWhereToLook) {
                                                {"watch", "--for", "soon"},
                                                {"watch", "--for", "-1"},
                                                {"tree", "extra"},
+                                               {"tree", "\x1b[31m"},
                                                {"tree", "--yes"},
                                                {"--log-level", "high", "tree"},
                                                {"--host-tools", "some", "tree"},
@@ -71,6 +72,7 @@ HOST_TEST(CommandLine, WrongUsageEndsWithStatusTwoAndSaysWhereToLook) {
         EXPECT_EQ(run.status, 2) << (words.empty() ? "nothing" : words.back());
         EXPECT_THAT(run.err, StartsWith("cvagent: "));
         EXPECT_THAT(run.err, HasSubstr("--help"));
+        EXPECT_THAT(run.err, Not(HasSubstr("\x1b")));
         EXPECT_THAT(run.out, IsEmpty());
     }
     EXPECT_THAT(cvagent.diary(), IsEmpty());

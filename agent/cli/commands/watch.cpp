@@ -11,7 +11,7 @@ namespace cvagent::commands {
 ExitStatus watch(Session& session, const Options& options) {
     print("");                 // an output that is closed is told now, not at the first event
     const OrderlyEnd waiting;  // to the end of the plug-in and of its last events
-    const auto events = session.agent().subscribe(0);
+    const EventPrinter printer(session.agent().subscribe(0), options.json);
     std::optional<EventProgram> program;
     if (!options.program.empty()) {
         program.emplace(options.program, EventProgram::Seconds(options.programSeconds),
@@ -19,7 +19,6 @@ ExitStatus watch(Session& session, const Options& options) {
     }
     complain("watching " + std::to_string(session.agent().nodes().size()) + " nodes" +
              (options.seconds ? "" : "; Ctrl-C ends it"));
-    const EventPrinter printer(*events, options.json);
     printer.follow(options.seconds);
     session.end();
     printer.printAll();  // what came while the plug-ins were stopped
