@@ -94,7 +94,13 @@ HOST_TEST(PreparedProcess, HasAllThatAnAgentNeeds) {
     settings.files = {&plugin};
     settings.log.file = "log";
     settings.hostTools = cvagent::HostTools::native;
+    close(STDIN_FILENO);
     const cvagent::PreparedProcess process(settings);
+    struct stat input {};
+    struct stat nothing {};
+    EXPECT_EQ(fstat(STDIN_FILENO, &input), 0);
+    EXPECT_EQ(stat("/dev/null", &nothing), 0);
+    EXPECT_EQ(input.st_rdev, nothing.st_rdev) << "no file of the agent's takes its place";
     EXPECT_EQ(plugin, "/srv/plugin.so");
     EXPECT_EQ(process.data().path(), "/srv/real/");
     EXPECT_STREQ(std::getenv("CORVISTA_DATA_DIR"), "/srv/real/") << "where the plug-ins look";

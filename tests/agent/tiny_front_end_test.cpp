@@ -35,12 +35,4 @@ HOST_TEST(TinyFrontEnd, HasAPreparedProcess) {
     EXPECT_EQ(run("").status, 12);
 }
 
-HOST_TEST(TinyFrontEnd, WhatItPrintsGoesIntoNoFileOfTheAgents) {
-    host.directory("/srv");
-    host.run({"sh", "-c",
-              "CORVISTA_DATA_DIR=/srv/data exec '" TINY_FRONT_END "' '" FAKE_PLUGIN_FILE
-              "' computer HostName >&-"});
-    EXPECT_EQ(host.read("/srv/data/.lock"), "");
-}
-
 }  // namespace
