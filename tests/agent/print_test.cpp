@@ -85,6 +85,7 @@ TEST(Print, NamesFromTheHostCannotSteerTheTerminal) {
               "\\xc2\\x9b"
               "2J");
     EXPECT_EQ(printable("a\xff\xe2\x82z"), "a\\xff\\xe2\\x82z");
+    EXPECT_EQ(printable("a\u202eb"), "a\\xe2\\x80\\xaeb") << "what follows would be read backwards";
     EXPECT_EQ(printable("J\u00fcrgen"), "J\u00fcrgen");
     EXPECT_EQ(shown(40, 108, {"a\nb", true}), "a\\x0ab");
 }
