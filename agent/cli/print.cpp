@@ -37,9 +37,9 @@ std::string speedText(unsigned long long kilobits) {
     return fraction == std::string::npos ? text : text.erase(fraction, 2);
 }
 
-std::string offsetText(int minutes) {
-    const auto twoDigits = [](int number) { return (number < 10 ? "0" : "") + std::to_string(number); };
-    const int size = std::abs(minutes);
+std::string offsetText(long long minutes) {
+    const auto twoDigits = [](long long number) { return (number < 10 ? "0" : "") + std::to_string(number); };
+    const long long size = std::abs(minutes);
     return (minutes < 0 ? "UTC-" : "UTC+") + twoDigits(size / 60) + ":" + twoDigits(size % 60);
 }
 

@@ -39,6 +39,7 @@ TEST(Print, SpeedsClocksAndOffsetsReadWell) {
               "1795208583 s since 1970, 2026-11-20T21:03:03Z");
     EXPECT_EQ(shown(40, 127, {Number(-210.0), true}), "-210 min, UTC-03:30");
     EXPECT_EQ(shown(40, 127, {Number(330.0), true}), "330 min, UTC+05:30");
+    EXPECT_EQ(shown(40, 127, {Number(-2147483648.0), true}), "-2147483648 min, UTC-35791394:08");
 }
 
 TEST(Print, CodesHaveTheirLabels) {
