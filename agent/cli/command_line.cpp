@@ -2,7 +2,6 @@
 
 #include <CLI/CLI.hpp>
 #include <cmath>
-#include <iostream>
 #include <sstream>
 
 #include "agent/cli/failure.h"
@@ -199,7 +198,7 @@ std::string helpCommand(const CLI::App& app) {
 
 }  // namespace
 
-std::optional<Options> parseCommandLine(int count, const char* const* words, int& status) {
+std::optional<Options> parseCommandLine(int count, const char* const* words) {
     Options options;
     CLI::App app{kDescription, "cvagent"};
     app.footer(kFooter);
@@ -218,18 +217,16 @@ std::optional<Options> parseCommandLine(int count, const char* const* words, int
         return options;
     } catch (const CLI::Success& help) {
         std::ostringstream text;
-        status = app.exit(help, text, text);
+        app.exit(help, text, text);
         print(text.str());
-    } catch (const CLI::RequiredError& error) {
-        const bool noCommand = app.get_subcommands().empty();
-        std::cerr << "cvagent: " << (noCommand ? "which command? Try: cvagent tree" : error.what())
-                  << "\nSee: " << helpCommand(app) << '\n';
-        status = static_cast<int>(ExitStatus::usage);
+        return std::nullopt;
     } catch (const CLI::ParseError& error) {
-        std::cerr << "cvagent: " << error.what() << "\nSee: " << helpCommand(app) << '\n';
-        status = static_cast<int>(ExitStatus::usage);
+        const bool noCommand =
+            dynamic_cast<const CLI::RequiredError*>(&error) != nullptr && app.get_subcommands().empty();
+        throw Failure(ExitStatus::usage,
+                      std::string(noCommand ? "which command? Try: cvagent tree" : error.what()) +
+                          "\nSee: " + helpCommand(app));
     }
-    return std::nullopt;
 }
 
 }  // namespace cvagent

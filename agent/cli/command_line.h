@@ -6,9 +6,8 @@
 
 namespace cvagent {
 
-/// Reads the command line. Prints help and complaints itself.
-/// @param status receives the exit status when there is nothing to run
-/// @return what to run, or nothing
-std::optional<Options> parseCommandLine(int count, const char* const* words, int& status);
+/// Reads the command line. Throws Failure when it makes no sense.
+/// @return what to run; nothing when help was asked for, which is printed
+std::optional<Options> parseCommandLine(int count, const char* const* words);
 
 }  // namespace cvagent

@@ -60,7 +60,7 @@ void complainOfAlert(const Event& alert) {
 
 void EventPrinter::printAll() {
     const std::lock_guard lock(guard_);
-    const Subscription::Taken taken = events_.take();
+    const Subscription::Taken taken = events_->take();
     if (taken.dropped > 0) {
         complain(std::to_string(taken.dropped) + " events came faster than they could be printed");
     }
@@ -104,7 +104,7 @@ void EventPrinter::follow(const std::optional<double>& seconds) {
               std::chrono::duration_cast<Clock::duration>(std::chrono::duration<double>(*seconds));
     }
     while (StopSignals::received() == 0 && !hasFailed() && (!end || Clock::now() < *end)) {
-        pollfd ready[] = {{events_.descriptor(), POLLIN, 0}, {StopSignals::descriptor(), POLLIN, 0}};
+        pollfd ready[] = {{events_->descriptor(), POLLIN, 0}, {StopSignals::descriptor(), POLLIN, 0}};
         if (poll(ready, 2, millisecondsTo(end)) < 0 && errno != EINTR) {
             throw Failure(ExitStatus::failed, "cannot wait for events");
         }

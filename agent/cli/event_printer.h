@@ -1,7 +1,9 @@
 #pragma once
 
+#include <memory>
 #include <mutex>
 #include <optional>
+#include <utility>
 
 #include "agent/cli/failure.h"
 #include "agent/core/event_log.h"
@@ -11,11 +13,12 @@ namespace cvagent {
 /// One line on standard error.
 void complainOfAlert(const Event& alert);
 
-/// Prints the events of a subscription, which outlives it, as lines for people or as JSON. Once standard
-/// output takes no more, alerts are told on standard error: the plug-in tells each but once. Any thread.
+/// Prints the events of a subscription as lines for people or as JSON. Once standard output takes no more,
+/// alerts are told on standard error: the plug-in tells each but once. Any thread.
 class EventPrinter {
 public:
-    EventPrinter(Subscription& events, bool asJson) : events_(events), asJson_(asJson) {}
+    EventPrinter(std::shared_ptr<Subscription> events, bool asJson)
+        : events_(std::move(events)), asJson_(asJson) {}
 
     /// What waits to be printed. Never throws for an output that fails.
     void printAll();
@@ -29,7 +32,7 @@ private:
     void show(const Event& event);
     bool hasFailed() const;
 
-    Subscription& events_;
+    const std::shared_ptr<Subscription> events_;
     const bool asJson_;
     mutable std::mutex guard_;  // guards everything below, and the order of what is printed
     std::optional<Failure> failure_;

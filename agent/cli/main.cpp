@@ -61,15 +61,6 @@ ExitStatus runGuarded(Options& options, cvagent::WantMessages& wants) {
     }
 }
 
-std::optional<Options> parsed(int count, char** words, int& status) {
-    try {
-        return cvagent::parseCommandLine(count, words, status);
-    } catch (const cvagent::Failure& failure) {
-        status = static_cast<int>(endWith(failure));
-        return std::nullopt;
-    }
-}
-
 /// What is not shown or not found can be what was wanting.
 ExitStatus runAndJudge(Options& options) {
     cvagent::WantMessages wants;
@@ -89,7 +80,10 @@ ExitStatus runAndJudge(Options& options) {
 int main(int count, char** words) {
     cvagent::openStandardDescriptors();
     cvagent::StopSignals::becomeWriteErrors();
-    int status = 0;
-    auto options = parsed(count, words, status);
-    return options ? static_cast<int>(runAndJudge(*options)) : status;
+    try {
+        auto options = cvagent::parseCommandLine(count, words);
+        return static_cast<int>(options ? runAndJudge(*options) : ExitStatus::done);
+    } catch (const cvagent::Failure& failure) {
+        return static_cast<int>(endWith(failure));
+    }
 }

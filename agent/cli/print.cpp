@@ -6,8 +6,7 @@
 #include <algorithm>
 #include <array>
 #include <cerrno>
-#include <cstdarg>
-#include <cstdio>
+#include <charconv>
 #include <cstdlib>
 #include <cstring>
 
@@ -18,15 +17,6 @@ namespace cvagent {
 
 namespace {
 
-__attribute__((format(printf, 1, 2))) std::string formatted(const char* format, ...) {
-    std::array<char, 64> text{};
-    va_list arguments;
-    va_start(arguments, format);
-    const int length = std::vsnprintf(text.data(), text.size(), format, arguments);
-    va_end(arguments);
-    return length < 0 ? std::string() : std::string(text.data());
-}
-
 /// "12.3 GB": a size in steps of 1000 or 1024, with the unit that keeps it short.
 std::string scaled(double size, double step, const std::array<const char*, 6>& units) {
     std::size_t unit = 0;
@@ -35,7 +25,9 @@ std::string scaled(double size, double step, const std::array<const char*, 6>& u
         ++unit;
     }
     const int decimals = unit == 0 || size >= 1000 ? 0 : 1;
-    return formatted("%.*f %s", decimals, size, units[unit]);
+    std::array<char, 32> text{};
+    const auto written = std::to_chars(text.begin(), text.end(), size, std::chars_format::fixed, decimals);
+    return std::string(text.begin(), written.ptr) + " " + units.at(unit);
 }
 
 std::string speedText(unsigned long long kilobits) {
@@ -45,9 +37,10 @@ std::string speedText(unsigned long long kilobits) {
     return fraction == std::string::npos ? text : text.erase(fraction, 2);
 }
 
-std::string offsetText(double minutes) {
-    const int whole = static_cast<int>(minutes);
-    return formatted("UTC%c%02d:%02d", whole < 0 ? '-' : '+', std::abs(whole) / 60, std::abs(whole) % 60);
+std::string offsetText(long long minutes) {
+    const auto twoDigits = [](long long number) { return (number < 10 ? "0" : "") + std::to_string(number); };
+    const long long size = std::abs(minutes);
+    return (minutes < 0 ? "UTC-" : "UTC+") + twoDigits(size / 60) + ":" + twoDigits(size % 60);
 }
 
 /// What a number comes to in larger units; empty when there is nothing to add.
@@ -64,9 +57,9 @@ std::string inLargerUnits(Unit unit, const IC::Number& number) {
         case Unit::kilobitsPerSecond:
             return speedText(number.toUnsigned64());
         case Unit::secondsSinceEpoch:
-            return timeText(static_cast<std::time_t>(number.toDouble()));
+            return timeText(static_cast<std::time_t>(number.toUnsigned64()));
         case Unit::minutes:
-            return offsetText(number.toDouble());
+            return offsetText(static_cast<int>(static_cast<unsigned int>(number)));
         default:
             return {};
     }

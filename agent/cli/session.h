@@ -24,7 +24,7 @@ ProcessSettings processSettings(Options& options);
 /// The agent as the command line needs it, with its errors and warnings on standard error.
 class Session {
 public:
-    /// Both outlive it.
+    /// @param process outlives it
     Session(const PreparedProcess& process, const Options& options, WantMessages& wants);
     Session(const Session&) = delete;
     Session& operator=(const Session&) = delete;

@@ -97,35 +97,23 @@ void EventLog::hear(const Event& event) {
     }
 }
 
-EventLog::Since EventLog::sinceLocked(std::uint64_t number) const {
-    const std::deque<Event>& kept = kept_.events();
-    const std::uint64_t gone = last_ - kept.size();  // the last one that is kept no more
-    Since since;
-    since.missing = number < gone ? gone - number : 0;
-    std::copy_if(kept.begin(), kept.end(), std::back_inserter(since.events),
-                 [number](const Event& event) { return event.number > number; });
-    return since;
-}
-
 /// How many of a kind are lost to who wants those after a number; at most, where that number is lost itself.
 std::uint64_t EventLog::missingOf(Event::Kind kind, std::uint64_t after) const {
     const Gone& gone = gone_.at(placeOf(kind));
     return gone.last > after ? std::min(gone.count, gone.last - after) : 0;
 }
 
-EventLog::Since EventLog::since(std::uint64_t number) const {
-    const std::lock_guard lock(guard_);
-    return sinceLocked(number);
-}
-
 std::shared_ptr<Subscription> EventLog::subscribe(std::uint64_t after, std::size_t most,
                                                   std::optional<Event::Kind> only) {
     auto subscription = std::make_shared<Subscription>(most, only);
     const std::lock_guard lock(guard_);
-    const Since past = sinceLocked(after);
-    subscription->dropped_ = only ? missingOf(*only, after) : past.missing;
-    for (const Event& event : past.events) {
-        subscription->put(event);
+    const std::deque<Event>& kept = kept_.events();
+    const std::uint64_t gone = last_ - kept.size();  // the last one that is kept no more
+    subscription->dropped_ = only ? missingOf(*only, after) : gone - std::min(gone, after);
+    for (const Event& event : kept) {
+        if (event.number > after) {
+            subscription->put(event);
+        }
     }
     std::erase_if(subscribers_, [](const auto& subscriber) { return subscriber.expired(); });
     subscribers_.push_back(subscription);

@@ -75,18 +75,11 @@ class EventLog : public Listener {
 public:
     static constexpr std::size_t kMost = 4096;  ///< a thousand nodes that come, go and change
 
-    struct Since {
-        std::vector<Event> events;
-        std::uint64_t missing = 0;  ///< events after that number which are kept no more
-    };
-
     /// @param most how many past events are kept
     explicit EventLog(std::size_t most = kMost) : kept_(most) {}
 
     void hear(const Event& event) override;
-    /// The events after a number, the oldest first; 0 asks for all that are kept.
-    Since since(std::uint64_t number) const;
-    /// A queue of the events after a number, those that have happened included.
+    /// A queue of the events after a number, those that have happened included; 0 asks for all that are kept.
     std::shared_ptr<Subscription> subscribe(std::uint64_t after, std::size_t most = kMost,
                                             std::optional<Event::Kind> only = std::nullopt);
 
@@ -97,10 +90,9 @@ private:
         std::uint64_t last = 0;  ///< number of the last one
     };
 
-    Since sinceLocked(std::uint64_t number) const;
     std::uint64_t missingOf(Event::Kind kind, std::uint64_t after) const;
 
-    mutable std::mutex guard_;  // guards everything below
+    std::mutex guard_;  // guards everything below
     std::uint64_t last_ = 0;
     EventQueue kept_;
     std::array<Gone, kEventKinds> gone_;  // by kind

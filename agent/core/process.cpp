@@ -29,7 +29,7 @@ PreparedProcess::PreparedProcess(ProcessSettings settings) {
     }
 }
 
-AgentSettings PreparedProcess::agentSettings() const {
+AgentSettings PreparedProcess::agentSettings() const& {
     AgentSettings settings;
     settings.data = data_;
     settings.log = log_;

@@ -31,7 +31,8 @@ public:
     PreparedProcess& operator=(const PreparedProcess&) = delete;
 
     /// What an agent in this process starts from; its plug-ins are still to be named.
-    AgentSettings agentSettings() const;
+    AgentSettings agentSettings() const&;
+    AgentSettings agentSettings() const&& = delete;  // the agent would outlive the process's set-up
     /// Errors of the plug-ins that belong to no call.
     ErrorLines& errors() const { return *errors_; }
     const DataDirectory& data() const { return *data_; }

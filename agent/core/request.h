@@ -31,16 +31,4 @@ private:
     std::shared_ptr<ErrorLines> errors_ = std::make_shared<ErrorLines>();
 };
 
-/// Waits on a condition until a request's deadline.
-/// @return whether it came true
-template <class Condition, class Lock, class Predicate>
-bool waitFor(Condition& changed, Lock& lock, Request::Clock::time_point deadline,
-             const Predicate& predicate) {
-    if (deadline == Request::Clock::time_point::max()) {  // would overflow on its way to the kernel
-        changed.wait(lock, predicate);
-        return true;
-    }
-    return changed.wait_until(lock, deadline, predicate);
-}
-
 }  // namespace cvagent

@@ -100,7 +100,7 @@ void forgetSignalsOfTheCaller() {
 }  // namespace
 
 void openStandardDescriptors() {
-    standardOutputClosed = fcntl(STDOUT_FILENO, F_GETFD) < 0;
+    standardOutputClosed = standardOutputClosed || fcntl(STDOUT_FILENO, F_GETFD) < 0;
     int opened = -1;
     do {
         opened = open("/dev/null", O_RDWR);
@@ -118,6 +118,7 @@ bool standardOutputWasClosed() {
 }
 
 void prepareSurroundings(const std::vector<std::string*>& files) {
+    openStandardDescriptors();
     rememberChildrenOfTheCaller();
     forgetSignalsOfTheCaller();
     umask(S_IWGRP | S_IWOTH);
@@ -195,8 +196,7 @@ std::string limitsOfUser(const DataDirectory& data) {
         return {};
     }
     return "without root some facts will be missing: partition tables of disks, Wake-on-LAN of network "
-           "ports, "
-           "files that only root reads. Nothing of the host can be changed. Data is kept in " +
+           "ports, files that only root reads. Nothing of the host can be changed. Data is kept in " +
            data.path();
 }
 

@@ -8,15 +8,16 @@
 namespace cvagent {
 
 /// Opens the descriptors 0 to 2 that the program was started without (to /dev/null): the next file opened
-/// would be taken for one of them. To be called before anything else.
+/// would be taken for one of them. prepareSurroundings() does it, too; a program that opens or prints
+/// anything before that calls it first.
 void openStandardDescriptors();
 /// Whether standard output was one of them: what is written there reaches nobody.
 bool standardOutputWasClosed();
 
-/// Gives the process what the plug-in's commands need, and takes from it what would let others turn them: an
-/// environment of a few variables, a PATH with the sbin directories behind what is there, "/" as the current
-/// directory, umask 022, children that can be waited for, no core dumps, no blocked signals, running timers
-/// and limits that end it in the middle of a write. To be called before any thread.
+/// Gives the process what the plug-in's commands need, and takes from it what would let others turn them:
+/// standard descriptors, an environment of a few variables, a PATH with the sbin directories behind what is
+/// there, "/" as the current directory, umask 022, children that can be waited for, no core dumps, no blocked
+/// signals, running timers and limits that end it in the middle of a write. To be called before any thread.
 /// @param files names that become absolute, as CORVISTA_DATA_DIR does: they are meant from where the program
 ///              was started
 void prepareSurroundings(const std::vector<std::string*>& files);

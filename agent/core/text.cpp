@@ -18,12 +18,17 @@ std::string spelt(char byte) {
 
 }  // namespace
 
+bool isControl(char32_t character) {
+    return character < 0x20 || (character >= 0x7F && character < 0xA0) || character == 0x2028 ||
+           character == 0x2029 || (character >= 0x202A && character <= 0x202E) ||
+           (character >= 0x2066 && character <= 0x2069);
+}
+
 std::string printable(const std::string& text) {
     std::string shown;
     for (std::size_t i = 0; i < text.size();) {
         const QX::Utf8Character next = QX::firstUtf8Character(std::string_view(text).substr(i));
-        const bool isControl = next.code < 0x20 || (next.code >= 0x7F && next.code < 0xA0);
-        if (next.length != 0 && !isControl) {
+        if (next.length != 0 && !isControl(next.code)) {
             shown.append(text, i, next.length);
             i += next.length;
         } else {

@@ -7,7 +7,9 @@
 
 namespace cvagent {
 
-/// The text with control characters, and bytes that are no UTF-8, spelt out, so that a name from the host
+/// Control characters, line and paragraph separators, and those that turn the direction of writing.
+bool isControl(char32_t character);
+/// The text with such characters, and bytes that are no UTF-8, spelt out, so that a name from the host
 /// cannot steer the terminal.
 std::string printable(const std::string& text);
 /// The same, cut after some 60 characters, for messages that quote what was given.

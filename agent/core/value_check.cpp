@@ -43,13 +43,6 @@ std::optional<unsigned int> writableCode(const Property& property, Words words) 
     return std::nullopt;
 }
 
-/// Control characters, line and paragraph separators, and those that turn the direction of writing.
-bool isControl(char32_t character) {
-    return character < 0x20 || (character >= 0x7F && character < 0xA0) || character == 0x2028 ||
-           character == 0x2029 || (character >= 0x202A && character <= 0x202E) ||
-           (character >= 0x2066 && character <= 0x2069);
-}
-
 bool isPlainText(std::string_view text) {
     while (!text.empty()) {
         const QX::Utf8Character next = QX::firstUtf8Character(text);

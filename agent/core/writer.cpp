@@ -63,9 +63,11 @@ class Writer::Turn {
 public:
     Turn(Writer& writer, Request::Clock::time_point deadline) : writer_(writer) {
         std::unique_lock lock(writer_.guard_);
-        const bool patient = deadline == Request::Clock::time_point::max();
-        waitFor(writer_.turnOver_, lock, deadline,
-                [&] { return !writer_.busy_ || (patient && writer_.givenUp_); });
+        if (deadline == Request::Clock::time_point::max()) {
+            writer_.turnOver_.wait(lock, [&] { return !writer_.busy_ || writer_.givenUp_; });
+        } else {
+            writer_.turnOver_.wait_until(lock, deadline, [&] { return !writer_.busy_; });
+        }
         if (writer_.busy_) {
             throw Problem(Problem::busy, "another write is at work");
         }

@@ -350,6 +350,23 @@ HOST_TEST(AgentReads, WhatIsKnownAsksNobody) {
     host.remove(kHold);
 }
 
+/// The kernel numbers threads and processes in one sequence.
+pid_t idOfANewThread() {
+    pid_t id = 0;
+    std::jthread([&id] { id = gettid(); }).join();
+    return id;
+}
+
+HOST_TEST(AgentThreads, AreNotMadeForEachCall) {
+    Fake fake;
+    const pid_t before = idOfANewThread();
+    for (int i = 0; i < 100; ++i) {
+        fake.read(108, i % 2 == 0 ? Request("test") : within(5s));
+        fake.write("x", Request("test"));
+    }
+    EXPECT_LT(idOfANewThread() - before, 100) << "no more than the pool has";
+}
+
 HOST_TEST(AgentWrites, TellWhatCameOfThem) {
     Fake fake;
     const Request request("test");

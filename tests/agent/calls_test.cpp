@@ -67,7 +67,7 @@ TEST(Writer, ANodeThatIsGoneIsNotWrittenTo) {
     EXPECT_EQ(result.problem->kind(), Problem::notFound);
     EXPECT_STREQ(result.problem->what(), "OwnerContact was not changed: the node is gone");
     EXPECT_TRUE(result.after.failed());
-    EXPECT_TRUE(parts.events.since(0).events.empty());
+    EXPECT_TRUE(parts.events.subscribe(0)->take().events.empty());
     EXPECT_EQ(static_cast<std::string>(cvagent::readProperty(*node, 115).value), "old");
 }
 

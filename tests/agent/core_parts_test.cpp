@@ -13,6 +13,7 @@
 #include "agent/cli/failure.h"
 #include "agent/core/agent.h"
 #include "agent/core/announcer.h"
+#include "agent/core/process.h"
 #include "agent/core/property_words.h"
 #include "agent/core/running_plugins.h"
 #include "tests/agent/node_list.h"
@@ -53,6 +54,11 @@ concept PointsToItsNode = requires(Reference&& node) {
 static_assert(GivesItsNode<const NodeRef&> && PointsToItsNode<const NodeRef&>);
 static_assert(!GivesItsNode<NodeRef> && !PointsToItsNode<NodeRef>);
 static_assert(std::is_same_v<decltype(*std::declval<const NodeRef&>()), const IC::MutableNode&>);
+template <class Process>
+concept GivesSettings = requires(Process&& process) {
+    std::forward<Process>(process).agentSettings();
+};
+static_assert(GivesSettings<const cvagent::PreparedProcess&> && !GivesSettings<cvagent::PreparedProcess>);
 
 template <class Call>
 Problem problemOf(const Call& call) {
@@ -79,27 +85,31 @@ std::vector<std::uint64_t> numbersOf(const auto& events) {
     return numbers;
 }
 
+cvagent::Subscription::Taken pastOf(EventLog& log, std::uint64_t after = 0) {
+    return log.subscribe(after)->take();
+}
+
 TEST(EventLog, NumbersEventsAndKeepsTheLastOnes) {
     EventLog log(3);
     for (int i = 0; i < 5; ++i) {
         log.hear(eventOf(Event::Kind::alert));
     }
-    EXPECT_THAT(numbersOf(log.since(0).events), ElementsAre(3, 4, 5));
-    EXPECT_EQ(log.since(0).missing, 2U);
-    EXPECT_EQ(log.since(1).missing, 1U);
-    EXPECT_EQ(log.since(2).missing, 0U);
-    EXPECT_THAT(numbersOf(log.since(4).events), ElementsAre(5));
-    EXPECT_THAT(log.since(5).events, IsEmpty());
-    EXPECT_EQ(log.since(99).missing, 0U);
-    EXPECT_THAT(log.since(99).events, IsEmpty());
+    EXPECT_THAT(numbersOf(pastOf(log).events), ElementsAre(3, 4, 5));
+    EXPECT_EQ(pastOf(log).dropped, 2U);
+    EXPECT_EQ(pastOf(log, 1).dropped, 1U);
+    EXPECT_EQ(pastOf(log, 2).dropped, 0U);
+    EXPECT_THAT(numbersOf(pastOf(log, 4).events), ElementsAre(5));
+    EXPECT_THAT(pastOf(log, 5).events, IsEmpty());
+    EXPECT_EQ(pastOf(log, 99).dropped, 0U);
+    EXPECT_THAT(pastOf(log, 99).events, IsEmpty());
 }
 
 TEST(EventLog, MissesNothingAfterANumberThatIsStillToCome) {
     EventLog log(3);
     log.hear(eventOf(Event::Kind::alert));
-    const EventLog::Since since = log.since(std::numeric_limits<std::uint64_t>::max());
-    EXPECT_THAT(since.events, IsEmpty());
-    EXPECT_EQ(since.missing, 0U);
+    const auto past = pastOf(log, std::numeric_limits<std::uint64_t>::max());
+    EXPECT_THAT(past.events, IsEmpty());
+    EXPECT_EQ(past.dropped, 0U);
 }
 
 TEST(EventLog, ASlowSubscriberLosesTheOldestAndIsToldHowMany) {
@@ -165,8 +175,8 @@ TEST(EventLog, LongTextsDoNotFillTheMemory) {
     EXPECT_EQ(taken.events.size() + taken.dropped, 40U);
     EXPECT_EQ(taken.events.size(), 15U);
     EXPECT_EQ(taken.events.back().number, 40U);
-    EXPECT_EQ(log.since(0).events.size(), 15U);
-    EXPECT_EQ(log.since(0).missing, 25U);
+    EXPECT_EQ(pastOf(log).events.size(), 15U);
+    EXPECT_EQ(pastOf(log).dropped, 25U);
     event.message = std::string(20 << 20, 'x');
     log.hear(event);
     EXPECT_THAT(numbersOf(slow->take().events), ElementsAre(41));
@@ -458,15 +468,15 @@ protected:
 
 TEST_F(Announcer, TellsOfANodeOnceWhoeverSeesItFirst) {
     announcer.announceNew(ports);
-    EXPECT_THAT(log.since(0).events, IsEmpty());
+    EXPECT_THAT(pastOf(log).events, IsEmpty());
     const IC::MutableNode* const made = ports.addPort("eth1");
     announcer.announceNew(ports);
     announcer.announceNew(ports);
     announcer.hear(cvagent::nodeEvent(Event::Kind::published, *made));
-    ASSERT_EQ(log.since(0).events.size(), 1U);
-    EXPECT_EQ(log.since(0).events.front().path, "/network-port:eth1");
+    ASSERT_EQ(pastOf(log).events.size(), 1U);
+    EXPECT_EQ(pastOf(log).events.front().path, "/network-port:eth1");
     announcer.hear(cvagent::nodeEvent(Event::Kind::withdrawn, *made));
-    EXPECT_EQ(log.since(0).events.size(), 2U);
+    EXPECT_EQ(pastOf(log).events.size(), 2U);
 }
 
 TEST_F(Announcer, AnAlertTellsTheStateBeforeAndAfter) {
@@ -478,7 +488,7 @@ TEST_F(Announcer, AnAlertTellsTheStateBeforeAndAfter) {
     announcer.hear(
         cvagent::alertEvent(IC::Alert(1, 0, {"/nowhere"}, 12, "NIC is Offline "), ports.holdAll()));
     std::vector<std::string> changes;
-    for (const Event& event : log.since(0).events) {
+    for (const Event& event : pastOf(log).events) {
         changes.push_back(event.nodeClass + " " + event.propertyName + " " + event.before + " " +
                           event.after);
     }
@@ -503,7 +513,7 @@ TEST_F(Announcer, SuccessiveAlertsAreAChain) {
             }
         });
     }
-    const auto events = log.since(0).events;
+    const auto events = pastOf(log).events;
     ASSERT_EQ(events.size(), 2000U);
     for (std::size_t i = 1; i < events.size(); ++i) {
         ASSERT_EQ(events[i].before, events[i - 1].after) << i;

@@ -39,6 +39,7 @@ TEST(Print, SpeedsClocksAndOffsetsReadWell) {
               "1795208583 s since 1970, 2026-11-20T21:03:03Z");
     EXPECT_EQ(shown(40, 127, {Number(-210.0), true}), "-210 min, UTC-03:30");
     EXPECT_EQ(shown(40, 127, {Number(330.0), true}), "330 min, UTC+05:30");
+    EXPECT_EQ(shown(40, 127, {Number(-2147483648.0), true}), "-2147483648 min, UTC-35791394:08");
 }
 
 TEST(Print, CodesHaveTheirLabels) {
@@ -67,7 +68,9 @@ TEST(Print, UncataloguedValuesAreShownPlainly) {
 
 TEST(Print, WhatDoesNotFitItsUnitIsShownPlainly) {
     const PropertyValue large(Number(1e30), true);
-    EXPECT_EQ(shown(11, 37, large), static_cast<std::string>(large));
+    for (const auto& [type, id] : {std::pair(11U, 37U), {40U, 126U}, {40U, 127U}}) {
+        EXPECT_EQ(shown(type, id, large), static_cast<std::string>(large)) << id;
+    }
 }
 
 TEST(Print, ATimeThatHasNoYearIsShownInSeconds) {
@@ -83,6 +86,7 @@ TEST(Print, NamesFromTheHostCannotSteerTheTerminal) {
               "\\xc2\\x9b"
               "2J");
     EXPECT_EQ(printable("a\xff\xe2\x82z"), "a\\xff\\xe2\\x82z");
+    EXPECT_EQ(printable("a\u202eb"), "a\\xe2\\x80\\xaeb") << "what follows would be read backwards";
     EXPECT_EQ(printable("J\u00fcrgen"), "J\u00fcrgen");
     EXPECT_EQ(shown(40, 108, {"a\nb", true}), "a\\x0ab");
 }

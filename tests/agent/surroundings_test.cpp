@@ -64,6 +64,7 @@ HOST_TEST(CommandLine, WrongUsageEndsWithStatusTwoAndSaysWhereToLook) {
                                                {"watch", "--for", "soon"},
                                                {"watch", "--for", "-1"},
                                                {"tree", "extra"},
+                                               {"tree", "\x1b[31m"},
                                                {"tree", "--yes"},
                                                {"--log-level", "high", "tree"},
                                                {"--host-tools", "some", "tree"},
@@ -73,6 +74,7 @@ HOST_TEST(CommandLine, WrongUsageEndsWithStatusTwoAndSaysWhereToLook) {
         EXPECT_EQ(run.status, 2) << (words.empty() ? "nothing" : words.back());
         EXPECT_THAT(run.err, StartsWith("cvagent: "));
         EXPECT_THAT(run.err, HasSubstr("--help"));
+        EXPECT_THAT(run.err, Not(HasSubstr("\x1b")));
         EXPECT_THAT(run.out, IsEmpty());
     }
     EXPECT_THAT(cvagent.diary(), IsEmpty());
@@ -94,7 +96,13 @@ HOST_TEST(PreparedProcess, HasAllThatAnAgentNeeds) {
     settings.files = {&plugin};
     settings.log.file = "log";
     settings.hostTools = cvagent::HostTools::native;
+    close(STDIN_FILENO);
     const cvagent::PreparedProcess process(settings);
+    struct stat input {};
+    struct stat nothing {};
+    EXPECT_EQ(fstat(STDIN_FILENO, &input), 0);
+    EXPECT_EQ(stat("/dev/null", &nothing), 0);
+    EXPECT_EQ(input.st_rdev, nothing.st_rdev) << "no file of the agent's takes its place";
     EXPECT_EQ(plugin, "/srv/plugin.so");
     EXPECT_EQ(process.data().path(), "/srv/real/");
     EXPECT_STREQ(std::getenv("CORVISTA_DATA_DIR"), "/srv/real/") << "where the plug-ins look";

@@ -127,6 +127,28 @@ TEST(House, TheAgentsLibraryPrintsNothingAndEndsNothing) {
     }
 }
 
+TEST(House, TheAgentChangesItsProcessInTheSetUpAlone) {
+    const std::regex change(
+        R"re(\b(setenv|putenv|unsetenv|clearenv|f?chdir|umask|dup2|unshare|u?mount2?|sigaction|signal|sigprocmask|setrlimit|setitimer|prctl)\s*\()re");
+    const std::regex step(
+        R"re(\b(prepareSurroundings|nameInEnvironment|makeTmpPrivate|setUpCommands|putAdaptersOnPath)\()re");
+    std::set<std::string> changing;
+    std::set<std::string> callers;
+    for (const std::string room : {"agent/core", "agent/cli"}) {
+        for (const fs::path& file : sources(room)) {
+            const std::string code = codeOnly(file);
+            if (std::regex_search(code, change)) {
+                changing.insert(file.filename());
+            } else if (file.extension() == ".cpp" && std::regex_search(code, step)) {
+                callers.insert(file.filename());
+            }
+        }
+    }
+    EXPECT_EQ(changing, (std::set<std::string>{"data_directory.cpp", "environment.cpp", "host_tools.cpp",
+                                               "private_tmp.cpp", "signals.cpp", "surroundings.cpp"}));
+    EXPECT_EQ(callers, (std::set<std::string>{"main.cpp", "process.cpp"}));
+}
+
 TEST(House, TheAgentsLibraryGivesNoAdviceForOneFrontEnd) {
     const std::regex advice(R"re("[^"\n]*(sudo |ulimit|--[a-z]|\bcvagent[: ]|=DIRECTORY))re");
     for (const fs::path& file : sources("agent/core")) {
