@@ -36,11 +36,11 @@ constexpr Step kStartUp[] = {
 OsHwMI myoshwmi;
 
 OsHwMI::OsHwMI()
-    : ComputerBuilder(static_cast<NodeTree&>(*this)),
-      NetworkBuilder(static_cast<NodeTree&>(*this)),
-      ProcessorBuilder(static_cast<NodeTree&>(*this)),
-      Indications(static_cast<NodeTree&>(*this)),
-      StorageBuilder(static_cast<NodeTree&>(*this)) {}
+    : ComputerBuilder(tree()),
+      NetworkBuilder(tree()),
+      ProcessorBuilder(tree()),
+      Indications(tree()),
+      StorageBuilder(tree()) {}
 OsHwMI::~OsHwMI() = default;
 
 Error OsHwMI::initialize(unsigned int miId, const Number& ownNodeId, const Number& firstNodeId) {
@@ -85,6 +85,7 @@ Error OsHwMI::emptyTree() {
     // A write of the agent may have begun a walk, which still hangs its nodes under those that go here.
     const std::lock_guard noWalk(building);
     forgetStorageNodes();
+    forgetProcessors();
     fixed = {};
     return ManagementInterface::unload();
 }
