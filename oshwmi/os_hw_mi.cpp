@@ -35,12 +35,13 @@ constexpr Step kStartUp[] = {
 
 OsHwMI myoshwmi;
 
+// Without the cast each builder would be a copy of its own, not yet made, part of this object.
 OsHwMI::OsHwMI()
-    : ComputerBuilder(tree()),
-      NetworkBuilder(tree()),
-      ProcessorBuilder(tree()),
-      Indications(tree()),
-      StorageBuilder(tree()) {}
+    : ComputerBuilder(static_cast<NodeTree&>(*this)),
+      NetworkBuilder(static_cast<NodeTree&>(*this)),
+      ProcessorBuilder(static_cast<NodeTree&>(*this)),
+      Indications(static_cast<NodeTree&>(*this)),
+      StorageBuilder(static_cast<NodeTree&>(*this)) {}
 OsHwMI::~OsHwMI() = default;
 
 Error OsHwMI::initialize(unsigned int miId, const Number& ownNodeId, const Number& firstNodeId) {

@@ -32,8 +32,6 @@ public:
     __attribute__((visibility("default"))) void createCpuNodes();
 
 private:
-    /// What the builders are given: `*this` would be read as a builder to copy.
-    NodeTree& tree() { return *this; }
     void stopMonitors();
     Error emptyTree();
 };
