@@ -1,6 +1,7 @@
 #pragma once
 
 #include <map>
+#include <memory>
 #include <string>
 
 #include "mi/node_tree.h"
@@ -20,9 +21,12 @@ public:
     /// unload.
     void createCpuNodes();
 
+    /// The nodes have left the tree with all others: a build that lists none describes none.
+    void forgetProcessors() { processors_.clear(); }
+
 private:
     NodeTree& tree_;
-    std::map<unsigned int, MutableNode*> processors_;  ///< of the last build, by number, from 1
+    std::map<unsigned int, std::weak_ptr<MutableNode>> processors_;  ///< of the last build, by number, from 1
 };
 
 }  // namespace IC

@@ -36,7 +36,7 @@ bool isProcessor(const std::string& row) {
 
 /// The k-th speed that the kernel tells is the k-th processor's. One without a speed is left undescribed:
 /// agents have always been shown it so.
-void describeProcessors(const std::map<unsigned int, MutableNode*>& processors) {
+void describeProcessors(const std::map<unsigned int, std::weak_ptr<MutableNode>>& processors) {
     std::ifstream cpuinfo("/proc/cpuinfo");
     auto processor = processors.begin();
     for (std::string line; processor != processors.end() && std::getline(cpuinfo, line);) {
@@ -44,9 +44,11 @@ void describeProcessors(const std::map<unsigned int, MutableNode*>& processors) 
             continue;
         }
         const std::string speed = line.substr(line.find(':') + 1);
-        processor->second->setDescription("Processor");
-        processor->second->setProperty(
-            kClockSpeed, PropertyValue(Number(static_cast<unsigned int>(leadingDecimal(speed))), true));
+        if (const auto node = processor->second.lock()) {  // the agent has not withdrawn it
+            node->setDescription("Processor");
+            node->setProperty(kClockSpeed,
+                              PropertyValue(Number(static_cast<unsigned int>(leadingDecimal(speed))), true));
+        }
         ++processor;
     }
 }
@@ -72,7 +74,7 @@ void ProcessorBuilder::createCpuNodeAndMap() {
         }
         auto* processor = tree_.makeNode<MutableNode>(tree_.fixed.planar, NodeType::processor, number);
         tree_.appendNode(processor);
-        processors_.emplace(number++, processor);
+        processors_.emplace(number++, processor->weak_from_this());
     }
 }
 

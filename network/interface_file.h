@@ -19,8 +19,8 @@ struct KeyLine {
     /// writer goes on treating such a line as it always has, so that the file comes out as its owner expects.
     enum class Held {
         replaced,  ///< `line`; the keys behind this one look at the new text
-        kept,      ///< it stays, for a file that tells its origin keeps it; the keys behind look at it too
-        keptUntouched,  ///< as kept, but no key behind looks at it: the mask is never written over an origin
+        kept,      ///< it stays: an origin that the file tells is not overwritten; the next keys look at it
+        keptUntouched,  ///< it stays and no other key looks at it: the mask never replaces an origin
     };
 
     const char* key;   ///< looked for anywhere in a line: "IPADDR_" finds every secondary address

@@ -35,6 +35,7 @@ constexpr Step kStartUp[] = {
 
 OsHwMI myoshwmi;
 
+// Without the cast each builder would be a copy of its own, not yet made, part of this object.
 OsHwMI::OsHwMI()
     : ComputerBuilder(static_cast<NodeTree&>(*this)),
       NetworkBuilder(static_cast<NodeTree&>(*this)),
@@ -85,6 +86,7 @@ Error OsHwMI::emptyTree() {
     // A write of the agent may have begun a walk, which still hangs its nodes under those that go here.
     const std::lock_guard noWalk(building);
     forgetStorageNodes();
+    forgetProcessors();
     fixed = {};
     return ManagementInterface::unload();
 }

@@ -158,7 +158,7 @@ std::vector<ToolReport> inspectHostTools(HostTools choice, Look look,
 
 void setUpCommands(Commands commands) {
     shell::leaveAllToShell(commands == Commands::shell);
-    QX::setKillWitness(shell::noteKill);
+    QX::setKillCallBack(shell::noteKill);
 }
 
 void putAdaptersOnPath(const std::vector<ToolReport>& reports) {

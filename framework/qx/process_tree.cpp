@@ -205,7 +205,7 @@ void freeze(const Process& process) {
     }
 }
 
-std::atomic<void (*)(pid_t)> killWitness = nullptr;
+std::atomic<void (*)(pid_t)> killCallBack = nullptr;
 
 /// Processes that are stopped first, all of them, and killed then. When the search ends half-way they go on
 /// instead: whoever kills a shell alone sets its tools free, and they keep the pipe open.
@@ -216,8 +216,8 @@ public:
     Condemned& operator=(const Condemned&) = delete;
     ~Condemned() {
         for (const Process& process : frozen_) {
-            if (auto* const witness = killWitness.load(); complete_ && witness != nullptr) {
-                witness(process.id());
+            if (auto* const callBack = killCallBack.load(); complete_ && callBack != nullptr) {
+                callBack(process.id());
             }
             process.send(complete_ ? SIGKILL : SIGCONT);
         }
@@ -257,8 +257,8 @@ private:
 
 }  // namespace
 
-void setKillWitness(void (*witness)(pid_t)) {
-    killWitness = witness;
+void setKillCallBack(void (*callBack)(pid_t)) {
+    killCallBack = callBack;
 }
 
 void killChildrenOf(pid_t thread) {

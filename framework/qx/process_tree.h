@@ -56,6 +56,6 @@ CORVISTA_API std::vector<int> numbersIn(const std::string& directory);
 /// Has a function called with each process right before one of the functions above kills it, on the thread
 /// that kills: who waits for it can tell such an end from any other. To be set once, before there are
 /// threads.
-CORVISTA_API void setKillWitness(void (*witness)(pid_t));
+CORVISTA_API void setKillCallBack(void (*callBack)(pid_t));
 
 }  // namespace QX

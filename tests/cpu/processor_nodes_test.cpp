@@ -217,6 +217,35 @@ HOST_TEST(Processors, KeepTheirPlacesWhenTheyCannotBeListedAgain) {
     EXPECT_THAT(plugin.speeds(), ElementsAre("2000")) << "only a listing empties the map";
 }
 
+HOST_TEST(Processors, OfAnEarlierStartAreNotDescribedAgain) {
+    host.file("/proc/cpuinfo", processor(0, "1000.0"));
+    std::shared_ptr<IC::MutableNode> earlier;
+    {
+        Started plugin;
+        plugin.mi().createCpuNodes();
+        earlier = plugin.processors().front();
+    }
+    earlier->setDescription("of an earlier start");
+    Started plugin;
+    shell_stub::failWhen([](const std::string&) { return true; });
+    plugin.mi().createCpuNodes();
+    shell_stub::failWhen({});
+    EXPECT_EQ(earlier->getDescription(), "of an earlier start");
+}
+
+HOST_TEST(Processors, ThatTheAgentHasWithdrawnAreNotTouched) {
+    host.file("/proc/cpuinfo", processor(0, "1000.0"));
+    Started plugin;
+    plugin.mi().createCpuNodes();
+    const std::weak_ptr<IC::MutableNode> node = plugin.processors().front();
+    EXPECT_EQ(plugin.mi().deleteNode(node.lock().get()).getStatus(), 0);
+    EXPECT_TRUE(node.expired());
+    shell_stub::failWhen([](const std::string&) { return true; });
+    plugin.mi().createCpuNodes();  // which describes those of the last listing
+    shell_stub::failWhen({});
+    EXPECT_TRUE(plugin.processors().empty());
+}
+
 HOST_TEST(Processors, AnyAllocationMayFail) {
     host.file("/proc/cpuinfo", processor(0, "1000.0") + processor(1, "2000.0"));
     Started plugin;

@@ -164,7 +164,7 @@ TEST(Mutex, KeepsThreadsApart) {
     EXPECT_EQ(counter, 4000);
 }
 
-TEST(WaitWitness, HearsOfEveryWaitAndHoldsItsThreadBack) {
+TEST(WaitCallBack, HearsOfEveryWaitAndHoldsItsThreadBack) {
     Waits waits;
     QX::Event never(true);
     never.wait(0);

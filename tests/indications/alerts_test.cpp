@@ -32,11 +32,11 @@ struct Agent {
 };
 
 /// Keeps what a node said when its alert came.
-struct Witness {
+struct Listener {
     static IC::Error hear(const std::vector<IC::Alert>&, const void* context) {
-        auto* witness = const_cast<Witness*>(static_cast<const Witness*>(context));
-        witness->status = witness->node.getStatus();
-        witness->node.getProperty(123, witness->state);
+        auto* listener = const_cast<Listener*>(static_cast<const Listener*>(context));
+        listener->status = listener->node.getStatus();
+        listener->node.getProperty(123, listener->state);
         return {};
     }
 
@@ -109,11 +109,11 @@ HOST_TEST(Alerts, TellAPortThatGoesDown) {
 HOST_TEST(Alerts, TellASwitchOverAndMarkTheNodeFirst) {
     expectAlert({1, 32, "NIC has Switched Over ", 1, 32, 1, 32});
     OneChange change(1, 32);
-    Witness witness{change.node};
-    change.interfaces.mi().registerForAlerts(Witness::hear, &witness);
+    Listener listener{change.node};
+    change.interfaces.mi().registerForAlerts(Listener::hear, &listener);
     change.check();
-    EXPECT_EQ(witness.status, 1U);
-    EXPECT_EQ(witness.state, IC::PropertyValue(IC::Number(32U), true));
+    EXPECT_EQ(listener.status, 1U);
+    EXPECT_EQ(listener.state, IC::PropertyValue(IC::Number(32U), true));
 }
 
 HOST_TEST(Alerts, TellASwitchBackUnderTheCodeOfASwitchOver) {

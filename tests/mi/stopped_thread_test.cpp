@@ -23,10 +23,10 @@ namespace {
 using namespace std::chrono_literals;
 using IC::MyProcess;
 
-class Errand : public QX::Thread {
+class Worker : public QX::Thread {
 public:
-    explicit Errand(std::function<void()> work) : work_(std::move(work)) {}
-    ~Errand() override { join(); }
+    explicit Worker(std::function<void()> work) : work_(std::move(work)) {}
+    ~Worker() override { join(); }
     void* run(void* /*argument*/) override {
         work_();
         return nullptr;
@@ -39,7 +39,7 @@ private:
 HOST_TEST(AbortedThread, StartsNoFurtherCommand) {
     const CommandLines commands;
     const int before = MyProcess::cnt;
-    Errand errand([&] {
+    Worker worker([&] {
         QX::Thread::sleep(60'000);
         const unsigned int cutOff = IC::commandsCutOff();
         {
@@ -51,9 +51,9 @@ HOST_TEST(AbortedThread, StartsNoFurtherCommand) {
         EXPECT_EQ(IC::commandsCutOff(), cutOff + 2) << "they have not told what they had to";
         IC::runToEnd("true");
     });
-    errand.start(nullptr);
-    errand.abort();
-    errand.join();
+    worker.start(nullptr);
+    worker.abort();
+    worker.join();
     EXPECT_THAT(commands.all(), testing::IsEmpty());
     EXPECT_EQ(MyProcess::cnt, before + 2) << "as of commands that could not be started";
 }
@@ -61,50 +61,50 @@ HOST_TEST(AbortedThread, StartsNoFurtherCommand) {
 HOST_TEST(AbortedThread, HasNoErrorsOfItsOwn) {
     LogCapture capture;
     std::atomic<bool> begun{false};
-    Errand errand([&] {
+    Worker worker([&] {
         IC::log(IC::kError) << "before";
         begun = true;
         QX::Thread::sleep(60'000);
         IC::log(IC::kError) << "not for want of a tool";
         IC::log(IC::kProgress) << "after";
     });
-    errand.start(nullptr);
+    worker.start(nullptr);
     ASSERT_TRUE(eventually([&] { return begun.load(); }));
-    errand.abort();
-    errand.join();
+    worker.abort();
+    worker.join();
     EXPECT_THAT(capture.messages(), TextsAre("before", "after"));
 }
 
 HOST_TEST(JoinWithPatience, EndsTheCommandsAfterTenSeconds) {
     host.tool("ethtool eth0", ToolAnswer{.out = "", .delayMilliseconds = 60'000});
-    Errand errand([] { IC::HostCommand("ethtool eth0").nextLine(); });
-    errand.start(nullptr);
+    Worker worker([] { IC::HostCommand("ethtool eth0").nextLine(); });
+    worker.start(nullptr);
     QX::setClockSpeed(1000);
     const Waits waits;
-    IC::joinWithPatience(errand);
+    IC::joinWithPatience(worker);
     EXPECT_THAT(waits.ours(), testing::ElementsAre(10));
-    EXPECT_TRUE(errand.joinWithin(0));
+    EXPECT_TRUE(worker.joinWithin(0));
 }
 
 HOST_TEST(DropStopped, DeletesAThreadThatHasEndedAtOnce) {
     auto held = std::make_shared<int>();
     const std::weak_ptr<int> thing = held;
-    auto errand = std::make_unique<Errand>([held = std::move(held)] {});
-    errand->start(nullptr);
-    errand->join();
-    IC::dropStopped(std::move(errand));
+    auto worker = std::make_unique<Worker>([held = std::move(held)] {});
+    worker->start(nullptr);
+    worker->join();
+    IC::dropStopped(std::move(worker));
     EXPECT_TRUE(thing.expired());
 }
 
 HOST_TEST(DropStopped, WaitsWhereTheLibraryIsBeingClosed) {
     std::atomic<bool> ended{false};
-    auto errand = std::make_unique<Errand>([&] {
+    auto worker = std::make_unique<Worker>([&] {
         std::this_thread::sleep_for(50ms);
         ended = true;
     });
-    errand->start(nullptr);
+    worker->start(nullptr);
     IC::leaveNoThreads();
-    IC::dropStopped(std::move(errand));
+    IC::dropStopped(std::move(worker));
     EXPECT_TRUE(ended);
 }
 

@@ -7,6 +7,7 @@ corvista_test(mi SOURCES
   mi/log_names_test.cpp
   mi/no_memory_test.cpp
   mi/operation_names.cpp
+  mi/plugin_object_test.cpp
   mi/stopped_thread_test.cpp
   mi/temporary_file_test.cpp
   mi/text_test.cpp

@@ -81,7 +81,7 @@ using System = int (*)(const char*);
 /// Commands run as cvagent runs the plug-in's; CORVISTA_TEST_SHELLS=1 has real shells run them all.
 bool inShells() {
     static const bool all = [] {
-        QX::setKillWitness(cvagent::shell::noteKill);
+        QX::setKillCallBack(cvagent::shell::noteKill);
         const char* const wish = std::getenv("CORVISTA_TEST_SHELLS");
         return wish != nullptr && *wish == '1';
     }();

@@ -17,11 +17,11 @@ constexpr std::size_t kNobody = std::numeric_limits<std::size_t>::max();
 
 Waits::Waits() : heldFrom_(kNobody) {
     now = this;
-    QX::setWaitWitness(witness);
+    QX::setWaitCallBack(hear);
 }
 
 Waits::~Waits() {
-    QX::setWaitWitness(nullptr);
+    QX::setWaitCallBack(nullptr);
     now = nullptr;
     letGo();
     while (inside != 0) {
@@ -29,7 +29,7 @@ Waits::~Waits() {
     }
 }
 
-void Waits::witness(double seconds) {
+void Waits::hear(double seconds) {
     ++inside;
     if (Waits* const waits = now) {
         waits->note(seconds);

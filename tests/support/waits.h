@@ -32,7 +32,7 @@ public:
     void whenWeWait(std::function<void(double seconds)> action);
 
 private:
-    static void witness(double seconds);
+    static void hear(double seconds);
     void note(double seconds);
 
     const std::thread::id us_ = std::this_thread::get_id();

@@ -75,7 +75,7 @@ std::string codeOnly(const fs::path& file) {
     return std::regex_replace(content(file), noise, "");
 }
 
-TEST(House, RoomsIncludeOnlyWhatTheyMay) {
+TEST(CodeRules, RoomsIncludeOnlyWhatTheyMay) {
     const std::regex include(R"re(^\s*#include "([^"]+)")re");
     for (const auto& [room, allowed] : kMayInclude) {
         const auto files = sources(room);
@@ -92,7 +92,7 @@ TEST(House, RoomsIncludeOnlyWhatTheyMay) {
     }
 }
 
-TEST(House, ThePluginHasOneSeamToTheShell) {
+TEST(CodeRules, ThePluginHasOneSeamToTheShell) {
     const std::regex call(
         R"re(\b(popen|mypopen|system|execl|execv|execvp|execlp|posix_spawn|fork|vfork)\s*\()re");
     std::set<std::string> seams;
@@ -106,7 +106,7 @@ TEST(House, ThePluginHasOneSeamToTheShell) {
     EXPECT_EQ(seams, (std::set<std::string>{"mi/command.cpp", "mi/my_process.cpp", "mi/my_process.h"}));
 }
 
-TEST(House, ThePluginHasOneWayToTheLogger) {
+TEST(CodeRules, ThePluginHasOneWayToTheLogger) {
     for (const std::string& room : kPlugin) {
         for (const fs::path& file : sources(room)) {
             if (fs::relative(file, kTree) != "mi/log.cpp") {
@@ -116,7 +116,7 @@ TEST(House, ThePluginHasOneWayToTheLogger) {
     }
 }
 
-TEST(House, TheAgentsLibraryPrintsNothingAndEndsNothing) {
+TEST(CodeRules, TheAgentsLibraryPrintsNothingAndEndsNothing) {
     const std::regex edge(
         R"re(\b(std::c(err|out|in)|f?printf|puts|exit|_exit|set_terminate|abort|isatty)\b)re");
     for (const fs::path& file : sources("agent/core")) {
@@ -127,7 +127,7 @@ TEST(House, TheAgentsLibraryPrintsNothingAndEndsNothing) {
     }
 }
 
-TEST(House, TheAgentChangesItsProcessInTheSetUpAlone) {
+TEST(CodeRules, TheAgentChangesItsProcessInTheSetUpAlone) {
     const std::regex change(
         R"re(\b(setenv|putenv|unsetenv|clearenv|f?chdir|umask|dup2|unshare|u?mount2?|sigaction|signal|sigprocmask|setrlimit|setitimer|prctl)\s*\()re");
     const std::regex step(
@@ -149,14 +149,14 @@ TEST(House, TheAgentChangesItsProcessInTheSetUpAlone) {
     EXPECT_EQ(callers, (std::set<std::string>{"main.cpp", "process.cpp"}));
 }
 
-TEST(House, TheAgentsLibraryGivesNoAdviceForOneFrontEnd) {
+TEST(CodeRules, TheAgentsLibraryGivesNoAdviceForOneFrontEnd) {
     const std::regex advice(R"re("[^"\n]*(sudo |ulimit|--[a-z]|\bcvagent[: ]|=DIRECTORY))re");
     for (const fs::path& file : sources("agent/core")) {
         EXPECT_FALSE(std::regex_search(content(file), advice)) << file;
     }
 }
 
-TEST(House, FrontEndsReadAndWriteThroughTheAgent) {
+TEST(CodeRules, FrontEndsReadAndWriteThroughTheAgent) {
     for (const fs::path& file : sources("agent/cli")) {
         for (const char* call : {"getProperty(", "setProperty(", "holdAll("}) {
             EXPECT_EQ(codeOnly(file).find(call), std::string::npos) << file << " calls " << call;
@@ -164,7 +164,7 @@ TEST(House, FrontEndsReadAndWriteThroughTheAgent) {
     }
 }
 
-TEST(House, SourcesAndHeadersStayShort) {
+TEST(CodeRules, SourcesAndHeadersStayShort) {
     for (const auto& [room, allowed] : kMayInclude) {
         for (const fs::path& file : sources(room)) {
             const std::size_t longest = file.extension() == ".h" ? 150 : 400;
@@ -206,7 +206,7 @@ void expectNamesTests(const std::string& column, const std::set<std::string>& te
     EXPECT_TRUE(any) << column;
 }
 
-TEST(House, EveryAttackThatThePageOnSecurityNamesIsPlayed) {
+TEST(CodeRules, EveryAttackThatThePageOnSecurityNamesIsPlayed) {
     const std::set<std::string> tests = namesOfTests();
     std::size_t rows = 0;
     for (const std::string& line : lines(kTree / "docs/security.md")) {

@@ -1,4 +1,0 @@
-corvista_test(house SOURCES
-  house/house_test.cpp)
-# Of the file, not of the program: all programs share this one's precompiled headers, and what is defined is part of those.
-set_source_files_properties(house/house_test.cpp PROPERTIES COMPILE_DEFINITIONS CORVISTA_SOURCE_DIR="${CMAKE_SOURCE_DIR}")
