@@ -12,11 +12,6 @@ namespace {
 constexpr const char* toolName = "brctl";
 constexpr const char* sysfs = "/sys/class/net/";
 
-std::string firstLine(const std::string& path) {
-    const std::string content = readFile(path).value_or("");
-    return content.substr(0, content.find('\n'));
-}
-
 std::vector<std::string> sortedNames(const std::string& directory) {
     std::vector<std::string> names = listDirectory(directory);
     std::ranges::sort(names);
@@ -31,7 +26,7 @@ bool isBridge(const std::string& name) {
 void list(Text& text, const std::string& bridge) {
     const std::string directory = sysfs + bridge;
     const bool spanningTree = readNumber(directory + "/bridge/stp_state") != 0;
-    text.add(bridge).add("\t\t").add(firstLine(directory + "/bridge/bridge_id"));
+    text.add(bridge).add("\t\t").add(readFirstLine(directory + "/bridge/bridge_id"));
     text.add(spanningTree ? "\tyes\t\t" : "\tno\t\t");
     const char* before = "";
     for (const std::string& member : sortedNames(directory + "/brif")) {

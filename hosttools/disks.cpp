@@ -38,11 +38,6 @@ std::string under(const std::string& directory, const std::string& name) {
     return directory + "/" + name;
 }
 
-std::string readFirstLine(const std::string& path) {
-    const std::string content = readFile(path).value_or("");
-    return content.substr(0, content.find('\n'));
-}
-
 std::vector<Partition> listPartitions(const std::string& diskDirectory) {
     std::vector<Partition> partitions;
     for (const std::string& name : listDirectory(diskDirectory)) {

@@ -29,6 +29,11 @@ std::optional<std::string> readFile(const std::string& path) {
     }
 }
 
+std::string readFirstLine(const std::string& path) {
+    const std::string content = readFile(path).value_or("");
+    return content.substr(0, content.find('\n'));
+}
+
 std::uint64_t readNumber(const std::string& path, std::uint64_t fallback) {
     const auto content = readFile(path);
     return content ? parseNumber(*content).value_or(fallback) : fallback;

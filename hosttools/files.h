@@ -25,6 +25,8 @@ private:
 
 /// A whole file, as files of /proc, /sys and /run are read. @return nothing when it cannot be opened or read
 std::optional<std::string> readFile(const std::string& path);
+/// The first line of such a file without its newline; "" when there is none.
+std::string readFirstLine(const std::string& path);
 /// The decimal number that a file begins with. @return fallback when there is no such file or no number in it
 std::uint64_t readNumber(const std::string& path, std::uint64_t fallback = 0);
 /// The leading number of a text, in base 10 or 16 (with or without "0x"). @return nothing when there is none

@@ -32,6 +32,12 @@ bool isNullDevice(const struct stat& file) {
     return S_ISCHR(file.st_mode) && file.st_rdev == makedev(kMemoryDevices, kNull);
 }
 
+/// Whether nobody sees what this process and its children print to standard error.
+bool complaintsGoNowhere() {
+    struct stat file {};
+    return fstat(STDERR_FILENO, &file) == 0 && isNullDevice(file);
+}
+
 FirstStage refused() {
     return {{Outcome::refused}};
 }
@@ -202,11 +208,6 @@ FirstStage startProcess(const FirstStageRequest& request, const std::string& pat
 }
 
 }  // namespace
-
-bool complaintsGoNowhere() {
-    struct stat file {};
-    return fstat(STDERR_FILENO, &file) == 0 && isNullDevice(file);
-}
 
 bool nullDeviceIsThere() {
     struct stat file {};

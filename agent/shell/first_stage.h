@@ -44,8 +44,6 @@ FirstStage startFirstStage(const FirstStageRequest& request, ProgramSearch& prog
 FirstStage startShell(const FirstStageRequest& request, const std::string& text,
                       const std::string& argument = {});
 
-/// Whether nobody sees what this process and its children print to standard error.
-bool complaintsGoNowhere();
 /// Whether /dev/null is the device of that name.
 bool nullDeviceIsThere();
 

@@ -7,8 +7,6 @@
 #include <sys/stat.h>
 #include <sys/syscall.h>
 
-#include <algorithm>
-#include <array>
 #include <cerrno>
 #include <optional>
 
@@ -126,10 +124,8 @@ LocalFile::Outcome removable(const std::string& path) {
     if (!looked.isOpen()) {
         return errno == ENOENT ? LocalFile::missing : LocalFile::unfit;
     }
-    const auto kind = kindOf(looked);
-    constexpr std::array<mode_t, 2> kFit = {S_IFREG, S_IFLNK};
-    const bool fits = std::find(kFit.begin(), kFit.end(), kind) != kFit.end();
-    return fits ? LocalFile::opened : LocalFile::unfit;
+    const bool isLink = kindOf(looked) == static_cast<mode_t>(S_IFLNK);
+    return isLink || isRegular(looked) ? LocalFile::opened : LocalFile::unfit;
 }
 
 }  // namespace cvagent::shell

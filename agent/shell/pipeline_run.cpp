@@ -1,6 +1,5 @@
 #include "agent/shell/pipeline_run.h"
 
-#include <fcntl.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -12,6 +11,7 @@
 
 #include "agent/shell/filters/filters.h"
 #include "agent/shell/local_file.h"
+#include "hosttools/text.h"
 
 namespace cvagent::shell {
 
@@ -64,17 +64,6 @@ std::vector<std::string> splitWord(const std::string& text) {
         at = text.find_first_not_of(kSeparators, end);
     }
     return words;
-}
-
-bool writeAll(int descriptor, std::string_view text) {
-    while (!text.empty()) {
-        const ssize_t written = write(descriptor, text.data(), text.size());
-        if (written < 0 && errno != EINTR) {
-            return false;
-        }
-        text.remove_prefix(written > 0 ? static_cast<std::size_t>(written) : 0);
-    }
-    return true;
 }
 
 }  // namespace
@@ -239,7 +228,7 @@ bool PipelineRun::pull(std::string& out) {
 void PipelineRun::drainIntoFile() {
     std::string chunk;
     while (file_.isOpen() && last_->pull(chunk)) {
-        if (!writeAll(file_.get(), chunk)) {
+        if (!hosttools::writeAll(file_.get(), chunk)) {
             failToWrite(errno);
             file_.reset();
         }
@@ -254,8 +243,8 @@ void PipelineRun::failToWrite(int error) {
     const bool grep = stage.words.front().text.ends_with("grep");
     writeStatus_ = grep ? 2 : 1;
     if (!stage.silent) {
-        writeAll(STDERR_FILENO, (grep ? "grep" : stage.words.front().text) +
-                                    ": write error: " + std::strerror(error) + '\n');
+        hosttools::writeAll(STDERR_FILENO, (grep ? "grep" : stage.words.front().text) +
+                                               ": write error: " + std::strerror(error) + '\n');
     }
 }
 

@@ -9,6 +9,7 @@
 #include <cerrno>
 #include <chrono>
 #include <cstdlib>
+#include <cstring>
 #include <ctime>
 #include <map>
 #include <mutex>
@@ -80,6 +81,11 @@ bool isEgrepScript(std::string_view content) {
            content.ends_with(kEgrepScript) && content.find("obsolescent") == std::string_view::npos;
 }
 
+/// A string's own search stops at each first byte of what it looks for, and programs are full of zeros.
+bool holds(std::string_view content, std::string_view mark) {
+    return memmem(content.data(), content.size(), mark.data(), mark.size()) != nullptr;
+}
+
 Program::Kind kindIn(const std::string& name, std::string_view content) {
     if (content.starts_with(kScript)) {
         return name == "egrep" && isEgrepScript(content) ? Program::known : Program::tool;
@@ -87,11 +93,9 @@ Program::Kind kindIn(const std::string& name, std::string_view content) {
     if (!content.starts_with(kBinary)) {
         return Program::tool;
     }
-    const bool known = std::ranges::any_of(kKnown, [&](const Known& one) {
-        return one.name == name && content.find(one.mark) != std::string::npos;
-    });
-    const bool busybox = content.find(kBusybox) != std::string::npos;
-    return known ? Program::known : busybox ? Program::busybox : Program::tool;
+    const bool known = std::ranges::any_of(
+        kKnown, [&](const Known& one) { return one.name == name && holds(content, one.mark); });
+    return known ? Program::known : holds(content, kBusybox) ? Program::busybox : Program::tool;
 }
 
 /// What was found out about files, by what identifies them.

@@ -6,6 +6,7 @@
 #include <unistd.h>
 
 #include <array>
+#include <cerrno>
 #include <cstdint>
 #include <cstdio>
 #include <cstdlib>
@@ -93,6 +94,16 @@ Answer ours(const Stage& stage, const std::string& input) {
     return answer;
 }
 
+/// The fuzzer's own alarm may come at any time.
+template <class Call>
+auto uninterrupted(Call call) {
+    auto result = call();
+    while (result < 0 && errno == EINTR) {
+        result = call();
+    }
+    return result;
+}
+
 /// The input fits into a pipe, so that it can be written before anybody reads.
 Answer theirs(const Stage& stage, const std::string& input) {
     std::array<int, 2> in{};
@@ -122,12 +133,13 @@ Answer theirs(const Stage& stage, const std::string& input) {
     close(out[1]);
     Answer answer;
     std::array<char, 65536> buffer{};
-    for (ssize_t got = 0; (got = read(out[0], buffer.data(), buffer.size())) > 0;) {
+    const auto next = [&] { return read(out[0], buffer.data(), buffer.size()); };
+    for (ssize_t got = 0; (got = uninterrupted(next)) > 0;) {
         answer.out.append(buffer.data(), static_cast<std::size_t>(got));
     }
     close(out[0]);
     int status = 0;
-    waitpid(tool, &status, 0);
+    uninterrupted([&] { return waitpid(tool, &status, 0); });
     answer.status = WEXITSTATUS(status);
     return answer;
 }

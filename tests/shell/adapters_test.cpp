@@ -1,6 +1,10 @@
 // Our own host tools as calls: the same listings as from the program, and as current.
 #include <gmock/gmock.h>
+#include <linux/rtnetlink.h>
+#include <sys/socket.h>
+#include <unistd.h>
 
+#include <cerrno>
 #include <fstream>
 #include <regex>
 #include <thread>
@@ -119,18 +123,34 @@ HOST_TEST(Adapters, AreAskedAnewAtOnceWhenARouteGoesWithItsNextHop) {
     EXPECT_EQ(shown().find("198.51.100.0"), std::string::npos);
 }
 
+/// Is told of links like the runner, and has as much room for what is told.
+int openListener() {
+    const int listener = socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC | SOCK_NONBLOCK, NETLINK_ROUTE);
+    sockaddr_nl address{};
+    address.nl_family = AF_NETLINK;
+    address.nl_groups = RTMGRP_LINK;
+    bind(listener, reinterpret_cast<const sockaddr*>(&address), sizeof address);
+    return listener;
+}
+
 HOST_TEST(Adapters, ReadTheKernelAnewWhenNewsWereLost) {
     host.useKernelNetwork();
     host.realTool("ip");
+    ASSERT_EQ(inShell("ip link add one type veth peer name two", Complaints::seen).err, "");
     cvagent::shell::KernelNews news;
     EXPECT_FALSE(news.isQuiet());
     EXPECT_TRUE(news.isQuiet());
-    std::string batch = "link add one type veth peer name two\n";
-    for (int i = 0; i < 1000; ++i) {
-        batch += "link set one alias " + std::string(200, static_cast<char>('a' + i % 26)) + '\n';
+    const int listener = openListener();
+    std::string batch;
+    for (int mtu = 1000; mtu < 1400; ++mtu) {
+        batch += "link set one mtu " + std::to_string(mtu) + '\n';
     }
     host.file("/tmp/batch", batch);
     ASSERT_EQ(inShell("ip -batch /tmp/batch", Complaints::seen).err, "");
+    char begin = 0;
+    EXPECT_EQ(recv(listener, &begin, 1, 0), -1);
+    EXPECT_EQ(errno, ENOBUFS) << "more than there is room for";
+    close(listener);
     EXPECT_FALSE(news.isQuiet());
     EXPECT_TRUE(news.isQuiet());
 }

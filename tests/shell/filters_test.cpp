@@ -2,6 +2,7 @@
 // prints.
 #include <gmock/gmock.h>
 
+#include "agent/shell/filters/filters.h"
 #include "tests/shell/both_ways.h"
 #include "tests/support/fake_host.h"
 
@@ -117,6 +118,25 @@ HOST_TEST(Filters, HandALineThatIsTooLongToNobody) {
     EXPECT_EQ(direct("cat /etc/input | grep b", Complaints::seen).out, "");
     EXPECT_EQ(direct("cat /etc/input | grep b", Complaints::seen).status, 2 << 8);
     EXPECT_EQ(direct("cat /etc/input | tr -s b", Complaints::seen).out, "b");
+}
+
+/// A file that can be read so far and no further.
+class BrokenFile : public cvagent::shell::TextSource {
+public:
+    using TextSource::TextSource;
+    bool failed() const override { return true; }
+};
+
+TEST(Filters, GrepTakesNoHalfLineOfAFileThatCannotBeReadOn) {
+    using cvagent::shell::Manner;
+    const std::vector<std::string> words = {"b"};
+    const auto grep = cvagent::shell::makeGrep(words, Manner{});
+    grep->readFrom(std::make_unique<BrokenFile>("a\nb\nb and"));
+    std::string out;
+    while (grep->pull(out)) {
+    }
+    EXPECT_EQ(out, "b\n");
+    EXPECT_EQ(grep->status(), 2);
 }
 
 /// Has another program stand for a tool, as on a host that has it as its own.
