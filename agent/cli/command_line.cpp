@@ -1,6 +1,7 @@
 #include "agent/cli/command_line.h"
 
 #include <CLI/CLI.hpp>
+#include <algorithm>
 #include <cmath>
 #include <iostream>
 #include <sstream>
@@ -25,12 +26,24 @@ constexpr const char* kFooter =
 constexpr const char* kNodeHelp =
     "The node: its id, its path, or the last part of its path when only one node has it";
 
+/// Numbers are decimal: "+1" and "0x10" are none, here as in ids and values.
+CLI::Validator wholeDecimal() {
+    return CLI::Validator(
+        [](const std::string& text) {
+            const bool good = text.find_first_not_of("0123456789") == std::string::npos;
+            return good ? std::string() : inQuotes(text) + " is no decimal number";
+        },
+        "");
+}
+
 /// Seconds up to a limit; the range check of the parser lets "nan" through.
 CLI::Validator secondsUpTo(double most) {
     return CLI::Validator(
         [most](const std::string& text) {
             double seconds = 0;
-            const bool good = CLI::detail::lexical_cast(text, seconds) && seconds >= 0 && seconds <= most;
+            const bool good = !text.starts_with('+') &&
+                              text.find_first_not_of("0123456789.eE+-") == std::string::npos &&
+                              CLI::detail::lexical_cast(text, seconds) && seconds >= 0 && seconds <= most;
             return good ? std::string()
                         : inQuotes(text) + " is no number of seconds from 0 to " +
                               std::to_string(std::lround(most));
@@ -51,6 +64,7 @@ void addGlobalOptions(CLI::App& app, Options& options) {
            "Lowest level of the lines that are logged (3000 progress, 4000 changes, 5000, 6000 errors); "
            "without --log they go to standard error. Default: 6000")
         ->type_name("N")
+        ->check(wholeDecimal())
         ->check(CLI::Range(0, 1000000));
     app.add_option("--trace", options.traceFile, "Append every line, whatever its level, to this file")
         ->type_name("FILE");
@@ -180,8 +194,22 @@ void addOffline(CLI::App& app, Options& options) {
 
     CLI::App* doctor =
         app.add_subcommand("doctor", "Tell which of the host's tools are found, used and missing");
+    doctor->add_flag("--verify", options.verify,
+                     "Compare the tree with what the kernel says now; status 1 when they differ");
     addJson(*doctor, options);
     doctor->callback([&options] { options.command = Command::doctor; });
+}
+
+std::string whyNoCommand(const CLI::App& app) {
+    std::vector<std::string> rest = app.remaining();
+    const auto word =
+        std::ranges::find_if(rest, [](const std::string& text) { return !text.starts_with('-'); });
+    if (word == rest.end()) {
+        return "which command? Try: cvagent tree";
+    }
+    unmark(*word);
+    return "there is no command " + inQuotes(*word) +
+           "; the commands are: tree, get, set, watch, properties, doctor";
 }
 
 /// The subcommand that was being read, for the hint.
@@ -215,7 +243,7 @@ std::optional<Options> parseCommandLine(int count, const char* const* words, int
         print(text.str());
     } catch (const CLI::RequiredError& error) {
         const bool noCommand = app.get_subcommands().empty();
-        std::cerr << "cvagent: " << (noCommand ? "which command? Try: cvagent tree" : error.what())
+        std::cerr << "cvagent: " << (noCommand ? whyNoCommand(app) : error.what())
                   << "\nSee: " << helpCommand(app) << '\n';
         status = static_cast<int>(ExitStatus::usage);
     } catch (const CLI::ParseError& error) {

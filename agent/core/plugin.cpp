@@ -68,6 +68,10 @@ std::string pluginBesideProgram() {
     return *found;
 }
 
+bool isOfThisSystem(const std::string& file) {
+    return file.substr(file.rfind('/') + 1).starts_with(kLibrary);
+}
+
 void tellNobody(const std::string& /*text*/) {}
 
 Plugin::Plugin(const std::string& file, Listener* listener, Tell tell, bool processors)

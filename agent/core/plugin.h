@@ -14,6 +14,8 @@ namespace cvagent {
 /// The plug-in beside this program: in its build tree or where it was installed. Throws Problem when it is at
 /// neither place; nowhere else is it looked for.
 std::string pluginBesideProgram();
+/// Whether a file is, by its name, the plug-in that this agent comes with.
+bool isOfThisSystem(const std::string& file);
 
 /// Hears of what belongs to no call: a message for whoever looks after the agent.
 using Tell = std::function<void(const std::string& text)>;
