@@ -51,6 +51,24 @@ CLI::Validator secondsUpTo(double most) {
         "");
 }
 
+/// The words of an enumeration, and nothing else.
+template <class Value>
+CLI::Validator oneOf(const std::map<std::string, Value>& words) {
+    return CLI::Validator(
+        [words](std::string& text) {
+            if (const auto found = words.find(text); found != words.end()) {
+                text = std::to_string(static_cast<int>(found->second));
+                return std::string();
+            }
+            std::string list;
+            for (const auto& [word, value] : words) {
+                list += (list.empty() ? "" : ", ") + word;
+            }
+            return inQuotes(text) + " is none of: " + list;
+        },
+        "");
+}
+
 void addGlobalOptions(CLI::App& app, Options& options) {
     app.add_option("--plugin", options.plugins,
                    "The plug-in to load; by default the one beside this program. Several may be given")
@@ -75,13 +93,13 @@ void addGlobalOptions(CLI::App& app, Options& options) {
            "Tools the plug-in's commands find: the host's own (native), our adapters (classic), or of "
            "each the one that prints the classic format (auto, the default)")
         ->type_name("auto|native|classic")
-        ->transform(CLI::CheckedTransformer(choices).description(""));
+        ->transform(oneOf(choices));
     const std::map<std::string, Commands> ways{{"direct", Commands::direct}, {"shell", Commands::shell}};
     app.add_option("--commands", options.commands,
                    "How the plug-in's commands are run: without a shell where that makes no difference "
                    "(direct, the default), or all by /bin/sh (shell)")
         ->type_name("direct|shell")
-        ->transform(CLI::CheckedTransformer(ways).description(""));
+        ->transform(oneOf(ways));
     app.add_option("--command-timeout", options.commandSeconds,
                    "End a command of the plug-in that takes longer, in a write ten times as long; what it "
                    "would have told reads as an error. 0 waits for ever. Default: 10")
