@@ -1,8 +1,8 @@
 #include "hosttools/host_tool.h"
 
-#include <sys/auxv.h>
 #include <sys/stat.h>
 #include <unistd.h>
+#include <algorithm>
 #include <cstdlib>
 #include <string>
 #include <vector>
@@ -10,17 +10,9 @@
 namespace hosttools {
 namespace {
 
-// Two installations on one PATH would hand a call over to each other for ever.
+// Two installations on one PATH, or one without /proc, would hand a call over to each other for ever.
 constexpr const char* handedOver = "HOSTTOOLS_HANDED_OVER";
 constexpr const char* usualPath = "/usr/sbin:/usr/bin:/sbin:/bin";
-
-/// Works without /proc, too.
-struct stat ownFile() {
-    struct stat own {};
-    const char* const path = reinterpret_cast<const char*>(getauxval(AT_EXECFN));
-    if (stat("/proc/self/exe", &own) != 0 && path != nullptr) stat(path, &own);
-    return own;
-}
 
 bool isProgram(const std::string& path, const struct stat& own) {
     struct stat file {};
@@ -31,7 +23,8 @@ bool isProgram(const std::string& path, const struct stat& own) {
 void run(const char* name, const std::vector<const char*>& words) {
     const char* const variable = getenv("PATH");
     std::string_view rest = variable != nullptr ? variable : usualPath;
-    const struct stat own = ownFile();
+    struct stat own {};
+    stat("/proc/self/exe", &own);
     while (!rest.empty()) {
         const std::string_view directory = rest.substr(0, rest.find(':'));
         rest.remove_prefix(std::min(directory.size() + 1, rest.size()));

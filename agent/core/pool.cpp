@@ -197,18 +197,19 @@ Pool::~Pool() {
 }
 
 void Pool::submit(unsigned int lane, const void* batch, std::function<void()> work) {
-    std::unique_lock lock(state_->guard);
-    state_->queue.push_back({lane, batch, std::move(work)});
-    state_->grow();
-    if (state_->threads.empty()) {
-        const State::Work alone = std::move(state_->queue.back());
-        state_->queue.pop_back();
+    const std::shared_ptr<State> state = state_;  // the work may end the pool before this returns
+    std::unique_lock lock(state->guard);
+    state->queue.push_back({lane, batch, std::move(work)});
+    state->grow();
+    if (state->threads.empty()) {
+        const State::Work alone = std::move(state->queue.back());
+        state->queue.pop_back();
         lock.unlock();
         alone.run();
         return;
     }
     lock.unlock();
-    state_->changed.notify_one();
+    state->changed.notify_one();
 }
 
 void Pool::giveUp(const void* batch) {

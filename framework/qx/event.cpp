@@ -16,10 +16,10 @@ void Event::signal() {
 }
 
 bool Event::wait(unsigned long seconds) {
+    const auto longest = scaled(std::chrono::duration<double>(seconds));
     const AbortableWait abortable(guard_, changed_);
     std::unique_lock lock(guard_);
-    changed_.wait_for(lock, scaled(std::chrono::duration<double>(seconds)),
-                      [&] { return signalled_ || abortable.aborted(); });
+    changed_.wait_for(lock, longest, [&] { return signalled_ || abortable.aborted(); });
     const bool signalled = signalled_;
     if (autoReset_) {
         signalled_ = false;

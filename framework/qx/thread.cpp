@@ -177,8 +177,9 @@ void Thread::join() {
 }
 
 bool Thread::joinWithin(unsigned int milliseconds) {
+    const auto longest = scaled(std::chrono::milliseconds(milliseconds));
     std::unique_lock lock(state_->guard);
-    return !state_->isCurrent() && state_->waitForEnd(lock, scaled(std::chrono::milliseconds(milliseconds)));
+    return !state_->isCurrent() && state_->waitForEnd(lock, longest);
 }
 
 void Thread::abort() {

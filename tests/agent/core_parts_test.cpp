@@ -387,25 +387,27 @@ TEST(Facts, KeepTheLastValueOfWhatWasCutOff) {
     EXPECT_FALSE(facts.known(node, 5).stale);
 }
 
-TEST(Facts, AnOlderAnswerThatComesLateChangesNothing) {
-    const IC::MutableNode node(7, 0, {1}, 40, 0);
+/// A node whose property 5 has answered "young" to a read that began a second after `earlier`.
+class FactsOfAYoungAnswer : public testing::Test {
+protected:
+    FactsOfAYoungAnswer() {
+        facts.meet(7);
+        Reading young{5, {}, IC::PropertyValue("young", true), {}};
+        facts.judge(node, young, earlier + 1s);
+    }
+
+    const IC::MutableNode node{7, 0, {1}, 40, 0};
+    const Facts::Clock::time_point earlier = Facts::Clock::now();
     Facts facts;
-    facts.meet(7);
-    const auto earlier = Facts::Clock::now();
-    Reading young{5, {}, IC::PropertyValue("young", true), {}};
-    facts.judge(node, young, earlier + 1s);
+};
+
+TEST_F(FactsOfAYoungAnswer, DoNotChangeByAnOlderAnswerThatComesLate) {
     Reading old{5, {}, IC::PropertyValue("old", true), {}};
     facts.judge(node, old, earlier);
     EXPECT_EQ(static_cast<std::string>(facts.known(node, 5).value), "young");
 }
 
-TEST(Facts, AnOlderReadThatIsCutOffLeavesAYoungerAnswerGood) {
-    const IC::MutableNode node(7, 0, {1}, 40, 0);
-    Facts facts;
-    facts.meet(7);
-    const auto earlier = Facts::Clock::now();
-    Reading young{5, {}, IC::PropertyValue("young", true), {}};
-    facts.judge(node, young, earlier + 1s);
+TEST_F(FactsOfAYoungAnswer, StayGoodWhenAnOlderReadIsCutOff) {
     Reading cut{5, {}, {}, "timed out", false, true};
     facts.judge(node, cut, earlier);
     EXPECT_EQ(static_cast<std::string>(cut.value), "young");
@@ -442,13 +444,19 @@ public:
     }
 };
 
-TEST(Announcer, TellsOfANodeOnceWhoeverSeesItFirst) {
+/// An announcer that knows of one port, eth0.
+class Announcer : public testing::Test {
+protected:
+    Announcer() { announcer.takeStock(ports); }
+
     Ports ports;
+    const IC::MutableNode* const port = ports.addPort("eth0");
     EventLog log;
     Facts facts;
-    cvagent::Announcer announcer(log, facts);
-    ports.addPort("eth0");
-    announcer.takeStock(ports);
+    cvagent::Announcer announcer{log, facts};
+};
+
+TEST_F(Announcer, TellsOfANodeOnceWhoeverSeesItFirst) {
     announcer.announceNew(ports);
     EXPECT_THAT(log.since(0).events, IsEmpty());
     const IC::MutableNode* const made = ports.addPort("eth1");
@@ -461,13 +469,7 @@ TEST(Announcer, TellsOfANodeOnceWhoeverSeesItFirst) {
     EXPECT_EQ(log.since(0).events.size(), 2U);
 }
 
-TEST(Announcer, AnAlertTellsTheStateBeforeAndAfter) {
-    Ports ports;
-    EventLog log;
-    Facts facts;
-    cvagent::Announcer announcer(log, facts);
-    ports.addPort("eth0");
-    announcer.takeStock(ports);
+TEST_F(Announcer, AnAlertTellsTheStateBeforeAndAfter) {
     for (const auto& [code, message] : std::vector<std::pair<unsigned int, std::string>>{
              {12, "NIC is Offline "}, {1, "NIC is Online "}, {32, "NIC has Switched Over "}}) {
         announcer.hear(
@@ -484,13 +486,7 @@ TEST(Announcer, AnAlertTellsTheStateBeforeAndAfter) {
                                      "network-port LinkState 1 32", "   "));
 }
 
-TEST(Announcer, SuccessiveAlertsAreAChain) {
-    Ports ports;
-    EventLog log;
-    Facts facts;
-    cvagent::Announcer announcer(log, facts);
-    const IC::MutableNode* const port = ports.addPort("eth0");
-    announcer.takeStock(ports);
+TEST_F(Announcer, SuccessiveAlertsAreAChain) {
     const auto alertAgain = [&](unsigned int code, const std::string& message) {
         for (int i = 0; i < 1000; ++i) {
             announcer.hear(

@@ -157,6 +157,8 @@ Json KernelTold::port(const std::string& name) const {
                        {"121", name},
                        {"123", liveState(name)},
                        {"125", {0, 1, 12}},
+                       {"182", nullptr},  // no way to wake the host
+                       {"183", nullptr},
                        {"185", 0}};
     addMembership(name, properties);
     return {{"description", "Network Port"}, {"status", liveState(name)}, {"properties", properties}};

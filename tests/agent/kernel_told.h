@@ -13,7 +13,8 @@ public:
 
     explicit KernelTold(FakeHost& host);
 
-    /// Path of each node to its description, status, and stored properties (id to value).
+    /// Path of each node to its description, status, and what the tools tell of its properties (id to value,
+    /// null for one that has none).
     Json nodes() const;
     /// What the link states of port and IP configuration answer when they are read live: 1 or 12.
     unsigned int liveState(const std::string& name) const;

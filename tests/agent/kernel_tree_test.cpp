@@ -65,6 +65,15 @@ Json values(const Json& node) {
     return found;
 }
 
+/// Of values only those that are told; null for one that is not there.
+Json onlyTold(const Json& values, const Json& told) {
+    Json found = Json::object();
+    for (const auto& [id, value] : told.items()) {
+        found[id] = values.value(id, Json());
+    }
+    return found;
+}
+
 /// A host whose network is the kernel's, in a namespace of its own. The far ends of its cables ("sw0"...)
 /// are in the same.
 class KernelTree : public HostFixture {
@@ -135,7 +144,12 @@ protected:
     }
     static void expectTreeAsTold(FakeHost& host) {
         const Json expected = KernelTold(host).nodes();
-        const Json found = shown(host);
+        Json found = shown(host);
+        for (const auto& [path, node] : expected.items()) {
+            if (found.contains(path)) {
+                found[path]["properties"] = onlyTold(found[path]["properties"], node["properties"]);
+            }
+        }
         EXPECT_EQ(found, expected) << "the way from what is told to what is shown: "
                                    << Json::diff(expected, found).dump(1);
     }
@@ -175,7 +189,7 @@ HOST_TEST_F(KernelTree, ReadsLiveWhatTheToolsTellNow) {
     for (const auto& [path, node] : nodes.items()) {
         Json expected = node["properties"];
         expected["123"] = 12;
-        EXPECT_EQ(values(cvagent(host, {"get", path})), expected) << path;
+        EXPECT_EQ(onlyTold(values(cvagent(host, {"get", path})), expected), expected) << path;
     }
     EXPECT_EQ(nodes.size(), 4U) << "both ends of the cable";
 }

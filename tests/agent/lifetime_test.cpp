@@ -77,7 +77,7 @@ HOST_TEST(PluginLifetime, MonitorsStoppedInTheMiddleOfAPassLeaveNothingBehind) {
     host.tool("fdisk -ls",
               "Disk /dev/sda: 80.0 GB, 80026361856 bytes\n/dev/sda1  *  1  13  104391  83  Linux\n");
     const cvagent::QuietCommands quiet;
-    loadAgainAndAgain(CORVISTA_PLUGIN_FILE, 20, 100000);  // one pass after the other
+    loadAgainAndAgain(CORVISTA_PLUGIN_FILE, 20, 100000);  // one loading after the other
     EXPECT_THAT(host.listDirectory("/tmp"), testing::IsEmpty());
 }
 

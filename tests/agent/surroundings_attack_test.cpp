@@ -178,7 +178,7 @@ HOST_TEST(CallersLimits, LeaveNoCoreWithWhatTheProgramKnows) {
     EXPECT_EQ(told(host), "0\n8\n") << "a service that a command restarts can raise it again";
 }
 
-// A limit of 0 is passed over where the kernel hands cores to a program.
+// A limit of 0 is ignored where the kernel hands cores to a program.
 HOST_TEST(CallersLimits, KeepACoreFromAProgramThatCollectsThem) {
     cvagent::prepareSurroundings({});
     rlimit limit{};

@@ -103,26 +103,24 @@ HOST_TEST_F(HostsFile, StopsTheChangeWhenItIsMissing) {
     EXPECT_EQ(capture.messages().back(), "executeDomainandHostnameChanges: exit");
 }
 
-HOST_TEST_F(HostsFile, StopsTheChangeOnAReadOnlyFileSystem) {
-    host.file(kHosts, "127.0.0.2 old\n");
-    host.file(kHostName, "old");
-    host.readOnly("/etc");
-    LogCapture capture;
-    change();
-    EXPECT_THAT(capture.messages(6000), TextsAre("Can not open '/etc/hosts' in write mode."));
-    EXPECT_EQ(host.read(kHosts), "127.0.0.2 old\n");
-    EXPECT_EQ(host.read(kHostName), "old");
-}
-
-HOST_TEST_F(HostsFile, StaysWholeOnAFullDisk) {
+/// Both files stay as they are where /etc takes no write.
+void expectUnchanged(FakeHost& host, void (FakeHost::*spoil)(const std::string&), void (*change)()) {
     host.file(kHosts, "10.0.0.1 a\n127.0.0.2 old\n");
     host.file(kHostName, "old");
-    host.fullDisk("/etc");
+    (host.*spoil)("/etc");
     LogCapture capture;
     change();
     EXPECT_THAT(capture.messages(6000), TextsAre("Can not open '/etc/hosts' in write mode."));
     EXPECT_EQ(host.read(kHosts), "10.0.0.1 a\n127.0.0.2 old\n");
     EXPECT_EQ(host.read(kHostName), "old");
+}
+
+HOST_TEST_F(HostsFile, StopsTheChangeOnAReadOnlyFileSystem) {
+    expectUnchanged(host, &FakeHost::readOnly, [] { change(); });
+}
+
+HOST_TEST_F(HostsFile, StaysWholeOnAFullDisk) {
+    expectUnchanged(host, &FakeHost::fullDisk, [] { change(); });
 }
 
 HOST_TEST_F(HostsFile, StaysWholeWhenTheDiskHasNoRoomForALongerOne) {

@@ -1,6 +1,6 @@
 #include "framework/qx/event.h"
 
-#include <gtest/gtest.h>
+#include <gmock/gmock.h>
 
 #include <atomic>
 #include <chrono>
@@ -9,6 +9,7 @@
 
 #include "framework/qx/mutex.h"
 #include "framework/qx/thread.h"
+#include "tests/support/waits.h"
 
 namespace {
 
@@ -161,6 +162,27 @@ TEST(Mutex, KeepsThreadsApart) {
         thread.join();
     }
     EXPECT_EQ(counter, 4000);
+}
+
+TEST(WaitWitness, HearsOfEveryWaitAndHoldsItsThreadBack) {
+    Waits waits;
+    QX::Event never(true);
+    never.wait(0);
+    QX::Thread::sleep(5);
+    QX::Thread().joinWithin(7);
+    EXPECT_THAT(waits.ours(), testing::ElementsAre(0, 0.005, 0.007));
+    waits.holdFrom(2);
+    std::atomic<bool> slept{false};
+    std::thread other([&] {
+        QX::Thread::sleep(1);
+        QX::Thread::sleep(2);
+        slept = true;
+    });
+    EXPECT_TRUE(waits.othersBegin(2));
+    EXPECT_FALSE(slept);
+    waits.letGo();
+    other.join();
+    EXPECT_THAT(waits.others(), testing::ElementsAre(0.001, 0.002));
 }
 
 }  // namespace

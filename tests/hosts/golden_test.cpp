@@ -4,6 +4,7 @@
 
 #include <sys/mman.h>
 
+#include <algorithm>
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
@@ -96,8 +97,24 @@ bool needsAdapters(const std::string& name) {
     return name == "todays-names";
 }
 
-Seen look(FakeHost& host, const std::string& name, bool json, const std::string& commands) {
+/// Of forty network cards of one kind five, eth1 and eth10 among them: hundreds of shells for each of the
+/// others would tell nothing more.
+void leaveOutMostCards(FakeHost& host) {
+    static const std::regex others(" *eth([3-9]|1[1-9]|[2-9][0-9]):[^\n]*\n");
+    const std::string devices = host.read("/proc/net/dev").value_or("");
+    if (std::ranges::count(devices, '\n') > 40) {
+        host.file("/proc/net/dev", std::regex_replace(devices, others, ""));
+    }
+}
+
+using HostChange = void (*)(FakeHost&);
+
+Seen look(FakeHost& host, const std::string& name, bool json, const std::string& commands,
+          HostChange changeHost) {
     host.copyTree(name);
+    if (changeHost != nullptr) {
+        changeHost(host);
+    }
     std::vector<std::string> words = {CVAGENT_PROGRAM,
                                       "--host-tools",
                                       needsAdapters(name) ? "auto" : "native",
@@ -117,47 +134,18 @@ Seen look(FakeHost& host, const std::string& name, bool json, const std::string&
     return {lasting(run.out), logOfTheStart(host.read("/var/trace").value_or(""))};
 }
 
-Seen seenOn(const std::string& name, bool json, const std::string& commands) {
+Seen seenOn(const std::string& name, bool json, const std::string& commands,
+            HostChange changeHost = nullptr) {
     const HandedOut tree;
     const HandedOut log;
     inFakeHost(
         [&](FakeHost& host) {
-            const Seen seen = look(host, name, json, commands);
+            const Seen seen = look(host, name, json, commands, changeHost);
             tree.set(seen.tree);
             log.set(seen.log);
         },
         kLongest);
     return {tree.get(), log.get()};
-}
-
-class RecordedHost : public testing::TestWithParam<std::string> {};
-
-TEST_P(RecordedHost, ShowsItsTree) {
-    const bool rewrite = std::getenv("CORVISTA_REWRITE_GOLDEN") != nullptr;
-    int compared = 0;
-    for (const char* expectation : kExpectations) {
-        const fs::path expected = kHosts / GetParam() / expectation;
-        if (!fs::exists(expected)) {
-            continue;
-        }
-        ++compared;
-        const Seen seen = seenOn(GetParam(), expected.extension() == ".json", "direct");
-        if (rewrite) {
-            std::ofstream(expected) << seen.tree;
-        } else {
-            EXPECT_EQ(seen.tree, content(expected)) << expected;
-        }
-    }
-    EXPECT_GT(compared, 0) << "an empty expected-tree.txt or expected-tree.json is filled when rewritten";
-}
-
-/// The one test that keeps real shells for all of a host's commands.
-TEST_P(RecordedHost, IsTheSameThroughShells) {
-    const Seen direct = seenOn(GetParam(), true, "direct");
-    const Seen shells = seenOn(GetParam(), true, "shell");
-    EXPECT_EQ(direct.tree, shells.tree);
-    EXPECT_EQ(direct.log, shells.log);
-    EXPECT_THAT(direct.log, testing::HasSubstr("initialize: exit"));
 }
 
 std::vector<std::string> recordedHosts() {
@@ -169,6 +157,44 @@ std::vector<std::string> recordedHosts() {
     }
     std::sort(found.begin(), found.end());
     return found;
+}
+
+void expectTrees(const std::string& name) {
+    const bool rewrite = std::getenv("CORVISTA_REWRITE_GOLDEN") != nullptr;
+    int compared = 0;
+    for (const char* expectation : kExpectations) {
+        const fs::path expected = kHosts / name / expectation;
+        if (!fs::exists(expected)) {
+            continue;
+        }
+        ++compared;
+        const Seen seen = seenOn(name, expected.extension() == ".json", "direct");
+        if (rewrite) {
+            std::ofstream(expected) << seen.tree;
+        } else {
+            EXPECT_EQ(seen.tree, content(expected)) << expected;
+        }
+    }
+    EXPECT_GT(compared, 0) << "an empty expected-tree.txt or expected-tree.json is filled when rewritten";
+}
+
+/// One test of all hosts: what a property is changes in all of them at once.
+TEST(RecordedHosts, ShowTheirTrees) {
+    for (const std::string& name : recordedHosts()) {
+        SCOPED_TRACE(name);
+        expectTrees(name);
+    }
+}
+
+class RecordedHost : public testing::TestWithParam<std::string> {};
+
+/// The one test that keeps real shells for all of a host's commands.
+TEST_P(RecordedHost, IsTheSameThroughShells) {
+    const Seen direct = seenOn(GetParam(), true, "direct", leaveOutMostCards);
+    const Seen shells = seenOn(GetParam(), true, "shell", leaveOutMostCards);
+    EXPECT_EQ(direct.tree, shells.tree);
+    EXPECT_EQ(direct.log, shells.log);
+    EXPECT_THAT(direct.log, testing::HasSubstr("initialize: exit"));
 }
 
 INSTANTIATE_TEST_SUITE_P(Golden, RecordedHost, testing::ValuesIn(recordedHosts()), [](const auto& host) {

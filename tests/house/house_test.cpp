@@ -151,49 +151,6 @@ TEST(House, SourcesAndHeadersStayShort) {
     }
 }
 
-/// How often a text, which is not empty, stands in another one.
-std::size_t occurrences(const std::string& text, const std::string& part) {
-    std::size_t count = 0;
-    for (auto at = text.find(part); at != std::string::npos; at = text.find(part, at + part.size())) {
-        ++count;
-    }
-    return count;
-}
-
-/// The defects of a list by the name of their file: the text that each of them replaces.
-std::vector<std::pair<std::string, std::string>> plantedTexts(const fs::path& list) {
-    std::vector<std::pair<std::string, std::string>> found;
-    bool inBlock = false;
-    for (const std::string& line : lines(list)) {
-        if (line.starts_with('#')) {
-            continue;
-        }
-        if (line.empty()) {
-            inBlock = false;
-        } else if (!inBlock) {
-            found.emplace_back(line.substr(0, line.find(':')), "");
-            inBlock = true;
-        } else if (line.starts_with("- ")) {
-            std::string& text = found.back().second;
-            text += (text.empty() ? "" : "\n") + line.substr(2);
-        }
-    }
-    return found;
-}
-
-TEST(House, EveryPlantedDefectFitsItsFile) {
-    std::size_t count = 0;
-    for (const auto& entry : fs::directory_iterator(kTree / "tests/mutation/defects")) {
-        for (const auto& [file, text] : plantedTexts(entry.path())) {
-            ++count;
-            ASSERT_FALSE(text.empty()) << entry.path().filename() << ", " << file;
-            EXPECT_EQ(occurrences(content(kTree / file), text), 1U)
-                << entry.path().filename() << ", " << file << ": " << text;
-        }
-    }
-    EXPECT_GE(count, 125U);
-}
-
 /// Every "Suite.Name" of the tests.
 std::set<std::string> namesOfTests() {
     static const std::regex test(R"((?:HOST_)?TEST(?:_F|_P)?\(\s*(\w+),\s*(\w+)\))");

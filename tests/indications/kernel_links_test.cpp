@@ -1,17 +1,17 @@
 // The whole plug-in on links of a real kernel whose carrier comes and goes.
 #include <gmock/gmock.h>
 
-#include <thread>
+#include <algorithm>
 
 #include "framework/qx/thread.h"
 #include "oshwmi/os_hw_mi.h"
 #include "tests/indications/heard.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/texts_are.h"
+#include "tests/support/waiting.h"
+#include "tests/support/waits.h"
 
 namespace {
-
-using namespace std::chrono_literals;
 
 constexpr char kFile[] = "/opt/vantrel/corvista/data/oshwminetind.dat";
 
@@ -42,21 +42,21 @@ public:
     void pull(const std::string& number) { ip("link set far" + number + " down"); }
     void plug(const std::string& number) { ip("link set far" + number + " up"); }
     void start() {
-        QX::setClockSpeed(100);  // a pass every 300 ms
+        QX::setClockSpeed(300);  // 30 seconds pass in 100 ms
         IC::myoshwmi.registerForAlerts(Heard::hear, &heard_);
         IC::myoshwmi.initialize(1, IC::Number(1U), IC::Number(2U));
     }
     void stop() { IC::myoshwmi.unload(); }
-    /// Waits until the state file says so; false after half a minute.
     bool kept(const std::string& states) const {
-        for (int i = 0; i < 3000 && host_.read(kFile) != states; ++i) {
-            std::this_thread::sleep_for(10ms);
-        }
-        return host_.read(kFile) == states;
+        return eventually([&] { return host_.read(kFile) == states; });
     }
     /// What was heard when some more passes have gone by.
     std::vector<std::string> heard() {
-        std::this_thread::sleep_for(1500ms);
+        const auto passes = [this] {
+            const auto waits = waits_.others();
+            return std::count(waits.begin(), waits.end(), 30);
+        };
+        EXPECT_TRUE(eventually([&, before = passes()] { return passes() >= before + 2; }));
         return heard_.now();
     }
 
@@ -67,6 +67,7 @@ private:
     }
 
     FakeHost& host_;
+    Waits waits_;
     Heard heard_;
 };
 

@@ -4,9 +4,9 @@
 
 #include <algorithm>
 #include <atomic>
-#include <chrono>
 #include <mutex>
 #include <optional>
+#include <semaphore>
 #include <thread>
 
 #include "tests/indications/heard.h"
@@ -17,49 +17,61 @@
 #include "tests/support/no_threads.h"
 #include "tests/support/texts_are.h"
 #include "tests/support/waiting.h"
+#include "tests/support/waits.h"
 
 namespace {
 
 using namespace std::chrono_literals;
 using testing::Contains;
+using testing::Each;
 
 constexpr char kFile[] = "/opt/vantrel/corvista/data/oshwminetind.dat";
 
-/// An interface that answers late, and not for want of a command.
+/// An interface that does not answer until the test lets it, and not for want of a command.
 class SlowNode : public IC::MutableNode {
 public:
-    explicit SlowNode(std::chrono::milliseconds delay) : MutableNode(300, 1, {1}, 12, 0), delay_(delay) {}
+    SlowNode() : MutableNode(300, 1, {1}, 12, 0) {}
     IC::Error getProperty(unsigned int, IC::PropertyValue&) const override {
         asked_ = true;
-        std::this_thread::sleep_for(delay_);
+        answer_.acquire();
         return {1, IC::Number(), "late"};
     }
     bool asked() const { return asked_; }
+    void letAnswer() const { answer_.release(); }
 
 private:
-    const std::chrono::milliseconds delay_;
     mutable std::atomic<bool> asked_{false};
+    mutable std::counting_semaphore<> answer_{0};
 };
 
-/// What stopping a monitor says that is held up for so long.
-std::vector<std::string> stopHeldUp(std::chrono::milliseconds delay) {
-    QX::setClockSpeed(20);  // a second passes in 50 ms
+/// What stopping a monitor says that is held up for so many seconds.
+std::vector<std::string> stopHeldUp(unsigned int seconds) {
+    QX::setClockSpeed(100);  // a second passes in 10 ms
     Interfaces interfaces;
-    auto* slow = new SlowNode(delay);
+    auto* slow = new SlowNode;
     IC::OsHwMITestAccess::addInterface(interfaces.mi(), "eth0", slow);
+    Waits waits;
     interfaces.mi().enableIndications();
     EXPECT_TRUE(eventually([&] { return slow->asked(); }));
+    unsigned int waited = 0;
+    waits.whenWeWait([&](double length) {
+        if (length == 1 && waited++ == seconds) {
+            slow->letAnswer();
+        }
+    });
     LogCapture capture;
-    const auto start = std::chrono::steady_clock::now();
     interfaces.mi().disableIndications();
-    EXPECT_LT(std::chrono::steady_clock::now() - start, 1500ms);
-    EXPECT_EQ(capture.ownMessages(3000), capture.ownMessages());
-    return capture.ownMessages();
+    const auto messages = capture.ownMessages();
+    slow->letAnswer();
+    EXPECT_EQ(capture.ownMessages(3000), messages);
+    return messages;
 }
 
 HOST_TEST(NetworkMonitor, RaisesEachChangeOnceAndKeepsTheStateAcrossARestart) {
     host.directory("/opt/vantrel/corvista/data");
-    QX::setClockSpeed(1000);  // 30 seconds pass in 30 ms
+    QX::setClockSpeed(10'000);  // 30 seconds pass in 3 ms
+    const Waits waits;
+    const auto somePasses = [&] { return waits.othersBegin(waits.others().size() + 4); };
     Interfaces interfaces;
     auto& eth0 = interfaces.add("eth0", 1);
     Heard heard;
@@ -68,14 +80,14 @@ HOST_TEST(NetworkMonitor, RaisesEachChangeOnceAndKeepsTheStateAcrossARestart) {
     ASSERT_TRUE(eventually([&] { return host.read(kFile) == "eth0=1\n"; }));
     eth0.is(12);
     ASSERT_TRUE(eventually([&] { return !heard.now().empty(); }));
-    std::this_thread::sleep_for(200ms);  // several passes
+    ASSERT_TRUE(somePasses());
     EXPECT_THAT(heard.now(), TextsAre("NIC is Offline "));
     interfaces.mi().disableIndications();
     EXPECT_EQ(host.read(kFile), "eth0=12\n");
     eth0.is(1);
     interfaces.mi().enableIndications();
     ASSERT_TRUE(eventually([&] { return heard.now().size() == 2; }));
-    std::this_thread::sleep_for(200ms);
+    ASSERT_TRUE(somePasses());
     EXPECT_THAT(heard.now(), TextsAre("NIC is Offline ", "NIC is Online "));
     interfaces.mi().disableIndications();
 }
@@ -87,15 +99,15 @@ auto passes(const LogCapture& capture) {
 }
 
 HOST_TEST(NetworkMonitor, LooksEveryThirtySeconds) {
-    QX::setClockSpeed(20);  // 30 seconds pass in 1.5
+    QX::setClockSpeed(10'000);
+    const Waits waits;
     Interfaces interfaces;
     LogCapture capture;
     interfaces.mi().enableIndications();
-    ASSERT_TRUE(eventually([&] { return passes(capture) >= 1; }));
-    const auto first = std::chrono::steady_clock::now();
-    EXPECT_TRUE(eventually([&] { return passes(capture) >= 2; }));
-    EXPECT_GT(std::chrono::steady_clock::now() - first, 500ms);
+    ASSERT_TRUE(waits.othersBegin(3));
+    EXPECT_GE(passes(capture), 3);
     interfaces.mi().disableIndications();
+    EXPECT_THAT(waits.others(), Each(30));
 }
 
 HOST_TEST(NetworkMonitor, TellsOfAnInterfaceAgainWhenItHasLeftItsBond) {
@@ -119,22 +131,27 @@ HOST_TEST(NetworkMonitor, TellsOfAnInterfaceAgainWhenItHasLeftItsBond) {
     EXPECT_THAT(heard.now(), TextsAre("NIC is Offline "));
 }
 
-HOST_TEST(NetworkMonitor, StopsAtOnceInTheMiddleOfItsWait) {
-    Interfaces interfaces;
-    LogCapture capture;
-    interfaces.mi().enableIndications();
-    ASSERT_TRUE(eventually([&] { return !capture.messages(6000).empty(); })) << "the first pass is over";
-    const auto start = std::chrono::steady_clock::now();
-    interfaces.mi().disableIndications();
-    EXPECT_LT(std::chrono::steady_clock::now() - start, 1s);
-    std::vector<std::string> messages = capture.ownMessages();
-    // How soon the woken thread gets a processor decides whether it is aborted and waited for.
-    std::erase_if(messages, [](const std::string& message) {
-        return message.starts_with("eventThreadNetIndications: Aborting") ||
-               message.starts_with("eventThreadNetIndications: Waiting");
+/// A stop sleeps when it has asked its thread to end. Has it sleep until that has ended: how soon the woken
+/// thread gets a processor decides otherwise whether it is aborted and waited for.
+void letTheThreadEndFirst(Waits& waits, const LogCapture& capture) {
+    waits.whenWeWait([&](double seconds) {
+        EXPECT_TRUE(seconds == 0 ||
+                    eventually([&] { return capture.messages().back() == "NetworkMonitor: run exit"; }));
     });
+}
+
+HOST_TEST(NetworkMonitor, StopsAtOnceInTheMiddleOfItsWait) {
+    QX::setClockSpeed(0.1);  // whoever waits for the monitor's wait does so for five minutes
+    const LogCapture capture;
+    Waits waits;
+    letTheThreadEndFirst(waits, capture);
+    Interfaces interfaces;
+    interfaces.mi().enableIndications();
+    ASSERT_TRUE(waits.othersBegin(1)) << "the first pass is over";
+    interfaces.mi().disableIndications();
+    EXPECT_EQ(waits.others().size(), 1U);
     EXPECT_THAT(
-        messages,
+        capture.ownMessages(),
         TextsAre("enableIndications: entry", "Creating NetworkMonitor thread.",
                  "NetworkMonitor::NetworkMonitor: entry", "NetworkMonitor::NetworkMonitor: exit",
                  "NetworkMonitor thread created.", "enableIndications: exit", "disableIndications: entry",
@@ -149,7 +166,7 @@ HOST_TEST(NetworkMonitor, StopsAtOnceInTheMiddleOfItsWait) {
 HOST_TEST(NetworkMonitor, IsAbortedInTheMiddleOfACommandAndReportsNothingOfThatPass) {
     host.file(kFile, "bond0=1\neth1=1\n");
     host.file("/proc/net/bonding/bond0", "Slave Interface: eth0\n");
-    host.tool("grep %any", ToolAnswer{"", 0, "", 20000});  // a tool that hangs
+    host.tool("grep %any", ToolAnswer{"", 0, "", 600'000});  // a tool that hangs
     Interfaces interfaces;
     interfaces.add("bond0", 12);
     interfaces.add("eth1", 12);
@@ -158,9 +175,7 @@ HOST_TEST(NetworkMonitor, IsAbortedInTheMiddleOfACommandAndReportsNothingOfThatP
     LogCapture capture;
     interfaces.mi().enableIndications();
     ASSERT_TRUE(eventually([&] { return !host.callsOf("grep").empty(); }));
-    const auto start = std::chrono::steady_clock::now();
     interfaces.mi().disableIndications();
-    EXPECT_LT(std::chrono::steady_clock::now() - start, 5s);
     EXPECT_THAT(capture.ownMessages(), Contains("eventThreadNetIndications: Aborting thread..."));
     EXPECT_THAT(capture.ownMessages(), Contains("eventThreadNetIndicationsThread terminated."));
     EXPECT_TRUE(heard.now().empty());
@@ -185,14 +200,14 @@ HOST_TEST(NetworkMonitor, TellsOfTheOthersWhileOneHangs) {
 }
 
 HOST_TEST(NetworkMonitor, IsWaitedForAndTheSecondsAreCounted) {
-    const auto messages = stopHeldUp(180ms);
+    const auto messages = stopHeldUp(1);
     EXPECT_THAT(messages, Contains("eventThreadNetIndications: Waiting for thread 0 seconds so far"));
     EXPECT_THAT(messages, Contains("eventThreadNetIndications: Waiting for thread 1 seconds so far"));
     EXPECT_THAT(messages, Contains("eventThreadNetIndicationsThread terminated."));
 }
 
 HOST_TEST(NetworkMonitor, IsWaitedForTenTimesAtTheMost) {
-    const auto messages = stopHeldUp(2000ms);
+    const auto messages = stopHeldUp(11);
     EXPECT_THAT(messages, Contains("eventThreadNetIndications: Waiting for thread 9 seconds so far"));
     EXPECT_THAT(messages,
                 testing::Not(Contains("eventThreadNetIndications: Waiting for thread 10 seconds so far")));
@@ -228,11 +243,10 @@ HOST_TEST(NetworkMonitor, IsLeftWhenACallbackHangsForEver) {
         interfaces.mi().registerForAlerts(Stuck::hear, &stuck);
         interfaces.mi().enableIndications();
         ASSERT_TRUE(eventually([&] { return stuck.calls == 1; }));
-        QX::setClockSpeed(20);  // a second passes in 50 ms
-        const auto start = std::chrono::steady_clock::now();
+        QX::setClockSpeed(100);  // a second passes in 10 ms
+        const Waits waits;
         EXPECT_EQ(interfaces.mi().unload().getStatus(), 0);
-        EXPECT_GE(std::chrono::steady_clock::now() - start, 490ms);
-        EXPECT_LT(std::chrono::steady_clock::now() - start, 5s);
+        EXPECT_THAT(waits.ours(), Contains(1).Times(10));
     }
     EXPECT_THAT(capture.ownMessages(), Contains("eventThreadNetIndications termination failed."));
     EXPECT_THAT(capture.ownMessages(),
@@ -290,10 +304,10 @@ HOST_TEST(NetworkMonitor, MayBeStoppedByTheCallbackThatItCalls) {
     interfaces.add("eth1", 1);
     std::atomic<int> calls{0};
     interfaces.mi().registerForAlerts(stopAll, &calls);
-    const auto start = std::chrono::steady_clock::now();
+    const Waits waits;
     interfaces.mi().enableIndications();
     ASSERT_TRUE(eventually([&] { return calls == 1 && runningThreads() == before; }));
-    EXPECT_LT(std::chrono::steady_clock::now() - start, 5s) << "it does not wait for itself";
+    EXPECT_THAT(waits.others(), Each(testing::Lt(1))) << "it does not wait for itself";
     EXPECT_EQ(calls, 1);
     EXPECT_EQ(host.read(kFile), "eth0=12\neth1=12\n") << "of the second change nobody was told";
     EXPECT_FALSE(host.exists("/tmp/fdisk_tmp")) << "the stop has run its commands";
@@ -301,6 +315,9 @@ HOST_TEST(NetworkMonitor, MayBeStoppedByTheCallbackThatItCalls) {
 }
 
 HOST_TEST(NetworkMonitor, StartedAgainIsNotTakenForTheOneThatEnded) {
+    const LogCapture capture;
+    Waits waits;
+    letTheThreadEndFirst(waits, capture);
     Interfaces interfaces;
     for (int start = 0; start < 2; ++start) {
         interfaces.mi().enableIndications();
@@ -415,7 +432,7 @@ HOST_TEST(NetworkMonitor, TellsAChangeAgainThatItCannotKeep) {
     interfaces.mi().enableIndications();
     EXPECT_TRUE(eventually([&] { return heard.now().size() >= 2; }));
     interfaces.mi().disableIndications();
-    EXPECT_THAT(heard.now(), testing::Each("NIC is Online "));
+    EXPECT_THAT(heard.now(), Each("NIC is Online "));
 }
 
 HOST_TEST(NetworkMonitor, WakesWhenItIsAskedToStop) {
@@ -446,6 +463,7 @@ HOST_TEST(NetworkMonitor, StoppedBeforeItRunsDoesNoPass) {
 HOST_TEST(NetworkMonitor, RunsCleanBesideReadersAndWriters) {
     host.directory("/opt/vantrel/corvista/data");
     QX::setClockSpeed(30000);  // a pass every millisecond
+    const Waits waits;
     Interfaces interfaces;
     std::vector<InterfaceNode*> nodes;
     for (int i = 0; i < 8; ++i) {
@@ -463,7 +481,7 @@ HOST_TEST(NetworkMonitor, RunsCleanBesideReadersAndWriters) {
             }
         });
     }
-    std::this_thread::sleep_for(500ms);
+    EXPECT_TRUE(waits.othersBegin(100));
     done = true;
     for (std::thread& agent : agents) {
         agent.join();

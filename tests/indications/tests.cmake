@@ -8,6 +8,5 @@ corvista_test(indications SOURCES
   indications/state_file_test.cpp
   support/failing_new.cpp
   LIBRARIES plugin_code test_support LABELS threads)
-set_source_files_properties(indications/network_monitor_test.cpp indications/recorded_bond_test.cpp indications/state_file_test.cpp PROPERTIES SKIP_UNITY_BUILD_INCLUSION ON)
 # The links of a real kernel are asked with our own classic tools too.
 add_dependencies(indications_test corvista-hosttools)

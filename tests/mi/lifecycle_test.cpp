@@ -1,7 +1,7 @@
 // Start and stop of the whole plug-in.
 #include <gmock/gmock.h>
 
-#include <chrono>
+#include <algorithm>
 #include <stdexcept>
 #include <thread>
 
@@ -16,6 +16,8 @@
 #include "tests/support/plugin_access.h"
 #include "tests/support/shell_stub.h"
 #include "tests/support/texts_are.h"
+#include "tests/support/waiting.h"
+#include "tests/support/waits.h"
 
 extern "C" int OpenMI(IC::ManagementInterface** mi, IC::Error** err);
 
@@ -386,31 +388,44 @@ HOST_TEST(Lifecycle, WithdrawsTheNextNodeAlsoWhenTheAgentThrowsAtOne) {
     IC::myoshwmi.unload();
 }
 
+/// Where a message stands among all, counted from 1; 0 while it does not.
+std::ptrdiff_t place(const LogCapture& capture, const std::string& message) {
+    const auto all = capture.messages();
+    const auto found = std::ranges::find(all, message);
+    return found == all.end() ? 0 : found - all.begin() + 1;
+}
+
 HOST_TEST(Lifecycle, WaitsForAWalkThatIsUnderWayBeforeItEmptiesTheTree) {
-    host.toolInTurn("brctl show", {{""}, {""}, {"", 0, "", 1000}});  // start-up asks twice
     initialize(IC::myoshwmi);
+    host.tool("brctl show", ToolAnswer{.out = "", .action = kUntilItMayGoOn});
+    host.clearCalls();
+    LogCapture capture;
     std::thread walk([] { IC::myoshwmi.createNetworkPortNodes(true); });
-    while (host.callsOf("brctl").size() < 3) {
-        std::this_thread::sleep_for(std::chrono::milliseconds(10));
-    }
-    const auto start = std::chrono::steady_clock::now();
+    ASSERT_TRUE(eventually([&] { return !host.callsOf("brctl").empty(); }));
+    std::thread letGoOn([&] {
+        EXPECT_TRUE(eventually([&] { return place(capture, "disableIndications: exit") != 0; }));
+        host.file("/go-on", "");
+    });
     IC::myoshwmi.unload();
-    EXPECT_GT(std::chrono::steady_clock::now() - start, std::chrono::milliseconds(500));
     walk.join();
+    letGoOn.join();
+    const std::ptrdiff_t walked = place(capture, "getDNSDetails: exit");  // behind what held the walk up
+    EXPECT_GT(walked, 0);
+    EXPECT_LT(walked, place(capture, "deleteSavedConfigurations: entry")) << "what comes after the tree";
 }
 
 HOST_TEST(Lifecycle, AStopInTheMiddleOfAComparisonWaitsForItAndLeavesNothing) {
     const std::string layout = "Disk /dev/sda: 80.0 GB, 80026361856 bytes\n/dev/sda1 1 2 300 83 Linux\n";
-    host.toolInTurn("fdisk -ls", {{.out = layout}, {.out = layout, .delayMilliseconds = 500}});
+    host.toolInTurn("fdisk -ls", {{.out = layout}, {.out = layout, .action = kUntilItMayGoOn}});
     const CommandLines commands;
+    Waits waits;
     QX::setClockSpeed(1000);
     initialize(IC::myoshwmi);
     EXPECT_EQ(Access::drives().size(), 1U);
     EXPECT_EQ(Access::partitions().size(), 1U);
-    while (host.callsOf("fdisk").size() < 2) {
-        std::this_thread::sleep_for(std::chrono::milliseconds(1));
-    }
+    ASSERT_TRUE(eventually([&] { return host.callsOf("fdisk").size() == 2; }));
     QX::setClockSpeed(1);
+    waits.whenWeWait([&](double) { host.file("/go-on", ""); });
     LogCapture capture;
     IC::myoshwmi.unload();
     EXPECT_THAT(capture.messages(), testing::Contains("Partition Node Published")) << "it went to its end";
@@ -439,10 +454,11 @@ HOST_TEST(Lifecycle, StopsWithoutAStart) {
 }
 
 HOST_TEST(Lifecycle, StopsWithoutWaitingForASleep) {
+    QX::setClockSpeed(0.02);  // whoever waits for a sleep of the monitors waits for minutes
+    const Waits waits;
     initialize(IC::myoshwmi);
-    const auto start = std::chrono::steady_clock::now();
+    ASSERT_TRUE(waits.othersBegin(2)) << "both sleep";
     IC::myoshwmi.unload();
-    EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(2));
 }
 
 HOST_TEST(Lifecycle, LogsEveryLineTwiceInTheOrderOfTheSequences) {

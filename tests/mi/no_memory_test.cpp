@@ -34,6 +34,7 @@ HOST_TEST(NoMemory, AnyAllocationOfAStartMayFail) {
     host.file("/proc/net/bonding/bond0", "");
     shell_stub::answerWith(answer);
     CVLog::CVLogger::setLog(nullptr, 0);
+    QX::setClockSpeed(50);  // for the millisecond that each stop grants a thread
     long allocations = 0;
     for (bool failed = true; failed; ++allocations) {
         {
@@ -53,6 +54,7 @@ HOST_TEST(NoMemory, AnyAllocationOfAStartMayFail) {
 HOST_TEST(NoMemory, OfAStartWhoseBaseFailsThrowsNothingEither) {
     shell_stub::answerWith(answer);
     CVLog::CVLogger::setLog(nullptr, 0);
+    QX::setClockSpeed(50);  // for the millisecond that each stop grants a thread
     long allocations = 0;
     for (bool failed = true; failed; ++allocations) {
         {
@@ -75,6 +77,7 @@ HOST_TEST(NoMemory, AnyAllocationOfAStopMayFail) {
     host.file("/opt/vantrel/corvista/data/ifcfg-eth0", "");
     shell_stub::answerWith(answer);
     CVLog::CVLogger::setLog(nullptr, 0);
+    QX::setClockSpeed(50);
     std::thread([] {}).join();  // what a sanitizer starts beside the first thread of a process
     const auto before = runningThreads();
     long allocations = 0;

@@ -60,10 +60,9 @@ HOST_TEST(SlaveInterfaces, AreListedInTheOrderOfTheFile) {
     EXPECT_THAT(members, TextsAre("before", "eth1", "eth0"));
     EXPECT_THAT(commands.all(),
                 TextsAre("cat /proc/net/bonding/bond0 2> /dev/null | grep \"Slave Interface:\""));
-    EXPECT_THAT(capture.messages(),
-                TextsAre("Entering getSlaveInterfaces", "mypopen():  Count value 1", "Slave Found:eth1",
-                         "Slave Found:eth0", "Exiting getSlaveInterfaces"));
-    EXPECT_EQ(capture.messages(3000).size(), 5U);
+    EXPECT_EQ(capture.messages().front(), "Entering getSlaveInterfaces");
+    EXPECT_THAT(capture.messages(3000), testing::IsSupersetOf({"Slave Found:eth1", "Slave Found:eth0"}));
+    EXPECT_EQ(capture.messages().back(), "Exiting getSlaveInterfaces");
 }
 
 HOST_TEST(SlaveInterfaces, TakeTheBlankBehindTheLabelForGrantedAndTheProbeDoesNot) {

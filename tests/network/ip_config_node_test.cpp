@@ -5,7 +5,7 @@
 
 #include "network/ip_facts.h"
 #include "network/ip_origin.h"
-#include "tests/network/port_host.h"
+#include "tests/network/one_node.h"
 #include "tests/support/command_lines.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/shell_stub.h"
@@ -20,9 +20,9 @@ PropertyValue live(const IC::MutableNode& node, unsigned int id) {
 }
 
 HOST_TEST(IPConfigNode, HoldsEverythingAtCreation) {
-    PortHost plugin(host, "suse-two-nics");
+    OneNode interface(host, "suse-two-nics");
     host.file("/var/lib/dhcpv6/client6.leases", "lease SDUID: 00:01:00:01;\n");
-    const auto config = plugin.build().config("eth0");
+    const auto config = interface.config("eth0");
     ASSERT_NE(config, nullptr);
     EXPECT_EQ(config->getStatus(), 1U);
     const std::map<unsigned int, PropertyValue> expected = {
@@ -58,8 +58,8 @@ HOST_TEST(IPConfigNode, HoldsEverythingAtCreation) {
 }
 
 HOST_TEST(IPConfigNode, OfALeaseSaysSo) {
-    PortHost plugin(host, "suse-two-nics");
-    const auto config = plugin.build().config("eth1");
+    OneNode interface(host, "suse-two-nics");
+    const auto config = interface.config("eth1");
     EXPECT_EQ(PortHost::stored(*config, 24), enumeration(1));
     EXPECT_EQ(PortHost::stored(*config, 93), texts({"198.51.100.1"}));
     EXPECT_EQ(PortHost::stored(*config, 96), enumeration(1));
@@ -94,8 +94,8 @@ HOST_TEST(IPConfigNode, PrefersTheFirstStaticIPv6GatewayToAnAdvertisedOne) {
 }
 
 HOST_TEST(IPConfigNode, AnswersWhatTheHostSaysNow) {
-    PortHost plugin(host, "suse-two-nics");
-    const auto config = plugin.build().config("eth0");
+    OneNode interface(host, "suse-two-nics");
+    const auto config = interface.config("eth0");
     host.tool("ifconfig eth0",
               "eth0 Link encap:Ethernet  HWaddr 02:00:5E:00:00:01\n  inet addr:203.0.113.5  Bcast:x  "
               "Mask:255.0.0.0\n");
@@ -136,19 +136,19 @@ HOST_TEST(IPConfigNode, AnswersWhatTheHostSaysNow) {
 }
 
 HOST_TEST(IPConfigNode, PrefersAGatewaySetByHandToAnAdvertisedOne) {
-    PortHost plugin(host, "ipv6-only");
-    EXPECT_EQ(live(*plugin.build().config("eth0"), 101), text("2001:db8:6::1"));
+    OneNode interface(host, "ipv6-only");
+    EXPECT_EQ(live(*interface.emptyConfig("eth0"), 101), text("2001:db8:6::1"));
 }
 
 HOST_TEST(IPConfigNode, OnAHostWithoutADefaultRouteShowsTheOnLinkMarkAsItsGateway) {
-    PortHost plugin(host, "suse-two-nics");
+    OneNode interface(host, "suse-two-nics");
     host.tool("route -n", "192.0.2.0 0.0.0.0 255.255.255.0 U 0 0 0 eth0\n");
-    EXPECT_EQ(live(*plugin.build().config("eth0"), 100), text("0.0.0.0"));
+    EXPECT_EQ(live(*interface.emptyConfig("eth0"), 100), text("0.0.0.0"));
 }
 
 HOST_TEST(IPConfigNode, WithoutAnyAddressReadsZerosAndIPv6AloneReadsEmpty) {
-    PortHost plugin(host, "ipv6-only");
-    const auto config = plugin.build().config("eth0");
+    OneNode interface(host, "ipv6-only");
+    const auto config = interface.emptyConfig("eth0");
     EXPECT_EQ(live(*config, 25), text(""));
     EXPECT_EQ(live(*config, 26), text(""));
     EXPECT_EQ(live(*config, 28), enumeration(5));
@@ -159,8 +159,8 @@ HOST_TEST(IPConfigNode, WithoutAnyAddressReadsZerosAndIPv6AloneReadsEmpty) {
 }
 
 HOST_TEST(IPConfigNode, KeepsAnAddressWhoseMaskCannotBeRead) {
-    PortHost plugin(host, "suse-two-nics");
-    const auto config = plugin.build().config("eth0");
+    OneNode interface(host, "suse-two-nics");
+    const auto config = interface.emptyConfig("eth0");
     shell_stub::answerWith([](const std::string& command) -> std::optional<std::string> {
         const bool isNone = command.find("cut -d: -f4") != command.npos || command.starts_with("ip -6");
         return isNone ? std::optional<std::string>("") : std::nullopt;
@@ -174,8 +174,8 @@ HOST_TEST(IPConfigNode, KeepsAnAddressWhoseMaskCannotBeRead) {
 }
 
 HOST_TEST(IPConfigNode, AsksWithTheseCommands) {
-    PortHost plugin(host, "suse-two-nics");
-    const auto config = plugin.build().config("eth0");
+    OneNode interface(host, "suse-two-nics");
+    const auto config = interface.emptyConfig("eth0");
     const IC::IPConfigNode bond(900, 1, {1}, 29, 1, "bond0");
     const CommandLines commands;
     live(*config, 97);
@@ -190,9 +190,9 @@ HOST_TEST(IPConfigNode, AsksWithTheseCommands) {
 }
 
 HOST_TEST(IPConfigNode, LeavesTheAddressTypeAloneWhenThereIsNone) {
-    PortHost plugin(host, "ipv6-only");
+    OneNode interface(host, "ipv6-only");
     host.tool("ifconfig eth0", "eth0 Link encap:Ethernet\n");
-    const auto config = plugin.build().config("eth0");
+    const auto config = interface.config("eth0");
     EXPECT_EQ(PortHost::stored(*config, 28), enumeration(0)) << "so that the agent lists it";
     PropertyValue value("untouched", true);
     EXPECT_EQ(config->getProperty(28, value).getStatus(), 0);
@@ -200,15 +200,14 @@ HOST_TEST(IPConfigNode, LeavesTheAddressTypeAloneWhenThereIsNone) {
 }
 
 HOST_TEST(IPConfigNode, IsDownWithTheCableOutAndUpWithALink) {
-    PortHost plugin(host, "suse-two-nics");
-    plugin.build();
-    EXPECT_EQ(live(*plugin.config("eth0"), 123), number(1));
-    EXPECT_EQ(live(*plugin.config("eth1"), 123), number(12));
+    OneNode interface(host, "suse-two-nics");
+    EXPECT_EQ(live(*interface.emptyConfig("eth0"), 123), number(1));
+    EXPECT_EQ(live(*interface.emptyConfig("eth1"), 123), number(12));
 }
 
 HOST_TEST(IPConfigNode, OfABondIsUpWhenIfconfigListsIt) {
-    PortHost plugin(host, "bond-two-members");
-    const auto config = plugin.build().config("bond0");
+    OneNode interface(host, "bond-two-members");
+    const auto config = interface.emptyConfig("bond0");
     EXPECT_EQ(live(*config, 123), number(1));
     host.tool("ifconfig", "lo Link encap:Local Loopback\n");
     EXPECT_EQ(live(*config, 123), number(12));
@@ -218,8 +217,8 @@ HOST_TEST(IPConfigNode, OfABondIsUpWhenIfconfigListsIt) {
 }
 
 HOST_TEST(IPConfigNode, HasAnEmptyNameWhenHostnamePrintsNothing) {
-    PortHost plugin(host, "suse-two-nics");
-    const auto config = plugin.build().config("eth0");
+    OneNode interface(host, "suse-two-nics");
+    const auto config = interface.emptyConfig("eth0");
     host.tool("hostname -s", "");
     host.tool("hostname -d", "");
     EXPECT_EQ(live(*config, 97), text(""));
@@ -229,16 +228,16 @@ HOST_TEST(IPConfigNode, HasAnEmptyNameWhenHostnamePrintsNothing) {
 }
 
 HOST_TEST(IPConfigNode, AnswersAnUnknownIdAsTheFrameworkDoes) {
-    PortHost plugin(host, "suse-two-nics");
+    OneNode interface(host, "suse-two-nics");
     PropertyValue value("untouched", true);
-    const IC::Error error = plugin.build().config("eth0")->getProperty(999, value);
+    const IC::Error error = interface.emptyConfig("eth0")->getProperty(999, value);
     EXPECT_NE(error.getStatus(), 0);
     EXPECT_EQ(value, text("untouched"));
 }
 
 HOST_TEST(IPConfigNode, SaysWhenItIsRead) {
-    PortHost plugin(host, "suse-two-nics");
-    const auto config = plugin.build().config("eth0");
+    OneNode interface(host, "suse-two-nics");
+    const auto config = interface.config("eth0");
     LogCapture capture;
     live(*config, 108);
     EXPECT_THAT(capture.ownMessages(),

@@ -1,7 +1,7 @@
 // The write side of IP configurations: which property goes to which writer.
 #include <gmock/gmock.h>
 
-#include "tests/network/port_host.h"
+#include "tests/network/one_node.h"
 #include "tests/support/command_lines.h"
 #include "tests/support/log_capture.h"
 #include "tests/support/texts_are.h"
@@ -23,12 +23,14 @@ PropertyValue origin(unsigned int code) {
 /// Two interfaces, eth0 with a fixed address and eth1 with DHCP, ready for writes.
 class Writable {
 public:
-    explicit Writable(FakeHost& host) : plugin_(host, "suse-two-nics"), host_(host) {
-        plugin_.build();
+    explicit Writable(FakeHost& host)
+        : interface_(host, "suse-two-nics"), host_(host), eth0_(interface_.config("eth0")) {
         host.file("/etc/hosts", "127.0.0.1\tlocalhost\n");
     }
-    std::shared_ptr<IC::MutableNode> eth0() { return plugin_.config("eth0"); }
-    std::shared_ptr<IC::MutableNode> eth1() { return plugin_.config("eth1"); }
+    std::shared_ptr<IC::MutableNode> eth0() { return eth0_; }
+    std::shared_ptr<IC::MutableNode> eth1() {
+        return eth1_ != nullptr ? eth1_ : eth1_ = interface_.config("eth1");
+    }
     /// The commands since then that change something.
     std::vector<std::string> changes() {
         std::vector<std::string> calls = host_.calls();
@@ -44,11 +46,12 @@ public:
         EXPECT_EQ(node.setProperty(id, value).getStatus(), 0);
         return host_.read(file).value_or("(missing)");
     }
-    PortHost& plugin() { return plugin_; }
 
 private:
-    PortHost plugin_;
+    OneNode interface_;
     FakeHost& host_;
+    const std::shared_ptr<IC::MutableNode> eth0_;
+    std::shared_ptr<IC::MutableNode> eth1_;
 };
 
 // --- the dispatch
@@ -107,13 +110,14 @@ HOST_TEST(Dispatch, AValueOfTheWrongKindIsLoggedAndStored) {
 }
 
 HOST_TEST(Dispatch, OfOneReenumeratesAndIsNotStored) {
-    Writable writable(host);
+    PortHost plugin(host, "suse-two-nics");
+    const auto eth0 = plugin.build().config("eth0");
     LogCapture capture;
-    writable.set(*writable.eth0(), 74, number(0));
-    EXPECT_EQ(PortHost::stored(*writable.eth0(), 74), number(0));
+    eth0->setProperty(74, number(0));
+    EXPECT_EQ(PortHost::stored(*eth0, 74), number(0));
     EXPECT_THAT(capture.ownMessages(), Not(Contains("createNetworkPortNodes: entry")));
-    writable.set(*writable.eth0(), 74, number(1));
-    EXPECT_EQ(PortHost::stored(*writable.eth0(), 74), number(0)) << "the value before";
+    eth0->setProperty(74, number(1));
+    EXPECT_EQ(PortHost::stored(*eth0, 74), number(0)) << "the value before";
     EXPECT_THAT(capture.ownMessages(), Contains("createNetworkPortNodes: entry"));
     EXPECT_THAT(capture.ownMessages(), Contains("IPConfigNode::CreateUser :setProperty:"));
     EXPECT_THAT(capture.ownMessages(), Contains("IPConfigNode::CreateUser :PropertyValue:1"));
@@ -272,8 +276,8 @@ HOST_TEST(LinkState, ThatIsNoneRunsAnEmptyCommand) {
 }
 
 HOST_TEST(LinkState, OfABondTakesTheMonitorsReportsWithoutACommand) {
-    PortHost plugin(host, "bond-two-members");
-    const auto bond = plugin.build().config("bond0");
+    OneNode interface(host, "bond-two-members");
+    const auto bond = interface.config("bond0");
     const CommandLines commands;
     for (const unsigned int state : {32U, 33U}) {
         LogCapture capture;
@@ -289,8 +293,8 @@ HOST_TEST(LinkState, OfABondTakesTheMonitorsReportsWithoutACommand) {
 }
 
 HOST_TEST(LinkState, OfABondIsSetLikeAnyOther) {
-    PortHost plugin(host, "bond-two-members");
-    const auto bond = plugin.build().config("bond0");
+    OneNode interface(host, "bond-two-members");
+    const auto bond = interface.config("bond0");
     host.tool("ifconfig bond0 up", "");
     host.tool("ifconfig bond0 down", "");
     LogCapture capture;

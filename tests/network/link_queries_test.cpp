@@ -208,8 +208,7 @@ HOST_TEST(NicUp, LogsWhatEthtoolSays) {
     host.tool("ethtool eth0", "\tLink detected: yes\n");
     const LogCapture capture;
     EXPECT_TRUE(IC::isNICUp("eth0"));
-    EXPECT_THAT(capture.messages(), TextsAre("isNICUp: entry", "mypopen():  Count value 1",
-                                             "buffer = \tLink detected: yes\n", "isNICUp: exit"));
+    EXPECT_THAT(capture.messages(3000), testing::Contains("buffer = \tLink detected: yes\n"));
 }
 
 HOST_TEST(NicUp, ABondAsksItsFileAndThenEachMember) {

@@ -9,7 +9,17 @@ corvista_test(network_config SOURCES
   network/saved_settings_test.cpp
   network/team_node_test.cpp
   network/teaming_queries_test.cpp
+  network/writer_sample_test.cpp
   LIBRARIES plugin_code test_support)
+# What the page on architecture shows is compiled from the page.
+set(sample_page ${CMAKE_SOURCE_DIR}/docs/architecture.md)
+set_property(DIRECTORY APPEND PROPERTY CMAKE_CONFIGURE_DEPENDS ${sample_page})
+file(READ ${sample_page} text)
+if(NOT text MATCHES "```cpp\n([^`]+)```")
+  message(FATAL_ERROR "${sample_page} shows no writer")
+endif()
+file(CONFIGURE OUTPUT writer_sample/writer_sample.inc CONTENT "${CMAKE_MATCH_1}" @ONLY)
+target_include_directories(network_config_test PRIVATE ${CMAKE_CURRENT_BINARY_DIR}/writer_sample)
 
 corvista_test(network_queries SOURCES
   network/address_queries_test.cpp
@@ -43,15 +53,3 @@ corvista_test(network_ports SOURCES
   LIBRARIES plugin_code test_support)
 # The links of a real kernel are asked with our own classic tools too.
 add_dependencies(network_queries_test corvista-hosttools)
-
-# Compiled by themselves in every preset: they have names of their own for the same files and recordings.
-set_source_files_properties(
-  network/ipv4_writer_test.cpp
-  network/ipv6_writer_test.cpp
-  network/recorded_addresses_test.cpp
-  network/recorded_ethtool_test.cpp
-  network/recorded_ifconfig_test.cpp
-  network/routes_file_test.cpp
-  network/saved_settings_test.cpp
-  network/teaming_queries_test.cpp
-  PROPERTIES SKIP_UNITY_BUILD_INCLUSION ON)

@@ -6,8 +6,8 @@
 
 #include <algorithm>
 #include <atomic>
-#include <chrono>
 #include <new>
+#include <numeric>
 #include <thread>
 
 #include "mi/disk_snapshot.h"
@@ -15,11 +15,11 @@
 #include "tests/storage/storage_host.h"
 #include "tests/support/failing_new.h"
 #include "tests/support/texts_are.h"
+#include "tests/support/waiting.h"
+#include "tests/support/waits.h"
 
 namespace {
 
-using namespace std::chrono_literals;
-using std::chrono::steady_clock;
 using testing::Contains;
 using testing::IsEmpty;
 using testing::Not;
@@ -27,14 +27,16 @@ using Access = IC::OsHwMITestAccess;
 
 const std::string kLayout = "Disk /dev/sda: 80.0 GB, 80026361856 bytes\n/dev/sda1 1 2 300 83 Linux\n";
 
-/// Passes so far, with the time of each, as the snapshot commands tell.
+/// Passes so far, as the snapshot commands tell, with the seconds that the monitor had waited for before
+/// each.
 class Passes {
 public:
-    Passes() {
-        shell_stub::beforeEach([this](const std::string& command) {
+    explicit Passes(const Waits& waits) {
+        shell_stub::beforeEach([&](const std::string& command) {
             if (command == IC::diskSnapshotCommand) {
+                const auto waited = waits.others();
                 const std::lock_guard lock(guard_);
-                times_.push_back(steady_clock::now());
+                after_.push_back(std::accumulate(waited.begin(), waited.end(), 0.0));
             }
         });
     }
@@ -42,21 +44,18 @@ public:
     Passes& operator=(const Passes&) = delete;
     ~Passes() { shell_stub::beforeEach({}); }
 
-    std::vector<steady_clock::time_point> times() const {
+    std::vector<double> after() const {
         const std::lock_guard lock(guard_);
-        return times_;
+        return after_;
     }
+    std::size_t count() const { return after().size(); }
     bool waitFor(std::size_t count) const {
-        const auto end = steady_clock::now() + 20s;
-        while (times().size() < count && steady_clock::now() < end) {
-            std::this_thread::sleep_for(1ms);
-        }
-        return times().size() >= count;
+        return eventually([&] { return this->count() >= count; });
     }
 
 private:
     mutable std::mutex guard_;
-    std::vector<steady_clock::time_point> times_;
+    std::vector<double> after_;
 };
 
 class DriveMonitor : public StorageHost {
@@ -72,19 +71,13 @@ protected:
 
     /// A stop while a tool of a comparison hangs.
     static std::vector<std::string> stopWhileHanging(const FakeHost& host, const std::string& tool) {
+        const Waits waits;
         QX::setClockSpeed(1000);
         IC::myoshwmi.startHDDThread();
-        const auto end = steady_clock::now() + 20s;
-        while (host.callsOf(tool).empty() && steady_clock::now() < end) {
-            std::this_thread::sleep_for(1ms);
-        }
-        EXPECT_FALSE(host.callsOf(tool).empty());
-        QX::setClockSpeed(50);  // ten seconds pass in 200 ms
+        EXPECT_TRUE(eventually([&] { return !host.callsOf(tool).empty(); }));
         LogCapture log;
-        const auto start = steady_clock::now();
         Access::stopMonitor();
-        EXPECT_GE(steady_clock::now() - start, 199ms) << "not before ten seconds";
-        EXPECT_LT(steady_clock::now() - start, 10s);
+        EXPECT_EQ(waits.ours().back(), 10) << "seconds of patience";
         EXPECT_THAT(diary(), IsEmpty()) << "nothing was compared";
         EXPECT_THAT(log.messages(6000), IsEmpty());
         return log.ownMessages();
@@ -92,28 +85,27 @@ protected:
 };
 
 HOST_TEST_F(DriveMonitor, ComparesAfterTwoMinutesAndThenEveryMinute) {
-    QX::setClockSpeed(60);
-    const Passes passes;
-    const auto start = steady_clock::now();
+    QX::setClockSpeed(10'000);
+    const Waits waits;
+    const Passes passes(waits);
     IC::myoshwmi.startHDDThread();
     EXPECT_TRUE(Access::monitorRuns());
-    ASSERT_TRUE(passes.waitFor(2));
+    ASSERT_TRUE(passes.waitFor(3));
     Access::stopMonitor();
-    const auto times = passes.times();
-    EXPECT_GE(times[0] - start, 2s) << "a minute is a second here";
-    EXPECT_LT(times[0] - start, 3s);
-    EXPECT_GE(times[1] - times[0], 1s);
+    const auto after = passes.after();
+    EXPECT_THAT(std::vector(after.begin(), after.begin() + 3), testing::ElementsAre(120, 180, 240));
     EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda", "published /dev/sda", "withdrawn /dev/sda1",
                                   "published /dev/sda1"))
         << "once by the first pass, never again";
 }
 
 HOST_TEST_F(DriveMonitor, StartedAgainPublishesEverythingOnceAgain) {
-    QX::setClockSpeed(1000);
+    QX::setClockSpeed(10'000);
     for (int start = 0; start < 2; ++start) {
         diary().clear();
         IC::HardDriveNodeUpdate = false;
-        const Passes passes;
+        const Waits waits;
+        const Passes passes(waits);
         IC::myoshwmi.startHDDThread();
         ASSERT_TRUE(passes.waitFor(3));
         Access::stopMonitor();
@@ -123,26 +115,36 @@ HOST_TEST_F(DriveMonitor, StartedAgainPublishesEverythingOnceAgain) {
 }
 
 HOST_TEST_F(DriveMonitor, StartedWhileOneRunsTheEarlierOneEndsFirst) {
-    QX::setClockSpeed(1000);
-    host.tool("fdisk -ls", ToolAnswer{.out = kLayout, .delayMilliseconds = 300});
-    const Passes passes;
+    QX::setClockSpeed(10'000);
+    host.tool("fdisk -ls", ToolAnswer{.out = kLayout, .action = kUntilItMayGoOn});
+    const LogCapture log;
+    Waits waits;
+    waits.whenWeWait([&](double) {  // for the earlier one, which is in the middle of a comparison
+        host.file("/go-on", "");
+        EXPECT_TRUE(eventually([&] {
+            const auto said = log.messages();
+            return std::ranges::find(said, "Hard Drive ThreadProcess :: Exit") != said.end();
+        }));
+    });
+    const Passes passes(waits);
     IC::myoshwmi.startHDDThread();
-    ASSERT_TRUE(passes.waitFor(1));
-    EXPECT_EQ(passes.times().size(), 1U);
-    IC::myoshwmi.startHDDThread();  // ten seconds pass in 10 ms: the fdisk of the earlier one is ended
+    ASSERT_TRUE(eventually([&] { return !host.callsOf("fdisk").empty(); }));
+    IC::myoshwmi.startHDDThread();
     ASSERT_TRUE(passes.waitFor(3));
-    QX::setClockSpeed(1);
     Access::stopMonitor();
-    EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda", "published /dev/sda", "withdrawn /dev/sda1",
-                                  "published /dev/sda1"))
-        << "by the later one's first pass";
+    const auto once = {"withdrawn /dev/sda", "published /dev/sda", "withdrawn /dev/sda1",
+                       "published /dev/sda1"};
+    std::vector<std::string> twice(once.begin(), once.end());
+    twice.insert(twice.end(), once.begin(), once.end());
+    EXPECT_EQ(diary(), twice) << "by the first pass of either";
 }
 
 HOST_TEST_F(DriveMonitor, FollowsTheLayout) {
-    QX::setClockSpeed(1000);
+    QX::setClockSpeed(10'000);
     host.toolInTurn("fdisk -ls",
                     {{.out = kLayout}, {.out = kLayout}, {.out = kLayout + "/dev/sda2 3 4 500 83 Linux\n"}});
-    const Passes passes;
+    const Waits waits;
+    const Passes passes(waits);
     IC::myoshwmi.startHDDThread();
     ASSERT_TRUE(passes.waitFor(4));
     Access::stopMonitor();
@@ -165,12 +167,13 @@ std::vector<std::string> messages(const LogCapture& log, bool ours) {
 }
 
 HOST_TEST_F(DriveMonitor, UnloadDuringTheFirstWaitEndsItAtOnceWithoutAComparison) {
+    QX::setClockSpeed(0.02);  // whoever waits for the monitor's sleep waits for ever
     LogCapture log;
+    const Waits waits;
     IC::myoshwmi.startHDDThread();
-    std::this_thread::sleep_for(50ms);
-    const auto start = steady_clock::now();
+    ASSERT_TRUE(waits.othersBegin(1));
     Access::stopMonitor();
-    EXPECT_LT(steady_clock::now() - start, 3s) << "the sleep of five seconds is not waited for";
+    EXPECT_THAT(waits.others(), testing::ElementsAre(5)) << "seconds: one slice, and none after it";
     EXPECT_THAT(commands(), IsEmpty());
     EXPECT_TRUE(Access::monitorEndedWithin(0)) << "the completion event is signalled";
     EXPECT_FALSE(Access::monitorRuns());
@@ -188,19 +191,18 @@ HOST_TEST_F(DriveMonitor, UnloadDuringTheFirstWaitEndsItAtOnceWithoutAComparison
 }
 
 HOST_TEST_F(DriveMonitor, AStopIsSeenWithinOneSlice) {
-    QX::setClockSpeed(10);
+    QX::setClockSpeed(1000);
+    Waits waits;
+    waits.holdFrom(3);
     QX::Event ended(true);
     IC::HardDriveUpdateMonitor monitor(&ended, IC::myoshwmi);
     ASSERT_TRUE(monitor.start(nullptr));
-    std::this_thread::sleep_for(700ms);
+    ASSERT_TRUE(waits.othersBegin(3));
     EXPECT_FALSE(monitor.isDone());
-    const auto start = steady_clock::now();
     monitor.stop();
-    while (!monitor.isDone() && steady_clock::now() - start < 10s) {
-        std::this_thread::sleep_for(1ms);
-    }
-    EXPECT_TRUE(monitor.isDone());
-    EXPECT_LT(steady_clock::now() - start, 3s) << "a slice is half a second here, a wait twelve of them";
+    waits.letGo();
+    EXPECT_TRUE(eventually([&] { return monitor.isDone(); }));
+    EXPECT_EQ(waits.others().size(), 3U) << "of the twelve slices of a wait";
     EXPECT_TRUE(ended.wait(10));
     EXPECT_THAT(commands(), IsEmpty());
 }
@@ -218,23 +220,29 @@ HOST_TEST_F(DriveMonitor, UnloadsFlagAloneEndsIt) {
 }
 
 HOST_TEST_F(DriveMonitor, AStopDuringTheSecondWaitLetsOneComparisonRun) {
-    QX::setClockSpeed(50);
-    const Passes passes;
+    QX::setClockSpeed(1000);
+    Waits waits;
+    waits.holdFrom(13);                                // a wait has twelve slices
+    waits.whenWeWait([&](double) { waits.letGo(); });  // when the stop has been asked for
+    const Passes passes(waits);
     IC::myoshwmi.startHDDThread();
-    std::this_thread::sleep_for(1800ms);  // the first wait takes 1.2 s here, and so does the second
+    ASSERT_TRUE(waits.othersBegin(13));
     Access::stopMonitor();
-    EXPECT_EQ(passes.times().size(), 1U);
+    EXPECT_EQ(passes.count(), 1U);
+    EXPECT_EQ(waits.others().size(), 13U);
 }
 
 HOST_TEST_F(DriveMonitor, AStopDuringAComparisonWaitsForItsEnd) {
+    host.tool("fdisk -ls", ToolAnswer{.out = kLayout, .action = kUntilItMayGoOn});
     QX::setClockSpeed(1000);
-    host.tool("fdisk -ls", ToolAnswer{.out = kLayout, .delayMilliseconds = 300});
-    const Passes passes;
+    Waits waits;
+    waits.whenWeWait([&](double) { host.file("/go-on", ""); });
+    const Passes passes(waits);
     IC::myoshwmi.startHDDThread();
-    ASSERT_TRUE(passes.waitFor(1));
+    ASSERT_TRUE(eventually([&] { return !host.callsOf("fdisk").empty(); }));
     QX::setClockSpeed(1);
     Access::stopMonitor();
-    EXPECT_EQ(passes.times().size(), 1U);
+    EXPECT_EQ(passes.count(), 1U);
     EXPECT_EQ(diary().size(), 4U) << "the comparison went to its end";
 }
 
@@ -267,15 +275,11 @@ HOST_TEST_F(DriveMonitor, MayBeStoppedByTheCallbackThatItCalls) {
         nullptr, nullptr);
     LogCapture log;
     IC::myoshwmi.startHDDThread();
-    const auto end = steady_clock::now() + 20s;
     const auto ended = [&] {
         const auto said = log.messages();
         return std::ranges::find(said, "HardDriveUpdateMonitor::~HardDriveUpdateMonitor: exit") != said.end();
     };
-    while (!ended() && steady_clock::now() < end) {
-        std::this_thread::sleep_for(1ms);
-    }
-    EXPECT_TRUE(ended());
+    EXPECT_TRUE(eventually(ended));
     EXPECT_EQ(calls, 1);
     EXPECT_TRUE(Access::drives().empty());
     EXPECT_THAT(log.messages(6000), IsEmpty());
@@ -284,9 +288,10 @@ HOST_TEST_F(DriveMonitor, MayBeStoppedByTheCallbackThatItCalls) {
 HOST_TEST_F(DriveMonitor, AMonitorThatIsDroppedEndsByItself) {
     QX::Event ended(true);
     {
+        const Waits waits;
         IC::HardDriveUpdateMonitor monitor(&ended, IC::myoshwmi);
         ASSERT_TRUE(monitor.start(nullptr));
-        std::this_thread::sleep_for(20ms);
+        ASSERT_TRUE(waits.othersBegin(1));
     }
     EXPECT_TRUE(ended.wait(0));
 }
@@ -328,7 +333,7 @@ HOST_TEST_F(DriveMonitor, WhereTheNextOneCannotBeMadeThereIsNothingToStop) {
 }
 
 HOST_TEST_F(DriveMonitor, AComparisonThatThrowsIsLoggedAndTheNextOneRuns) {
-    QX::setClockSpeed(1000);
+    QX::setClockSpeed(10'000);
     std::atomic<int> snapshots{0};
     shell_stub::failWhen([&](const std::string& command) {
         if (command == IC::diskSnapshotCommand && ++snapshots == 1) {
@@ -341,12 +346,8 @@ HOST_TEST_F(DriveMonitor, AComparisonThatThrowsIsLoggedAndTheNextOneRuns) {
     });
     LogCapture log;
     IC::myoshwmi.startHDDThread();
-    const auto end = steady_clock::now() + 20s;
-    while (snapshots < 4 && steady_clock::now() < end) {
-        std::this_thread::sleep_for(1ms);
-    }
+    EXPECT_TRUE(eventually([&] { return snapshots >= 4; }));
     Access::stopMonitor();
-    EXPECT_GE(snapshots, 4);
     EXPECT_THAT(log.messages(6000), TextsAre("HDDThreadProcess failed: out of everything",
                                              "HDDThreadProcess failed: unknown exception"));
     EXPECT_FALSE(diary().empty());

@@ -74,16 +74,12 @@ HOST_TEST_F(Partitions, AnUpdateWithdrawsTheOldNodesAndPublishesTheNewOnesOneByO
     build(host, "/dev/sdb1 1 2 300 83 Linux\n/dev/sdb2 3 4 500 83 Linux\n", true);
     EXPECT_THAT(diary(), TextsAre("withdrawn /dev/sda1", "published /dev/sdb1", "published /dev/sdb2"));
     EXPECT_THAT(partitions(), ElementsAre(Seen{102, 1, "/dev/sdb1", 300}, Seen{103, 2, "/dev/sdb2", 500}));
-    EXPECT_THAT(
-        withoutPropertyLines(log.messages()),
-        TextsAre("createPartitionNodes: entry", "Delete a Partition entry: Partition",
-                 "DiskPartition::~DiskPartition: entry", "DiskPartition::~DiskPartition: exit",
-                 "DiskPartition::DiskPartition: entry", "DiskPartition::DiskPartition: exit",
-                 "Partition blocksize : 300", "Partition blocksize in Uint64 : 300", "publishNode: entry",
-                 "publishNode: exit", "Partition Node Published", "DiskPartition::DiskPartition: entry",
-                 "DiskPartition::DiskPartition: exit", "Partition blocksize : 500",
-                 "Partition blocksize in Uint64 : 500", "publishNode: entry", "publishNode: exit",
-                 "Partition Node Published", "createPartitionNodes: exit"));
+    const auto said = log.messages();
+    EXPECT_THAT(said, testing::Contains("Delete a Partition entry: Partition").Times(1));
+    EXPECT_THAT(said, testing::Contains("DiskPartition::~DiskPartition: entry").Times(1));
+    EXPECT_THAT(said, testing::Contains("DiskPartition::~DiskPartition: exit").Times(1));
+    EXPECT_THAT(said, testing::Contains("publishNode: entry").Times(2));
+    EXPECT_THAT(said, testing::Contains("Partition Node Published").Times(2));
     EXPECT_EQ(log.messages(3000), log.messages());
 }
 

@@ -11,6 +11,7 @@
 #include "tests/support/log_capture.h"
 #include "tests/support/plugin_access.h"
 #include "tests/support/shell_stub.h"
+#include "tests/support/waiting.h"
 
 /// A listing of tests/storage/listings.
 std::string listing(const std::string& name);
@@ -24,9 +25,8 @@ void forgetCommands();
 /// Whether the plug-in's file lock is held by somebody at this moment.
 bool fileLockIsHeld();
 
-/// What keeps a tool of the fake host running until it may go on.
-inline constexpr char kUntilItMayGoOn[] = "until [ -e /go-on ]; do sleep 0.01; done";
-/// Waits for such a tool to start and lets it go on as soon as nobody holds the plug-in's file lock.
+/// Waits for a tool that runs kUntilItMayGoOn to start and lets it go on as soon as nobody holds the
+/// plug-in's file lock.
 /// @return false when the lock was held all the time
 bool fileLockIsFreeWhile(FakeHost& host, const std::string& toolRuns);
 

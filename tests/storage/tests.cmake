@@ -9,4 +9,3 @@ corvista_test(storage SOURCES
   storage/storage_host.cpp
   support/failing_new.cpp
   LIBRARIES plugin_code test_support LABELS threads)
-set_source_files_properties(storage/layout_comparison_test.cpp storage/partition_nodes_test.cpp PROPERTIES SKIP_UNITY_BUILD_INCLUSION ON)

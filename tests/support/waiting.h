@@ -6,6 +6,9 @@
 #include <iterator>
 #include <thread>
 
+/// The action of a tool that hangs until the test says host.file("/go-on", "").
+inline constexpr char kUntilItMayGoOn[] = "until [ -e /go-on ]; do sleep 0.01; done";
+
 /// Whether something comes true within ten seconds.
 template <class Condition>
 bool eventually(const Condition& condition) {
