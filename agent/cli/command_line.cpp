@@ -74,6 +74,7 @@ void addGlobalOptions(CLI::App& app, Options& options) {
                    "The plug-in to load; by default the one beside this program. Several may be given")
         ->type_name("FILE")
         ->expected(1)
+        ->allow_extra_args(false)
         ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
     app.add_option("--log", options.logFile, "Append the plug-in's log lines to this file")
         ->type_name("FILE");
