@@ -1,6 +1,7 @@
 #include "agent/cli/command_line.h"
 
 #include <CLI/CLI.hpp>
+#include <algorithm>
 #include <cmath>
 #include <sstream>
 
@@ -26,15 +27,45 @@ constexpr const char* kNodeHelp =
     "plug-ins' "
     "nodes the first plug-in's";
 
+/// Numbers are decimal: "+1" and "0x10" are none, here as in ids and values.
+CLI::Validator wholeDecimal() {
+    return CLI::Validator(
+        [](const std::string& text) {
+            const bool good = text.find_first_not_of("0123456789") == std::string::npos;
+            return good ? std::string() : inQuotes(text) + " is no decimal number";
+        },
+        "");
+}
+
 /// Seconds up to a limit; the range check of the parser lets "nan" through.
 CLI::Validator secondsUpTo(double most) {
     return CLI::Validator(
         [most](const std::string& text) {
             double seconds = 0;
-            const bool good = CLI::detail::lexical_cast(text, seconds) && seconds >= 0 && seconds <= most;
+            const bool good = !text.starts_with('+') &&
+                              text.find_first_not_of("0123456789.eE+-") == std::string::npos &&
+                              CLI::detail::lexical_cast(text, seconds) && seconds >= 0 && seconds <= most;
             return good ? std::string()
                         : inQuotes(text) + " is no number of seconds from 0 to " +
                               std::to_string(std::lround(most));
+        },
+        "");
+}
+
+/// The words of an enumeration, and nothing else.
+template <class Value>
+CLI::Validator oneOf(const std::map<std::string, Value>& words) {
+    return CLI::Validator(
+        [words](std::string& text) {
+            if (const auto found = words.find(text); found != words.end()) {
+                text = std::to_string(static_cast<int>(found->second));
+                return std::string();
+            }
+            std::string list;
+            for (const auto& [word, value] : words) {
+                list += (list.empty() ? "" : ", ") + word;
+            }
+            return inQuotes(text) + " is none of: " + list;
         },
         "");
 }
@@ -44,6 +75,7 @@ void addGlobalOptions(CLI::App& app, Options& options) {
                    "The plug-in to load, in place of all those beside this program. Several may be given")
         ->type_name("FILE")
         ->expected(1)
+        ->allow_extra_args(false)
         ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
     app.add_option("--log", options.logFile, "Append the plug-in's log lines to this file")
         ->type_name("FILE");
@@ -52,6 +84,7 @@ void addGlobalOptions(CLI::App& app, Options& options) {
            "Lowest level of the lines that are logged (3000 progress, 4000 changes, 5000, 6000 errors); "
            "without --log they go to standard error. Default: 6000")
         ->type_name("N")
+        ->check(wholeDecimal())
         ->check(CLI::Range(0, 1000000));
     app.add_option("--trace", options.traceFile, "Append every line, whatever its level, to this file")
         ->type_name("FILE");
@@ -62,13 +95,13 @@ void addGlobalOptions(CLI::App& app, Options& options) {
            "Tools the plug-in's commands find: the host's own (native), our adapters (classic), or of "
            "each the one that prints the classic format (auto, the default)")
         ->type_name("auto|native|classic")
-        ->transform(CLI::CheckedTransformer(choices).description(""));
+        ->transform(oneOf(choices));
     const std::map<std::string, Commands> ways{{"direct", Commands::direct}, {"shell", Commands::shell}};
     app.add_option("--commands", options.commands,
                    "How the plug-in's commands are run: without a shell where that makes no difference "
                    "(direct, the default), or all by /bin/sh (shell)")
         ->type_name("direct|shell")
-        ->transform(CLI::CheckedTransformer(ways).description(""));
+        ->transform(oneOf(ways));
     app.add_option("--command-timeout", options.commandSeconds,
                    "End a command of the plug-in that takes longer, in a write ten times as long; what it "
                    "would have told reads as an error. 0 waits for ever. Default: 10")
@@ -186,8 +219,22 @@ void addOffline(CLI::App& app, Options& options) {
 
     CLI::App* doctor =
         app.add_subcommand("doctor", "Tell which of the host's tools are found, used and missing");
+    doctor->add_flag("--verify", options.verify,
+                     "Compare the tree with what the kernel says now; status 1 when they differ");
     addJson(*doctor, options);
     doctor->callback([&options] { options.command = Command::doctor; });
+}
+
+std::string whyNoCommand(const CLI::App& app) {
+    std::vector<std::string> rest = app.remaining();
+    const auto word =
+        std::ranges::find_if(rest, [](const std::string& text) { return !text.starts_with('-'); });
+    if (word == rest.end()) {
+        return "which command? Try: cvagent tree";
+    }
+    unmark(*word);
+    return "there is no command " + inQuotes(*word) +
+           "; the commands are: tree, get, set, watch, properties, doctor";
 }
 
 /// The subcommand that was being read, for the hint.
@@ -224,7 +271,7 @@ std::optional<Options> parseCommandLine(int count, const char* const* words) {
         const bool noCommand =
             dynamic_cast<const CLI::RequiredError*>(&error) != nullptr && app.get_subcommands().empty();
         throw Failure(ExitStatus::usage,
-                      std::string(noCommand ? "which command? Try: cvagent tree" : error.what()) +
+                      (noCommand ? whyNoCommand(app) : std::string(error.what())) +
                           "\nSee: " + helpCommand(app));
     }
 }

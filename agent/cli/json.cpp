@@ -119,9 +119,18 @@ void addProperty(Json& object, const Event& event) {
 }  // namespace
 
 std::string tree(const std::vector<std::string>& plugins, const std::vector<NodeRef>& nodes) {
-    Json list = Json::array();
+    std::vector<std::vector<Reading>> readings;
     for (const NodeRef& node : nodes) {
-        list.push_back(nodeObject(*node, storedReadings(*node)));
+        readings.push_back(storedReadings(*node));
+    }
+    return tree(plugins, nodes, readings);
+}
+
+std::string tree(const std::vector<std::string>& plugins, const std::vector<NodeRef>& nodes,
+                 const std::vector<std::vector<Reading>>& readings) {
+    Json list = Json::array();
+    for (std::size_t i = 0; i < nodes.size(); ++i) {
+        list.push_back(nodeObject(*nodes[i], readings[i]));
     }
     Json whole{{"plugin", plugins.front()}};
     if (plugins.size() > 1) {
@@ -211,6 +220,18 @@ std::string tools(const std::vector<ToolReport>& reports) {
                         {"purpose", report.purpose}});
     }
     return document(list, 2);
+}
+
+std::string verdict(const verify::Result& result) {
+    Json list = Json::array();
+    for (const verify::Difference& each : result.differences) {
+        list.push_back({{"path", each.path},
+                        {"property", each.property},
+                        {"shown", each.shown},
+                        {"kernel", each.kernel},
+                        {"why", each.why}});
+    }
+    return document({{"compared", result.compared}, {"differences", std::move(list)}}, 2);
 }
 
 }  // namespace cvagent::json

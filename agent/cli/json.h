@@ -7,13 +7,18 @@
 #include "agent/core/host_tools.h"
 #include "agent/core/node_ref.h"
 #include "agent/core/reading.h"
+#include "agent/verify/verify.h"
 
 /// The program's JSON. Text that is no UTF-8 has its damaged bytes replaced. Each function returns a whole
 /// document with a line break at its end.
 namespace cvagent::json {
 
-/// {"plugin": FILE, "nodes": [NODE...]} with the stored properties of each node; of several plug-ins
-/// "plugins": [FILE...] stands behind the first one.
+/// {"plugin": FILE, "nodes": [NODE...]}; of several plug-ins "plugins": [FILE...] stands behind the first
+/// one.
+/// @param readings what to show of each node
+std::string tree(const std::vector<std::string>& plugins, const std::vector<NodeRef>& nodes,
+                 const std::vector<std::vector<Reading>>& readings);
+/// The same with what is stored in each node.
 std::string tree(const std::vector<std::string>& plugins, const std::vector<NodeRef>& nodes);
 /// {"id", "parent", "type", "class", "index", "path", "description", "status", "properties": {"108": {"name",
 /// "kind", "value"}}}; a property whose read failed has "error" in place of "value". One of a plug-in that
@@ -29,5 +34,7 @@ std::string event(const Event& event);
 std::string catalogue(const std::vector<const Property*>& rows);
 /// [{"tool", "host", "classic", "adapter", "used", "package", "purpose"}]
 std::string tools(const std::vector<ToolReport>& reports);
+/// {"compared", "differences": [{"path", "property", "shown", "kernel", "why"}]}
+std::string verdict(const verify::Result& result);
 
 }  // namespace cvagent::json

@@ -23,7 +23,9 @@ constexpr std::array<Question, 6> kQuestions = {cvagent::commands::tree, cvagent
                                                 cvagent::commands::set, cvagent::commands::watch};
 
 ExitStatus run(Options& options, cvagent::WantMessages& wants) {
-    if (const Question ask = kQuestions.at(static_cast<std::size_t>(options.command))) {
+    const Question ask = options.verify ? cvagent::commands::verifyTree
+                                        : kQuestions.at(static_cast<std::size_t>(options.command));
+    if (ask != nullptr) {
         const cvagent::PreparedProcess process(cvagent::processSettings(options));
         cvagent::Session session(process, options, wants);
         return session.statusAfter(ask(session, options));

@@ -25,6 +25,7 @@ struct Options {
     HostTools hostTools = HostTools::automatic;
     Commands commands = Commands::direct;
     bool json = false;
+    bool verify = false;            ///< the tree is to be compared with the kernel
     bool yes = false;               ///< power actions need no question
     std::optional<double> seconds;  ///< how long to watch; none: until a signal comes
     std::string program;            ///< whole path of what is run on each alert; "" for nothing

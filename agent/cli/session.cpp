@@ -1,5 +1,6 @@
 #include "agent/cli/session.h"
 
+#include <algorithm>
 #include <mutex>
 
 #include "agent/cli/event_printer.h"
@@ -148,6 +149,24 @@ void Session::start(const AgentSettings& settings, WantMessages& wants) {
     hint(limitsOfTmp());
     const std::vector<NodeRef> nodes = agent_->nodes();
     wants.tell(&nodes, settings.processors);
+}
+
+void Session::tellMissingTools(const std::vector<Reading>& properties) const {
+    const std::vector<std::string> files = agent_->plugins();
+    if (std::ranges::none_of(files, isOfThisSystem)) {
+        return;  // whatever another plug-in runs
+    }
+    for (const MissingTool& missing : missingTools()) {
+        const std::string listed = ", " + missing.costs + ",";
+        const bool concerned =
+            properties.empty() || std::ranges::any_of(properties, [&](const Reading& reading) {
+                return listed.find(", " + reading.name() + ",") != std::string::npos;
+            });
+        if (concerned) {
+            complain("there is no " + missing.tool + " (package " + missing.package +
+                     "), without which these are not known or changed: " + missing.costs);
+        }
+    }
 }
 
 void Session::end() {

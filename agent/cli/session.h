@@ -34,6 +34,9 @@ public:
     Agent& agent() { return *agent_; }
     /// Prints what the plug-in has reported because of a call, and then what it reported by itself.
     void showErrors(const Request& request);
+    /// Names the tools that are missing for good, and what they cost.
+    /// @param properties those that were asked for; none: the whole tree is
+    void tellMissingTools(const std::vector<Reading>& properties = {}) const;
     /// Stops the agent and shows what it reports on its way.
     void end();
     /// While it lives, alerts go there, on whatever thread brings them, and not to standard error.

@@ -184,6 +184,33 @@ std::vector<Reading> Agent::read(const NodeRef& node, const std::vector<unsigned
     return engine_->reader.read(node.node_, ids, freshness, request);
 }
 
+std::vector<std::vector<Reading>> Agent::readTree(const std::vector<NodeRef>& nodes,
+                                                  const Request& request) const {
+    std::vector<Reader::Question> questions;
+    std::vector<std::size_t> places;
+    std::vector<std::vector<Reading>> all;
+    for (std::size_t i = 0; i < nodes.size(); ++i) {
+        all.push_back(storedReadings(*nodes[i]));
+        const NodeClass* nodeClass = findClass(nodes[i]->nodeType());
+        for (const unsigned int id :
+             nodeClass != nullptr ? nodeClass->live : std::span<const unsigned int>()) {
+            questions.push_back({nodes[i].node_, id});
+            places.push_back(i);
+        }
+    }
+    const std::vector<Reading> read = engine_->reader.readNow(questions, request);
+    for (std::size_t i = 0; i < read.size(); ++i) {
+        std::vector<Reading>& readings = all[places[i]];
+        const auto place = std::ranges::lower_bound(readings, read[i].id, {}, &Reading::id);
+        if (place != readings.end() && place->id == read[i].id) {
+            *place = read[i];
+        } else if (!read[i].missing) {
+            readings.insert(place, read[i]);
+        }
+    }
+    return all;
+}
+
 WriteResult Agent::write(const NodeRef& node, const Property& row, const IC::PropertyValue& value,
                          const Request& request) const {
     return engine_->writer.write(node.node_, row, value, request);

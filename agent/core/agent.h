@@ -68,6 +68,10 @@ public:
     /// See Reader::read.
     std::vector<Reading> read(const NodeRef& node, const std::vector<unsigned int>& ids, Freshness freshness,
                               const Request& request) const;
+    /// What a tree shows of each of the nodes, in their order: what is stored, but that which a read can tell
+    /// otherwise is read now, on all nodes side by side.
+    std::vector<std::vector<Reading>> readTree(const std::vector<NodeRef>& nodes,
+                                               const Request& request) const;
     /// See Writer::write. What may be written is judged before: see property_words.h.
     WriteResult write(const NodeRef& node, const Property& row, const IC::PropertyValue& value,
                       const Request& request) const;

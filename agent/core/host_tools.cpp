@@ -38,6 +38,8 @@ struct Tool {
     const char* name;
     const char* package;
     const char* purpose;
+    /// The properties, by their names, and the nodes that are not known without it.
+    const char* costs;
     Adapter adapter = Adapter::none;
     /// Empty for tools whose format has not changed.
     Format format = {};
@@ -51,31 +53,38 @@ constexpr Tool kTools[] = {
     {"ifconfig",
      "net-tools",
      "IPv4 addresses, hardware addresses; bringing interfaces up and down",
+     "IPv4Address, SubnetMask, IPOrigin, TeamName",
      Adapter::exists,
      {"lo", [](bool, std::string_view output) { return contains(output, "Link encap:"); }}},
     {"route",
      "net-tools",
      "gateways",
+     "IPv4Gateway, IPv6Gateway",
      Adapter::exists,
      {"-n", [](bool, std::string_view output) { return contains(output, "Kernel IP routing table"); }}},
     // A host without disks has nothing to list; a usage error is no listing.
     {"fdisk",
      "fdisk",
      "drives and partitions",
+     "hard-drive, partition",
      Adapter::exists,
      {"-ls",
       [](bool succeeded, std::string_view output) {
           return succeeded || output.starts_with("Disk") || contains(output, "\nDisk ");
       }}},
-    {"ethtool", "ethtool", "speed, duplex, link state, Wake-on-LAN", Adapter::exists},
-    {"brctl", "bridge-utils", "bridges and their members", Adapter::exists},
-    {kListingTool, "grep", "network interfaces", Adapter::exists},
-    {"ip", "iproute2", "IPv6 addresses, IPv6 routes"},
-    {"hostname", "hostname", "host name and domain name"},
-    {"awk", "mawk", "changes of disks, settings of interfaces"},
-    {"md5sum", "coreutils", "noticing changes of disks"},
-    {"sha1sum", "coreutils", "noticing changes of disks"},
-    {"shutdown", "systemd-sysv", "power actions"},
+    {"ethtool", "ethtool", "speed, duplex, link state, Wake-on-LAN",
+     "LinkSpeed, SupportedSpeed, FullDuplex, AutoNegotiation, PortType, LinkState, InterfaceState, "
+     "WakeOnLanSupported, WakeOnLanEnabled",
+     Adapter::exists},
+    {"brctl", "bridge-utils", "bridges and their members", "", Adapter::exists},
+    {kListingTool, "grep", "network interfaces", "network-port, ip-config, team", Adapter::exists},
+    {"ip", "iproute2", "IPv6 addresses, IPv6 routes",
+     "IPv6Address, IPv6PrefixLength, IPv6InterfaceId, IPv6AddressType"},
+    {"hostname", "hostname", "host name and domain name", "HostName, DomainName"},
+    {"awk", "mawk", "changes of disks, settings of interfaces", "IPOrigin, IPv4Gateway"},
+    {"md5sum", "coreutils", "noticing changes of disks", ""},
+    {"sha1sum", "coreutils", "noticing changes of disks", ""},
+    {"shutdown", "systemd-sysv", "power actions", "PowerAction"},
 };
 
 bool isProgram(const std::string& path) {
@@ -154,6 +163,16 @@ std::vector<ToolReport> inspectHostTools(HostTools choice, Look look,
         report.standsBy = choice != HostTools::native && !report.adapter.empty() && !report.useAdapter;
     }
     return reports;
+}
+
+std::vector<MissingTool> missingTools() {
+    std::vector<MissingTool> missing;
+    for (const Tool& tool : kTools) {
+        if (*tool.costs != '\0' && findOnPath(tool.name).empty()) {
+            missing.push_back({tool.name, tool.package, tool.costs});
+        }
+    }
+    return missing;
 }
 
 void setUpCommands(Commands commands) {

@@ -47,6 +47,15 @@ std::vector<ToolReport> inspectHostTools(HostTools choice, Look look,
 /// very end: a tool can vanish for a moment while the program runs, when its package is upgraded.
 void putAdaptersOnPath(const std::vector<ToolReport>& reports);
 
+/// A tool that the plug-in's commands do not find, not even as an adapter.
+struct MissingTool {
+    std::string tool;
+    std::string package;
+    std::string costs;  ///< the properties, by their names, and nodes that are not known without it
+};
+/// As PATH is now. The tools without which nothing is missing that a node shows are left out.
+std::vector<MissingTool> missingTools();
+
 /// Where the adapters are, in the build tree or installed, each in a directory of its own name; nothing when
 /// they are not.
 std::optional<std::string> adapterDirectory();

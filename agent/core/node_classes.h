@@ -43,6 +43,8 @@ struct NodeClass {
     /// The properties that tell the nodes of the class apart at a glance.
     std::span<const unsigned int> telling{};
     bool everywhere = false;  ///< every host has nodes of the class
+    /// The properties whose stored value can be another one than a read gives.
+    std::span<const unsigned int> live{};
 };
 
 /// All classes, in the order in which the tree and the catalogue show them.

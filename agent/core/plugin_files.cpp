@@ -103,6 +103,10 @@ void addPluginsIn(const fs::path& directory, PluginFiles& all) {
 
 }  // namespace
 
+bool isOfThisSystem(const std::string& file) {
+    return fs::path(file).filename().string().starts_with(kFirstPlugin);
+}
+
 std::string whyUnsafe(const std::string& file) {
     std::error_code error;
     if (!fs::is_regular_file(file, error)) {

@@ -26,6 +26,9 @@ struct PluginFiles {
 /// at all.
 PluginFiles pluginsBesideProgram();
 
+/// Whether a file is, by its name, the OS/hardware plug-in.
+bool isOfThisSystem(const std::string& file);
+
 /// Why others could put something of theirs into a file, or lead the way to it elsewhere; "" when they cannot
 /// and it is a regular file.
 /// @param file without symbolic links

@@ -42,7 +42,12 @@ private:
 std::vector<Reading> Reader::read(const Handle& node, const std::vector<unsigned int>& ids,
                                   Freshness freshness, const Request& request) {
     if (freshness == Freshness::now) {
-        return readNow(node, ids, request);
+        std::vector<Question> questions;
+        questions.reserve(ids.size());
+        for (const unsigned int id : ids) {
+            questions.push_back({node, id});
+        }
+        return readNow(questions, request);
     }
     std::vector<Reading> readings;
     readings.reserve(ids.size());
@@ -65,36 +70,45 @@ bool Reader::isHopeless(const IC::MutableNode& node, const Request& request) con
            (request.deadline() <= Request::Clock::now() || pool_.isStuck(node.getNodeId()));
 }
 
-std::vector<Reading> Reader::readNow(const Handle& node, const std::vector<unsigned int>& ids,
-                                     const Request& request) {
+std::vector<Reading> Reader::readNow(const std::vector<Question>& questions, const Request& request) {
     const auto asked = Facts::Clock::now();
-    std::vector<std::optional<Reading>> come(ids.size());
-    if (!isHopeless(*node, request)) {
-        come = ask(node, ids, request);
-    }
+    std::vector<std::optional<Reading>> come = ask(questions, request);
     std::vector<Reading> readings;
-    for (std::size_t i = 0; i < ids.size(); ++i) {
-        readings.push_back(come[i] ? *std::move(come[i]) : facts_.overdue(*node, ids[i], asked));
+    readings.reserve(questions.size());
+    for (std::size_t i = 0; i < questions.size(); ++i) {
+        readings.push_back(come[i] ? *std::move(come[i])
+                                   : facts_.overdue(*questions[i].node, questions[i].id, asked));
     }
     return readings;
 }
 
-std::vector<std::optional<Reading>> Reader::ask(const Handle& node, const std::vector<unsigned int>& ids,
+std::vector<std::optional<Reading>> Reader::ask(const std::vector<Question>& questions,
                                                 const Request& request) {
-    const auto answers = std::make_shared<Answers>(ids.size());
-    for (std::size_t i = 0; i < ids.size(); ++i) {
-        pool_.submit(node->getNodeId(), answers.get(),
-                     [held = node, id = ids[i], i, answers, request, this]() mutable {
+    std::vector<std::size_t> hopeful;
+    for (std::size_t i = 0; i < questions.size(); ++i) {
+        if (!isHopeless(*questions[i].node, request)) {
+            hopeful.push_back(i);
+        }
+    }
+    std::vector<std::optional<Reading>> all(questions.size());
+    const auto answers = std::make_shared<Answers>(hopeful.size());
+    for (std::size_t place = 0; place < hopeful.size(); ++place) {
+        const Question& question = questions[hopeful[place]];
+        pool_.submit(question.node->getNodeId(), answers.get(),
+                     [held = question.node, id = question.id, place, answers, request, this]() mutable {
                          Reading reading = askHere(*held, id, request);
                          held.reset();  // whoever has his answer may end the agent and know that it has ended
-                         answers->put(i, std::move(reading));
+                         answers->put(place, std::move(reading));
                      });
     }
     auto come = answers->takeAt(request.deadline(), pool_);
     if (!std::all_of(come.begin(), come.end(), [](const auto& reading) { return reading.has_value(); })) {
         pool_.giveUp(answers.get());
     }
-    return come;
+    for (std::size_t place = 0; place < hopeful.size(); ++place) {
+        all[hopeful[place]] = std::move(come[place]);
+    }
+    return all;
 }
 
 }  // namespace cvagent

@@ -29,13 +29,18 @@ public:
     std::vector<Reading> read(const Handle& node, const std::vector<unsigned int>& ids, Freshness freshness,
                               const Request& request);
 
+    /// A property of a node.
+    struct Question {
+        Handle node;
+        unsigned int id;
+    };
+    /// The same with what is so now, for many nodes side by side.
+    std::vector<Reading> readNow(const std::vector<Question>& questions, const Request& request);
+
 private:
-    std::vector<Reading> readNow(const Handle& node, const std::vector<unsigned int>& ids,
-                                 const Request& request);
     bool isHopeless(const IC::MutableNode& node, const Request& request) const;
     /// What comes until the request's deadline.
-    std::vector<std::optional<Reading>> ask(const Handle& node, const std::vector<unsigned int>& ids,
-                                            const Request& request);
+    std::vector<std::optional<Reading>> ask(const std::vector<Question>& questions, const Request& request);
     Reading askHere(const IC::MutableNode& node, unsigned int id, const Request& request);
 
     Pool& pool_;

@@ -208,7 +208,7 @@ Json KernelTold::config(const std::string& name) const {
                        {"101", gateway6(name)},
                        {"108", name},
                        {"121", name},
-                       {"123", listed},
+                       {"123", liveState(name)},
                        {"125", {0, 1, 12}},
                        {"186", false}};
     addAddresses(name, properties);
@@ -221,8 +221,9 @@ void KernelTold::addAddresses(const std::string& name, Json& properties) const {
     const Json ipv6 = shownAddress(links_[name], "inet6");
     const bool both = !ipv4.is_null() && !ipv6.is_null();
     const std::string address6 = ipv6.is_null() ? "" : ipv6["local"];
-    properties["25"] = ipv4.is_null() ? "0.0.0.0" : ipv4["local"];
-    properties["26"] = ipv4.is_null() ? "0.0.0.0" : dotted(ipv4["prefixlen"]);
+    const Json none = ipv6.is_null() ? "0.0.0.0" : "";  // zeros stand for an interface without any address
+    properties["25"] = ipv4.is_null() ? none : ipv4["local"];
+    properties["26"] = ipv4.is_null() ? none : Json(dotted(ipv4["prefixlen"]));
     properties["27"] = address6;
     properties["28"] = both ? 7 : ipv6.is_null() ? 2 : 5;
     properties["29"] = fourthGroup(address6);

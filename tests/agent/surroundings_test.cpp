@@ -80,6 +80,26 @@ HOST_TEST(CommandLine, WrongUsageEndsWithStatusTwoAndSaysWhereToLook) {
     EXPECT_THAT(cvagent.diary(), IsEmpty());
 }
 
+HOST_TEST(CommandLine, NamesTheWordThatIsWrong) {
+    CvagentRun cvagent(host);
+    for (const auto& [words, complaint] : std::vector<std::pair<std::vector<std::string>, std::string>>{
+             {{"foo"},
+              "there is no command 'foo'; the commands are: tree, get, set, watch, properties, doctor"},
+             {{"--json", "foo", "eth0"}, "there is no command 'foo'"},
+             {{"--host-tools", "some", "tree"}, "'some' is none of: auto, classic, native"},
+             {{"--host-tools", "0", "tree"}, "'0' is none of: auto, classic, native"},
+             {{"--commands", "ask", "tree"}, "'ask' is none of: direct, shell"},
+             {{"--log-level", "0x10", "tree"}, "'0x10' is no decimal number"},
+             {{"--log-level", "+1", "tree"}, "'+1' is no decimal number"},
+             {{"watch", "--for", "0x1"}, "'0x1' is no number of seconds"},
+             {{"watch", "--for", "+1"}, "'+1' is no number of seconds"}}) {
+        const Finished run = cvagent(words);
+        EXPECT_EQ(run.status, 2) << complaint;
+        EXPECT_THAT(run.err, HasSubstr(complaint));
+        EXPECT_THAT(run.err, HasSubstr("\nSee: cvagent "));
+    }
+}
+
 HOST_TEST(Surroundings, SpeakTheLanguageThatTheParsersRead) {
     setenv("LC_ALL", "de_DE.UTF-8", 1);
     cvagent::prepareSurroundings({});

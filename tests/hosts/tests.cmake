@@ -7,3 +7,8 @@ target_compile_definitions(golden_test PRIVATE
   CVAGENT_PROGRAM="$<TARGET_FILE:cvagent>"
   CORVISTA_PLUGIN_FILE="$<TARGET_FILE:vantrelcvicoshwmi>")
 add_dependencies(golden_test corvista-hosttools cvagent vantrelcvicoshwmi)
+
+corvista_test(one_truth LIBRARIES agent_core test_support SOURCES
+  hosts/one_truth_test.cpp)
+target_compile_definitions(one_truth_test PRIVATE CORVISTA_PLUGIN_FILE="$<TARGET_FILE:vantrelcvicoshwmi>")
+add_dependencies(one_truth_test vantrelcvicoshwmi)

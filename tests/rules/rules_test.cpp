@@ -26,7 +26,8 @@ const std::map<std::string, std::set<std::string>> kMayInclude = {
     {"oshwmi", {"oshwmi", "computer", "storage", "network", "indications", "cpu", "mi", "framework"}},
     {"agent/shell", {"agent/shell", "hosttools"}},
     {"agent/core", {"agent/core", "agent/shell", "framework"}},
-    {"agent/cli", {"agent/cli", "agent/core", "agent/shell", "framework"}},
+    {"agent/verify", {"agent/verify", "agent/core", "hosttools", "framework"}},
+    {"agent/cli", {"agent/cli", "agent/core", "agent/verify", "agent/shell", "framework"}},
     {"hosttools", {"hosttools"}},
     {"plugins/hardware", {"plugins/hardware", "framework"}},
 };

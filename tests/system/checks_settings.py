@@ -78,11 +78,11 @@ def origin_dhcp(context):
     expect_line(context, NETWORK + "config", 'NETCONFIG_DNS_POLICY="auto"')
 
 
-@check("set: while the origin is DHCP an address changes no file")
+@check("set: while the origin is DHCP an address changes no file, and is told so")
 def refused_while_dhcp(context):
     one_interface(context)
     before = context.guest.read(INTERFACE_FILE)
-    context.guest.set(CONFIG, "IPv4Address", "192.0.2.99")
+    context.guest.set(CONFIG, "IPv4Address", "192.0.2.99", status=1)
     expect_equal("interface file", context.guest.read(INTERFACE_FILE), before)
 
 

@@ -53,6 +53,13 @@ def upper_levels(context):
     expect_equal("host name", by_id(nodes(context, "computer")[0])[108], context.guest.sh("hostname").strip())
 
 
+@check("tree: doctor finds no fact that the kernel tells otherwise")
+def verified(context):
+    verdict = context.guest.cvagent("doctor", "--verify")
+    expect_equal("differences", verdict["differences"], [])
+    expect(verdict["compared"] > 20, f"only {verdict['compared']} facts were compared")
+
+
 @check("tree: the network ports are the kernel's Ethernet devices and VLANs, without the bridge's member")
 def ports(context):
     devices = set(context.guest.names("/sys/class/net/eth*"))

@@ -42,10 +42,12 @@ class Guest:
         own = "mount -t tmpfs -o mode=700 none /opt/vantrel/corvista/data"
         return json.loads(self.sh(f"unshare -m sh -c {shlex.quote(own + ' && exec ' + line)}"))
 
-    def set(self, node, name, *values):
+    def set(self, node, name, *values, status=0):
         """Sets a property on the host's own files and returns the values before and after."""
         line = shlex.join(["cvagent", "--log", LOG, "--log-level", "3000", "set", node, name, *values, "--json"])
-        change = json.loads(self.sh(line))["property"]
+        result = self.machine.run(line)
+        expect(result.status == status, f"{line}\nended with status {result.status}:\n{result.out}{result.err}")
+        change = json.loads(result.out)["property"]
         return change["old"].get("value"), change["new"].get("value")
 
 

@@ -12,6 +12,8 @@ ExitStatus tree(Session& session, const Options& options);
 ExitStatus get(Session& session, const Options& options);
 ExitStatus set(Session& session, const Options& options);
 ExitStatus watch(Session& session, const Options& options);
+/// doctor --verify
+ExitStatus verifyTree(Session& session, const Options& options);
 // These need no agent.
 ExitStatus properties(const Options& options);
 ExitStatus doctor(const Options& options);

@@ -54,6 +54,7 @@ ExitStatus get(Session& session, const Options& options) {
     const Request request = ownRequest();
     const std::vector<Reading> readings =
         session.agent().read(node, readableIds(*node, options.properties), Freshness::now, request);
+    session.tellMissingTools(readings);
     print(options.json ? json::node(*node, readings) : listing(*node, readings, Style::detect()));
     session.showErrors(request);
     return verdict(*node, readings, !options.properties.empty());

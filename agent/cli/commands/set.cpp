@@ -42,6 +42,7 @@ ExitStatus set(Session& session, const Options& options) {
     const Request request = ownRequest();
     const WriteResult result = session.agent().write(node, row, value, request);
     session.showErrors(request);
+    session.tellMissingTools({result.after});
     if (result.problem) {
         throw Problem(*result.problem);
     }

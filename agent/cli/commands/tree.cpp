@@ -1,7 +1,12 @@
 #include "agent/core/tree.h"
+
+#include <algorithm>
+#include <map>
+
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/json.h"
 #include "agent/cli/print.h"
+#include "agent/core/oshw/unshown_links.h"
 
 namespace cvagent::commands {
 
@@ -12,7 +17,9 @@ bool saysNothing(const IC::PropertyValue& value) {
     return text.empty() || text == "0.0.0.0" || text == "0";
 }
 
-/// A stored value in short: the label of a code, the larger of two units.
+using Readings = std::vector<std::vector<Reading>>;
+
+/// A value in short: the label of a code, the larger of two units.
 std::string fact(const Property& row, const IC::PropertyValue& value) {
     std::string text = valueText(&row, value);
     const bool coded = !row.labels.empty() && text.ends_with(')');
@@ -25,18 +32,16 @@ std::string fact(const Property& row, const IC::PropertyValue& value) {
 }
 
 /// What tells the node from others of its class.
-std::string facts(const IC::MutableNode& node) {
+std::string facts(const IC::MutableNode& node, const std::vector<Reading>& readings) {
     const NodeClass* nodeClass = findClass(node.nodeType());
     if (nodeClass == nullptr) {
         return {};
     }
-    const Properties stored = storedProperties(node);
     std::string text;
     for (const unsigned int id : nodeClass->telling) {
-        const auto value = stored.find(id);
-        const Property* row = findProperty(node.nodeType(), id);
-        if (value != stored.end() && row != nullptr && !saysNothing(value->second)) {
-            text += (text.empty() ? "" : ", ") + fact(*row, value->second);
+        const auto told = std::ranges::find(readings, id, &Reading::id);
+        if (told != readings.end() && !told->failed() && told->row != nullptr && !saysNothing(told->value)) {
+            text += (text.empty() ? "" : ", ") + fact(*told->row, told->value);
         }
     }
     return text;
@@ -55,12 +60,16 @@ std::string branch(const std::vector<bool>& last, const Style& style) {
     return text;
 }
 
-std::string drawing(const std::vector<NodeRef>& nodes, const Style& style) {
+std::string drawing(const std::vector<NodeRef>& nodes, const Readings& readings, const Style& style) {
+    std::map<unsigned int, const std::vector<Reading>*> byId;
+    for (std::size_t i = 0; i < nodes.size(); ++i) {
+        byId.emplace(nodes[i]->getNodeId(), &readings[i]);
+    }
     std::string text;
     for (const Placed& placed : drawingOrder(nodes)) {
         const IC::MutableNode& node = *placed.node;
         const std::string description = printable(node.getDescription());
-        const std::string known = facts(node);
+        const std::string known = facts(node, *byId.at(node.getNodeId()));
         text += style.faint(branch(placed.last, style)) + style.strong(printable(pathComponent(node)));
         text += " " + style.faint("[" + std::to_string(node.getNodeId()) + "]");
         text += description.empty() ? "" : "  " + description;
@@ -69,11 +78,30 @@ std::string drawing(const std::vector<NodeRef>& nodes, const Style& style) {
     return text;
 }
 
+/// A link without a node is no fault, but who misses it is to know that the kernel has it.
+void hintAtLinks(const std::vector<std::string>& unshown) {
+    constexpr std::size_t kMost = 8;
+    std::string names;
+    for (std::size_t i = 0; i < std::min(unshown.size(), kMost); ++i) {
+        names += (i == 0 ? " " : ", ") + inQuotes(unshown[i]);
+    }
+    if (!unshown.empty()) {
+        complain("links of the kernel that the tree has no node for:" + names +
+                 (unshown.size() > kMost ? " and " + std::to_string(unshown.size() - kMost) + " more" : ""));
+    }
+}
+
 }  // namespace
 
 ExitStatus tree(Session& session, const Options& options) {
     const std::vector<NodeRef> nodes = session.agent().nodes();
-    print(options.json ? json::tree(session.agent().plugins(), nodes) : drawing(nodes, Style::detect()));
+    session.tellMissingTools();
+    const Request request = ownRequest();
+    const Readings readings = session.agent().readTree(nodes, request);
+    print(options.json ? json::tree(session.agent().plugins(), nodes, readings)
+                       : drawing(nodes, readings, Style::detect()));
+    session.showErrors(request);
+    hintAtLinks(oshw::unshownLinks(nodes));
     return ExitStatus::done;
 }
 

@@ -16,10 +16,15 @@ constexpr unsigned int kIpConfig[] = {123, 25, 26, 27};
 constexpr unsigned int kTeam[] = {198, 165};
 constexpr unsigned int kProcessor[] = {80};
 
+// What is stored comes from another command than what is read: the listing of interfaces where a read asks for
+// the link, zeros where a read tells that there is no IPv4. A clock goes on.
+constexpr unsigned int kComputerLive[] = {126};
+constexpr unsigned int kIpConfigLive[] = {25, 26, 123};
+
 constexpr NodeClass kClasses[] = {
     {NodeType::osHardware, "oshw", Naming::single, 0},
     {NodeType::root, "root", Naming::single, 0},
-    {NodeType::computer, "computer", Naming::single, 0, kComputer},
+    {NodeType::computer, "computer", Naming::single, 0, kComputer, false, kComputerLive},
     {NodeType::chassis, "chassis", Naming::single, 0},
     {NodeType::planar, "planar", Naming::single, 0},
     {NodeType::networkController, "network-controller", Naming::single, 0},
@@ -27,7 +32,7 @@ constexpr NodeClass kClasses[] = {
     {NodeType::hardDrive, "hard-drive", Naming::byProperty, 89, kDrive, true},
     {NodeType::partition, "partition", Naming::byProperty, 89, kPartition},
     {NodeType::networkPort, "network-port", Naming::byProperty, 108, kPort, true},
-    {NodeType::ipConfig, "ip-config", Naming::byProperty, 108, kIpConfig, true},
+    {NodeType::ipConfig, "ip-config", Naming::byProperty, 108, kIpConfig, true, kIpConfigLive},
     {NodeType::lanEndpoint, "lan-endpoint", Naming::byProperty, 108},
     {NodeType::team, "team", Naming::byProperty, 197, kTeam},
     {NodeType::processor, "processor", Naming::byIndex, 0, kProcessor, true},

@@ -1,0 +1,41 @@
+#pragma once
+
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "hosttools/interfaces.h"
+
+namespace cvagent::verify {
+
+/// What the kernel says at one moment: links and addresses by netlink, the rest out of /proc and /sys when it
+/// is asked for. No process is started.
+class Kernel {
+public:
+    Kernel();
+
+    /// Why links and addresses are not known, as an errno; 0 when they are.
+    int problem() const { return problem_; }
+    /// Null when there is none of that name.
+    const hosttools::Link* link(const std::string& name) const;
+    const std::vector<hosttools::Link>& links() const { return interfaces_.links; }
+    bool hasCarrier(const std::string& name) const;
+    /// What the driver says, of a link that is down as well.
+    struct LinkMode {
+        unsigned megabits = 0;  ///< 0 for not known
+        bool isFullDuplex = false;
+    };
+    static LinkMode modeOf(const std::string& name);
+    /// The first one of the link itself, not of an alias; null for none.
+    const hosttools::InetAddress* inet(const std::string& name) const;
+    /// The global ones, as texts with their prefix lengths.
+    std::vector<std::pair<std::string, unsigned>> inet6(const std::string& name) const;
+    /// Of the default routes; of one link, or of all for an empty name.
+    static std::vector<std::string> gateways(const std::string& name);
+
+private:
+    hosttools::Interfaces interfaces_;
+    int problem_;
+};
+
+}  // namespace cvagent::verify
