@@ -270,9 +270,8 @@ std::optional<Options> parseCommandLine(int count, const char* const* words) {
     } catch (const CLI::ParseError& error) {
         const bool noCommand =
             dynamic_cast<const CLI::RequiredError*>(&error) != nullptr && app.get_subcommands().empty();
-        throw Failure(ExitStatus::usage,
-                      (noCommand ? whyNoCommand(app) : std::string(error.what())) +
-                          "\nSee: " + helpCommand(app));
+        throw Failure(ExitStatus::usage, (noCommand ? whyNoCommand(app) : std::string(error.what())) +
+                                             "\nSee: " + helpCommand(app));
     }
 }
 

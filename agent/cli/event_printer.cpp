@@ -78,7 +78,7 @@ void EventPrinter::show(const Event& event) {
         }
     } catch (const Failure& failure) {
         failure_ = failure;
-        events_.wake();  // whoever follows is to end
+        events_->wake();  // whoever follows is to end
     }
     if (event.kind == Event::Kind::alert) {
         complainOfAlert(event);

@@ -17,6 +17,13 @@ namespace cvagent {
 
 namespace {
 
+/// A number with so many digits behind the point, whatever the locale.
+std::string fixedPoint(double number, int decimals) {
+    std::array<char, 64> text{};
+    const auto written = std::to_chars(text.begin(), text.end(), number, std::chars_format::fixed, decimals);
+    return {text.begin(), written.ptr};
+}
+
 /// "12.3 GB": a size in steps of 1000 or 1024, with the unit that keeps it short.
 std::string scaled(double size, double step, const std::array<const char*, 6>& units) {
     std::size_t unit = 0;
@@ -25,9 +32,7 @@ std::string scaled(double size, double step, const std::array<const char*, 6>& u
         ++unit;
     }
     const int decimals = unit == 0 || size >= 1000 ? 0 : 1;
-    std::array<char, 32> text{};
-    const auto written = std::to_chars(text.begin(), text.end(), size, std::chars_format::fixed, decimals);
-    return std::string(text.begin(), written.ptr) + " " + units.at(unit);
+    return fixedPoint(size, decimals) + " " + units.at(unit);
 }
 
 std::string speedText(unsigned long long kilobits) {
@@ -49,7 +54,7 @@ std::string inLargerUnits(Unit unit, const IC::Number& number) {
         case Unit::bytes:
             return number.toUnsigned64() < 10000 ? "" : sizeText(number.toUnsigned64());
         case Unit::kilohertz:
-            return formatted("%.2f GHz", number.toDouble() / 1e6);
+            return fixedPoint(number.toDouble() / 1e6, 2) + " GHz";
         case Unit::thousandBytes:
             return sizeText(number.toUnsigned64() * 1000);
         case Unit::kibibytes:

@@ -95,8 +95,8 @@ void appearBelow(unsigned int parent);
 
 /// 900 is slow, 901 fails and logs, 902 throws, 903 throws what is no exception, 904 hangs while it is held,
 /// 905 says then that nobody answers, 910 to 919 log an error of their own; 115 writes "room 5" with an error
-/// line, 116 does not write, 74 makes a node. Writing "throw" or "seven" throws, writing "hold" hangs while it
-/// is held.
+/// line, 116 does not write, 74 makes a node. Writing "throw" or "seven" throws, writing "hold" hangs while
+/// it is held.
 class FakeNode : public IC::MutableNode {
 public:
     using MutableNode::MutableNode;
