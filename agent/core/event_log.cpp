@@ -15,8 +15,12 @@ namespace cvagent {
 namespace {
 
 std::size_t bytesOf(const Event& event) {
-    return sizeof(Event) + event.path.size() + event.message.size() + event.before.size() +
-           event.after.size();
+    std::size_t bytes = sizeof(Event);
+    for (const std::string* text : {&event.nodeClass, &event.path, &event.message, &event.propertyName,
+                                    &event.before, &event.after, &event.caller}) {
+        bytes += text->size();
+    }
+    return bytes;
 }
 
 std::size_t placeOf(Event::Kind kind) {
