@@ -17,8 +17,8 @@ constexpr unsigned int kTeam[] = {198, 165};
 constexpr unsigned int kProcessor[] = {80};
 
 // What is stored comes from elsewhere than what is read: the listing of interfaces where a read asks for the
-// link, zeros where a read tells that there is no IPv4, what `hostname` prints where a read asks the kernel. A
-// clock goes on.
+// link, zeros where a read tells that there is no IPv4, what `hostname` prints where a read asks the kernel.
+// A clock goes on.
 constexpr unsigned int kComputerLive[] = {108, 126};
 constexpr unsigned int kIpConfigLive[] = {25, 26, 123};
 
