@@ -176,7 +176,8 @@ def processors(context):
 
 @check("tree: read through our host-tool adapters it is the same, the time apart")
 def adapters(context):
-    expect_equal("adapters", sorted(context.guest.names("/usr/lib/corvista/adapters/*")), ["fdisk", "ifconfig", "route"])
+    expect_equal("adapters", sorted(context.guest.names("/usr/lib/corvista/adapters/*")),
+                 ["brctl", "egrep", "ethtool", "fdisk", "ifconfig", "route"])
     ours = context.guest.cvagent("--host-tools", "classic", "tree")["nodes"]
     for mine, native in zip(ours, load_tree(context), strict=True):
         for node in (mine, native):
