@@ -220,7 +220,11 @@ Error ComputerNode::setProperty(const unsigned int& id, const PropertyValue& val
         if (row != nullptr && row->write != nullptr) {
             row->write(change);
         }
-        return change.isStored ? MutableNode::setProperty(id, value) : Error();
+        if (!change.isStored) {
+            return {};
+        }
+        // Past the next class, which would log the operation a second time.
+        return MutableNode::setProperty(id, value);  // NOLINT(bugprone-parent-virtual-call)
     } catch (...) {
         return failed();
     }

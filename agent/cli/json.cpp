@@ -1,5 +1,6 @@
 #include "agent/cli/json.h"
 
+#include <algorithm>
 #include <array>
 #include <nlohmann/json.hpp>
 
@@ -119,10 +120,9 @@ void addProperty(Json& object, const Event& event) {
 }  // namespace
 
 std::string tree(const std::vector<std::string>& plugins, const std::vector<NodeRef>& nodes) {
-    std::vector<std::vector<Reading>> readings;
-    for (const NodeRef& node : nodes) {
-        readings.push_back(storedReadings(*node));
-    }
+    std::vector<std::vector<Reading>> readings(nodes.size());
+    std::ranges::transform(nodes, readings.begin(),
+                           [](const NodeRef& node) { return storedReadings(*node); });
     return tree(plugins, nodes, readings);
 }
 

@@ -120,7 +120,7 @@ std::optional<Kind> kindNamed(const std::string& name) {
 
 class CatalogueParser {
 public:
-    explicit CatalogueParser(std::string owner) { own_->table.owner = keep(std::move(owner)); }
+    explicit CatalogueParser(const std::string& owner) { own_->table.owner = keep(owner); }
 
     ParsedCatalogue parse(std::string_view text) {
         const auto notTooDeep = [](int depth, CatalogueJson::parse_event_t /*event*/,
@@ -145,11 +145,8 @@ private:
         }
     }
 
-    const char* keep(std::string text) {
-        if (text.empty()) {
-            return "";
-        }
-        return own_->texts.emplace_back(printable(std::move(text))).c_str();
+    const char* keep(const std::string& text) {
+        return text.empty() ? "" : own_->texts.emplace_back(printable(text)).c_str();
     }
     /// For people; a long one is cut.
     const char* keepText(std::string text) {
@@ -160,7 +157,7 @@ private:
             }
             text.resize(end);
         }
-        return keep(std::move(text));
+        return keep(text);
     }
 
     template <class Add>

@@ -140,7 +140,7 @@ public:
     void noteAbsent(const std::string& path, const Identity& directory) {
         constexpr std::size_t kMost = 1000;
         const std::lock_guard lock(guard_);
-        if (absent_.size() < kMost || absent_.count(path) > 0) {
+        if (absent_.size() < kMost || absent_.contains(path)) {
             absent_[path] = directory;
         }
     }

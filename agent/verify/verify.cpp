@@ -207,7 +207,7 @@ std::string reasonFor(const Kernel& kernel, const Check& check, const Fact& fact
         }
     }
     const bool isOfLink = check.type == NodeType::networkPort || check.type == NodeType::ipConfig;
-    if (const std::string other = isOfLink ? namePartOf(kernel, fact.name) : ""; !other.empty()) {
+    if (std::string other = isOfLink ? namePartOf(kernel, fact.name) : ""; !other.empty()) {
         return other;
     }
     if (isOfLink && fact.name.find("bond") != std::string::npos && check.says == linkState) {
