@@ -220,11 +220,7 @@ Error ComputerNode::setProperty(const unsigned int& id, const PropertyValue& val
         if (row != nullptr && row->write != nullptr) {
             row->write(change);
         }
-        if (!change.isStored) {
-            return {};
-        }
-        // Past the next class, which would log the operation a second time.
-        return MutableNode::setProperty(id, value);  // NOLINT(bugprone-parent-virtual-call)
+        return change.isStored ? store(id, value) : Error();
     } catch (...) {
         return failed();
     }

@@ -34,7 +34,7 @@ Error HostNode::getProperty(unsigned int id, PropertyValue& out) const {
 
 Error HostNode::setProperty(const unsigned int& id, const PropertyValue& value) {
     const LogScope scope = enter();
-    return MutableNode::setProperty(id, value);
+    return store(id, value);
 }
 
 }  // namespace IC

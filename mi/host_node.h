@@ -39,6 +39,8 @@ protected:
     HostNode(const NodeClass& nodeClass, unsigned int nodeId, unsigned int linkedId,
              std::vector<unsigned int> miIds, unsigned int nodeType, unsigned int index, std::string name);
 
+    /// Stores the value without a word in the log.
+    Error store(unsigned int id, const PropertyValue& value) { return MutableNode::setProperty(id, value); }
     /// The log lines of a member that a class overrides.
     LogScope enter(const char* function = __builtin_FUNCTION(), int line = __builtin_LINE()) const {
         return {ClassName{class_.name()}, function, line};

@@ -330,7 +330,7 @@ Error IPConfigNode::setProperty(const unsigned int& id, const PropertyValue& val
         act(id, originCode(origin) == IPOrigin::fixed, change);
     }
     if (change.isStored) {
-        MutableNode::setProperty(id, value);
+        store(id, value);
     }
     return {};
 }

@@ -1,6 +1,7 @@
 // Prints the plug-in's catalogue as the file that lies beside the library: one table for code and readers.
 #include <algorithm>
 #include <cstdio>
+#include <exception>
 #include <nlohmann/json.hpp>
 #include <sstream>
 #include <stdexcept>
@@ -42,9 +43,7 @@ Json idsOf(const hardware::ClassRow& type, const std::vector<hardware::Row>& row
     return ids;
 }
 
-}  // namespace
-
-int main() {
+void printCatalogue() {
     const std::vector<hardware::Row> rows = hardware::allRows();
     Json json{{"plugin", "hardware"}, {"classes", Json::array()}, {"properties", Json::array()}};
     for (const hardware::ClassRow& row : hardware::classes()) {
@@ -68,5 +67,16 @@ int main() {
                                       {"trusted", row.audience == hardware::Audience::trusted}});
     }
     std::puts(json.dump(1).c_str());
-    return 0;
+}
+
+}  // namespace
+
+int main() {
+    try {
+        printCatalogue();
+        return 0;
+    } catch (const std::exception& failure) {
+        std::fprintf(stderr, "print_catalogue: %s\n", failure.what());
+        return 1;
+    }
 }

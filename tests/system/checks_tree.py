@@ -179,7 +179,8 @@ def adapters(context):
     expect_equal("adapters", sorted(context.guest.names("/usr/lib/corvista/adapters/*")),
                  ["brctl", "egrep", "ethtool", "fdisk", "ifconfig", "route"])
     ours = context.guest.cvagent("--host-tools", "classic", "tree")["nodes"]
-    for mine, native in zip(ours, load_tree(context), strict=True):
+    first = [[node for node in tree if node["path"].startswith("/oshw")] for tree in (ours, load_tree(context))]
+    for mine, native in zip(*first, strict=True):
         for node in (mine, native):
             node["properties"].pop("126", None)
         expect_equal(native["path"], mine, native)

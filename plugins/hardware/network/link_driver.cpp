@@ -9,8 +9,8 @@
 
 #include <algorithm>
 #include <array>
-#include <cstdio>
 #include <cstring>
+#include <string_view>
 
 #include "plugins/hardware/host.h"
 
@@ -57,9 +57,8 @@ std::optional<std::string> permanentAddress(int control, const std::string& link
     }
     std::string text;
     for (auto byte = begin; byte != end; ++byte) {
-        std::array<char, 4> digits{};
-        std::snprintf(digits.data(), digits.size(), "%02x:", static_cast<unsigned int>(*byte));
-        text += digits.data();
+        constexpr std::string_view kDigits = "0123456789abcdef";
+        text += {kDigits[*byte >> 4U], kDigits[*byte & 0xfU], ':'};
     }
     text.pop_back();
     return text;

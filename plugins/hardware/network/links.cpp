@@ -118,10 +118,10 @@ std::optional<std::string> sortOf(const Host& host, const std::string& link, con
     if (mark != kMarks.end()) {
         return mark->sort;
     }
-    if (const auto told = host.field(link + "/uevent", "DEVTYPE")) {
+    if (auto told = host.field(link + "/uevent", "DEVTYPE")) {
         return told;
     }
-    const auto type = host.number(link + "/type");
+    const unsigned long long type = host.number(link + "/type").value_or(0);
     if (type == kLoopback || type == kInfiniband) {
         return type == kLoopback ? "loopback" : "infiniband";
     }
@@ -138,8 +138,8 @@ std::optional<unsigned long long> receiveQueues(const Host& host, const std::str
 /// The kernel says -1 for a speed that it does not know, older ones the same without a sign.
 std::optional<unsigned long long> speedOf(const Host& host, const std::string& link) {
     constexpr unsigned long long kUnknown = 0xffffffff;
-    const auto speed = host.number(link + "/speed");
-    return speed == 0 || speed == kUnknown ? std::nullopt : speed;
+    const unsigned long long speed = host.number(link + "/speed").value_or(0);
+    return speed == 0 || speed == kUnknown ? std::nullopt : std::optional(speed);
 }
 
 std::optional<std::string> duplexOf(const Host& host, const std::string& link) {

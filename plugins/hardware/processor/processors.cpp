@@ -54,6 +54,11 @@ constexpr Row kRows[] = {
      "known weaknesses that it has, and what the kernel does about them"},
 };
 
+/// Where the kernel tells of a processor, by its number.
+std::string placeOf(const std::string& processor, const char* file) {
+    return kAll + "cpu" + processor + file;
+}
+
 using Fields = std::map<std::string, std::string>;
 
 /// The sections of these processors in /proc/cpuinfo, one after the other; where there are none, what stands
@@ -117,7 +122,7 @@ std::vector<std::string> coresOf(const Host& host, const std::vector<std::string
     std::set<std::string> known;
     std::vector<std::string> cores;
     for (const std::string& number : processors) {
-        const std::string topology = kAll + "cpu" + number + "/topology/";
+        const std::string topology = placeOf(number, "/topology/");
         const auto siblings = host.line(topology + "core_cpus_list");
         if (known.insert(siblings ? *siblings : host.line(topology + "thread_siblings_list").value_or(number))
                 .second) {
@@ -142,7 +147,7 @@ std::map<Id, unsigned long long> cachesOf(const Host& host, const std::vector<st
     std::map<Id, unsigned long long> sizes;
     std::set<std::string> counted;
     for (const std::string& number : cores) {
-        const std::string caches = kAll + "cpu" + number + "/cache/";
+        const std::string caches = placeOf(number, "/cache/");
         for (const std::string& index : host.entries(caches)) {
             const std::string cache = caches + index + "/";
             const auto sort =
@@ -234,7 +239,7 @@ std::optional<std::string> makerOf(const Fields& fields) {
 std::optional<unsigned long long> topFrequency(const Host& host, const std::vector<std::string>& cores) {
     std::optional<unsigned long long> top;
     for (const std::string& number : cores) {
-        top = std::max(top, host.number(kAll + "cpu" + number + "/cpufreq/cpuinfo_max_freq"));
+        top = std::max(top, host.number(placeOf(number, "/cpufreq/cpuinfo_max_freq")));
     }
     return top;
 }
@@ -283,7 +288,7 @@ void describeProcessor(const Host& host, Found& found) {
     for (const auto& [property, size] : cachesOf(host, cores)) {
         facts.number(property, size);
     }
-    const auto scaled = host.number(kAll + "cpu" + processors.front() + "/cpufreq/scaling_cur_freq");
+    const auto scaled = host.number(placeOf(processors.front(), "/cpufreq/scaling_cur_freq"));
     facts.number(kFrequency, scaled ? scaled : kilohertz(field(first, "cpu MHz")));
     facts.number(kTopFrequency, topFrequency(host, cores));
     facts.text(kMicrocode, field(first, "microcode"));

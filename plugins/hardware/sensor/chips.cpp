@@ -2,7 +2,7 @@
 
 #include <algorithm>
 #include <array>
-#include <cstdio>
+#include <charconv>
 #include <set>
 #include <string_view>
 
@@ -32,8 +32,7 @@ std::vector<std::string> pieces(const std::string& text, const char* separators)
 /// In hexadecimal digits, with zeros before them up to the width.
 std::string digits(unsigned int number, std::size_t width = 1) {
     std::array<char, 9> text{};
-    std::snprintf(text.data(), text.size(), "%x", number);
-    const std::string all = text.data();
+    const std::string all(text.data(), std::to_chars(text.begin(), text.end(), number, 16).ptr);
     return std::string(width - std::min(width, all.size()), '0') + all;
 }
 

@@ -62,8 +62,8 @@ void addLife(const Host& host, const std::string& device, const HealthIds& ids, 
     if (tenths >= 1 && tenths <= 11) {  // 0 stands for "not known", 11 for "beyond its end"
         facts.number(ids.worn, tenths * 10);
     }
-    const auto spare = host.number(device + "/pre_eol_info");
-    if (spare == 2ULL || spare == 3ULL) {
+    const unsigned long long spare = host.number(device + "/pre_eol_info").value_or(0);
+    if (spare == 2 || spare == 3) {
         facts.texts(ids.warnings, {"spare blocks run out"});
     }
 }

@@ -65,10 +65,8 @@ std::vector<Mount> mountsOf(const Host& host, const std::string& name, const std
 }
 
 std::vector<std::string> places(const std::vector<Mount>& mounted) {
-    std::vector<std::string> texts;
-    for (const Mount& mount : mounted) {
-        texts.push_back(printable(mount.where));
-    }
+    std::vector<std::string> texts(mounted.size());
+    std::ranges::transform(mounted, texts.begin(), [](const Mount& mount) { return printable(mount.where); });
     return texts;
 }
 

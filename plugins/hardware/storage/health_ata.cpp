@@ -163,7 +163,7 @@ Health askAta(const DeviceAccess& access, const DeviceFile& drive) {
     const bool solid = littleEndian(identity, 217 * 2, 2) == 1;
     if (solid && bitOfWord(identity, 84, 5)) {  // logs
         const std::string logs = read(access, drive, kLogDirectory);
-        if (littleEndian(logs, kDeviceStatistics * 2, 2) > 7) {
+        if (littleEndian(logs, std::size_t{kDeviceStatistics} * 2, 2) > 7) {
             addSolidStatePage(read(access, drive, kSolidStatePage), health);
         }
     }
