@@ -2,6 +2,7 @@
 #include <algorithm>
 #include <cstdio>
 #include <exception>
+#include <iostream>
 #include <nlohmann/json.hpp>
 #include <sstream>
 #include <stdexcept>
@@ -76,7 +77,7 @@ int main() {
         printCatalogue();
         return 0;
     } catch (const std::exception& failure) {
-        std::fprintf(stderr, "print_catalogue: %s\n", failure.what());
+        std::cerr << "print_catalogue: " << failure.what() << '\n';
         return 1;
     }
 }

@@ -150,6 +150,7 @@ bool bitOfWord(const std::string& identity, std::size_t word, unsigned int bit) 
 
 Health askAta(const DeviceAccess& access, const DeviceFile& drive) {
     constexpr std::size_t kDeviceStatistics = 4;
+    constexpr std::size_t kRotationWord = 217;
     Health health;
     const auto mode = tell(access, drive, kCheckPowerMode);
     health.power = mode ? powerState(mode->count) : std::nullopt;
@@ -160,10 +161,10 @@ Health askAta(const DeviceAccess& access, const DeviceFile& drive) {
     if (bitOfWord(identity, 82, 0) && bitOfWord(identity, 85, 0)) {  // SMART: there and switched on
         addSmart(access, drive, health);
     }
-    const bool solid = littleEndian(identity, 217 * 2, 2) == 1;
+    const bool solid = littleEndian(identity, kRotationWord * 2, 2) == 1;
     if (solid && bitOfWord(identity, 84, 5)) {  // logs
         const std::string logs = read(access, drive, kLogDirectory);
-        if (littleEndian(logs, std::size_t{kDeviceStatistics} * 2, 2) > 7) {
+        if (littleEndian(logs, kDeviceStatistics * 2, 2) > 7) {
             addSolidStatePage(read(access, drive, kSolidStatePage), health);
         }
     }
