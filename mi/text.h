@@ -20,9 +20,9 @@ std::string trimEnd(std::string text, char unwanted = '\n');
 /// `text` without the `unwanted` characters at its start.
 std::string trimStart(std::string text, char unwanted = ' ');
 
-/// The decimal number at the start of a text, with blanks and a sign before it; 0 when there is none, the
-/// nearest there is for one that does not fit. Sizes that fdisk prints are no such numbers: they are read as
-/// floating point.
+/// The decimal number at the start of a text as `strtol` reads it, with blanks and a sign before it; 0 when
+/// there is none, the nearest there is for one that does not fit. Sizes that fdisk prints are no such
+/// numbers: they are read as floating point.
 /// @param rest receives what stands behind it: all of the text when there is no number
 long long leadingDecimal(const std::string& text, std::string* rest = nullptr);
 
