@@ -241,6 +241,51 @@ HOST_TEST_F(KernelTree, WritesAnInterfaceWithOneOfTodaysNames) {
     EXPECT_THAT(ip(host, "-o link show ens18").out, testing::HasSubstr(",UP"));
 }
 
+/// With a user's own rights, each property that can be written.
+HOST_TEST_F(KernelTree, ChangesNothingWithoutRootAndSaysSo) {
+    wire(host, cable("eth0", "sw0"));
+    wire(host, {"address add 10.1.2.3/20 broadcast + dev eth0", "route add default via 10.1.0.1",
+                "-6 address add 2001:db8:1:42::3/56 dev eth0 nodad"});
+    interfaceFile(host, "eth0", "BOOTPROTO=static\nIPADDR=10.1.2.3/20\n");
+    host.file("/etc/sysconfig/network/routes", "default\t10.1.0.1\t-\n");
+    host.file("/etc/HOSTNAME", "linux-k.example.com");
+    host.directory("/home/x");
+    if (!host.giveToStranger("/home/x")) {
+        GTEST_SKIP() << "the tests do not run as root";
+    }
+    host.realTool("setpriv");
+    const auto asStranger = [&host](const Lines& words) {
+        Lines line = {"setpriv",      "--reuid=12345", "--regid=12345", "--keep-groups",     "env",
+                      "HOME=/home/x", CVAGENT_PROGRAM, "--plugin",      CORVISTA_PLUGIN_FILE};
+        line.insert(line.end(), words.begin(), words.end());
+        return host.run(line);
+    };
+    const auto network = [&host] { return ip(host, "-o address show").out + ip(host, "route show").out; };
+    const std::string before = network();
+    for (const auto& [property, value] : std::map<std::string, std::string>{{"InterfaceState", "down"},
+                                                                            {"IPOrigin", "1"},
+                                                                            {"IPv4Address", "10.1.2.4"},
+                                                                            {"SubnetMask", "255.255.255.0"},
+                                                                            {"IPv6Address", "2001:db8::20"},
+                                                                            {"IPv6PrefixLength", "48"},
+                                                                            {"IPv4Gateway", "10.1.0.2"},
+                                                                            {"IPv6Gateway", "fe80::2"},
+                                                                            {"DNSServers", "192.0.2.54"},
+                                                                            {"DNSSuffixes", "example.net"},
+                                                                            {"HostName", "earth"},
+                                                                            {"DomainName", "example.net"}}) {
+        const Finished run = asStranger({"set", "ip-config:eth0", property, value});
+        EXPECT_EQ(run.status, 1) << property << run.out;
+        EXPECT_THAT(run.err, testing::HasSubstr(property + " was not changed"));
+    }
+    EXPECT_THAT(asStranger({"set", "computer", "PowerAction", "9", "--yes"}).err,
+                testing::HasSubstr("PowerAction was not changed"));
+    EXPECT_EQ(asStranger({"set", "computer", "TimeZoneOffset", "330"}).status, 1);
+    EXPECT_EQ(asStranger({"set", "computer", "OwnerName", "x"}).status, 0) << "the user's own data";
+    EXPECT_EQ(network(), before);
+    EXPECT_EQ(host.read("/etc/HOSTNAME").value_or(""), "linux-k.example.com");
+}
+
 HOST_TEST_F(KernelTree, TellsOfAnInterfaceWithOneOfTodaysNames) {
     wireTodaysNames(host);
     wire(host, {"link set sw1 up", "link set ens18 up"});
