@@ -3,6 +3,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cctype>
 #include <cstring>
 
 #include "agent/core/host_tools.h"
@@ -25,6 +26,18 @@ std::string namePartOf(const Kernel& kernel, const std::string& name) {
     return {};
 }
 
+/// What the plug-in lets stand bare in a command.
+bool isLetIntoCommands(const std::string& name) {
+    return !name.starts_with('-') && std::ranges::all_of(name, [](char letter) {
+        const auto byte = static_cast<unsigned char>(letter);
+        return std::isalnum(byte) != 0 || byte > 127 || std::strchr("._:@%+=,/-", letter) != nullptr;
+    });
+}
+
+std::string refusedName(const std::string& name) {
+    return isLetIntoCommands(name) ? "" : "no command is run with such a name";
+}
+
 std::string missingToolOf(const std::string& property) {
     for (const MissingTool& missing : missingTools()) {
         if ((", " + missing.costs + ",").find(", " + property + ",") != std::string::npos) {
@@ -43,11 +56,13 @@ std::string bondOf(const Check& check, const std::string& name) {
 
 std::string reasonFor(const Kernel& kernel, const Check& check, const std::string& name,
                       const std::string& property) {
-    const bool isOfLink = check.type == NodeType::networkPort || check.type == NodeType::ipConfig;
+    std::vector<std::string> reasons{missingToolOf(property), bondOf(check, name),
+                                     check.why == nullptr ? "" : check.why};
+    if (check.type == NodeType::networkPort || check.type == NodeType::ipConfig) {
+        reasons.insert(reasons.begin(), {refusedName(name), namePartOf(kernel, name)});
+    }
     std::string why;
-    for (const std::string& reason :
-         {missingToolOf(property), bondOf(check, name), isOfLink ? namePartOf(kernel, name) : "",
-          std::string(check.why == nullptr ? "" : check.why)}) {
+    for (const std::string& reason : reasons) {
         why += (why.empty() || reason.empty() ? "" : "; or ") + reason;
     }
     return why.empty() ? "it has changed meanwhile, or the host's tool tells it otherwise: see cvagent doctor"

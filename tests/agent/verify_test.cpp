@@ -204,6 +204,31 @@ HOST_TEST(VerifyOfATeam, FindsEachWrongFact) {
     }
 }
 
+HOST_TEST_F(Verify, AsksForTheLinkAndOfABondWhetherItIsUp) {
+    for (const char* command :
+         {"link add eth1 type veth peer name sw1", "link add bond1 type veth peer name sw2",
+          "link set eth1 up", "link set bond1 up"}) {
+        EXPECT_EQ(host.run({"sh", "-c", std::string("ip ") + command}).status, 0);
+    }
+    expectEachFound(NodeType::ipConfig, {{108, text("eth1")}, {123, number(12), number(1), "12"}});
+    expectEachFound(NodeType::ipConfig, {{108, text("bond1")}, {123, number(1), number(12), "1"}});
+}
+
+HOST_TEST_F(Verify, SaysWhyAFactMayBeWrong) {
+    host.realTool("ethtool");
+    const auto why = [](const char* name, unsigned int id) {
+        const Result result = verified(NodeType::networkPort, {{id, text("wrong")}, {108, text(name)}}, 9);
+        return result.differences.empty() ? "" : result.differences.back().why;
+    };
+    using testing::HasSubstr;
+    EXPECT_THAT(why("sw0", 123), HasSubstr("see cvagent doctor"));
+    EXPECT_THAT(why("sw", 123), HasSubstr("the name is part of 'sw0'"));
+    EXPECT_THAT(why("sw0", 199), HasSubstr("from the interface's file"));
+    EXPECT_THAT(why("bond7", 123), HasSubstr("while all its members are"));
+    EXPECT_THAT(why("-x", 82), HasSubstr("no command is run with such a name"));
+    EXPECT_THAT(why("$(x)", 82), HasSubstr("no command is run with such a name"));
+}
+
 HOST_TEST_F(Verify, FindsWhatIsShownOfAnInterfaceThatHasNothing) {
     host.setHostName("linux");  // of whose domain no file knows
     const PropertyValue none = text("");
