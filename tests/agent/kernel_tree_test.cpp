@@ -312,6 +312,24 @@ HOST_TEST_F(KernelTree, IsTheSameOnABareHost) {
     EXPECT_GT(equipped.size(), 10U);
 }
 
+/// As in a rescue system, or where a distribution is put together.
+HOST_TEST_F(KernelTree, IsTheSameBelowAnotherRoot) {
+    wireTodaysNames(host);
+    for (const char* tool : {"chroot", "mount"}) {
+        host.realTool(tool);
+    }
+    host.directory("/srv/root");
+    const Finished bound = host.run({"mount", "--rbind", "/", "/srv/root"});
+    ASSERT_EQ(bound.status, 0) << bound.err;
+    const Lines tree = {CVAGENT_PROGRAM, "--plugin", CORVISTA_PLUGIN_FILE, "tree"};
+    Lines below = {"chroot", "/srv/root"};
+    below.insert(below.end(), tree.begin(), tree.end());
+    const Finished run = host.run(below);
+    EXPECT_EQ(run.out, host.run(tree).out);
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.out, testing::HasSubstr("network-port:ens18"));
+}
+
 /// The words with which doctor compares.
 const Lines kVerify = {CVAGENT_PROGRAM, "--plugin", CORVISTA_PLUGIN_FILE, "doctor", "--verify", "--json"};
 
