@@ -6,10 +6,10 @@
 #include <cstdio>
 #include <sstream>
 
+#include "agent/core/host_file.h"
 #include "agent/verify/fact.h"
 #include "framework/ic/link_state.h"
 #include "hosttools/addresses.h"
-#include "hosttools/files.h"
 
 namespace cvagent::verify {
 
@@ -17,10 +17,6 @@ namespace {
 
 bool isNoAddress(const std::string& address) {
     return address.empty() || address == "0.0.0.0" || address == "::";
-}
-
-std::string contentOf(const std::string& path) {
-    return hosttools::readFile(path).value_or("");
 }
 
 /// A list as it is shown.
@@ -44,12 +40,12 @@ std::string interfaceFile(const Kernel& kernel, const std::string& name) {
         std::snprintf(address.data(), address.size(), "%02x:%02x:%02x:%02x:%02x:%02x", bytes[0], bytes[1],
                       bytes[2], bytes[3], bytes[4], bytes[5]);
     }
-    return contentOf("/etc/sysconfig/network/ifcfg-eth-id-" + std::string(address.data()));
+    return "/etc/sysconfig/network/ifcfg-eth-id-" + std::string(address.data());
 }
 
 /// What stands behind the key, without quotes; "" when there is no such line.
-std::string valueOf(const std::string& content, const std::string& key) {
-    std::istringstream lines(content);
+std::string valueIn(const std::string& file, const std::string& key) {
+    std::istringstream lines = linesOf(file);
     for (std::string line; std::getline(lines, line);) {
         if (line.starts_with(key + "=")) {
             std::string value = line.substr(key.size() + 1);
@@ -64,7 +60,7 @@ std::string valueOf(const std::string& content, const std::string& key) {
 Text ipOrigin(const Kernel& kernel, const Fact& fact) {
     constexpr std::pair<const char*, const char*> kOrigins[] = {
         {"dhcp", "1"}, {"dhcp4", "1"}, {"bootp", "2"}, {"static", "3"}, {"none", "3"}};
-    const std::string protocol = valueOf(interfaceFile(kernel, fact.name), "BOOTPROTO");
+    const std::string protocol = valueIn(interfaceFile(kernel, fact.name), "BOOTPROTO");
     const auto* known = std::ranges::find(kOrigins, protocol, &std::pair<const char*, const char*>::first);
     return known != std::end(kOrigins) ? known->second : "0";
 }
@@ -152,7 +148,7 @@ Text ipv6Gateway(const Kernel& /*kernel*/, const Fact& fact) {
 
 /// The words behind a keyword of the resolver's file.
 std::vector<std::string> resolverWords(const std::string& keyword) {
-    std::istringstream lines(contentOf("/etc/resolv.conf"));
+    std::istringstream lines = linesOf("/etc/resolv.conf");
     std::vector<std::string> found;
     for (std::string line; std::getline(lines, line);) {
         std::istringstream words(line.substr(0, line.find_first_of("#;")));
@@ -173,16 +169,20 @@ Text dnsSuffixes(const Kernel& /*kernel*/, const Fact& /*fact*/) {
     return joined(resolverWords("search"));
 }
 
-std::string leaseOf(const std::string& name) {
-    return contentOf("/var/lib/dhcpcd/dhcpcd-" + name + ".info");
+std::string leaseFile(const std::string& name) {
+    return "/var/lib/dhcpcd/dhcpcd-" + name + ".info";
+}
+
+bool hasLease(const std::string& name) {
+    return !contentOf(leaseFile(name)).value_or("").empty();
 }
 
 Text usesDhcp(const Kernel& /*kernel*/, const Fact& fact) {
-    return yesOrNo(!leaseOf(fact.name).empty());
+    return yesOrNo(hasLease(fact.name));
 }
 
 Text leaseOrigin(const Kernel& /*kernel*/, const Fact& fact) {
-    return leaseOf(fact.name).empty() ? "3" : "1";
+    return hasLease(fact.name) ? "1" : "3";
 }
 
 /// The last word of the first line of all leases that has one.
@@ -191,7 +191,7 @@ std::string dhcpv6Server() {
     std::string server;
     if (glob("/var/lib/dhcpv6/client6.leases*", 0, nullptr, &files) == 0) {
         for (std::size_t i = 0; i < files.gl_pathc && server.empty(); ++i) {
-            std::istringstream lines(contentOf(files.gl_pathv[i]));
+            std::istringstream lines = linesOf(files.gl_pathv[i]);
             for (std::string line; server.empty() && std::getline(lines, line);) {
                 const std::size_t at = line.find("SDUID");
                 server = at == std::string::npos ? "" : line.substr(line.find_last_of(" \t") + 1);
@@ -203,7 +203,7 @@ std::string dhcpv6Server() {
 }
 
 Text dhcpServers(const Kernel& /*kernel*/, const Fact& fact) {
-    std::vector<std::string> servers{valueOf(leaseOf(fact.name), "DHCPSID"), dhcpv6Server()};
+    std::vector<std::string> servers{valueIn(leaseFile(fact.name), "DHCPSID"), dhcpv6Server()};
     std::erase(servers, "");
     return joined(servers);
 }

@@ -36,7 +36,7 @@ Text shortHostName(const Kernel& /*kernel*/, const Fact& /*fact*/) {
 /// name server knows it.
 std::vector<std::string> wholeHostNames() {
     const std::string own = kernelsHostName();
-    std::istringstream lines(hosttools::readFile("/etc/hosts").value_or(""));
+    std::istringstream lines = linesOf("/etc/hosts");
     std::vector<std::string> found;
     for (std::string line; std::getline(lines, line);) {
         std::istringstream words(line.substr(0, line.find('#')));
@@ -83,7 +83,7 @@ Text timeZone(const Kernel& /*kernel*/, const Fact& /*fact*/) {
 
 /// In the order of /proc/cpuinfo; nothing when it tells no such processor's.
 std::optional<Megahertz> clockNow(unsigned int processor) {
-    std::istringstream lines(hosttools::readFile("/proc/cpuinfo").value_or(""));
+    std::istringstream lines = linesOf("/proc/cpuinfo");
     for (std::string line; std::getline(lines, line);) {
         Megahertz speed = 0;
         if (line.starts_with("cpu MHz") && --processor == 0 &&

@@ -5,9 +5,9 @@
 
 #include <algorithm>
 #include <filesystem>
-#include <sstream>
 #include <system_error>
 
+#include "agent/core/host_file.h"
 #include "hosttools/addresses.h"
 #include "hosttools/files.h"
 
@@ -26,6 +26,10 @@ std::string placeOf(const std::string& name, const std::string& file) {
 }
 
 }  // namespace
+
+std::istringstream linesOf(const std::string& path) {
+    return std::istringstream(contentOf(path).value_or(""));
+}
 
 Kernel::Kernel() : problem_(hosttools::readInterfaces({}, interfaces_)) {}
 
@@ -82,7 +86,7 @@ std::vector<std::pair<std::string, unsigned>> Kernel::inet6(const std::string& n
 }
 
 std::vector<std::string> Kernel::gateways(const std::string& name) {
-    std::istringstream lines(hosttools::readFile("/proc/net/route").value_or(""));
+    std::istringstream lines = linesOf("/proc/net/route");
     std::vector<std::string> found;
     for (std::string line; std::getline(lines, line);) {
         std::istringstream words(line);
@@ -98,7 +102,7 @@ std::vector<std::string> Kernel::gateways(const std::string& name) {
 }
 
 std::vector<std::string> Kernel::inet6Gateways(const std::string& name) {
-    std::istringstream lines(hosttools::readFile("/proc/net/ipv6_route").value_or(""));
+    std::istringstream lines = linesOf("/proc/net/ipv6_route");
     std::vector<std::string> found;
     for (std::string line; std::getline(lines, line);) {
         std::istringstream words(line);

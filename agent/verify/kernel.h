@@ -1,6 +1,7 @@
 #pragma once
 
 #include <optional>
+#include <sstream>
 #include <string>
 #include <utility>
 #include <vector>
@@ -9,6 +10,9 @@
 #include "hosttools/link_settings.h"
 
 namespace cvagent::verify {
+
+/// A file to be read line by line; without any lines when it is no regular file that can be read.
+std::istringstream linesOf(const std::string& path);
 
 /// What the kernel says at one moment: links and addresses by netlink, the rest out of /proc and /sys when it
 /// is asked for. No process is started.

@@ -260,7 +260,10 @@ HOST_TEST_F(KernelTree, ChangesNothingWithoutRootAndSaysSo) {
         line.insert(line.end(), words.begin(), words.end());
         return host.run(line);
     };
-    const auto network = [&host] { return ip(host, "-o address show").out + ip(host, "route show").out; };
+    const auto network = [&host] {
+        return ip(host, "-4 -o address show up").out + ip(host, "route show").out +
+               ip(host, "-6 route show default").out;
+    };
     const std::string before = network();
     for (const auto& [property, value] : std::map<std::string, std::string>{{"InterfaceState", "down"},
                                                                             {"IPOrigin", "1"},
