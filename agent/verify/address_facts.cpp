@@ -3,13 +3,13 @@
 
 #include <algorithm>
 #include <array>
-#include <cstdio>
 #include <sstream>
 
 #include "agent/core/host_file.h"
 #include "agent/verify/fact.h"
 #include "framework/ic/link_state.h"
 #include "hosttools/addresses.h"
+#include "hosttools/text.h"
 
 namespace cvagent::verify {
 
@@ -33,14 +33,14 @@ Text interfaceState(const Kernel& kernel, const Fact& fact) {
 
 /// The file of the interface's settings; its name ends in the hardware address.
 std::string interfaceFile(const Kernel& kernel, const std::string& name) {
+    constexpr std::size_t kBytes = 6;
     const hosttools::Link* link = kernel.link(name);
-    std::array<char, 18> address{};
-    if (link != nullptr) {
-        const auto& bytes = link->hardware;
-        std::snprintf(address.data(), address.size(), "%02x:%02x:%02x:%02x:%02x:%02x", bytes[0], bytes[1],
-                      bytes[2], bytes[3], bytes[4], bytes[5]);
+    hosttools::Text path;
+    path.add("/etc/sysconfig/network/ifcfg-eth-id-");
+    for (std::size_t byte = 0; link != nullptr && byte < kBytes; ++byte) {
+        path.add(byte == 0 ? "" : ":").hex(link->hardware.at(byte), 2);
     }
-    return "/etc/sysconfig/network/ifcfg-eth-id-" + std::string(address.data());
+    return path.str();
 }
 
 /// What stands behind the key, without quotes; "" when there is no such line.

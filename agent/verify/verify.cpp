@@ -40,7 +40,7 @@ std::string refusedName(const std::string& name) {
 
 std::string missingToolOf(const std::string& property) {
     for (const MissingTool& missing : missingTools()) {
-        if ((", " + missing.costs + ",").find(", " + property + ",") != std::string::npos) {
+        if (missing.costsProperty(property)) {
             return "there is no " + missing.tool + " (package " + missing.package + ")";
         }
     }
@@ -99,14 +99,24 @@ void compare(const Kernel& kernel, const Check& check, const IC::MutableNode& no
     }
 }
 
+bool isOf(NodeType type, const NodeRef& node) {
+    return node->nodeType() == static_cast<unsigned int>(type);
+}
+
+/// They hang below the planar; another plug-in's tree alone has neither.
 void compareProcessors(const std::vector<NodeRef>& nodes, Result& result) {
-    const auto shown = std::ranges::count_if(nodes, [](const NodeRef& node) {
-        return node->nodeType() == static_cast<unsigned int>(NodeType::processor);
-    });
+    const auto planar =
+        std::ranges::find_if(nodes, [](const NodeRef& node) { return isOf(NodeType::planar, node); });
+    if (planar == nodes.end()) {
+        return;
+    }
+    const auto shown =
+        std::ranges::count_if(nodes, [](const NodeRef& node) { return isOf(NodeType::processor, node); });
     const long online = sysconf(_SC_NPROCESSORS_ONLN);
     ++result.compared;
     if (shown != online) {
-        result.differences.push_back({"/oshw", "processors", std::to_string(shown), std::to_string(online),
+        result.differences.push_back({(*planar)->getPath(), "processors", std::to_string(shown),
+                                      std::to_string(online),
                                       "/proc/cpuinfo of this machine has not one entry for each"});
     }
 }
