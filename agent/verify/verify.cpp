@@ -47,7 +47,7 @@ std::string missingToolOf(const std::string& property) {
     return {};
 }
 
-std::string bondOf(const Check& check, const std::string& name) {
+std::string countedAsBond(const Check& check, const std::string& name) {
     const bool isState = check.type == NodeType::networkPort && check.id == 123;
     return isState && name.find("bond") != std::string::npos
                ? "with 'bond' in its name it counts as a bond: up while all its members are"
@@ -56,7 +56,7 @@ std::string bondOf(const Check& check, const std::string& name) {
 
 std::string reasonFor(const Kernel& kernel, const Check& check, const std::string& name,
                       const std::string& property) {
-    std::vector<std::string> reasons{missingToolOf(property), bondOf(check, name),
+    std::vector<std::string> reasons{missingToolOf(property), countedAsBond(check, name),
                                      check.why == nullptr ? "" : check.why};
     if (check.type == NodeType::networkPort || check.type == NodeType::ipConfig) {
         reasons.insert(reasons.begin(), {refusedName(name), namePartOf(kernel, name)});
