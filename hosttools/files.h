@@ -31,7 +31,7 @@ std::string readFirstLine(const std::string& path);
 std::uint64_t readNumber(const std::string& path, std::uint64_t fallback = 0);
 /// The leading number of a text, in base 10 or 16 (with or without "0x"). @return nothing when there is none
 std::optional<std::uint64_t> parseNumber(std::string_view text, int base = 10);
-/// The names in a directory without those that begin with a dot, in no order; none when it cannot be read.
+/// The names in a directory but for "." and "..", in no order; none when it cannot be read.
 std::vector<std::string> listDirectory(const std::string& path);
 
 /// Takes the next line off the front of text; the line comes without its newline.
