@@ -5,6 +5,7 @@
 #include <string_view>
 
 #include "plugins/hardware/sensor/chips.h"
+#include "plugins/hardware/storage/drive_health.h"
 
 namespace hardware {
 
@@ -101,6 +102,14 @@ bool isCovered(const Host& host, const std::string& zone, const std::vector<std:
     });
 }
 
+/// A drive that sleeps would be woken by its temperature being read: its driver asks it each time.
+bool letsSleep(const Host& host, const Chip& chip) {
+    const auto drives = chip.sort == "drivetemp" ? host.entries(chip.directory + "/device/block")
+                                                 : std::vector<std::string>();
+    return std::any_of(drives.begin(), drives.end(),
+                       [&host](const std::string& drive) { return !isAwake(host, drive); });
+}
+
 std::optional<double> measured(const Host& host, const std::string& file, double perUnit) {
     const auto count = host.signedNumber(file);
     return count ? std::optional(static_cast<double>(*count) / perUnit) : std::nullopt;
@@ -173,7 +182,7 @@ void describeSensor(const Host& host, Found& found) {
     facts.text(kChip, chip->name);
     facts.text(kLabel, host.line(file + "_label"));
     const std::optional<bool> fault = host.flag(file + "_fault");
-    if (fault != true) {
+    if (fault != true && !letsSleep(host, *chip)) {
         const auto value = measured(host, file + "_input", sort->perUnit);
         facts.real(sort->value, value ? value : measured(host, file + "_average", sort->perUnit));
     }

@@ -7,6 +7,8 @@
 #include <string>
 #include <vector>
 
+#include "plugins/hardware/network/neighbours.h"
+
 namespace hardware {
 
 /// A device file, and what the kernel says it must be: what stands there instead is not asked.
@@ -52,6 +54,8 @@ public:
     virtual std::optional<Room> room(const std::string& where) const = 0;
     /// What libblkid finds on the device: TYPE, USAGE, LABEL, UUID. Nothing where the library is missing.
     virtual Contents contents(const DeviceFile& device) const = 0;
+    /// What lldpd has heard on all links.
+    virtual Neighbours neighbours() const = 0;
 };
 
 /// Those of this host.

@@ -23,4 +23,8 @@ struct HealthIds {
 void addHealth(const Host& host, const std::string& name, const std::string& transport, const HealthIds& ids,
                Facts& facts);
 
+/// Whether a drive turns for sure, so that a question that other drivers pass on to it wakes it not: one that
+/// has nothing to turn does, and one of a recorded host. It is told nothing of those that may not be asked.
+bool isAwake(const Host& host, const std::string& name);
+
 }  // namespace hardware

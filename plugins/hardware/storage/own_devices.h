@@ -19,7 +19,7 @@ private:
     int descriptor_;
 };
 
-/// This host's devices, by ioctls, statvfs and libblkid.
+/// This host's devices, by ioctls, statvfs, libblkid and lldpd.
 class OwnDevices : public DeviceAccess {
 public:
     std::optional<std::string> nvmeLog(const DeviceFile& controller, unsigned int page,
@@ -28,6 +28,7 @@ public:
                                    std::size_t size) const override;
     std::optional<Room> room(const std::string& where) const override;
     Contents contents(const DeviceFile& device) const override;
+    Neighbours neighbours() const override;
 };
 
 /// What libblkid finds in a file or on a device: TYPE, USAGE, LABEL, UUID. Empty where the library is missing
