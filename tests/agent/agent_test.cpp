@@ -188,8 +188,7 @@ HOST_TEST(AgentPlugins, OneThatTakesTooLongToStartIsLeftToItself) {
         const Agent agent(settings);
         ASSERT_EQ(agent.failedPlugins().size(), 1U);
         EXPECT_THAT(agent.failedPlugins().front().problem.what(), HasSubstr("has not started after 1 s"));
-        EXPECT_THAT(told, ElementsAre(testing::AllOf(HasSubstr("waiting for the plug-in"),
-                                                     HasSubstr(FAKE_PLUGIN_FILE))));
+        EXPECT_THAT(told, ElementsAre(HasSubstr("waiting for the plug-in '/")));
         EXPECT_THAT(agent.plugins(), ElementsAre(CORVISTA_PLUGIN_FILE));
         EXPECT_THAT(pathsOf(agent), testing::Contains("/oshw/root/computer"));
         events = agent.subscribe(0);

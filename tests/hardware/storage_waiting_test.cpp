@@ -1,7 +1,10 @@
 // Drives that sleep and are not to be woken, and what is told of those that do not answer.
 #include <gmock/gmock.h>
+#include <unistd.h>
 
+#include <filesystem>
 #include <future>
+#include <stdexcept>
 
 #include "plugins/hardware/storage/storage.h"
 #include "tests/hardware/storage_host.h"
@@ -77,6 +80,71 @@ TEST_F(WaitedFor, AFileSystemThatHangsLeavesItsRoomUnanswered) {
     EXPECT_TRUE(found.facts.isUnanswered(30705));
     EXPECT_TRUE(found.facts.isUnanswered(30706));
     EXPECT_FALSE(found.facts.isUnanswered(30704));
+}
+
+TEST_F(WaitedFor, AFileSystemOfADriveThatHangsIsNotGone) {
+    host_.file("/sys/class/block/nvme0n1/queue/rotational", "0");
+    bool hangs = false;
+    host_.devices->inside = [&hangs, gate = gate_](const auto&) {
+        if (hangs) {
+            gate->wait();
+        }
+        return hardware::DeviceAccess::Contents{{"TYPE", "xfs"}, {"USAGE", "filesystem"}};
+    };
+    const hardware::Host patient = host_.asRoot(std::chrono::milliseconds(30));
+    EXPECT_THAT(hardware::listFileSystems(patient), ElementsAre("nvme0n1"));
+    hangs = true;
+    EXPECT_THAT(hardware::listFileSystems(patient), ElementsAre("nvme0n1"));
+    host_.file("/sys/class/block/nvme0n1/diskseq", "2");  // another drive, of which nothing is known
+    EXPECT_THAT(hardware::listFileSystems(patient), IsEmpty());
+    gate_->open();
+}
+
+using Told = hardware::DeviceAccess::Told;
+
+/// The open descriptors, but for the one that reads the list.
+std::string openDescriptors() {
+    std::string all;
+    for (const auto& entry : std::filesystem::directory_iterator("/proc/self/fd")) {
+        const std::filesystem::path target = std::filesystem::read_symlink(entry.path());
+        all += target.string().starts_with("/proc/") ? "" : target.string().substr(0, 5);
+    }
+    return all;
+}
+
+TEST(Apart, TextsComeBackAsTheyWereTold) {
+    const Told told{{"a", "1"}, {"b", ""}, {"c d", "e=f "}, {"long", std::string(3000, 'x')}};
+    EXPECT_EQ(hardware::ownDevices()->apart([&told] { return told; }), told);
+    EXPECT_THAT(hardware::ownDevices()->apart([] { return Told(); }), IsEmpty());
+    EXPECT_THAT(hardware::ownDevices()->apart([]() -> Told { throw std::runtime_error("no memory"); }),
+                IsEmpty());
+    EXPECT_THAT(hardware::ownDevices()->apart([]() -> Told { _exit(0); }), IsEmpty());
+}
+
+TEST(Apart, TheProcessIsNotOursAndKeepsNothingOpen) {
+    Told told = hardware::ownDevices()->apart([] {
+        return Told{{"parent", std::to_string(getppid())}, {"open", openDescriptors()}};
+    });
+    EXPECT_NE(told["parent"], std::to_string(getpid()));
+    EXPECT_EQ(told["open"], "pipe:");
+}
+
+TEST(Apart, HealthIsToldWhole) {
+    hardware::Health health;
+    health.power = "idle";
+    health.temperature = -3;
+    health.worn = 0;
+    health.spare = 100;
+    health.hours = 18446744073709551615ULL;
+    health.warnings = {"one", "two"};
+    const hardware::Health same = hardware::healthFrom(hardware::toldOf(health));
+    EXPECT_EQ(same.power, "idle");
+    EXPECT_EQ(same.temperature, -3);
+    EXPECT_EQ(same.worn, 0U);
+    EXPECT_EQ(same.spare, 100U);
+    EXPECT_EQ(same.hours, 18446744073709551615ULL);
+    EXPECT_THAT(same.warnings, ElementsAre("one", "two"));
+    EXPECT_THAT(hardware::toldOf(hardware::healthFrom({})), IsEmpty());
 }
 
 /// A drive whose driver shows its temperature as a sensor.

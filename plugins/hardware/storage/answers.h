@@ -39,14 +39,20 @@ public:
                 });
             lock.lock();
             Known& known = state_->known[device];
-            known = {answered ? std::move(known.answer) : std::nullopt, Clock::now()};
+            known = {std::move(known.answer), Clock::now(), !answered};
             state_->answered.notify_all();
         } else {
             state_->answered.wait_for(lock, times_.patience, [&] {
                 const Known& known = state_->known[device];
-                return known.answer || !known.beingAsked;
+                return (known.answer && !known.isOld) || !known.beingAsked;
             });
         }
+        const Known& known = state_->known[device];
+        return known.isOld ? std::nullopt : known.answer;
+    }
+    /// What it answered last, however long ago.
+    std::optional<Answer> lastOf(const std::string& device) const {
+        const std::lock_guard lock(state_->guard);
         return state_->known[device].answer;
     }
 
@@ -56,6 +62,7 @@ private:
     struct Known {
         std::optional<Answer> answer;
         std::optional<Clock::time_point> asOf;
+        bool isOld = false;  ///< it has not answered since
         bool beingAsked = false;
     };
     struct State {
@@ -67,14 +74,14 @@ private:
     /// Whether it is time to ask; who is told so does it. Others make do with what is known, and wait for the
     /// first answer. The guard is held.
     bool isDue(const std::string& device) {
-        const auto isOld = [this](const Known& known) {
+        const auto isOver = [this](const Known& known) {
             return !known.asOf || Clock::now() - *known.asOf >= times_.kept;
         };
         if (state_->known.size() >= kMost) {  // devices come and go
-            std::erase_if(state_->known, [&](const auto& entry) { return isOld(entry.second); });
+            std::erase_if(state_->known, [&](const auto& entry) { return isOver(entry.second); });
         }
         Known& known = state_->known[device];
-        const bool due = isOld(known);
+        const bool due = isOver(known);
         if (due) {
             known.asOf = Clock::now();
             known.beingAsked = true;

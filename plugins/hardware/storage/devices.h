@@ -29,7 +29,8 @@ public:
     std::optional<Health> health(const HealthSource& source);
     /// In the same way.
     std::optional<Room> room(const std::string& where);
-    /// Empty when nothing is known.
+    /// What it was last where the device does not answer: a file system is not gone because of that. Empty
+    /// when nothing is known.
     DeviceAccess::Contents contents(const DeviceFile& device);
     /// Nothing when lldpd does not answer in time.
     std::optional<Neighbours> neighbours();

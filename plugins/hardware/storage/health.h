@@ -28,6 +28,10 @@ struct HealthSource {
     DeviceFile file;
 };
 
+/// As texts, and from them.
+DeviceAccess::Told toldOf(const Health& health);
+Health healthFrom(const DeviceAccess::Told& told);
+
 /// Asks one drive. A drive that sleeps is asked nothing but whether it does.
 Health askHealth(const DeviceAccess& access, const HealthSource& source);
 
