@@ -34,12 +34,13 @@ std::string raw(std::initializer_list<int> values) {
 
 TEST(NvmeHealth, IsReadFromTheLogPage) {
     // 311 K, spare 98 %, threshold 10 %, 3 % used; 0x01e240 hours.
-    const Health health = hardware::nvmeHealth(
-        bytes(512, {{0, raw({0, 0x37, 0x01, 98, 10, 3})}, {128, raw({0x40, 0xe2, 0x01})}}));
+    const Health health = hardware::nvmeHealth(bytes(
+        512, {{0, raw({0, 0x37, 0x01, 98, 10, 3})}, {128, raw({0x40, 0xe2, 0x01})}, {160, raw({2, 1})}}));
     EXPECT_EQ(health.temperature, 38);
     EXPECT_EQ(health.spare, 98U);
     EXPECT_EQ(health.worn, 3U);
     EXPECT_EQ(health.hours, 123456U);
+    EXPECT_EQ(health.mediaErrors, 258U);
     EXPECT_THAT(health.warnings, IsEmpty());
 }
 

@@ -50,8 +50,8 @@ TEST_F(WaitedFor, ADriveThatHangsLeavesItsHealthUnansweredAndNothingElse) {
             unanswered.emplace_back(row.name);
         }
     }
-    EXPECT_THAT(unanswered,
-                ElementsAre("PowerState", "Temperature", "Worn", "Spare", "PowerOnHours", "Warnings"));
+    EXPECT_THAT(unanswered, ElementsAre("PowerState", "Temperature", "Worn", "Spare", "PowerOnHours",
+                                        "Warnings", "MediaErrors"));
 }
 
 TEST_F(WaitedFor, WhoComesWhileTheFirstAnswerIsAwaitedGetsIt) {
@@ -136,6 +136,7 @@ TEST(Apart, HealthIsToldWhole) {
     health.worn = 0;
     health.spare = 100;
     health.hours = 18446744073709551615ULL;
+    health.mediaErrors = 3;
     health.warnings = {"one", "two"};
     const hardware::Health same = hardware::healthFrom(hardware::toldOf(health));
     EXPECT_EQ(same.power, "idle");
@@ -143,6 +144,7 @@ TEST(Apart, HealthIsToldWhole) {
     EXPECT_EQ(same.worn, 0U);
     EXPECT_EQ(same.spare, 100U);
     EXPECT_EQ(same.hours, 18446744073709551615ULL);
+    EXPECT_EQ(same.mediaErrors, 3U);
     EXPECT_THAT(same.warnings, ElementsAre("one", "two"));
     EXPECT_THAT(hardware::toldOf(hardware::healthFrom({})), IsEmpty());
 }

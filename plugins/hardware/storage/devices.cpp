@@ -31,8 +31,10 @@ struct Count {
     std::optional<unsigned long long> Health::*value;
 };
 
-constexpr std::array<Count, 3> kCounts = {
-    {{"worn", &Health::worn}, {"spare", &Health::spare}, {"hours", &Health::hours}}};
+constexpr std::array<Count, 4> kCounts = {{{"worn", &Health::worn},
+                                           {"spare", &Health::spare},
+                                           {"hours", &Health::hours},
+                                           {"media errors", &Health::mediaErrors}}};
 
 }  // namespace
 

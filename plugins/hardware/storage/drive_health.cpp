@@ -90,7 +90,8 @@ void addHealth(const Host& host, const std::string& name, const std::string& tra
     }
     const std::optional<Health> health = host.devices()->health(*source);
     if (!health) {
-        for (const Id id : {ids.power, ids.temperature, ids.worn, ids.spare, ids.hours, ids.warnings}) {
+        for (const Id id :
+             {ids.power, ids.temperature, ids.worn, ids.spare, ids.hours, ids.warnings, ids.mediaErrors}) {
             facts.unanswered(id);
         }
         return;
@@ -101,6 +102,7 @@ void addHealth(const Host& host, const std::string& name, const std::string& tra
     facts.number(ids.spare, health->spare);
     facts.number(ids.hours, health->hours);
     facts.texts(ids.warnings, health->warnings);
+    facts.number(ids.mediaErrors, health->mediaErrors);
 }
 
 bool isAwake(const Host& host, const std::string& name) {

@@ -16,6 +16,7 @@ struct HealthIds {
     Id spare;
     Id hours;
     Id warnings;
+    Id mediaErrors;
 };
 
 /// What the drive says of its health, for those who may ask it. One that the kernel lets sleep is not asked.

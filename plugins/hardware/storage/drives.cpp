@@ -37,6 +37,7 @@ enum : Id {
     kSpare,
     kHours,
     kWarnings,
+    kMediaErrors,
 };
 
 constexpr Row row(Id id, const char* name, Kind kind, const char* unit, const char* source,
@@ -83,6 +84,8 @@ constexpr Row kRows[] = {
     row(kSpare, "Spare", Kind::number, "percent", "NVMe log page 2", "spare blocks that are left", true),
     row(kHours, "PowerOnHours", Kind::number, "hours", kHealth, "how long it has been running", true),
     row(kWarnings, "Warnings", Kind::texts, "", kHealth, "what is wrong with it, as it says itself", true),
+    row(kMediaErrors, "MediaErrors", Kind::number, "", "NVMe log page 2",
+        "pieces of data that it could not read or keep whole", true),
 };
 
 }  // namespace
@@ -117,7 +120,7 @@ void describeDrive(const Host& host, Found& found) {
     block::count(host, found.name, {kReads, kReadBytes, kWrites, kWrittenBytes}, facts);
     facts.number(kErrors, host.number(directory + "/device/ioerr_cnt"));
     addHealth(host, found.name, transport.value_or(""),
-              {kPower, kTemperature, kWorn, kSpare, kHours, kWarnings}, facts);
+              {kPower, kTemperature, kWorn, kSpare, kHours, kWarnings, kMediaErrors}, facts);
 }
 
 }  // namespace hardware

@@ -16,6 +16,7 @@ struct Health {
         worn;  ///< percent of the life that the maker promises; can be above 100
     std::optional<unsigned long long> spare;  ///< percent of the spare blocks that are left
     std::optional<unsigned long long> hours;
+    std::optional<unsigned long long> mediaErrors;
     std::vector<std::string> warnings;
 };
 
