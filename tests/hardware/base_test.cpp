@@ -334,6 +334,7 @@ TEST_F(Plugin, ASecondStartMakesTheTreeAnew) {
     ASSERT_EQ(start().getStatus(), 0);
     EXPECT_EQ(golden::tree(plugin_), tree);
     EXPECT_EQ(plugin_.holdAll()[1]->getNodeId(), 100U);
+    EXPECT_EQ(plugin_.holdAll()[1]->getIndex(), 1U) << "they are counted anew";
     addLink("eth1", "1500");
     plugin_.lookAgain("net");
     EXPECT_EQ(links().size(), 3U);
