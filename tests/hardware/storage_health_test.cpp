@@ -316,6 +316,15 @@ TEST(DriveHealth, WhatMustNotBeAskedIsNot) {
     }
 }
 
+TEST(DriveHealth, ADriveThatTheKernelLetsSleepIsOnStandby) {
+    StorageHost host;
+    host.block("sda", "pci0/ata1/host0/target0:0:0/0:0:0:0", "8:0");
+    host.file("/sys/class/block/sda/device/power/runtime_status", "suspended");
+    for (const hardware::Host& seen : {host.asRoot(), host.asNobody(), host.host()}) {
+        EXPECT_EQ(factsOf(seen, Class::drive, "sda")["PowerState"], "standby");
+    }
+}
+
 TEST(DriveHealth, AControllerThatSleepsOrIsResetIsNotAsked) {
     const std::map<std::string, std::string> reasons = {{"state", "resetting"},
                                                         {"device/power/runtime_status", "suspended"}};
