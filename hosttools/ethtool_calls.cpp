@@ -11,6 +11,7 @@
 #include <cstring>
 #include <span>
 
+#include "hosttools/descriptor.h"
 #include "hosttools/ethtool_words.h"
 #include "hosttools/files.h"
 #include "hosttools/netlink.h"

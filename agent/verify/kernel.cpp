@@ -10,6 +10,7 @@
 #include <sstream>
 
 #include "hosttools/addresses.h"
+#include "hosttools/descriptor.h"
 #include "hosttools/files.h"
 
 #ifndef IFF_LOWER_UP
@@ -43,7 +44,7 @@ Kernel::LinkMode Kernel::modeOf(const std::string& name) {
     ifreq request{};
     name.copy(request.ifr_name, IFNAMSIZ - 1);
     request.ifr_data = reinterpret_cast<char*>(&settings);
-    if (!socket.valid() || name.size() >= IFNAMSIZ || ioctl(socket.get(), SIOCETHTOOL, &request) != 0) {
+    if (!socket.isOpen() || name.size() >= IFNAMSIZ || ioctl(socket.get(), SIOCETHTOOL, &request) != 0) {
         return {};
     }
     constexpr unsigned kUnknown = 0xFFFF;  // of its lower half, too

@@ -14,6 +14,7 @@
 #include "agent/core/text.h"
 #include "agent/verify/kernel.h"
 #include "framework/ic/link_state.h"
+#include "framework/qx/whole_number.h"
 #include "hosttools/addresses.h"
 #include "hosttools/files.h"
 
@@ -118,7 +119,7 @@ std::string shortHostName(const Kernel& kernel, const Fact& fact) {
 std::string currentTime(const Kernel& /*kernel*/, const Fact& fact) {
     constexpr long long kMoment = 30;
     const long long now = std::time(nullptr);
-    const auto shown = wholeNumber<long long>(fact.shown);
+    const auto shown = QX::wholeNumber<long long>(fact.shown);
     return shown && *shown <= now && *shown > now - kMoment ? fact.shown : std::to_string(now);
 }
 
