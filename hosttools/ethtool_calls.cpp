@@ -5,6 +5,7 @@
 #include <cerrno>
 #include <cstring>
 
+#include "hosttools/descriptor.h"
 #include "hosttools/ethtool_words.h"
 #include "hosttools/link_settings.h"
 

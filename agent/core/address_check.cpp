@@ -5,8 +5,8 @@
 #include <array>
 #include <string_view>
 
-#include "agent/core/text.h"
 #include "agent/core/value_check.h"
+#include "framework/qx/whole_number.h"
 
 namespace cvagent::check {
 
@@ -151,7 +151,7 @@ Value prefixLength(const Property& /*property*/, Words words) {
     if (words.size() != 1 || words.front().empty() || words.front().front() == '0') {
         return std::nullopt;
     }
-    const auto bits = wholeNumber<unsigned int>(words.front());
+    const auto bits = QX::wholeNumber<unsigned int>(words.front());
     const bool good = bits && *bits >= 1 && *bits <= 128;
     return good ? Value(IC::PropertyValue(IC::Number(*bits), true)) : std::nullopt;
 }

@@ -1,4 +1,4 @@
-corvista_test(golden SOURCES
+corvista_test(golden PARTS 2 SOURCES
   hosts/golden_test.cpp
   LIBRARIES test_support)
 target_compile_definitions(golden_test PRIVATE
