@@ -6,7 +6,7 @@
 #include <cstdint>
 #include <string_view>
 
-#include "hosttools/files.h"
+#include "hosttools/descriptor.h"
 
 namespace hosttools {
 

@@ -9,6 +9,7 @@
 
 #include "agent/core/text.h"
 #include "agent/verify/fact.h"
+#include "framework/qx/whole_number.h"
 #include "hosttools/files.h"
 
 namespace cvagent::verify {
@@ -67,7 +68,7 @@ Text domainName(const Kernel& /*kernel*/, const Fact& fact) {
 Text currentTime(const Kernel& /*kernel*/, const Fact& fact) {
     constexpr long long kMoment = 30;
     const long long now = std::time(nullptr);
-    const auto shown = wholeNumber<long long>(fact.shown);
+    const auto shown = QX::wholeNumber<long long>(fact.shown);
     return shown && *shown <= now && *shown > now - kMoment ? fact.shown : std::to_string(now);
 }
 
@@ -105,7 +106,7 @@ Megahertz clockLimit(unsigned int processor, const char* file, Megahertz fallbac
 Text clockSpeed(const Kernel& /*kernel*/, const Fact& fact) {
     constexpr Megahertz kClose = 0.1;
     const auto now = clockNow(fact.index);
-    const auto shown = wholeNumber<unsigned int>(fact.shown);
+    const auto shown = QX::wholeNumber<unsigned int>(fact.shown);
     if (!now || !shown) {
         return kNone;
     }

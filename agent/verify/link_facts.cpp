@@ -9,6 +9,7 @@
 #include "agent/verify/fact.h"
 #include "agent/verify/link_modes.h"
 #include "framework/ic/link_state.h"
+#include "framework/qx/whole_number.h"
 
 namespace cvagent::verify {
 
@@ -102,7 +103,7 @@ constexpr const char* kTeamModes[] = {
 /// What stands behind the mode ("fail_over_mac active") is left to the plug-in.
 Text teamMode(const Kernel& /*kernel*/, const Fact& fact) {
     const std::string told = Kernel::attribute(fact.name, "bonding/mode");
-    const auto number = wholeNumber<std::size_t>(told.substr(told.find(' ') + 1));
+    const auto number = QX::wholeNumber<std::size_t>(told.substr(told.find(' ') + 1));
     if (!number || *number >= std::size(kTeamModes)) {
         return told;
     }
