@@ -23,7 +23,9 @@ std::string changeText(const Event& event) {
     return event.propertyName + ": " + before + (event.after.empty() ? "not known" : printable(event.after));
 }
 
-std::string line(const Event& event, const Style& style) {
+}  // namespace
+
+std::string eventLine(const Event& event, const Style& style) {
     std::string text = style.faint(timeText(event.time)) + "  ";
     const std::string path = event.path.empty() ? "(node without a path)" : printable(event.path);
     if (event.kind == Event::Kind::alert) {
@@ -33,12 +35,14 @@ std::string line(const Event& event, const Style& style) {
                 std::to_string(event.firstCode) + ", " + std::to_string(event.secondCode) + ", " +
                 std::to_string(event.eventCode) + ")";
     } else {
-        const bool isWrite = event.kind == Event::Kind::written;
+        const bool isOfProperty = event.kind == Event::Kind::written || event.kind == Event::Kind::changed;
         text += padded(eventName(event.kind), 11) + style.strong(path) + "  " +
-                (isWrite ? changeText(event) : printable(event.message));
+                (isOfProperty ? changeText(event) : printable(event.message));
     }
     return text + "\n";
 }
+
+namespace {
 
 /// The time left, as poll takes it; -1 without an end.
 int millisecondsTo(const std::optional<Clock::time_point>& end) {
@@ -65,7 +69,40 @@ void EventPrinter::printAll() {
         complain(std::to_string(taken.dropped) + " events came faster than they could be printed");
     }
     for (const Event& event : taken.events) {
+        if (event.number > shownUpTo_) {
+            show(event);
+        }
+    }
+    if (!taken.events.empty()) {
+        noteShown(taken.events.back().number);
+    }
+}
+
+/// An event that waits to be taken may have been kept already, and was then shown with these; so may one that
+/// the plug-in tells once more.
+void EventPrinter::printUnseen() {
+    const std::lock_guard lock(guard_);
+    if (!marks_) {
+        return;
+    }
+    const ShownMarks::Unseen unseen = marks_->unseen();
+    if (unseen.left > 0) {
+        complain(std::to_string(unseen.left) + " events before these are not shown; see: cvagent history");
+    }
+    for (const Event& event : unseen.events) {
         show(event);
+    }
+    shownUpTo_ = unseen.shown;
+    if (!unseen.events.empty()) {
+        shownUpTo_ = unseen.events.back().number;
+        noteShown(shownUpTo_);
+    }
+}
+
+/// With the guard. What was not printed is shown the next time.
+void EventPrinter::noteShown(std::uint64_t number) {
+    if (marks_ && !failure_) {
+        marks_->shown(number);
     }
 }
 
@@ -73,7 +110,7 @@ void EventPrinter::printAll() {
 void EventPrinter::show(const Event& event) {
     try {
         if (!failure_) {
-            print(asJson_ ? json::event(event) : line(event, Style::detect()));
+            print(asJson_ ? json::event(event) : eventLine(event, Style::detect()));
             return;
         }
     } catch (const Failure& failure) {
