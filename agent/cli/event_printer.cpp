@@ -69,7 +69,7 @@ void EventPrinter::printAll() {
         complain(std::to_string(taken.dropped) + " events came faster than they could be printed");
     }
     for (const Event& event : taken.events) {
-        if (event.number > shownUpTo_) {
+        if (!wasUnseen(event)) {
             show(event);
         }
     }
@@ -78,25 +78,30 @@ void EventPrinter::printAll() {
     }
 }
 
-/// An event that waits to be taken may have been kept already, and was then shown with these; so may one that
-/// the plug-in tells once more.
 void EventPrinter::printUnseen() {
     const std::lock_guard lock(guard_);
     if (!marks_) {
         return;
     }
-    const ShownMarks::Unseen unseen = marks_->unseen();
+    ShownMarks::Unseen unseen = marks_->unseen();
     if (unseen.left > 0) {
         complain(std::to_string(unseen.left) + " events before these are not shown; see: cvagent history");
     }
     for (const Event& event : unseen.events) {
         show(event);
     }
-    shownUpTo_ = unseen.shown;
     if (!unseen.events.empty()) {
-        shownUpTo_ = unseen.events.back().number;
-        noteShown(shownUpTo_);
+        noteShown(unseen.events.back().number);
     }
+    unseen_ = std::move(unseen.events);
+}
+
+/// With the guard. An event that waits to be taken may have been kept already, and was then shown with those
+/// before.
+bool EventPrinter::wasUnseen(const Event& event) const {
+    const auto found = std::ranges::lower_bound(unseen_, event.number, {}, &Event::number);
+    return found != unseen_.end() && found->number == event.number && found->path == event.path &&
+           found->message == event.message;
 }
 
 /// With the guard. What was not printed is shown the next time.

@@ -5,6 +5,7 @@
 #include <mutex>
 #include <optional>
 #include <utility>
+#include <vector>
 
 #include "agent/cli/failure.h"
 #include "agent/cli/kept_events.h"
@@ -40,6 +41,7 @@ public:
 
 private:
     void show(const Event& event);
+    bool wasUnseen(const Event& event) const;
     void noteShown(std::uint64_t number);
     bool hasFailed() const;
 
@@ -48,7 +50,7 @@ private:
     const std::shared_ptr<ShownMarks> marks_;
     mutable std::mutex guard_;  // guards everything below, and the order of what is printed
     std::optional<Failure> failure_;
-    std::uint64_t shownUpTo_ = 0;
+    std::vector<Event> unseen_;  // what was shown first
 };
 
 }  // namespace cvagent

@@ -20,7 +20,6 @@ public:
         Unseen found;
         use([&found](History& history) {
             History::Unseen unseen = history.unseen(geteuid(), kMostUnseen);
-            found.shown = unseen.shown;
             found.left = unseen.left;
             for (HistoryEntry& entry : unseen.entries) {
                 found.events.push_back(std::move(entry.event));

@@ -16,8 +16,7 @@ std::shared_ptr<EventKeeper> eventKeeper();
 class ShownMarks {
 public:
     struct Unseen {
-        std::uint64_t shown = 0;    ///< the number up to which he was shown everything
-        std::vector<Event> events;  ///< the last of the others, the oldest first
+        std::vector<Event> events;  ///< the last of them, the oldest first
         std::uint64_t left = 0;     ///< how many came before these
     };
 

@@ -227,6 +227,10 @@ WriteResult Agent::write(const NodeRef& node, const Property& row, const IC::Pro
     return engine_->writer.write(node.node_, row, value, request);
 }
 
+void Agent::announce(const Event& event) const {
+    engine_->announcer.hear(event);
+}
+
 std::shared_ptr<Subscription> Agent::subscribe(std::uint64_t after, std::optional<Event::Kind> only) const {
     return engine_->events.subscribe(after, EventLog::kMost, only);
 }

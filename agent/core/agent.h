@@ -83,6 +83,8 @@ public:
     WriteResult write(const NodeRef& node, const Property& row, const IC::PropertyValue& value,
                       const Request& request) const;
 
+    /// A front end has found out by itself that something has changed.
+    void announce(const Event& event) const;
     /// See EventLog. A subscription outlives the agent: the last events come while the plug-ins stop.
     std::shared_ptr<Subscription> subscribe(std::uint64_t after, std::optional<Event::Kind> only = {}) const;
 

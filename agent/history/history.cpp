@@ -27,6 +27,7 @@ void prepareForWriting(const Database& database) {
     database.execute("PRAGMA synchronous = FULL");
     database.execute("PRAGMA journal_size_limit = 1048576");
     database.execute("PRAGMA cache_size = -512");
+    database.execute("PRAGMA temp_store = MEMORY");
     database.execute("PRAGMA foreign_keys = OFF");
 }
 
@@ -48,8 +49,7 @@ struct History::Opened {
     std::optional<Entries> entries;
 };
 
-History::History(const HistoryPlace& place, Tell tell)
-    : place_(place), tell_(std::move(tell)) {
+History::History(const HistoryPlace& place, Tell tell) : place_(place), tell_(std::move(tell)) {
     open();
 }
 
@@ -235,10 +235,9 @@ History::Unseen History::unseen(uid_t user, std::size_t most) {
             query.after = static_cast<std::uint64_t>(mark.number(0));
             mark.reset();
         }
-        const std::uint64_t shown = query.after;
         const Entries::Tail tail = opened_->entries->lastOf(query, most);
         query.after = tail.after;
-        Unseen found{shown, opened_->entries->read(query, most), 0};
+        Unseen found{opened_->entries->read(query, most), 0};
         found.left = tail.count - std::min<std::uint64_t>(tail.count, found.entries.size());
         return found;
     });
@@ -250,7 +249,7 @@ void History::shown(uid_t user, std::uint64_t number) {
                        "INSERT INTO marks (uid, number) VALUES (:uid, :number) "
                        "ON CONFLICT (uid) DO UPDATE SET number = max(number, :number)");
         mark.set(":uid", static_cast<std::int64_t>(user))
-            .set(":number", static_cast<std::int64_t>(number))
+            .set(":number", static_cast<std::int64_t>(std::min(number, opened_->entries->last())))
             .run();
     });
 }

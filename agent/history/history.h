@@ -42,12 +42,11 @@ public:
     std::vector<HistoryEntry> read(const HistoryQuery& query, std::size_t most);
     /// What was not shown to a user.
     struct Unseen {
-        std::uint64_t shown = 0;            ///< the number up to which everything was shown
-        std::vector<HistoryEntry> entries;  ///< the last of the others, the oldest first
+        std::vector<HistoryEntry> entries;  ///< the last of them, the oldest first
         std::uint64_t left = 0;             ///< how many came before these
     };
     Unseen unseen(uid_t user, std::size_t most);
-    /// The user has been shown everything up to this number.
+    /// The user has been shown everything up to this number; never less than before.
     void shown(uid_t user, std::uint64_t number);
 
     HistoryLimits limits();

@@ -126,7 +126,7 @@ HistoryPlace readHistoryPlace(std::string& left) {
     if (std::getenv(kDataVariable) != nullptr || geteuid() == 0) {
         return ownHistoryPlace();
     }
-    const HistoryPlace host{kHostDirectory, true};
+    HistoryPlace host{kHostDirectory, true};
     if (access(host.file().c_str(), R_OK) == 0) {
         return host;
     }
@@ -194,7 +194,8 @@ std::string moveAside(const HistoryPlace& place) {
     const std::time_t time = std::time(nullptr);
     gmtime_r(&time, &now);
     std::array<char, 40> when{};
-    std::strftime(when.data(), when.size(), "%Y%m%dT%H%M%SZ", &now);
+    [[maybe_unused]] const std::size_t length =
+        std::strftime(when.data(), when.size(), "%Y%m%dT%H%M%SZ", &now);
     const std::string base = file + kDamaged + when.data();
     std::string aside = base;
     for (int more = 2; look(aside); ++more) {
@@ -231,7 +232,7 @@ HistoryLock::HistoryLock(const HistoryPlace& place, Kind kind) {
         close(file_);
         throw HistoryError(HistoryError::unsafe, inQuotes(name) + " is not this user's");
     }
-    constexpr timespec kPause{0, 10 * 1000 * 1000};
+    constexpr timespec kPause{0, 10'000'000};
     constexpr int kPauses = 200;
     const int operation = (kind == Kind::shared ? LOCK_SH : LOCK_EX) | LOCK_NB;
     for (int i = 0; flock(file_, operation) != 0; ++i) {

@@ -9,7 +9,7 @@ Recorder::~Recorder() {
     nextTry_ = std::chrono::steady_clock::time_point::min();
     std::vector<Event> none;
     if (!waiting_.events().empty()) {
-        keep(none);
+        Recorder::keep(none);
     }
 }
 

@@ -4,7 +4,8 @@ if(CORVISTA_SERVICE)
     history/history_command_test.cpp
     history/history_files_test.cpp
     history/history_test.cpp
+    history/kept_alerts_test.cpp
     history/recorder_test.cpp)
   target_compile_definitions(history_test PRIVATE ${agent_test_programs})
-  add_dependencies(history_test cvagent fake_plugin)
+  add_dependencies(history_test cvagent fake_plugin vantrelcvicoshwmi)
 endif()
