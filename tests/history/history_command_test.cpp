@@ -1,11 +1,17 @@
 // What cvagent keeps and shows, by running the program.
+#include <fcntl.h>
 #include <gmock/gmock.h>
+#include <signal.h>
+#include <sys/ioctl.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <nlohmann/json.hpp>
 #include <sstream>
 
 #include "tests/agent/cvagent_run.h"
+#include "tests/history/kept.h"
+#include "tests/support/waiting.h"
 
 namespace {
 
@@ -145,6 +151,28 @@ HOST_TEST(HistoryCommand, GoesWithTheDataDirectoryThatIsNamed) {
     EXPECT_TRUE(host.exists("/root/scratch/history.db"));
     EXPECT_FALSE(host.exists("/var/lib/corvista"));
     EXPECT_THAT(objects(run({"history", "--json"}).out), SizeIs(1));
+}
+
+/// A pager that is left open: the pipe to it is full, and the program waits.
+HOST_TEST(HistoryCommand, HoldsNothingWhileNobodyReads) {
+    cvagent::History history(kept::kPlace);
+    std::vector<cvagent::Event> events(1500,
+                                       kept::event(std::string(1000, 'x'), cvagent::Event::Kind::alert));
+    history.append(events);
+    ASSERT_EQ(mkfifo("/tmp/pager", 0600), 0);
+    const int pager = open("/tmp/pager", O_RDWR | O_CLOEXEC);
+    RunningProgram program =
+        host.start({"sh", "-c", std::string("exec ") + CVAGENT_PROGRAM + " history > /tmp/pager"});
+    EXPECT_TRUE(eventually([pager] {
+        int waiting = 0;
+        return ioctl(pager, FIONREAD, &waiting) == 0 && waiting >= fcntl(pager, F_GETPIPE_SZ);
+    }));
+    kept::append(history, kept::event("meanwhile"));
+    const cvagent::Database writer(history.file(), cvagent::Database::Access::write);
+    EXPECT_EQ(writer.number("PRAGMA wal_checkpoint(TRUNCATE)"), 0) << "a reader is in the way";
+    program.signal(SIGKILL);
+    program.wait();
+    close(pager);
 }
 
 HOST_TEST(HistoryCommand, CanBeMadeSmaller) {
