@@ -99,7 +99,7 @@ void makeFile(const HistoryPlace& place) {
     }
 }
 
-/// The directory as ownDirectory has made it; one that is there keeps its mode.
+/// As ownDirectory has made it; a directory that somebody has given another owner or mode keeps them.
 void letReadersIn(const HistoryPlace& place, const std::optional<gid_t>& group) {
     const auto found = look(place.directory);
     if (group && found && found->st_gid == 0 && (found->st_mode & 07777) == 0700 &&
@@ -160,8 +160,8 @@ HistoryPlace reachHistoryPlace(HistoryPlace place) {
 
 void prepareHistoryFile(const HistoryPlace& place) {
     const auto group = readers(place);
+    letReadersIn(place, group);
     if (!look(place.file())) {
-        letReadersIn(place, group);
         makeFile(place);
     }
     for (const char* part : kParts) {

@@ -87,6 +87,7 @@ HOST_TEST(HistoryFile, CanBeReadByTheGroupWhereTheHostHasIt) {
     { History history(kPlace); }
     EXPECT_EQ(modeOf(kFile), 0640U);
     EXPECT_EQ(groupOf(kFile), readers);
+    EXPECT_EQ(modeOf("/var/lib/corvista"), 0750U);
     host.remove("/var/lib/corvista");
     History history(kPlace);
     kept::append(history, kept::event("x"));
