@@ -210,11 +210,12 @@ std::string moveAside(const HistoryPlace& place) {
     return aside;
 }
 
-bool hasMovedAside(const HistoryPlace& place) {
-    const std::string start = place.file() + kDamaged;
+bool hasTraces(const HistoryPlace& place) {
+    const std::string file = place.file();
     std::error_code error;
     for (const auto& entry : std::filesystem::directory_iterator(place.directory, error)) {
-        if (entry.path().string().starts_with(start)) {
+        const std::string found = entry.path().string();
+        if (found.starts_with(file + "-") || found.starts_with(file + kDamaged)) {
             return true;
         }
     }

@@ -187,6 +187,16 @@ HOST_TEST(HistoryFile, WithAHeaderOfZerosGoesOnBeyondAllNumbers) {
     EXPECT_GT(kept::append(history, kept::event("x")), 1700000000U);
 }
 
+HOST_TEST(HistoryFile, ThatWasEmptiedGoesOnBeyondAllNumbers) {
+    {
+        History history(kPlace);
+        fill(history, 10);
+    }
+    std::filesystem::resize_file(kFile, 0);
+    std::filesystem::resize_file(kFile + "-wal", 0);
+    EXPECT_GT(kept::append(*std::make_unique<History>(kPlace), kept::event("x")), 1700000000U);
+}
+
 HOST_TEST(HistoryFile, ThatWasRemovedIsMadeAnewAndItsNumbersGoOn) {
     History history(kPlace);
     fill(history, 3);
