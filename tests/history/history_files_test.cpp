@@ -99,6 +99,12 @@ HOST_TEST(HistoryFile, CanBeReadByTheGroupWhereTheHostHasIt) {
     EXPECT_EQ(modeOf("/var/lib/corvista/history.lock"), 0600U);
 }
 
+HOST_TEST(HistoryFile, LeavesWhatReadersNeedWithoutTheRightToMakeIt) {
+    kept::append(*std::make_unique<History>(kPlace), kept::event("x"));
+    EXPECT_TRUE(host.exists(kFile + "-wal"));
+    EXPECT_TRUE(host.exists(kFile + "-shm"));
+}
+
 HOST_TEST(HistoryFile, OfAStrangerIsRefused) {
     host.directory("/var/lib/corvista", 0700);
     host.file(kFile, "");
