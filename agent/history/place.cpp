@@ -89,7 +89,7 @@ void syncDirectory(const std::string& directory) {
 
 /// A file that is there is not opened: closing it would take the locks from who has it open in this process.
 void makeFile(const HistoryPlace& place) {
-    const int made = open(place.file().c_str(), O_RDWR | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600);
+    const int made = open(place.file().c_str(), O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC, 0600);
     if (made < 0 && errno != EEXIST) {
         failWith(errno, inQuotes(place.file()));
     }
