@@ -1,8 +1,6 @@
 // Who may what: root, the trusted group, others; with and without polkit.
 #include <gmock/gmock.h>
 
-#include <filesystem>
-
 #include "tests/service/service_run.h"
 
 namespace {
@@ -176,28 +174,33 @@ HOST_TEST_F(ServiceConsent, IsNotAStrangersToGive) {
 class ServiceSecrets : public HostFixture {
 protected:
     void setUpHost(FakeHost& host) override {
-        std::filesystem::create_directories("/opt/p");
-        std::filesystem::copy_file(UPTIME_FILE, "/opt/p/libuptime.so.1");
-        host.file("/opt/p/libuptime.json",
-                  R"({"classes": [{"type": 900, "name": "uptime"}], "properties": [
-                      {"class": 900, "id": 90001, "name": "Uptime", "kind": "number", "trusted": true}]})");
+        host.file("/sys/class/dmi/id/product_serial", "S3CR3T\n");
+        host.file("/sys/class/dmi/id/product_name", "Model 1\n");
         run.emplace(host);
-        run->plugin("/opt/p/libuptime.so.1").start();
+        run->plugin(HARDWARE_FILE).start();
         if (call::asUser(kUser, {}, [] { return std::string("yes"); }) != "yes") {
             GTEST_SKIP();
         }
     }
-    static constexpr const char* kNode = "/com/vantrel/Corvista1/uptime";
-    static constexpr const char* kUptime = "com.vantrel.Corvista1.Uptime";
-    /// What a user finds by each of the ways.
+    static constexpr const char* kSystem = "/com/vantrel/Corvista1/hardware/system";
+    static constexpr const char* kInterface = "com.vantrel.Corvista1.System";
+    /// All that a user finds, in each of the ways.
     static std::string look() {
         const bus::Connection own(ServiceRun::address());
-        std::string told = call::errorOf(own, kNode, call::kProperties, "Get", [](bus::Writer& writer) {
-            writer.put(kUptime).put("Uptime");
-        });
-        told += " " + std::to_string(call::getAll(own, kNode, kUptime).size());
-        const ToldReading read = call::read(own, kNode, {90001}).front();
-        told += " " + read.value + " " + read.error;
+        const auto get = [&](const std::string& name) {
+            try {
+                return call::get(own, kSystem, kInterface, name);
+            } catch (const bus::Error& error) {
+                return error.name();
+            }
+        };
+        std::string told = get("Model") + " " + get("SerialNumber");
+        for (const auto& [name, value] : call::getAll(own, kSystem, kInterface)) {
+            told += " " + name + "=" + value;
+        }
+        for (const ToldReading& reading : call::read(own, kSystem, {})) {
+            told += " " + reading.value + " " + reading.error;
+        }
         const bus::Message tree = call::ask(own, ServiceRun::kRoot, call::kAgent, "Tree");
         bus::Reader reader(tree);
         reader.skip();
@@ -206,7 +209,28 @@ protected:
                 for (int i = 0; i < 9; ++i) {
                     reader.skip();
                 }
-                told += " " + std::to_string(call::readings(reader).size());
+                for (const ToldReading& each : call::readings(reader)) {
+                    told += " " + each.value;
+                }
+            });
+        });
+        const bus::Message managed = call::ask(own, ServiceRun::kRoot, "org.freedesktop.DBus.ObjectManager",
+                                               "GetManagedObjects");
+        bus::Reader objects(managed);
+        objects.array("{oa{sa{sv}}}", [&] {
+            objects.entry("oa{sa{sv}}", [&] {
+                objects.skip();
+                objects.array("{sa{sv}}", [&] {
+                    objects.entry("sa{sv}", [&] {
+                        objects.skip();
+                        objects.array("{sv}", [&] {
+                            objects.entry("sv", [&] {
+                                told += " " + objects.text();
+                                told += "=" + call::variantText(objects);
+                            });
+                        });
+                    });
+                });
             });
         });
         return told;
@@ -215,10 +239,18 @@ protected:
 };
 
 HOST_TEST_F(ServiceSecrets, AreForRootAndTheGroup) {
-    call::read(run->bus(), kNode, {90001});
-    EXPECT_EQ(call::asUser(kUser, {}, look),
-              std::string(kDenied) + " 0  told to root and the trusted group only 0");
-    EXPECT_EQ(call::asUser(kUser, kGroup, look), call::asUser(0, {}, look));
+    const std::string others = call::asUser(kUser, {}, look);
+    EXPECT_THAT(others, Not(HasSubstr("S3CR3T")));
+    EXPECT_THAT(others, HasSubstr(std::string("Model 1 ") + kDenied));
+    EXPECT_THAT(others, HasSubstr("told to root and the trusted group only"));
+    const std::string roots = call::asUser(0, {}, look);
+    EXPECT_THAT(roots, HasSubstr("Model 1 S3CR3T"));
+    EXPECT_EQ(call::asUser(kUser, kGroup, look), roots);
+    std::size_t count = 0;
+    for (std::size_t at = roots.find("S3CR3T"); at != std::string::npos; at = roots.find("S3CR3T", at + 1)) {
+        ++count;
+    }
+    EXPECT_EQ(count, 5U) << "once by each of the ways";
 }
 
 }  // namespace

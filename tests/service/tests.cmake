@@ -13,6 +13,6 @@ if(CORVISTA_SERVICE)
     service/workers_test.cpp
     service/write_test.cpp)
   target_compile_definitions(service_test PRIVATE ${agent_test_programs} CVAGENTD_PROGRAM="$<TARGET_FILE:cvagentd>"
-    UPTIME_FILE="$<TARGET_FILE:uptime>" INTERFACE_FILE="${CMAKE_SOURCE_DIR}/packaging/com.vantrel.Corvista1.xml")
-  add_dependencies(service_test cvagent cvagentd fake_plugin uptime)
+    HARDWARE_FILE="$<TARGET_FILE:corvistahardware>" INTERFACE_FILE="${CMAKE_SOURCE_DIR}/packaging/com.vantrel.Corvista1.xml")
+  add_dependencies(service_test cvagent cvagentd fake_plugin corvistahardware tiny_front_end)
 endif()

@@ -47,7 +47,7 @@ HOST_TEST_F(ServiceWrites, ChangeTheHostAndTellHow) {
     EXPECT_FALSE(complained);
     EXPECT_EQ(write(kContact, "room 5"), "applied 'room 4' 'room 5'");
     EXPECT_TRUE(complained);
-    EXPECT_THAT(errors, ElementsAre("the disk is nearly full"));
+    EXPECT_THAT(errors, ElementsAre(HasSubstr("the disk is nearly full")));
     EXPECT_EQ(call::get(run->bus(), ServiceRun::kComputer, kComputerInterface, "OwnerContact"), "room 5");
     EXPECT_THAT(run->diary(), HasSubstr("115=room 4\n115=room 5\n"));
 }
@@ -137,7 +137,7 @@ HOST_TEST_F(ServiceWrites, ThatMakeANodeMakeAnObject) {
     });
     call::get(listener, ServiceRun::kRoot, call::kAgent, "Version");
     call::ask(run->bus(), ServiceRun::kPort + std::string("/ip_2dconfig_3aeth0"), call::kNode, "Write",
-              call::write(74, "2001:db8::5"));
+              call::write(74, "1"));
     ASSERT_TRUE(call::until(listener, [&] { return !added.empty(); }));
     EXPECT_THAT(added, ElementsAre(HasSubstr("network_2dport_3aeth1")));
     EXPECT_EQ(call::get(listener, added[0], call::kNode, "Class"), "network-port");
