@@ -28,8 +28,10 @@ const std::map<std::string, std::set<std::string>> kMayInclude = {
     {"agent/core", {"agent/core", "agent/shell", "framework"}},
     {"agent/verify", {"agent/verify", "agent/core", "hosttools", "framework"}},
     {"agent/bus", {"agent/bus"}},
-    {"agent/service", {"agent/service", "agent/bus", "agent/core", "agent/verify", "agent/shell", "framework"}},
-    {"agent/cli", {"agent/cli", "agent/core", "agent/verify", "agent/shell", "framework"}},
+    {"agent/history", {"agent/history", "agent/core"}},
+    {"agent/service",
+     {"agent/service", "agent/bus", "agent/core", "agent/history", "agent/verify", "agent/shell", "framework"}},
+    {"agent/cli", {"agent/cli", "agent/core", "agent/history", "agent/verify", "agent/shell", "framework"}},
     {"hosttools", {"hosttools"}},
     {"plugins/hardware", {"plugins/hardware", "framework"}},
 };
