@@ -9,6 +9,7 @@
 #include "agent/core/signals.h"
 #include "agent/service/log.h"
 #include "agent/service/manager.h"
+#include "agent/service/names.h"
 #include "agent/service/past.h"
 #include "agent/service/private_bus.h"
 #include "agent/service/service.h"
@@ -103,13 +104,23 @@ public:
         watchBus();
         loop_.run();
         sd_bus_detach_event(connection_.get());
-        connection_.flush();
+        leaveBus();
     }
     bool busLost() const { return busLost_; }
     int endedBy() const { return signal_; }
     void giveSignalsBack() { stop_.release(); }
 
 private:
+    /// When the bus has answered twice it has passed on what it was given before. A bus of our own ends next.
+    void leaveBus() const {
+        try {
+            connection_.releaseName(kBusName);
+            whoServes(connection_);
+        } catch (const bus::Error&) {
+            // It is gone.
+        }
+    }
+
     void takeSignals() {
         for (int signal = StopRequest::take(); signal != 0; signal = StopRequest::take()) {
             if (signal == SIGHUP) {
@@ -125,7 +136,7 @@ private:
 
     void endWhenWritten(std::chrono::steady_clock::time_point latest) {
         if (!service_->isWriting() || std::chrono::steady_clock::now() >= latest) {
-            loop_.stop();
+            loop_.mailbox()->post([this] { loop_.stop(); });  // behind the answer to the last write
             return;
         }
         writes_ = loop_.after(kLookForWrites, [this, latest] { endWhenWritten(latest); });

@@ -200,11 +200,15 @@ Arguments write(std::uint32_t property, const std::string& value) {
 
 bool until(bus::Connection& bus, const std::function<bool()>& condition) {
     const auto end = std::chrono::steady_clock::now() + 10s;
-    bus.process();
-    while (!condition() && std::chrono::steady_clock::now() < end) {
-        pollfd ready{bus.descriptor(), POLLIN, 0};
-        poll(&ready, 1, 10);
+    try {
         bus.process();
+        while (!condition() && std::chrono::steady_clock::now() < end) {
+            pollfd ready{bus.descriptor(), POLLIN, 0};
+            poll(&ready, 1, 10);
+            bus.process();
+        }
+    } catch (const bus::Error&) {
+        // The bus is gone; what came before counts.
     }
     return condition();
 }
