@@ -6,8 +6,9 @@
 
 #include "agent/cli/command_line.h"
 #include "agent/cli/commands/commands.h"
+#include "agent/cli/local_session.h"
 #include "agent/cli/print.h"
-#include "agent/cli/session.h"
+#include "agent/cli/remote/service.h"
 #include "agent/core/signals.h"
 
 namespace {
@@ -22,12 +23,29 @@ using Question = ExitStatus (*)(cvagent::Session& session, const Options& option
 constexpr std::array<Question, 6> kQuestions = {cvagent::commands::tree, cvagent::commands::get,
                                                 cvagent::commands::set, cvagent::commands::watch};
 
+/// The service's answer; nothing where there is none, or where it has ended before anything was done.
+std::optional<ExitStatus> askService(Question ask, Options& options) {
+    try {
+        if (const auto service = cvagent::remote::openSession(options)) {
+            options.byService = true;
+            return ask(*service, options);
+        }
+    } catch (const cvagent::remote::ServiceGone& gone) {
+        cvagent::complain(std::string(gone.what()) + "; cvagent looks by itself");
+        options.byService = false;
+    }
+    return std::nullopt;
+}
+
 ExitStatus run(Options& options, cvagent::WantMessages& wants) {
     const Question ask = options.verify ? cvagent::commands::verifyTree
                                         : kQuestions.at(static_cast<std::size_t>(options.command));
     if (ask != nullptr) {
+        if (const auto status = askService(ask, options)) {
+            return *status;
+        }
         const cvagent::PreparedProcess process(cvagent::processSettings(options));
-        cvagent::Session session(process, options, wants);
+        cvagent::LocalSession session(process, options, wants);
         return session.statusAfter(ask(session, options));
     }
     std::vector<std::string*> files;
@@ -67,7 +85,7 @@ ExitStatus runGuarded(Options& options, cvagent::WantMessages& wants) {
 ExitStatus runAndJudge(Options& options) {
     cvagent::WantMessages wants;
     const ExitStatus status = runGuarded(options, wants);
-    const bool wanting = options.command != Command::properties && wants.tell();
+    const bool wanting = !options.byService && options.command != Command::properties && wants.tell();
     const bool good = status == ExitStatus::done || status == ExitStatus::notFound;
     return wanting && good ? ExitStatus::failed : status;
 }

@@ -1,5 +1,6 @@
 #include "agent/service/values.h"
 
+#include <algorithm>
 #include <array>
 #include <atomic>
 #include <chrono>

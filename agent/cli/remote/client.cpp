@@ -89,7 +89,6 @@ bus::Message Client::call(const std::string& member) const {
 void Client::wait(Clock::time_point deadline) {
     pollfd stopped{stop_, POLLIN, 0};
     try {
-        connection_.process();
         const auto due = connection_.deadline().value_or(deadline);
         pollfd ready[] = {{connection_.descriptor(), connection_.events(), 0}, stopped};
         poll(ready, 2, millisecondsTo(std::min(due, deadline)));
