@@ -188,9 +188,6 @@ ExitStatus serve(Options& options, const Manager& manager, bus::Connection& conn
     if (daemon.busLost()) {
         throw Problem(Problem::failed, "the bus is gone");
     }
-    if (daemon.signal() != 0) {
-        StopSignals::die();
-    }
     return ExitStatus::done;
 }
 
@@ -208,9 +205,17 @@ ExitStatus runDaemon(Options& options) {
         options.bus = own->address();
         log(Priority::info, "a bus of its own: " + own->address());
     }
-    bus::Connection connection(options.bus);
-    refuseASecond(connection);
-    return serve(options, manager, connection);
+    ExitStatus status = ExitStatus::done;
+    {
+        bus::Connection connection(options.bus);
+        refuseASecond(connection);
+        status = serve(options, manager, connection);
+    }
+    own.reset();
+    if (StopSignals::received() != 0) {
+        StopSignals::die();
+    }
+    return status;
 }
 
 }  // namespace cvagent::service

@@ -109,9 +109,8 @@ std::string privateBusConfig(const std::string& socket, uid_t owner) {
             "    <allow send_requested_reply=\"true\" send_type=\"error\"/>\n"
             "    <allow receive_type=\"method_call\"/>\n    <allow receive_type=\"method_return\"/>\n"
             "    <allow receive_type=\"error\"/>\n    <allow receive_type=\"signal\"/>\n"
-            "    <deny eavesdrop=\"true\"/>\n"
             "    <allow send_destination=\"org.freedesktop.DBus\"/>\n"
-            "    <deny send_destination=\"org.freedesktop.DBus\" "
+            "    <deny send_destination=\"org.freedesktop.DBus\" send_interface=\"org.freedesktop.DBus\" "
             "send_member=\"UpdateActivationEnvironment\"/>\n    <allow send_destination=\"" +
             std::string(kBusName) + "\"/>\n  </policy>\n";
     for (const std::string& user : {std::string("0"), std::to_string(owner)}) {

@@ -28,8 +28,13 @@ bool isPlainUnsigned(const IC::Number& number) {
 }
 
 std::string typeOf(const IC::Number& number) {
-    static constexpr std::array kTypes = {"u", "u", "t", "b", "d", "d"};  // in the order of its kinds
-    return number.empty() ? "" : kTypes.at(number.kind());
+    static constexpr std::array kTypes = {"u", "u", "t", "b", "d", "x"};  // in the order of its kinds
+    if (number.empty()) {
+        return "";
+    }
+    const bool hasFraction =
+        number.kind() == IC::Number::scaled && number.toString().find('.') != std::string::npos;
+    return hasFraction ? "d" : kTypes.at(number.kind());
 }
 
 void putNumber(bus::Writer& writer, const IC::Number& number, std::string_view type) {
@@ -39,6 +44,8 @@ void putNumber(bus::Writer& writer, const IC::Number& number, std::string_view t
         writer.put(number.toDouble());
     } else if (type == "t") {
         writer.put(std::uint64_t{number.toUnsigned64()});
+    } else if (type == "x") {
+        writer.put(static_cast<std::int64_t>(number.toUnsigned64()));  // which wraps a negative one
     } else {
         writer.put(std::uint32_t{static_cast<unsigned int>(number)});
     }
@@ -49,7 +56,9 @@ std::string listType(const std::vector<IC::Number>& numbers) {
     std::string type = "u";
     for (const IC::Number& number : numbers) {
         const std::string own = typeOf(number);
-        if (own == "d" || (own == "t" && type == "u")) {
+        if (own == "d" || own == "x") {
+            type = "d";
+        } else if (own == "t" && type == "u") {
             type = own;
         }
     }
