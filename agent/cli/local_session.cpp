@@ -4,6 +4,7 @@
 #include <mutex>
 
 #include "agent/cli/event_printer.h"
+#include "agent/cli/kept_events.h"
 #include "agent/cli/print.h"
 #include "agent/core/catalogue_file.h"
 #include "agent/core/node_classes.h"
@@ -106,6 +107,7 @@ LocalSession::LocalSession(const PreparedProcess& process, const Options& option
     settings.commandTime = std::chrono::duration<double>(options.commandSeconds);
     settings.processors = options.processors;
     settings.tell = complain;
+    settings.keeper = eventKeeper();
     settings.alertTold = [alerts = alerts_](const Event& alert) { alerts->tell(alert); };
     hint(limitsOfUser(process.data()), "\nTo see everything run: sudo cvagent");
     hint(limitsOfData(process.data()));

@@ -27,7 +27,8 @@ const std::map<std::string, std::set<std::string>> kMayInclude = {
     {"agent/shell", {"agent/shell", "hosttools"}},
     {"agent/core", {"agent/core", "agent/shell", "framework"}},
     {"agent/verify", {"agent/verify", "agent/core", "hosttools", "framework"}},
-    {"agent/cli", {"agent/cli", "agent/core", "agent/verify", "agent/shell", "framework"}},
+    {"agent/history", {"agent/history", "agent/core"}},
+    {"agent/cli", {"agent/cli", "agent/core", "agent/history", "agent/verify", "agent/shell", "framework"}},
     {"hosttools", {"hosttools"}},
     {"plugins/hardware", {"plugins/hardware", "framework"}},
 };

@@ -9,7 +9,7 @@ namespace cvagent::commands {
 
 ExitStatus watch(Session& session, const Options& options) {
     print("");  // an output that is closed is told now, not at the first event
-    EventPrinter printer(session.subscribe({}), options.json);
+    EventPrinter printer(session.subscribe({}), options.json, shownMarks());
     std::optional<EventProgram> program;
     if (!options.program.empty()) {
         program.emplace(options.program, EventProgram::Seconds(options.programSeconds),
@@ -17,6 +17,7 @@ ExitStatus watch(Session& session, const Options& options) {
     }
     complain("watching " + std::to_string(session.countNodes()) + " nodes" +
              (options.seconds ? "" : "; Ctrl-C ends it"));
+    printer.printUnseen();
     const AlertsTo shown(session, [&printer](const Event&) { printer.printAll(); });
     printer.follow(options.seconds);
     session.end();
