@@ -34,6 +34,7 @@ public:
     WriteResult write(const NodeRef& node, const Property& row, const std::vector<std::string>& words,
                       const Request& request) override;
     std::shared_ptr<Subscription> subscribe(std::optional<Event::Kind> only) override;
+    std::shared_ptr<ShownMarks> marks() override { return shownMarks(); }
     std::size_t countNodes() override;
     void sendAlertsTo(std::function<void(const Event&)> receiver) override;
     void showErrors(const Request& request) override;

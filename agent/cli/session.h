@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "agent/cli/failure.h"
+#include "agent/cli/kept_events.h"
 #include "agent/core/event_log.h"
 #include "agent/core/node_ref.h"
 #include "agent/core/request.h"
@@ -42,6 +43,8 @@ public:
 
     /// Events from now on, and those that a local start brings.
     virtual std::shared_ptr<Subscription> subscribe(std::optional<Event::Kind> only) = 0;
+    /// What this user was shown of them before; null where nobody knows.
+    virtual std::shared_ptr<ShownMarks> marks() = 0;
     /// How many nodes those events are about.
     virtual std::size_t countNodes() = 0;
     /// From now on alerts go there, on whatever thread brings them, and not to standard error, and events of

@@ -9,7 +9,7 @@ namespace cvagent::commands {
 
 ExitStatus watch(Session& session, const Options& options) {
     print("");  // an output that is closed is told now, not at the first event
-    EventPrinter printer(session.subscribe({}), options.json, shownMarks());
+    EventPrinter printer(session.subscribe({}), options.json, session.marks());
     std::optional<EventProgram> program;
     if (!options.program.empty()) {
         program.emplace(options.program, EventProgram::Seconds(options.programSeconds),

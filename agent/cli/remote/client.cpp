@@ -61,7 +61,8 @@ Client::Client(const std::string& address, int stop) : connection_(opened(addres
         throw NoService("the service ended", true);
     }
     read(owned, [&user](bus::Reader& reader) { user = reader.number(); });
-    if (user != 0 && user != geteuid()) {
+    own_ = user == geteuid();
+    if (user != 0 && !own_) {
         throw NoService("the service on the bus belongs to user " + std::to_string(user) +
                             ", neither root nor you, and is not believed",
                         false);

@@ -41,6 +41,8 @@ public:
 
     /// The service's own name on the bus, ":1.23".
     const std::string& owner() const { return owner_; }
+    /// Whether it runs as this very user.
+    bool isOwn() const { return own_; }
     bus::Connection& connection() { return connection_; }
 
     /// A call of the agent's interface.
@@ -82,6 +84,7 @@ private:
     bus::Connection connection_;
     int stop_;
     std::string owner_;
+    bool own_ = false;
 };
 
 }  // namespace cvagent::remote

@@ -159,6 +159,10 @@ std::shared_ptr<Subscription> RemoteSession::subscribe(std::optional<Event::Kind
     return feed_->subscribe(only);
 }
 
+std::shared_ptr<ShownMarks> RemoteSession::marks() {
+    return client_->isOwn() ? shownMarks() : nullptr;
+}
+
 std::size_t RemoteSession::countNodes() {
     std::size_t count = 0;
     const bus::Message answer = client_->ask(client_->call("Tree"), Client::kShort);

@@ -27,6 +27,8 @@ public:
     WriteResult write(const NodeRef& node, const Property& row, const std::vector<std::string>& words,
                       const Request& request) override;
     std::shared_ptr<Subscription> subscribe(std::optional<Event::Kind> only) override;
+    /// The marks are beside the history, and only whose service it is has that before him.
+    std::shared_ptr<ShownMarks> marks() override;
     std::size_t countNodes() override;
     /// The service has told the alerts to its plug-ins' satisfaction: only who watches hears of them here.
     void sendAlertsTo(std::function<void(const Event&)> receiver) override;
