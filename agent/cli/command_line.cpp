@@ -18,7 +18,8 @@ constexpr const char* kDescription =
     "Shows and changes what the Corvista OS/hardware plug-in knows of this host.\n";
 constexpr const char* kFooter =
     "\nExit status: 0 done, 1 the plug-in or the host failed, 2 wrong usage, 3 no such node or property,\n"
-    "4 value refused, or not allowed, 5 another agent holds the data directory, or too much is asked at once.\n"
+    "4 value refused, or not allowed, 5 another agent holds the data directory, or too much is asked at "
+    "once.\n"
     "\nExamples:\n"
     "  cvagent tree\n"
     "  cvagent get network-port:eth0 LinkSpeed LinkState\n"
@@ -327,7 +328,8 @@ std::optional<Options> parseCommandLine(int count, const char* const* words) {
     try {
         app.parse(marked(count, words));
         unmark(options);
-        options.byItself = std::ranges::any_of(kOwnOptions, [&app](const char* name) { return app.count(name) > 0; });
+        options.byItself =
+            std::ranges::any_of(kOwnOptions, [&app](const char* name) { return app.count(name) > 0; });
         return options;
     } catch (const CLI::Success& help) {
         std::ostringstream text;

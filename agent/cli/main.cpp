@@ -24,11 +24,22 @@ using Question = ExitStatus (*)(cvagent::Session& session, const Options& option
 constexpr std::array<Question, 7> kQuestions = {cvagent::commands::tree, cvagent::commands::get,
                                                 cvagent::commands::set, cvagent::commands::watch};
 
+/// What a watch runs on alerts gets the surroundings that it has without a service.
+void prepareToAsk(Options& options) {
+    if (options.command == Command::watch) {
+        cvagent::prepareSurroundings({&options.program});
+    }
+    if (options.command == Command::watch || options.command == Command::set) {
+        cvagent::StopSignals::install();
+    }
+}
+
 /// The service's answer; nothing where there is none, or where it has ended before anything was done.
 std::optional<ExitStatus> askService(Question ask, Options& options) {
     try {
         if (const auto service = cvagent::remote::openSession(options)) {
             options.byService = true;
+            prepareToAsk(options);
             return ask(*service, options);
         }
     } catch (const cvagent::remote::ServiceGone& gone) {

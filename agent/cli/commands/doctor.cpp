@@ -106,7 +106,7 @@ std::string service(const Options& options, const Style& style) {
     const remote::ServiceReport report = remote::describeService(options);
     const std::string head = style.strong("SERVICE") + "\n  ";
     if (!report.problem.empty()) {
-        return head + printable(report.problem) + "; cvagent works by itself\n\n";
+        return head + printable(report.problem) + "\n\n";
     }
     return head + style.good("running") + ", version " + printable(report.version) + "\n  since " +
            report.since + ", last full look " + report.looked + "\n  read by everybody, written by " +
@@ -120,7 +120,8 @@ ExitStatus doctor(const Options& options) {
     StopSignals::install();
     const std::vector<ToolReport> reports =
         inspectHostTools(options.hostTools, Look::everything, adapterDirectory());
-    print(options.json ? json::tools(reports) : service(options, style) + plugins(options, style) + table(reports, style));
+    print(options.json ? json::tools(reports)
+                       : service(options, style) + plugins(options, style) + table(reports, style));
     return ExitStatus::done;
 }
 

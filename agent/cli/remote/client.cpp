@@ -17,7 +17,6 @@ namespace cvagent::remote {
 
 namespace {
 
-constexpr const char* kBus = "org.freedesktop.DBus";
 constexpr const char* kBusObject = "/org/freedesktop/DBus";
 constexpr const char* kProperties = "org.freedesktop.DBus.Properties";
 constexpr const char* kPeer = "org.freedesktop.DBus.Peer";
@@ -70,7 +69,7 @@ Client::Client(const std::string& address, int stop) : connection_(opened(addres
 }
 
 bus::Message Client::askBus(const char* member, const std::string& name) {
-    const bus::Message call = connection_.call({kBus, kBusObject, kBus, member});
+    const bus::Message call = connection_.newCall({kBusDriver, kBusObject, kBusDriver, member});
     bus::Writer(call).put(name);
     try {
         const bus::Message answer = answerTo(call, kShort);
@@ -84,7 +83,7 @@ bus::Message Client::askBus(const char* member, const std::string& name) {
 }
 
 bus::Message Client::call(const std::string& member) const {
-    return connection_.call({owner_, service::kRootObject, service::kAgentInterface, member});
+    return connection_.newCall({owner_, service::kRootObject, service::kAgentInterface, member});
 }
 
 void Client::wait(Clock::time_point deadline) {
@@ -107,8 +106,8 @@ void Client::wait(Clock::time_point deadline) {
 bus::Message Client::answerTo(const bus::Message& call, Seconds longest) {
     bus::Message answer;
     const auto deadline = Clock::now() + longest;
-    const bus::Slot waiting = connection_.askLater(
-        call, longest + Seconds(1), [&answer](const bus::Message& come) { answer = come; });
+    const bus::Slot waiting = connection_.askLater(call, longest + Seconds(1),
+                                                   [&answer](const bus::Message& come) { answer = come; });
     while (!answer && Clock::now() < deadline) {
         wait(deadline);
     }
@@ -143,7 +142,7 @@ bus::Message Client::askForLong(const bus::Message& call) {
             wait(look);
         }
         if (!answer) {
-            ask(connection_.call({owner_, service::kRootObject, kPeer, "Ping"}), kShort);
+            ask(connection_.newCall({owner_, service::kRootObject, kPeer, "Ping"}), kShort);
         }
     }
     checkAnswer(answer);
@@ -151,7 +150,7 @@ bus::Message Client::askForLong(const bus::Message& call) {
 }
 
 bus::Message Client::propertyCall(const std::string& name) const {
-    const bus::Message call = connection_.call({owner_, service::kRootObject, kProperties, "Get"});
+    const bus::Message call = connection_.newCall({owner_, service::kRootObject, kProperties, "Get"});
     bus::Writer(call).put(service::kAgentInterface).put(name);
     return call;
 }
@@ -185,14 +184,16 @@ void Client::failOtherVersion() {
         const bus::Message answer = answerTo(propertyCall("Version"), kShort);
         if (answer && !answer.isError()) {
             bus::Reader reader(answer);
-            reader.variant([&](const std::string& /*type*/) { version = "version " + inQuotes(reader.text()); });
+            reader.variant(
+                [&](const std::string& /*type*/) { version = "version " + inQuotes(reader.text()); });
         }
     } catch (const bus::Error&) {  // it has not even that
     }
-    throw Failure(ExitStatus::failed, "the service is " + version +
-                                          " and this is cvagent " CORVISTA_VERSION
-                                          ": they do not understand each other\nInstall both from one package "
-                                          "and restart the service: systemctl restart cvagentd");
+    throw Failure(ExitStatus::failed,
+                  "the service is " + version +
+                      " and this is cvagent " CORVISTA_VERSION
+                      ": they do not understand each other\nInstall both from one package "
+                      "and restart the service: systemctl restart cvagentd");
 }
 
 }  // namespace cvagent::remote

@@ -10,6 +10,9 @@
 
 namespace cvagent::remote {
 
+/// The bus itself.
+inline constexpr const char* kBusDriver = "org.freedesktop.DBus";
+
 /// There is no service, or none that could be believed.
 class NoService : public std::runtime_error {
 public:
@@ -69,8 +72,8 @@ public:
         }
     }
     [[noreturn]] void failOtherVersion();
-    /// Waits until something comes or the time is over, at most an hour; handles what came. Throws ServiceGone
-    /// when the bus is gone.
+    /// Waits until something comes or the time is over, at most an hour; handles what came. Throws
+    /// ServiceGone when the bus is gone.
     void wait(std::chrono::steady_clock::time_point deadline);
 
 private:

@@ -22,15 +22,13 @@ constexpr std::size_t kMostPending = 4096;
 constexpr std::size_t kMostOfOneAnswer = 512;
 constexpr int kPauseMilliseconds = 500;  // between two attempts to reach a service that is away
 
-constexpr const char* kBus = "org.freedesktop.DBus";
-
 std::string eventsOf(const std::string& owner) {
-    return "type='signal',sender='" + owner + "',interface='" + service::kAgentInterface +
-           "',member='Event'";
+    return "type='signal',sender='" + owner + "',interface='" + service::kAgentInterface + "',member='Event'";
 }
 
 std::string endOf(const std::string& owner) {
-    return std::string("type='signal',sender='") + kBus + "',member='NameOwnerChanged',arg0='" + owner + "'";
+    return std::string("type='signal',sender='") + kBusDriver + "',member='NameOwnerChanged',arg0='" + owner +
+           "'";
 }
 
 }  // namespace
@@ -96,7 +94,7 @@ void EventFeed::follow(Client& client) {
         eventsOf(client.owner()),
         [this, &client](const bus::Message& signal) { signalled(client.owner(), signal); });
     const bus::Slot end = client.connection().match(
-        endOf(client.owner()), [&gone](const bus::Message& signal) { gone = signal.sender() == kBus; });
+        endOf(client.owner()), [&gone](const bus::Message& signal) { gone = signal.sender() == kBusDriver; });
     if (client.numberProperty("LastEvent") < last_) {
         last_ = 0;  // one that keeps no history counts anew
     }

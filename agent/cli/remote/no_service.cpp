@@ -10,7 +10,7 @@ constexpr const char* kNone = "this cvagent was built without the service";
 
 }  // namespace
 
-std::unique_ptr<Session> openSession(Options& options) {
+std::unique_ptr<Session> openSession(const Options& options) {
     if (options.bus && *options.bus != "none") {
         complain(std::string(kNone) + " and works by itself");
     }

@@ -26,20 +26,11 @@ WriteResult::Outcome outcomeOf(const std::string& verdict) {
                                   : WriteResult::notKnown;
 }
 
-/// The nodes that a name is found by store it, so that a path is put together here as it is there.
-void store(IC::MutableNode& node, const std::vector<Reading>& readings) {
-    for (const Reading& reading : readings) {
-        if (!reading.value.empty()) {
-            node.setProperty(reading.id, reading.value);
-        }
-    }
-}
-
 }  // namespace
 
 /// A class that the program does not know is one of a plug-in that brings its own names.
-void RemoteSession::learnClasses(const std::vector<Handle>& nodes) {
-    const auto isStrange = [](const Handle& node) { return findClass(node->nodeType()) == nullptr; };
+void RemoteSession::learnClasses(const std::vector<NodeCopy>& nodes) {
+    const auto isStrange = [](const NodeCopy& node) { return findClass(node.type) == nullptr; };
     if (std::ranges::none_of(nodes, isStrange)) {
         return;
     }
@@ -54,7 +45,7 @@ void RemoteSession::learnClasses(const std::vector<Handle>& nodes) {
 }
 
 Session::Tree RemoteSession::tree(const Request& /*request*/) {
-    std::vector<Handle> nodes;
+    std::vector<NodeCopy> nodes;
     Tree whole;
     const bus::Message answer = client_->ask(client_->call("Tree"), Client::kShort);
     client_->read(answer, [&](bus::Reader& reader) {
@@ -68,9 +59,8 @@ Session::Tree RemoteSession::tree(const Request& /*request*/) {
     });
     learnClasses(nodes);
     for (std::size_t i = 0; i < nodes.size(); ++i) {
-        findRows(whole.readings[i], nodes[i]->nodeType());
-        store(*nodes[i], whole.readings[i]);
-        whole.nodes.push_back(NodeCopy::refTo(nodes[i]));
+        findRows(whole.readings[i], nodes[i].type);
+        whole.nodes.push_back(nodes[i].reference(whole.readings[i]));
     }
     if (whole.plugins.empty()) {
         client_->failOtherVersion();
@@ -81,13 +71,13 @@ Session::Tree RemoteSession::tree(const Request& /*request*/) {
 NodeRef RemoteSession::find(const std::string& word) {
     const bus::Message call = client_->call("Find");
     bus::Writer(call).put(word);
-    Handle node;
+    NodeCopy node;
     const bus::Message answer = client_->ask(call, Client::kShort);
     client_->read(answer, [&node](bus::Reader& reader) {
         reader.structure(kNodeContents, [&] { node = takeNode(reader); });
     });
     learnClasses({node});
-    return NodeCopy::refTo(node);
+    return node.reference();
 }
 
 std::vector<Reading> RemoteSession::read(const NodeRef& node, const std::vector<std::string>& properties,

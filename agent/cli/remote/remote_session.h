@@ -39,8 +39,7 @@ public:
     ExitStatus statusAfter(ExitStatus own) const override { return own; }
 
 private:
-    void learnClasses(const std::vector<Handle>& nodes);
-    void readCatalogues(const std::vector<std::string>& plugins);
+    void learnClasses(const std::vector<NodeCopy>& nodes);
     bus::Message writeCall(const NodeRef& node, const Property& row, const std::vector<std::string>& words);
 
     std::unique_ptr<Client> client_;

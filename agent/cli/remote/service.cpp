@@ -2,12 +2,14 @@
 
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstdlib>
+#include <string>
+#include <utility>
+#include <vector>
 
 #include "agent/cli/print.h"
 #include "agent/cli/remote/remote_session.h"
-#include "agent/core/signals.h"
-#include "agent/core/surroundings.h"
 #include "agent/core/text.h"
 
 namespace cvagent::remote {
@@ -17,23 +19,40 @@ namespace {
 constexpr const char* kBusVariable = "CORVISTA_BUS";
 constexpr std::uint64_t kMicroseconds = 1000000;
 
-/// "none" for none.
-std::string addressOf(const Options& options) {
-    if (options.bus) {
-        return *options.bus;
-    }
+/// Where cvagentd --private-bus has its own, on hosts without a system bus.
+constexpr const char* kPrivateBus = "unix:path=/run/corvista/bus";
+
+/// In the order in which they are asked.
+std::vector<std::string> addressesOf(const Options& options) {
     const char* named = std::getenv(kBusVariable);
-    return named != nullptr && *named != '\0' ? named : "system";
+    const std::string address = options.bus ? *options.bus : named != nullptr ? named : "";
+    if (address == "none") {
+        return {};
+    }
+    return address.empty() ? std::vector<std::string>{"system", kPrivateBus} : std::vector{address};
 }
 
-/// Programs that are run on alerts get the surroundings that those of a local session get.
-void prepare(Options& options) {
-    if (options.command == Command::watch) {
-        prepareSurroundings({&options.program});
+struct Reached {
+    std::unique_ptr<Client> client;
+    std::string address;
+    std::string why;  ///< there is no client; "" for nothing to tell
+};
+
+Reached reach(const Options& options) {
+    Reached reached;
+    bool silent = !options.bus;
+    for (const std::string& address : addressesOf(options)) {
+        try {
+            reached.client = std::make_unique<Client>(address);
+            reached.address = address;
+            return reached;
+        } catch (const NoService& none) {
+            silent = silent && none.isSilent();
+            reached.why = reached.why.empty() || !none.isSilent() ? none.what() : reached.why;
+        }
     }
-    if (options.command == Command::watch || options.command == Command::set) {
-        StopSignals::install();
-    }
+    reached.why = silent ? "" : reached.why;
+    return reached;
 }
 
 std::string timeOf(std::uint64_t microseconds) {
@@ -42,38 +61,37 @@ std::string timeOf(std::uint64_t microseconds) {
 
 }  // namespace
 
-std::unique_ptr<Session> openSession(Options& options) {
-    const std::string address = addressOf(options);
-    if (options.byItself || address == "none") {
+std::unique_ptr<Session> openSession(const Options& options) {
+    if (options.byItself) {
         return nullptr;
     }
-    try {
-        auto client = std::make_unique<Client>(address);
-        prepare(options);
-        return std::make_unique<RemoteSession>(std::move(client), address, isatty(STDIN_FILENO) == 1);
-    } catch (const NoService& none) {
-        if (options.bus || !none.isSilent()) {
-            complain(std::string(none.what()) + "; cvagent works by itself");
-        }
-        return nullptr;
+    Reached reached = reach(options);
+    if (reached.client) {
+        return std::make_unique<RemoteSession>(std::move(reached.client), reached.address,
+                                               isatty(STDIN_FILENO) == 1);
     }
+    if (!reached.why.empty()) {
+        complain(reached.why + "; cvagent works by itself");
+    }
+    return nullptr;
 }
 
 ServiceReport describeService(const Options& options) {
     ServiceReport report;
-    const std::string address = addressOf(options);
-    if (address == "none") {
-        report.problem = "not asked";
-        return report;
-    }
     try {
-        Client client(address);
+        const Reached reached = reach(options);
+        if (!reached.client) {
+            report.problem = reached.why.empty() ? "not running: cvagent works by itself" : reached.why;
+            return report;
+        }
+        Client& client = *reached.client;
         report.version = client.textProperty("Version");
         report.since = timeOf(client.numberProperty("StartedAt"));
         report.looked = timeOf(client.numberProperty("LookedAt"));
         report.consent = client.textProperty("Consent");
-    } catch (const std::runtime_error& error) {  // NoService, ServiceGone, Failure, Problem
+    } catch (const std::runtime_error& error) {  // Failure, ServiceGone, Problem
         report.problem = error.what();
+        report.problem.erase(std::min(report.problem.find('\n'), report.problem.size()));  // advice
     }
     return report;
 }

@@ -145,17 +145,16 @@ void takeCodes(bus::Reader& reader, Event& event) {
 
 }  // namespace
 
-Handle takeNode(bus::Reader& reader) {
-    const std::uint32_t id = reader.number();
-    const std::uint32_t parent = reader.number();
-    const std::uint32_t type = reader.number();
-    const std::uint32_t index = reader.number();
-    auto node = std::make_shared<IC::MutableNode>(id, parent, std::vector<unsigned int>(), type, index);
+NodeCopy takeNode(bus::Reader& reader) {
+    NodeCopy node;
+    for (unsigned int* number : {&node.id, &node.parent, &node.type, &node.index}) {
+        *number = reader.number();
+    }
     reader.path();
     reader.text();  // its class, which the type tells
-    node->setPath(reader.text());
-    node->setDescription(reader.text());
-    node->setStatus(reader.number());
+    node.path = reader.text();
+    node.description = reader.text();
+    node.status = reader.number();
     return node;
 }
 

@@ -6,17 +6,8 @@
 
 #include "agent/bus/reader.h"
 #include "agent/core/event.h"
-#include "agent/core/node_ref.h"
+#include "agent/core/node_copy.h"
 #include "agent/core/reading.h"
-
-namespace cvagent {
-
-/// A node of the service's, as this process has built it up again: it shows what the service has told.
-struct NodeCopy {
-    static NodeRef refTo(Handle node) { return {nullptr, std::move(node)}; }
-};
-
-}  // namespace cvagent
 
 /// The agent's values as they stand in the service's messages; packaging/com.vantrel.Corvista1.xml describes
 /// them. All throw bus::Error when something else is there.
@@ -25,7 +16,7 @@ namespace cvagent::remote {
 inline constexpr const char* kNodeContents = "uuuuosssu";
 
 /// What a structure of a node begins with.
-Handle takeNode(bus::Reader& reader);
+NodeCopy takeNode(bus::Reader& reader);
 /// Their rows of the catalogue are still to be found: it may have to be read first.
 std::vector<Reading> takeReadings(bus::Reader& reader);
 Reading takeReading(bus::Reader& reader);
