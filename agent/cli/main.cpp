@@ -1,7 +1,9 @@
 #include <array>
+#include <chrono>
 #include <exception>
 #include <optional>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include "agent/cli/caller.h"
@@ -24,28 +26,47 @@ using Question = ExitStatus (*)(cvagent::Session& session, const Options& option
 constexpr std::array<Question, 7> kQuestions = {cvagent::commands::tree, cvagent::commands::get,
                                                 cvagent::commands::set, cvagent::commands::watch};
 
+constexpr int kAttempts = 10;  // to ask a service that has ended
+constexpr std::chrono::milliseconds kBetweenAttempts{100};
+
+bool onlyReads(const Options& options) {
+    return options.command != Command::watch && options.command != Command::set;
+}
+
 /// What a watch runs on alerts gets the surroundings that it has without a service.
 void prepareToAsk(Options& options) {
     if (options.command == Command::watch) {
         cvagent::prepareSurroundings({&options.program});
     }
-    if (options.command == Command::watch || options.command == Command::set) {
+    if (!onlyReads(options)) {
         cvagent::StopSignals::install();
     }
 }
 
-/// The service's answer; nothing where there is none, or where it has ended before anything was done.
+/// The service's answer; nothing where there is none. One that ends in the middle of an answer is mostly
+/// started again, and would be in the way of an agent of this process.
 std::optional<ExitStatus> askService(Question ask, Options& options) {
-    try {
-        if (const auto service = cvagent::remote::openSession(options)) {
-            options.byService = true;
-            prepareToAsk(options);
-            return ask(*service, options);
+    std::string gone;
+    for (int attempt = 0; attempt < kAttempts; ++attempt) {
+        try {
+            if (const auto service = cvagent::remote::openSession(options, attempt > 0)) {
+                options.byService = true;
+                prepareToAsk(options);
+                return ask(*service, options);
+            }
+        } catch (const cvagent::remote::ServiceGone& ended) {
+            gone = ended.what();
+            if (!onlyReads(options)) {
+                throw cvagent::Failure(ExitStatus::failed, gone + "; nothing was done");
+            }
         }
-    } catch (const cvagent::remote::ServiceGone& gone) {
-        cvagent::complain(std::string(gone.what()) + "; cvagent looks by itself");
         options.byService = false;
+        if (gone.empty()) {
+            return std::nullopt;
+        }
+        std::this_thread::sleep_for(kBetweenAttempts);
     }
+    cvagent::complain(gone + "; cvagent looks by itself");
     return std::nullopt;
 }
 

@@ -61,7 +61,7 @@ std::string timeOf(std::uint64_t microseconds) {
 
 }  // namespace
 
-std::unique_ptr<Session> openSession(const Options& options) {
+std::unique_ptr<Session> openSession(const Options& options, bool silent) {
     if (options.byItself) {
         return nullptr;
     }
@@ -70,7 +70,7 @@ std::unique_ptr<Session> openSession(const Options& options) {
         return std::make_unique<RemoteSession>(std::move(reached.client), reached.address,
                                                isatty(STDIN_FILENO) == 1);
     }
-    if (!reached.why.empty()) {
+    if (!silent && !reached.why.empty()) {
         complain(reached.why + "; cvagent works by itself");
     }
     return nullptr;

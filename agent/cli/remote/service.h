@@ -20,7 +20,8 @@ public:
 /// A session with the service; null when the command is worked by this process: by the options, or since no
 /// service runs that could be believed, which is told where somebody has named a bus. Throws Failure of one
 /// that does not answer.
-std::unique_ptr<Session> openSession(const Options& options);
+/// @param silent nothing is told
+std::unique_ptr<Session> openSession(const Options& options, bool silent = false);
 
 struct ServiceReport {
     std::string problem;  ///< why there is none; the rest is empty then
