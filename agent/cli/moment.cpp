@@ -8,6 +8,7 @@
 #include "agent/core/text.h"
 #include "framework/qx/whole_number.h"
 #include "framework/qx/date_time.h"
+#include "framework/qx/whole_number.h"
 
 namespace cvagent {
 
