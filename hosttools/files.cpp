@@ -55,7 +55,8 @@ std::vector<std::string> listDirectory(const std::string& path) {
     const std::unique_ptr<DIR, int (*)(DIR*)> directory(opendir(path.c_str()), closedir);
     if (!directory) return names;
     while (const dirent* entry = readdir(directory.get())) {
-        if (entry->d_name[0] != '.') names.emplace_back(entry->d_name);
+        const std::string_view name = entry->d_name;
+        if (name != "." && name != "..") names.emplace_back(name);
     }
     return names;
 }

@@ -19,7 +19,7 @@ std::uint64_t readNumber(const std::string& path, std::uint64_t fallback = 0);
 std::optional<std::uint64_t> takeNumber(std::string_view& text, int base = 10);
 /// The same, whatever follows it.
 std::optional<std::uint64_t> parseNumber(std::string_view text, int base = 10);
-/// The names in a directory without those that begin with a dot, in no order; none when it cannot be read.
+/// The names in a directory but for "." and "..", in no order; none when it cannot be read.
 std::vector<std::string> listDirectory(const std::string& path);
 
 /// Takes the next line off the front of text; the line comes without its newline.

@@ -23,8 +23,12 @@ bool isLetter(char c) {
     return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z');
 }
 
+bool isHexDigit(char c) {
+    return isDigit(c) || (c >= 'a' && c <= 'f') || (c >= 'A' && c <= 'F');
+}
+
 bool isHexOrColon(char c) {
-    return isDigit(c) || (c >= 'a' && c <= 'f') || (c >= 'A' && c <= 'F') || c == ':' || c == '.';
+    return isHexDigit(c) || c == ':' || c == '.';
 }
 
 Value asText(Words words, bool good) {
@@ -83,6 +87,14 @@ bool isLabel(std::string_view text) {
                        [](char c) { return isDigit(c) || isLetter(c) || c == '-'; });
 }
 
+/// In digits, or in the hexadecimal ones behind 0x.
+bool isNumber(std::string_view label) {
+    const bool isHex = label.starts_with("0x") || label.starts_with("0X");
+    label.remove_prefix(isHex ? 2 : 0);
+    return std::ranges::all_of(label, isDigit) || (isHex && std::ranges::all_of(label, isHexDigit));
+}
+
+/// A resolver takes a name that ends in a number for an address: 10.0.0.07 is 10.0.0.7.
 bool isDomain(std::string_view text) {
     if (text.size() > kLongestDomain) {
         return false;
@@ -93,7 +105,7 @@ bool isDomain(std::string_view text) {
         }
         text.remove_prefix(dot + 1);
     }
-    return isLabel(text);
+    return isLabel(text) && !isNumber(text);
 }
 
 /// One empty word stands for the empty list.

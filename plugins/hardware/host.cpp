@@ -90,12 +90,7 @@ std::optional<unsigned long long> Host::number(const std::string& path) const {
 
 std::optional<long long> Host::signedNumber(const std::string& path) const {
     const std::optional<std::string> first = line(path);
-    const bool negative = first && first->starts_with('-');
-    const auto value = first ? asNumber(first->substr(negative ? 1 : 0)) : std::nullopt;
-    if (!value || *value > static_cast<unsigned long long>(INT64_MAX)) {
-        return std::nullopt;
-    }
-    return negative ? -static_cast<long long>(*value) : static_cast<long long>(*value);
+    return first ? asSigned(*first) : std::nullopt;
 }
 
 std::optional<bool> Host::flag(const std::string& path) const {
@@ -188,6 +183,15 @@ std::optional<unsigned long long> asNumber(const std::string& text) {
     const bool hexadecimal = text.starts_with("0x");
     return QX::wholeNumber<unsigned long long>(std::string_view(text).substr(hexadecimal ? 2 : 0),
                                                hexadecimal ? 16 : 10);
+}
+
+std::optional<long long> asSigned(const std::string& text) {
+    const bool negative = text.starts_with('-');
+    const auto value = asNumber(text.substr(negative ? 1 : 0));
+    if (!value || *value > static_cast<unsigned long long>(INT64_MAX)) {
+        return std::nullopt;
+    }
+    return negative ? -static_cast<long long>(*value) : static_cast<long long>(*value);
 }
 
 }  // namespace hardware

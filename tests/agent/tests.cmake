@@ -63,9 +63,10 @@ target_compile_definitions(agent_lifetime_test PRIVATE ${agent_test_programs})
 add_dependencies(agent_lifetime_test fake_plugin vantrelcvicoshwmi)
 
 # The tree on links of a real kernel, with our own adapters as a user's cvagent picks them.
-corvista_test(agent_kernel_tree LIBRARIES test_support SOURCES
+corvista_test(agent_kernel_tree LIBRARIES agent_verify test_support SOURCES
   agent/kernel_told.cpp
-  agent/kernel_tree_test.cpp)
+  agent/kernel_tree_test.cpp
+  agent/verify_test.cpp)
 target_compile_definitions(agent_kernel_tree_test PRIVATE ${agent_test_programs})
 add_dependencies(agent_kernel_tree_test cvagent vantrelcvicoshwmi corvista-hosttools)
 

@@ -6,13 +6,10 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <filesystem>
-#include <fstream>
-#include <iterator>
-#include <optional>
-#include <system_error>
+#include <sstream>
 
 #include "agent/core/environment.h"
+#include "agent/core/host_file.h"
 #include "agent/core/oshw/tables.h"
 #include "agent/core/text.h"
 #include "framework/ic/link_state.h"
@@ -28,19 +25,6 @@ constexpr const char* kHostNameFile = "/etc/HOSTNAME";
 constexpr int kDaylightSaving = 60;  // minutes
 
 using Texts = std::vector<std::string>;
-
-/// Nothing but a regular file is opened: another one could keep the reader waiting.
-std::optional<std::string> contentOf(const std::string& path) {
-    std::error_code unknown;
-    std::ifstream file;
-    if (std::filesystem::is_regular_file(path, unknown)) {
-        file.open(path);
-    }
-    if (!file.is_open()) {
-        return std::nullopt;
-    }
-    return std::string(std::istreambuf_iterator<char>(file), {});
-}
 
 std::string firstLineOf(const std::string& path) {
     const std::string content = contentOf(path).value_or("");
