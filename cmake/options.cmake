@@ -25,9 +25,9 @@ if(CORVISTA_SANITIZE)
   add_link_options(-fsanitize=${CORVISTA_SANITIZE})
 endif()
 
-# One object library a room: the plug-in is linked from them, and so are the tests of that room.
-function(corvista_room name)
-  add_library(room_${name} OBJECT ${ARGN})
-  target_link_libraries(room_${name} PUBLIC corvista_framework PRIVATE corvista_options)
-  set_property(GLOBAL APPEND PROPERTY CORVISTA_ROOMS room_${name})
+# One object library a component: the plug-in is linked from them, and so are the tests of that component.
+function(corvista_component name)
+  add_library(component_${name} OBJECT ${ARGN})
+  target_link_libraries(component_${name} PUBLIC corvista_framework PRIVATE corvista_options)
+  set_property(GLOBAL APPEND PROPERTY CORVISTA_COMPONENTS component_${name})
 endfunction()

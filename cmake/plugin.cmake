@@ -1,8 +1,8 @@
-# The plug-in: every room in one shared library that exports OpenMI and the processor builder, nothing else.
-get_property(rooms GLOBAL PROPERTY CORVISTA_ROOMS)
+# The plug-in: every component in one shared library that exports OpenMI and the processor builder, nothing else.
+get_property(components GLOBAL PROPERTY CORVISTA_COMPONENTS)
 set(objects)
-foreach(room ${rooms})
-  list(APPEND objects $<TARGET_OBJECTS:${room}>)
+foreach(component ${components})
+  list(APPEND objects $<TARGET_OBJECTS:${component}>)
 endforeach()
 add_library(vantrelcvicoshwmi SHARED ${objects})
 target_link_libraries(vantrelcvicoshwmi PRIVATE corvista_framework)

@@ -27,7 +27,7 @@ struct StaticTree {
 /// The id of a node that another one is to hang under. Throws when there is none.
 unsigned int idOf(const MutableNode* parent);
 
-/// The tree of nodes, and what the builders of all rooms need of it and of each other.
+/// The tree of nodes, and what the builders of all components need of it and of each other.
 class NodeTree : public ManagementInterface {
 public:
     using ManagementInterface::alertHandler;

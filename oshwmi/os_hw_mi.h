@@ -10,7 +10,8 @@
 namespace IC {
 
 /// The plug-in object: builds the tree of the host's nodes, starts and stops the monitors. It is the tree and
-/// the builders of all rooms in one; each room has the members that build its nodes, and what they keep.
+/// the builders of all components in one; each component has the members that build its nodes, and what they
+/// keep.
 class OsHwMI : public NodeTree,
                public ComputerBuilder,
                public NetworkBuilder,

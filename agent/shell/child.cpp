@@ -178,6 +178,7 @@ Child::End Child::wait() {
         return end_;  // somebody else has waited for it
     }
     const bool signalled = WIFSIGNALED(status);
+    end_.waited = status;
     end_.status = signalled ? kSignalStatus + WTERMSIG(status) : WEXITSTATUS(status);
     end_.forced = running_->cutOff || (running_->forced && signalled && WTERMSIG(status) == SIGKILL);
     return end_;

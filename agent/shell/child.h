@@ -48,6 +48,7 @@ public:
     struct End {
         int status = 0;       ///< as a shell tells it: above 128 the signal that ended it
         bool forced = false;  ///< it was ended through noteKill, or cut off
+        int waited = 0;       ///< as waitpid tells it
     };
     /// Waits for its end. Without a process it is that of one that did nothing.
     End wait();

@@ -87,11 +87,25 @@ Outcome Command::begin() noexcept {
     }
 }
 
+Outcome Command::beginInShell() noexcept {
+    try {
+        inShell_ = true;
+        plan_.clear();
+        plan_.emplace_back().text = text_;
+        next_ = plan_.size();
+        current_ = std::make_unique<PipelineRun>(text_, standardOutput_);
+        return current_->startInShell(plan_.front());
+    } catch (const std::exception&) {
+        return {Outcome::failed, ENOMEM};
+    }
+}
+
 void Command::endCurrent(bool unread) {
     if (current_ != nullptr) {
         const Child::End end = current_->finish(unread);
         current_.reset();
         status_ = end.status;
+        waited_ = end.waited;
         killed_ = killed_ || end.forced;
     }
 }
@@ -133,7 +147,10 @@ int Command::finish() noexcept {
         current_.reset();
         status_ = kShellFailure;
     }
-    return killed_ ? SIGKILL : static_cast<int>(static_cast<unsigned>(status_) << kStatusShift);
+    if (killed_) {
+        return SIGKILL;
+    }
+    return inShell_ ? waited_ : static_cast<int>(static_cast<unsigned>(status_) << kStatusShift);
 }
 
 }  // namespace cvagent::shell

@@ -21,6 +21,8 @@ public:
     /// Starts its first tool, and before that does what comes before it.
     /// @return refused: nothing was done, and a shell is to run it
     Outcome begin() noexcept;
+    /// Has a shell run all of it.
+    Outcome beginInShell() noexcept;
     /// The next bytes of its output. Waits until there are some.
     /// @return how many; 0 at the end
     ssize_t read(char* buffer, std::size_t size) noexcept;
@@ -42,7 +44,9 @@ private:
     std::string pending_;
     bool ended_ = false;  ///< its output was read to the end
     bool killed_ = false;
+    bool inShell_ = false;
     int status_ = 0;
+    int waited_ = 0;  ///< of the last process, as waitpid tells it
 };
 
 }  // namespace cvagent::shell

@@ -201,7 +201,7 @@ FirstStage startProcess(const FirstStageRequest& request, const std::string& pat
         return {{Outcome::failed, error}};
     }
     if (error != 0) {
-        return refused();
+        return {{Outcome::refused, error}};
     }
     ProcessSource* const started = process.get();
     return {{}, std::move(process), started};
@@ -233,7 +233,11 @@ FirstStage startFirstStage(const FirstStageRequest& request, ProgramSearch& prog
 
 FirstStage startShell(const FirstStageRequest& request, const std::string& text,
                       const std::string& argument) {
-    return startProcess(request, "/bin/sh", {"sh", "-c", "--", text, "sh", argument});
+    std::vector<std::string> words{"sh", "-c", "--", text};
+    if (!argument.empty()) {
+        words.insert(words.end(), {"sh", argument});
+    }
+    return startProcess(request, "/bin/sh", std::move(words));
 }
 
 }  // namespace cvagent::shell

@@ -14,7 +14,7 @@ namespace cvagent::shell {
 struct Outcome {
     enum Kind {
         started,
-        refused,  ///< for a shell to run
+        refused,  ///< for a shell to run; of a shell: there is none
         failed    ///< the system has no room for another process
     };
     Kind kind = started;

@@ -11,6 +11,7 @@
 #include <set>
 
 #include "agent/shell/command.h"
+#include "agent/shell/starts.h"
 
 namespace cvagent::shell {
 
@@ -55,6 +56,23 @@ FILE* makeStream(std::unique_ptr<Command> command) {
     return stream;
 }
 
+/// @return nothing with errno when it cannot be begun this way; null with errno when the system has no room
+/// for it
+std::optional<FILE*> openedBy(const char* text, Outcome (Command::*begin)() noexcept) {
+    try {
+        auto command = std::make_unique<Command>(text, -1);
+        const Outcome outcome = (command.get()->*begin)();
+        errno = outcome.error;
+        if (outcome.kind == Outcome::refused) {
+            return std::nullopt;
+        }
+        return outcome.kind == Outcome::failed ? nullptr : makeStream(std::move(command));
+    } catch (const std::exception&) {
+        errno = ENOMEM;
+        return nullptr;
+    }
+}
+
 }  // namespace
 
 void leaveAllToShell(bool all) {
@@ -62,24 +80,15 @@ void leaveAllToShell(bool all) {
 }
 
 std::optional<FILE*> openCommand(const char* command) {
-    if (allToShell) {
-        return std::nullopt;
+    return allToShell ? std::nullopt : openedBy(command, &Command::begin);
+}
+
+FILE* openInShell(const char* command) {
+    const auto stream = openedBy(command, &Command::beginInShell);
+    if (!stream) {
+        countNotStarted(errno);
     }
-    try {
-        auto made = std::make_unique<Command>(command, -1);
-        const Outcome outcome = made->begin();
-        if (outcome.kind == Outcome::refused) {
-            return std::nullopt;
-        }
-        if (outcome.kind == Outcome::failed) {
-            errno = outcome.error;
-            return nullptr;
-        }
-        return makeStream(std::move(made));
-    } catch (const std::exception&) {
-        errno = ENOMEM;
-        return nullptr;
-    }
+    return stream.value_or(nullptr);
 }
 
 std::optional<int> closeCommand(FILE* stream) {

@@ -13,7 +13,11 @@ void leaveAllToShell(bool all);
 /// @return nothing when it is for a shell to run; null with errno when the system has no room for it
 std::optional<FILE*> openCommand(const char* command);
 
-/// Ends what openCommand gave, as pclose does.
+/// Has a shell run it, as popen(command, "r") does; what is left behind with its pipe can be cut off.
+/// @return null with errno when there is no process for it
+FILE* openInShell(const char* command);
+
+/// Ends what these gave, as pclose does.
 /// @return nothing for a stream that is not from there
 std::optional<int> closeCommand(FILE* stream);
 

@@ -35,7 +35,7 @@ HOST_TEST(CommandDeadline, EndsAPipelineThatHangsAndTellsItsReader) {
 /// What it has left behind keeps its pipe open.
 HOST_TEST(CommandDeadline, EndsTheReadingOfACommandThatHasEnded) {
     host.tool("leaver", ToolAnswer{.out = "half\n", .action = "sleep 1000 &"});
-    for (const char* const command : {"leaver", "leaver | cat"}) {
+    for (const char* const command : {"leaver", "leaver | cat", "leaver $NONE"}) {
         const CommandDeadline deadline(0.3s, cvagent::complain);
         const CommandScope scope(CommandScope::read);
         EXPECT_EQ(shell(command).status, kKilled) << command;

@@ -27,6 +27,7 @@
 // CORVISTA_FAKE_PLUGIN_HOLD names a file: while it is there, what waits for it hangs.
 // CORVISTA_FAKE_PLUGIN_DIARY names a file that gets a line for each write and for the unload.
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -74,6 +75,26 @@ std::string outputOf(const char* command) {
     FILE* const pipe = popen(command, "r");
     const bool told = pipe != nullptr && fgets(word.data(), word.size(), pipe) != nullptr;
     return pipe == nullptr || pclose(pipe) != 0 || !told ? "nothing" : word.data();
+}
+
+/// How many descriptors are pipes that have all of these flags.
+int pipesWith(int flags, int mask) {
+    int count = 0;
+    for (int descriptor = 3; descriptor < 256; ++descriptor) {
+        struct stat file {};
+        const bool pipe = fstat(descriptor, &file) == 0 && S_ISFIFO(file.st_mode);
+        count += pipe && (fcntl(descriptor, F_GETFD) & mask) == flags ? 1 : 0;
+    }
+    return count;
+}
+
+int openPipes() {
+    return pipesWith(0, 0);
+}
+
+/// Those that a program gets that is started now.
+int pipesHandedOn() {
+    return pipesWith(0, FD_CLOEXEC);
 }
 
 void logError(const std::string& message) {
@@ -212,8 +233,10 @@ public:
             note("held no more");
         }
         if (told("pipe")) {
+            const int before = openPipes();
+            const int handedOn = pipesHandedOn();
             FILE* const pipe = popen("exit 7", "r");
-            note((fcntl(fileno(pipe), F_GETFD) & FD_CLOEXEC) != 0 ? "closed on exec" : "left open");
+            note(openPipes() > before && pipesHandedOn() == handedOn ? "closed on exec" : "left open");
             note("ended with " + std::to_string(WEXITSTATUS(pclose(pipe))));
         }
         if (told("command")) {

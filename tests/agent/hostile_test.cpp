@@ -40,6 +40,14 @@ HOST_TEST(HangingTool, ReadsAsAnErrorAndTheRestGoesOn) {
     EXPECT_FALSE(isRunning(host, "sleep"));
 }
 
+HOST_TEST(HangingTool, ThatLeavesItsPipeToAnotherEndsUnderAShellToo) {
+    SuseHost suse(host);
+    host.tool("hostname -s", ToolAnswer{.out = "", .action = "sleep 1000 &"});
+    const Finished run = suse.run(within("0.3", {"--commands", "shell", "get", kIp, "HostName"}));
+    EXPECT_EQ(run.status, 1);
+    EXPECT_THAT(run.out, HasSubstr("timed out after 0.3 s: hostname -s"));
+}
+
 HOST_TEST(HangingTool, AListingTellsAndFails) {
     SuseHost suse(host);
     afterTheStart(host, suse, kRoutes, {kGateway}, hanging());

@@ -72,7 +72,7 @@ add_dependencies(agent_kernel_tree_test cvagent vantrelcvicoshwmi corvista-hostt
 
 corvista_test(agent_hostile PARTS 4 LIBRARIES agent_cli agent_core test_support LABELS threads SOURCES
   agent/command_deadline_test.cpp
-  agent/door_test.cpp
+  agent/interposed_test.cpp
   agent/hostile_output_test.cpp
   agent/hostile_surroundings_test.cpp
   agent/hostile_test.cpp

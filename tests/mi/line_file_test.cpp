@@ -1,10 +1,14 @@
 #include "mi/line_file.h"
 
+#include <fcntl.h>
+#include <sys/ioctl.h>
 #include <sys/mount.h>
 #include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/time.h>
+#include <unistd.h>
 
+#include <array>
 #include <chrono>
 #include <csignal>
 #include <filesystem>
@@ -223,10 +227,20 @@ HOST_TEST(LineFile, GoesOnWritingAfterASignal) {
     sigaddset(&alarms, SIGALRM);
     pthread_sigmask(SIG_BLOCK, &alarms, nullptr);
     std::size_t read = 0;
+    // There before the writer, whose open would otherwise wait and be interrupted; it reads once the writer
+    // waits.
+    const int reading = open("/tmp/pipe", O_RDONLY | O_NONBLOCK);
     std::thread reader([&] {
-        std::ifstream in("/tmp/pipe");
-        std::this_thread::sleep_for(std::chrono::milliseconds(200));
-        read = std::string(std::istreambuf_iterator<char>(in), {}).size();
+        for (int waiting = 0; waiting == 0; std::this_thread::sleep_for(std::chrono::milliseconds(1))) {
+            ioctl(reading, FIONREAD, &waiting);
+        }
+        std::this_thread::sleep_for(std::chrono::milliseconds(50));
+        fcntl(reading, F_SETFL, 0);
+        std::array<char, 4096> piece{};
+        for (ssize_t got = 0; (got = ::read(reading, piece.data(), piece.size())) > 0;) {
+            read += static_cast<std::size_t>(got);
+        }
+        close(reading);
     });
     pthread_sigmask(SIG_UNBLOCK, &alarms, nullptr);
     struct sigaction interrupting {};

@@ -1,5 +1,5 @@
 // Every log line carries the name of its operation, as the headers have it, and the source of that
-// operation's room.
+// operation's component.
 #include <gmock/gmock.h>
 
 #include <atomic>

@@ -10,7 +10,7 @@ namespace {
 namespace fs = std::filesystem;
 using Names = std::map<std::string, std::set<std::string>>;
 
-// What the rooms' operations are made of: nobody outside calls it, and no log line carries its name.
+// What the components' operations are made of: nobody outside calls it, and no log line carries its name.
 const std::set<std::string> kHelpers = {
     "mi/command.h",
     "mi/host_node.h",
@@ -24,24 +24,24 @@ const std::set<std::string> kHelpers = {
     "network/ip_facts.h",
 };
 
-std::string sourceOf(const std::string& room) {
-    if (room == "indications") {
+std::string sourceOf(const std::string& component) {
+    if (component == "indications") {
         return "OsHwMIInd_ix86";
     }
-    return room == "cpu" ? "OsHwMICpu_ix86" : "OsHwMI_ix86";
+    return component == "cpu" ? "OsHwMICpu_ix86" : "OsHwMI_ix86";
 }
 
-/// The code of a header. A comment that names a room ("// cpu/ ...") heads the members that are implemented
-/// there and becomes a statement of its own.
+/// The code of a header. A comment that names a component ("// cpu/ ...") heads the members that are
+/// implemented there and becomes a statement of its own.
 std::string codeOf(const fs::path& header) {
     std::ifstream in(header);
     std::string code;
     const std::regex heading(R"re(^\s*// ([a-z]+)/.*)re");
     const std::regex noise(R"re("(\\.|[^"\\])*"|'(\\.|[^'\\])'|//.*|^\s*#.*|__attribute__\(\(.*?\)\)\)?)re");
     for (std::string line; std::getline(in, line);) {
-        std::smatch room;
-        if (std::regex_match(line, room, heading)) {
-            code += ";room " + room[1].str() + ";\n";
+        std::smatch component;
+        if (std::regex_match(line, component, heading)) {
+            code += ";component " + component[1].str() + ";\n";
         } else {
             code += std::regex_replace(line, noise, "") + '\n';
         }
@@ -52,8 +52,8 @@ std::string codeOf(const fs::path& header) {
 /// One header read from its start to its end.
 class Reader {
 public:
-    Reader(const fs::path& header, std::string room, Names& names)
-        : code_(codeOf(header)), room_(std::move(room)), names_(names) {}
+    Reader(const fs::path& header, std::string component, Names& names)
+        : code_(codeOf(header)), component_(std::move(component)), names_(names) {}
 
     void read() {
         for (; at_ < code_.size(); ++at_) {
@@ -80,8 +80,8 @@ private:
             R"re(^\s*(template <.*>\s*)?(namespace|class|struct|extern)\b[^(=]*$)re");
         static const std::regex nodeClass(R"re(class (\w+) :+ public NodeOf<)re");
         if (std::smatch node; std::regex_search(statement_, node, nodeClass)) {
-            names_[node[1]].insert(sourceOf(room_));
-            names_['~' + node[1].str()].insert(sourceOf(room_));
+            names_[node[1]].insert(sourceOf(component_));
+            names_['~' + node[1].str()].insert(sourceOf(component_));
         }
         if (std::regex_search(statement_, scope)) {
             isPublic_.push_back(isPublic_.back() && statement_.find("class ") == std::string::npos);
@@ -110,19 +110,19 @@ private:
     }
 
     void end() {
-        static const std::regex room(R"re(^\s*room ([a-z]+)$)re");
+        static const std::regex component(R"re(^\s*component ([a-z]+)$)re");
         static const std::regex declared(R"re((~?[A-Za-z_]\w*)\s*\()re");
         std::smatch match;
-        if (std::regex_match(statement_, match, room)) {
-            room_ = match[1];
+        if (std::regex_match(statement_, match, component)) {
+            component_ = match[1];
         } else if (isPublic_.back() && std::regex_search(statement_, match, declared)) {
-            names_[match[1]].insert(sourceOf(room_));
+            names_[match[1]].insert(sourceOf(component_));
         }
         statement_.clear();
     }
 
     std::string code_;
-    std::string room_;
+    std::string component_;
     Names& names_;
     std::size_t at_ = 0;
     std::string statement_;
@@ -133,11 +133,11 @@ private:
 
 Names operationNames(const fs::path& tree) {
     Names names;
-    for (const char* room : {"mi", "computer", "storage", "network", "indications", "cpu", "oshwmi"}) {
-        for (const auto& entry : fs::directory_iterator(tree / room)) {
+    for (const char* component : {"mi", "computer", "storage", "network", "indications", "cpu", "oshwmi"}) {
+        for (const auto& entry : fs::directory_iterator(tree / component)) {
             const std::string name = fs::relative(entry.path(), tree);
             if (name.ends_with(".h") && !kHelpers.contains(name)) {
-                Reader(entry.path(), room, names).read();
+                Reader(entry.path(), component, names).read();
             }
         }
     }

@@ -1,5 +1,5 @@
-// The plug-in object is put together from the builders of all rooms. What it offers by name, and where the
-// agent finds it, must not depend on that.
+// The plug-in object is put together from the builders of all components. What it offers by name, and where
+// the agent finds it, must not depend on that.
 #include <gtest/gtest.h>
 
 #include <cstdint>

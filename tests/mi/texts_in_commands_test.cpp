@@ -145,8 +145,8 @@ std::set<std::string> formats() {
     static const std::regex call(R"re((?:formatCommand|textCommand)\(\s*((?:"(?:\\.|[^"\\])*"\s*)+))re");
     static const std::regex literal(R"re("((?:\\.|[^"\\])*)")re");
     std::set<std::string> found;
-    for (const std::string room : {"mi", "computer", "storage", "network", "indications", "cpu"}) {
-        for (const auto& file : std::filesystem::directory_iterator(testsDirectory() + "/../" + room)) {
+    for (const std::string component : {"mi", "computer", "storage", "network", "indications", "cpu"}) {
+        for (const auto& file : std::filesystem::directory_iterator(testsDirectory() + "/../" + component)) {
             std::ostringstream source;
             source << std::ifstream(file.path()).rdbuf();
             const std::string text = source.str();

@@ -30,7 +30,7 @@ class Tree:
         files = [path] if path.is_file() else sorted(file for file in path.rglob("*") if file.suffix in (".cpp", ".h"))
         return [self.source(file) for file in files]
 
-    def rooms(self):
+    def components(self):
         """The sources of all folders with sources, but for the tests' and what is built."""
         folders = [path for path in sorted(self.folder.iterdir()) if path.is_dir() and path.name[0] != "."]
         return [source for path in folders if path.name not in ("bench", "build", "tests") for source in self.below(path)]
@@ -56,11 +56,11 @@ def matches_in(sources, name, pattern):
 
 
 class Defect:
-    def __init__(self, room, where, header):
+    def __init__(self, component, where, header):
         match = re.fullmatch(r"(\S+|\S+/operator \S+): (.+)", header)
         if not match:
             raise ListError(f"{where}: not PLACE: KIND: {header}")
-        self.room, self.where = room, where
+        self.component, self.where = component, where
         self.place, self.kind = match.groups()
         self.before, self.after = [], []
 
@@ -86,8 +86,8 @@ class Defect:
         path, name = tree.split(self.place)
         sources = tree.below(path) if path != tree.folder else []
         matches, is_there = matches_in(sources, name, pattern)
-        if not is_there:  # it has moved to another room, or is called otherwise
-            matches, is_there = matches_in(tree.rooms(), name, pattern)
+        if not is_there:  # it has moved to another component, or is called otherwise
+            matches, is_there = matches_in(tree.components(), name, pattern)
             if not is_there:
                 matches, _ = matches_in(sources, "", pattern)
         if len(matches) == 1:

@@ -12,7 +12,7 @@ from pattern import Pattern  # noqa: E402
 from source import Source  # noqa: E402
 
 CODE = r"""
-namespace room {
+namespace component {
 constexpr int kMost = 10'000;  // not kMost = 1
 const Row kRows[] = {{"a", 1}, {"b", 2}};
 struct Point { int x = 0; bool operator<(const Point& other) const { return x < other.x; } };
@@ -31,26 +31,26 @@ int sum(int left, int right) {
     return 0;
 }
 int sum(int one) { return one; }
-}  // namespace room
+}  // namespace component
 """
 
 
 class Places(unittest.TestCase):
     def test_everything_that_is_defined_has_its_name(self):
-        source = Source("room/code.cpp", CODE)
+        source = Source("component/code.cpp", CODE)
         self.assertEqual([place.name for place in source.places],
                          ["kMost", "kRows", "Point", "Point::x", "Point::operator<", "made", "Holder::Holder",
                           "Holder::~Holder", "Holder::operatorbool", "sum", "sum"])
 
     def test_a_definition_ends_with_its_body(self):
-        source = Source("room/code.cpp", CODE)
+        source = Source("component/code.cpp", CODE)
         self.assertEqual([source.line(place.last - 1) - source.line(place.first) for place in source.places if place.name == "sum"],
                          [8, 0])
 
 
 class Patterns(unittest.TestCase):
     def planted(self, before, after, text=CODE):
-        source = Source("room/code.cpp", text)
+        source = Source("component/code.cpp", text)
         pattern = Pattern(before, after)
         found = pattern.matches(source, 0, len(source.tokens))
         self.assertEqual(len(found), 1, before)
@@ -77,28 +77,28 @@ class Patterns(unittest.TestCase):
 class Lists(unittest.TestCase):
     def found(self, place, *before):
         with tempfile.TemporaryDirectory() as folder:
-            for room, code in (("room", CODE), ("other", "int only() { ++count; return one; }"), ("tests", "int gone() { --count; }")):
-                (Path(folder) / room).mkdir()
-                (Path(folder) / room / "code.cpp").write_text(code)
-            defect = Defect("room", "room.txt:1", f"{place}: kind")
+            for component, code in (("component", CODE), ("other", "int only() { ++count; return one; }"), ("tests", "int gone() { --count; }")):
+                (Path(folder) / component).mkdir()
+                (Path(folder) / component / "code.cpp").write_text(code)
+            defect = Defect("component", "component.txt:1", f"{place}: kind")
             defect.before = list(before)
             return defect.found(Tree(Path(folder)))
 
     def test_all_definitions_of_a_name_are_looked_at(self):
-        self.assertEqual(self.found("room/sum", "return one;")[0].file, "room/code.cpp")
+        self.assertEqual(self.found("component/sum", "return one;")[0].file, "component/code.cpp")
 
     def test_what_has_moved_or_has_another_name_is_found(self):
-        self.assertEqual(self.found("room/only", "return one;")[0].file, "other/code.cpp")
-        self.assertEqual(self.found("room/gone", "--count;")[0].file, "room/code.cpp")
+        self.assertEqual(self.found("component/only", "return one;")[0].file, "other/code.cpp")
+        self.assertEqual(self.found("component/gone", "--count;")[0].file, "component/code.cpp")
 
     def test_what_does_not_stand_once_is_told_with_where_it_stands(self):
-        for place, before, words in (("room/sum", "return", "stands 4 times: room/code.cpp:13 in sum"),
-                                     ("room/gone", "return", "nothing is called gone.*\n.*room/code.cpp:7 in made"),
-                                     ("room/only", "--count;", "does not have.*\n.*room/code.cpp:9 in Holder::~Holder"),
-                                     ("room/sum", "--count;", "does not have.*\n.*room/code.cpp:9"),
-                                     ("room/sum", "no such;", "nowhere"),
-                                     ("room", "++count; --count", "nowhere"),
-                                     ("room/sum", "// a comment", "nothing to look for")):
+        for place, before, words in (("component/sum", "return", "stands 4 times: component/code.cpp:13 in sum"),
+                                     ("component/gone", "return", "nothing is called gone.*\n.*component/code.cpp:7 in made"),
+                                     ("component/only", "--count;", "does not have.*\n.*component/code.cpp:9 in Holder::~Holder"),
+                                     ("component/sum", "--count;", "does not have.*\n.*component/code.cpp:9"),
+                                     ("component/sum", "no such;", "nowhere"),
+                                     ("component", "++count; --count", "nowhere"),
+                                     ("component/sum", "// a comment", "nothing to look for")):
             with self.assertRaisesRegex(ListError, words, msg=place):
                 self.found(place, before)
 

@@ -48,7 +48,7 @@ class Workshop:
 
     def prepare(self, programs):
         copy_tree(self.copy)
-        # Small units: a defect has its own compiled again, not a room.
+        # Small units: a defect has its own compiled again, not a component.
         flags = ["-DCMAKE_CXX_FLAGS=-O0 -w", "-DCMAKE_CXX_FLAGS_DEBUG=-g0", "-DCMAKE_UNITY_BUILD_BATCH_SIZE=3"]
         linker = next((name for name in ("lld", "gold") if shutil.which("ld." + name)), None)
         if linker:

@@ -41,21 +41,21 @@ const std::map<std::string, std::set<std::string>> kMayInclude = {
 const std::set<std::string> kPlugin = {"mi",          "computer", "storage", "network",
                                        "indications", "cpu",      "oshwmi"};
 
-/// The innermost room of a file; its first directory where it is in none.
-std::string roomOf(const fs::path& file) {
-    for (fs::path room = file.parent_path(); !room.empty(); room = room.parent_path()) {
-        if (kMayInclude.contains(room)) {
-            return room;
+/// The innermost component of a file; its first directory where it is in none.
+std::string componentOf(const fs::path& file) {
+    for (fs::path component = file.parent_path(); !component.empty(); component = component.parent_path()) {
+        if (kMayInclude.contains(component)) {
+            return component;
         }
     }
     return file.begin()->string();
 }
 
-std::vector<fs::path> sources(const std::string& room) {
+std::vector<fs::path> sources(const std::string& component) {
     std::vector<fs::path> found;
-    for (const auto& entry : fs::recursive_directory_iterator(kTree / room)) {
+    for (const auto& entry : fs::recursive_directory_iterator(kTree / component)) {
         const bool source = entry.path().extension() == ".cpp" || entry.path().extension() == ".h";
-        if (source && roomOf(fs::relative(entry.path(), kTree)) == room) {
+        if (source && componentOf(fs::relative(entry.path(), kTree)) == component) {
             found.push_back(entry.path());
         }
     }
@@ -83,16 +83,17 @@ std::string codeOnly(const fs::path& file) {
     return std::regex_replace(content(file), noise, "");
 }
 
-TEST(CodeRules, RoomsIncludeOnlyWhatTheyMay) {
+TEST(CodeRules, ComponentsIncludeOnlyWhatTheyMay) {
     const std::regex include(R"re(^\s*#include "([^"]+)")re");
-    for (const auto& [room, allowed] : kMayInclude) {
-        const auto files = sources(room);
-        EXPECT_FALSE(files.empty()) << room;
+    for (const auto& [component, allowed] : kMayInclude) {
+        const auto files = sources(component);
+        EXPECT_FALSE(files.empty()) << component;
         for (const fs::path& file : files) {
             for (const std::string& line : lines(file)) {
                 std::smatch match;
                 if (std::regex_search(line, match, include)) {
-                    EXPECT_TRUE(allowed.contains(roomOf(match[1].str()))) << file << " includes " << match[1];
+                    EXPECT_TRUE(allowed.contains(componentOf(match[1].str())))
+                        << file << " includes " << match[1];
                     EXPECT_EQ(match[1].str().find(".."), std::string::npos) << file << " climbs";
                 }
             }
@@ -104,8 +105,8 @@ TEST(CodeRules, ThePluginHasOneSeamToTheShell) {
     const std::regex call(
         R"re(\b(popen|mypopen|system|execl|execv|execvp|execlp|posix_spawn|fork|vfork)\s*\()re");
     std::set<std::string> seams;
-    for (const std::string& room : kPlugin) {
-        for (const fs::path& file : sources(room)) {
+    for (const std::string& component : kPlugin) {
+        for (const fs::path& file : sources(component)) {
             if (std::regex_search(codeOnly(file), call)) {
                 seams.insert(fs::relative(file, kTree));
             }
@@ -115,8 +116,8 @@ TEST(CodeRules, ThePluginHasOneSeamToTheShell) {
 }
 
 TEST(CodeRules, ThePluginHasOneWayToTheLogger) {
-    for (const std::string& room : kPlugin) {
-        for (const fs::path& file : sources(room)) {
+    for (const std::string& component : kPlugin) {
+        for (const fs::path& file : sources(component)) {
             if (fs::relative(file, kTree) != "mi/log.cpp") {
                 EXPECT_EQ(codeOnly(file).find("LevelMessage"), std::string::npos) << file;
             }
@@ -131,8 +132,8 @@ TEST(CodeRules, NumbersAreReadInOnePlaceEach) {
     const std::regex call(
         R"re(\b(from_chars|strto(l|ul|ll|ull|f|d|ld|imax|umax)|ato(i|l|ll|f)|sto(i|l|ul|ll|ull|f|d|ld)|sscanf)\s*\()re");
     std::set<std::string> readers;
-    for (const auto& [room, allowed] : kMayInclude) {
-        for (const fs::path& file : sources(room)) {
+    for (const auto& [component, allowed] : kMayInclude) {
+        for (const fs::path& file : sources(component)) {
             if (std::regex_search(codeOnly(file), call)) {
                 readers.insert(fs::relative(file, kTree));
             }
@@ -160,8 +161,8 @@ TEST(CodeRules, TheAgentChangesItsProcessInTheSetUpAlone) {
         R"re(\b(prepareSurroundings|nameInEnvironment|makeTmpPrivate|setUpCommands|putAdaptersOnPath)\()re");
     std::set<std::string> changing;
     std::set<std::string> callers;
-    for (const std::string room : {"agent/core", "agent/cli", "agent/bus", "agent/service"}) {
-        for (const fs::path& file : sources(room)) {
+    for (const std::string component : {"agent/core", "agent/cli", "agent/bus", "agent/service"}) {
+        for (const fs::path& file : sources(component)) {
             const std::string code = codeOnly(file);
             if (std::regex_search(code, change)) {
                 changing.insert(file.filename());
@@ -193,8 +194,8 @@ TEST(CodeRules, FrontEndsReadAndWriteThroughTheAgent) {
 }
 
 TEST(CodeRules, SourcesAndHeadersStayShort) {
-    for (const auto& [room, allowed] : kMayInclude) {
-        for (const fs::path& file : sources(room)) {
+    for (const auto& [component, allowed] : kMayInclude) {
+        for (const fs::path& file : sources(component)) {
             const std::size_t longest = file.extension() == ".h" ? 150 : 400;
             EXPECT_LE(lines(file).size(), longest) << file;
         }

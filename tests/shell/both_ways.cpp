@@ -1,5 +1,6 @@
 #include "tests/shell/both_ways.h"
 
+#include <dlfcn.h>
 #include <fcntl.h>
 #include <unistd.h>
 
@@ -55,15 +56,16 @@ void PrintTo(const Ran& ran, std::ostream* stream) {
 }
 
 Ran inShell(const std::string& command, Complaints complaints) {
-    cvagent::shell::leaveAllToShell(true);
+    // The C library's: the tests' own runs what a shell is to run as the product does.
+    static const auto original =
+        reinterpret_cast<FILE* (*)(const char*, const char*)>(dlsym(RTLD_NEXT, "popen"));
     Ran ran;
     {
         const ErrorOutput redirected(complaints);
-        FILE* const pipe = popen(command.c_str(), "r");
+        FILE* const pipe = original(command.c_str(), "r");
         ran.out = readAll(pipe);
         ran.status = pclose(pipe);
     }
-    cvagent::shell::leaveAllToShell(false);
     ran.err = complaints == Complaints::seen ? ErrorOutput::text() : "";
     ran.inShell = true;
     return ran;

@@ -30,6 +30,7 @@ using both_ways::direct;
 using both_ways::inShell;
 using cvagent::shell::closeCommand;
 using cvagent::shell::openCommand;
+using cvagent::shell::openInShell;
 
 /// The error that the system has for whoever wants a process; 0 for none.
 std::atomic<int> spawnFails = 0;
@@ -90,6 +91,49 @@ HOST_TEST(Traps, WhatIsCutOffIsReadNoFurther) {
     other.join();
     EXPECT_EQ(command.end(), SIGKILL);
     EXPECT_THAT(cvagent::shell::readBy(gettid()), testing::IsEmpty());
+}
+
+// A command with a variable is a shell's, which becomes its one tool.
+HOST_TEST(Traps, WhatAShellHasLeftBehindIsCutOffToo) {
+    inC();
+    host.tool("leaver", ToolAnswer{.out = "half\n", .action = "sleep 1000 &"});
+    ASSERT_FALSE(openCommand("leaver $NONE"));
+    FILE* const stream = openInShell("leaver $NONE");
+    char text[512] = "";
+    EXPECT_STREQ(fgets(text, sizeof text, stream), "half\n");
+    const std::vector<pid_t> read = cvagent::shell::readBy(gettid());
+    ASSERT_EQ(read.size(), 1);
+    EXPECT_EQ(cvagent::shell::commandOf(read.front()), "leaver $NONE");
+    std::thread other([process = read.front()] { EXPECT_TRUE(cvagent::shell::cutOff(process)); });
+    EXPECT_EQ(fgets(text, sizeof text, stream), nullptr);
+    other.join();
+    EXPECT_EQ(closeCommand(stream), SIGKILL);
+}
+
+HOST_TEST(Traps, WhatIsLeftToAShellEndsAsItDoesUnderPopen) {
+    inC();
+    for (const char* const command :
+         {"exit 7", "kill -TERM $$", "kill -KILL $$", "none 2> /dev/null", "echo a; echo b >&2; exit 3",
+          "echo \"$0 $#\"", "(exit 9)", "sh -c 'kill -9 $$'; exit 5", ""}) {
+        const both_ways::Ran expected = inShell(command, Complaints::seen);
+        FILE* const stream = openInShell(command);
+        std::string out;
+        for (char text[512] = ""; fgets(text, sizeof text, stream) != nullptr;) {
+            out += text;
+        }
+        EXPECT_EQ(out, expected.out) << command;
+        EXPECT_EQ(closeCommand(stream), expected.status) << command;
+    }
+}
+
+HOST_TEST(Traps, AShellForWhichThereIsNoProcessIsNone) {
+    inC();
+    spawnFails = EAGAIN;
+    const unsigned long before = cvagent::shell::notStarted().count;
+    EXPECT_EQ(openInShell("exit 0"), nullptr);
+    EXPECT_EQ(errno, EAGAIN);
+    EXPECT_EQ(cvagent::shell::notStarted().count, before + 1);
+    spawnFails = 0;
 }
 
 HOST_TEST(Traps, AScriptedToolIsRun) {

@@ -90,8 +90,11 @@ bool inShells() {
 
 FILE* run(const char* line, const char* mode) {
     static const auto next = reinterpret_cast<Popen>(dlsym(RTLD_NEXT, "popen"));
-    const auto direct = inShells() ? std::nullopt : cvagent::shell::openCommand(line);
-    return direct ? *direct : next(line, mode);
+    if (inShells() || std::string_view(mode) != "r") {
+        return next(line, mode);
+    }
+    const auto direct = cvagent::shell::openCommand(line);
+    return direct ? *direct : cvagent::shell::openInShell(line);
 }
 
 }  // namespace

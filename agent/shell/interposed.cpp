@@ -1,6 +1,7 @@
 // popen, pclose and system as a plug-in finds them that this program has loaded: the loader looks in the
 // program first. They do what the C library's do, and besides: they do without a shell where that is safe,
-// they end with a stop, and they know of commands that could not be started.
+// they end with a stop, and they know of commands that could not be started. A stream that is read has no
+// descriptor of its own.
 #include <dlfcn.h>
 #include <spawn.h>
 #include <sys/wait.h>
@@ -10,13 +11,13 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
-#include <cstring>
 #include <string>
+#include <string_view>
 
 #include "agent/shell/runner.h"
 #include "agent/shell/starts.h"
 
-#define CVAGENT_DOOR extern "C" __attribute__((visibility("default")))
+#define CVAGENT_EXPORT extern "C" __attribute__((visibility("default")))
 
 namespace {
 
@@ -49,10 +50,9 @@ int waitFor(pid_t process) {
 
 FILE* opened(const char* command, const char* mode) {
     static const auto original = inLibrary<FILE* (*)(const char*, const char*)>("popen");
-    if (std::strcmp(mode, "r") == 0) {
-        if (const auto direct = cvagent::shell::openCommand(command)) {
-            return *direct;
-        }
+    if (const std::string_view wanted = mode; wanted == "r" || wanted == "re") {
+        const auto direct = cvagent::shell::openCommand(command);
+        return direct ? *direct : cvagent::shell::openInShell(command);
     }
     const Start start;
     FILE* const pipe = original(command, closingOnExec(mode).c_str());
@@ -83,7 +83,7 @@ int ranByShell(const char* command) {
 
 }  // namespace
 
-CVAGENT_DOOR FILE* popen(const char* command, const char* mode) {
+CVAGENT_EXPORT FILE* popen(const char* command, const char* mode) {
     countBegun();
     FILE* const pipe = opened(command, mode);
     if (pipe == nullptr) {
@@ -92,7 +92,7 @@ CVAGENT_DOOR FILE* popen(const char* command, const char* mode) {
     return pipe;
 }
 
-CVAGENT_DOOR int pclose(FILE* pipe) {
+CVAGENT_EXPORT int pclose(FILE* pipe) {
     static const auto original = inLibrary<int (*)(FILE*)>("pclose");
     if (const auto status = cvagent::shell::closeCommand(pipe)) {
         countEnded();
@@ -104,7 +104,7 @@ CVAGENT_DOOR int pclose(FILE* pipe) {
     return status;
 }
 
-CVAGENT_DOOR int system(const char* command) {
+CVAGENT_EXPORT int system(const char* command) {
     if (command == nullptr) {
         return 1;  // there is a shell
     }

@@ -1,4 +1,4 @@
-// The door between a plug-in and the program that loads it.
+// What a plug-in finds in the program that loads it.
 #include <gmock/gmock.h>
 #include <unistd.h>
 
