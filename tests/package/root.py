@@ -31,7 +31,7 @@ def make(purpose, architecture, packages, variant="minbase"):
         if name.startswith(prefix):
             shutil.rmtree(os.path.join(cache(), name))
     mirror = next(uri for uri, suite, _ in machine_sources() if suite == codename)
-    print(f"# making {root} from {mirror}", flush=True)
+    print(f"# making {root} from {mirror}", file=sys.stderr, flush=True)
     part = root + ".part"
     with open(part + ".log", "w", encoding="utf-8") as log:
         result = subprocess.run(["debootstrap", f"--variant={variant}", f"--arch={architecture}",
@@ -44,3 +44,8 @@ def make(purpose, architecture, packages, variant="minbase"):
     os.remove(part + ".log")
     os.rename(part, root)
     return root
+
+
+if __name__ == "__main__":
+    # root.py PURPOSE ARCHITECTURE PACKAGE...: prints the directory of one to build in
+    print(make(sys.argv[1], sys.argv[2], sys.argv[3:], "buildd"))

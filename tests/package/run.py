@@ -11,7 +11,7 @@ HERE = os.path.dirname(os.path.abspath(__file__))
 sys.path.insert(1, os.path.join(HERE, "..", "system"))
 
 import root  # noqa: E402
-from host import Host  # noqa: E402
+from host import Host, HostFailure  # noqa: E402
 from tap import CHECKS, Report  # noqa: E402
 
 import checks_build  # noqa: F401,E402  each registers its checks, in this order
@@ -51,8 +51,8 @@ def bounding_set():
 
 def evidence_of(host):
     def collect():
-        yield "the journal", host.run("journalctl --no-pager -n 40").stdout.splitlines()
-        yield "the unit", host.run("systemctl status --no-pager -n 0 corvista-agent").stdout.splitlines()
+        journal = host.run("journalctl --no-pager -n 12 -o short-monotonic -u corvista-agent -u dbus -u polkit")
+        yield "the journal", journal.stdout.splitlines()
     return collect
 
 
@@ -70,7 +70,8 @@ def main():
     try:
         context = Context(host, options)
         for name, function in checks:
-            report.run(name, function, context, evidence_of(host))
+            if isinstance(report.run(name, function, context, evidence_of(host)), HostFailure):
+                break
     finally:
         host.stop()
     used = resource.getrusage(resource.RUSAGE_CHILDREN)
