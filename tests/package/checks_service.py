@@ -1,6 +1,7 @@
 """The service as an administrator meets it: installed, asked, hurt, reloaded, stopped."""
 
 import json
+import os
 import re
 
 from host import HostFailure
@@ -9,6 +10,8 @@ from tap import check, expect, expect_equal
 UNIT = "corvista-agent.service"
 NAME = "com.vantrel.Corvista1"
 OWNER_NAME = 116  # of a computer
+HOST_NAME, DNS_SERVERS = 97, 94  # of an IP configuration
+HERE = os.path.dirname(os.path.abspath(__file__))
 CONF = "/etc/corvista/agent.conf"
 CHANGES_ITSELF = re.compile("Time|Available|Free|Used|Uptime|Load|Frequency|Temperature|Bytes|Packets|Reads|Writes")
 ASK = f"busctl --auto-start=no get-property {NAME} /com/vantrel/Corvista1 {NAME}.Agent"
@@ -79,6 +82,18 @@ def rated(context):
     expect(level <= 5.0, text)
 
 
+@check("sandbox: the page on security tells of every part of it")
+def explained(context):
+    with open(os.path.join(HERE, "../../docs/security.md"), encoding="utf-8") as file:
+        page = file.read()
+    unit = context.host.sh(f"sed '1,/^# docs.security.md/d; /^.Install/,$d' /lib/systemd/system/{UNIT}")
+    for line in unit.splitlines():
+        key, _, words = line.partition("=")
+        named = words.split() if key == "CapabilityBoundingSet" else [key] if key else []
+        for word in named:
+            expect(f"`{word}" in page, f"not in docs/security.md: {word}")
+
+
 @check("sandbox: a walk within it finds what one without it finds")
 def nothing_missed(context):
     host = context.host
@@ -125,6 +140,18 @@ def write_denied(context):
     expect("may not write" in messages(context), "nothing in the journal:\n" + messages(context))
     expect('"applied"' in host.sh(f"{owner} alice"), "root cannot write")
     expect("alice" in host.sh("cat /opt/vantrel/corvista/data/asset.dat"), "nothing was written")
+
+
+@check("sandbox: what root writes through the service reaches the host's files and its kernel")
+def writes(context):
+    host = context.host
+    node = host.sh(f"busctl call {NAME} /com/vantrel/Corvista1 {NAME}.Agent Find s ip-config:cable0").split()[1]
+    write = f"busctl call --timeout=60 {NAME} /com/vantrel/Corvista1 {NAME}.Agent Write uuv {node}"
+    host.sh(f"{write} {DNS_SERVERS} as 2 192.0.2.53 192.0.2.54")
+    expect("nameserver 192.0.2.53\nnameserver 192.0.2.54\n" in host.sh("cat /etc/resolv.conf"), "no name servers")
+    host.sh(f"{write} {HOST_NAME} s renamed")
+    expect_equal("the kernel's name of the host", host.sh("hostname"), "renamed\n")
+    expect("renamed" in host.sh("cat /etc/hosts"), "not in /etc/hosts")
 
 
 @check("crash: killed, it is started again and answers")
