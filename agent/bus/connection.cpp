@@ -68,7 +68,7 @@ Message Connection::newCall(const Target& target) const {
 }
 
 Message Connection::newSignal(const std::string& path, const std::string& interface,
-                           const std::string& member) const {
+                              const std::string& member) const {
     sd_bus_message* made = nullptr;
     checkDone(sd_bus_message_new_signal(get(), &made, path.c_str(), interface.c_str(), member.c_str()),
               "cannot make the signal " + member);

@@ -22,7 +22,8 @@ public:
     std::vector<std::string> texts();
     std::vector<std::uint32_t> numbers();
     std::string bytes();
-    /// A basic value of any type that is one: "s", "o", "g" as they are, flags "1" and "0", numbers in decimal.
+    /// A basic value of any type that is one: "s", "o", "g" as they are, flags "1" and "0", numbers in
+    /// decimal.
     std::string asWord();
 
     /// Calls something for each element.

@@ -53,6 +53,20 @@ bool setGroup(Config& config, const std::string& value) {
     return true;
 }
 
+bool setHistoryAge(Config& config, const std::string& value) {
+    constexpr long kMostDays = 36500;
+    const auto days = numberWithin(value, 1, kMostDays);
+    config.historyAge = std::chrono::hours(24 * days.value_or(1));
+    return days.has_value();
+}
+
+bool setHistorySize(Config& config, const std::string& value) {
+    constexpr long kMostMebibytes = 65536;
+    const auto mebibytes = numberWithin(value, 1, kMostMebibytes);
+    config.historyBytes = static_cast<std::uint64_t>(mebibytes.value_or(1)) << 20U;
+    return mebibytes.has_value();
+}
+
 struct Key {
     const char* name;
     Setter set;
@@ -60,11 +74,14 @@ struct Key {
 };
 
 constexpr Key kKeys[] = {
-    {"look-every", setDuration<&Config::lookEvery, 10, 86400, true>, "seconds from 10 to 86400, or 0 for never"},
+    {"look-every", setDuration<&Config::lookEvery, 10, 86400, true>,
+     "seconds from 10 to 86400, or 0 for never"},
     {"settling-time", setDuration<&Config::settlingTime, 0, 10000>, "milliseconds from 0 to 10000"},
     {"command-timeout", setDuration<&Config::commandTime, 1, 3600, true>,
      "seconds from 1 to 3600, or 0 for no limit"},
     {"trusted-group", setGroup, "the name of a group"},
+    {"history-days", setHistoryAge, "days from 1 to 36500"},
+    {"history-size", setHistorySize, "mebibytes from 1 to 65536"},
 };
 
 std::string trimmed(std::string_view text) {

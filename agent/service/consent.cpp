@@ -74,14 +74,13 @@ void Consent::askPolkit(const Caller& caller, const Question& question, Decided 
         decided(false, "polkit has not decided about earlier calls yet");
         return;
     }
-    const bus::Message call = connection_.newCall({kPolkit, "/org/freedesktop/PolicyKit1/Authority",
-                                                "org.freedesktop.PolicyKit1.Authority", "CheckAuthorization"});
+    const bus::Message call =
+        connection_.newCall({kPolkit, "/org/freedesktop/PolicyKit1/Authority",
+                             "org.freedesktop.PolicyKit1.Authority", "CheckAuthorization"});
     bus::Writer writer(call);
     writer.structure("sa{sv}", [&] {
         writer.put("system-bus-name").array("{sv}", [&] {
-            writer.entry("sv", [&] {
-                writer.put("name").variant("s", [&] { writer.put(caller.name); });
-            });
+            writer.entry("sv", [&] { writer.put("name").variant("s", [&] { writer.put(caller.name); }); });
         });
     });
     writer.put(kRules.at(static_cast<std::size_t>(question.audience)).action);
@@ -89,15 +88,15 @@ void Consent::askPolkit(const Caller& caller, const Question& question, Decided 
     writer.put(std::uint32_t{question.mayAskUser ? 1U : 0U}).put("");
     const std::uint64_t number = ++asked_;
     ++pendingOf_[caller.name];
-    pending_[number] = connection_.askLater(
-        call, question.mayAskUser ? kUserTime : kPolkitTime,
-        [this, number, caller, held = std::move(decided)](const bus::Message& answer) {
-            const bus::Slot slot = std::move(pending_.extract(number).mapped());
-            if (--pendingOf_[caller.name] == 0) {
-                pendingOf_.erase(caller.name);
-            }
-            polkitAnswered(caller, answer, held);
-        });
+    pending_[number] =
+        connection_.askLater(call, question.mayAskUser ? kUserTime : kPolkitTime,
+                             [this, number, caller, held = std::move(decided)](const bus::Message& answer) {
+                                 const bus::Slot slot = std::move(pending_.extract(number).mapped());
+                                 if (--pendingOf_[caller.name] == 0) {
+                                     pendingOf_.erase(caller.name);
+                                 }
+                                 polkitAnswered(caller, answer, held);
+                             });
 }
 
 void Consent::polkitAnswered(const Caller& caller, const bus::Message& answer, const Decided& decided) {

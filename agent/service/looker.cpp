@@ -1,6 +1,9 @@
 #include "agent/service/looker.h"
 
 #include <algorithm>
+#include <map>
+#include <set>
+#include <span>
 #include <utility>
 
 #include "agent/service/names.h"
@@ -95,22 +98,31 @@ void Looker::run() {
     }
 }
 
-/// What the node stores and what a read tells otherwise, all of it read now. A property that the host no
-/// longer tells is not known any more; one of which it tells nothing in time keeps its last value.
+/// What the node stores and what a read tells otherwise, all of it read now, as a new agent would show it:
+/// where a read fails of which a tree does not show the failure, what is stored stays. What the host does not
+/// tell in time is the last value.
 std::vector<Reading> Looker::readAgain(const NodeRef& node, const Request& request) const {
-    std::vector<unsigned int> ids;
-    for (const auto& [id, value] : storedProperties(*node)) {
-        ids.push_back(id);
+    const NodeClass* known = findClass(node->nodeType());
+    const std::span<const unsigned int> live =
+        known != nullptr ? known->live : std::span<const unsigned int>();
+    std::map<unsigned int, Reading> stored;
+    std::set<unsigned int> ids(live.begin(), live.end());
+    for (const Reading& reading : storedReadings(*node)) {
+        stored.emplace(reading.id, reading);
+        ids.insert(reading.id);
     }
-    if (const NodeClass* known = findClass(node->nodeType())) {
-        for (const unsigned int id : known->live) {
-            if (const auto place = std::ranges::lower_bound(ids, id); place == ids.end() || *place != id) {
-                ids.insert(place, id);
-            }
+    std::vector<Reading> readings =
+        agent_.read(node, {ids.begin(), ids.end()}, cvagent::Freshness::now, request);
+    for (Reading& reading : readings) {
+        const bool isLive = std::ranges::find(live, reading.id) != live.end();
+        const auto before = stored.find(reading.id);
+        if (reading.failed() && !reading.timedOut && !isLive && before != stored.end()) {
+            reading = before->second;
         }
     }
-    std::vector<Reading> readings = agent_.read(node, ids, cvagent::Freshness::now, request);
-    std::erase_if(readings, [](const Reading& reading) { return reading.missing; });
+    std::erase_if(readings, [&stored](const Reading& reading) {
+        return reading.missing && !stored.contains(reading.id);
+    });
     return readings;
 }
 

@@ -56,7 +56,8 @@ void Manager::tell(const std::string& state) const {
         return;
     }
     const auto length = static_cast<socklen_t>(offsetof(sockaddr_un, sun_path) + socket_.size());
-    sendto(descriptor, state.data(), state.size(), MSG_NOSIGNAL, reinterpret_cast<sockaddr*>(&address), length);
+    sendto(descriptor, state.data(), state.size(), MSG_NOSIGNAL, reinterpret_cast<sockaddr*>(&address),
+           length);
     close(descriptor);
 }
 

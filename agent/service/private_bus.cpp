@@ -53,8 +53,7 @@ std::string escapedXml(const std::string& text) {
 
 /// Bytes of an address that stand for themselves; others are written as %2f.
 std::string escapedAddress(const std::string& path) {
-    constexpr std::string_view kPlain =
-        "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789-_/.";
+    constexpr std::string_view kPlain = "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789-_/.";
     constexpr std::string_view kDigits = "0123456789abcdef";
     std::string escaped;
     for (const char byte : path) {
@@ -100,25 +99,30 @@ std::string privateBusConfig(const std::string& socket, uid_t owner) {
                                                 {"max_replies_per_connection", 128},
                                                 {"auth_timeout", 5000},
                                                 {"reply_timeout", 900000}}};
-    std::string text = "<!DOCTYPE busconfig PUBLIC \"-//freedesktop//DTD D-Bus Bus Configuration 1.0//EN\"\n"
-                       " \"http://www.freedesktop.org/standards/dbus/1.0/busconfig.dtd\">\n<busconfig>\n";
-    text += "  <type>corvista</type>\n  <listen>unix:path=" + escapedXml(escapedAddress(socket)) + "</listen>\n";
-    text += "  <auth>EXTERNAL</auth>\n  <policy context=\"default\">\n    <allow user=\"*\"/>\n"
-            "    <deny own=\"*\"/>\n    <deny send_type=\"method_call\"/>\n    <deny send_type=\"signal\"/>\n"
-            "    <allow send_requested_reply=\"true\" send_type=\"method_return\"/>\n"
-            "    <allow send_requested_reply=\"true\" send_type=\"error\"/>\n"
-            "    <allow receive_type=\"method_call\"/>\n    <allow receive_type=\"method_return\"/>\n"
-            "    <allow receive_type=\"error\"/>\n    <allow receive_type=\"signal\"/>\n"
-            "    <allow send_destination=\"org.freedesktop.DBus\"/>\n"
-            "    <deny send_destination=\"org.freedesktop.DBus\" send_interface=\"org.freedesktop.DBus\" "
-            "send_member=\"UpdateActivationEnvironment\"/>\n    <allow send_destination=\"" +
-            std::string(kBusName) + "\"/>\n  </policy>\n";
+    std::string text =
+        "<!DOCTYPE busconfig PUBLIC \"-//freedesktop//DTD D-Bus Bus Configuration 1.0//EN\"\n"
+        " \"http://www.freedesktop.org/standards/dbus/1.0/busconfig.dtd\">\n<busconfig>\n";
+    text +=
+        "  <type>corvista</type>\n  <listen>unix:path=" + escapedXml(escapedAddress(socket)) + "</listen>\n";
+    text +=
+        "  <auth>EXTERNAL</auth>\n  <policy context=\"default\">\n    <allow user=\"*\"/>\n"
+        "    <deny own=\"*\"/>\n    <deny send_type=\"method_call\"/>\n    <deny send_type=\"signal\"/>\n"
+        "    <allow send_requested_reply=\"true\" send_type=\"method_return\"/>\n"
+        "    <allow send_requested_reply=\"true\" send_type=\"error\"/>\n"
+        "    <allow receive_type=\"method_call\"/>\n    <allow receive_type=\"method_return\"/>\n"
+        "    <allow receive_type=\"error\"/>\n    <allow receive_type=\"signal\"/>\n"
+        "    <allow send_destination=\"org.freedesktop.DBus\"/>\n"
+        "    <deny send_destination=\"org.freedesktop.DBus\" send_interface=\"org.freedesktop.DBus\" "
+        "send_member=\"UpdateActivationEnvironment\"/>\n    <allow send_destination=\"" +
+        std::string(kBusName) + "\"/>\n  </policy>\n";
     for (const std::string& user : {std::string("0"), std::to_string(owner)}) {
-        text += "  <policy user=\"" + user + "\">\n    <allow own=\"*\"/>\n    <allow send_type=\"signal\"/>\n"
+        text += "  <policy user=\"" + user +
+                "\">\n    <allow own=\"*\"/>\n    <allow send_type=\"signal\"/>\n"
                 "    <allow send_type=\"method_call\"/>\n  </policy>\n";
     }
     for (const Limit& limit : kLimits) {
-        text += "  <limit name=\"" + std::string(limit.name) + "\">" + std::to_string(limit.value) + "</limit>\n";
+        text +=
+            "  <limit name=\"" + std::string(limit.name) + "\">" + std::to_string(limit.value) + "</limit>\n";
     }
     return text + "</busconfig>\n";
 }
@@ -133,7 +137,7 @@ std::string PrivateBus::standardDirectory() {
 
 PrivateBus::PrivateBus(const std::string& directory) {
     try {
-        directory_.emplace(directory, DirectoryRole{Problem::none, ""});
+        directory_.emplace(directory, DirectoryRole{Problem::none, "", "directory of the bus"});
     } catch (const std::system_error& error) {
         failToStart("the directory " + inQuotes(directory) + ": " + error.code().message());
     } catch (const Problem& problem) {

@@ -37,7 +37,8 @@ std::string whoServes(const bus::Connection& connection) {
     }
 }
 
-Service::Service(Loop& loop, bus::Connection& connection, Agent& agent, const Config& config)
+Service::Service(Loop& loop, bus::Connection& connection, Agent& agent, const Config& config,
+                 EventSource past, std::uint64_t lastEvent)
     : loop_(loop),
       connection_(connection),
       agent_(agent),
@@ -47,15 +48,16 @@ Service::Service(Loop& loop, bus::Connection& connection, Agent& agent, const Co
       consent_(connection),
       looker_(agent,
               [this, mailbox = loop.mailbox()](Look look) {
-                  mailbox->post([this, held = std::make_shared<Look>(std::move(look))] {
-                      take(std::move(*held));
-                  });
+                  mailbox->post(
+                      [this, held = std::make_shared<Look>(std::move(look))] { take(std::move(*held)); });
               }),
       readers_(kReaders),
       writers_(kWriters),
-      parts_{connection, agent, model_, callers_, consent_, looker_, readers_, writers_, loop.mailbox()},
+      parts_{connection, agent,    model_,   callers_,       consent_,
+             looker_,    readers_, writers_, loop.mailbox(), std::move(past)},
       objects_(parts_, standing_) {
     standing_.version = CORVISTA_VERSION;
+    standing_.lastEvent = lastEvent;
     configure(config);
 }
 

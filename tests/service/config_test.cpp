@@ -22,12 +22,15 @@ TEST(ServiceConfig, SaysNothingWhereNothingStands) {
 
 TEST(ServiceConfig, TakesEachKey) {
     const auto read = parseConfig(
-        "look-every=30\n settling-time =  200 \ncommand-timeout = 0\ntrusted-group = adm_2-x\n");
+        "look-every=30\n settling-time =  200 \ncommand-timeout = 0\ntrusted-group = adm_2-x\n"
+        "history-days = 7\nhistory-size = 2\n");
     EXPECT_THAT(read.complaints, IsEmpty());
     EXPECT_EQ(read.config.lookEvery.count(), 30);
     EXPECT_EQ(read.config.settlingTime.count(), 200);
     EXPECT_EQ(read.config.commandTime.count(), 0);
     EXPECT_EQ(read.config.trustedGroup, "adm_2-x");
+    EXPECT_EQ(read.config.historyAge, std::chrono::hours(7 * 24));
+    EXPECT_EQ(read.config.historyBytes, 2097152U);
     EXPECT_EQ(parseConfig("look-every = 0").config.lookEvery.count(), 0);
 }
 
@@ -43,7 +46,8 @@ TEST(ServiceConfig, TellsEachWrongLineWithItsNumber) {
                     "line 7: command-timeout is '1.5', but takes seconds from 1 to 3600, or 0 for no limit",
                     "line 8: trusted-group is 'a b', but takes the name of a group",
                     "line 9: a second command-timeout"));
-    EXPECT_EQ(parseConfig(std::string(1000, '\n') + "x\ny").complaints.front(), "line 1001: 'x' is no \"key = value\"");
+    EXPECT_EQ(parseConfig(std::string(1000, '\n') + "x\ny").complaints.front(),
+              "line 1001: 'x' is no \"key = value\"");
     std::string many;
     for (int i = 0; i < 1000; ++i) {
         many += "wrong\n";
