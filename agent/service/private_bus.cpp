@@ -27,7 +27,7 @@ namespace {
 
 constexpr const char* kSocket = "bus";
 constexpr const char* kConfig = "bus.conf";
-constexpr int kPatience = 5000;  // milliseconds for its start
+constexpr int kStartPatience = 5000;  // milliseconds for its start
 constexpr std::array kPrograms = {"/usr/bin/dbus-daemon", "/bin/dbus-daemon", "/usr/local/bin/dbus-daemon"};
 
 [[noreturn]] void failToStart(const std::string& why) {
@@ -185,7 +185,7 @@ void PrivateBus::start(const std::string& config) {
 void PrivateBus::waitForAddress(int pipe) {
     pollfd readable{pipe, POLLIN, 0};
     std::array<char, 512> text{};
-    if (poll(&readable, 1, kPatience) == 1 && read(pipe, text.data(), text.size()) > 0) {
+    if (poll(&readable, 1, kStartPatience) == 1 && read(pipe, text.data(), text.size()) > 0) {
         address_ = "unix:path=" + escapedAddress(directory_->path() + kSocket);
     }
 }

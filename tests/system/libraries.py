@@ -1,4 +1,4 @@
-"""32-bit libraries of Debian for the builds on this machine: prints the directory that holds them.
+"""libraries.py DIRECTORY: puts 32-bit libraries of Debian there, for a build on this machine that is linked with them.
 
 The machine's own package state is left alone: an archive's two halves are not always in step, and then the 32-bit package of a
 library that is installed here cannot be had.
@@ -8,6 +8,7 @@ import hashlib
 import os
 import shutil
 import subprocess
+import sys
 
 from image import extract
 from packages import Apt
@@ -57,7 +58,7 @@ def main():
     os.makedirs(cache(), exist_ok=True)
     if not os.path.exists(directory):
         make(directory)
-    print(directory)
+    shutil.copytree(directory, sys.argv[1], symlinks=True, dirs_exist_ok=True)
 
 
 if __name__ == "__main__":
