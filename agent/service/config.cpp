@@ -33,8 +33,8 @@ std::optional<long> numberWithin(const std::string& value, long least, long most
 
 template <auto Member, long Least, long Most, bool ZeroToo = false>
 bool setDuration(Config& config, const std::string& value) {
-    const auto number = numberWithin(value, ZeroToo ? 0 : Least, Most);
-    if (!number || (*number < Least && *number != 0)) {
+    const auto number = ZeroToo && value == "0" ? std::optional(0L) : numberWithin(value, Least, Most);
+    if (!number) {
         return false;
     }
     config.*Member = std::remove_reference_t<decltype(config.*Member)>(*number);

@@ -1,6 +1,9 @@
 #include "agent/service/daemon.h"
 
+#include <unistd.h>
+
 #include <algorithm>
+#include <csignal>
 #include <optional>
 
 #include "agent/core/catalogue_file.h"
@@ -221,7 +224,7 @@ ExitStatus serve(Options& options, const Manager& manager, bus::Connection& conn
         daemon.run(agent, *config, past);
         daemon.giveSignalsBack();
         if (daemon.endedBy() != 0) {
-            raise(daemon.endedBy());  // from here on the end is a matter of a second
+            kill(getpid(), daemon.endedBy());  // from here on the end is a matter of a second
         }
     }
     showErrors(process.errors());

@@ -17,7 +17,7 @@ constexpr Workers::Limits kWriters{1, 16, 64};
 constexpr std::chrono::seconds kBusTime{10};
 
 bus::Message busCall(const bus::Connection& connection, const std::string& member) {
-    const bus::Message call =
+    bus::Message call =
         connection.newCall({"org.freedesktop.DBus", "/org/freedesktop/DBus", "org.freedesktop.DBus", member});
     bus::Writer(call).put(kBusName);
     return call;

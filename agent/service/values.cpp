@@ -1,5 +1,6 @@
 #include "agent/service/values.h"
 
+#include <algorithm>
 #include <array>
 #include <atomic>
 #include <chrono>
@@ -255,10 +256,16 @@ void putEvent(bus::Writer& writer, const Event& event) {
 }
 
 std::vector<std::string> takeWords(bus::Reader& reader) {
+    constexpr std::size_t kMost = 1024;
     std::vector<std::string> words;
     reader.variant([&](const std::string& type) {
         if (type.size() == 2 && type.front() == 'a') {
-            reader.array(type.c_str() + 1, [&] { words.push_back(reader.asWord()); });
+            reader.array(type.c_str() + 1, [&] {
+                if (words.size() == kMost) {
+                    throw bus::Error(bus::kLimitsExceeded, "too many values in one call");
+                }
+                words.push_back(reader.asWord());
+            });
         } else {
             words.push_back(reader.asWord());
         }
