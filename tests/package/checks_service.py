@@ -142,6 +142,26 @@ def write_denied(context):
     expect("alice" in host.sh("cat /opt/vantrel/corvista/data/asset.dat"), "nothing was written")
 
 
+@check("cvagent: asks the service, shows what it shows by itself, and keeps one history with it")
+def client(context):
+    host = context.host
+    served = host.sh("cvagent tree")
+    service = main_pid(context)
+    host.sh("cvagent set computer OwnerName bob")
+    expect("bob" in host.sh("cvagent history --json"), "the write is not in the history")
+    expect("wrote" in messages(context).splitlines()[-1], "the service has not written it")
+    host.sh(f"systemctl stop {UNIT}")
+    alone = host.sh("cvagent tree")
+    host.sh("cvagent set computer OwnerName carol")
+    kept = host.sh("cvagent history --json")
+    expect("bob" in kept and "carol" in kept, kept)
+    host.sh(f"systemctl start {UNIT}")
+    wait_up(context)
+    expect(main_pid(context) != service, "the service was not stopped")
+    expect_equal("lines that differ", [line for line in served.splitlines() if line not in alone], [])
+    expect("carol" in host.sh("cvagent history --json"), "what happened without the service")
+
+
 @check("sandbox: what root writes through the service reaches the host's files and its kernel")
 def writes(context):
     host = context.host
