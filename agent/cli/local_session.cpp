@@ -173,10 +173,9 @@ void LocalSession::tellMissingTools(const std::vector<Reading>& properties) {
         return;  // whatever another plug-in runs
     }
     for (const MissingTool& missing : missingTools()) {
-        const std::string listed = ", " + missing.costs + ",";
         const bool concerned =
-            properties.empty() || std::ranges::any_of(properties, [&](const Reading& reading) {
-                return listed.find(", " + reading.name() + ",") != std::string::npos;
+            properties.empty() || std::ranges::any_of(properties, [&missing](const Reading& reading) {
+                return missing.costsProperty(reading.name());
             });
         if (concerned) {
             complain("there is no " + missing.tool + " (package " + missing.package +

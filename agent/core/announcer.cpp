@@ -2,6 +2,8 @@
 
 #include <limits>
 
+#include "framework/qx/whole_number.h"
+
 namespace cvagent {
 
 namespace {
@@ -49,7 +51,7 @@ void Announcer::tellWithdrawn(const Event& event) {
 /// What a read has brought since the last event is not in the chain: its reader knows it.
 void Announcer::tellAlert(Event event) {
     if (!event.propertyName.empty()) {
-        const IC::PropertyValue after(IC::Number(static_cast<unsigned int>(std::stoul(event.after))), true);
+        const IC::PropertyValue after(IC::Number(QX::wholeNumber<unsigned int>(event.after).value()), true);
         const auto known = facts_.note(event.nodeId, event.property, after);
         const auto told = told_.find({event.nodeId, event.property});
         if (told != told_.end()) {

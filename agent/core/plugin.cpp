@@ -71,6 +71,7 @@ Plugin::Plugin(const std::string& file, Listener* listener, Tell tell, LoadOnly 
 Plugin::Plugin(const std::string& file, Listener* listener, Tell tell, bool processors)
     : Plugin(file, listener, std::move(tell), LoadOnly()) {
     start(processors);
+    tellEvents();
 }
 
 std::unique_ptr<Plugin> Plugin::loaded(const std::string& file, Listener* listener, Tell tell) {
@@ -130,13 +131,13 @@ void Plugin::takePlace() {
 
 void Plugin::start(bool processors) {
     begun_ = true;
+    events_.startHere();
     try {
         guarded("initialize of " + inQuotes(file_), [this, processors] { initialize(processors); });
     } catch (...) {
         events_.abandon();
         throw;
     }
-    events_.release();
 }
 
 void Plugin::initialize(bool processors) {

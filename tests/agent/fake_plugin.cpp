@@ -9,6 +9,7 @@
 //                           asks once more when the library is closed
 //   manyerrors              initialize logs sixty different errors
 //   hangstart, hangstop     initialize, unload never return
+//   holdstart               initialize hangs while it is held
 //   slowstop                unload takes a tenth of a second
 //   pipe                    initialize runs a command and notes who else has its pipe, and its end
 //   command                 initialize runs a command that hangs, and notes what it tells
@@ -205,6 +206,10 @@ public:
         build();
         if (told("hangstart")) {
             hang();
+        }
+        if (told("holdstart")) {
+            waitWhileHeld();
+            note("held no more");
         }
         if (told("pipe")) {
             FILE* const pipe = popen("exit 7", "r");

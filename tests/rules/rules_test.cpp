@@ -124,6 +124,24 @@ TEST(CodeRules, ThePluginHasOneWayToTheLogger) {
     }
 }
 
+/// One reader of whole numbers for the framework and all above it, one for the host tools and what stands in
+/// for them, the C library's for what the tools of old print; and one for sizes, which fdisk prints as
+/// anything.
+TEST(CodeRules, NumbersAreReadInOnePlaceEach) {
+    const std::regex call(
+        R"re(\b(from_chars|strto(l|ul|ll|ull|f|d|ld|imax|umax)|ato(i|l|ll|f)|sto(i|l|ul|ll|ull|f|d|ld)|sscanf)\s*\()re");
+    std::set<std::string> readers;
+    for (const auto& [room, allowed] : kMayInclude) {
+        for (const fs::path& file : sources(room)) {
+            if (std::regex_search(codeOnly(file), call)) {
+                readers.insert(fs::relative(file, kTree));
+            }
+        }
+    }
+    EXPECT_EQ(readers, (std::set<std::string>{"framework/qx/whole_number.h", "hosttools/files.cpp",
+                                              "mi/text.cpp", "storage/drive_nodes.cpp"}));
+}
+
 TEST(CodeRules, TheAgentsLibraryPrintsNothingAndEndsNothing) {
     const std::regex edge(
         R"re(\b(std::c(err|out|in)|f?printf|puts|exit|_exit|set_terminate|abort|isatty)\b)re");
