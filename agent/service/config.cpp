@@ -15,6 +15,7 @@
 #include "agent/core/owners.h"
 #include "agent/core/problem.h"
 #include "agent/core/text.h"
+#include "framework/qx/whole_number.h"
 
 namespace cvagent::service {
 
@@ -27,7 +28,7 @@ using Setter = bool (*)(Config& config, const std::string& value);
 
 /// The number when it lies within the bounds.
 std::optional<long> numberWithin(const std::string& value, long least, long most) {
-    const auto number = wholeNumber<long>(value);
+    const auto number = QX::wholeNumber<long>(value);
     return number && *number >= least && *number <= most ? number : std::nullopt;
 }
 

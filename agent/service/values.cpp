@@ -8,6 +8,7 @@
 #include <string_view>
 
 #include "agent/bus/text.h"
+#include "framework/qx/whole_number.h"
 
 namespace cvagent::service {
 
@@ -74,7 +75,7 @@ void putDecimal(bus::Writer& writer, const std::string& text) {
         digits.erase(point, 1);
     }
     writer.structure("xq", [&] {
-        writer.put(std::int64_t{std::strtoll(digits.c_str(), nullptr, 10)});
+        writer.put(QX::wholeNumber<std::int64_t>(digits).value_or(0));
         writer.put(static_cast<std::uint16_t>(scale));
     });
 }
