@@ -363,7 +363,7 @@ HOST_TEST(ServiceClient, AWatchGoesOnWhenTheServiceComesAgain) {
     for (const char* name : {"one", "two"}) {
         host.run(asking({"set", "computer", "OwnerContact", name}));
     }
-    EXPECT_TRUE(watch.waitForOutput("\"two\""));
+    EXPECT_TRUE(watch.waitForOutput("\"two\"", 2s)) << watch.err() << run.program().err() << watch.out();
     run.program().signal(SIGKILL);
     EXPECT_TRUE(eventually([&] { return watch.err().find("waiting for the service") != std::string::npos; }));
     ServiceRun again(host);
@@ -397,10 +397,10 @@ void forgeEvents(const bus::Connection& bus) {
     for (int connection = 0; connection < 20; ++connection) {
         const bus::Message forged = bus.newSignal(ServiceRun::kRoot, call::kAgent, "Event");
         bus::Writer writer(forged);
-        writer.structure("tstusssussssau", [&] {
+        writer.structure("tstusssussssssau", [&] {
             writer.put(std::uint64_t{1}).put("alert").put(std::uint64_t{0}).put(std::uint32_t{0});
             writer.put("").put("/forged").put("forged").put(std::uint32_t{0});
-            writer.put("").put("").put("").put("").put(std::vector<std::uint32_t>{1, 2, 3});
+            writer.put("").put("").put("").put("").put("").put("").put(std::vector<std::uint32_t>{1, 2, 3});
         });
         sd_bus_message_set_destination(forged.get(), (":1." + std::to_string(connection)).c_str());
         bus.send(forged);

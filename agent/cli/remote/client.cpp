@@ -72,7 +72,7 @@ bus::Message Client::askBus(const char* member, const std::string& name) {
     const bus::Message call = connection_.newCall({kBusDriver, kBusObject, kBusDriver, member});
     bus::Writer(call).put(name);
     try {
-        const bus::Message answer = answerTo(call, kShort);
+        bus::Message answer = answerTo(call, kShort);
         if (!answer) {
             failHanging("bus", kShort);
         }
@@ -124,7 +124,7 @@ void Client::checkAnswer(const bus::Message& answer) {
 }
 
 bus::Message Client::ask(const bus::Message& call, Seconds longest) {
-    const bus::Message answer = answerTo(call, longest);
+    bus::Message answer = answerTo(call, longest);
     if (!answer) {
         failHanging("service", longest);
     }
@@ -150,7 +150,7 @@ bus::Message Client::askForLong(const bus::Message& call) {
 }
 
 bus::Message Client::propertyCall(const std::string& name) const {
-    const bus::Message call = connection_.newCall({owner_, service::kRootObject, kProperties, "Get"});
+    bus::Message call = connection_.newCall({owner_, service::kRootObject, kProperties, "Get"});
     bus::Writer(call).put(service::kAgentInterface).put(name);
     return call;
 }

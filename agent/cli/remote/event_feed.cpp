@@ -90,10 +90,10 @@ bool EventFeed::pause() const {
 /// Listens first and then asks for what came before, so that nothing falls between.
 void EventFeed::follow(Client& client) {
     bool gone = false;
-    const bus::Slot events = client.connection().match(
+    [[maybe_unused]] const bus::Slot events = client.connection().match(
         eventsOf(client.owner()),
         [this, &client](const bus::Message& signal) { signalled(client.owner(), signal); });
-    const bus::Slot end = client.connection().match(
+    [[maybe_unused]] const bus::Slot end = client.connection().match(
         endOf(client.owner()), [&gone](const bus::Message& signal) { gone = signal.sender() == kBusDriver; });
     if (client.numberProperty("LastEvent") < last_) {
         last_ = 0;  // one that keeps no history counts anew

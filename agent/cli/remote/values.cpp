@@ -1,11 +1,9 @@
 #include "agent/cli/remote/values.h"
 
-#include <charconv>
-#include <limits>
 #include <utility>
 
-#include "agent/core/text.h"
 #include "agent/service/values.h"
+#include "framework/qx/whole_number.h"
 
 namespace cvagent::remote {
 
@@ -19,16 +17,9 @@ enum Flag : std::uint32_t { stale = 1, missing = 2, timedOut = 4, noValue = 8 };
     throw bus::Error(bus::kInvalidArgs, "a value of a kind that is not known");
 }
 
-/// The word is the shortest decimal that means the number, and means no other one.
-double realOf(const std::string& word) {
-    double number = 0;
-    std::from_chars(word.data(), word.data() + word.size(), number);
-    return number;
-}
-
 template <class Number>
 Number wholeOf(const std::string& word) {
-    const auto number = wholeNumber<Number>(word);
+    const auto number = QX::wholeNumber<Number>(word);
     return number ? *number : (failUnknown(), Number());
 }
 
@@ -49,15 +40,15 @@ IC::Number takeNumber(bus::Reader& reader, const std::string& type) {
     if (type == "b") {
         return {reader.flag()};
     }
+    if (type == "d") {
+        return {reader.real()};
+    }
     const std::string word = reader.asWord();
     if (type == "u") {
         return {wholeOf<unsigned int>(word)};
     }
     if (type == "t") {
         return {wholeOf<unsigned long long>(word)};
-    }
-    if (type == "d") {
-        return {realOf(word)};
     }
     return word.empty() ? IC::Number() : (failUnknown(), IC::Number());
 }
@@ -181,7 +172,7 @@ NumberedEvent takeEvent(bus::Reader& reader) {
     NumberedEvent taken;
     Event event;
     std::optional<Event::Kind> kind;
-    reader.structure("tstusssussssau", [&] {
+    reader.structure("tstusssussssssau", [&] {
         event.number = reader.longNumber();
         kind = kindOf(reader.text());
         event.time = static_cast<std::time_t>(reader.longNumber() / kMicroseconds);
@@ -190,7 +181,8 @@ NumberedEvent takeEvent(bus::Reader& reader) {
             *text = reader.text();
         }
         event.property = reader.number();
-        for (std::string* text : {&event.propertyName, &event.before, &event.after, &event.caller}) {
+        for (std::string* text : {&event.propertyName, &event.before, &event.after, &event.caller,
+                                  &event.wanted, &event.verdict}) {
             *text = reader.text();
         }
         takeCodes(reader, event);
