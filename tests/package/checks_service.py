@@ -215,6 +215,21 @@ def reload(context):
     expect_equal("process", main_pid(context), before)
 
 
+@check("configuration: the file that is installed names every key, and each is taken")
+def keys(context):
+    host = context.host
+    host.sh(f"sed 's/^#\\([a-z]\\)/\\1/' {CONF} > /root/all.conf; cvagentd --check --config /root/all.conf")
+    named = host.sh("sed -n 's/^\\([a-z-]*\\) = .*/\\1/p' /root/all.conf").split()
+    with open(os.path.join(HERE, "../../packaging/agent.conf.5"), encoding="utf-8") as file:
+        page = file.read()
+    with open(os.path.join(HERE, "../../agent/service/config.cpp"), encoding="utf-8") as file:
+        known = re.findall(r'^    \{"([a-z-]+)", set', file.read(), re.MULTILINE)
+    expect(len(known) > 3, f"keys in the source: {known}")
+    expect_equal("keys in the file", sorted(named), sorted(known))
+    for key in known:
+        expect(".B " + key.replace("-", "\\-") + "\n" in page, f"not in agent.conf(5): {key}")
+
+
 @check("journal: no complaint of the service or of its commands about the sandbox")
 def quiet(context):
     lines = [line for line in messages(context).splitlines()
