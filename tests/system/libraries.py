@@ -58,7 +58,11 @@ def main():
     os.makedirs(cache(), exist_ok=True)
     if not os.path.exists(directory):
         make(directory)
-    shutil.copytree(directory, sys.argv[1], symlinks=True, dirs_exist_ok=True)
+    os.makedirs(sys.argv[1], exist_ok=True)
+    for name in sorted(os.listdir(directory)):
+        target = os.path.join(sys.argv[1], name)
+        if not os.path.lexists(target):  # an earlier build's serves again
+            shutil.copy2(os.path.join(directory, name), target, follow_symlinks=False)
 
 
 if __name__ == "__main__":
