@@ -7,7 +7,8 @@ from guest import EVENTS, by_id
 from tap import check, expect, expect_equal
 
 MACHINE = "service"
-CHANGES_ITSELF = {"CurrentTime", "MemoryAvailable", "MemoryFree", "Uptime", "Reads", "Writes"}
+CHANGES_ITSELF = {"AvailableMemory", "CurrentTime", "FreeSwap", "ReadBytes", "Reads", "ReceivedBytes", "ReceivedPackets", "SentBytes",
+                  "SentPackets", "WrittenBytes", "Writes"}
 
 
 def client(context, *words):
