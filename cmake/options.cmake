@@ -7,6 +7,12 @@ set(CORVISTA_SANITIZE "" CACHE STRING "Sanitizers, as -fsanitize= takes them")
 
 find_package(Threads REQUIRED)
 
+# Where no package brings them; the programs look for them beside our own libraries, and so do these for what they load, by the old
+# kind of run path.
+if(CORVISTA_SERVICE AND CMAKE_SIZEOF_VOID_P EQUAL 4 AND CMAKE_LIBRARY_PATH AND NOT EXISTS ${CMAKE_LIBRARY_PATH}/libsystemd.so)
+  message(FATAL_ERROR "32-bit libraries are missing: python3 tests/system/libraries.py ${CMAKE_LIBRARY_PATH}")
+endif()
+
 add_library(corvista_options INTERFACE)
 target_include_directories(corvista_options INTERFACE ${CMAKE_SOURCE_DIR})
 # -fno-gnu-unique: a unique symbol would keep the plug-in mapped after dlclose.

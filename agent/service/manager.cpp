@@ -32,8 +32,8 @@ Manager::Manager() : socket_(variable("NOTIFY_SOCKET")) {
 }
 
 void Manager::reloading() const {
-    constexpr long kMicroseconds = 1000000;
-    constexpr long kNanoseconds = 1000;
+    constexpr long long kMicroseconds = 1000000;  // a 32-bit long ends after half an hour of them
+    constexpr long long kNanoseconds = 1000;
     timespec now{};
     clock_gettime(CLOCK_MONOTONIC, &now);
     tell("RELOADING=1\nMONOTONIC_USEC=" +

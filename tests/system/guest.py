@@ -31,6 +31,12 @@ class Guest:
     def sleep(self, seconds):
         self.sh(f"sleep {seconds}")
 
+    def wait_for_text(self, file, text):
+        """Until the file has it, which may be so already."""
+        result = self.machine.run(f"i=0; until grep -q -F {shlex.quote(text)} {file}; do sleep 1; i=$((i + 1)); "
+                                  f"[ $i -lt {LONGEST_WAIT} ] || exit 1; done")
+        expect(result.status == 0, f"not within {LONGEST_WAIT} s in {file}: {text}")
+
     def names(self, pattern):
         """Base names of the paths that match."""
         return [path.rsplit("/", 1)[1] for path in self.sh(f"for p in {pattern}; do echo $p; done").split()

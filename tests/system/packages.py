@@ -7,7 +7,7 @@ import sys
 
 # What the guest runs, apart from the kernel and our own programs; their dependencies come with them.
 TOOLS = ["bridge-utils", "busybox-static", "dash", "dmsetup", "ethtool", "hostname", "iproute2", "libstdc++6", "tzdata",
-         "util-linux"]
+         "util-linux", "dbus-daemon", "libsqlite3-0"]
 KERNEL = "linux-image-686-pae"
 
 

@@ -20,6 +20,7 @@ import checks_events  # noqa: F401
 import checks_settings  # noqa: F401
 import checks_stress  # noqa: F401
 import checks_hardware  # noqa: F401
+import checks_service  # noqa: F401
 
 
 class Context:

@@ -1,0 +1,249 @@
+"""The service as an administrator meets it: installed, asked, hurt, reloaded, stopped."""
+
+import json
+import os
+import re
+
+from host import HostFailure
+from tap import check, expect, expect_equal
+
+UNIT = "corvista-agent.service"
+NAME = "com.vantrel.Corvista1"
+OWNER_NAME = 116  # of a computer
+HOST_NAME, DNS_SERVERS = 97, 94  # of an IP configuration
+HERE = os.path.dirname(os.path.abspath(__file__))
+CONF = "/etc/corvista/agent.conf"
+CHANGES_ITSELF = re.compile("Time|Available|Free|Used|Uptime|Load|Frequency|Temperature|Bytes|Packets|Reads|Writes")
+ASK = f"busctl --auto-start=no get-property {NAME} /com/vantrel/Corvista1 {NAME}.Agent"
+
+
+def show(context, *properties):
+    """{name: value} of the unit."""
+    text = context.host.sh(f"systemctl show {UNIT} -p {','.join(properties)}")
+    return dict(line.split("=", 1) for line in text.splitlines())
+
+
+def main_pid(context):
+    pid = int(show(context, "MainPID")["MainPID"])
+    expect(pid > 0, f"{UNIT} has no process")
+    return pid
+
+
+def wait_up(context):
+    context.host.wait_for(f"systemctl is-active {UNIT} && {ASK} Version")
+
+
+def restarted(context, before):
+    """Waits until another process serves; how often the unit was restarted by then."""
+    context.host.wait_for(f"[ $(systemctl show {UNIT} -p MainPID --value) -gt 0 ] && "
+                          f"[ $(systemctl show {UNIT} -p MainPID --value) != {before} ]")
+    wait_up(context)
+    return int(show(context, "NRestarts")["NRestarts"])
+
+
+def messages(context):
+    return context.host.sh(f"journalctl --no-pager -o cat -u {UNIT}")
+
+
+@check("install: apt installs the package, and the service is up")
+def install(context):
+    host = context.host
+    host.sh("ip link add cable0 type veth peer name cable1; ip address add 192.0.2.10/24 dev cable0; ip link set cable0 up")
+    for name in ("corvista-agent", "corvista-dev"):
+        host.put(context.package(name), f"/tmp/{name}.deb")
+    try:
+        host.sh("apt-get install -y --no-install-recommends /tmp/corvista-agent.deb 2>&1")
+        wait_up(context)
+    except AssertionError as failure:
+        raise HostFailure(str(failure)) from failure
+    state = show(context, "Type", "NotifyAccess", "UnitFileState", "SubState")
+    expect_equal("the unit", (state["Type"], state["UnitFileState"], state["SubState"]), ("notify", "enabled", "running"))
+    expect_equal("failed units", host.sh("systemctl --failed --plain --no-legend"), "")
+
+
+@check("install: the group, the directory of the history, the bus and polkit know of it")
+def around(context):
+    host = context.host
+    expect(host.sh("getent group corvista").startswith("corvista:"), "no group")
+    expect_equal("directory", host.sh("stat -c '%a %U %G' /var/lib/corvista").strip(), "750 root corvista")
+    actions = host.sh("pkaction | grep corvista").split()
+    expect_equal("actions", actions, ["com.vantrel.corvista1.power", "com.vantrel.corvista1.write"])
+    for action in actions:
+        details = host.sh(f"pkaction --verbose --action-id {action}")
+        expect_equal(f"who may at once: {action}", details.count("auth_admin\n"), 3)
+
+
+@check("sandbox: systemd rates it 5.0 or better")
+def rated(context):
+    text = context.host.sh(f"systemd-analyze security --offline=true --no-pager /lib/systemd/system/{UNIT} 2>&1 | "
+                           "tail -n 1")
+    print(f"# {text.strip()}", flush=True)
+    level = float(text.split(": ")[1].split()[0])
+    expect(level <= 5.0, text)
+
+
+@check("sandbox: the page on security tells of every part of it")
+def explained(context):
+    with open(os.path.join(HERE, "../../docs/security.md"), encoding="utf-8") as file:
+        page = file.read()
+    unit = context.host.sh(f"sed '1,/^# docs.security.md/d; /^.Install/,$d' /lib/systemd/system/{UNIT}")
+    for line in unit.splitlines():
+        key, _, words = line.partition("=")
+        named = words.split() if key == "CapabilityBoundingSet" else [key] if key else []
+        for word in named:
+            expect(f"`{word}" in page, f"not in docs/security.md: {word}")
+
+
+@check("sandbox: a walk within it finds what one without it finds")
+def nothing_missed(context):
+    host = context.host
+    host.sh(f"systemctl stop {UNIT}")
+    boxed = "/run/systemd/system/boxed.service"
+    host.sh(f"sed -e 's|^ExecStart=.*|ExecStart=/usr/bin/cvagent tree --json|; s/^Type=.*/Type=oneshot/; "
+            f"s|^Restart=.*|StandardOutput=file:/run/boxed|; /^WatchdogSec/d' "
+            f"/lib/systemd/system/{UNIT} > {boxed}; systemctl daemon-reload; systemctl start boxed.service")
+    within = host.sh(f"cat /run/boxed; rm {boxed} /run/boxed; systemctl daemon-reload")
+    without = host.sh("cvagent tree --json")
+    host.sh(f"systemctl start {UNIT}")
+    wait_up(context)
+    expect_equal("differences", differences(json.loads(within)["nodes"], json.loads(without)["nodes"]), [])
+
+
+def differences(one, other):
+    """(path, property, value, value) of what two trees have differently, apart from what changes all the time."""
+    def facts(nodes):
+        return {(node["path"], row["name"]): row.get("value") for node in nodes for row in node["properties"].values()
+                if not CHANGES_ITSELF.search(row["name"])}
+    left, right = facts(one), facts(other)
+    expect(len(left) > 50, f"only {len(left)} facts")
+    return [(*key, left.get(key), right.get(key)) for key in sorted({**left, **right}) if left.get(key) != right.get(key)]
+
+
+@check("bus: everybody may ask, nobody but root may take the name")
+def bus_policy(context):
+    host = context.host
+    expect(host.sh(f"{ASK} Version", user="nobody").startswith("s "), "no version for a user")
+    tree = host.sh(f"busctl tree --list {NAME}", user="nobody")
+    expect("/com/vantrel/Corvista1/oshw" in tree, tree)
+    taken = host.run(f"busctl call org.freedesktop.DBus / org.freedesktop.DBus RequestName su {NAME} 4", user="nobody")
+    expect("Access denied" in taken.stderr or "not allowed" in taken.stderr, taken.stdout + taken.stderr)
+
+
+@check("bus: a user without polkit's consent changes nothing")
+def write_denied(context):
+    host = context.host
+    node = host.sh(f"busctl call {NAME} /com/vantrel/Corvista1 {NAME}.Agent Find s computer").split()[1]
+    owner = f"busctl call {NAME} /com/vantrel/Corvista1 {NAME}.Agent Write uuv {node} {OWNER_NAME} s"
+    denied = host.run(f"{owner} mallory", user="nobody")
+    expect(denied.returncode != 0 and "denied" in denied.stderr.lower(), denied.stdout + denied.stderr)
+    expect("mallory" not in host.sh("cat /opt/vantrel/corvista/data/* 2>/dev/null || true"), "it was written")
+    expect("may not write" in messages(context), "nothing in the journal:\n" + messages(context))
+    expect('"applied"' in host.sh(f"{owner} alice"), "root cannot write")
+    expect("alice" in host.sh("cat /opt/vantrel/corvista/data/asset.dat"), "nothing was written")
+
+
+@check("cvagent: asks the service, shows what it shows by itself, and keeps one history with it")
+def client(context):
+    host = context.host
+    served = host.sh("cvagent tree")
+    service = main_pid(context)
+    host.sh("cvagent set computer OwnerName bob")
+    expect("bob" in host.sh("cvagent history --json"), "the write is not in the history")
+    expect("wrote" in messages(context).splitlines()[-1], "the service has not written it")
+    host.sh(f"systemctl stop {UNIT}")
+    alone = host.sh("cvagent tree")
+    host.sh("cvagent set computer OwnerName carol")
+    kept = host.sh("cvagent history --json")
+    expect("bob" in kept and "carol" in kept, kept)
+    host.sh(f"systemctl start {UNIT}")
+    wait_up(context)
+    expect(main_pid(context) != service, "the service was not stopped")
+    expect_equal("lines that differ", [line for line in served.splitlines() if line not in alone], [])
+    expect("carol" in host.sh("cvagent history --json"), "what happened without the service")
+
+
+@check("sandbox: what root writes through the service reaches the host's files and its kernel")
+def writes(context):
+    host = context.host
+    node = host.sh(f"busctl call {NAME} /com/vantrel/Corvista1 {NAME}.Agent Find s ip-config:cable0").split()[1]
+    write = f"busctl call --timeout=60 {NAME} /com/vantrel/Corvista1 {NAME}.Agent Write uuv {node}"
+    host.sh(f"{write} {DNS_SERVERS} as 2 192.0.2.53 192.0.2.54")
+    expect("nameserver 192.0.2.53\nnameserver 192.0.2.54\n" in host.sh("cat /etc/resolv.conf"), "no name servers")
+    host.sh(f"{write} {HOST_NAME} s renamed")
+    expect_equal("the kernel's name of the host", host.sh("hostname"), "renamed\n")
+    expect("renamed" in host.sh("cat /etc/hosts"), "not in /etc/hosts")
+
+
+@check("crash: killed, it is started again and answers")
+def killed(context):
+    before = main_pid(context)
+    context.host.sh(f"kill -KILL {before}")
+    expect(restarted(context, before) >= 1, "not restarted by systemd")
+
+
+@check("watchdog: one that hangs is ended and started again")
+def watchdog(context):
+    host = context.host
+    host.sh(f"mkdir -p /run/systemd/system/{UNIT}.d; printf '[Service]\\nWatchdogSec=2\\n' "
+            f"> /run/systemd/system/{UNIT}.d/test.conf; systemctl daemon-reload; systemctl restart {UNIT}")
+    wait_up(context)
+    before = main_pid(context)
+    host.sh("sleep 3")
+    expect_equal("process after more than one watchdog's time", main_pid(context), before)
+    host.sh(f"kill -STOP {before}")
+    restarted(context, before)
+    expect("atchdog timeout" in messages(context), "the watchdog was not the reason")
+    host.sh(f"rm -r /run/systemd/system/{UNIT}.d; systemctl daemon-reload; systemctl restart {UNIT}")
+    wait_up(context)
+
+
+@check("reload: the file is read again by the same process; a wrong line is told with its number and changes nothing")
+def reload(context):
+    host = context.host
+    before = main_pid(context)
+    host.sh(f"cp {CONF} /root/agent.conf; systemctl reload {UNIT}")
+    host.sh(f"echo 'no such key' >> {CONF}")
+    number = host.sh(f"wc -l < {CONF}").strip()
+    refused = host.run(f"systemctl reload {UNIT}")
+    expect(refused.returncode != 0, "systemctl reload took a wrong file")
+    checked = host.run("cvagentd --check")
+    expect(checked.returncode != 0 and number in checked.stderr + checked.stdout, checked.stdout + checked.stderr)
+    host.wait_for(f"journalctl --no-pager -o cat -u {UNIT} | grep -q {CONF}.*{number}")
+    wait_up(context)
+    expect_equal("process", main_pid(context), before)
+    host.sh(f"cp /root/agent.conf {CONF}; systemctl reload {UNIT}")
+    expect_equal("process", main_pid(context), before)
+
+
+@check("configuration: the file that is installed names every key, and each is taken")
+def keys(context):
+    host = context.host
+    host.sh(f"sed 's/^#\\([a-z]\\)/\\1/' {CONF} > /root/all.conf; cvagentd --check --config /root/all.conf")
+    named = host.sh("sed -n 's/^\\([a-z-]*\\) = .*/\\1/p' /root/all.conf").split()
+    with open(os.path.join(HERE, "../../packaging/agent.conf.5"), encoding="utf-8") as file:
+        page = file.read()
+    with open(os.path.join(HERE, "../../agent/service/config.cpp"), encoding="utf-8") as file:
+        known = re.findall(r'^    \{"([a-z-]+)", set', file.read(), re.MULTILINE)
+    expect(len(known) > 3, f"keys in the source: {known}")
+    expect_equal("keys in the file", sorted(named), sorted(known))
+    for key in known:
+        expect(".B " + key.replace("-", "\\-") + "\n" in page, f"not in agent.conf(5): {key}")
+
+
+@check("journal: no complaint of the service or of its commands about the sandbox")
+def quiet(context):
+    lines = [line for line in messages(context).splitlines()
+             if "Permission denied" in line or "Operation not permitted" in line or "Read-only" in line]
+    expect_equal("complaints", lines, [])
+
+
+@check("stop: it ends in order, nothing of it stays, and the command line works by itself")
+def stop(context):
+    host = context.host
+    host.sh(f"systemctl stop {UNIT}")
+    expect_equal("the unit", show(context, "ActiveState", "Result"), {"ActiveState": "inactive", "Result": "success"})
+    expect_equal("processes", host.sh("pgrep -l cvagent || true"), "")
+    expect("/oshw" in host.sh("cvagent tree --json"), "no tree without the service")
+    expect_equal("the unit after that", host.run(f"systemctl is-active {UNIT}").stdout.strip(), "inactive")
+    host.sh(f"systemctl start {UNIT}")
+    wait_up(context)
