@@ -126,6 +126,7 @@ const Columns kOfDrives = {{"Size", kSize},
                            {"Removable", "rm"},
                            {"ReadOnly", "ro"},
                            {"Transport", "tran"},
+                           {"Maker", "vendor"},
                            {"Model", "model"},
                            {"SerialNumber", "serial"},
                            {"FirmwareVersion", "rev"},
@@ -133,6 +134,11 @@ const Columns kOfDrives = {{"Size", kSize},
 const Columns kOfPartitions = {
     {"Size", kSize}, {"Label", "partlabel"}, {"UUID", "partuuid"}, {"PartitionType", "parttype"}};
 const Columns kOfFileSystems = {{"FileSystemType", "fstype"}, {"Label", "label"}, {"UUID", "uuid"}};
+
+/// The word for all ATA drives and numbers of PCI vendors are no makers.
+bool isNoMaker(const std::string& property, const std::string& text) {
+    return property == "Maker" && (text == "ATA" || text.starts_with("0x"));
+}
 
 /// The kernel's SCSI layer cuts off what ATA drives tell.
 bool mayBeCutOff(const Json& row, const std::string& property) {
@@ -145,7 +151,8 @@ void expectColumns(const Facts& own, const Json& row, const Columns& columns) {
         const std::string text = hardware::printable(
             hardware::trimmed(theirs.is_string() ? theirs.get<std::string>() : theirs.dump()));
         const std::string fact = own.contains(property) ? own.at(property) : "nothing";
-        if (theirs.is_null() || text.empty() || (column == kSize && text == "0")) {
+        if (theirs.is_null() || text.empty() || (column == kSize && text == "0") ||
+            isNoMaker(property, text)) {
             continue;
         }
         if (mayBeCutOff(row, property)) {

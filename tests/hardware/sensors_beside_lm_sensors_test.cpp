@@ -91,7 +91,8 @@ std::vector<std::string> differences(const hardware::Host& host, const Row& row)
                           std::to_string(value));
         }
     }
-    if (fact("Label") != row.label || (fact("Alarm") == "true") != alarm) {
+    if (fact("Chip") + ":" + sensor != row.name || fact("Label") != row.label ||
+        (fact("Alarm") == "true") != alarm) {
         all.push_back(row.name + ": label " + fact("Label") + ", alarm " + fact("Alarm"));
     }
     return all;
@@ -129,14 +130,8 @@ bool hasChips(const hardware::Host& host) {
     return !host.entries("/sys/class/hwmon").empty();
 }
 
-class RecordedSensors : public testing::TestWithParam<std::string> {};
-
-TEST_P(RecordedSensors, AreThoseOfLmSensors) {
-    const RecordedHost recorded;
-    recorded.unpack(recordedHosts() + "/" + GetParam() + "/files");
-    if (!hasChips(recorded.host())) {
-        return;
-    }
+/// Compares the sensors of a recorded host.
+void compare(const RecordedHost& recorded) {
     const Json chips = hardware_test::printedJson(
         "unshare --user --map-root-user --mount sh -c 'mount --bind \"$0\" /sys && "
         "LD_PRELOAD=" CORVISTA_AS_SYSFS " exec sensors -j -c /dev/null' " +
@@ -145,6 +140,36 @@ TEST_P(RecordedSensors, AreThoseOfLmSensors) {
         GTEST_SKIP() << "no sensors, or no mount namespace for it";
     }
     EXPECT_THAT(differences(recorded.host(), chips), testing::IsEmpty());
+}
+
+class RecordedSensors : public testing::TestWithParam<std::string> {};
+
+TEST_P(RecordedSensors, AreThoseOfLmSensors) {
+    const RecordedHost recorded;
+    recorded.unpack(recordedHosts() + "/" + GetParam() + "/files");
+    if (hasChips(recorded.host())) {
+        compare(recorded);
+    }
+}
+
+TEST(SensorsOfEveryKind, AreThoseOfLmSensors) {
+    const RecordedHost recorded;
+    const std::string chip = "/sys/devices/virtual/hwmon/hwmon0/";
+    recorded.file(chip + "name", "every");
+    recorded.link("/sys/class/hwmon/hwmon0", "../../devices/virtual/hwmon/hwmon0");
+    int value = 7000;
+    for (const auto& [sensor, property] : kValues) {
+        recorded.file(chip + sensor + "1_input", std::to_string(value += 1234));
+    }
+    for (const char* limit : {"temp1_lcrit", "temp1_min", "temp1_max", "temp1_crit", "temp1_emergency",
+                              "in1_lcrit", "curr1_crit", "power1_max", "fan1_min"}) {
+        recorded.file(chip + limit, std::to_string(value += 1234));
+    }
+    recorded.file(chip + "temp1_alarm", "1");
+    recorded.file(chip + "humidity1_label", "the room");
+    recorded.file(chip + "temp2_input", "-40000");
+    recorded.file(chip + "temp2_fault", "1");
+    compare(recorded);
 }
 
 INSTANTIATE_TEST_SUITE_P(All, RecordedSensors, testing::ValuesIn(namesOfRecordedHosts()), nameOfTest);

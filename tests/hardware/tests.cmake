@@ -4,6 +4,7 @@ corvista_test(hardware LABELS threads SOURCES
   hardware/hosts_test.cpp
   hardware/memory_beside_dmidecode_test.cpp
   hardware/memory_test.cpp
+  hardware/page_test.cpp
   hardware/patience_test.cpp
   hardware/processors_test.cpp
   hardware/recorded_beside_tools_test.cpp

@@ -90,7 +90,7 @@ inline std::vector<std::string> ownWeaknesses(const hardware::Host& host) {
     std::vector<std::string> all;
     for (const auto& row : sourceOf(found.type).rows) {
         const auto fact = found.facts.all().find(row.id);
-        if (row.kind == hardware::Kind::texts && fact != found.facts.all().end()) {
+        if (std::string(row.name) == "Weaknesses" && fact != found.facts.all().end()) {
             std::ranges::transform(*fact->second.asTexts(), std::back_inserter(all), withoutColons);
         }
     }
