@@ -8,6 +8,7 @@
 
 #include "tests/hardware/golden.h"
 #include "tests/hardware/recorded_host.h"
+#include "tests/hardware/recorded_hosts.h"
 
 namespace {
 
@@ -17,20 +18,9 @@ class RecordedHosts : public testing::TestWithParam<std::string> {
 protected:
     RecordedHosts() { recorded_.unpack(directory_ + "/files"); }
 
-    const std::string directory_ = CORVISTA_TESTS_DIR "/hardware/hosts/" + GetParam();
+    const std::string directory_ = recordedHosts() + "/" + GetParam();
     RecordedHost recorded_;
 };
-
-std::vector<std::string> names() {
-    std::vector<std::string> all;
-    for (const auto& entry : fs::directory_iterator(CORVISTA_TESTS_DIR "/hardware/hosts")) {
-        if (entry.is_directory()) {
-            all.push_back(entry.path().filename());
-        }
-    }
-    std::sort(all.begin(), all.end());
-    return all;
-}
 
 TEST_P(RecordedHosts, TreeIsAsExpected) {
     const std::string tree = golden::tree(recorded_.root());
@@ -116,10 +106,6 @@ TEST_P(RecordedHosts, WhatIsForTrustedOnesIsNotToldToOthers) {
     }
 }
 
-INSTANTIATE_TEST_SUITE_P(All, RecordedHosts, testing::ValuesIn(names()), [](const auto& host) {
-    std::string name = host.param;
-    std::replace(name.begin(), name.end(), '-', '_');
-    return name;
-});
+INSTANTIATE_TEST_SUITE_P(All, RecordedHosts, testing::ValuesIn(namesOfRecordedHosts()), nameOfTest);
 
 }  // namespace

@@ -7,18 +7,15 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <array>
-#include <cctype>
 #include <condition_variable>
-#include <cstdio>
 #include <cstdlib>
 #include <fstream>
 #include <mutex>
 #include <nlohmann/json.hpp>
 #include <random>
-#include <tuple>
 
 #include "plugins/hardware/hardware_mi.h"
+#include "tests/hardware/beside_ip.h"
 #include "tests/hardware/golden.h"
 #include "tests/hardware/recorded_host.h"
 #include "tests/support/waiting.h"
@@ -44,17 +41,6 @@ bool enterOwnNetwork() {
     return (own || unshare(CLONE_NEWNS | CLONE_NEWNET) == 0) &&
            mount("", "/", "", MS_REC | MS_PRIVATE, nullptr) == 0 &&
            mount("none", "/sys", "sysfs", 0, nullptr) == 0;
-}
-
-std::string output(const std::string& command) {
-    std::string text;
-    FILE* const pipe = popen(command.c_str(), "r");
-    std::array<char, 4096> piece{};
-    for (std::size_t count = 0; (count = fread(piece.data(), 1, piece.size(), pipe)) > 0;) {
-        text.append(piece.data(), count);
-    }
-    pclose(pipe);
-    return text;
 }
 
 bool ip(const std::string& words) {
@@ -127,7 +113,7 @@ TEST_F(Links, AreOfTheKindThatIpNames) {
     ip("link add vxlan0 type vxlan id 4 dstport 4789");
     ip("tuntap add tun0 mode tun");
     ip("tuntap add tap0 mode tap");
-    const Json all = Json::parse(output("ip -j -d link"));
+    const Json all = Json::parse(hardware_test::printed("ip -j -d link"));
     EXPECT_GE(all.size(), 3U);
     for (const Json& link : all) {
         const std::string name = link["ifname"];
@@ -138,39 +124,7 @@ TEST_F(Links, AreOfTheKindThatIpNames) {
     }
 }
 
-/// What differs between the node of a link and what ip tells of it.
-std::vector<std::string> differences(const hardware::Host& host, const Json& link) {
-    const std::string name = link["ifname"];
-    std::vector<std::string> all;
-    const auto compare = [&](const char* property, const Json& value) {
-        const std::string wanted = value.is_string() ? value.get<std::string>() : value.dump();
-        const std::string own = told(host, Class::link, name, property);
-        if (own != wanted) {
-            all.push_back(name + " " + property + ": " + own + ", ip: " + wanted);
-        }
-    };
-    std::string state = link["operstate"];
-    std::transform(state.begin(), state.end(), state.begin(),
-                   [](unsigned char letter) { return std::tolower(letter); });
-    compare("Index", link["ifindex"]);
-    compare("HardwareAddress", link.value("address", ""));
-    compare("PermanentAddress", link.value("permaddr", told(host, Class::link, name, "PermanentAddress")));
-    compare("MTU", link["mtu"]);
-    compare("State", state);
-    compare("Master", link.value("master", ""));
-    compare("Queues", link["num_rx_queues"]);
-    for (const auto& [way, prefix, error] :
-         {std::tuple{"rx", "Received", "Receive"}, {"tx", "Sent", "Send"}}) {
-        const Json& counters = link["stats64"][way];
-        compare((prefix + std::string("Bytes")).c_str(), counters["bytes"]);
-        compare((prefix + std::string("Packets")).c_str(), counters["packets"]);
-        compare((error + std::string("Errors")).c_str(), counters["errors"]);
-        compare((error + std::string("Dropped")).c_str(), counters["dropped"]);
-    }
-    return all;
-}
-
-TEST_F(Links, HaveTheValuesThatIpTells) {
+TEST_F(Links, HaveTheValuesThatIpAndEthtoolTell) {
     ip("link set lo up");
     ip("link add veth0 numrxqueues 3 type veth peer name veth1");
     ip("link add br0 type bridge");
@@ -179,9 +133,15 @@ TEST_F(Links, HaveTheValuesThatIpTells) {
     ip("link set br0 up");
     const auto all = [this] {
         std::vector<std::string> differing;
-        for (const Json& link : Json::parse(output("ip -j -d -s link"))) {
-            const auto of = differences(host_, link);
-            differing.insert(differing.end(), of.begin(), of.end());
+        for (const Json& link : Json::parse(hardware_test::printed("ip -j -d -s -s link"))) {
+            const std::string name = link["ifname"];
+            const auto own = hardware_test::factsOf(host_, Class::link, name);
+            for (const auto& theirs : {hardware_test::toldByIp(link), hardware_test::countedByIp(link),
+                                       hardware_test::toldByEthtool(name)}) {
+                for (const std::string& one : hardware_test::differences(own, theirs)) {
+                    differing.push_back(name + " " + one);
+                }
+            }
         }
         return differing;
     };

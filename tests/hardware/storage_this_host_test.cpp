@@ -3,12 +3,13 @@
 #include <unistd.h>
 
 #include <array>
-#include <cstdio>
 #include <filesystem>
 #include <nlohmann/json.hpp>
 #include <set>
+#include <sstream>
 
 #include "tests/hardware/storage_host.h"
+#include "tests/hardware/tools.h"
 
 namespace {
 
@@ -16,21 +17,10 @@ using hardware::Class;
 using hardware_test::factsOf;
 using Json = nlohmann::json;
 
-std::string output(const std::string& command) {
-    std::string text;
-    std::array<char, 4096> piece{};
-    const std::unique_ptr<FILE, int (*)(FILE*)> pipe(popen(command.c_str(), "r"), pclose);
-    while (pipe != nullptr && fgets(piece.data(), piece.size(), pipe.get()) != nullptr) {
-        text += piece.data();
-    }
-    return text;
-}
-
 class ThisHostsStorage : public testing::Test {
 protected:
     ThisHostsStorage() {
-        const Json all =
-            Json::parse(output("lsblk --json --bytes --output-all --list 2> /dev/null"), nullptr, false);
+        const Json all = hardware_test::printedJson("lsblk --json --bytes --output-all --list");
         if (all.is_object()) {
             rows_ = all.at("blockdevices");
         }
@@ -100,7 +90,10 @@ TEST_F(ThisHostsStorage, WhatDrivesAreIsWhatLsblkSays) {
                                                                              {"Removable", "rm"},
                                                                              {"ReadOnly", "ro"},
                                                                              {"Model", "model"},
-                                                                             {"SerialNumber", "serial"}}) {
+                                                                             {"SerialNumber", "serial"},
+                                                                             {"FirmwareVersion", "rev"},
+                                                                             {"Transport", "tran"},
+                                                                             {"WWN", "wwn"}}) {
             expectSame(facts, ours, theirs.at(column));
         }
     }
@@ -117,6 +110,46 @@ TEST_F(ThisHostsStorage, PartitionsAreThoseOfLsblk) {
         expectSame(facts, "Label", theirs.at("partlabel"));
         expectSame(facts, "UUID", theirs.at("partuuid"));
         expectSame(facts, "PartitionType", theirs.at("parttype"));
+        if (theirs.contains("start") && theirs.at("start").is_number()) {
+            EXPECT_EQ(facts.at("Start"), std::to_string(theirs.at("start").get<unsigned long long>() * 512));
+        }
+    }
+}
+
+/// Completed reads, sectors read, writes and sectors written, by device.
+std::map<std::string, std::array<std::string, 4>> countedByVmstat() {
+    std::istringstream lines(hardware_test::printed("LC_ALL=C vmstat -d"));
+    std::map<std::string, std::array<std::string, 4>> all;
+    for (std::string line; std::getline(lines, line);) {
+        std::istringstream words(line);
+        std::string name;
+        std::string other;
+        std::array<std::string, 4> counts;
+        words >> name >> counts[0] >> other >> counts[1] >> other >> counts[2] >> other >> counts[3];
+        all[name] = counts;
+    }
+    return all;
+}
+
+TEST_F(ThisHostsStorage, TransfersAreThoseOfVmstat) {
+    if (countedByVmstat().empty()) {
+        GTEST_SKIP() << "no vmstat";
+    }
+    std::map<std::string, std::map<std::string, std::string>> before;
+    for (const std::string& name : listed(host_, Class::drive)) {
+        before[name] = factsOf(host_, Class::drive, name);
+    }
+    const auto counted = countedByVmstat();
+    for (const auto& [name, facts] : before) {
+        SCOPED_TRACE(name);
+        const auto after = factsOf(host_, Class::drive, name);
+        std::size_t at = 0;
+        for (const auto& [property, unit] :
+             {std::pair{"Reads", 1}, {"ReadBytes", 512}, {"Writes", 1}, {"WrittenBytes", 512}}) {
+            const unsigned long long theirs = std::stoull(counted.at(name)[at++]) * unit;
+            EXPECT_LE(std::stoull(facts.at(property)), theirs) << property;
+            EXPECT_GE(std::stoull(after.at(property)), theirs) << property;
+        }
     }
 }
 
@@ -131,7 +164,12 @@ TEST_F(ThisHostsStorage, FileSystemsAreMountedWhereLsblkSees) {
         const auto facts = factsOf(host_, Class::fileSystem, name);
         expectSame(facts, "FileSystemType", theirs.at("fstype"));
         expectSame(facts, "Label", theirs.at("label"));
+        expectSame(facts, "UUID", theirs.at("uuid"));
         expectSame(facts, "Size", theirs.at("fssize"));
+        if (theirs.at("fsavail").is_number() && facts.contains("Free")) {
+            constexpr double kBetween = 1e9;  // lsblk looked before, and others fill it meanwhile
+            EXPECT_NEAR(std::stod(facts.at("Free")), theirs.at("fsavail").get<double>(), kBetween);
+        }
         for (const Json& place : theirs.at("mountpoints")) {
             EXPECT_TRUE(
                 place.is_null() || place == "[SWAP]" ||

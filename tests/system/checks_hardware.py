@@ -1,5 +1,5 @@
-"""The second plug-in's drives, arrays and mappings, against lsblk in the same guest. A machine of its own: drives whose
-commands have a time limit want a clock that waits for them."""
+"""The second plug-in's values against those of lsblk, dmidecode, smartctl and others in the same guest. A machine of its own:
+drives whose commands have a time limit want a clock that waits for them."""
 
 import json
 
@@ -7,7 +7,7 @@ from guest import by_id
 from machine import HARDWARE_DRIVES
 from tap import check, expect, expect_equal
 
-DRIVE, PARTITION, FILE_SYSTEM, ARRAY, MAPPING = 305, 306, 307, 308, 309
+SYSTEM, MEMORY, MODULE, PROCESSOR, DRIVE, PARTITION, FILE_SYSTEM, ARRAY, MAPPING, LINK, SENSOR = range(301, 312)
 MACHINE = "hardware"
 OWN_VERSION = {"nvme0n1": "firmware_rev", "mmcblk0": "fwrev"}  # drives whose firmware is as old as QEMU says
 SETUP = r"""
@@ -27,7 +27,9 @@ for member in dev-vda dev-vdb; do
   echo 16384 > $member/size; echo $slot > $member/slot; slot=$((slot + 1))
 done
 echo active > array_state || { dmesg | tail -20; exit 1; } >&2
-dmsetup create --noudevsync an-example --table '0 16384 linear /dev/vdc 0'
+dmsetup create --noudevsync an-example --uuid CRYPT-PLAIN-example --table '0 16384 linear /dev/vdc 0'
+mke2fs -L 'a label' /dev/sdb > /dev/null
+mkdir -p '/mnt/a place'; mount -t ext4 /dev/sdb '/mnt/a place'
 """
 
 
@@ -44,8 +46,19 @@ def load(context):
 def look(context):
     nodes = context.guest.cvagent("--plugin", plugin(context), "tree")["nodes"]
     listing = json.loads(context.guest.sh("lsblk --json --bytes --output-all --list"))["blockdevices"]
-    return ({(node["type"], by_id(node)[node["type"] * 100]): by_id(node) for node in nodes
-             if DRIVE <= node["type"] <= MAPPING}, {row["kname"]: row for row in listing})
+    return ({(node["type"], by_id(node).get(node["type"] * 100, "")): by_id(node) for node in nodes},
+            {row["kname"]: row for row in listing})
+
+
+def told(values, *numbers):
+    """The values of some properties; None for those that are not told."""
+    return tuple(values.get(number) for number in numbers)
+
+
+def rows_of(text, separator=":"):
+    """{key: value} of the lines that have both."""
+    pairs = (line.split(separator, 1) for line in text.splitlines() if separator in line)
+    return {key.strip(): value.strip() for key, value in pairs}
 
 
 def plugin(context):
@@ -67,7 +80,7 @@ def drives(context):
     for name in names(nodes, DRIVE):
         values, row = nodes[DRIVE, name], listing[name]
         expect_equal(f"{name}: size, blocks, turning, removable, read-only",
-                     tuple(values[30500 + number] for number in (7, 8, 9, 10, 11, 12)),
+                     told(values, 30507, 30508, 30509, 30510, 30511, 30512),
                      (row["size"], row["log-sec"], row["phy-sec"], row["rota"], row["rm"], row["ro"]))
         if row["tran"]:
             expect_equal(f"{name}: transport", values[30501], row["tran"])
@@ -93,11 +106,20 @@ def contents(context):
         values, row = nodes[PARTITION, name], listing[name]
         expect_equal(f"{name}: size, start", (values[30603], values[30602]),
                      (row["size"], int(context.guest.read(f"/sys/class/block/{name}/start")) * 512))
-    expect_equal("file systems", names(nodes, FILE_SYSTEM), ["nvme0n1"])
-    values = nodes[FILE_SYSTEM, "nvme0n1"]
-    told = dict(line.split("=", 1) for line in context.guest.sh("blkid -p -o export /dev/nvme0n1").splitlines())
-    expect_equal("type, label, UUID", (values.get(30701), values.get(30702), values.get(30703)),
-                 ("swap", "swap area", told["UUID"]))
+        kernel = rows_of(context.guest.sh(f"blkid -p -o export /dev/{name}"), "=")
+        expect_equal(f"{name}: number, start, size, by libblkid", told(values, 30601, 30602, 30603),
+                     (int(kernel["PART_ENTRY_NUMBER"]), int(kernel["PART_ENTRY_OFFSET"]) * 512,
+                      int(kernel["PART_ENTRY_SIZE"]) * 512))
+    expect_equal("file systems", names(nodes, FILE_SYSTEM), ["nvme0n1", "sdb"])
+    for name in names(nodes, FILE_SYSTEM):
+        values = nodes[FILE_SYSTEM, name]
+        blkid = rows_of(context.guest.sh(f"blkid -p -o export /dev/{name} | tr -d '\\\\'"), "=")
+        expect_equal(f"{name}: label, UUID", told(values, 30702, 30703), (blkid["LABEL"], blkid["UUID"]))
+        driver = {"ext2": "ext4"}  # that mounts it
+        expect_equal(f"{name}: type", values[30701], driver.get(blkid["TYPE"], blkid["TYPE"]))
+    values, row = nodes[FILE_SYSTEM, "sdb"], listing["sdb"]
+    expect_equal("mount points, size, free", told(values, 30704, 30705, 30706),
+                 (row["mountpoints"], int(row["fssize"]), int(row["fsavail"])))
 
 
 @check("hardware: the array and the mapping are the kernel's", MACHINE)
@@ -108,11 +130,25 @@ def built_of_others(context):
     expect_equal("level, size, disks, missing", (values[30801], values[30803], values[30804], values[30805]),
                  ("raid1", listing["md5"]["size"], 2, 0))
     expect_equal("members", [member.split(":")[0] for member in values[30806]], ["vda", "vdb"])
+    detail = rows_of(context.guest.sh("mdadm --detail /dev/md5"), " : ")
+    expect_equal("level, disks, missing, by mdadm", told(values, 30801, 30804, 30805),
+                 (detail["Raid Level"], int(detail["Raid Devices"]),
+                  int(detail["Raid Devices"]) - int(detail["Active Devices"])))
+    expect_equal("size, by mdadm", values[30803], int(detail["Array Size"].split()[0]) * 1024)
+    expect_equal("no resynchronisation, by mdadm", told(values, 30807, 30808) == ("idle", None),
+                 "Resync Status" not in detail)
+    expect_equal("state, by mdadm", values[30802].split("-")[0], detail["State"].split(",")[0])
     expect_equal("mappings", names(nodes, MAPPING), ["dm-0"])
     values = nodes[MAPPING, "dm-0"]
-    told = context.guest.sh("dmsetup info --columns --noheadings -o name; cat /sys/block/dm-0/size").split()
-    expect_equal("name, members", (values[30901], values[30905]), (told[0], ["vdc"]))
-    expect_equal("size", values[30903], int(told[-1]) * 512)
+    kernel = context.guest.sh("dmsetup info --columns --noheadings -o name,blkdevs_used --separator ' '").split()
+    expect_equal("name, members", (values[30901], values[30905]), (kernel[0], kernel[1].split(",")))
+    expect_equal("size, by dmsetup", values[30903], int(context.guest.sh("dmsetup table an-example").split()[1]) * 512)
+    expect_equal("kind, by the UUID that it was made with", values[30902], "encrypted")
+    for command, suspended in (("suspend --noflush --nolockfs", True), ("resume", False)):
+        context.guest.sh(f"dmsetup {command} --noudevsync an-example")
+        state = context.guest.sh("dmsetup info --columns --noheadings -o suspended an-example").strip()
+        node = by_id(context.guest.cvagent("--plugin", plugin(context), "get", "mapping:dm-0"))
+        expect_equal("suspended", (node[30904], state == "Suspended"), (suspended, suspended))
 
 
 @check("hardware: NVMe and SATA drives tell their health", MACHINE)
@@ -125,6 +161,101 @@ def health(context):
     for what, number in (("worn", 30520), ("spare", 30521), ("hours", 30522)):
         expect(number in nvme, f"NVMe: {what} is not told")
     expect_equal("SATA: hours told", 30522 in sata, True)
+    told_by_smartctl(context, nodes)
+
+
+def told_by_smartctl(context, nodes):
+    """What drives are and how they are, by another reader of the same pages and logs."""
+    for name, device in (("nvme0n1", "nvme0"), ("sdc", "sdc"), ("sda", "sda")):
+        values = nodes[DRIVE, name]
+        other = json.loads(context.guest.machine.run(f"smartctl -j -a -n never /dev/{device}").out)
+        expect_equal(f"{name}: serial number", values.get(30504), other.get("serial_number"))
+        if name == "sda":
+            expect_equal("SCSI: maker, model, firmware", told(values, 30502, 30503, 30505),
+                         (other["scsi_vendor"], other["scsi_product"], other["scsi_revision"]))
+            continue
+        expect_equal(f"{name}: model, firmware", told(values, 30503, 30505),
+                     (other["model_name"], other["firmware_version"]))
+        expect_equal(f"{name}: temperature, hours", told(values, 30519, 30522),
+                     (other["temperature"]["current"], other["power_on_time"]["hours"]))
+        expect_equal(f"{name}: warnings", bool(values.get(30523)), not other["smart_status"]["passed"])
+        if name == "nvme0n1":
+            log = other["nvme_smart_health_information_log"]
+            expect_equal("NVMe: worn, spare, media errors", told(values, 30520, 30521, 30524),
+                         (log["percentage_used"], log["available_spare"], log["media_errors"]))
+        else:
+            wwn = other["wwn"]
+            expect_equal("SATA: WWN", values.get(30506), f"naa.{wwn['naa']:x}{wwn['oui']:06x}{wwn['id']:09x}")
+            expect_equal("SATA: power state", values.get(30518) in ("active", "idle"),
+                         "ACTIVE or IDLE" in context.guest.machine.run("smartctl -i -n standby /dev/sdc").out)
+
+
+@check("hardware: the system and its memory modules are those that dmidecode reads", MACHINE)
+def firmware(context):
+    nodes, _ = load(context)
+    values = nodes[SYSTEM, ""]
+    for number, word in ((30101, "system-manufacturer"), (30102, "system-product-name"), (30103, "system-serial-number"),
+                         (30104, "system-uuid"), (30105, "bios-version"), (30106, "bios-release-date")):
+        expect_equal(word, values.get(number), context.guest.sh(f"dmidecode -s {word}").strip())
+    expect_equal("modules", names(nodes, MODULE), ["0"])
+    rows = rows_of(context.guest.sh("dmidecode -q -t 17"))
+    expect_equal("slot, bank, maker, part, serial number", told(nodes[MODULE, "0"], 30301, 30302, 30306, 30307, 30308),
+                 (rows["Locator"], rows["Bank Locator"], rows["Manufacturer"], rows["Part Number"], rows["Serial Number"]))
+    expect_equal("size, kind, speed", told(nodes[MODULE, "0"], 30303, 30304, 30305),
+                 (int(rows["Size"].split()[0]) << 20, rows["Type"], int(rows["Configured Memory Speed"].split()[0])))
+
+
+@check("hardware: processors, memory and system are those of lscpu, free and uname", MACHINE)
+def system(context):
+    nodes, _ = load(context)
+    rows = {row["field"]: row["data"] for row in json.loads(context.guest.sh("lscpu -J -B"))["lscpu"]}
+    (name,) = names(nodes, PROCESSOR)
+    expect_equal("maker, model, cores, threads", told(nodes[PROCESSOR, name], 30401, 30402, 30403, 30404),
+                 (rows["Vendor ID:"], rows["Model name:"], int(rows["Core(s) per socket:"]), int(rows["CPU(s):"])))
+    values = nodes[SYSTEM, ""]
+    expect_equal("virtual", values[30107], "Hypervisor vendor:" in rows or "hypervisor" in rows["Flags:"].split())
+    expect_equal("kernel, architecture", told(values, 30110, 30111), tuple(context.guest.sh("uname -rm").split()))
+    started = float(context.guest.sh("date +%s")) - float(context.guest.read("/proc/uptime").split()[0])
+    expect(abs(values[30109] - started) < 5, f"started at {values[30109]}, by the clock at {started}")
+    total = int(context.guest.sh("busybox free -b").splitlines()[1].split()[1])
+    expect_equal("memory", nodes[MEMORY, ""][30201], total)
+
+
+@check("hardware: links are those of ip and ethtool", MACHINE)
+def links(context):
+    nodes, _ = load(context)
+    rows = json.loads(context.guest.sh("ip -j -d link"))
+    expect_equal("links", names(nodes, LINK), sorted(row["ifname"] for row in rows))
+    for row in rows:
+        name = row["ifname"]
+        values = nodes[LINK, name]
+        expect_equal(f"{name}: index, address, MTU", told(values, 31002, 31003, 31005),
+                     (row["ifindex"], row["address"], row["mtu"]))
+        if row.get("parentbus") == "pci":
+            driver = rows_of(context.guest.sh(f"ethtool -i {name}"), ": ")
+            expect_equal(f"{name}: driver, bus address", told(values, 31011, 31013), (driver["driver"], driver["bus-info"]))
+            expect_equal(f"{name}: permanent address", values.get(31004),
+                         context.guest.sh(f"ethtool -P {name}").split()[-1])
+            settings = rows_of(context.guest.sh(f"ethtool {name}"))
+            if "Mb/s" in settings["Speed"]:
+                expect_equal(f"{name}: speed, duplex", told(values, 31008, 31009),
+                             (int(settings["Speed"].removesuffix("Mb/s")), settings["Duplex"].lower()))
+
+
+@check("hardware: sensors are those of lm-sensors", MACHINE)
+def sensors(context):
+    nodes, _ = load(context)
+    chips = json.loads(context.guest.sh("sensors -j -c /dev/null"))
+    theirs = {}
+    for chip, features in chips.items():
+        for label, rows in features.items():
+            if isinstance(rows, dict):
+                name = next(iter(rows)).split("_")[0]
+                theirs[f"{chip}:{name}"] = (label, *(rows.get(f"{name}_{limit}") for limit in ("input", "min", "max", "crit")))
+    expect("nvme-pci" in " ".join(theirs), f"the NVMe drive has no sensor: {theirs}")
+    own = {name: told(nodes[SENSOR, name], 31102, 31103, 31110, 31111, 31112) for name in names(nodes, SENSOR) if ":" in name}
+    expect_equal("label, temperature, limits", {name: values[:1] + tuple(value and round(value, 3) for value in values[1:])
+                                                for name, values in own.items()}, theirs)
 
 
 @check("hardware: a drive that hangs costs what only it knows, and holds nothing up", MACHINE)

@@ -10,8 +10,10 @@ import tempfile
 HERE = os.path.dirname(os.path.abspath(__file__))
 MODULES = ["e1000", "virtio_pci", "virtio_scsi", "sd_mod", "bonding", "8021q", "bridge"]
 # Loaded by the checks that need them.
-HARDWARE_MODULES = ["nvme", "ahci", "virtio_blk", "sdhci_pci", "mmc_block", "raid1", "dm_mod"]
-ONLY = {"util-linux": ["bin/lsblk", "sbin/blkid"], "util-linux-extra": []}  # of its other tools the guest has busybox's
+HARDWARE_MODULES = ["nvme", "ahci", "virtio_blk", "sdhci_pci", "mmc_block", "raid1", "dm_mod", "crc32c_generic", "ext4"]
+# Of their other tools the guest has busybox's, or needs none.
+ONLY = {"util-linux": ["bin/lsblk", "sbin/blkid", "usr/bin/lscpu"], "util-linux-extra": [], "lm-sensors": ["usr/bin/sensors"],
+        "mdadm": ["sbin/mdadm"], "smartmontools": ["usr/sbin/smartctl"]}
 # Of the packages only what runs: no documentation, and of the time zones the files, not the variants.
 UNWANTED = ["usr/share/doc", "usr/share/man", "usr/share/locale", "usr/share/lintian", "usr/share/bash-completion",
             "usr/share/zoneinfo/posix", "usr/share/zoneinfo/right", "usr/share/perl5", "usr/share/debconf",

@@ -14,12 +14,18 @@ DISKS = {"sda": 6144, "sdb": 24}  # MiB; the first has more bytes than 32 bits c
 HARDWARE_DRIVES = {
     "nvme0n1": ("QEMU NVMe Ctrl", "NVME0001", None, "nvme,serial=NVME0001"),
     "sdc": ("EXAMPLE MODEL OF MORE THAN 16 LETTERS", "SATA0001", "1.234567",
-            "ide-hd,bus=ahci.0,model=EXAMPLE MODEL OF MORE THAN 16 LETTERS,serial=SATA0001,ver=1.234567"),
+            "ide-hd,bus=ahci.0,model=EXAMPLE MODEL OF MORE THAN 16 LETTERS,serial=SATA0001,ver=1.234567,"
+            "wwn=0x5000c500a1b2c3d4"),
     "vda": (None, "VIRTIO0001", None, "virtio-blk-pci,serial=VIRTIO0001"),
     "vdb": (None, "VIRTIO0002", None, "virtio-blk-pci,serial=VIRTIO0002"),
     "vdc": (None, None, None, "virtio-blk-pci"),
     "mmcblk0": ("QEMU!", "0xdeadbeef", None, "sd-card"),
 }
+# What that machine's firmware tells.
+FIRMWARE = ["type=0,vendor=Example,version=1.2.3,date=02/29/2024",
+            "type=1,manufacturer=Example Maker,product=Example Model,serial=MACHINE0001,"
+            "uuid=12345678-9abc-def0-1234-56789abcdef0",
+            "type=17,loc_pfx=SLOT,bank=BANK 1,manufacturer=Example Memory,serial=MODULE0001,part=PART 1,speed=2933"]
 # No network names of udev's, fast start, and nothing random in addresses: translated code is used again.
 KERNEL_OPTIONS = ("console=ttyS0,115200 quiet loglevel=4 panic=-1 net.ifnames=0 clocksource=tsc tsc=reliable "
                   "random.trust_cpu=on mitigations=off init_on_alloc=0 apparmor=0 audit=0 nokaslr norandmaps")
@@ -130,6 +136,7 @@ class Machine:
                       "-device", f"scsi-hd,id={name},bus=scsi.0,drive=drive-{name}"]
         if self.hardware:
             words += ["-device", "ahci,id=ahci", "-device", "sdhci-pci,id=sdhci"]
+            words += [word for row in FIRMWARE for word in ("-smbios", row)]
         for name, row in self.hardware.items():
             words += ["-blockdev", json.dumps(self._block_device(name)),
                       "-device", f"{row[3]},id={name},drive=drive-{name}"]

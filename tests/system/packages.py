@@ -6,8 +6,9 @@ import subprocess
 import sys
 
 # What the guest runs, apart from the kernel and our own programs; their dependencies come with them.
-TOOLS = ["bridge-utils", "busybox-static", "dash", "dmsetup", "ethtool", "hostname", "iproute2", "libstdc++6", "tzdata",
-         "util-linux", "dbus-daemon", "libsqlite3-0"]
+TOOLS = ["bridge-utils", "busybox-static", "dash", "dbus-daemon", "dmidecode", "dmsetup", "ethtool", "hostname", "iproute2", "libsensors5", "libsqlite3-0",
+         "libstdc++6", "smartmontools", "tzdata", "util-linux"]
+ALONE = ["lm-sensors", "mdadm"]  # what they depend on besides the above is for what the guest does not run of them
 KERNEL = "linux-image-686-pae"
 
 
@@ -95,7 +96,7 @@ def fetch(directory):
     apt = Apt(directory)
     apt.update()
     kernel = apt.kernel_package()
-    wanted = apt.uris("download", kernel) + apt.uris("install", *TOOLS)
+    wanted = apt.uris("download", kernel) + apt.uris("download", *ALONE) + apt.uris("install", *TOOLS)
     here = os.path.join(apt.archives, "")
     missing = [row for row in wanted if not os.path.exists(here + row[1])]
     if missing:
@@ -105,6 +106,6 @@ def fetch(directory):
             print(f"#   {name}", flush=True)
         subprocess.run(["apt-get", *apt.options, "-q", "-y", "--download-only", "install", *TOOLS],
                        check=True, stdout=subprocess.DEVNULL)
-        subprocess.run(["apt-get", *apt.options, "-q", "download", kernel],
+        subprocess.run(["apt-get", *apt.options, "-q", "download", kernel, *ALONE],
                        check=True, stdout=subprocess.DEVNULL, cwd=apt.archives)
     return [here + name for _, name, _ in wanted]

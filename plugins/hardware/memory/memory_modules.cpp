@@ -1,4 +1,3 @@
-#include <algorithm>
 #include <array>
 
 #include "plugins/hardware/memory/memory.h"
@@ -36,30 +35,13 @@ constexpr Row kRows[] = {
      Audience::trusted},
 };
 
-struct Sort {
-    std::uint8_t code;
-    const char* name;
-};
-
-constexpr std::array<Sort, 19> kSorts = {{{0x03, "DRAM"},
-                                          {0x07, "RAM"},
-                                          {0x0f, "SDRAM"},
-                                          {0x12, "DDR"},
-                                          {0x13, "DDR2"},
-                                          {0x14, "DDR2 FB-DIMM"},
-                                          {0x18, "DDR3"},
-                                          {0x19, "FBD2"},
-                                          {0x1a, "DDR4"},
-                                          {0x1b, "LPDDR"},
-                                          {0x1c, "LPDDR2"},
-                                          {0x1d, "LPDDR3"},
-                                          {0x1e, "LPDDR4"},
-                                          {0x1f, "NVDIMM"},
-                                          {0x20, "HBM"},
-                                          {0x21, "HBM2"},
-                                          {0x22, "DDR5"},
-                                          {0x23, "LPDDR5"},
-                                          {0x24, "HBM3"}}};
+// By the codes of the standard (DSP0134), in its words; a null pointer for what says nothing.
+constexpr std::array<const char*, 0x25> kSorts = {
+    nullptr, nullptr, nullptr,  "DRAM",   "EDRAM",        "VRAM",   "SRAM",   "RAM",
+    "ROM",   "Flash", "EEPROM", "FEPROM", "EPROM",        "CDRAM",  "3DRAM",  "SDRAM",
+    "SGRAM", "RDRAM", "DDR",    "DDR2",   "DDR2 FB-DIMM", nullptr,  nullptr,  nullptr,
+    "DDR3",  "FBD2",  "DDR4",   "LPDDR",  "LPDDR2",       "LPDDR3", "LPDDR4", "Logical non-volatile device",
+    "HBM",   "HBM2",  "DDR5",   "LPDDR5", "HBM3"};
 
 /// In bytes; nothing for an empty slot and for a size that the firmware does not know.
 std::optional<unsigned long long> sizeOf(const SmbiosRecord& record) {
@@ -95,10 +77,9 @@ std::optional<unsigned long long> speedOf(const SmbiosRecord& record) {
 }
 
 std::optional<std::string> sortOf(const SmbiosRecord& record) {
-    const std::uint8_t code = record.byte(0x12).value_or(0);
-    const auto known =
-        std::find_if(kSorts.begin(), kSorts.end(), [code](const Sort& sort) { return sort.code == code; });
-    return known == kSorts.end() ? std::nullopt : std::optional<std::string>(known->name);
+    const std::size_t code = record.byte(0x12).value_or(0);
+    const char* const name = code < kSorts.size() ? kSorts[code] : nullptr;
+    return name == nullptr ? std::nullopt : std::optional<std::string>(name);
 }
 
 /// The modules in the order of the table; empty slots are none.

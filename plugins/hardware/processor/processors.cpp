@@ -32,7 +32,7 @@ constexpr Row kRows[] = {
     {kType, kMaker, "Maker", Kind::text, "", "vendor_id or CPU implementer in /proc/cpuinfo", "who made it"},
     {kType, kModel, "Model", Kind::text, "", "model name or CPU part in /proc/cpuinfo", "the model's name"},
     {kType, kCores, "Cores", Kind::number, "",
-     "topology/core_id of each processor in /sys/devices/system/cpu", "cores that are in use"},
+     "topology/core_cpus_list of each processor in /sys/devices/system/cpu", "cores that are in use"},
     {kType, kThreads, "Threads", Kind::number, "", "processors of the package in /sys/devices/system/cpu",
      "processors that the kernel schedules on"},
     {kType, kLevel1Data, "Level1DataCache", Kind::number, "bytes", "cache/index* in /sys/devices/system/cpu",
