@@ -11,7 +11,7 @@ constexpr std::chrono::milliseconds kFresh{500};
 
 bool isLive(const Source& source, Id id) {
     return std::any_of(source.rows.begin(), source.rows.end(),
-                       [id](const Row& row) { return row.id == id && row.live; });
+                       [id](const Row& row) { return row.id == id && row.traits.live; });
 }
 
 IC::Error noAnswer() {

@@ -30,7 +30,7 @@ constexpr ClassRow kClasses[] = {
 };
 
 constexpr Row nameRow(Class type) {
-    return {type, firstId(type), "Name", Kind::text, "", "the kernel", "what it is called"};
+    return {firstId(type), "Name", Kind::text, "", "the kernel", "what it is called"};
 }
 
 const Source kSources[] = {

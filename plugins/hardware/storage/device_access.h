@@ -2,12 +2,12 @@
 
 #include <cstdint>
 #include <functional>
-#include <map>
 #include <memory>
 #include <optional>
 #include <string>
 #include <vector>
 
+#include "plugins/hardware/host.h"
 #include "plugins/hardware/network/neighbours.h"
 
 namespace hardware {
@@ -39,9 +39,9 @@ struct Room {
 /// interface, so that tests can stand in for devices. Any thread.
 class DeviceAccess {
 public:
-    using Contents = std::map<std::string, std::string>;
+    using Contents = TextMap;
     /// Texts by their names; neither holds a line break, no name a '='.
-    using Told = std::map<std::string, std::string>;
+    using Told = TextMap;
 
     virtual ~DeviceAccess() = default;
 

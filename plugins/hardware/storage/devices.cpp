@@ -59,12 +59,12 @@ DeviceAccess::Told toldOf(const Health& health) {
 
 Health healthFrom(const DeviceAccess::Told& told) {
     Health health;
-    health.power = block::fact(told, kPower);
-    if (const auto degrees = block::fact(told, kTemperature)) {
+    health.power = textOf(told, kPower);
+    if (const auto degrees = textOf(told, kTemperature)) {
         health.temperature = asSigned(*degrees);
     }
     for (const Count& count : kCounts) {
-        const auto value = block::fact(told, count.name);
+        const auto value = textOf(told, count.name);
         health.*count.value = value ? asNumber(*value) : std::nullopt;
     }
     for (const auto& [name, text] : told) {
