@@ -3,7 +3,7 @@ corvista_test(hardware LABELS threads SOURCES
   hardware/host_test.cpp
   hardware/hosts_test.cpp
   hardware/memory_test.cpp
-  hardware/patience_test.cpp
+  hardware/deadline_runner_test.cpp
   hardware/processors_test.cpp
   hardware/recorded_host.cpp
   hardware/sensors_test.cpp

@@ -95,8 +95,7 @@ std::optional<unsigned long long> speedOf(const SmbiosRecord& record) {
 
 std::optional<std::string> sortOf(const SmbiosRecord& record) {
     const std::uint8_t code = record.byte(0x12).value_or(0);
-    const auto known =
-        std::find_if(kSorts.begin(), kSorts.end(), [code](const Sort& sort) { return sort.code == code; });
+    const auto* const known = std::ranges::find(kSorts, code, &Sort::code);
     return known == kSorts.end() ? std::nullopt : std::optional<std::string>(known->name);
 }
 

@@ -48,7 +48,7 @@ public:
     /// Does work that asks a device. Who waits for a drive cannot be ended by anybody, so where that can be,
     /// the work is done by another process: this one could not end before it.
     /// @return what the work told; empty when it could not be done
-    virtual Told apart(const std::function<Told()>& work) const { return work(); }
+    virtual Told inOtherProcess(const std::function<Told()>& work) const { return work(); }
 
     /// A log page of an NVMe controller, for the controller as a whole.
     /// @return nothing when it has none or may not be asked

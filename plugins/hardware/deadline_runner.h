@@ -11,13 +11,13 @@ namespace hardware {
 /// Runs what may wait for a device, and does not wait for ever. Work that does not return in time keeps its
 /// thread until it does; meanwhile nothing else is asked of its device, and who asks for it is told so at
 /// once. There are never more than 16 threads. Any thread.
-class Patience {
+class DeadlineRunner {
 public:
-    explicit Patience(std::chrono::milliseconds limit);
-    Patience(const Patience&) = delete;
-    Patience& operator=(const Patience&) = delete;
+    explicit DeadlineRunner(std::chrono::milliseconds limit);
+    DeadlineRunner(const DeadlineRunner&) = delete;
+    DeadlineRunner& operator=(const DeadlineRunner&) = delete;
     /// Work that still hangs is left to itself, and keeps this library in its place.
-    ~Patience();
+    ~DeadlineRunner();
 
     /// @param device what is asked; work for one device runs one at a time
     /// @param work owns all that it uses: it may return long after its caller has gone
