@@ -165,12 +165,12 @@ DeadlineRunner::~DeadlineRunner() {
 }
 
 bool DeadlineRunner::run(const std::string& device, std::function<void()> work) {
-    return runOne(
-        device, [work = std::move(work)](std::size_t /*place*/) { work(); }, 0, limit_);
+    return runWithin(limit_, device, std::move(work));
 }
 
-bool DeadlineRunner::runOne(const std::string& device, const std::function<void(std::size_t)>& work,
-                            std::size_t place, std::chrono::milliseconds limit) {
+bool DeadlineRunner::runWithin(std::chrono::milliseconds limit, const std::string& device,
+                               std::function<void()> work) {
+    const std::function<void(std::size_t)> only = [work = std::move(work)](std::size_t /*place*/) { work(); };
     const Time end = now() + limit;
     std::unique_lock lock(state_->guard);
     for (;;) {
@@ -179,8 +179,7 @@ bool DeadlineRunner::runOne(const std::string& device, const std::function<void(
         if (!state_->changed.wait_until(lock, until, [&] { return !state_->busy.contains(device); })) {
             return false;
         }
-        const auto job =
-            std::make_shared<Job>(Job{{device}, [work, place](std::size_t /*first*/) { work(place); }});
+        const auto job = std::make_shared<Job>(Job{{device}, only});
         if (!state_->post(lock, job, end)) {
             return false;
         }
@@ -216,7 +215,7 @@ std::vector<bool> DeadlineRunner::runAll(std::vector<std::string> devices,
         first += job->at + 1;
     }
     for (const std::size_t place : busy) {
-        done[place] = runOne(devices[place], work, place, limit);
+        done[place] = runWithin(limit, devices[place], [work, place] { work(place); });
     }
     return done;
 }

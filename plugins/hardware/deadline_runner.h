@@ -35,8 +35,7 @@ private:
     struct Job;
     struct State;
 
-    bool runOne(const std::string& device, const std::function<void(std::size_t)>& work, std::size_t place,
-                std::chrono::milliseconds limit);
+    bool runWithin(std::chrono::milliseconds limit, const std::string& device, std::function<void()> work);
 
     std::shared_ptr<State> state_;
     std::chrono::milliseconds limit_;
