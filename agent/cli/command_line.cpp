@@ -2,10 +2,12 @@
 
 #include <CLI/CLI.hpp>
 #include <algorithm>
+#include <array>
 #include <cmath>
 #include <sstream>
 
 #include "agent/cli/failure.h"
+#include "agent/cli/moment.h"
 #include "agent/cli/print.h"
 
 namespace cvagent {
@@ -16,7 +18,8 @@ constexpr const char* kDescription =
     "Shows and changes what the Corvista OS/hardware plug-in knows of this host.\n";
 constexpr const char* kFooter =
     "\nExit status: 0 done, 1 the plug-in or the host failed, 2 wrong usage, 3 no such node or property,\n"
-    "4 value refused, 5 another agent holds the data directory.\n"
+    "4 value refused, or not allowed, 5 another agent holds the data directory, or too much is asked at "
+    "once.\n"
     "\nExamples:\n"
     "  cvagent tree\n"
     "  cvagent get network-port:eth0 LinkSpeed LinkState\n"
@@ -70,7 +73,26 @@ CLI::Validator oneOf(const std::map<std::string, Value>& words) {
         "");
 }
 
+// What an agent of this process is told; the service has its own.
+constexpr std::array kOwnOptions = {"--plugin",     "--log",      "--log-level",      "--trace",
+                                    "--host-tools", "--commands", "--command-timeout"};
+
+CLI::Validator busAddress() {
+    return CLI::Validator(
+        [](const std::string& text) {
+            const bool good = text == "none" || text == "system" || text.starts_with("unix:");
+            return good ? std::string() : inQuotes(text) + " is none of: none, system, unix:path=FILE";
+        },
+        "");
+}
+
 void addGlobalOptions(CLI::App& app, Options& options) {
+    app.add_option("--bus", options.bus,
+                   "Where to ask the service: on the system's bus (system, the default), at another bus's "
+                   "address, or not at all (none). Without a service, and with any of the options below, "
+                   "this program is the agent itself")
+        ->type_name("none|system|ADDRESS")
+        ->check(busAddress());
     app.add_option("--plugin", options.plugins,
                    "The plug-in to load, in place of all those beside this program. Several may be given")
         ->type_name("FILE")
@@ -132,12 +154,14 @@ void unmark(std::string& word) {
 }
 
 void unmark(Options& options) {
-    for (std::vector<std::string>* list : {&options.values, &options.properties, &options.plugins}) {
+    for (std::vector<std::string>* list :
+         {&options.values, &options.properties, &options.plugins, &options.kinds}) {
         for (std::string& word : *list) {
             unmark(word);
         }
     }
-    for (std::string* word : {&options.node, &options.property, &options.nodeClass, &options.program}) {
+    for (std::string* word : {&options.node, &options.property, &options.nodeClass, &options.program,
+                              &options.since, &options.until}) {
         unmark(*word);
     }
     for (std::optional<std::string>* file : {&options.logFile, &options.traceFile}) {
@@ -225,6 +249,48 @@ void addOffline(CLI::App& app, Options& options) {
     doctor->callback([&options] { options.command = Command::doctor; });
 }
 
+/// What a check of one word says of it.
+CLI::Validator checked(const std::function<std::string(const std::string&)>& problemOf) {
+    return CLI::Validator([problemOf](const std::string& text) { return problemOf(text); }, "");
+}
+
+void addHistory(CLI::App& app, Options& options) {
+    CLI::App* history =
+        app.add_subcommand("history", "Print what has happened: alerts, nodes that came and went, writes");
+    history->add_option("--since", options.since, "Only what came then or later, or behind this number")
+        ->type_name("TIME|NUMBER")
+        ->check(checked(problemOfMoment));
+    history->add_option("--until", options.until, "Only what came until then, or up to this number")
+        ->type_name("TIME|NUMBER")
+        ->check(checked(problemOfMoment));
+    history
+        ->add_option("--node", options.node, "Only of this node: its path, the last part of it, or its name")
+        ->type_name("NODE");
+    history->add_option("--kind", options.kinds, "Only of this kind; may be given several times")
+        ->type_name("KIND")
+        ->expected(1)
+        ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll)
+        ->check(checked(problemOfKind));
+    history->add_option("--limit", options.limit, "Only the last N of them")
+        ->type_name("N")
+        ->check(wholeDecimal());
+    history
+        ->add_option("--keep-days", options.keepDays, "Keep entries for so long from now on; prints nothing")
+        ->type_name("DAYS")
+        ->check(secondsUpTo(36500));
+    history
+        ->add_option("--keep-megabytes", options.keepMegabytes,
+                     "Let the file grow up to this size from now on; prints nothing")
+        ->type_name("MB")
+        ->check(secondsUpTo(100000));
+    addJson(*history, options);
+    history->footer(
+        "TIME is 2026-11-20, 2026-11-20T21:03:00Z, or how long ago: 90s, 30m, 2h, 7d.\n"
+        "KIND is alert, published, withdrawn, written or changed.\n"
+        "With --json each entry is one object on a line of its own.");
+    history->callback([&options] { options.command = Command::history; });
+}
+
 std::string whyNoCommand(const CLI::App& app) {
     std::vector<std::string> rest = app.remaining();
     const auto word =
@@ -234,7 +300,7 @@ std::string whyNoCommand(const CLI::App& app) {
     }
     unmark(*word);
     return "there is no command " + inQuotes(*word) +
-           "; the commands are: tree, get, set, watch, properties, doctor";
+           "; the commands are: tree, get, set, watch, history, properties, doctor";
 }
 
 /// The subcommand that was being read, for the hint.
@@ -257,10 +323,13 @@ std::optional<Options> parseCommandLine(int count, const char* const* words) {
     addReaders(app, options);
     addWatch(app, options);
     addSet(app, options);
+    addHistory(app, options);
     addOffline(app, options);
     try {
         app.parse(marked(count, words));
         unmark(options);
+        options.byItself =
+            std::ranges::any_of(kOwnOptions, [&app](const char* name) { return app.count(name) > 0; });
         return options;
     } catch (const CLI::Success& help) {
         std::ostringstream text;

@@ -1,13 +1,17 @@
 #include <array>
+#include <chrono>
 #include <exception>
 #include <optional>
 #include <string>
+#include <thread>
 #include <vector>
 
+#include "agent/cli/caller.h"
 #include "agent/cli/command_line.h"
 #include "agent/cli/commands/commands.h"
+#include "agent/cli/local_session.h"
 #include "agent/cli/print.h"
-#include "agent/cli/session.h"
+#include "agent/cli/remote/service.h"
 #include "agent/core/signals.h"
 
 namespace {
@@ -19,15 +23,62 @@ using cvagent::Options;
 using Question = ExitStatus (*)(cvagent::Session& session, const Options& options);
 
 /// What needs an agent, in the order of Command; null for what does not.
-constexpr std::array<Question, 6> kQuestions = {cvagent::commands::tree, cvagent::commands::get,
+constexpr std::array<Question, 7> kQuestions = {cvagent::commands::tree, cvagent::commands::get,
                                                 cvagent::commands::set, cvagent::commands::watch};
+
+constexpr int kAttempts = 10;  // to ask a service that has ended
+constexpr std::chrono::milliseconds kBetweenAttempts{100};
+
+bool onlyReads(const Options& options) {
+    return options.command != Command::watch && options.command != Command::set;
+}
+
+/// What a watch runs on alerts gets the surroundings that it has without a service.
+void prepareToAsk(Options& options) {
+    if (options.command == Command::watch) {
+        cvagent::prepareSurroundings({&options.program});
+    }
+    if (!onlyReads(options)) {
+        cvagent::StopSignals::install();
+    }
+}
+
+/// The service's answer; nothing where there is none. One that ends in the middle of an answer is mostly
+/// started again, and would be in the way of an agent of this process.
+std::optional<ExitStatus> askService(Question ask, Options& options) {
+    std::string gone;
+    for (int attempt = 0; attempt < kAttempts; ++attempt) {
+        try {
+            if (const auto service = cvagent::remote::openSession(options, attempt > 0)) {
+                options.byService = true;
+                prepareToAsk(options);
+                return ask(*service, options);
+            }
+        } catch (const cvagent::remote::ServiceGone& ended) {
+            gone = ended.what();
+            if (!onlyReads(options)) {
+                throw cvagent::Failure(ExitStatus::failed, gone + "; nothing was done");
+            }
+        }
+        options.byService = false;
+        if (gone.empty()) {
+            return std::nullopt;
+        }
+        std::this_thread::sleep_for(kBetweenAttempts);
+    }
+    cvagent::complain(gone + "; cvagent looks by itself");
+    return std::nullopt;
+}
 
 ExitStatus run(Options& options, cvagent::WantMessages& wants) {
     const Question ask = options.verify ? cvagent::commands::verifyTree
                                         : kQuestions.at(static_cast<std::size_t>(options.command));
     if (ask != nullptr) {
+        if (const auto status = askService(ask, options)) {
+            return *status;
+        }
         const cvagent::PreparedProcess process(cvagent::processSettings(options));
-        cvagent::Session session(process, options, wants);
+        cvagent::LocalSession session(process, options, wants);
         return session.statusAfter(ask(session, options));
     }
     std::vector<std::string*> files;
@@ -35,8 +86,9 @@ ExitStatus run(Options& options, cvagent::WantMessages& wants) {
         files.push_back(&plugin);
     }
     cvagent::prepareSurroundings(files);
-    return options.command == Command::doctor ? cvagent::commands::doctor(options)
-                                              : cvagent::commands::properties(options);
+    return options.command == Command::doctor    ? cvagent::commands::doctor(options)
+           : options.command == Command::history ? cvagent::commands::history(options)
+                                                 : cvagent::commands::properties(options);
 }
 
 ExitStatus endWith(const cvagent::Failure& failure) {
@@ -48,7 +100,8 @@ ExitStatus endWith(const cvagent::Failure& failure) {
 
 ExitStatus runGuarded(Options& options, cvagent::WantMessages& wants) {
     try {
-        cvagent::Style::detect();  // before the locale goes
+        cvagent::Style::detect();   // before the locale goes
+        cvagent::rememberCaller();  // before the environment goes
         return run(options, wants);
     } catch (const cvagent::Failure& failure) {
         return endWith(failure);
@@ -67,7 +120,8 @@ ExitStatus runGuarded(Options& options, cvagent::WantMessages& wants) {
 ExitStatus runAndJudge(Options& options) {
     cvagent::WantMessages wants;
     const ExitStatus status = runGuarded(options, wants);
-    const bool wanting = options.command != Command::properties && wants.tell();
+    const bool ofHost = options.command != Command::properties && options.command != Command::history;
+    const bool wanting = ofHost && !options.byService && wants.tell();
     const bool good = status == ExitStatus::done || status == ExitStatus::notFound;
     return wanting && good ? ExitStatus::failed : status;
 }

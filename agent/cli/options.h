@@ -8,7 +8,7 @@
 
 namespace cvagent {
 
-enum class Command { tree, get, set, watch, properties, doctor };
+enum class Command { tree, get, set, watch, properties, doctor, history };
 
 /// What the command line asks for.
 struct Options {
@@ -18,6 +18,9 @@ struct Options {
     bool pluginMissing = false;           ///< one that is beside the program was left out; not typed
     bool pluginsNamed = false;            ///< on the command line; not typed
     bool processors = true;               ///< whether they can be meant; not typed
+    std::optional<std::string> bus;       ///< where the service is asked: "none", "system" or an address
+    bool byItself = false;                ///< an option concerns an agent of this process; not typed
+    bool byService = false;               ///< the service has answered; not typed
     std::optional<std::string> logFile;
     std::optional<std::string> traceFile;
     std::optional<int> logLevel;
@@ -35,6 +38,13 @@ struct Options {
     std::string property;
     std::vector<std::string> values;
     std::string nodeClass;
+    // of the history
+    std::string since;  ///< as moment.h reads it; "" for the beginning
+    std::string until;  ///< the same; "" for the end
+    std::vector<std::string> kinds;
+    std::optional<unsigned long long> limit;  ///< only the last ones
+    std::optional<double> keepDays;           ///< from now on, in place of printing
+    std::optional<double> keepMegabytes;
 };
 
 }  // namespace cvagent

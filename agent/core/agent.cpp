@@ -6,6 +6,7 @@
 
 #include "agent/core/announcer.h"
 #include "agent/core/command_deadline.h"
+#include "agent/core/event_keeping.h"
 #include "agent/core/plugin_files.h"
 #include "agent/core/plugin_start.h"
 #include "agent/core/text.h"
@@ -27,12 +28,14 @@ struct Agent::Engine {
     void startAll(std::vector<PluginStart>& starts, const AgentSettings& settings);
     void refresh();
     bool lists(const Handle& node) const;
+    Listener& listenerOf(const std::shared_ptr<EventKeeper>& keeper);
 
     std::shared_ptr<DataDirectory> data;
     Tell tell;
     std::shared_ptr<LogOutput> log;
     CommandDeadline deadline;
     EventLog events;
+    std::optional<EventKeeping> keeping;  // in front of the log, where somebody keeps events
     Facts facts;
     Announcer announcer;
     std::vector<std::unique_ptr<Plugin>> plugins;
@@ -49,7 +52,8 @@ Agent::Engine::Engine(const AgentSettings& settings)
       log(settings.log ? settings.log
                        : std::make_shared<LogOutput>(LogSettings(), std::make_shared<ErrorLines>())),
       deadline(settings.commandTime, settings.tell),
-      announcer(events, facts, settings.alertTold) {
+      events(EventLog::kMost, settings.lastEvent),
+      announcer(listenerOf(settings.keeper), facts, settings.alertTold) {
     if (!data) {
         throw std::invalid_argument("an agent needs a data directory");
     }
@@ -69,6 +73,13 @@ Agent::Engine::Engine(const AgentSettings& settings)
     if (plugins.empty() && !failed.empty()) {
         throw Problem(failed.front().problem);
     }
+}
+
+Listener& Agent::Engine::listenerOf(const std::shared_ptr<EventKeeper>& keeper) {
+    if (!keeper) {
+        return events;
+    }
+    return keeping.emplace(events, keeper);
 }
 
 /// The plug-in for this system waits most for the host's tools, whose time is limited, and starts on the
@@ -177,6 +188,10 @@ std::vector<std::vector<Reading>> Agent::readTree(const std::vector<NodeRef>& no
 WriteResult Agent::write(const NodeRef& node, const Property& row, const IC::PropertyValue& value,
                          const Request& request) const {
     return engine_->writer.write(node.node_, row, value, request);
+}
+
+void Agent::announce(const Event& event) const {
+    engine_->announcer.hear(event);
 }
 
 std::shared_ptr<Subscription> Agent::subscribe(std::uint64_t after, std::optional<Event::Kind> only) const {

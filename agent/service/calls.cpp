@@ -1,0 +1,221 @@
+#include "agent/service/calls.h"
+
+#include <algorithm>
+#include <array>
+#include <limits>
+#include <utility>
+
+#include "agent/core/property_words.h"
+#include "agent/service/log.h"
+#include "agent/service/members.h"
+#include "agent/service/names.h"
+#include "agent/service/values.h"
+
+namespace cvagent::service {
+
+namespace {
+
+constexpr std::chrono::seconds kReadTime{20};  // below the 25 s after which most clients give up
+constexpr std::size_t kMostEvents = 512;
+constexpr std::size_t kMostProperties = 1024;  // of one read
+
+/// In the order of Problem::Kind.
+constexpr std::array kKindNames = {"NotFound", "Ambiguous", "Refused", "Busy", "TimedOut", "Failed"};
+
+const char* subjectName(Problem::Subject subject) {
+    return subject == Problem::node ? "node" : subject == Problem::property ? "property" : "";
+}
+
+/// The node of an id. Throws Problem.
+const NodeView& nodeOf(const PendingCall& call, std::uint32_t id) {
+    const NodeView* node = call.parts().model.byId(id);
+    if (node == nullptr) {
+        throw Problem(Problem::notFound, "there is no node " + std::to_string(id), Problem::node);
+    }
+    return *node;
+}
+
+Withheld withheldFrom(const PendingCall& call, const Caller& caller, Withheld how) {
+    return call.parts().consent.isTrusted(caller) ? Withheld::nothing : how;
+}
+
+/// Runs what a job has come to on the loop's thread.
+void comeBack(const CallPointer& call, std::function<void()> work) {
+    call->parts().mailbox->post([call, held = std::move(work)] { call->guarded(held); });
+}
+
+/// Has a job done for the caller in his turn.
+void submit(const CallPointer& call, Workers& workers, const Caller& caller, Workers::Job job) {
+    const auto safely = [call, held = std::move(job)] {
+        try {
+            held();
+        } catch (const Problem& problem) {
+            comeBack(call, [call, problem] { call->fail(problem); });
+        } catch (const std::exception& exception) {
+            const Problem problem(Problem::failed, exception.what());
+            comeBack(call, [call, problem] { call->fail(problem); });
+        }
+    };
+    if (!workers.submit(caller.user, safely)) {
+        call->fail(bus::kLimitsExceeded, "too many calls wait for an answer already");
+    }
+}
+
+}  // namespace
+
+void PendingCall::answer(const std::function<void(bus::Writer& writer)>& fill) const {
+    if (message_.wantsNoReply()) {
+        return;
+    }
+    const bus::Message reply = message_.reply();
+    bus::Writer writer(reply);
+    fill(writer);
+    parts_.connection.send(reply);
+}
+
+void PendingCall::fail(const std::string& name, const std::string& text) const {
+    if (!message_.wantsNoReply()) {
+        parts_.connection.send(message_.errorReply(name, text));
+    }
+}
+
+void PendingCall::fail(const Problem& problem, const std::vector<std::string>& errors) const {
+    if (message_.wantsNoReply()) {
+        return;
+    }
+    const bus::Message reply =
+        message_.errorReply(std::string(kErrorPrefix) + kKindNames.at(problem.kind()), problem.what());
+    bus::Writer(reply).put(subjectName(problem.subject())).put(problem.detail()).put(errors);
+    parts_.connection.send(reply);
+}
+
+void PendingCall::guarded(const std::function<void()>& work) const {
+    try {
+        work();
+    } catch (const Problem& problem) {
+        fail(problem);
+    } catch (const bus::Error& error) {
+        fail(error.name(), error.what());
+    } catch (const std::exception& exception) {
+        fail(bus::kFailed, exception.what());
+    }
+}
+
+void PendingCall::withCaller(std::function<void(const Caller& caller)> next) const {
+    const PendingCall held = *this;
+    const bool asked =
+        parts_.callers.find(message_.sender(), [held, go = std::move(next)](const Caller* caller) {
+            if (caller == nullptr) {
+                held.fail(bus::kAccessDenied, "the bus does not tell who calls");
+            } else {
+                held.guarded([&] { go(*caller); });
+            }
+        });
+    if (!asked) {
+        fail(bus::kLimitsExceeded, "too many calls wait for an answer already");
+    }
+}
+
+void answerTree(const CallPointer& call) {
+    call->withCaller([call](const Caller& caller) {
+        const Withheld withheld = withheldFrom(*call, caller, Withheld::leftOut);
+        call->answer([&](bus::Writer& writer) {
+            writer.put(call->parts().agent.plugins());
+            writer.array("(uuuuosssua(uyvtus))", [&] {
+                for (const NodeView* node : call->parts().model.all()) {
+                    writer.structure("uuuuosssua(uyvtus)", [&] {
+                        putNodeHead(writer, *node);
+                        putReadings(writer, node->readings, withheld);
+                    });
+                }
+            });
+        });
+    });
+}
+
+void answerFind(const CallPointer& call) {
+    const std::string word = bus::Reader(call->message()).text();
+    call->withCaller([call, word](const Caller& caller) {
+        submit(call, call->parts().readers, caller, [call, word] {
+            const NodeRef found = call->parts().agent.find(word);
+            comeBack(call, [call, id = found->getNodeId()] {
+                const NodeView& node = nodeOf(*call, id);
+                call->answer([&](bus::Writer& writer) {
+                    writer.structure("uuuuosssu", [&] { putNodeHead(writer, node); });
+                });
+            });
+        });
+    });
+}
+
+namespace {
+
+/// @param after the number that was asked for
+void answerEvents(const PendingCall& call, std::uint64_t after, const std::vector<Event>& events,
+                  std::uint64_t dropped) {
+    const std::uint64_t missing = events.empty() ? 0 : events.front().number - after - 1;
+    call.answer([&](bus::Writer& writer) {
+        writer.array(kEventType, [&] {
+            for (std::size_t i = 0; i < std::min(events.size(), kMostEvents); ++i) {
+                putEvent(writer, events[i]);
+            }
+        });
+        writer.put(std::min(dropped, missing));
+    });
+}
+
+}  // namespace
+
+/// What the agent itself remembers, and behind that the history.
+void answerEventsSince(const CallPointer& call) {
+    const std::uint64_t after = bus::Reader(call->message()).longNumber();
+    const Subscription::Taken taken = call->parts().agent.subscribe(after)->take();
+    std::vector<Event> events(taken.events.begin(), taken.events.end());
+    const std::uint64_t upTo =
+        events.empty() ? std::numeric_limits<std::int64_t>::max() : events.front().number - 1;
+    if (taken.dropped == 0 || !call->parts().past || after >= upTo) {
+        answerEvents(*call, after, events, taken.dropped);
+        return;
+    }
+    call->withCaller([call, after, upTo, events, dropped = taken.dropped](const Caller& caller) {
+        submit(call, call->parts().readers, caller, [call, after, upTo, events, dropped] {
+            std::vector<Event> all = call->parts().past(after, upTo, kMostEvents);
+            if (all.size() < kMostEvents) {
+                all.insert(all.end(), events.begin(), events.end());
+            }
+            comeBack(call, [call, after, all, dropped] { answerEvents(*call, after, all, dropped); });
+        });
+    });
+}
+
+void startRead(const CallPointer& call, std::optional<std::uint32_t> node) {
+    bus::Reader arguments(call->message());
+    const std::uint32_t id = node ? *node : arguments.number();
+    const std::vector<std::uint32_t> wanted = arguments.numbers();
+    if (wanted.size() > kMostProperties) {
+        throw bus::Error(bus::kLimitsExceeded, "too many properties in one call");
+    }
+    nodeOf(*call, id);
+    call->withCaller([call, id, wanted](const Caller& caller) {
+        const NodeRef ref = nodeOf(*call, id).node;
+        const Withheld withheld = withheldFrom(*call, caller, Withheld::asMissing);
+        const auto until = Request::Clock::now() + kReadTime;
+        submit(call, call->parts().readers, caller, [call, id, wanted, ref, withheld, until] {
+            const Request request("a reader on the bus", until);
+            const std::vector<unsigned int> ids =
+                wanted.empty() ? readableIds(*ref, {})
+                               : std::vector<unsigned int>(wanted.begin(), wanted.end());
+            const auto readings = call->parts().agent.read(ref, ids, cvagent::Freshness::now, request);
+            const std::vector<std::string> errors = request.errors().take().texts;
+            comeBack(call, [call, id, withheld, readings, errors] {
+                call->parts().model.learn(id, readings);
+                call->answer([&](bus::Writer& writer) {
+                    putReadings(writer, readings, withheld);
+                    writer.put(errors);
+                });
+            });
+        });
+    });
+}
+
+}  // namespace cvagent::service

@@ -1,0 +1,73 @@
+#pragma once
+
+#include <functional>
+#include <memory>
+#include <optional>
+#include <string>
+
+#include "agent/bus/reader.h"
+#include "agent/bus/writer.h"
+#include "agent/core/agent.h"
+#include "agent/service/callers.h"
+#include "agent/service/consent.h"
+#include "agent/service/looker.h"
+#include "agent/service/loop.h"
+#include "agent/service/model.h"
+#include "agent/service/workers.h"
+
+namespace cvagent::service {
+
+/// Events behind a number and up to another one, at most so many.
+using EventSource =
+    std::function<std::vector<Event>(std::uint64_t after, std::uint64_t upTo, std::size_t most)>;
+
+/// What the members of the service's objects need; all of it outlives them.
+struct Parts {
+    bus::Connection& connection;
+    Agent& agent;
+    Model& model;
+    Callers& callers;
+    Consent& consent;
+    Looker& looker;
+    Workers& readers;
+    Workers& writers;
+    std::shared_ptr<Mailbox> mailbox;
+    /// Reads what happened behind a number, as many as are wanted; null where nothing is kept. Any thread.
+    EventSource past;
+};
+
+/// A call that is answered later. What goes wrong on the way is the answer.
+class PendingCall {
+public:
+    PendingCall(Parts& parts, bus::Message message) : parts_(parts), message_(std::move(message)) {}
+
+    const bus::Message& message() const { return message_; }
+    Parts& parts() const { return parts_; }
+
+    /// Sends the answer that a function fills. The loop's thread.
+    void answer(const std::function<void(bus::Writer& writer)>& fill) const;
+    void fail(const std::string& name, const std::string& text) const;
+    /// @param errors what the plug-in reported on the way
+    void fail(const Problem& problem, const std::vector<std::string>& errors = {}) const;
+    /// Runs something for the call on the loop's thread; what it throws is the answer.
+    void guarded(const std::function<void()>& work) const;
+    /// Goes on when it is known who calls.
+    void withCaller(std::function<void(const Caller& caller)> next) const;
+
+private:
+    Parts& parts_;
+    bus::Message message_;
+};
+
+using CallPointer = std::shared_ptr<const PendingCall>;
+
+// The methods of com.vantrel.Corvista1.Agent and com.vantrel.Corvista1.Node. They take the arguments from the
+// call; the message has the types that the interface says.
+void answerTree(const CallPointer& call);
+void answerFind(const CallPointer& call);
+void answerEventsSince(const CallPointer& call);
+/// @param node the id; nothing: it is the first argument
+void startRead(const CallPointer& call, std::optional<std::uint32_t> node);
+void startWrite(const CallPointer& call, std::optional<std::uint32_t> node);
+
+}  // namespace cvagent::service

@@ -1,0 +1,129 @@
+#include "agent/service/service.h"
+
+#include <utility>
+
+#include "agent/bus/reader.h"
+#include "agent/bus/writer.h"
+#include "agent/service/names.h"
+#include "agent/service/values.h"
+
+namespace cvagent::service {
+
+namespace {
+
+// Most of a read is waiting for the host's tools; one write at a time is the agent's rule anyway.
+constexpr Workers::Limits kReaders{8, 128, 512};
+constexpr Workers::Limits kWriters{1, 16, 64};
+constexpr std::chrono::seconds kBusTime{10};
+
+bus::Message busCall(const bus::Connection& connection, const std::string& member) {
+    bus::Message call =
+        connection.newCall({"org.freedesktop.DBus", "/org/freedesktop/DBus", "org.freedesktop.DBus", member});
+    bus::Writer(call).put(kBusName);
+    return call;
+}
+
+}  // namespace
+
+std::string whoServes(const bus::Connection& connection) {
+    if (!bus::Reader(connection.ask(busCall(connection, "NameHasOwner"), kBusTime)).flag()) {
+        return "";
+    }
+    try {
+        const auto process = connection.ask(busCall(connection, "GetConnectionUnixProcessID"), kBusTime);
+        return "process " + std::to_string(bus::Reader(process).number());
+    } catch (const bus::Error&) {
+        return "a process that the bus does not name";
+    }
+}
+
+Service::Service(Loop& loop, bus::Connection& connection, Agent& agent, const Config& config,
+                 EventSource past, std::uint64_t lastEvent)
+    : loop_(loop),
+      connection_(connection),
+      agent_(agent),
+      config_(config),
+      changes_(connection, loop),
+      callers_(connection),
+      consent_(connection),
+      looker_(agent,
+              [this, mailbox = loop.mailbox()](Look look) {
+                  mailbox->post(
+                      [this, held = std::make_shared<Look>(std::move(look))] { take(std::move(*held)); });
+              }),
+      readers_(kReaders),
+      writers_(kWriters),
+      parts_{connection, agent,    model_,   callers_,       consent_,
+             looker_,    readers_, writers_, loop.mailbox(), std::move(past)},
+      objects_(parts_, standing_) {
+    standing_.version = CORVISTA_VERSION;
+    standing_.lastEvent = lastEvent;
+    configure(config);
+}
+
+/// What comes back from other threads would find nothing of this any more.
+Service::~Service() {
+    windDown();
+    loop_.mailbox()->close();
+}
+
+void Service::begin() {
+    events_ = agent_.subscribe(0);
+    take(looker_.firstLook());
+    standing_.startedAt = standing_.lookedAt;
+    objects_.serve();
+    consent_.lookForPolkit();
+    if (!connection_.acquireName(kBusName)) {
+        throw Problem(Problem::busy, "another agent is on this bus already: " + whoServes(connection_));
+    }
+    changes_.begin(model_);
+    eventsCome_ = loop_.whenReadable(events_->descriptor(), [this] { takeEvents(); });
+    looker_.start();
+    armLook();
+}
+
+void Service::configure(const Config& config) {
+    config_ = config;
+    consent_.setTrustedGroup(config.trustedGroup);
+    looker_.setSettlingTime(config.settlingTime);
+    if (nextLook_ || !config.lookEvery.count()) {
+        armLook();
+    }
+}
+
+void Service::armLook() {
+    nextLook_.reset();
+    if (events_ && config_.lookEvery.count() > 0) {
+        nextLook_ = loop_.after(config_.lookEvery, [this] {
+            looker_.lookAtAll();
+            armLook();
+        });
+    }
+}
+
+void Service::take(Look look) {
+    if (look.whole) {
+        standing_.lookedAt = wallClock();
+    }
+    model_.apply(std::move(look));
+}
+
+void Service::takeEvents() {
+    for (const Event& event : events_->take().events) {
+        standing_.lastEvent = event.number;
+        if (event.kind == Event::Kind::withdrawn) {
+            model_.withdraw(event.nodeId, looker_.begun());
+        } else if (event.nodeId != 0) {
+            looker_.lookAgain(event.nodeId);
+        }
+        changes_.happened(event);
+    }
+}
+
+void Service::windDown() {
+    nextLook_.reset();
+    looker_.stop();
+    readers_.stop();
+}
+
+}  // namespace cvagent::service

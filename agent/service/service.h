@@ -1,0 +1,66 @@
+#pragma once
+
+#include <functional>
+#include <memory>
+#include <string>
+
+#include "agent/core/agent.h"
+#include "agent/service/calls.h"
+#include "agent/service/changes.h"
+#include "agent/service/config.h"
+#include "agent/service/objects.h"
+
+namespace cvagent::service {
+
+/// The agent on the bus: what it knows, what it is asked, what it tells. The loop's thread.
+class Service {
+public:
+    /// All outlive it.
+    /// @param past      what happened before; null where nothing is kept
+    /// @param lastEvent its last number
+    Service(Loop& loop, bus::Connection& connection, Agent& agent, const Config& config,
+            EventSource past = nullptr, std::uint64_t lastEvent = 0);
+    Service(const Service&) = delete;
+    Service& operator=(const Service&) = delete;
+    /// What is under way is waited for.
+    ~Service();
+
+    /// Looks at the host and puts it onto the bus. Throws Problem (busy) when another one has the name.
+    void begin();
+    void configure(const Config& config);
+    /// No further call is answered but that it is over; what is under way comes to its end.
+    void windDown();
+    /// Whether a write waits or is at work.
+    bool isWriting() const { return writers_.isBusy(); }
+    /// Whoever hears of changes of the host tells them here.
+    Freshness& freshness() { return looker_; }
+    std::size_t nodes() const { return model_.all().size(); }
+
+private:
+    void take(Look look);
+    void takeEvents();
+    void armLook();
+
+    Loop& loop_;
+    bus::Connection& connection_;
+    Agent& agent_;
+    Config config_;
+    Changes changes_;
+    Model model_{changes_};
+    Standing standing_;
+    Callers callers_;
+    Consent consent_;
+    Looker looker_;
+    Workers readers_;
+    Workers writers_;
+    Parts parts_;
+    Objects objects_;
+    std::shared_ptr<Subscription> events_;
+    Loop::Source eventsCome_;
+    Loop::Source nextLook_;
+};
+
+/// Who has the service's name on the bus: "process 123"; "" for nobody. Throws bus::Error.
+std::string whoServes(const bus::Connection& connection);
+
+}  // namespace cvagent::service

@@ -1,0 +1,133 @@
+// The method Write: judged, consented to, done, told.
+#include <pwd.h>
+
+#include <array>
+#include <utility>
+
+#include "agent/core/property_words.h"
+#include "agent/core/tree.h"
+#include "agent/service/calls.h"
+#include "agent/service/log.h"
+#include "agent/service/names.h"
+#include "agent/service/values.h"
+
+namespace cvagent::service {
+
+namespace {
+
+/// As long as a person waits for a host to change; one that waits its turn that long is told so.
+constexpr std::chrono::seconds kWriteTime{150};
+
+/// In the order of WriteResult::Outcome.
+constexpr std::array kVerdicts = {"applied", "differs", "unknown"};
+
+struct Wish {
+    NodeRef node;
+    const Property& row;
+    IC::PropertyValue value;
+    Caller caller;
+
+    std::string target() const { return node->getPath() + " " + row.name; }
+};
+
+std::string userName(std::uint32_t user) {
+    constexpr std::size_t kRoom = 65536;
+    std::string room(kRoom, '\0');
+    passwd entry{};
+    passwd* found = nullptr;
+    getpwuid_r(user, &entry, room.data(), room.size(), &found);
+    const std::string id = "uid " + std::to_string(user);
+    return found != nullptr ? std::string(found->pw_name) + " (" + id + ")" : id;
+}
+
+void note(Priority priority, const Wish& wish, const std::string& what, const std::string& verdict) {
+    log(priority, what,
+        {{"CORVISTA_NODE", wish.node->getPath()},
+         {"CORVISTA_PROPERTY", wish.row.name},
+         {"CORVISTA_CALLER_UID", std::to_string(wish.caller.user)},
+         {"CORVISTA_VERDICT", verdict}});
+}
+
+void answerWrite(const PendingCall& call, const WriteResult& result, const std::vector<std::string>& errors) {
+    if (result.problem) {
+        call.fail(*result.problem, errors);
+        return;
+    }
+    call.answer([&](bus::Writer& writer) {
+        putReading(writer, result.before);
+        putReading(writer, result.after);
+        writer.put(kVerdicts.at(result.outcome)).put(result.complained).put(result.lacking).put(errors);
+    });
+}
+
+/// On a thread of its own, since a host can take its time.
+void perform(const CallPointer& call, const Wish& wish, Request::Clock::time_point until) {
+    const std::string who = userName(wish.caller.user);
+    const Request request(who, until);
+    WriteResult result;
+    try {
+        result = call->parts().agent.write(wish.node, wish.row, wish.value, request);
+    } catch (const Problem& problem) {
+        result.problem = problem;
+    }
+    const std::vector<std::string> errors = request.errors().take().texts;
+    const std::string verdict = result.problem ? "failed" : kVerdicts.at(result.outcome);
+    note(Priority::notice, wish,
+         who + " wrote " + wish.target() + ": " + (result.problem ? result.problem->what() : verdict),
+         verdict);
+    call->parts().mailbox->post([call, result, errors, id = wish.node->getNodeId()] {
+        call->guarded([&] {
+            if (!result.after.failed()) {
+                call->parts().model.learn(id, {result.after});
+            }
+            call->parts().looker.lookAgain(id);
+            answerWrite(*call, result, errors);
+        });
+    });
+}
+
+void decide(const CallPointer& call, const Wish& wish) {
+    const bool stops = drasticLabel(wish.row, wish.value) != nullptr;
+    const Consent::Question question{stops ? Audience::stoppers : Audience::writers, "write " + wish.target(),
+                                     call->message().allowsInteraction()};
+    call->parts().consent.ask(wish.caller, question, [call, wish](bool allowed, const std::string& reason) {
+        call->guarded([&] {
+            if (!allowed) {
+                note(Priority::warning, wish,
+                     "uid " + std::to_string(wish.caller.user) + " may not write " + wish.target() + ": " +
+                         reason,
+                     "denied");
+                throw bus::Error(bus::kAccessDenied, "you may not write this: " + reason);
+            }
+            const auto until = Request::Clock::now() + kWriteTime;
+            const bool taken = call->parts().writers.submit(
+                wish.caller.user, [call, wish, until] { perform(call, wish, until); });
+            if (!taken) {
+                throw bus::Error(bus::kLimitsExceeded, "too many writes wait for their turn already");
+            }
+        });
+    });
+}
+
+}  // namespace
+
+void startWrite(const CallPointer& call, std::optional<std::uint32_t> node) {
+    bus::Reader arguments(call->message());
+    const std::uint32_t id = node ? *node : arguments.number();
+    const std::uint32_t property = arguments.number();
+    std::vector<std::string> words = takeWords(arguments);
+    const NodeView* view = call->parts().model.byId(id);
+    if (view == nullptr) {
+        throw Problem(Problem::notFound, "there is no node " + std::to_string(id), Problem::node);
+    }
+    if (words.empty()) {
+        words.emplace_back();  // an empty list
+    }
+    const Property& row = writableRow(*view->node, std::to_string(property));
+    const IC::PropertyValue value = acceptedValue(row, words);
+    call->withCaller([call, ref = view->node, &row, value](const Caller& caller) {
+        decide(call, {ref, row, value, caller});
+    });
+}
+
+}  // namespace cvagent::service
