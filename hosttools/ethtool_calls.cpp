@@ -118,61 +118,36 @@ public:
     Modes(const LinkSettings& settings, LinkSettings::Mask mask) : settings_(settings), mask_(mask) {}
 
     bool has(unsigned bit) const { return settings_.has(mask_, bit); }
+    /// The full duplex of a speed stands on the line of its half duplex, should this be there or not.
+    void addSpeeds(Text& text, std::size_t indent) const {
+        bool any = false;
+        bool newLine = false;
+        bool sameLine = false;
+        for (const auto& [bit, name] : speeds) {
+            newLine = newLine || (any && !sameLine);
+            sameLine = name.ends_with("/Half");
+            if (!has(bit)) continue;
+            if (newLine) text.add("\n\t").left("", indent);
+            text.add(name).add(' ');
+            any = true;
+            newLine = false;
+        }
+        text.add(any ? "\n" : "Not reported\n");
+    }
+    void addErrorCorrections(Text& text) const {
+        bool any = false;
+        for (const auto& [bit, name] : errorCorrections) {
+            if (!has(bit)) continue;
+            text.add(any ? " " : "").add(name);
+            any = true;
+        }
+        if (!any) text.add("Not reported");
+    }
 
 private:
     const LinkSettings& settings_;
     LinkSettings::Mask mask_;
 };
-
-void addErrorCorrections(Text& text, const Modes& modes) {
-    bool any = false;
-    for (const auto& [bit, name] : errorCorrections) {
-        if (!modes.has(bit)) continue;
-        text.add(any ? " " : "").add(name);
-        any = true;
-    }
-    if (!any) text.add("Not reported");
-}
-
-/// The full duplex of a speed stands on the line of its half duplex, should this be there or not.
-void addSpeeds(Text& text, const Modes& modes, std::size_t indent) {
-    bool any = false;
-    bool newLine = false;
-    bool sameLine = false;
-    for (const auto& [bit, name] : speeds) {
-        newLine = newLine || (any && !sameLine);
-        sameLine = name.ends_with("/Half");
-        if (!modes.has(bit)) continue;
-        if (newLine) text.add("\n\t").left("", indent);
-        text.add(name).add(' ');
-        any = true;
-        newLine = false;
-    }
-    text.add(any ? "\n" : "Not reported\n");
-}
-
-struct Labels {
-    std::string_view whose;      ///< "Supported"
-    std::string_view negotiate;  ///< "Supports"
-    std::size_t indent;
-};
-
-constexpr Labels labels[LinkSettings::masks] = {{"Supported", "Supports", 24},
-                                                {"Advertised", "Advertised", 24},
-                                                {"Link partner advertised", "Link partner advertised", 37}};
-
-void addModes(Text& text, const Modes& modes, const Labels& label) {
-    const std::size_t mark = text.size() + 1;
-    text.add("\t").add(label.whose).add(" link modes:").padLeftAligned(mark, label.indent);
-    addSpeeds(text, modes, label.indent);
-    text.add("\t").add(label.whose).add(" pause frame use: ");
-    addPause(text, modes.has(ETHTOOL_LINK_MODE_Pause_BIT), modes.has(ETHTOOL_LINK_MODE_Asym_Pause_BIT));
-    text.add("\n\t").add(label.negotiate).add(" auto-negotiation: ");
-    text.add(modes.has(ETHTOOL_LINK_MODE_Autoneg_BIT) ? "Yes\n\t" : "No\n\t");
-    text.add(label.whose).add(" FEC modes: ");
-    addErrorCorrections(text, modes);
-    text.add('\n');
-}
 
 void addSettings(Text& text, const LinkSettings& settings) {
     text.add("\tSupported ports: [ ");
@@ -180,9 +155,10 @@ void addSettings(Text& text, const LinkSettings& settings) {
         if (settings.has(LinkSettings::supported, bit)) text.add(name).add(' ');
     }
     text.add("]\n");
-    for (const auto mask : {LinkSettings::supported, LinkSettings::advertised, LinkSettings::partner}) {
-        const bool isTold = mask != LinkSettings::partner || settings.any(mask);
-        if (isTold) addModes(text, {settings, mask}, labels[mask]);
+    addModes(text, Modes(settings, LinkSettings::supported), supportedModes);
+    addModes(text, Modes(settings, LinkSettings::advertised), advertisedModes);
+    if (settings.any(LinkSettings::partner)) {
+        addModes(text, Modes(settings, LinkSettings::partner), partnerModes);
     }
     const ethtool_link_settings& head = settings.head();
     addSpeed(text.add("\tSpeed: "), head.speed);

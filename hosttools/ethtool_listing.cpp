@@ -104,34 +104,20 @@ public:
         addNames(text, ModeClass::port, "");
         text.add(" ]\n");
     }
-    /// @param label with the blanks behind it; further lines begin below its end
-    void addSpeeds(Text& text, std::string_view label) const {
-        text.add("\t").add(label);
+    void addSpeeds(Text& text, std::size_t indent) const {
         const Bit* before = nullptr;
         for (const Bit& bit : bits_) {
             if (classOf(bit.index) != ModeClass::speed) continue;
-            if (before != nullptr) addBetween(text, *before, bit, label.size());
+            if (before != nullptr) addBetween(text, *before, bit, indent);
             text.add(bit.name);
             before = &bit;
         }
         text.add(before == nullptr ? "Not reported\n" : "\n");
     }
-    void addPause(Text& text, std::string_view label) const {
-        text.add("\t").add(label);
-        hosttools::addPause(text, has(ETHTOOL_LINK_MODE_Pause_BIT), has(ETHTOOL_LINK_MODE_Asym_Pause_BIT));
-        text.add('\n');
-    }
-    void addNegotiation(Text& text, std::string_view label) const {
-        text.add("\t").add(label).add(has(ETHTOOL_LINK_MODE_Autoneg_BIT) ? "Yes\n" : "No\n");
-    }
-    void addErrorCorrection(Text& text, std::string_view label) const {
-        text.add("\t").add(label);
-        addNames(text, ModeClass::fec, "Not reported");
-        text.add('\n');
-    }
+    void addErrorCorrections(Text& text) const { addNames(text, ModeClass::fec, "Not reported"); }
+    bool has(unsigned index) const { return std::ranges::find(bits_, index, &Bit::index) != bits_.end(); }
 
 private:
-    bool has(unsigned index) const { return std::ranges::find(bits_, index, &Bit::index) != bits_.end(); }
     /// Half and full duplex of a speed share a line, but for the newest, which the tool does not know either.
     static void addBetween(Text& text, const Bit& before, const Bit& bit, std::size_t indent) {
         constexpr unsigned newestKnown = ETHTOOL_LINK_MODE_10baseT1L_Full_BIT;
@@ -158,23 +144,8 @@ void addOurModes(Text& text, std::string_view bitset) {
     const std::vector<Bit> bits = readBits(bitset);
     const Modes supported(bits, false);
     supported.addPorts(text);
-    supported.addSpeeds(text, "Supported link modes:   ");
-    supported.addPause(text, "Supported pause frame use: ");
-    supported.addNegotiation(text, "Supports auto-negotiation: ");
-    supported.addErrorCorrection(text, "Supported FEC modes: ");
-    const Modes advertised(bits, true);
-    advertised.addSpeeds(text, "Advertised link modes:  ");
-    advertised.addPause(text, "Advertised pause frame use: ");
-    advertised.addNegotiation(text, "Advertised auto-negotiation: ");
-    advertised.addErrorCorrection(text, "Advertised FEC modes: ");
-}
-
-void addPeerModes(Text& text, std::string_view bitset) {
-    const Modes peer(readBits(bitset), true);
-    peer.addSpeeds(text, "Link partner advertised link modes:  ");
-    peer.addPause(text, "Link partner advertised pause frame use: ");
-    peer.addNegotiation(text, "Link partner advertised auto-negotiation: ");
-    peer.addErrorCorrection(text, "Link partner advertised FEC modes: ");
+    addModes(text, supported, supportedModes);
+    addModes(text, Modes(bits, true), advertisedModes);
 }
 
 /// "\tLABEL: " and a number's name, when the number is there.
@@ -188,7 +159,9 @@ void addNamedNumber(Text& text, std::string_view label, std::optional<std::uint3
 
 void addLinkModes(Text& text, const Attributes& told) {
     if (const auto ours = told.bytes(ETHTOOL_A_LINKMODES_OURS)) addOurModes(text, *ours);
-    if (const auto peer = told.bytes(ETHTOOL_A_LINKMODES_PEER)) addPeerModes(text, *peer);
+    if (const auto peer = told.bytes(ETHTOOL_A_LINKMODES_PEER)) {
+        addModes(text, Modes(readBits(*peer), true), partnerModes);
+    }
     addNamedNumber(text, "Speed", told.number(ETHTOOL_A_LINKMODES_SPEED), addSpeed);
     addNamedNumber(text, "Lanes", told.number(ETHTOOL_A_LINKMODES_LANES),
                    [](Text& place, unsigned lanes) { place.number(lanes); });

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <linux/ethtool.h>
+#include <cstddef>
 #include <cstdint>
 #include <string_view>
 
@@ -26,6 +28,30 @@ void addWakeOnLan(Text& text, std::uint32_t supported, std::uint32_t enabled);
 void addPassword(Text& text, std::string_view password);
 /// "Symmetric Receive-only"
 void addPause(Text& text, bool pause, bool asymmetric);
+
+/// What is said of the link modes of one side.
+struct ModeLabels {
+    std::string_view whose;       ///< "Supported"
+    std::string_view negotiates;  ///< "Supports"
+    std::size_t indent;           ///< at which the modes are listed
+};
+constexpr ModeLabels supportedModes{"Supported", "Supports", 24};
+constexpr ModeLabels advertisedModes{"Advertised", "Advertised", 24};
+constexpr ModeLabels partnerModes{"Link partner advertised", "Link partner advertised", 37};
+
+/// The modes of one side. @param modes has(bit), addSpeeds(text, indent), addErrorCorrections(text)
+template <typename Modes>
+void addModes(Text& text, const Modes& modes, const ModeLabels& labels) {
+    const std::size_t mark = text.size() + 1;
+    text.add("\t").add(labels.whose).add(" link modes:").padLeftAligned(mark, labels.indent);
+    modes.addSpeeds(text, labels.indent);
+    text.add("\t").add(labels.whose).add(" pause frame use: ");
+    addPause(text, modes.has(ETHTOOL_LINK_MODE_Pause_BIT), modes.has(ETHTOOL_LINK_MODE_Asym_Pause_BIT));
+    text.add("\n\t").add(labels.negotiates).add(" auto-negotiation: ");
+    text.add(modes.has(ETHTOOL_LINK_MODE_Autoneg_BIT) ? "Yes\n\t" : "No\n\t");
+    modes.addErrorCorrections(text.add(labels.whose).add(" FEC modes: "));
+    text.add('\n');
+}
 
 /// Why there is no link, "Autoneg". @return "" for a number without a name
 std::string_view noLinkReason(unsigned reason);

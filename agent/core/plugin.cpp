@@ -56,34 +56,17 @@ void complaining(const Tell& tell, const std::string& what, const Call& call) {
 
 void tellNobody(const std::string& /*text*/) {}
 
-Plugin::Plugin(const std::string& file, Listener* listener, Tell tell, LoadOnly /*tag*/)
-    : file_(file), events_(listener), tell_(std::move(tell)) {
-    try {
-        load();
-        open();
-        takePlace();
-    } catch (...) {
-        close();
-        throw;
-    }
-}
-
-Plugin::Plugin(const std::string& file, Listener* listener, Tell tell, bool processors)
-    : Plugin(file, listener, std::move(tell), LoadOnly()) {
-    start(processors);
-    tellEvents();
-}
-
-std::unique_ptr<Plugin> Plugin::loaded(const std::string& file, Listener* listener, Tell tell) {
-    return std::unique_ptr<Plugin>(new Plugin(file, listener, std::move(tell), LoadOnly()));
+Plugin::Plugin(std::string file, Listener* listener, Tell tell)
+    : file_(std::move(file)), events_(listener), tell_(std::move(tell)) {
+    load();
+    open();
+    takePlace();
 }
 
 Plugin::~Plugin() {
     if (begun_) {
         stop();
     }
-    running_.reset();
-    close();
 }
 
 void Plugin::load() {
@@ -91,7 +74,7 @@ void Plugin::load() {
     if (!std::filesystem::exists(file_, ignored)) {
         fail("there is no plug-in file " + inQuotes(file_), Problem::pluginFile);
     }
-    library_ = dlopen(file_.c_str(), RTLD_NOW | RTLD_LOCAL);
+    library_.reset(dlopen(file_.c_str(), RTLD_NOW | RTLD_LOCAL));
     if (library_ == nullptr) {
         const char* reason = dlerror();
         fail("cannot load the plug-in " + inQuotes(file_) + ": " +
@@ -101,7 +84,7 @@ void Plugin::load() {
 }
 
 void Plugin::open() {
-    const auto openMi = symbol<OpenMi>(library_, "OpenMI");
+    const auto openMi = symbol<OpenMi>(library_.get(), "OpenMI");
     if (openMi == nullptr) {
         fail(inQuotes(file_) + " is a library but no plug-in: it has no OpenMI", Problem::pluginEntry);
     }
@@ -150,7 +133,7 @@ void Plugin::initialize(bool processors) {
     if (result.getStatus() != 0) {
         fail("the plug-in " + inQuotes(file_) + " did not initialize: " + errorText(result));
     }
-    const auto create = symbol<Builder>(library_, kProcessorBuilder);
+    const auto create = symbol<Builder>(library_.get(), kProcessorBuilder);
     if (create != nullptr && processors) {
         create(interface_);
     }
@@ -183,13 +166,6 @@ void Plugin::stop() {
         interface_->setWithdrawCallBack(nullptr, nullptr);
     });
     running_.reset();
-}
-
-void Plugin::close() {
-    if (library_ != nullptr) {
-        dlclose(library_);
-        library_ = nullptr;
-    }
 }
 
 IC::Error Plugin::nodeLoaded(IC::Node* const& node, const void* plugin) {

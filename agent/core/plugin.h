@@ -1,5 +1,7 @@
 #pragma once
 
+#include <dlfcn.h>
+
 #include <functional>
 #include <memory>
 #include <optional>
@@ -16,23 +18,21 @@ namespace cvagent {
 using Tell = std::function<void(const std::string& text)>;
 void tellNobody(const std::string& text);
 
-/// A loaded and initialized plug-in. It knows the plug-in by OpenMI and by the exported builder of processor
-/// nodes alone. Handles of nodes must be gone before the object is.
+/// A plug-in from its load to its unload. It knows the plug-in by OpenMI and by the exported builder of
+/// processor nodes alone. Handles of nodes must be gone before the object is.
 class Plugin {
 public:
-    /// Loads the library, hands over the callbacks, initializes it, gives every node its path.
+    /// Loads the library and gives it its place: several can then start at once, while the order in which
+    /// they were loaded decides their ids.
     /// @param file its path; one without a slash would be looked for at the loader's own places
-    /// @param listener hears of alerts, published and withdrawn nodes, from the moment when the start has
-    ///                 succeeded: what came before it hears then. Null for none. Outlives the object.
+    /// @param listener hears of alerts, published and withdrawn nodes, see tellEvents(). Null for none.
+    ///                 Outlives the object.
     /// @param tell     hears of a stop that went wrong
-    /// @param processors whether its builder of processor nodes is called
     /// Throws Problem, with a text of its own for each way in which a file can be no plug-in.
-    Plugin(const std::string& file, Listener* listener, Tell tell = tellNobody, bool processors = true);
-    /// The same in two steps, so that several can start at once while the order in which they were loaded
-    /// decides their ids: loaded() loads the library and gives it its place, start() and tellEvents() do the
-    /// rest.
-    static std::unique_ptr<Plugin> loaded(const std::string& file, Listener* listener, Tell tell);
-    /// At most once. Throws Problem; what is left then is good for nothing but its end.
+    explicit Plugin(std::string file, Listener* listener = nullptr, Tell tell = tellNobody);
+    /// Hands over the callbacks, initializes the plug-in, gives every node its path. At most once. Throws
+    /// Problem; what is left then is good for nothing but its end.
+    /// @param processors whether its builder of processor nodes is called
     void start(bool processors);
     /// After the start: the listener hears what came meanwhile, and from now on everything.
     void tellEvents() { events_.release(); }
@@ -51,9 +51,6 @@ private:
     static void nodeWithdrawn(const IC::Node& node, const void* plugin);
     static IC::Error alertsCame(const std::vector<IC::Alert>& alerts, const void* plugin);
 
-    struct LoadOnly {};
-    Plugin(const std::string& file, Listener* listener, Tell tell, LoadOnly tag);
-
     void load();
     void open();
     void takePlace();
@@ -61,12 +58,11 @@ private:
     void checkIds() const;
     bool isOwnId(const IC::MutableNode& node) const;
     void stop();
-    void close();
 
     std::string file_;
     mutable WithheldEvents events_;  // the callbacks have their context as const
     Tell tell_;
-    void* library_ = nullptr;
+    std::unique_ptr<void, int (*)(void*)> library_{nullptr, dlclose};  // outlives what follows
     IC::ManagementInterface* interface_ = nullptr;
     std::optional<RunningPlugin> running_;
     bool begun_ = false;  // there is something to stop

@@ -66,7 +66,7 @@ PluginStart::PluginStart(std::string file, Listener* listener, Tell tell, Starte
     state_->tell = tell;
     state_->started = std::move(started);
     try {
-        state_->plugin = Plugin::loaded(file_, listener, std::move(tell));
+        state_->plugin = std::make_unique<Plugin>(file_, listener, std::move(tell));
     } catch (const Problem& problem) {
         state_->problem = problem;
         state_->ended = true;

@@ -249,6 +249,9 @@ bool ProcessSource::pull(std::string& out) {
     out.resize(before + kChunk);
     const ssize_t got = readOutput(out.data() + before);
     out.resize(before + (got > 0 ? static_cast<std::size_t>(got) : 0));
+    if (got <= 0) {
+        child_.setOutput(-1);  // what was read to its end is not cut off
+    }
     return got > 0;
 }
 

@@ -36,24 +36,28 @@ struct ClassRow {
 constexpr Id firstId(Class type) {
     return static_cast<unsigned int>(type) * 100;
 }
+constexpr Class classOfId(Id id) {
+    return static_cast<Class>(id / 100);
+}
 
 enum class Kind { text, texts, number, flag };
 
-/// Who may read it: what a thief or a tracker could use is told to root and to those the service names.
-enum class Audience { everybody, trusted };
+struct Traits {
+    bool live = false;     ///< it changes while nobody announces it, so a read asks the host anew
+    bool trusted = false;  ///< of use to a thief or a tracker: told to root and to those the service names
+};
+constexpr Traits kLive{.live = true};
+constexpr Traits kTrusted{.trusted = true};
 
 /// One row of the catalogue.
 struct Row {
-    Class type;
-    Id id;
+    Id id;  ///< its class is in it
     const char* name;
     Kind kind;
     const char* unit;    ///< "" for none
     const char* source;  ///< the file, or the call, that it comes from
     const char* meaning;
-    Audience audience = Audience::everybody;
-    /// It changes while nobody announces it, so a read asks the host anew.
-    bool live = false;
+    Traits traits{};
 };
 
 /// The rows that a source brings along.

@@ -11,7 +11,7 @@ constexpr std::chrono::milliseconds kFresh{500};
 
 bool isLive(const Source& source, Id id) {
     return std::any_of(source.rows.begin(), source.rows.end(),
-                       [id](const Row& row) { return row.id == id && row.live; });
+                       [id](const Row& row) { return row.id == id && row.traits.live; });
 }
 
 IC::Error noAnswer() {
@@ -44,7 +44,7 @@ std::vector<std::optional<Known>> ask(const std::shared_ptr<Asking>& asking, con
         one.asOf = std::chrono::steady_clock::now();
         source.describe(host, one.found);
     };
-    const std::vector<bool> answered = asking->patience.runAll(std::move(devices), describe);
+    const std::vector<bool> answered = asking->runner.runAll(std::move(devices), describe);
     std::vector<std::optional<Known>> known(names.size());
     for (std::size_t place = 0; place < names.size(); ++place) {
         if (answered[place]) {

@@ -6,8 +6,8 @@
 #include <string>
 
 #include "framework/ic/mutable_node.h"
+#include "plugins/hardware/deadline_runner.h"
 #include "plugins/hardware/host.h"
-#include "plugins/hardware/patience.h"
 #include "plugins/hardware/sources.h"
 
 namespace hardware {
@@ -15,10 +15,10 @@ namespace hardware {
 /// What all nodes ask with. It lives as long as the last question.
 struct Asking {
     explicit Asking(Host where, std::chrono::milliseconds limit = std::chrono::seconds(2))
-        : host(std::move(where)), patience(limit) {}
+        : host(std::move(where)), runner(limit) {}
 
     Host host;
-    Patience patience;
+    DeadlineRunner runner;
 };
 
 /// What is known of a thing, and when the asking for it began.

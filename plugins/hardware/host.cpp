@@ -179,6 +179,17 @@ std::string trimmed(const std::string& text) {
     return first == std::string::npos ? "" : text.substr(first, text.find_last_not_of(kBlank) - first + 1);
 }
 
+std::optional<std::string> firstTold(std::initializer_list<std::optional<std::string>> texts) {
+    const auto* const first =
+        std::ranges::find_if(texts, [](const auto& text) { return text && !text->empty(); });
+    return first == texts.end() ? std::nullopt : *first;
+}
+
+std::optional<std::string> textOf(const TextMap& texts, const std::string& key) {
+    const auto found = texts.find(key);
+    return found == texts.end() || found->second.empty() ? std::nullopt : std::optional(found->second);
+}
+
 std::optional<unsigned long long> asNumber(const std::string& text) {
     const bool hexadecimal = text.starts_with("0x");
     return QX::wholeNumber<unsigned long long>(std::string_view(text).substr(hexadecimal ? 2 : 0),

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <initializer_list>
+#include <map>
 #include <memory>
 #include <optional>
 #include <string>
@@ -61,6 +63,12 @@ bool comesBefore(const std::string& left, const std::string& right);
 std::string printable(std::string text);
 /// The text without blanks and NUL at both ends.
 std::string trimmed(const std::string& text);
+/// The first text that is told, and not empty.
+std::optional<std::string> firstTold(std::initializer_list<std::optional<std::string>> texts);
+
+using TextMap = std::map<std::string, std::string>;
+/// The text of a key; nothing where it is missing or empty.
+std::optional<std::string> textOf(const TextMap& texts, const std::string& key);
 /// The whole text as a number; nothing for anything else.
 std::optional<unsigned long long> asNumber(const std::string& text);
 /// As asNumber, for what can be below zero.

@@ -1,5 +1,6 @@
 // Prints the plug-in's catalogue as the file that lies beside the library: one table for code and readers.
 #include <algorithm>
+#include <array>
 #include <cstdio>
 #include <exception>
 #include <iostream>
@@ -15,27 +16,17 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-const char* kindName(hardware::Kind kind) {
-    switch (kind) {
-        case hardware::Kind::text:
-            return "text";
-        case hardware::Kind::texts:
-            return "texts";
-        case hardware::Kind::number:
-            return "number";
-        case hardware::Kind::flag:
-            break;
-    }
-    return "flag";
-}
+// By their values.
+constexpr std::array kKindNames = {"text", "texts", "number", "flag"};
 
 /// Throws when the class has no property of a name.
 Json idsOf(const hardware::ClassRow& type, const std::vector<hardware::Row>& rows) {
     Json ids = Json::array();
     std::istringstream names(type.telling);
     for (std::string name; names >> name;) {
-        const auto row = std::ranges::find_if(
-            rows, [&](const hardware::Row& one) { return one.type == type.type && one.name == name; });
+        const auto row = std::ranges::find_if(rows, [&](const hardware::Row& one) {
+            return hardware::classOfId(one.id) == type.type && one.name == name;
+        });
         if (row == rows.end()) {
             throw std::logic_error(std::string(type.name) + " has no property " + name);
         }
@@ -58,14 +49,14 @@ void printCatalogue() {
         json["classes"].push_back(one);
     }
     for (const hardware::Row& row : rows) {
-        json["properties"].push_back({{"class", static_cast<unsigned int>(row.type)},
+        json["properties"].push_back({{"class", static_cast<unsigned int>(hardware::classOfId(row.id))},
                                       {"id", row.id},
                                       {"name", row.name},
-                                      {"kind", kindName(row.kind)},
+                                      {"kind", kKindNames.at(static_cast<std::size_t>(row.kind))},
                                       {"unit", row.unit},
                                       {"source", row.source},
                                       {"meaning", row.meaning},
-                                      {"trusted", row.audience == hardware::Audience::trusted}});
+                                      {"trusted", row.traits.trusted}});
     }
     std::puts(json.dump(1).c_str());
 }

@@ -1,7 +1,6 @@
 #include "plugins/hardware/sources.h"
 
 #include <algorithm>
-#include <iterator>
 
 #include "plugins/hardware/memory/memory.h"
 #include "plugins/hardware/network/links.h"
@@ -30,7 +29,7 @@ constexpr ClassRow kClasses[] = {
 };
 
 constexpr Row nameRow(Class type) {
-    return {type, firstId(type), "Name", Kind::text, "", "the kernel", "what it is called"};
+    return {firstId(type), "Name", Kind::text, "", "the kernel", "what it is called"};
 }
 
 const Source kSources[] = {
@@ -54,8 +53,7 @@ std::span<const ClassRow> classes() {
 }
 
 const ClassRow& classRow(Class type) {
-    return *std::find_if(std::begin(kClasses), std::end(kClasses),
-                         [type](const ClassRow& row) { return row.type == type; });
+    return *std::ranges::find(kClasses, type, &ClassRow::type);
 }
 
 std::span<const Source> sources() {

@@ -123,6 +123,8 @@ TEST(CommandDeadline, IsTenSecondsWhenNobodyAsks) {
 
 HOST_TEST(CommandDeadline, ACommandThatHasEndedIsNotKilled) {
     FILE* pipe = popen("true", "r");
+    while (std::fgetc(pipe) != EOF) {
+    }
     siginfo_t ended{};
     ASSERT_EQ(waitid(P_ALL, 0, &ended, WEXITED | WNOWAIT), 0);
     testing::internal::CaptureStderr();

@@ -5,10 +5,10 @@
 #include <nlohmann/json.hpp>
 
 #include "agent/core/command_deadline.h"
-#include "agent/core/plugin.h"
 #include "agent/core/surroundings.h"
 #include "framework/qx/thread.h"
 #include "tests/agent/hostile_host.h"
+#include "tests/agent/started_plugin.h"
 #include "tests/agent/suse_host.h"
 
 namespace {
@@ -118,7 +118,7 @@ HOST_TEST(HangingTool, TheMonitorsGoOnAndTellNoLies) {
     Alerts alerts;
     const cvagent::CommandDeadline deadline(0.5s, cvagent::tellNobody);
     QX::setClockSpeed(1000);  // a pass every 30 ms
-    cvagent::Plugin plugin(CORVISTA_PLUGIN_FILE, &alerts);
+    StartedPlugin plugin(CORVISTA_PLUGIN_FILE, &alerts);
     ASSERT_TRUE(eventually([&] { return host.exists("/opt/vantrel/corvista/data/oshwminetind.dat"); }));
     host.file("/hang", "");
     const auto calls = [&] { return host.callsOf("ethtool").size(); };

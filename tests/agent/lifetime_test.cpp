@@ -7,17 +7,16 @@
 #include <thread>
 
 #include "agent/core/log_output.h"
-#include "agent/core/plugin.h"
 #include "agent/core/reading.h"
 #include "agent/core/surroundings.h"
 #include "agent/core/tree.h"
 #include "framework/qx/thread.h"
+#include "tests/agent/started_plugin.h"
 #include "tests/support/fake_host.h"
 
 namespace {
 
 using cvagent::Event;
-using cvagent::Plugin;
 
 std::size_t entries(const std::string& directory) {
     const std::filesystem::directory_iterator all(directory);
@@ -49,12 +48,12 @@ public:
 
 void loadAgainAndAgain(const std::string& file, int times, double clockSpeed = 1) {
     const cvagent::LogOutput log({}, std::make_shared<cvagent::ErrorLines>());
-    { Plugin first(file, nullptr); }  // what the C library keeps from its first use
+    { StartedPlugin first(file, nullptr); }  // what the C library keeps from its first use
     const auto before = holdings();
     for (int i = 0; i < times; ++i) {
         Counter counter;
         QX::setClockSpeed(clockSpeed);
-        Plugin plugin(file, &counter);
+        StartedPlugin plugin(file, &counter);
         ASSERT_GE(plugin.interface().holdAll().size(), 7U) << i;
         QX::setClockSpeed(1);  // the stop waits for the monitors as long as it ever does
     }
@@ -89,7 +88,7 @@ HOST_TEST(PluginLifetime, APluginThatStaysMappedIsLeftWithoutACallback) {
     Counter counter;
     IC::ManagementInterface* interface = nullptr;
     {
-        Plugin plugin(CORVISTA_PLUGIN_FILE, &counter);
+        StartedPlugin plugin(CORVISTA_PLUGIN_FILE, &counter);
         interface = &plugin.interface();
     }
     auto* const node = new IC::MutableNode(900, 1, {1}, 11, 1);
@@ -101,10 +100,11 @@ HOST_TEST(PluginLifetime, APluginThatStaysMappedIsLeftWithoutACallback) {
 
 HOST_TEST(PluginLifetime, TwoHundredFailuresLeaveNothingBehind) {
     setenv("CORVISTA_FAKE_PLUGIN", "badstart churn", 1);
-    EXPECT_ANY_THROW(Plugin(FAKE_PLUGIN_FILE, nullptr));  // what the C library keeps from its first use
+    EXPECT_ANY_THROW(
+        StartedPlugin(FAKE_PLUGIN_FILE, nullptr));  // what the C library keeps from its first use
     const auto before = holdings();
     for (int i = 0; i < 200; ++i) {
-        EXPECT_ANY_THROW(Plugin(FAKE_PLUGIN_FILE, nullptr));
+        EXPECT_ANY_THROW(StartedPlugin(FAKE_PLUGIN_FILE, nullptr));
     }
     EXPECT_EQ(holdingsBackAt(before), before);
 }
@@ -114,7 +114,7 @@ HOST_TEST(PluginLifetime, NodesAreReadWhileTheyComeAndGo) {
     Counter counter;
     std::atomic<int> reads{0};
     {
-        Plugin plugin(FAKE_PLUGIN_FILE, &counter);
+        StartedPlugin plugin(FAKE_PLUGIN_FILE, &counter);
         std::vector<std::jthread> readers;
         for (int i = 0; i < 4; ++i) {
             readers.emplace_back([&](const std::stop_token& stop) {
@@ -137,7 +137,7 @@ HOST_TEST(PluginLifetime, NodesAreReadWhileTheyComeAndGo) {
 HOST_TEST(PluginLifetime, HandlesKeepWithdrawnNodesAlive) {
     setenv("CORVISTA_FAKE_PLUGIN", "churn", 1);
     Counter counter;
-    Plugin plugin(FAKE_PLUGIN_FILE, &counter);
+    StartedPlugin plugin(FAKE_PLUGIN_FILE, &counter);
     cvagent::Handle drive;
     while (!drive) {
         for (const cvagent::Handle& node : plugin.interface().holdAll()) {
@@ -159,7 +159,7 @@ HOST_TEST(PluginLifetime, RebuiltDrivesReplaceTheOldOnes) {
               "Disk /dev/sda: 80.0 GB, 80026361856 bytes\n/dev/sda1   1  13  104391  83  Linux\n");
     QX::setClockSpeed(1000);  // the monitor's two minutes in an eighth of a second
     Counter counter;
-    Plugin plugin(CORVISTA_PLUGIN_FILE, &counter);
+    StartedPlugin plugin(CORVISTA_PLUGIN_FILE, &counter);
     for (int i = 0; i < 3000 && counter.published < 2; ++i) {
         std::this_thread::sleep_for(std::chrono::milliseconds(10));
     }

@@ -28,8 +28,7 @@ TEST(HardwareCatalogue, IdsAndNamesAreUniqueInTheirClass) {
     std::set<std::pair<Class, std::string>> names;
     for (const hardware::Row& row : hardware::allRows()) {
         EXPECT_TRUE(ids.insert(row.id).second) << row.name;
-        EXPECT_TRUE(names.insert({row.type, row.name}).second) << row.name;
-        EXPECT_EQ(row.id / 100, static_cast<unsigned int>(row.type)) << row.name;
+        EXPECT_TRUE(names.insert({hardware::classOfId(row.id), row.name}).second) << row.name;
         EXPECT_NE(*row.source, '\0') << row.name;
         EXPECT_NE(*row.meaning, '\0') << row.name;
     }
@@ -41,7 +40,7 @@ TEST(HardwareCatalogue, SourcesBringTheirOwnRowsAndComeAfterTheirParents) {
         EXPECT_TRUE(seen.insert(source.type).second);
         EXPECT_EQ(hardware::classRow(source.type).type, source.type);
         for (const hardware::Row& row : source.rows) {
-            EXPECT_EQ(row.type, source.type) << row.name;
+            EXPECT_EQ(hardware::classOfId(row.id), source.type) << row.name;
         }
     }
     EXPECT_EQ(seen.size() + 1, hardware::classes().size());
@@ -109,9 +108,8 @@ struct Device {
         changed.notify_all();
     }
     static constexpr hardware::Row kRows[] = {
-        {Class::link, 31001, "Live", hardware::Kind::number, "", "s", "m", hardware::Audience::everybody,
-         true},
-        {Class::link, 31002, "Fixed", hardware::Kind::number, "", "s", "m"},
+        {31001, "Live", hardware::Kind::number, "", "s", "m", hardware::kLive},
+        {31002, "Fixed", hardware::Kind::number, "", "s", "m"},
     };
     static inline const hardware::Source kSource{Class::link, kRows, nullptr, describe, ""};
 };

@@ -99,9 +99,7 @@ TEST_P(RecordedHosts, WhatIsForTrustedOnesIsNotToldToOthers) {
     for (const auto& node : plugin.holdAll()) {
         for (const hardware::Row& row : hardware::allRows()) {
             IC::PropertyValue value;
-            EXPECT_FALSE(row.audience == hardware::Audience::trusted &&
-                         node->getProperty(row.id, value).getStatus() == 0)
-                << row.name;
+            EXPECT_FALSE(row.traits.trusted && node->getProperty(row.id, value).getStatus() == 0) << row.name;
         }
     }
 }

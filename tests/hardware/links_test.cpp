@@ -92,7 +92,7 @@ protected:
         std::erase_if(facts, [](const auto& fact) {
             const auto rows = hardware::allRows();
             return std::any_of(rows.begin(), rows.end(), [&](const hardware::Row& row) {
-                return row.id == fact.first && row.live && std::string(row.name) != "Master" &&
+                return row.id == fact.first && row.traits.live && std::string(row.name) != "Master" &&
                        std::string(row.name) != "Carrier";
             });
         });

@@ -147,7 +147,7 @@ std::string told(const hardware::Host& host, Class type, const std::string& name
     sourceOf(type).describe(host, found);
     for (const hardware::Row& row : hardware::allRows()) {
         const auto fact = found.facts.all().find(row.id);
-        if (row.type == type && row.name == property && fact != found.facts.all().end()) {
+        if (hardware::classOfId(row.id) == type && row.name == property && fact != found.facts.all().end()) {
             return golden::text(fact->second);
         }
     }

@@ -112,24 +112,25 @@ std::string openDescriptors() {
     return all;
 }
 
-TEST(Apart, TextsComeBackAsTheyWereTold) {
+TEST(OtherProcess, TextsComeBackAsTheyWereTold) {
     const Told told{{"a", "1"}, {"b", ""}, {"c d", "e=f "}, {"long", std::string(3000, 'x')}};
-    EXPECT_EQ(hardware::ownDevices()->apart([&told] { return told; }), told);
-    EXPECT_THAT(hardware::ownDevices()->apart([] { return Told(); }), IsEmpty());
-    EXPECT_THAT(hardware::ownDevices()->apart([]() -> Told { throw std::runtime_error("no memory"); }),
-                IsEmpty());
-    EXPECT_THAT(hardware::ownDevices()->apart([]() -> Told { _exit(0); }), IsEmpty());
+    EXPECT_EQ(hardware::ownDevices()->inOtherProcess([&told] { return told; }), told);
+    EXPECT_THAT(hardware::ownDevices()->inOtherProcess([] { return Told(); }), IsEmpty());
+    EXPECT_THAT(
+        hardware::ownDevices()->inOtherProcess([]() -> Told { throw std::runtime_error("no memory"); }),
+        IsEmpty());
+    EXPECT_THAT(hardware::ownDevices()->inOtherProcess([]() -> Told { _exit(0); }), IsEmpty());
 }
 
-TEST(Apart, TheProcessIsNotOursAndKeepsNothingOpen) {
-    Told told = hardware::ownDevices()->apart([] {
+TEST(OtherProcess, TheProcessIsNotOursAndKeepsNothingOpen) {
+    Told told = hardware::ownDevices()->inOtherProcess([] {
         return Told{{"parent", std::to_string(getppid())}, {"open", openDescriptors()}};
     });
     EXPECT_NE(told["parent"], std::to_string(getpid()));
     EXPECT_EQ(told["open"], "pipe:");
 }
 
-TEST(Apart, HealthIsToldWhole) {
+TEST(OtherProcess, HealthIsToldWhole) {
     hardware::Health health;
     health.power = "idle";
     health.temperature = -3;

@@ -4,8 +4,8 @@ corvista_test(hardware LABELS threads SOURCES
   hardware/hosts_test.cpp
   hardware/memory_beside_dmidecode_test.cpp
   hardware/memory_test.cpp
+  hardware/deadline_runner_test.cpp
   hardware/page_test.cpp
-  hardware/patience_test.cpp
   hardware/processors_test.cpp
   hardware/recorded_beside_tools_test.cpp
   hardware/recorded_host.cpp

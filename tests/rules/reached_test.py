@@ -17,7 +17,7 @@ ROWS = [  # a changed file, programs that it reaches, programs that it does not
     ("agent/core/oshw/host.cpp", "agent agent_core one_truth golden", "network_queries storage mi framework hosttools shell hardware"),
     ("agent/shell/filters/cut.cpp", "shell shell_traps network_queries agent golden", "framework hosttools hardware hardware_links"),
     ("hosttools/route.cpp", "hosttools shell golden agent_kernel_tree", "framework hardware hardware_links"),
-    ("plugins/hardware/patience.cpp", "hardware hardware_storage hardware_links agent_plugins", "framework network_queries shell golden"),
+    ("plugins/hardware/deadline_runner.cpp", "hardware hardware_storage hardware_links agent_plugins", "framework network_queries shell golden"),
     ("plugins/hardware/CMakeLists.txt", "hardware hardware_links agent_plugins", "framework network_queries shell"),
     ("tests/agent/fake_plugin.cpp", "agent agent_core agent_hostile", "framework shell hardware"),
     ("tests/support/world.cpp", "mi storage agent shell golden support", "hardware_links"),

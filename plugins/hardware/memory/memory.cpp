@@ -18,18 +18,18 @@ enum : Id {
 };
 
 constexpr Row kRows[] = {
-    {kType, kTotal, "TotalMemory", Kind::number, "bytes", "MemTotal in /proc/meminfo",
+    {kTotal, "TotalMemory", Kind::number, "bytes", "MemTotal in /proc/meminfo",
      "memory that the kernel can use"},
-    {kType, kAvailable, "AvailableMemory", Kind::number, "bytes", "MemAvailable in /proc/meminfo",
-     "memory that programs can still have without swapping", Audience::everybody, true},
-    {kType, kSwapTotal, "TotalSwap", Kind::number, "bytes", "SwapTotal in /proc/meminfo",
-     "room for swapped memory", Audience::everybody, true},
-    {kType, kSwapFree, "FreeSwap", Kind::number, "bytes", "SwapFree in /proc/meminfo",
-     "room for swapped memory that is not used", Audience::everybody, true},
-    {kType, kCorrected, "CorrectedErrors", Kind::number, "", "/sys/devices/system/edac/mc/mc*/ce_count",
-     "memory errors that were corrected since the start", Audience::everybody, true},
-    {kType, kUncorrected, "UncorrectedErrors", Kind::number, "", "/sys/devices/system/edac/mc/mc*/ue_count",
-     "memory errors that could not be corrected since the start", Audience::everybody, true},
+    {kAvailable, "AvailableMemory", Kind::number, "bytes", "MemAvailable in /proc/meminfo",
+     "memory that programs can still have without swapping", kLive},
+    {kSwapTotal, "TotalSwap", Kind::number, "bytes", "SwapTotal in /proc/meminfo", "room for swapped memory",
+     kLive},
+    {kSwapFree, "FreeSwap", Kind::number, "bytes", "SwapFree in /proc/meminfo",
+     "room for swapped memory that is not used", kLive},
+    {kCorrected, "CorrectedErrors", Kind::number, "", "/sys/devices/system/edac/mc/mc*/ce_count",
+     "memory errors that were corrected since the start", kLive},
+    {kUncorrected, "UncorrectedErrors", Kind::number, "", "/sys/devices/system/edac/mc/mc*/ue_count",
+     "memory errors that could not be corrected since the start", kLive},
 };
 
 /// A row "Key:   123 kB", in bytes.

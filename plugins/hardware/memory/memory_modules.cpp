@@ -23,16 +23,15 @@ enum : Id {
 };
 
 constexpr Row kRows[] = {
-    {kType, kSlot, "Slot", Kind::text, "", "SMBIOS type 17, device locator", "where the module sits"},
-    {kType, kBank, "Bank", Kind::text, "", "SMBIOS type 17, bank locator", "the bank it belongs to"},
-    {kType, kSize, "Size", Kind::number, "bytes", "SMBIOS type 17, size", "how much it holds"},
-    {kType, kSort, "MemoryType", Kind::text, "", "SMBIOS type 17, memory type", "kind of memory"},
-    {kType, kSpeed, "Speed", Kind::number, "megatransfers per second",
-     "SMBIOS type 17, configured memory speed", "how fast it is run"},
-    {kType, kMaker, "Maker", Kind::text, "", "SMBIOS type 17, manufacturer", "who made it"},
-    {kType, kPartNumber, "PartNumber", Kind::text, "", "SMBIOS type 17, part number", "the maker's number"},
-    {kType, kSerial, "SerialNumber", Kind::text, "", "SMBIOS type 17, serial number", "its serial number",
-     Audience::trusted},
+    {kSlot, "Slot", Kind::text, "", "SMBIOS type 17, device locator", "where the module sits"},
+    {kBank, "Bank", Kind::text, "", "SMBIOS type 17, bank locator", "the bank it belongs to"},
+    {kSize, "Size", Kind::number, "bytes", "SMBIOS type 17, size", "how much it holds"},
+    {kSort, "MemoryType", Kind::text, "", "SMBIOS type 17, memory type", "kind of memory"},
+    {kSpeed, "Speed", Kind::number, "megatransfers per second", "SMBIOS type 17, configured memory speed",
+     "how fast it is run"},
+    {kMaker, "Maker", Kind::text, "", "SMBIOS type 17, manufacturer", "who made it"},
+    {kPartNumber, "PartNumber", Kind::text, "", "SMBIOS type 17, part number", "the maker's number"},
+    {kSerial, "SerialNumber", Kind::text, "", "SMBIOS type 17, serial number", "its serial number", kTrusted},
 };
 
 // By the codes of the standard (DSP0134), in its words; a null pointer for what says nothing.

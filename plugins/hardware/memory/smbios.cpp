@@ -5,6 +5,7 @@
 #include <string_view>
 #include <utility>
 
+#include "plugins/hardware/bytes.h"
 #include "plugins/hardware/host.h"
 
 namespace hardware {
@@ -37,10 +38,6 @@ constexpr std::array<std::string_view, 18> kNothing = {"Not Specified",
                                                        "Undefined",
                                                        "0000000000000000"};
 
-std::uint8_t byteAt(const std::string& bytes, std::size_t place) {
-    return static_cast<std::uint8_t>(bytes[place]);
-}
-
 /// Takes the texts behind a structure. @return where the next one begins; npos when they have no end
 std::size_t readTexts(const std::string& table, std::size_t at, std::vector<std::string>& texts) {
     if (table.compare(at, 2, std::string(2, '\0')) == 0) {
@@ -68,11 +65,7 @@ std::optional<std::uint32_t> SmbiosRecord::number(std::size_t offset, std::size_
     if (offset > fixed_.size() || size > fixed_.size() - offset) {
         return std::nullopt;
     }
-    std::uint32_t value = 0;
-    for (std::size_t place = size; place-- > 0;) {
-        value = value << 8U | byteAt(fixed_, offset + place);
-    }
-    return value;
+    return static_cast<std::uint32_t>(littleEndian(fixed_, offset, size));
 }
 
 std::optional<std::uint8_t> SmbiosRecord::byte(std::size_t offset) const {

@@ -43,53 +43,47 @@ enum : Id {
     kNeighbourPortDescriptions,
 };
 
-constexpr Row row(Id id, const char* name, Kind kind, const char* unit, const char* source,
-                  const char* meaning, bool live = false) {
-    return {kType, id, name, kind, unit, source, meaning, Audience::everybody, live};
-}
-
 constexpr Row kRows[] = {
-    row(kSort, "LinkKind", Kind::text, "",
-        "uevent, type and directories in /sys/class/net/LINK, else the driver",
-        "ethernet, wlan, bond, bridge, vlan, loopback and others"),
-    row(kIndex, "Index", Kind::number, "", "ifindex", "the kernel's number for it"),
-    row(kAddress, "HardwareAddress", Kind::text, "", "address", "the hardware address in use"),
-    row(kPermanentAddress, "PermanentAddress", Kind::text, "", "ETHTOOL_GPERMADDR",
-        "the hardware address it was made with"),
-    row(kMtu, "MTU", Kind::number, "bytes", "mtu", "longest packet"),
-    row(kState, "State", Kind::text, "", "operstate", "up, down, dormant, lowerlayerdown or unknown", true),
-    row(kCarrier, "Carrier", Kind::flag, "", "carrier", "whether there is a signal; not told while it is off",
-        true),
-    row(kSpeed, "Speed", Kind::number, "megabits per second", "speed", "speed of the link", true),
-    row(kDuplex, "Duplex", Kind::text, "", "duplex", "full or half", true),
-    row(kMaster, "Master", Kind::text, "", "master", "the bond, bridge or the like it belongs to", true),
-    row(kDriver, "Driver", Kind::text, "", "ETHTOOL_GDRVINFO, else device/driver", "the driver"),
-    row(kFirmware, "FirmwareVersion", Kind::text, "", "ETHTOOL_GDRVINFO", "version of its firmware"),
-    row(kBus, "BusAddress", Kind::text, "", "ETHTOOL_GDRVINFO, else device", "where the device sits"),
-    row(kQueues, "Queues", Kind::number, "", "queues", "queues that receive"),
-    row(kReceivedBytes, "ReceivedBytes", Kind::number, "bytes", "statistics/rx_bytes", "bytes received",
-        true),
-    row(kReceivedPackets, "ReceivedPackets", Kind::number, "", "statistics/rx_packets", "packets received",
-        true),
-    row(kReceiveErrors, "ReceiveErrors", Kind::number, "", "statistics/rx_errors", "packets received damaged",
-        true),
-    row(kReceiveDropped, "ReceiveDropped", Kind::number, "", "statistics/rx_dropped",
-        "packets received and thrown away", true),
-    row(kSentBytes, "SentBytes", Kind::number, "bytes", "statistics/tx_bytes", "bytes sent", true),
-    row(kSentPackets, "SentPackets", Kind::number, "", "statistics/tx_packets", "packets sent", true),
-    row(kSendErrors, "SendErrors", Kind::number, "", "statistics/tx_errors", "packets that could not be sent",
-        true),
-    row(kSendDropped, "SendDropped", Kind::number, "", "statistics/tx_dropped", "packets thrown away unsent",
-        true),
-    row(kCarrierChanges, "CarrierChanges", Kind::number, "", "carrier_changes",
-        "how often the signal came or went", true),
-    row(kNeighbours, "Neighbours", Kind::texts, "", "lldpd", "names of what is at the other end", true),
-    row(kNeighbourChassis, "NeighbourChassis", Kind::texts, "", "lldpd",
-        "numbers of what is at the other end, one for each neighbour", true),
-    row(kNeighbourPorts, "NeighbourPorts", Kind::texts, "", "lldpd",
-        "which of their ports the link leads to, one for each neighbour", true),
-    row(kNeighbourPortDescriptions, "NeighbourPortDescriptions", Kind::texts, "", "lldpd",
-        "what those ports are called, one for each neighbour", true),
+    {kSort, "LinkKind", Kind::text, "",
+     "uevent, type and directories in /sys/class/net/LINK, else the driver",
+     "ethernet, wlan, bond, bridge, vlan, loopback and others"},
+    {kIndex, "Index", Kind::number, "", "ifindex", "the kernel's number for it"},
+    {kAddress, "HardwareAddress", Kind::text, "", "address", "the hardware address in use"},
+    {kPermanentAddress, "PermanentAddress", Kind::text, "", "ETHTOOL_GPERMADDR",
+     "the hardware address it was made with"},
+    {kMtu, "MTU", Kind::number, "bytes", "mtu", "longest packet"},
+    {kState, "State", Kind::text, "", "operstate", "up, down, dormant, lowerlayerdown or unknown", kLive},
+    {kCarrier, "Carrier", Kind::flag, "", "carrier", "whether there is a signal; not told while it is off",
+     kLive},
+    {kSpeed, "Speed", Kind::number, "megabits per second", "speed", "speed of the link", kLive},
+    {kDuplex, "Duplex", Kind::text, "", "duplex", "full or half", kLive},
+    {kMaster, "Master", Kind::text, "", "master", "the bond, bridge or the like it belongs to", kLive},
+    {kDriver, "Driver", Kind::text, "", "ETHTOOL_GDRVINFO, else device/driver", "the driver"},
+    {kFirmware, "FirmwareVersion", Kind::text, "", "ETHTOOL_GDRVINFO", "version of its firmware"},
+    {kBus, "BusAddress", Kind::text, "", "ETHTOOL_GDRVINFO, else device", "where the device sits"},
+    {kQueues, "Queues", Kind::number, "", "queues", "queues that receive"},
+    {kReceivedBytes, "ReceivedBytes", Kind::number, "bytes", "statistics/rx_bytes", "bytes received", kLive},
+    {kReceivedPackets, "ReceivedPackets", Kind::number, "", "statistics/rx_packets", "packets received",
+     kLive},
+    {kReceiveErrors, "ReceiveErrors", Kind::number, "", "statistics/rx_errors", "packets received damaged",
+     kLive},
+    {kReceiveDropped, "ReceiveDropped", Kind::number, "", "statistics/rx_dropped",
+     "packets received and thrown away", kLive},
+    {kSentBytes, "SentBytes", Kind::number, "bytes", "statistics/tx_bytes", "bytes sent", kLive},
+    {kSentPackets, "SentPackets", Kind::number, "", "statistics/tx_packets", "packets sent", kLive},
+    {kSendErrors, "SendErrors", Kind::number, "", "statistics/tx_errors", "packets that could not be sent",
+     kLive},
+    {kSendDropped, "SendDropped", Kind::number, "", "statistics/tx_dropped", "packets thrown away unsent",
+     kLive},
+    {kCarrierChanges, "CarrierChanges", Kind::number, "", "carrier_changes",
+     "how often the signal came or went", kLive},
+    {kNeighbours, "Neighbours", Kind::texts, "", "lldpd", "names of what is at the other end", kLive},
+    {kNeighbourChassis, "NeighbourChassis", Kind::texts, "", "lldpd",
+     "numbers of what is at the other end, one for each neighbour", kLive},
+    {kNeighbourPorts, "NeighbourPorts", Kind::texts, "", "lldpd",
+     "which of their ports the link leads to, one for each neighbour", kLive},
+    {kNeighbourPortDescriptions, "NeighbourPortDescriptions", Kind::texts, "", "lldpd",
+     "what those ports are called, one for each neighbour", kLive},
 };
 
 struct Counter {
@@ -213,9 +207,9 @@ void describeLink(const Host& host, Found& found) {
     facts.number(kSpeed, speedOf(host, link));
     facts.text(kDuplex, duplexOf(host, link));
     facts.text(kMaster, host.target(link + "/master"));
-    facts.text(kDriver, driver.name ? driver.name : host.target(link + "/device/driver"));
+    facts.text(kDriver, firstTold({driver.name, host.target(link + "/device/driver")}));
     facts.text(kFirmware, driver.firmware);
-    facts.text(kBus, driver.bus ? driver.bus : host.target(link + "/device"));
+    facts.text(kBus, firstTold({driver.bus, host.target(link + "/device")}));
     facts.number(kQueues, receiveQueues(host, link));
     for (const Counter& counter : kCounters) {
         facts.number(counter.id, host.number(link + "/" + counter.file));

@@ -29,28 +29,27 @@ enum : Id {
 };
 
 constexpr Row kRows[] = {
-    {kType, kMaker, "Maker", Kind::text, "", "vendor_id or CPU implementer in /proc/cpuinfo", "who made it"},
-    {kType, kModel, "Model", Kind::text, "", "model name or CPU part in /proc/cpuinfo", "the model's name"},
-    {kType, kCores, "Cores", Kind::number, "",
+    {kMaker, "Maker", Kind::text, "", "vendor_id or CPU implementer in /proc/cpuinfo", "who made it"},
+    {kModel, "Model", Kind::text, "", "model name or CPU part in /proc/cpuinfo", "the model's name"},
+    {kCores, "Cores", Kind::number, "",
      "topology/core_cpus_list of each processor in /sys/devices/system/cpu", "cores that are in use"},
-    {kType, kThreads, "Threads", Kind::number, "", "processors of the package in /sys/devices/system/cpu",
+    {kThreads, "Threads", Kind::number, "", "processors of the package in /sys/devices/system/cpu",
      "processors that the kernel schedules on"},
-    {kType, kLevel1Data, "Level1DataCache", Kind::number, "bytes", "cache/index* in /sys/devices/system/cpu",
+    {kLevel1Data, "Level1DataCache", Kind::number, "bytes", "cache/index* in /sys/devices/system/cpu",
      "all first-level data caches together"},
-    {kType, kLevel1Instructions, "Level1InstructionCache", Kind::number, "bytes",
+    {kLevel1Instructions, "Level1InstructionCache", Kind::number, "bytes",
      "cache/index* in /sys/devices/system/cpu", "all first-level instruction caches together"},
-    {kType, kLevel2, "Level2Cache", Kind::number, "bytes", "cache/index* in /sys/devices/system/cpu",
+    {kLevel2, "Level2Cache", Kind::number, "bytes", "cache/index* in /sys/devices/system/cpu",
      "all second-level caches together"},
-    {kType, kLevel3, "Level3Cache", Kind::number, "bytes", "cache/index* in /sys/devices/system/cpu",
+    {kLevel3, "Level3Cache", Kind::number, "bytes", "cache/index* in /sys/devices/system/cpu",
      "all third-level caches together"},
-    {kType, kFrequency, "Frequency", Kind::number, "kilohertz",
+    {kFrequency, "Frequency", Kind::number, "kilohertz",
      "cpufreq/scaling_cur_freq, else cpu MHz in /proc/cpuinfo", "how fast its first processor runs now",
-     Audience::everybody, true},
-    {kType, kTopFrequency, "TopFrequency", Kind::number, "kilohertz", "cpufreq/cpuinfo_max_freq",
+     kLive},
+    {kTopFrequency, "TopFrequency", Kind::number, "kilohertz", "cpufreq/cpuinfo_max_freq",
      "how fast it can run"},
-    {kType, kMicrocode, "Microcode", Kind::text, "", "microcode in /proc/cpuinfo",
-     "version of its microcode"},
-    {kType, kWeaknesses, "Weaknesses", Kind::texts, "", "/sys/devices/system/cpu/vulnerabilities",
+    {kMicrocode, "Microcode", Kind::text, "", "microcode in /proc/cpuinfo", "version of its microcode"},
+    {kWeaknesses, "Weaknesses", Kind::texts, "", "/sys/devices/system/cpu/vulnerabilities",
      "known weaknesses that it has, and what the kernel does about them"},
 };
 
@@ -59,16 +58,14 @@ std::string placeOf(const std::string& processor, const char* file) {
     return kAll + "cpu" + processor + file;
 }
 
-using Fields = std::map<std::string, std::string>;
-
 /// The sections of these processors in /proc/cpuinfo, one after the other; where there are none, what stands
 /// for all.
-std::vector<Fields> sectionsOf(const Host& host, const std::vector<std::string>& processors) {
+std::vector<TextMap> sectionsOf(const Host& host, const std::vector<std::string>& processors) {
     static const std::set<std::string> kWanted = {"processor", "vendor_id",       "model name", "cpu MHz",
                                                   "microcode", "CPU implementer", "CPU part",   "cpu"};
     const std::set<std::string> asked(processors.begin(), processors.end());
-    std::vector<Fields> sections;
-    Fields fields;
+    std::vector<TextMap> sections;
+    TextMap fields;
     const auto keep = [&] {
         if (fields.contains("processor") && asked.contains(fields["processor"])) {
             sections.push_back(fields);
@@ -88,11 +85,6 @@ std::vector<Fields> sectionsOf(const Host& host, const std::vector<std::string>&
     }
     keep();
     return sections.empty() ? std::vector{fields} : sections;
-}
-
-std::optional<std::string> field(const Fields& fields, const std::string& key) {
-    const auto found = fields.find(key);
-    return found == fields.end() ? std::nullopt : std::optional(found->second);
 }
 
 /// The package of a processor that is in use; nothing for others. Where the kernel knows no packages, there
@@ -199,20 +191,20 @@ constexpr std::array<std::pair<const char*, const char*>, 10> kImplementers = {{
                                                                                 {"0x61", "Apple"},
                                                                                 {"0xc0", "Ampere"}}};
 
-std::optional<std::string> modelOf(const Fields& fields) {
+std::optional<std::string> modelOf(const TextMap& fields) {
     for (const Part& part : kParts) {
-        if (field(fields, "CPU implementer") == part.implementer && field(fields, "CPU part") == part.part) {
+        if (textOf(fields, "CPU implementer") == part.implementer &&
+            textOf(fields, "CPU part") == part.part) {
             return part.name;
         }
     }
-    const auto name = field(fields, "model name");
-    return name ? name : field(fields, "cpu");  // PowerPC
+    return firstTold({textOf(fields, "model name"), textOf(fields, "cpu")});  // the latter on PowerPC
 }
 
 /// The model; a processor with cores of several kinds is named after all of them.
-std::string modelsOf(const std::vector<Fields>& sections) {
+std::string modelsOf(const std::vector<TextMap>& sections) {
     std::vector<std::string> models;
-    for (const Fields& fields : sections) {
+    for (const TextMap& fields : sections) {
         const std::optional<std::string> model = modelOf(fields);
         if (model && std::find(models.begin(), models.end(), *model) == models.end()) {
             models.push_back(*model);
@@ -225,14 +217,14 @@ std::string modelsOf(const std::vector<Fields>& sections) {
     return text;
 }
 
-std::optional<std::string> makerOf(const Fields& fields) {
-    const auto implementer = field(fields, "CPU implementer");
+std::optional<std::string> makerOf(const TextMap& fields) {
+    const auto implementer = textOf(fields, "CPU implementer");
     const auto known = std::find_if(kImplementers.begin(), kImplementers.end(),
                                     [&](const auto& one) { return implementer == one.first; });
     if (known != kImplementers.end()) {
         return known->second;
     }
-    return implementer ? implementer : field(fields, "vendor_id");
+    return firstTold({implementer, textOf(fields, "vendor_id")});
 }
 
 /// The fastest of them, in kilohertz.
@@ -277,8 +269,8 @@ void describeProcessor(const Host& host, Found& found) {
     if (processors.empty()) {
         return;
     }
-    const std::vector<Fields> sections = sectionsOf(host, processors);
-    const Fields& first = sections.front();
+    const std::vector<TextMap> sections = sectionsOf(host, processors);
+    const TextMap& first = sections.front();
     const std::vector<std::string> cores = coresOf(host, processors);
     Facts& facts = found.facts;
     facts.text(kMaker, makerOf(first));
@@ -289,9 +281,9 @@ void describeProcessor(const Host& host, Found& found) {
         facts.number(property, size);
     }
     const auto scaled = host.number(placeOf(processors.front(), "/cpufreq/scaling_cur_freq"));
-    facts.number(kFrequency, scaled ? scaled : kilohertz(field(first, "cpu MHz")));
+    facts.number(kFrequency, scaled ? scaled : kilohertz(textOf(first, "cpu MHz")));
     facts.number(kTopFrequency, topFrequency(host, cores));
-    facts.text(kMicrocode, field(first, "microcode"));
+    facts.text(kMicrocode, textOf(first, "microcode"));
     facts.texts(kWeaknesses, weaknesses(host));
 }
 

@@ -109,8 +109,7 @@ std::string placeOf(const Host& host, const std::string& directory) {
         way += "/device";
         const std::optional<std::string> device = host.resolved(way);
         const std::string name = host.target(way + "/subsystem").value_or("");
-        const auto bus =
-            std::find_if(kBuses.begin(), kBuses.end(), [&name](const Bus& one) { return one.name == name; });
+        const auto* const bus = std::ranges::find(kBuses, name, &Bus::name);
         if (device && bus != kBuses.end()) {
             return bus->place(device->substr(device->rfind('/') + 1));
         }
@@ -147,8 +146,7 @@ std::vector<Chip> chips(const Host& host) {
 
 std::optional<Chip> findChip(const Host& host, const std::string& name) {
     const std::vector<Chip> all = chipsNamedLike(host, name);
-    const auto found =
-        std::find_if(all.begin(), all.end(), [&](const Chip& chip) { return chip.name == name; });
+    const auto found = std::ranges::find(all, name, &Chip::name);
     return found == all.end() ? std::nullopt : std::optional(*found);
 }
 

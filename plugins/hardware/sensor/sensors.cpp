@@ -33,32 +33,28 @@ enum : Id {
     kEmergency,
 };
 
-constexpr Row row(Id id, const char* name, Kind kind, const char* unit, const char* source,
-                  const char* meaning, bool live = true) {
-    return {kType, id, name, kind, unit, source, meaning, Audience::everybody, live};
-}
-
 constexpr Row kRows[] = {
-    row(kChip, "Chip", Kind::text, "", "name in /sys/class/hwmon/hwmon*", "the chip and where it sits",
-        false),
-    row(kLabel, "Label", Kind::text, "", "*_label", "what is measured", false),
-    row(kTemperature, "Temperature", Kind::number, "degrees Celsius", "temp*_input", "the temperature now"),
-    row(kFan, "FanSpeed", Kind::number, "revolutions per minute", "fan*_input", "how fast the fan turns now"),
-    row(kVoltage, "Voltage", Kind::number, "volts", "in*_input", "the voltage now"),
-    row(kCurrent, "Current", Kind::number, "amperes", "curr*_input", "the current now"),
-    row(kPower, "Power", Kind::number, "watts", "power*_input or power*_average", "the power drawn now"),
-    row(kEnergy, "Energy", Kind::number, "joules", "energy*_input", "the energy used so far"),
-    row(kHumidity, "Humidity", Kind::number, "percent", "humidity*_input", "the relative humidity now"),
-    row(kLow, "LowLimit", Kind::number, "as the value", "*_min", "what is too low"),
-    row(kHigh, "HighLimit", Kind::number, "as the value", "*_max", "what is too high"),
-    row(kCritical, "CriticalLimit", Kind::number, "as the value", "*_crit", "what does harm"),
-    row(kAlarm, "Alarm", Kind::flag, "", "*_alarm, *_min_alarm, *_max_alarm, *_crit_alarm and others",
-        "whether the chip gives an alarm"),
-    row(kFault, "Fault", Kind::flag, "", "*_fault", "whether the sensor is broken; it then has no value"),
-    row(kLowCritical, "LowCriticalLimit", Kind::number, "as the value", "*_lcrit",
-        "what does harm by being too low"),
-    row(kEmergency, "EmergencyLimit", Kind::number, "as the value", "*_emergency",
-        "beyond the critical limit: what stops the chip"),
+    {kChip, "Chip", Kind::text, "", "name in /sys/class/hwmon/hwmon*", "the chip and where it sits"},
+    {kLabel, "Label", Kind::text, "", "*_label", "what is measured"},
+    {kTemperature, "Temperature", Kind::number, "degrees Celsius", "temp*_input", "the temperature now",
+     kLive},
+    {kFan, "FanSpeed", Kind::number, "revolutions per minute", "fan*_input", "how fast the fan turns now",
+     kLive},
+    {kVoltage, "Voltage", Kind::number, "volts", "in*_input", "the voltage now", kLive},
+    {kCurrent, "Current", Kind::number, "amperes", "curr*_input", "the current now", kLive},
+    {kPower, "Power", Kind::number, "watts", "power*_input or power*_average", "the power drawn now", kLive},
+    {kEnergy, "Energy", Kind::number, "joules", "energy*_input", "the energy used so far", kLive},
+    {kHumidity, "Humidity", Kind::number, "percent", "humidity*_input", "the relative humidity now", kLive},
+    {kLow, "LowLimit", Kind::number, "as the value", "*_min", "what is too low", kLive},
+    {kHigh, "HighLimit", Kind::number, "as the value", "*_max", "what is too high", kLive},
+    {kCritical, "CriticalLimit", Kind::number, "as the value", "*_crit", "what does harm", kLive},
+    {kAlarm, "Alarm", Kind::flag, "", "*_alarm, *_min_alarm, *_max_alarm, *_crit_alarm and others",
+     "whether the chip gives an alarm", kLive},
+    {kFault, "Fault", Kind::flag, "", "*_fault", "whether the sensor is broken; it then has no value", kLive},
+    {kLowCritical, "LowCriticalLimit", Kind::number, "as the value", "*_lcrit",
+     "what does harm by being too low", kLive},
+    {kEmergency, "EmergencyLimit", Kind::number, "as the value", "*_emergency",
+     "beyond the critical limit: what stops the chip", kLive},
 };
 
 struct Sort {

@@ -10,7 +10,7 @@
 #include <string>
 #include <utility>
 
-#include "plugins/hardware/patience.h"
+#include "plugins/hardware/deadline_runner.h"
 
 namespace hardware {
 
@@ -20,10 +20,10 @@ template <class Answer>
 class Answers {
 public:
     struct Times {
-        std::chrono::milliseconds patience;
+        std::chrono::milliseconds limit;  ///< how long an answer is waited for
         std::chrono::milliseconds kept;
     };
-    explicit Answers(Times times) : times_(times), patience_(times.patience) {}
+    explicit Answers(Times times) : times_(times), runner_(times.limit) {}
 
     /// @param question owns all that it uses: it may return long after its caller has gone
     /// @return nothing when the device has not answered
@@ -32,7 +32,7 @@ public:
         if (isDue(device)) {
             lock.unlock();
             const bool answered =
-                patience_.run(device, [state = state_, device, question = std::move(question)] {
+                runner_.run(device, [state = state_, device, question = std::move(question)] {
                     Answer answer = question();
                     const std::lock_guard inner(state->guard);
                     state->known[device] = {std::move(answer), Clock::now()};
@@ -42,7 +42,7 @@ public:
             known = {std::move(known.answer), Clock::now(), !answered};
             state_->answered.notify_all();
         } else {
-            state_->answered.wait_for(lock, times_.patience, [&] {
+            state_->answered.wait_for(lock, times_.limit, [&] {
                 const Known& known = state_->known[device];
                 return (known.answer && !known.isOld) || !known.beingAsked;
             });
@@ -91,7 +91,7 @@ private:
 
     const Times times_;
     const std::shared_ptr<State> state_ = std::make_shared<State>();
-    Patience patience_;
+    DeadlineRunner runner_;
 };
 
 }  // namespace hardware

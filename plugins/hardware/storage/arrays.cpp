@@ -19,22 +19,18 @@ enum : Id {
     kMismatches,
 };
 
-constexpr Row row(Id id, const char* name, Kind kind, const char* unit, const char* source,
-                  const char* meaning, bool live = true) {
-    return {kType, id, name, kind, unit, source, meaning, Audience::everybody, live};
-}
-
 constexpr Row kRows[] = {
-    row(kLevel, "Level", Kind::text, "", "md/level", "how the members work together", false),
-    row(kState, "State", Kind::text, "", "md/array_state", "clean, active, readonly and others"),
-    row(kSize, "Size", Kind::number, "bytes", "size", "how much it holds", false),
-    row(kDisks, "Disks", Kind::number, "", "md/raid_disks", "members that a whole array has", false),
-    row(kDegraded, "Missing", Kind::number, "", "md/degraded", "members that are missing or failed"),
-    row(kMembers, "Members", Kind::texts, "", "md/dev-*/state", "each member with its state"),
-    row(kAction, "Action", Kind::text, "", "md/sync_action", "idle, resync, recover, check or repair"),
-    row(kProgress, "Progress", Kind::text, "sectors", "md/sync_completed", "how far it has got: done / all"),
-    row(kMismatches, "Mismatches", Kind::number, "sectors", "md/mismatch_cnt",
-        "what the last check found to differ"),
+    {kLevel, "Level", Kind::text, "", "md/level", "how the members work together"},
+    {kState, "State", Kind::text, "", "md/array_state", "clean, active, readonly and others", kLive},
+    {kSize, "Size", Kind::number, "bytes", "size", "how much it holds"},
+    {kDisks, "Disks", Kind::number, "", "md/raid_disks", "members that a whole array has"},
+    {kDegraded, "Missing", Kind::number, "", "md/degraded", "members that are missing or failed", kLive},
+    {kMembers, "Members", Kind::texts, "", "md/dev-*/state", "each member with its state", kLive},
+    {kAction, "Action", Kind::text, "", "md/sync_action", "idle, resync, recover, check or repair", kLive},
+    {kProgress, "Progress", Kind::text, "sectors", "md/sync_completed", "how far it has got: done / all",
+     kLive},
+    {kMismatches, "Mismatches", Kind::number, "sectors", "md/mismatch_cnt",
+     "what the last check found to differ", kLive},
 };
 
 std::vector<std::string> members(const Host& host, const std::string& directory) {

@@ -106,8 +106,8 @@ bool hasUdev(const Host& host) {
     return host.exists("/run/udev/data");
 }
 
-UdevFacts udevFacts(const Host& host, const std::string& name) {
-    UdevFacts facts;
+TextMap udevFacts(const Host& host, const std::string& name) {
+    TextMap facts;
     const auto device = number(host, name);
     if (!device) {
         return facts;
@@ -119,11 +119,6 @@ UdevFacts udevFacts(const Host& host, const std::string& name) {
         }
     }
     return facts;
-}
-
-std::optional<std::string> fact(const UdevFacts& facts, const std::string& key) {
-    const auto found = facts.find(key);
-    return found == facts.end() || found->second.empty() ? std::nullopt : std::optional(found->second);
 }
 
 void count(const Host& host, const std::string& name, const Counters& ids, Facts& facts) {

@@ -1,6 +1,5 @@
 #pragma once
 
-#include <map>
 #include <optional>
 #include <string>
 #include <utility>
@@ -44,10 +43,8 @@ std::vector<std::string> slaves(const Host& host, const std::string& name);
 
 /// What udev has found out about it (/run/udev/data): ID_FS_TYPE and the like, without the device being
 /// opened here. Empty where no udev runs.
-using UdevFacts = std::map<std::string, std::string>;
 bool hasUdev(const Host& host);
-UdevFacts udevFacts(const Host& host, const std::string& name);
-std::optional<std::string> fact(const UdevFacts& facts, const std::string& key);
+TextMap udevFacts(const Host& host, const std::string& name);
 
 /// Reads, writes and errors so far, as rows of the class.
 struct Counters {

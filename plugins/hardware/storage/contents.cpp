@@ -23,19 +23,17 @@ bool mayBeRead(const Host& host, const std::string& name, bool mounted) {
 
 DeviceContents contentsOf(const Host& host, const std::string& name, bool mounted) {
     if (block::hasUdev(host)) {
-        const block::UdevFacts udev = block::udevFacts(host, name);
-        const auto type = block::fact(udev, "ID_FS_TYPE");
-        const auto label = block::fact(udev, "ID_FS_LABEL_ENC");
-        return {type, label ? label : block::fact(udev, "ID_FS_LABEL"), block::fact(udev, "ID_FS_UUID"),
-                isFileSystem(type, block::fact(udev, "ID_FS_USAGE"))};
+        const TextMap udev = block::udevFacts(host, name);
+        const auto type = textOf(udev, "ID_FS_TYPE");
+        const auto label = firstTold({textOf(udev, "ID_FS_LABEL_ENC"), textOf(udev, "ID_FS_LABEL")});
+        return {type, label, textOf(udev, "ID_FS_UUID"), isFileSystem(type, textOf(udev, "ID_FS_USAGE"))};
     }
     if (host.devices() == nullptr || !mayBeRead(host, name, mounted)) {
         return {};
     }
     const DeviceAccess::Contents read = host.devices()->contents(block::fileOf(host, name));
-    const auto type = block::fact(read, "TYPE");
-    return {type, block::fact(read, "LABEL"), block::fact(read, "UUID"),
-            isFileSystem(type, block::fact(read, "USAGE"))};
+    const auto type = textOf(read, "TYPE");
+    return {type, textOf(read, "LABEL"), textOf(read, "UUID"), isFileSystem(type, textOf(read, "USAGE"))};
 }
 
 }  // namespace hardware

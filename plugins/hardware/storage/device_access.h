@@ -2,12 +2,12 @@
 
 #include <cstdint>
 #include <functional>
-#include <map>
 #include <memory>
 #include <optional>
 #include <string>
 #include <vector>
 
+#include "plugins/hardware/host.h"
 #include "plugins/hardware/network/neighbours.h"
 
 namespace hardware {
@@ -39,16 +39,16 @@ struct Room {
 /// interface, so that tests can stand in for devices. Any thread.
 class DeviceAccess {
 public:
-    using Contents = std::map<std::string, std::string>;
+    using Contents = TextMap;
     /// Texts by their names; neither holds a line break, no name a '='.
-    using Told = std::map<std::string, std::string>;
+    using Told = TextMap;
 
     virtual ~DeviceAccess() = default;
 
     /// Does work that asks a device. Who waits for a drive cannot be ended by anybody, so where that can be,
     /// the work is done by another process: this one could not end before it.
     /// @return what the work told; empty when it could not be done
-    virtual Told apart(const std::function<Told()>& work) const { return work(); }
+    virtual Told inOtherProcess(const std::function<Told()>& work) const { return work(); }
 
     /// A log page of an NVMe controller, for the controller as a whole.
     /// @return nothing when it has none or may not be asked

@@ -59,12 +59,12 @@ DeviceAccess::Told toldOf(const Health& health) {
 
 Health healthFrom(const DeviceAccess::Told& told) {
     Health health;
-    health.power = block::fact(told, kPower);
-    if (const auto degrees = block::fact(told, kTemperature)) {
+    health.power = textOf(told, kPower);
+    if (const auto degrees = textOf(told, kTemperature)) {
         health.temperature = asSigned(*degrees);
     }
     for (const Count& count : kCounts) {
-        const auto value = block::fact(told, count.name);
+        const auto value = textOf(told, count.name);
         health.*count.value = value ? asNumber(*value) : std::nullopt;
     }
     for (const auto& [name, text] : told) {
@@ -77,14 +77,14 @@ Health healthFrom(const DeviceAccess::Told& told) {
 
 Devices::Devices(std::shared_ptr<const DeviceAccess> access, const Times& times)
     : access_(std::move(access)),
-      health_({times.patience, times.health}),
-      room_({times.patience, times.room}),
-      contents_({times.patience, times.contents}),
-      neighbours_({times.patience, times.neighbours}) {}
+      health_({times.limit, times.health}),
+      room_({times.limit, times.room}),
+      contents_({times.limit, times.contents}),
+      neighbours_({times.limit, times.neighbours}) {}
 
 std::optional<Health> Devices::health(const HealthSource& source) {
     return health_.of(source.file.path + " " + source.file.sequence, [access = access_, source] {
-        return healthFrom(access->apart([&] { return toldOf(askHealth(*access, source)); }));
+        return healthFrom(access->inOtherProcess([&] { return toldOf(askHealth(*access, source)); }));
     });
 }
 

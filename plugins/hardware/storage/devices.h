@@ -9,14 +9,14 @@
 
 namespace hardware {
 
-/// What only the devices know, asked with patience and kept for a while. Any thread.
+/// What only the devices know, asked with a deadline and kept for a while. Any thread.
 class Devices {
 public:
     /// How long a device is waited for: shorter than what a source may take, so that a device that hangs
     /// costs what only it knows and not what the kernel knows of it. A minute is soon enough for
     /// temperatures; the room of a file system changes faster.
     struct Times {
-        std::chrono::milliseconds patience{700};
+        std::chrono::milliseconds limit{700};
         std::chrono::milliseconds health{60'000};
         std::chrono::milliseconds room{400};
         std::chrono::milliseconds contents{60'000};

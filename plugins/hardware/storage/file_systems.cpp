@@ -24,17 +24,14 @@ enum : Id {
 };
 
 constexpr Row kRows[] = {
-    {kType, kSort, "FileSystemType", Kind::text, "", "/proc/1/mountinfo, else ID_FS_TYPE of udev or libblkid",
+    {kSort, "FileSystemType", Kind::text, "", "/proc/1/mountinfo, else ID_FS_TYPE of udev or libblkid",
      "ext4, xfs, swap and others"},
-    {kType, kLabel, "Label", Kind::text, "", "ID_FS_LABEL_ENC of udev, else libblkid", "its label"},
-    {kType, kUuid, "UUID", Kind::text, "", "ID_FS_UUID of udev, else libblkid",
-     "the number that no other file system has", Audience::trusted},
-    {kType, kMountPoints, "MountPoints", Kind::texts, "", "/proc/1/mountinfo", "where it is mounted",
-     Audience::everybody, true},
-    {kType, kSize, "Size", Kind::number, "bytes", "statvfs", "how much it holds; told while it is mounted",
-     Audience::everybody, true},
-    {kType, kFree, "Free", Kind::number, "bytes", "statvfs", "what users can still put there",
-     Audience::everybody, true},
+    {kLabel, "Label", Kind::text, "", "ID_FS_LABEL_ENC of udev, else libblkid", "its label"},
+    {kUuid, "UUID", Kind::text, "", "ID_FS_UUID of udev, else libblkid",
+     "the number that no other file system has", kTrusted},
+    {kMountPoints, "MountPoints", Kind::texts, "", "/proc/1/mountinfo", "where it is mounted", kLive},
+    {kSize, "Size", Kind::number, "bytes", "statvfs", "how much it holds; told while it is mounted", kLive},
+    {kFree, "Free", Kind::number, "bytes", "statvfs", "what users can still put there", kLive},
 };
 
 /// File systems on several devices have numbers of their own and name one of the devices. What others write

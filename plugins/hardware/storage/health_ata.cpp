@@ -1,7 +1,7 @@
 #include <map>
 #include <optional>
 
-#include "plugins/hardware/storage/bytes.h"
+#include "plugins/hardware/bytes.h"
 #include "plugins/hardware/storage/health.h"
 
 // ATA commands travel in ATA PASS-THROUGH (16) of SCSI (SAT). The layouts are those of ACS-3.

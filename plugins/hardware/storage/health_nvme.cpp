@@ -1,6 +1,6 @@
 #include <array>
 
-#include "plugins/hardware/storage/bytes.h"
+#include "plugins/hardware/bytes.h"
 #include "plugins/hardware/storage/health.h"
 
 namespace hardware {

@@ -1,4 +1,4 @@
-#include "plugins/hardware/storage/bytes.h"
+#include "plugins/hardware/bytes.h"
 #include "plugins/hardware/storage/health.h"
 
 // The layouts are those of SPC-4 and SBC-3.
@@ -8,22 +8,23 @@ namespace {
 
 constexpr std::size_t kAnswer = 252;
 
-enum Page : std::uint8_t {
-    kSupported = 0x00,
-    kTemperature = 0x0d,
-    kSolidState = 0x11,
-    kBackgroundScan = 0x15,
-    kInformationalExceptions = 0x2f,
+enum class Page : std::uint8_t {
+    supported = 0x00,
+    temperature = 0x0d,
+    solidState = 0x11,
+    backgroundScan = 0x15,
+    informationalExceptions = 0x2f,
 };
 
 /// The parameters of a log page; empty when the drive does not have it.
 std::string logPage(const DeviceAccess& access, const DeviceFile& drive, Page page) {
     constexpr std::uint8_t kCurrentValues = 0x40;
     constexpr std::size_t kHead = 4;
+    const auto code = static_cast<std::uint8_t>(page);
     const auto answer = access.scsi(
-        drive, {0x4d, 0, static_cast<std::uint8_t>(kCurrentValues | page), 0, 0, 0, 0, 0, kAnswer, 0},
+        drive, {0x4d, 0, static_cast<std::uint8_t>(kCurrentValues | code), 0, 0, 0, 0, 0, kAnswer, 0},
         kAnswer);
-    if (!answer || answer->data.size() < kHead || (byteAt(answer->data, 0) & 0x3fU) != page) {
+    if (!answer || answer->data.size() < kHead || (byteAt(answer->data, 0) & 0x3fU) != code) {
         return "";
     }
     return answer->data.substr(kHead, bigEndian(answer->data, 2, 2));
@@ -78,18 +79,18 @@ Health askScsi(const DeviceAccess& access, const DeviceFile& drive) {
     if (health.power != "active") {
         return health;
     }
-    const std::string pages = logPage(access, drive, kSupported);
+    const std::string pages = logPage(access, drive, Page::supported);
     const auto page = [&](Page wanted) {
         const bool has = pages.find(static_cast<char>(wanted)) != std::string::npos;
         return has ? logPage(access, drive, wanted) : "";
     };
-    addException(parameter(page(kInformationalExceptions), 0), health);
-    setTemperature(byteAt(parameter(page(kTemperature), 0), 1), health);
-    const std::string worn = parameter(page(kSolidState), 1);
+    addException(parameter(page(Page::informationalExceptions), 0), health);
+    setTemperature(byteAt(parameter(page(Page::temperature), 0), 1), health);
+    const std::string worn = parameter(page(Page::solidState), 1);
     if (worn.size() >= 4) {
         health.worn = byteAt(worn, 3);
     }
-    const std::string scan = parameter(page(kBackgroundScan), 0);
+    const std::string scan = parameter(page(Page::backgroundScan), 0);
     if (scan.size() >= 4) {
         health.hours = bigEndian(scan, 0, 4) / 60;
     }

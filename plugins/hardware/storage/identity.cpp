@@ -5,8 +5,8 @@
 #include <string_view>
 #include <utility>
 
+#include "plugins/hardware/bytes.h"
 #include "plugins/hardware/storage/block.h"
-#include "plugins/hardware/storage/bytes.h"
 
 namespace hardware {
 
@@ -24,25 +24,11 @@ Text firstLine(const Host& host, const std::string& directory, std::initializer_
     return std::nullopt;
 }
 
-Text firstOf(std::initializer_list<Text> texts) {
-    for (const Text& text : texts) {
-        if (text) {
-            return text;
-        }
-    }
-    return std::nullopt;
-}
-
-Text told(const std::string& text) {
-    std::string plain = printable(trimmed(text));
-    return plain.empty() ? std::nullopt : Text(std::move(plain));
-}
-
 /// The serial number behind the four bytes of its head, which tell how long it is.
 Text serialPage(const Host& host, const std::string& device) {
     constexpr std::size_t kHead = 4;
     const std::string page = host.text(device + "/vpd_pg80").value_or("");
-    return page.size() > kHead ? told(page.substr(kHead, bigEndian(page, 2, 2))) : std::nullopt;
+    return page.size() > kHead ? Text(trimmed(page.substr(kHead, bigEndian(page, 2, 2)))) : std::nullopt;
 }
 
 /// A text in what an ATA drive tells of itself: two letters change places in each of its words. What SCSI
@@ -55,7 +41,7 @@ Text ataText(const Host& host, const std::string& device, std::size_t word, std:
     for (std::size_t at = 0; at + 1 < text.size(); at += 2) {
         std::swap(text[at], text[at + 1]);
     }
-    return told(text);
+    return trimmed(text);
 }
 
 /// Numbers of a vendor (PCI's) are no names, nor is the word for all of ATA.
@@ -113,17 +99,17 @@ std::optional<std::string> transportOf(const Host& host, const std::string& name
 DriveIdentity identify(const Host& host, const std::string& name) {
     const std::string directory = block::directory(name);
     const std::string device = directory + "/device";
-    const block::UdevFacts udev = block::udevFacts(host, name);
+    const TextMap udev = block::udevFacts(host, name);
     const bool ata = host.line(device + "/vendor") == "ATA";
-    const auto ataFact = [&](const char* key) { return ata ? block::fact(udev, key) : std::nullopt; };
+    const auto ataFact = [&](const char* key) { return ata ? textOf(udev, key) : std::nullopt; };
     return {.maker = makerOf(host, device),
-            .model = firstOf({ataText(host, device, 27, 20), ataFact("ID_MODEL_ENC"),
-                              firstLine(host, device, {"model", "name"})}),
-            .serial = firstOf({firstLine(host, directory, {"device/serial", "serial"}),
-                               serialPage(host, device), block::fact(udev, "ID_SERIAL_SHORT")}),
-            .firmware = firstOf({host.line(device + "/firmware_rev"), ataText(host, device, 23, 4),
-                                 ataFact("ID_REVISION"), firstLine(host, device, {"rev", "fwrev"})}),
-            .wwn = firstOf({nameOf(host, directory), block::fact(udev, "ID_WWN")})};
+            .model = firstTold({ataText(host, device, 27, 20), ataFact("ID_MODEL_ENC"),
+                                firstLine(host, device, {"model", "name"})}),
+            .serial = firstTold({firstLine(host, directory, {"device/serial", "serial"}),
+                                 serialPage(host, device), textOf(udev, "ID_SERIAL_SHORT")}),
+            .firmware = firstTold({host.line(device + "/firmware_rev"), ataText(host, device, 23, 4),
+                                   ataFact("ID_REVISION"), firstLine(host, device, {"rev", "fwrev"})}),
+            .wwn = firstTold({nameOf(host, directory), textOf(udev, "ID_WWN")})};
 }
 
 }  // namespace hardware

@@ -18,18 +18,13 @@ enum : Id {
     kMembers,
 };
 
-constexpr Row row(Id id, const char* name, Kind kind, const char* unit, const char* source,
-                  const char* meaning, bool live = false) {
-    return {kType, id, name, kind, unit, source, meaning, Audience::everybody, live};
-}
-
 constexpr Row kRows[] = {
-    row(kMappingName, "MappingName", Kind::text, "", "dm/name", "its name below /dev/mapper"),
-    row(kSort, "MappingKind", Kind::text, "", "how dm/uuid begins",
-        "logical volume, encrypted, multipath and others"),
-    row(kSize, "Size", Kind::number, "bytes", "size", "how much it holds"),
-    row(kSuspended, "Suspended", Kind::flag, "", "dm/suspended", "whether it waits and serves nobody", true),
-    row(kMembers, "Members", Kind::texts, "", "slaves", "the devices it is built of"),
+    {kMappingName, "MappingName", Kind::text, "", "dm/name", "its name below /dev/mapper"},
+    {kSort, "MappingKind", Kind::text, "", "how dm/uuid begins",
+     "logical volume, encrypted, multipath and others"},
+    {kSize, "Size", Kind::number, "bytes", "size", "how much it holds"},
+    {kSuspended, "Suspended", Kind::flag, "", "dm/suspended", "whether it waits and serves nobody", kLive},
+    {kMembers, "Members", Kind::texts, "", "slaves", "the devices it is built of"},
 };
 
 struct Sort {

@@ -22,7 +22,7 @@ private:
 /// This host's devices, by ioctls, statvfs, libblkid and lldpd.
 class OwnDevices : public DeviceAccess {
 public:
-    Told apart(const std::function<Told()>& work) const override;
+    Told inOtherProcess(const std::function<Told()>& work) const override;
     std::optional<std::string> nvmeLog(const DeviceFile& controller, unsigned int page,
                                        std::size_t size) const override;
     std::optional<ScsiAnswer> scsi(const DeviceFile& drive, const std::vector<std::uint8_t>& command,

@@ -17,14 +17,14 @@ enum : Id {
 };
 
 constexpr Row kRows[] = {
-    {kType, kNumber, "Number", Kind::number, "", "partition", "its number in the partition table"},
-    {kType, kStart, "Start", Kind::number, "bytes", "start", "where on the device it begins"},
-    {kType, kSize, "Size", Kind::number, "bytes", "size", "how much it holds"},
-    {kType, kLabel, "Label", Kind::text, "", "PARTNAME in uevent, else ID_PART_ENTRY_NAME of udev",
+    {kNumber, "Number", Kind::number, "", "partition", "its number in the partition table"},
+    {kStart, "Start", Kind::number, "bytes", "start", "where on the device it begins"},
+    {kSize, "Size", Kind::number, "bytes", "size", "how much it holds"},
+    {kLabel, "Label", Kind::text, "", "PARTNAME in uevent, else ID_PART_ENTRY_NAME of udev",
      "its name in the partition table"},
-    {kType, kUuid, "UUID", Kind::text, "", "PARTUUID in uevent, else ID_PART_ENTRY_UUID of udev",
-     "the number that no other partition has", Audience::trusted},
-    {kType, kPartitionType, "PartitionType", Kind::text, "", "ID_PART_ENTRY_TYPE of udev",
+    {kUuid, "UUID", Kind::text, "", "PARTUUID in uevent, else ID_PART_ENTRY_UUID of udev",
+     "the number that no other partition has", kTrusted},
+    {kPartitionType, "PartitionType", Kind::text, "", "ID_PART_ENTRY_TYPE of udev",
      "what it is for, as the partition table says it"},
 };
 
@@ -40,7 +40,7 @@ std::vector<std::string> listPartitions(const Host& host) {
 
 void describePartition(const Host& host, Found& found) {
     const std::string directory = block::directory(found.name);
-    const block::UdevFacts udev = block::udevFacts(host, found.name);
+    const TextMap udev = block::udevFacts(host, found.name);
     if (const auto holder = block::holderOf(host, found.name)) {
         found.parent = {block::classOf(host, *holder).value_or(Class::drive), *holder};
     }
@@ -48,13 +48,12 @@ void describePartition(const Host& host, Found& found) {
     facts.number(kNumber, host.number(directory + "/partition"));
     facts.number(kStart, block::bytes(host.number(directory + "/start")));
     facts.number(kSize, block::sizeOf(host, found.name));
-    const auto label = host.field(directory + "/uevent", "PARTNAME");
-    facts.text(kLabel, label ? label : block::fact(udev, "ID_PART_ENTRY_NAME"));
+    const std::string uevent = directory + "/uevent";
+    facts.text(kLabel, firstTold({host.field(uevent, "PARTNAME"), textOf(udev, "ID_PART_ENTRY_NAME")}));
     if (host.privileged()) {
-        const auto uuid = host.field(directory + "/uevent", "PARTUUID");
-        facts.text(kUuid, uuid ? uuid : block::fact(udev, "ID_PART_ENTRY_UUID"));
+        facts.text(kUuid, firstTold({host.field(uevent, "PARTUUID"), textOf(udev, "ID_PART_ENTRY_UUID")}));
     }
-    facts.text(kPartitionType, block::fact(udev, "ID_PART_ENTRY_TYPE"));
+    facts.text(kPartitionType, textOf(udev, "ID_PART_ENTRY_TYPE"));
 }
 
 }  // namespace hardware

@@ -33,50 +33,51 @@ enum : Id {
 };
 
 constexpr Row kRows[] = {
-    {kType, kMaker, "Maker", Kind::text, "", "/sys/class/dmi/id/sys_vendor", "who made the computer"},
-    {kType, kModel, "Model", Kind::text, "", "/sys/class/dmi/id/product_name or /proc/device-tree/model",
+    {kMaker, "Maker", Kind::text, "", "/sys/class/dmi/id/sys_vendor", "who made the computer"},
+    {kModel, "Model", Kind::text, "", "/sys/class/dmi/id/product_name or /proc/device-tree/model",
      "the computer's model"},
-    {kType, kSerial, "SerialNumber", Kind::text, "",
+    {kSerial, "SerialNumber", Kind::text, "",
      "/sys/class/dmi/id/product_serial or /proc/device-tree/serial-number", "the computer's serial number",
-     Audience::trusted},
-    {kType, kUuid, "UUID", Kind::text, "", "/sys/class/dmi/id/product_uuid",
-     "the number that no other computer has", Audience::trusted},
-    {kType, kFirmwareVersion, "FirmwareVersion", Kind::text, "", "/sys/class/dmi/id/bios_version",
+     kTrusted},
+    {kUuid, "UUID", Kind::text, "", "/sys/class/dmi/id/product_uuid", "the number that no other computer has",
+     kTrusted},
+    {kFirmwareVersion, "FirmwareVersion", Kind::text, "", "/sys/class/dmi/id/bios_version",
      "version of the firmware"},
-    {kType, kFirmwareDate, "FirmwareDate", Kind::text, "", "/sys/class/dmi/id/bios_date",
+    {kFirmwareDate, "FirmwareDate", Kind::text, "", "/sys/class/dmi/id/bios_date",
      "when the firmware was made, as it says it"},
-    {kType, kVirtual, "Virtual", Kind::flag, "", "flags in /proc/cpuinfo, /sys/class/dmi/id, /sys/hypervisor",
+    {kVirtual, "Virtual", Kind::flag, "", "flags in /proc/cpuinfo, /sys/class/dmi/id, /sys/hypervisor",
      "whether the computer is a virtual machine"},
-    {kType, kVirtualKind, "VirtualKind", Kind::text, "", "/sys/class/dmi/id, /sys/hypervisor/type",
+    {kVirtualKind, "VirtualKind", Kind::text, "", "/sys/class/dmi/id, /sys/hypervisor/type",
      "what runs the virtual machine"},
-    {kType, kBootTime, "BootTime", Kind::number, "seconds since 1970", "btime in /proc/stat",
+    {kBootTime, "BootTime", Kind::number, "seconds since 1970", "btime in /proc/stat",
      "when the host was started"},
-    {kType, kKernel, "Kernel", Kind::text, "", "/proc/sys/kernel/osrelease", "release of the running kernel"},
-    {kType, kArchitecture, "Architecture", Kind::text, "", "/proc/sys/kernel/arch",
-     "what the kernel was made for"},
-    {kType, kDistribution, "Distribution", Kind::text, "", "PRETTY_NAME in /etc/os-release",
+    {kKernel, "Kernel", Kind::text, "", "/proc/sys/kernel/osrelease", "release of the running kernel"},
+    {kArchitecture, "Architecture", Kind::text, "", "/proc/sys/kernel/arch", "what the kernel was made for"},
+    {kDistribution, "Distribution", Kind::text, "", "PRETTY_NAME in /etc/os-release",
      "the operating system as it calls itself"},
-    {kType, kSockets, "ProcessorSockets", Kind::number, "",
+    {kSockets, "ProcessorSockets", Kind::number, "",
      "/sys/devices/system/cpu/cpu*/topology/physical_package_id", "sockets that hold a processor"},
 };
 
-/// The value behind "KEY=" in a file for a shell: quotes and backslashes taken off.
-std::optional<std::string> shellValue(const Host& host, const std::string& path, const std::string& key) {
-    for (const std::string& line : host.lines(path)) {
-        if (!line.starts_with(key + "=")) {
-            continue;
+/// A value out of a file for a shell, its quotes and backslashes taken off.
+std::string unquoted(const std::string& text) {
+    std::string value;
+    for (std::size_t at = 0; at < text.size(); ++at) {
+        if (text[at] == '\\' && at + 1 < text.size()) {
+            value += text[++at];
+        } else if (text[at] != '"' && text[at] != '\'') {
+            value += text[at];
         }
-        std::string value;
-        for (std::size_t at = key.size() + 1; at < line.size(); ++at) {
-            if (line[at] == '\\' && at + 1 < line.size()) {
-                value += line[++at];
-            } else if (line[at] != '"' && line[at] != '\'') {
-                value += line[at];
-            }
-        }
-        return printable(value);
     }
-    return std::nullopt;
+    return value;
+}
+
+/// By the first of its two places.
+std::string distribution(const Host& host) {
+    constexpr const char* kKey = "PRETTY_NAME";
+    const auto name =
+        firstTold({host.field("/etc/os-release", kKey), host.field("/usr/lib/os-release", kKey)});
+    return unquoted(name.value_or(""));
 }
 
 std::optional<unsigned long long> bootTime(const Host& host) {
@@ -153,11 +154,6 @@ std::optional<std::string> architecture(const Host& host) {
     return told;
 }
 
-template <class Answer>
-Answer firstOf(Answer first, const Answer& second) {
-    return first ? first : second;
-}
-
 }  // namespace
 
 Rows systemRows() {
@@ -175,9 +171,9 @@ void describeSystem(const Host& host, Found& found) {
     const std::string tree = "/proc/device-tree/";
     Facts& facts = found.facts;
     facts.text(kMaker, dmi("sys_vendor"));
-    facts.text(kModel, firstOf(dmi("product_name"), host.line(tree + "model")));
+    facts.text(kModel, firstTold({dmi("product_name"), host.line(tree + "model")}));
     if (host.privileged()) {
-        facts.text(kSerial, firstOf(dmi("product_serial"), host.line(tree + "serial-number")));
+        facts.text(kSerial, firstTold({dmi("product_serial"), host.line(tree + "serial-number")}));
         facts.text(kUuid, uuidOf(host));
     }
     facts.text(kFirmwareVersion, dmi("bios_version"));
@@ -189,8 +185,7 @@ void describeSystem(const Host& host, Found& found) {
     facts.number(kBootTime, bootTime(host));
     facts.text(kKernel, host.line("/proc/sys/kernel/osrelease"));
     facts.text(kArchitecture, architecture(host));
-    facts.text(kDistribution, firstOf(shellValue(host, "/etc/os-release", "PRETTY_NAME"),
-                                      shellValue(host, "/usr/lib/os-release", "PRETTY_NAME")));
+    facts.text(kDistribution, distribution(host));
     if (const std::size_t sockets = listProcessors(host).size(); sockets > 0) {
         facts.number(kSockets, sockets);
     }

@@ -1,4 +1,4 @@
-#include "plugins/hardware/patience.h"
+#include "plugins/hardware/deadline_runner.h"
 
 #include <dlfcn.h>
 #include <link.h>
@@ -42,7 +42,7 @@ std::chrono::steady_clock::time_point now() {
 }  // namespace
 
 /// Devices that one thread asks one after the other. Guarded by the state's guard but for the work itself.
-struct Patience::Job {
+struct DeadlineRunner::Job {
     enum class Outcome { open, done, busy };
 
     std::vector<std::string> devices;
@@ -54,7 +54,7 @@ struct Patience::Job {
     bool ended = false;
 };
 
-struct Patience::State {
+struct DeadlineRunner::State : std::enable_shared_from_this<State> {
     std::mutex guard;
     std::condition_variable changed;
     std::shared_ptr<Job> next;         // waits for a thread; guarded, like all below
@@ -65,8 +65,7 @@ struct Patience::State {
     bool ending = false;
 
     /// False when there is no thread to be had in time.
-    bool post(std::unique_lock<std::mutex>& lock, const std::shared_ptr<State>& self,
-              const std::shared_ptr<Job>& job, Time until);
+    bool post(std::unique_lock<std::mutex>& lock, const std::shared_ptr<Job>& job, Time until);
     /// Waits until the job has ended or one of its devices has taken longer than the limit.
     /// @return false when no thread got round to it
     bool await(std::unique_lock<std::mutex>& lock, Job& job, std::chrono::milliseconds limit);
@@ -74,7 +73,7 @@ struct Patience::State {
     void ask(std::unique_lock<std::mutex>& lock, Job& job);
 };
 
-void Patience::State::ask(std::unique_lock<std::mutex>& lock, Job& job) {
+void DeadlineRunner::State::ask(std::unique_lock<std::mutex>& lock, Job& job) {
     const std::string device = job.devices[job.at];
     job.since = now();
     if (!busy.emplace(device, job.since).second) {
@@ -92,7 +91,7 @@ void Patience::State::ask(std::unique_lock<std::mutex>& lock, Job& job) {
     busy.erase(device);
 }
 
-void Patience::State::serve() {
+void DeadlineRunner::State::serve() {
     std::unique_lock lock(guard);
     for (;;) {
         ++idle;
@@ -113,15 +112,15 @@ void Patience::State::serve() {
     changed.notify_all();
 }
 
-bool Patience::State::post(std::unique_lock<std::mutex>& lock, const std::shared_ptr<State>& self,
-                           const std::shared_ptr<Job>& job, Time until) {
+bool DeadlineRunner::State::post(std::unique_lock<std::mutex>& lock, const std::shared_ptr<Job>& job,
+                                 Time until) {
     const auto free = [this] { return next == nullptr && (idle > 0 || running < kMostThreads); };
     if (!changed.wait_until(lock, until, free)) {
         return false;
     }
     if (idle == 0) {
         try {
-            threads.push_back(quietThread([self] { self->serve(); }));
+            threads.push_back(quietThread([self = shared_from_this()] { self->serve(); }));
         } catch (const std::system_error&) {
             return false;
         }
@@ -133,7 +132,8 @@ bool Patience::State::post(std::unique_lock<std::mutex>& lock, const std::shared
     return true;
 }
 
-bool Patience::State::await(std::unique_lock<std::mutex>& lock, Job& job, std::chrono::milliseconds limit) {
+bool DeadlineRunner::State::await(std::unique_lock<std::mutex>& lock, Job& job,
+                                  std::chrono::milliseconds limit) {
     while (!job.ended && now() < job.since + limit) {
         const Time until = job.since + limit;  // the thread writes it while this one sleeps
         changed.wait_until(lock, until, [&job] { return job.ended; });
@@ -147,9 +147,10 @@ bool Patience::State::await(std::unique_lock<std::mutex>& lock, Job& job, std::c
     return taken;
 }
 
-Patience::Patience(std::chrono::milliseconds limit) : state_(std::make_shared<State>()), limit_(limit) {}
+DeadlineRunner::DeadlineRunner(std::chrono::milliseconds limit)
+    : state_(std::make_shared<State>()), limit_(limit) {}
 
-Patience::~Patience() {
+DeadlineRunner::~DeadlineRunner() {
     std::unique_lock lock(state_->guard);
     state_->ending = true;
     state_->changed.notify_all();
@@ -163,13 +164,13 @@ Patience::~Patience() {
     }
 }
 
-bool Patience::run(const std::string& device, std::function<void()> work) {
-    return runOne(
-        device, [work = std::move(work)](std::size_t /*place*/) { work(); }, 0, limit_);
+bool DeadlineRunner::run(const std::string& device, std::function<void()> work) {
+    return runWithin(limit_, device, std::move(work));
 }
 
-bool Patience::runOne(const std::string& device, const std::function<void(std::size_t)>& work,
-                      std::size_t place, std::chrono::milliseconds limit) {
+bool DeadlineRunner::runWithin(std::chrono::milliseconds limit, const std::string& device,
+                               std::function<void()> work) {
+    const std::function<void(std::size_t)> only = [work = std::move(work)](std::size_t /*place*/) { work(); };
     const Time end = now() + limit;
     std::unique_lock lock(state_->guard);
     for (;;) {
@@ -178,9 +179,8 @@ bool Patience::runOne(const std::string& device, const std::function<void(std::s
         if (!state_->changed.wait_until(lock, until, [&] { return !state_->busy.contains(device); })) {
             return false;
         }
-        const auto job =
-            std::make_shared<Job>(Job{{device}, [work, place](std::size_t /*first*/) { work(place); }});
-        if (!state_->post(lock, state_, job, end)) {
+        const auto job = std::make_shared<Job>(Job{{device}, only});
+        if (!state_->post(lock, job, end)) {
             return false;
         }
         static_cast<void>(state_->await(lock, *job, limit));
@@ -190,8 +190,8 @@ bool Patience::runOne(const std::string& device, const std::function<void(std::s
     }
 }
 
-std::vector<bool> Patience::runAll(std::vector<std::string> devices,
-                                   const std::function<void(std::size_t)>& work) {
+std::vector<bool> DeadlineRunner::runAll(std::vector<std::string> devices,
+                                         const std::function<void(std::size_t)>& work) {
     std::vector<bool> done(devices.size());
     std::vector<std::size_t> busy;
     std::chrono::milliseconds limit = limit_;
@@ -200,7 +200,7 @@ std::vector<bool> Patience::runAll(std::vector<std::string> devices,
         const auto job = std::make_shared<Job>(
             Job{{start, devices.end()}, [work, first](std::size_t place) { work(first + place); }});
         std::unique_lock lock(state_->guard);
-        if (!state_->post(lock, state_, job, now() + limit) || !state_->await(lock, *job, limit)) {
+        if (!state_->post(lock, job, now() + limit) || !state_->await(lock, *job, limit)) {
             break;
         }
         for (std::size_t place = 0; place < job->outcomes.size(); ++place) {
@@ -215,7 +215,7 @@ std::vector<bool> Patience::runAll(std::vector<std::string> devices,
         first += job->at + 1;
     }
     for (const std::size_t place : busy) {
-        done[place] = runOne(devices[place], work, place, limit);
+        done[place] = runWithin(limit, devices[place], [work, place] { work(place); });
     }
     return done;
 }

@@ -5,7 +5,7 @@
 
 namespace hardware {
 
-// Numbers in what a device answered; what lies behind its end counts as 0.
+// Numbers in what a device or the firmware answered; what lies behind its end counts as 0.
 
 inline std::uint8_t byteAt(const std::string& data, std::size_t place) {
     return place < data.size() ? static_cast<std::uint8_t>(data[place]) : 0;

@@ -53,7 +53,7 @@ void closeAllBut(int descriptor) {
 }
 
 /// Starts a process that is no child of this one: nobody has to wait for its end.
-bool startApart(const std::function<DeviceAccess::Told()>& work, int result) {
+bool startDetached(const std::function<DeviceAccess::Told()>& work, int result) {
     const pid_t between = fork();
     if (between == 0) {
         if (fork() == 0) {
@@ -83,12 +83,12 @@ std::string readToEnd(int descriptor) {
 
 }  // namespace
 
-DeviceAccess::Told OwnDevices::apart(const std::function<Told()>& work) const {
+DeviceAccess::Told OwnDevices::inOtherProcess(const std::function<Told()>& work) const {
     std::array<int, 2> ends{};
     if (pipe2(ends.data(), O_CLOEXEC) != 0) {
         return {};
     }
-    const bool started = startApart(work, ends[1]);
+    const bool started = startDetached(work, ends[1]);
     close(ends[1]);
     const std::string text = started ? readToEnd(ends[0]) : "";
     close(ends[0]);

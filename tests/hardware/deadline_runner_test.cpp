@@ -1,5 +1,5 @@
 // Work that may wait for a device: nothing waits longer for it than the limit.
-#include "plugins/hardware/patience.h"
+#include "plugins/hardware/deadline_runner.h"
 
 #include <gtest/gtest.h>
 
@@ -17,7 +17,7 @@
 
 namespace {
 
-using hardware::Patience;
+using hardware::DeadlineRunner;
 using std::chrono::milliseconds;
 using std::chrono::steady_clock;
 
@@ -73,41 +73,41 @@ std::vector<std::string> devices(std::size_t count) {
     return names;
 }
 
-TEST(Patience, WorkIsDoneInAnotherThread) {
-    Patience patience(kLong);
+TEST(DeadlineRunner, WorkIsDoneInAnotherThread) {
+    DeadlineRunner runner(kLong);
     std::thread::id there;
-    EXPECT_TRUE(patience.run("a", [&] { there = std::this_thread::get_id(); }));
+    EXPECT_TRUE(runner.run("a", [&] { there = std::this_thread::get_id(); }));
     EXPECT_NE(there, std::thread::id());
     EXPECT_NE(there, std::this_thread::get_id());
 }
 
-TEST(Patience, WorkThatThrowsIsDone) {
-    Patience patience(kLong);
-    EXPECT_TRUE(patience.run("a", [] { throw std::runtime_error("no memory"); }));
-    EXPECT_TRUE(patience.run("a", [] {}));
+TEST(DeadlineRunner, WorkThatThrowsIsDone) {
+    DeadlineRunner runner(kLong);
+    EXPECT_TRUE(runner.run("a", [] { throw std::runtime_error("no memory"); }));
+    EXPECT_TRUE(runner.run("a", [] {}));
 }
 
-TEST(Patience, ADeviceThatHangsCostsTheLimitOnce) {
+TEST(DeadlineRunner, ADeviceThatHangsCostsTheLimitOnce) {
     Stuck stuck;
-    Patience patience(kLimit);
-    EXPECT_GE(lasted([&] { EXPECT_FALSE(patience.run("a", stuck.work())); }), kLimit);
+    DeadlineRunner runner(kLimit);
+    EXPECT_GE(lasted([&] { EXPECT_FALSE(runner.run("a", stuck.work())); }), kLimit);
     std::atomic<bool> asked = false;
-    const auto again = lasted([&] { EXPECT_FALSE(patience.run("a", [&] { asked = true; })); });
+    const auto again = lasted([&] { EXPECT_FALSE(runner.run("a", [&] { asked = true; })); });
     EXPECT_LT(again, kLimit);
     EXPECT_FALSE(asked) << "only one question at a time";
-    EXPECT_TRUE(patience.run("b", [] {})) << "others are not concerned";
+    EXPECT_TRUE(runner.run("b", [] {})) << "others are not concerned";
 }
 
-TEST(Patience, ADeviceThatAnswersAgainIsAskedAgain) {
+TEST(DeadlineRunner, ADeviceThatAnswersAgainIsAskedAgain) {
     Stuck stuck;
-    Patience patience(kLimit);
-    EXPECT_FALSE(patience.run("a", stuck.work()));
+    DeadlineRunner runner(kLimit);
+    EXPECT_FALSE(runner.run("a", stuck.work()));
     stuck.release();
-    EXPECT_TRUE(eventually([&] { return patience.run("a", [] {}); }));
+    EXPECT_TRUE(eventually([&] { return runner.run("a", [] {}); }));
 }
 
-TEST(Patience, WorkForOneDeviceRunsOneAtATime) {
-    Patience patience(kLong);
+TEST(DeadlineRunner, WorkForOneDeviceRunsOneAtATime) {
+    DeadlineRunner runner(kLong);
     std::atomic<int> inside = 0;
     std::atomic<int> most = 0;
     std::atomic<int> done = 0;
@@ -115,7 +115,7 @@ TEST(Patience, WorkForOneDeviceRunsOneAtATime) {
     for (int caller = 0; caller < 8; ++caller) {
         callers.emplace_back([&] {
             for (int round = 0; round < 50; ++round) {
-                done += patience.run("a", [&] {
+                done += runner.run("a", [&] {
                     most = std::max(most.load(), ++inside);
                     std::this_thread::yield();
                     --inside;
@@ -130,14 +130,14 @@ TEST(Patience, WorkForOneDeviceRunsOneAtATime) {
     EXPECT_EQ(done, 400);
 }
 
-TEST(Patience, ManyCallersForManyDevicesAllGetTheirs) {
-    Patience patience(kLong);
+TEST(DeadlineRunner, ManyCallersForManyDevicesAllGetTheirs) {
+    DeadlineRunner runner(kLong);
     std::atomic<int> done = 0;
     std::vector<std::thread> callers;
     for (int caller = 0; caller < 40; ++caller) {
         callers.emplace_back([&, caller] {
             for (int round = 0; round < 20; ++round) {
-                done += patience.run(std::to_string(caller), [] { std::this_thread::yield(); });
+                done += runner.run(std::to_string(caller), [] { std::this_thread::yield(); });
             }
         });
     }
@@ -147,60 +147,60 @@ TEST(Patience, ManyCallersForManyDevicesAllGetTheirs) {
     EXPECT_EQ(done, 800);
 }
 
-TEST(Patience, ThreadsAreBounded) {
+TEST(DeadlineRunner, ThreadsAreBounded) {
     Stuck stuck;
     const std::size_t before = runningThreads();
-    Patience patience(milliseconds(5));
+    DeadlineRunner runner(milliseconds(5));
     for (const std::string& device : devices(30)) {
-        EXPECT_FALSE(patience.run(device, stuck.work()));
+        EXPECT_FALSE(runner.run(device, stuck.work()));
     }
     EXPECT_LE(runningThreads() - before, 16U);
-    EXPECT_FALSE(patience.run("another", [] {})) << "all threads hang";
+    EXPECT_FALSE(runner.run("another", [] {})) << "all threads hang";
     stuck.release();
-    EXPECT_TRUE(eventually([&] { return patience.run("another", [] {}); }));
+    EXPECT_TRUE(eventually([&] { return runner.run("another", [] {}); }));
 }
 
-TEST(Patience, WorkThatHangsOutlivesIt) {
+TEST(DeadlineRunner, WorkThatHangsOutlivesIt) {
     Stuck stuck;
     auto owned = std::make_shared<int>(1);
     const std::weak_ptr<int> watched = owned;
     {
-        Patience patience(kLimit);
-        EXPECT_FALSE(patience.run("a", [work = stuck.work(), owned] { work(); }));
+        DeadlineRunner runner(kLimit);
+        EXPECT_FALSE(runner.run("a", [work = stuck.work(), owned] { work(); }));
         owned.reset();
-        EXPECT_LT(lasted([&] { patience.run("b", [] {}); }), kLong);
+        EXPECT_LT(lasted([&] { runner.run("b", [] {}); }), kLong);
     }
     EXPECT_FALSE(watched.expired()) << "it still uses what it owns";
     stuck.release();
     EXPECT_TRUE(eventually([&] { return watched.expired(); }));
 }
 
-TEST(Patience, ItsThreadsGoWithIt) {
+TEST(DeadlineRunner, ItsThreadsGoWithIt) {
     const std::size_t before = runningThreads();
     {
-        Patience patience(kLong);
-        patience.run("a", [] {});
+        DeadlineRunner runner(kLong);
+        runner.run("a", [] {});
         EXPECT_GT(runningThreads(), before);
     }
     EXPECT_TRUE(eventually([&] { return runningThreads() == before; }));
 }
 
-TEST(Patience, ItsThreadsGetNoSignals) {
-    Patience patience(kLong);
+TEST(DeadlineRunner, ItsThreadsGetNoSignals) {
+    DeadlineRunner runner(kLong);
     sigset_t blocked;
     sigemptyset(&blocked);
-    patience.run("a", [&] { pthread_sigmask(SIG_BLOCK, nullptr, &blocked); });
+    runner.run("a", [&] { pthread_sigmask(SIG_BLOCK, nullptr, &blocked); });
     EXPECT_EQ(sigismember(&blocked, SIGTERM), 1);
     sigset_t own;
     pthread_sigmask(SIG_BLOCK, nullptr, &own);
     EXPECT_EQ(sigismember(&own, SIGTERM), 0);
 }
 
-TEST(PatienceWithMany, AllAreAskedInOrderByOneThread) {
-    Patience patience(kLong);
+TEST(DeadlineRunnerWithMany, AllAreAskedInOrderByOneThread) {
+    DeadlineRunner runner(kLong);
     std::vector<std::size_t> places;
     std::set<std::thread::id> threads;
-    const std::vector<bool> done = patience.runAll(devices(100), [&](std::size_t place) {
+    const std::vector<bool> done = runner.runAll(devices(100), [&](std::size_t place) {
         places.push_back(place);
         threads.insert(std::this_thread::get_id());
     });
@@ -210,14 +210,14 @@ TEST(PatienceWithMany, AllAreAskedInOrderByOneThread) {
     EXPECT_EQ(threads.size(), 1U);
 }
 
-TEST(PatienceWithMany, NoneIsDoneAtOnce) {
-    Patience patience(kLong);
-    EXPECT_TRUE(patience.runAll({}, [](std::size_t) { FAIL(); }).empty());
+TEST(DeadlineRunnerWithMany, NoneIsDoneAtOnce) {
+    DeadlineRunner runner(kLong);
+    EXPECT_TRUE(runner.runAll({}, [](std::size_t) { FAIL(); }).empty());
 }
 
-TEST(PatienceWithMany, TheOthersAreAskedWhenOneHangs) {
+TEST(DeadlineRunnerWithMany, TheOthersAreAskedWhenOneHangs) {
     Stuck stuck;
-    Patience patience(milliseconds(200));
+    DeadlineRunner runner(milliseconds(200));
     const auto asked = std::make_shared<std::array<std::atomic<int>, 5>>();
     const auto work = [asked, hang = stuck.work()](std::size_t place) {
         ++(*asked)[place];
@@ -225,7 +225,7 @@ TEST(PatienceWithMany, TheOthersAreAskedWhenOneHangs) {
             hang();
         }
     };
-    EXPECT_EQ(patience.runAll(devices(5), work), (std::vector<bool>{true, true, false, true, true}));
+    EXPECT_EQ(runner.runAll(devices(5), work), (std::vector<bool>{true, true, false, true, true}));
     stuck.release();
     EXPECT_TRUE(eventually([&] { return stuck.inside() == 0; }));
     std::this_thread::sleep_for(milliseconds(2));
@@ -234,44 +234,43 @@ TEST(PatienceWithMany, TheOthersAreAskedWhenOneHangs) {
     }
 }
 
-TEST(PatienceWithMany, EachHasTheWholeLimit) {
-    Patience patience(milliseconds(300));
+TEST(DeadlineRunnerWithMany, EachHasTheWholeLimit) {
+    DeadlineRunner runner(milliseconds(300));
     const auto slow = [](std::size_t) { std::this_thread::sleep_for(milliseconds(100)); };
-    EXPECT_EQ(patience.runAll(devices(6), slow), std::vector<bool>(6, true));
+    EXPECT_EQ(runner.runAll(devices(6), slow), std::vector<bool>(6, true));
 }
 
-TEST(PatienceWithMany, ABusThatIsDeadCostsLittleMoreThanTwiceTheLimit) {
+TEST(DeadlineRunnerWithMany, ABusThatIsDeadCostsLittleMoreThanTwiceTheLimit) {
     Stuck stuck;
-    Patience patience(milliseconds(64));
+    DeadlineRunner runner(milliseconds(64));
     const auto time = lasted([&] {
         const auto work = [hang = stuck.work()](std::size_t) { hang(); };
-        EXPECT_EQ(patience.runAll(devices(12), work), std::vector<bool>(12, false));
+        EXPECT_EQ(runner.runAll(devices(12), work), std::vector<bool>(12, false));
     });
     EXPECT_LT(time, milliseconds(12 * 64 / 2));
 }
 
-TEST(PatienceWithMany, ThingsOfOneDeviceThatHangsAreNotWaitedFor) {
+TEST(DeadlineRunnerWithMany, ThingsOfOneDeviceThatHangsAreNotWaitedFor) {
     Stuck stuck;
-    Patience patience(kLimit);
+    DeadlineRunner runner(kLimit);
     const auto time = lasted([&] {
         const auto work = [hang = stuck.work()](std::size_t) { hang(); };
-        EXPECT_EQ(patience.runAll(std::vector<std::string>(200, "chip"), work),
-                  std::vector<bool>(200, false));
+        EXPECT_EQ(runner.runAll(std::vector<std::string>(200, "chip"), work), std::vector<bool>(200, false));
     });
     EXPECT_LT(time, 4 * kLimit);
 }
 
-TEST(PatienceWithMany, OneThatIsAskedByAnotherIsWaitedFor) {
-    Patience patience(kLong);
+TEST(DeadlineRunnerWithMany, OneThatIsAskedByAnotherIsWaitedFor) {
+    DeadlineRunner runner(kLong);
     std::atomic<bool> inside = false;
     std::thread other([&] {
-        patience.run("device1", [&] {
+        runner.run("device1", [&] {
             inside = true;
             std::this_thread::sleep_for(milliseconds(30));
         });
     });
     ASSERT_TRUE(eventually([&] { return inside.load(); }));
-    EXPECT_EQ(patience.runAll(devices(3), [](std::size_t) {}), std::vector<bool>(3, true));
+    EXPECT_EQ(runner.runAll(devices(3), [](std::size_t) {}), std::vector<bool>(3, true));
     other.join();
 }
 

@@ -11,13 +11,13 @@ namespace hardware {
 /// Runs what may wait for a device, and does not wait for ever. Work that does not return in time keeps its
 /// thread until it does; meanwhile nothing else is asked of its device, and who asks for it is told so at
 /// once. There are never more than 16 threads. Any thread.
-class Patience {
+class DeadlineRunner {
 public:
-    explicit Patience(std::chrono::milliseconds limit);
-    Patience(const Patience&) = delete;
-    Patience& operator=(const Patience&) = delete;
+    explicit DeadlineRunner(std::chrono::milliseconds limit);
+    DeadlineRunner(const DeadlineRunner&) = delete;
+    DeadlineRunner& operator=(const DeadlineRunner&) = delete;
     /// Work that still hangs is left to itself, and keeps this library in its place.
-    ~Patience();
+    ~DeadlineRunner();
 
     /// @param device what is asked; work for one device runs one at a time
     /// @param work owns all that it uses: it may return long after its caller has gone
@@ -35,8 +35,7 @@ private:
     struct Job;
     struct State;
 
-    bool runOne(const std::string& device, const std::function<void(std::size_t)>& work, std::size_t place,
-                std::chrono::milliseconds limit);
+    bool runWithin(std::chrono::milliseconds limit, const std::string& device, std::function<void()> work);
 
     std::shared_ptr<State> state_;
     std::chrono::milliseconds limit_;
