@@ -47,9 +47,8 @@ Service::Service(Loop& loop, bus::Connection& connection, Agent& agent, const Co
       consent_(connection),
       looker_(agent,
               [this, mailbox = loop.mailbox()](Look look) {
-                  mailbox->post([this, held = std::make_shared<Look>(std::move(look))] {
-                      take(std::move(*held));
-                  });
+                  mailbox->post(
+                      [this, held = std::make_shared<Look>(std::move(look))] { take(std::move(*held)); });
               }),
       readers_(kReaders),
       writers_(kWriters),
@@ -77,6 +76,7 @@ void Service::begin() {
     changes_.begin(model_);
     eventsCome_ = loop_.whenReadable(events_->descriptor(), [this] { takeEvents(); });
     looker_.start();
+    hostWatch_.emplace(loop_, looker_);
     armLook();
 }
 
@@ -113,6 +113,9 @@ void Service::takeEvents() {
             model_.withdraw(event.nodeId, looker_.begun());
         } else if (event.nodeId != 0) {
             looker_.lookAgain(event.nodeId);
+            if (event.kind == Event::Kind::alert) {
+                looker_.alertCame(event.nodeId);
+            }
         }
         changes_.happened(event);
     }
@@ -120,6 +123,7 @@ void Service::takeEvents() {
 
 void Service::windDown() {
     nextLook_.reset();
+    hostWatch_.reset();
     looker_.stop();
     readers_.stop();
 }
