@@ -1,7 +1,7 @@
 # Options of the build and the flags every target shares.
 option(CORVISTA_TESTS "Build the tests" ON)
 option(CORVISTA_BENCH "Build the benchmarks (needs Google Benchmark)" OFF)
-option(CORVISTA_SERVICE "Build the agent as a service, cvagentd (needs libsystemd)" ON)
+option(CORVISTA_SERVICE "Build the service and the history (needs libsystemd and SQLite)" ON)
 option(CORVISTA_FUZZ "Build the fuzz targets (needs clang)" OFF)
 set(CORVISTA_SANITIZE "" CACHE STRING "Sanitizers, as -fsanitize= takes them")
 

@@ -59,7 +59,7 @@ std::string Connection::uniqueName() const {
     return name;
 }
 
-Message Connection::call(const Target& target) const {
+Message Connection::newCall(const Target& target) const {
     sd_bus_message* made = nullptr;
     checkDone(sd_bus_message_new_method_call(get(), &made, target.service.c_str(), target.path.c_str(),
                                              target.interface.c_str(), target.member.c_str()),
@@ -67,7 +67,7 @@ Message Connection::call(const Target& target) const {
     return Message::adopt(made);
 }
 
-Message Connection::signal(const std::string& path, const std::string& interface,
+Message Connection::newSignal(const std::string& path, const std::string& interface,
                            const std::string& member) const {
     sd_bus_message* made = nullptr;
     checkDone(sd_bus_message_new_signal(get(), &made, path.c_str(), interface.c_str(), member.c_str()),

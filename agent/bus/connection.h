@@ -41,8 +41,8 @@ public:
     /// ":1.23". Waits for the bus's greeting.
     std::string uniqueName() const;
 
-    Message call(const Target& target) const;
-    Message signal(const std::string& path, const std::string& interface, const std::string& member) const;
+    Message newCall(const Target& target) const;
+    Message newSignal(const std::string& path, const std::string& interface, const std::string& member) const;
 
     /// Sends a call and waits for its answer; never from inside a handler. Throws Error: what the answer says.
     Message ask(const Message& call, Microseconds longest) const;

@@ -6,6 +6,7 @@
 #include <sstream>
 
 #include "agent/cli/failure.h"
+#include "agent/cli/moment.h"
 #include "agent/cli/print.h"
 
 namespace cvagent {
@@ -132,12 +133,14 @@ void unmark(std::string& word) {
 }
 
 void unmark(Options& options) {
-    for (std::vector<std::string>* list : {&options.values, &options.properties, &options.plugins}) {
+    for (std::vector<std::string>* list :
+         {&options.values, &options.properties, &options.plugins, &options.kinds}) {
         for (std::string& word : *list) {
             unmark(word);
         }
     }
-    for (std::string* word : {&options.node, &options.property, &options.nodeClass, &options.program}) {
+    for (std::string* word : {&options.node, &options.property, &options.nodeClass, &options.program,
+                              &options.since, &options.until}) {
         unmark(*word);
     }
     for (std::optional<std::string>* file : {&options.logFile, &options.traceFile}) {
@@ -225,6 +228,48 @@ void addOffline(CLI::App& app, Options& options) {
     doctor->callback([&options] { options.command = Command::doctor; });
 }
 
+/// What a check of one word says of it.
+CLI::Validator checked(const std::function<std::string(const std::string&)>& problemOf) {
+    return CLI::Validator([problemOf](const std::string& text) { return problemOf(text); }, "");
+}
+
+void addHistory(CLI::App& app, Options& options) {
+    CLI::App* history =
+        app.add_subcommand("history", "Print what has happened: alerts, nodes that came and went, writes");
+    history->add_option("--since", options.since, "Only what came then or later, or behind this number")
+        ->type_name("TIME|NUMBER")
+        ->check(checked(problemOfMoment));
+    history->add_option("--until", options.until, "Only what came until then, or up to this number")
+        ->type_name("TIME|NUMBER")
+        ->check(checked(problemOfMoment));
+    history
+        ->add_option("--node", options.node, "Only of this node: its path, the last part of it, or its name")
+        ->type_name("NODE");
+    history->add_option("--kind", options.kinds, "Only of this kind; may be given several times")
+        ->type_name("KIND")
+        ->expected(1)
+        ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll)
+        ->check(checked(problemOfKind));
+    history->add_option("--limit", options.limit, "Only the last N of them")
+        ->type_name("N")
+        ->check(wholeDecimal());
+    history
+        ->add_option("--keep-days", options.keepDays, "Keep entries for so long from now on; prints nothing")
+        ->type_name("DAYS")
+        ->check(secondsUpTo(36500));
+    history
+        ->add_option("--keep-megabytes", options.keepMegabytes,
+                     "Let the file grow up to this size from now on; prints nothing")
+        ->type_name("MB")
+        ->check(secondsUpTo(100000));
+    addJson(*history, options);
+    history->footer(
+        "TIME is 2026-11-20, 2026-11-20T21:03:00Z, or how long ago: 90s, 30m, 2h, 7d.\n"
+        "KIND is alert, published, withdrawn, written or changed.\n"
+        "With --json each entry is one object on a line of its own.");
+    history->callback([&options] { options.command = Command::history; });
+}
+
 std::string whyNoCommand(const CLI::App& app) {
     std::vector<std::string> rest = app.remaining();
     const auto word =
@@ -234,7 +279,7 @@ std::string whyNoCommand(const CLI::App& app) {
     }
     unmark(*word);
     return "there is no command " + inQuotes(*word) +
-           "; the commands are: tree, get, set, watch, properties, doctor";
+           "; the commands are: tree, get, set, watch, history, properties, doctor";
 }
 
 /// The subcommand that was being read, for the hint.
@@ -257,6 +302,7 @@ std::optional<Options> parseCommandLine(int count, const char* const* words) {
     addReaders(app, options);
     addWatch(app, options);
     addSet(app, options);
+    addHistory(app, options);
     addOffline(app, options);
     try {
         app.parse(marked(count, words));

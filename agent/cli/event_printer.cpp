@@ -23,7 +23,9 @@ std::string changeText(const Event& event) {
     return event.propertyName + ": " + before + (event.after.empty() ? "not known" : printable(event.after));
 }
 
-std::string line(const Event& event, const Style& style) {
+}  // namespace
+
+std::string eventLine(const Event& event, const Style& style) {
     std::string text = style.faint(timeText(event.time)) + "  ";
     const std::string path = event.path.empty() ? "(node without a path)" : printable(event.path);
     if (event.kind == Event::Kind::alert) {
@@ -33,12 +35,14 @@ std::string line(const Event& event, const Style& style) {
                 std::to_string(event.firstCode) + ", " + std::to_string(event.secondCode) + ", " +
                 std::to_string(event.eventCode) + ")";
     } else {
-        const bool isWrite = event.kind == Event::Kind::written;
+        const bool isOfProperty = event.kind == Event::Kind::written || event.kind == Event::Kind::changed;
         text += padded(eventName(event.kind), 11) + style.strong(path) + "  " +
-                (isWrite ? changeText(event) : printable(event.message));
+                (isOfProperty ? changeText(event) : printable(event.message));
     }
     return text + "\n";
 }
+
+namespace {
 
 /// The time left, as poll takes it; -1 without an end.
 int millisecondsTo(const std::optional<Clock::time_point>& end) {
@@ -65,7 +69,45 @@ void EventPrinter::printAll() {
         complain(std::to_string(taken.dropped) + " events came faster than they could be printed");
     }
     for (const Event& event : taken.events) {
+        if (!wasUnseen(event)) {
+            show(event);
+        }
+    }
+    if (!taken.events.empty()) {
+        noteShown(taken.events.back().number);
+    }
+}
+
+void EventPrinter::printUnseen() {
+    const std::lock_guard lock(guard_);
+    if (!marks_) {
+        return;
+    }
+    ShownMarks::Unseen unseen = marks_->unseen();
+    if (unseen.left > 0) {
+        complain(std::to_string(unseen.left) + " events before these are not shown; see: cvagent history");
+    }
+    for (const Event& event : unseen.events) {
         show(event);
+    }
+    if (!unseen.events.empty()) {
+        noteShown(unseen.events.back().number);
+    }
+    unseen_ = std::move(unseen.events);
+}
+
+/// With the guard. An event that waits to be taken may have been kept already, and was then shown with those
+/// before.
+bool EventPrinter::wasUnseen(const Event& event) const {
+    const auto found = std::ranges::lower_bound(unseen_, event.number, {}, &Event::number);
+    return found != unseen_.end() && found->number == event.number && found->path == event.path &&
+           found->message == event.message;
+}
+
+/// With the guard. What was not printed is shown the next time.
+void EventPrinter::noteShown(std::uint64_t number) {
+    if (marks_ && !failure_) {
+        marks_->shown(number);
     }
 }
 
@@ -73,7 +115,7 @@ void EventPrinter::printAll() {
 void EventPrinter::show(const Event& event) {
     try {
         if (!failure_) {
-            print(asJson_ ? json::event(event) : line(event, Style::detect()));
+            print(asJson_ ? json::event(event) : eventLine(event, Style::detect()));
             return;
         }
     } catch (const Failure& failure) {

@@ -155,7 +155,9 @@ std::string change(const IC::MutableNode& node, const Reading& before, const Rea
                     2);
 }
 
-std::string event(const Event& event) {
+namespace {
+
+Json eventObject(const Event& event) {
     Json object{{"time", timeText(event.time)}, {"event", eventName(event.kind)}};
     if (event.kind == Event::Kind::alert) {
         object["path"] = event.path;
@@ -176,9 +178,25 @@ std::string event(const Event& event) {
     if (!event.caller.empty()) {
         object["caller"] = event.caller;
     }
+    if (!event.verdict.empty()) {
+        object["wanted"] = event.wanted;
+        object["verdict"] = event.verdict;
+    }
     if (event.number != 0) {
         object["number"] = event.number;
     }
+    return object;
+}
+
+}  // namespace
+
+std::string event(const Event& event) {
+    return document(eventObject(event), -1);
+}
+
+std::string event(const Event& event, const std::string& boot) {
+    Json object = eventObject(event);
+    object["boot"] = boot;
     return document(object, -1);
 }
 

@@ -27,8 +27,11 @@ std::string node(const IC::MutableNode& node, const std::vector<Reading>& readin
 /// {"id", "path", "property": {"id", "name", "old", "new"}}, both as in a node.
 std::string change(const IC::MutableNode& node, const Reading& before, const Reading& after);
 /// One line: {"time", "event", "path", ...}; with "number" when the agent has given one, "property":
-/// {"id", "name", "before", "after"} when the event is about one, and "caller" when somebody has written it.
+/// {"id", "name", "before", "after"} when the event is about one, and "caller", "wanted" and "verdict" when
+/// somebody has written it.
 std::string event(const Event& event);
+/// The same with the "boot" in which it happened.
+std::string event(const Event& event, const std::string& boot);
 /// [{"class", "type", "id", "name", "kind", "unit", "readable", "writable", "values", "accepts", "meaning"}];
 /// of a plug-in that brings its own catalogue also "source" and "trusted"
 std::string catalogue(const std::vector<const Property*>& rows);

@@ -4,6 +4,7 @@
 #include <string>
 #include <vector>
 
+#include "agent/cli/caller.h"
 #include "agent/cli/command_line.h"
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/print.h"
@@ -19,7 +20,7 @@ using cvagent::Options;
 using Question = ExitStatus (*)(cvagent::Session& session, const Options& options);
 
 /// What needs an agent, in the order of Command; null for what does not.
-constexpr std::array<Question, 6> kQuestions = {cvagent::commands::tree, cvagent::commands::get,
+constexpr std::array<Question, 7> kQuestions = {cvagent::commands::tree, cvagent::commands::get,
                                                 cvagent::commands::set, cvagent::commands::watch};
 
 ExitStatus run(Options& options, cvagent::WantMessages& wants) {
@@ -35,8 +36,9 @@ ExitStatus run(Options& options, cvagent::WantMessages& wants) {
         files.push_back(&plugin);
     }
     cvagent::prepareSurroundings(files);
-    return options.command == Command::doctor ? cvagent::commands::doctor(options)
-                                              : cvagent::commands::properties(options);
+    return options.command == Command::doctor    ? cvagent::commands::doctor(options)
+           : options.command == Command::history ? cvagent::commands::history(options)
+                                                 : cvagent::commands::properties(options);
 }
 
 ExitStatus endWith(const cvagent::Failure& failure) {
@@ -48,7 +50,8 @@ ExitStatus endWith(const cvagent::Failure& failure) {
 
 ExitStatus runGuarded(Options& options, cvagent::WantMessages& wants) {
     try {
-        cvagent::Style::detect();  // before the locale goes
+        cvagent::Style::detect();   // before the locale goes
+        cvagent::rememberCaller();  // before the environment goes
         return run(options, wants);
     } catch (const cvagent::Failure& failure) {
         return endWith(failure);
@@ -67,7 +70,8 @@ ExitStatus runGuarded(Options& options, cvagent::WantMessages& wants) {
 ExitStatus runAndJudge(Options& options) {
     cvagent::WantMessages wants;
     const ExitStatus status = runGuarded(options, wants);
-    const bool wanting = options.command != Command::properties && wants.tell();
+    const bool ofHost = options.command != Command::properties && options.command != Command::history;
+    const bool wanting = ofHost && wants.tell();
     const bool good = status == ExitStatus::done || status == ExitStatus::notFound;
     return wanting && good ? ExitStatus::failed : status;
 }

@@ -8,7 +8,7 @@
 
 namespace cvagent {
 
-enum class Command { tree, get, set, watch, properties, doctor };
+enum class Command { tree, get, set, watch, properties, doctor, history };
 
 /// What the command line asks for.
 struct Options {
@@ -35,6 +35,13 @@ struct Options {
     std::string property;
     std::vector<std::string> values;
     std::string nodeClass;
+    // of the history
+    std::string since;  ///< as moment.h reads it; "" for the beginning
+    std::string until;  ///< the same; "" for the end
+    std::vector<std::string> kinds;
+    std::optional<unsigned long long> limit;  ///< only the last ones
+    std::optional<double> keepDays;           ///< from now on, in place of printing
+    std::optional<double> keepMegabytes;
 };
 
 }  // namespace cvagent

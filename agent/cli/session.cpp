@@ -4,6 +4,7 @@
 #include <mutex>
 
 #include "agent/cli/event_printer.h"
+#include "agent/cli/kept_events.h"
 #include "agent/core/catalogue_file.h"
 #include "agent/core/node_classes.h"
 #include "agent/core/plugin_files.h"
@@ -124,6 +125,7 @@ Session::Session(const PreparedProcess& process, const Options& options, WantMes
     settings.commandTime = std::chrono::duration<double>(options.commandSeconds);
     settings.processors = options.processors;
     settings.tell = complain;
+    settings.keeper = eventKeeper();
     settings.alertTold = [alerts = alerts_](const Event& alert) { alerts->tell(alert); };
     hint(limitsOfUser(process.data()), "\nTo see everything run: sudo cvagent");
     hint(limitsOfData(process.data()));

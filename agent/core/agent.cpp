@@ -8,6 +8,7 @@
 #include "agent/core/announcer.h"
 #include "agent/core/catalogue_file.h"
 #include "agent/core/command_deadline.h"
+#include "agent/core/event_keeping.h"
 #include "agent/core/oshw/stored_facts.h"
 #include "agent/core/text.h"
 #include "agent/core/tree.h"
@@ -37,12 +38,14 @@ struct Agent::Engine {
     void startAll(std::vector<Beginner>& beginners, bool processors);
     void refresh();
     bool lists(const Handle& node) const;
+    Listener& listenerOf(const std::shared_ptr<EventKeeper>& keeper);
 
     std::shared_ptr<DataDirectory> data;
     Tell tell;
     std::shared_ptr<LogOutput> log;
     CommandDeadline deadline;
     EventLog events;
+    std::optional<EventKeeping> keeping;  // in front of the log, where somebody keeps events
     Facts facts;
     Announcer announcer;
     std::vector<std::unique_ptr<Plugin>> plugins;
@@ -59,7 +62,8 @@ Agent::Engine::Engine(const AgentSettings& settings)
       log(settings.log ? settings.log
                        : std::make_shared<LogOutput>(LogSettings(), std::make_shared<ErrorLines>())),
       deadline(settings.commandTime, settings.tell),
-      announcer(events, facts, settings.alertTold) {
+      events(EventLog::kMost, settings.lastEvent),
+      announcer(listenerOf(settings.keeper), facts, settings.alertTold) {
     if (!data) {
         throw std::invalid_argument("an agent needs a data directory");
     }
@@ -78,6 +82,13 @@ Agent::Engine::Engine(const AgentSettings& settings)
     if (plugins.empty() && !failed.empty()) {
         throw Problem(failed.front().problem);
     }
+}
+
+Listener& Agent::Engine::listenerOf(const std::shared_ptr<EventKeeper>& keeper) {
+    if (!keeper) {
+        return events;
+    }
+    return keeping.emplace(events, keeper);
 }
 
 void Agent::Engine::load(Beginner& beginner) {
@@ -260,6 +271,10 @@ void Agent::setStatus(const NodeRef& node, unsigned int status) const {
 WriteResult Agent::write(const NodeRef& node, const Property& row, const IC::PropertyValue& value,
                          const Request& request) const {
     return engine_->writer.write(node.node_, row, value, request);
+}
+
+void Agent::announce(const Event& event) const {
+    engine_->announcer.hear(event);
 }
 
 std::shared_ptr<Subscription> Agent::subscribe(std::uint64_t after, std::optional<Event::Kind> only) const {

@@ -6,6 +6,7 @@
 #include <string>
 #include <vector>
 
+#include "agent/core/event_keeper.h"
 #include "agent/core/event_log.h"
 #include "agent/core/log_output.h"
 #include "agent/core/node_ref.h"
@@ -35,6 +36,12 @@ struct AgentSettings {
     /// Hears each alert before the plug-in takes it for told, on the plug-in's thread: what nobody has heard
     /// when the process is ended is told by the next agent. Null: subscriptions alone hear of alerts.
     std::function<void(const Event&)> alertTold;
+    /// Gives the events their numbers and keeps them, before anybody hears of them. Null: they are numbered
+    /// and kept by the agent alone.
+    std::shared_ptr<EventKeeper> keeper;
+    /// Number of the last event that was told before; the agent's begin behind it where no keeper gives
+    /// others.
+    std::uint64_t lastEvent = 0;
 };
 
 /// Plug-ins at work: the one agent behind every front end. It owns data directory, log, deadline of commands,
@@ -95,6 +102,8 @@ public:
     void withdraw(const std::vector<NodeRef>& nodes, const Request& request) const;
     void setStatus(const NodeRef& node, unsigned int status) const;
 
+    /// A front end has found out by itself that something has changed.
+    void announce(const Event& event) const;
     /// See EventLog. A subscription outlives the agent: the last events come while the plug-ins stop.
     std::shared_ptr<Subscription> subscribe(std::uint64_t after, std::optional<Event::Kind> only = {}) const;
 

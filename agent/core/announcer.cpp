@@ -25,6 +25,7 @@ void Announcer::hear(const Event& event) {
             tellAlert(event);
             break;
         case Event::Kind::written:
+        case Event::Kind::changed:
             events_.hear(event);
             break;
     }
@@ -85,16 +86,18 @@ void Announcer::announceNew(const IC::ManagementInterface& interface) {
     }
 }
 
-void Announcer::announceWrite(const IC::MutableNode& node, const Reading& before, const Reading& after,
-                              const std::string& caller) {
+void Announcer::announceWrite(const IC::MutableNode& node, const Write& write) {
     Event event = nodeEvent(Event::Kind::written, node);
-    event.property = after.id;
-    event.propertyName = after.name();
-    event.before = stateText(before);
-    event.after = stateText(after);
-    event.caller = caller;
+    event.property = write.after.id;
+    event.propertyName = write.after.name();
+    event.before = stateText(write.before);
+    event.after = stateText(write.after);
+    event.caller = write.caller;
+    event.wanted = write.wanted;
+    event.verdict = write.verdict;
     const std::lock_guard lock(guard_);
-    if (const auto told = told_.find({event.nodeId, event.property}); told != told_.end()) {
+    const auto told = told_.find({event.nodeId, event.property});
+    if (told != told_.end() && !write.refused) {
         told->second = event.after;
     }
     events_.hear(event);

@@ -7,7 +7,7 @@
 #include <string>
 #include <utility>
 
-#include "agent/core/event_log.h"
+#include "agent/core/event.h"
 #include "agent/core/facts.h"
 #include "framework/ic/management_interface.h"
 
@@ -19,9 +19,10 @@ namespace cvagent {
 class Announcer : public Listener {
 public:
     /// Both outlive it.
+    /// @param events where they go; an event is known to be told when hear() has returned
     /// @param alertTold hears each alert on the thread that brings it, before the plug-in goes on; null:
     /// nobody
-    Announcer(EventLog& events, Facts& facts, std::function<void(const Event&)> alertTold = nullptr)
+    Announcer(Listener& events, Facts& facts, std::function<void(const Event&)> alertTold = nullptr)
         : events_(events), facts_(facts), alertTold_(std::move(alertTold)) {}
 
     void hear(const Event& event) override;
@@ -29,8 +30,16 @@ public:
     void takeStock(const IC::ManagementInterface& interface);
     /// Nodes that have appeared without the plug-in's telling are told. A write can make some.
     void announceNew(const IC::ManagementInterface& interface);
-    void announceWrite(const IC::MutableNode& node, const Reading& before, const Reading& after,
-                       const std::string& caller);
+    /// What a write came to; the texts are those of its event.
+    struct Write {
+        const Reading& before;
+        const Reading& after;
+        std::string caller;
+        std::string wanted;
+        std::string verdict;
+        bool refused;  ///< by the plug-in: the host is as it was told last
+    };
+    void announceWrite(const IC::MutableNode& node, const Write& write);
 
 private:
     using Key = std::pair<unsigned int, unsigned int>;  // node and property
@@ -39,7 +48,7 @@ private:
     void tellWithdrawn(const Event& event);
     void tellAlert(Event event);
 
-    EventLog& events_;
+    Listener& events_;
     Facts& facts_;
     const std::function<void(const Event&)> alertTold_;
     std::mutex guard_;  // guards everything below, and that events are told in the order of states

@@ -5,14 +5,12 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <cerrno>
 #include <cstdlib>
-#include <deque>
 #include <filesystem>
 #include <system_error>
 
-#include "agent/core/owners.h"
+#include "agent/core/own_directory.h"
 #include "agent/core/problem.h"
 #include "agent/core/text.h"
 #include "framework/qx/corvista_utilities.h"
@@ -29,103 +27,6 @@ constexpr const char* kLockFile = ".lock";
 [[noreturn]] void failWith(int error) {
     throw std::system_error(error, std::generic_category());
 }
-
-/// The way from the root of the file system to a directory. It is walked name by name, so that nothing is
-/// made or trusted behind a place where somebody else could put something of his own.
-class Way {
-public:
-    /// @param role what a refusal is about
-    Way(const std::string& path, const HeldDirectory::Role& role)
-        : role_(role), whole_(path), left_(names(path)) {}
-
-    /// Makes what is missing. @return the path without symbolic links
-    std::string walk() {
-        while (!left_.empty()) {
-            const std::string name = left_.front();
-            left_.pop_front();
-            if (name == "..") {
-                reached_.erase(std::min(reached_.rfind('/'), reached_.size()));
-            } else {
-                step(reached_ + "/" + name);
-            }
-        }
-        judge(reached_.empty() ? "/" : reached_, look(reached_ + "/"), true);
-        return reached_ + "/";
-    }
-
-private:
-    static std::deque<std::string> names(const std::string& path) {
-        std::deque<std::string> all;
-        for (const fs::path& name : fs::path(path).relative_path()) {
-            if (!name.empty() && name != ".") {
-                all.push_back(name);
-            }
-        }
-        return all;
-    }
-
-    static struct stat look(const std::string& place) {
-        struct stat found {};
-        if (lstat(place.c_str(), &found) != 0) {
-            failWith(errno);
-        }
-        return found;
-    }
-    void step(const std::string& next) {
-        struct stat found {};
-        if (lstat(next.c_str(), &found) != 0) {
-            make(next, errno);
-            found = look(next);
-        }
-        judge(next, found, false);
-        if (S_ISLNK(found.st_mode)) {
-            follow(next);
-        } else {
-            reached_ = next;
-        }
-    }
-    void make(const std::string& next, int error) const {
-        const mode_t mode = left_.empty() ? 0700 : 0755;
-        if (error != ENOENT) {
-            failWith(error);
-        }
-        if (mkdir(next.c_str(), mode) != 0 && errno != EEXIST) {
-            failWith(errno);
-        }
-    }
-    void judge(const std::string& place, const struct stat& found, bool isGoal) const {
-        if (isGoal ? found.st_uid != geteuid() : isSomebodyElses(found)) {
-            refuse(place, "belongs to somebody else (user " + std::to_string(found.st_uid) + ")");
-        }
-        if (othersCanReplace(place, found, isGoal, Writers::groupsToo)) {
-            refuse(place, "can be written by others");
-        }
-    }
-    void follow(const std::string& link) {
-        constexpr int kMostLinks = 40;
-        if (++links_ > kMostLinks) {
-            failWith(ELOOP);
-        }
-        const fs::path target = fs::read_symlink(link);
-        const std::deque<std::string> more = names(target);
-        left_.insert(left_.begin(), more.begin(), more.end());
-        if (target.is_absolute()) {
-            reached_.clear();
-        }
-    }
-    [[noreturn]] void refuse(const std::string& place, const std::string& reason) const {
-        throw Problem(
-            Problem::failed,
-            "the data directory " + inQuotes(whole_) + " is not safe: " + inQuotes(place) + " " + reason,
-            role_.subject, role_.reason);
-    }
-
-    const HeldDirectory::Role& role_;
-    std::string whole_;
-    std::deque<std::string> left_;
-    std::string reached_;  // without a slash at its end; the root is empty
-    int links_ = 0;
-};
 
 /// @return a descriptor; -1 where there is no lock file and none can be made, for nothing can be written
 int openLock(const std::string& path) {
@@ -148,16 +49,6 @@ std::string standardDirectory() {
     return path != nullptr ? path : "";
 }
 
-/// Where a user who may not write to the standard place keeps the data; "" when there is no home.
-std::string userDirectory() {
-    const char* state = std::getenv("XDG_STATE_HOME");
-    const char* home = std::getenv("HOME");
-    if (state != nullptr && *state == '/') {
-        return std::string(state) + "/corvista/data/";
-    }
-    return home != nullptr && *home == '/' ? std::string(home) + "/.local/state/corvista/data/" : "";
-}
-
 /// What every agent of this user holds, for the plug-in's files have the same names in all of them.
 std::string fixedDirectory() {
     struct stat found {};
@@ -167,14 +58,23 @@ std::string fixedDirectory() {
 
 }  // namespace
 
-HeldDirectory::HeldDirectory(const std::string& path, const Role& role)
-    : path_(Way(path, role).walk()), lock_(openLock(path_ + kLockFile)) {
+std::string userDirectory() {
+    const char* state = std::getenv("XDG_STATE_HOME");
+    const char* home = std::getenv("HOME");
+    if (state != nullptr && *state == '/') {
+        return std::string(state) + "/corvista/data/";
+    }
+    return home != nullptr && *home == '/' ? std::string(home) + "/.local/state/corvista/data/" : "";
+}
+
+HeldDirectory::HeldDirectory(const std::string& path, const DirectoryRole& role)
+    : path_(ownDirectory(path, role)), lock_(openLock(path_ + kLockFile)) {
     if (lock_ >= 0) {
         hold(role);
     }
 }
 
-void HeldDirectory::hold(const Role& role) const {
+void HeldDirectory::hold(const DirectoryRole& role) const {
     struct stat found {};
     const bool isOurs = fstat(lock_, &found) == 0 && S_ISREG(found.st_mode) && found.st_uid == geteuid();
     if (isOurs && (found.st_mode & 077U) != 0) {
@@ -211,7 +111,7 @@ DataDirectory::DataDirectory() {
     // Root is held to the standard directory anyway, for the settings that are saved there.
     isStandard_ = chosen == nullptr && !isUsers;
     try {
-        own_.emplace(path, HeldDirectory::Role{isStandard_ ? Problem::dataFixed : Problem::dataOwn, ""});
+        own_.emplace(path, DirectoryRole{isStandard_ ? Problem::dataFixed : Problem::dataOwn, ""});
     } catch (const std::system_error& error) {
         throw Problem(Problem::failed,
                       "cannot use the data directory " + inQuotes(path) + ": " + error.code().message(),
@@ -235,7 +135,7 @@ void DataDirectory::holdSettings() {
     const std::string why = fixed == kSettings ? "; settings of interfaces are saved there whatever "
                                                : "; files in /tmp have the same names whatever ";
     try {
-        settings_.emplace(fixed, HeldDirectory::Role{Problem::dataFixed, why + kDataVariable + " is"});
+        settings_.emplace(fixed, DirectoryRole{Problem::dataFixed, why + kDataVariable + " is"});
     } catch (const std::system_error&) {
         // Where it cannot be made, no agent saves or removes settings.
     } catch (const Problem& problem) {

@@ -3,27 +3,24 @@
 #include <optional>
 #include <string>
 
-#include "agent/core/problem.h"
+#include "agent/core/own_directory.h"
 
 namespace cvagent {
 
 /// Names another data directory.
 inline constexpr const char* kDataVariable = "CORVISTA_DATA_DIR";
 
+/// Where a user who may not write to the standard place keeps the data; "" when there is no home.
+std::string userDirectory();
+
 /// A directory held by a lock file in it that only its owner can open. The directory belongs to the caller,
 /// the way to it to the caller or to root, and nobody else can write there (see owners.h); what is missing is
 /// made, the last directory with mode 0700. Where nothing can be written (EROFS) there is nothing to hold.
 class HeldDirectory {
 public:
-    /// What the directory is to the agent: the subject of a Problem with it, and why it is used.
-    struct Role {
-        Problem::Subject subject;
-        std::string reason;
-    };
-
     /// Throws Problem when somebody else could change the directory and, as `busy`, when another agent holds
     /// it; std::system_error when it cannot be made or opened.
-    HeldDirectory(const std::string& path, const Role& role);
+    HeldDirectory(const std::string& path, const DirectoryRole& role);
     HeldDirectory(const HeldDirectory&) = delete;
     HeldDirectory& operator=(const HeldDirectory&) = delete;
     ~HeldDirectory();
@@ -32,7 +29,7 @@ public:
     const std::string& path() const { return path_; }
 
 private:
-    void hold(const Role& role) const;
+    void hold(const DirectoryRole& role) const;
 
     std::string path_;
     int lock_;

@@ -28,7 +28,7 @@ void tellState(Event& event, const IC::MutableNode& node) {
 }  // namespace
 
 const char* eventName(Event::Kind kind) {
-    static constexpr std::array kNames = {"published", "withdrawn", "alert", "written"};
+    static constexpr std::array kNames = {"published", "withdrawn", "alert", "written", "changed"};
     return kNames.at(static_cast<std::size_t>(kind));
 }
 

@@ -16,8 +16,9 @@ namespace {
 
 std::size_t bytesOf(const Event& event) {
     std::size_t bytes = sizeof(Event);
-    for (const std::string* text : {&event.nodeClass, &event.path, &event.message, &event.propertyName,
-                                    &event.before, &event.after, &event.caller}) {
+    for (const std::string* text :
+         {&event.nodeClass, &event.path, &event.message, &event.propertyName, &event.before, &event.after,
+          &event.caller, &event.wanted, &event.verdict}) {
         bytes += text->size();
     }
     return bytes;
@@ -87,7 +88,10 @@ void Subscription::wake() const {
 void EventLog::hear(const Event& event) {
     const std::lock_guard lock(guard_);
     Event numbered = event;
-    numbered.number = ++last_;
+    if (numbered.number == 0) {
+        numbered.number = last_ + 1;
+    }
+    last_ = std::max(last_, numbered.number);
     for (const auto& subscriber : subscribers_) {
         if (const auto listening = subscriber.lock()) {
             listening->put(numbered);
@@ -96,15 +100,15 @@ void EventLog::hear(const Event& event) {
     kept_.add(std::move(numbered));
     while (kept_.isTooLong()) {
         const Event oldest = kept_.dropOldest();
-        Gone& gone = gone_.at(placeOf(oldest.kind));
-        gone = {gone.count + 1, oldest.number};
+        for (Gone* gone : {&gone_.at(placeOf(oldest.kind)), &allGone_}) {
+            *gone = {gone->count + 1, std::max(gone->last, oldest.number)};
+        }
     }
 }
 
-/// How many of a kind are lost to who wants those after a number; at most, where that number is lost itself.
-std::uint64_t EventLog::missingOf(Event::Kind kind, std::uint64_t after) const {
-    const Gone& gone = gone_.at(placeOf(kind));
-    return gone.last > after ? std::min(gone.count, gone.last - after) : 0;
+/// How many of these are lost to who wants those after a number; at most, where that number is lost itself.
+std::uint64_t EventLog::Gone::since(std::uint64_t after) const {
+    return last > after ? std::min(count, last - after) : 0;
 }
 
 std::shared_ptr<Subscription> EventLog::subscribe(std::uint64_t after, std::size_t most,
@@ -112,8 +116,7 @@ std::shared_ptr<Subscription> EventLog::subscribe(std::uint64_t after, std::size
     auto subscription = std::make_shared<Subscription>(most, only);
     const std::lock_guard lock(guard_);
     const std::deque<Event>& kept = kept_.events();
-    const std::uint64_t gone = last_ - kept.size();  // the last one that is kept no more
-    subscription->dropped_ = only ? missingOf(*only, after) : gone - std::min(gone, after);
+    subscription->dropped_ = (only ? gone_.at(placeOf(*only)) : allGone_).since(after);
     for (const Event& event : kept) {
         if (event.number > after) {
             subscription->put(event);

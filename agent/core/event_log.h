@@ -38,8 +38,9 @@ public:
     struct Taken {
         std::deque<Event> events;
         /// Events that he would have got and that are lost, since the last call; older than those that are
-        /// here. Exact, but for a subscription to one kind that began at a number which the log keeps no
-        /// more: then some of them may have been before that number.
+        /// here. Exact, but for a subscription that began at a number which the log keeps no more and that
+        /// is one to one kind, or where the numbers have gaps: then some of them may have been before that
+        /// number.
         std::uint64_t dropped = 0;
     };
 
@@ -70,13 +71,16 @@ private:
 };
 
 /// Numbers events, keeps the last of them and hands them to subscribers. Nobody who does not take his events
-/// holds up the others or the plug-in. Any thread.
+/// holds up the others or the plug-in. One that has its number already keeps it: it may be an earlier one, of
+/// an event that is told once more. Any thread.
 class EventLog : public Listener {
 public:
     static constexpr std::size_t kMost = 4096;  ///< a thousand nodes that come, go and change
 
     /// @param most how many past events are kept
-    explicit EventLog(std::size_t most = kMost) : kept_(most) {}
+    /// @param last number of the last event that was told before; it and those before are kept no more
+    explicit EventLog(std::size_t most = kMost, std::uint64_t last = 0)
+        : last_(last), kept_(most), allGone_{last, last} {}
 
     void hear(const Event& event) override;
     /// A queue of the events after a number, those that have happened included; 0 asks for all that are kept.
@@ -84,18 +88,19 @@ public:
                                             std::optional<Event::Kind> only = std::nullopt);
 
 private:
-    /// Events of one kind that are kept no more.
+    /// Events that are kept no more.
     struct Gone {
         std::uint64_t count = 0;
         std::uint64_t last = 0;  ///< number of the last one
+
+        std::uint64_t since(std::uint64_t after) const;
     };
 
-    std::uint64_t missingOf(Event::Kind kind, std::uint64_t after) const;
-
     std::mutex guard_;  // guards everything below
-    std::uint64_t last_ = 0;
+    std::uint64_t last_;
     EventQueue kept_;
-    std::array<Gone, kEventKinds> gone_;  // by kind
+    std::array<Gone, kEventKinds> gone_;  // by kind, of those that were told here
+    Gone allGone_;
     std::vector<std::weak_ptr<Subscription>> subscribers_;
 };
 

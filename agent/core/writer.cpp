@@ -1,5 +1,7 @@
 #include "agent/core/writer.h"
 
+#include <array>
+
 #include "agent/core/command_deadline.h"
 
 namespace cvagent {
@@ -48,6 +50,24 @@ std::string lackingEffect(const IC::MutableNode& node, const Property& row, cons
                           const Reading& after) {
     const Effect* effect = findEffect(row);
     return effect == nullptr ? "" : effect->lacking({node, written, after.failed() ? nullptr : &after.value});
+}
+
+/// Why nothing is known of the property after its write, when it was not read.
+const char* afterUnread(const WriteResult& result, bool refused) {
+    return refused ? "not asked" : result.problem ? "cut off" : "can only be written";
+}
+
+/// The write's verdict as its event has it.
+std::string verdictOf(const WriteResult& result, bool refused) {
+    if (result.problem) {
+        return (refused ? "failed: " : "unknown: ") + std::string(result.problem->what());
+    }
+    if (!result.lacking.empty()) {
+        return "differs: " + result.lacking;
+    }
+    static constexpr std::array kWords = {"applied", "differs", "unknown"};
+    return std::string(kWords.at(result.outcome)) +
+           (result.complained ? ": the plug-in reported errors" : "");
 }
 
 }  // namespace
@@ -182,17 +202,16 @@ WriteResult Writer::perform(const Job& job, const Request& request) {
     result.problem = setGuarded(*job.node, row, job.value);
     result.complained = request.errors().count() > errorsBefore;
     tree_.refresh();
-    if (result.problem && result.problem->kind() == Problem::failed) {
-        result.after = {row.id, &row, {}, "not asked"};
-        return result;
-    }
-    result.after = {row.id, &row, {}, result.problem ? "cut off" : "can only be written"};
+    const bool refused = result.problem && result.problem->kind() == Problem::failed;
+    result.after = {row.id, &row, {}, afterUnread(result, refused)};
     if (!result.problem && row.readable) {
         result.after = facts_.ask(*job.node, row.id);
         result.outcome = compare(row, job.value, result.after);
         result.lacking = lackingEffect(*job.node, row, job.value, result.after);
     }
-    announcer_.announceWrite(*job.node, result.before, result.after, request.caller());
+    announcer_.announceWrite(
+        *job.node, {result.before, result.after, request.caller(), static_cast<std::string>(job.value),
+                    verdictOf(result, refused), refused});
     return result;
 }
 

@@ -94,7 +94,7 @@ void Changes::flush() {
 
 void Changes::tellEvents() {
     for (const Event& event : std::exchange(events_, {})) {
-        const bus::Message signal = connection_.signal(kRootObject, kAgentInterface, "Event");
+        const bus::Message signal = connection_.newSignal(kRootObject, kAgentInterface, "Event");
         bus::Writer writer(signal);
         putEvent(writer, event);
         connection_.send(signal);
@@ -103,7 +103,7 @@ void Changes::tellEvents() {
 
 void Changes::tellAdded(const NodeView& node) const {
     const bus::Message signal =
-        connection_.signal(kRootObject, "org.freedesktop.DBus.ObjectManager", "InterfacesAdded");
+        connection_.newSignal(kRootObject, "org.freedesktop.DBus.ObjectManager", "InterfacesAdded");
     bus::Writer writer(signal);
     writer.putPath(node.object);
     putInterfaces(writer, *model_, node, false);
@@ -112,7 +112,7 @@ void Changes::tellAdded(const NodeView& node) const {
 
 void Changes::tellRemoved(const Gone& gone) const {
     const bus::Message signal =
-        connection_.signal(kRootObject, "org.freedesktop.DBus.ObjectManager", "InterfacesRemoved");
+        connection_.newSignal(kRootObject, "org.freedesktop.DBus.ObjectManager", "InterfacesRemoved");
     bus::Writer writer(signal);
     writer.putPath(gone.object).put(std::vector<std::string>{kNodeInterface, gone.interface});
     connection_.send(signal);
@@ -120,7 +120,7 @@ void Changes::tellRemoved(const Gone& gone) const {
 
 void Changes::tellChanged(const NodeView& node, const Changed& changed) const {
     const auto signalOf = [&] {
-        return connection_.signal(node.object, "org.freedesktop.DBus.Properties", "PropertiesChanged");
+        return connection_.newSignal(node.object, "org.freedesktop.DBus.Properties", "PropertiesChanged");
     };
     if (!changed.node.empty()) {
         const bus::Message signal = signalOf();

@@ -74,7 +74,7 @@ void Consent::askPolkit(const Caller& caller, const Question& question, Decided 
         decided(false, "polkit has not decided about earlier calls yet");
         return;
     }
-    const bus::Message call = connection_.call({kPolkit, "/org/freedesktop/PolicyKit1/Authority",
+    const bus::Message call = connection_.newCall({kPolkit, "/org/freedesktop/PolicyKit1/Authority",
                                                 "org.freedesktop.PolicyKit1.Authority", "CheckAuthorization"});
     bus::Writer writer(call);
     writer.structure("sa{sv}", [&] {
@@ -125,9 +125,9 @@ void Consent::polkitAnswered(const Caller& caller, const bus::Message& answer, c
 }
 
 void Consent::lookForPolkit() {
-    const bus::Message call = connection_.call(
+    const bus::Message call = connection_.newCall(
         {"org.freedesktop.DBus", "/org/freedesktop/DBus", "org.freedesktop.DBus", "ListActivatableNames"});
-    const bus::Message owner = connection_.call(
+    const bus::Message owner = connection_.newCall(
         {"org.freedesktop.DBus", "/org/freedesktop/DBus", "org.freedesktop.DBus", "NameHasOwner"});
     bus::Writer(owner).put(kPolkit);
     look_ = connection_.askLater(owner, kPolkitTime, [this, call](const bus::Message& answer) {

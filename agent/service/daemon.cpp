@@ -20,6 +20,7 @@ namespace {
 /// A write that was begun has this long before a stop cuts it off; shorter than a manager waits.
 constexpr std::chrono::seconds kWriteAtStop{60};
 constexpr std::chrono::milliseconds kLookForWrites{50};
+constexpr std::chrono::seconds kLookForErrors{10};
 
 void findPlugins(Options& options) {
     if (options.plugins.empty()) {
@@ -42,8 +43,7 @@ ProcessSettings processSettings(Options& options) {
             settings.files.push_back(&file);
         }
     }
-    settings.log.shown = true;  // as they come, into the journal
-    settings.log.advises = true;
+    settings.log.advice = "; rename what has that name: letters, digits, dots, dashes and underscores are fine";
     settings.commands = options.commands;
     settings.hostTools = options.hostTools;
     return settings;
@@ -66,11 +66,21 @@ AgentSettings agentSettings(const PreparedProcess& process, const Options& optio
     return settings;
 }
 
+void showErrors(ErrorLines& errors) {
+    const ErrorLines::Taken taken = errors.take();
+    for (const std::string& text : taken.texts) {
+        log(Priority::warning, "a plug-in reports: " + text);
+    }
+    if (taken.lost > 0) {
+        log(Priority::warning, "a plug-in reports: and " + std::to_string(taken.lost) + " more");
+    }
+}
+
 /// The service at work, until something ends it.
 class Daemon {
 public:
-    Daemon(const Options& options, const Manager& manager, bus::Connection& connection)
-        : options_(options), manager_(manager), connection_(connection) {}
+    Daemon(const Options& options, const Manager& manager, bus::Connection& connection, ErrorLines& errors)
+        : options_(options), manager_(manager), connection_(connection), errors_(errors) {}
 
     void run(Agent& agent, const Config& config) {
         Service service(loop_, connection_, agent, config);
@@ -83,13 +93,14 @@ public:
         manager_.status(state);
         manager_.ready();
         feedWatchdog();
+        tellErrors();
         watchBus();
         loop_.run();
         sd_bus_detach_event(connection_.get());
         connection_.flush();
     }
     bool busLost() const { return busLost_; }
-    int signal() const { return signal_; }
+    int endedBy() const { return signal_; }
     void giveSignalsBack() { stop_.release(); }
 
 private:
@@ -136,6 +147,12 @@ private:
         }
     }
 
+    /// What the plug-ins' own threads report.
+    void tellErrors() {
+        showErrors(errors_);
+        errorsDue_ = loop_.after(kLookForErrors, [this] { tellErrors(); });
+    }
+
     void watchBus() {
         lost_ = connection_.match(
             "type='signal',sender='org.freedesktop.DBus.Local',path='/org/freedesktop/DBus/Local',"
@@ -149,12 +166,14 @@ private:
     const Options& options_;
     const Manager& manager_;
     bus::Connection& connection_;
+    ErrorLines& errors_;
     Loop loop_;
     StopRequest stop_;
     Service* service_ = nullptr;
     Loop::Source signals_;
     Loop::Source watchdog_;
     Loop::Source writes_;
+    Loop::Source errorsDue_;
     bus::Slot lost_;
     int signal_ = 0;
     bool busLost_ = false;
@@ -173,7 +192,7 @@ ExitStatus serve(Options& options, const Manager& manager, bus::Connection& conn
         return ExitStatus::usage;
     }
     const OrderlyEnd orderly;
-    Daemon daemon(options, manager, connection);
+    Daemon daemon(options, manager, connection, process.errors());
     {
         Agent agent(agentSettings(process, options, *config));
         for (const Agent::FailedPlugin& failed : agent.failedPlugins()) {
@@ -181,10 +200,11 @@ ExitStatus serve(Options& options, const Manager& manager, bus::Connection& conn
         }
         daemon.run(agent, *config);
         daemon.giveSignalsBack();
-        if (daemon.signal() != 0) {
-            raise(daemon.signal());  // from here on the end is a matter of a second
+        if (daemon.endedBy() != 0) {
+            raise(daemon.endedBy());  // from here on the end is a matter of a second
         }
     }
+    showErrors(process.errors());
     if (daemon.busLost()) {
         throw Problem(Problem::failed, "the bus is gone");
     }

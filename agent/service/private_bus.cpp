@@ -133,7 +133,7 @@ std::string PrivateBus::standardDirectory() {
 
 PrivateBus::PrivateBus(const std::string& directory) {
     try {
-        directory_.emplace(directory, HeldDirectory::Role{Problem::none, ""});
+        directory_.emplace(directory, DirectoryRole{Problem::none, ""});
     } catch (const std::system_error& error) {
         failToStart("the directory " + inQuotes(directory) + ": " + error.code().message());
     } catch (const Problem& problem) {

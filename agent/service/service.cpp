@@ -18,7 +18,7 @@ constexpr std::chrono::seconds kBusTime{10};
 
 bus::Message busCall(const bus::Connection& connection, const std::string& member) {
     const bus::Message call =
-        connection.call({"org.freedesktop.DBus", "/org/freedesktop/DBus", "org.freedesktop.DBus", member});
+        connection.newCall({"org.freedesktop.DBus", "/org/freedesktop/DBus", "org.freedesktop.DBus", member});
     bus::Writer(call).put(kBusName);
     return call;
 }

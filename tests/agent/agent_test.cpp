@@ -30,6 +30,7 @@ using testing::Each;
 using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::IsEmpty;
+using testing::StartsWith;
 
 constexpr const char* kHold = "/tmp/hold";
 
@@ -381,12 +382,18 @@ HOST_TEST(AgentWrites, TellWhatCameOfThem) {
     EXPECT_EQ(bad.problem->kind(), Problem::failed);
     EXPECT_EQ(bad.outcome, WriteResult::notKnown);
     const auto events = fake.agent->subscribe(0)->take().events;
-    ASSERT_EQ(events.size(), 1U);
+    ASSERT_EQ(events.size(), 2U);
     EXPECT_EQ(events[0].kind, Event::Kind::written);
     EXPECT_EQ(events[0].path, "/oshw/root/computer");
     EXPECT_EQ(events[0].propertyName, "OwnerContact");
     EXPECT_EQ(events[0].after, "room 5");
     EXPECT_EQ(events[0].caller, "test");
+    EXPECT_EQ(events[0].wanted, "room 5");
+    EXPECT_EQ(events[0].verdict, "applied: the plug-in reported errors");
+    EXPECT_EQ(events[1].kind, Event::Kind::written);
+    EXPECT_EQ(events[1].after, "");
+    EXPECT_EQ(events[1].wanted, "somebody");
+    EXPECT_THAT(events[1].verdict, StartsWith("failed: OwnerName was not changed: "));
 }
 
 HOST_TEST(AgentWrites, NodesThatAWriteMadeAppearAreTold) {

@@ -7,6 +7,7 @@ namespace cvagent {
 
 /// Makes references to nodes that no agent has.
 struct NodeRefOfTest {
+    static NodeRef of(Handle node) { return NodeRef(nullptr, std::move(node)); }
     static std::vector<NodeRef> all(const IC::ManagementInterface& list) {
         std::vector<NodeRef> nodes;
         for (const Handle& node : list.holdAll()) {

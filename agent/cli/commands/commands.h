@@ -17,5 +17,6 @@ ExitStatus verifyTree(Session& session, const Options& options);
 // These need no agent.
 ExitStatus properties(const Options& options);
 ExitStatus doctor(const Options& options);
+ExitStatus history(const Options& options);
 
 }  // namespace cvagent::commands

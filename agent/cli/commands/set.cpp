@@ -1,3 +1,4 @@
+#include "agent/cli/caller.h"
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/json.h"
 #include "agent/cli/print.h"
@@ -39,7 +40,7 @@ ExitStatus set(Session& session, const Options& options) {
     if (const Label* drastic = drasticLabel(row, value); drastic != nullptr && !options.yes) {
         confirm(drastic->text);
     }
-    const Request request = ownRequest();
+    const Request request(callerName());
     const WriteResult result = session.agent().write(node, row, value, request);
     session.showErrors(request);
     session.tellMissingTools({result.after});

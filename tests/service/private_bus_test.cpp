@@ -1,0 +1,51 @@
+// The bus of our own.
+#include <gmock/gmock.h>
+
+#include "agent/core/problem.h"
+#include "agent/service/private_bus.h"
+#include "tests/service/service_run.h"
+
+namespace {
+
+using cvagent::service::PrivateBus;
+using testing::HasSubstr;
+
+std::string problemWith(const std::string& directory) {
+    try {
+        const PrivateBus bus(directory);
+        return "";
+    } catch (const cvagent::Problem& problem) {
+        return problem.what();
+    }
+}
+
+HOST_TEST(PrivateBus, LiesInItsDirectoryAndGoesWithIt) {
+    host.realTool("dbus-daemon");
+    host.file("/etc/passwd", "root:x:0:0::/root:/bin/sh\n");
+    {
+        const PrivateBus own("/run/it's here");
+        EXPECT_EQ(own.address(), "unix:path=/run/it%27s%20here/bus");
+        const bus::Connection connection(own.address());
+        EXPECT_THAT(connection.uniqueName(), HasSubstr(":1."));
+        EXPECT_EQ(problemWith("/run/it's here"), "another cvagentd has a bus of its own in '/run/it's here'");
+    }
+    EXPECT_THAT(host.listDirectory("/run/it's here"), testing::ElementsAre(".lock"));
+    EXPECT_EQ(problemWith("/run/it's here"), "");
+}
+
+HOST_TEST(PrivateBus, DoesNotLieWhereOthersCanWrite) {
+    host.realTool("dbus-daemon");
+    host.directory("/srv/open", 0777);
+    EXPECT_THAT(problemWith("/srv/open"), HasSubstr("is not safe: '/srv/open' can be written by others"));
+    host.directory("/srv/theirs");
+    host.symlink("/srv/open/link", "/srv/theirs");
+    EXPECT_THAT(problemWith("/srv/open/link"), HasSubstr("is not safe"));
+    EXPECT_FALSE(host.exists("/srv/theirs/bus"));
+}
+
+HOST_TEST(PrivateBus, NeedsADaemon) {
+    EXPECT_EQ(problemWith("/run/x"),
+              "cannot start a bus of our own: there is no dbus-daemon (package dbus-daemon)");
+}
+
+}  // namespace

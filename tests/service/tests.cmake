@@ -1,0 +1,18 @@
+# The agent as a service, on a bus of its own in the fake host.
+if(CORVISTA_SERVICE)
+  corvista_test(service LIBRARIES agent_service agent_core agent_bus test_support SOURCES
+    service/bus_test.cpp
+    service/config_test.cpp
+    service/consent_test.cpp
+    service/interface_test.cpp
+    service/model_test.cpp
+    service/objects_test.cpp
+    service/private_bus_test.cpp
+    service/service_test.cpp
+    service/service_run.cpp
+    service/workers_test.cpp
+    service/write_test.cpp)
+  target_compile_definitions(service_test PRIVATE ${agent_test_programs} CVAGENTD_PROGRAM="$<TARGET_FILE:cvagentd>"
+    HARDWARE_FILE="$<TARGET_FILE:corvistahardware>" INTERFACE_FILE="${CMAKE_SOURCE_DIR}/packaging/com.vantrel.Corvista1.xml")
+  add_dependencies(service_test cvagent cvagentd fake_plugin corvistahardware tiny_front_end)
+endif()

@@ -1,0 +1,80 @@
+#include <gmock/gmock.h>
+
+#include <atomic>
+#include <mutex>
+
+#include "agent/service/workers.h"
+#include "tests/support/waiting.h"
+
+namespace {
+
+using cvagent::service::Workers;
+using testing::ElementsAre;
+
+TEST(ServiceWorkers, ServeEachUserInTurn) {
+    std::mutex hold;
+    std::atomic<bool> entered{false};
+    std::vector<int> done;
+    std::atomic<int> count{0};
+    Workers workers({1, 10, 20});
+    hold.lock();
+    ASSERT_TRUE(workers.submit(0, [&] {
+        entered = true;
+        const std::lock_guard lock(hold);
+    }));
+    ASSERT_TRUE(eventually([&] { return entered.load(); }));
+    for (const int job : {11, 12, 13, 21, 31, 14}) {
+        ASSERT_TRUE(workers.submit(static_cast<std::uint32_t>(job / 10), [&, job] {
+            done.push_back(job);
+            ++count;
+        }));
+    }
+    hold.unlock();
+    ASSERT_TRUE(eventually([&] { return count == 6; }));
+    EXPECT_THAT(done, ElementsAre(11, 21, 31, 12, 13, 14));
+}
+
+TEST(ServiceWorkers, RefuseWhatIsTooMuch) {
+    std::mutex hold;
+    hold.lock();
+    std::atomic<bool> entered{false};
+    Workers workers({1, 2, 3});
+    ASSERT_TRUE(workers.submit(7, [&] {
+        entered = true;
+        const std::lock_guard lock(hold);
+    }));
+    ASSERT_TRUE(eventually([&] { return entered.load(); }));
+    const auto nothing = [] {};
+    EXPECT_TRUE(workers.submit(7, nothing));
+    EXPECT_TRUE(workers.submit(7, nothing));
+    EXPECT_FALSE(workers.submit(7, nothing)) << "enough of this user's";
+    EXPECT_TRUE(workers.submit(8, nothing));
+    EXPECT_FALSE(workers.submit(9, nothing)) << "enough of all users'";
+    EXPECT_TRUE(workers.isBusy());
+    hold.unlock();
+    EXPECT_TRUE(eventually([&] { return !workers.isBusy(); }));
+    EXPECT_TRUE(workers.submit(9, nothing));
+}
+
+TEST(ServiceWorkers, DropAtTheirEndWhatHasNotBegun) {
+    std::atomic<int> done{0};
+    std::mutex hold;
+    hold.lock();
+    std::atomic<bool> entered{false};
+    {
+        Workers workers({1, 10, 10});
+        workers.submit(1, [&] {
+            entered = true;
+            const std::lock_guard lock(hold);
+            ++done;
+        });
+        ASSERT_TRUE(eventually([&] { return entered.load(); }));
+        workers.submit(1, [&] { done += 100; });
+        workers.stop();
+        EXPECT_FALSE(workers.submit(1, [] {}));
+        hold.unlock();
+    }
+    EXPECT_EQ(done, 1);
+}
+
+}  // namespace
