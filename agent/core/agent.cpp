@@ -149,6 +149,7 @@ NodesOfEach Agent::Engine::nodesOfEach() const {
 void Agent::Engine::refresh() {
     for (const auto& plugin : plugins) {
         setPaths(plugin->interface());
+        plugin->noteIds();
         announcer.announceNew(plugin->interface());
     }
 }
@@ -259,6 +260,18 @@ void Agent::withdraw(const std::vector<NodeRef>& nodes, const Request& request) 
         for (const NodeRef& node : nodes) {
             for (const auto& plugin : engine_->plugins) {
                 plugin->interface().deleteNode(node.node_.get());  // one that another one has fails
+            }
+        }
+    });
+}
+
+void Agent::restartPluginOf(const NodeRef& node, const Request& request) const {
+    engine_->writer.between(request, [&] {
+        for (const auto& plugin : engine_->plugins) {
+            if (plugin->interface().hold(node->getNodeId()).get() == node.node_.get()) {
+                const std::vector<Handle> before = plugin->interface().holdAll();
+                plugin->startAgain();
+                engine_->announcer.announceRestart(before, plugin->interface());
             }
         }
     });

@@ -100,6 +100,9 @@ public:
     bool lookForLinks(const Request& request) const;
     /// Takes nodes out of their plug-ins whose things are gone; told as events.
     void withdraw(const std::vector<NodeRef>& nodes, const Request& request) const;
+    /// Stops the plug-in of a node and starts it anew: what it finds at a start alone is found. Its nodes
+    /// have other ids then; told as events are those that come or go by their paths.
+    void restartPluginOf(const NodeRef& node, const Request& request) const;
     void setStatus(const NodeRef& node, unsigned int status) const;
 
     /// A front end has found out by itself that something has changed.

@@ -33,6 +33,11 @@ public:
     static std::unique_ptr<Plugin> loaded(const std::string& file, Listener* listener, Tell tell);
     /// At most once. Throws Problem; what is left then is good for nothing but its end.
     void start(bool processors);
+    /// Stops it and starts it anew, with ids of its nodes that none has had before; the former nodes live for
+    /// as long as somebody holds them. Throws Problem; it then has no nodes.
+    void startAgain();
+    /// Takes note of the ids that the plug-in has given away by now.
+    void noteIds();
     Plugin(const Plugin&) = delete;
     Plugin& operator=(const Plugin&) = delete;
     /// Unloads the plug-in and closes the library.
@@ -52,7 +57,7 @@ private:
     void load();
     void open();
     void takePlace();
-    void initialize(bool processors);
+    void initialize(bool processors, unsigned int firstNode);
     void checkIds() const;
     bool isOwnId(const IC::MutableNode& node) const;
     void stop();
@@ -65,6 +70,8 @@ private:
     IC::ManagementInterface* interface_ = nullptr;
     std::optional<RunningPlugin> running_;
     bool begun_ = false;  // there is something to stop
+    bool processors_ = false;
+    unsigned int lastId_ = 0;  // the highest that was given away; of the thread that has the turn to write
 };
 
 }  // namespace cvagent

@@ -46,6 +46,7 @@ ProcessSettings processSettings(Options& options) {
     settings.log.advice = "; rename what has that name: letters, digits, dots, dashes and underscores are fine";
     settings.commands = options.commands;
     settings.hostTools = options.hostTools;
+    settings.linksMayCome = true;
     return settings;
 }
 

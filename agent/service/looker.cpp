@@ -196,9 +196,11 @@ void Looker::keepTree(const Wanted& wanted, const Request& request) {
         return;
     }
     try {
-        keeper_.follow(*links_, request);
+        if (keeper_.follow(*links_, request)) {
+            met_.clear();
+        }
     } catch (const Problem& problem) {
-        log(Priority::info, std::string("new links are looked for later: ") + problem.what());
+        log(Priority::info, std::string("links are followed later: ") + problem.what());
     }
 }
 

@@ -86,6 +86,7 @@ void Model::replace(NodeView& known, NodeView view) {
     const bool moved = known.parent != view.parent;
     const bool described = known.description != view.description;
     const bool stated = known.status != view.status;
+    known.node = view.node;  // a plug-in that was started anew has another one
     known.parent = view.parent;
     known.status = view.status;
     known.description = std::move(view.description);

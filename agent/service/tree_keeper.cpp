@@ -14,6 +14,7 @@ constexpr std::chrono::seconds kForItsAlert{65};
 /// A node that was withdrawn lives on, and keeps its name, for as long as a read of it hangs.
 constexpr std::chrono::seconds kLongestLeave{30};
 constexpr std::chrono::milliseconds kRetry{100};
+constexpr std::chrono::milliseconds kShortestRest{1000};
 
 bool isOfType(const IC::MutableNode& node, std::initializer_list<NodeType> types) {
     return std::ranges::any_of(
@@ -76,36 +77,44 @@ std::vector<NodeRef> TreeKeeper::sort(const Named& named) {
     const auto now = Clock::now();
     std::vector<NodeRef> toWithdraw;
     std::map<std::uint32_t, Clock::time_point> hidden;
+    for (const NodeRef& node : agent_.nodes()) {
+        const std::uint32_t id = node->getNodeId();
+        const Judgement judgement = judge(node, nameOf(*node), named);
+        if (judgement == Judgement::present) {
+            continue;
+        }
+        const auto known = hidden_.find(id);
+        const auto until = judgement == Judgement::another ? now
+                           : known != hidden_.end()        ? known->second
+                           : isDrive(*node)
+                               ? Clock::time_point::max()  // the plug-in itself lets its drives go
+                               : now + kForItsAlert;
+        hidden.emplace(id, until);
+        if (until <= now) {
+            toWithdraw.push_back(node);
+        }
+    }
+    hidden_ = std::move(hidden);
+    return toWithdraw;
+}
+
+/// Which links and drives the nodes are of.
+void TreeKeeper::remember(const Named& named) {
     std::map<std::string, int> linkOf;
     std::set<std::uint32_t> drives;
     for (const NodeRef& node : agent_.nodes()) {
-        const std::uint32_t id = node->getNodeId();
         const std::string name = nameOf(*node);
-        const Judgement judgement = judge(node, name, named);
-        if (judgement != Judgement::present) {
-            // The plug-in itself lets its drives go.
-            const auto until = isDrive(*node) ? Clock::time_point::max() : now + kForItsAlert;
-            const auto known = hidden_.find(id);
-            hidden.emplace(id, judgement == Judgement::another ? now
-                               : known != hidden_.end()        ? known->second
-                                                               : until);
-        }
-        if (hidden.contains(id) && hidden[id] <= now) {
-            toWithdraw.push_back(node);
+        if (presentDrives_.contains(node->getNodeId())) {
+            drives.insert(node->getNodeId());
         }
         if (const auto link = named.find(name); isOfLink(*node) && link != named.end()) {
             linkOf[name] = link->second->first;
         } else if (const auto before = linkOf_.find(name); before != linkOf_.end()) {
             linkOf.insert(*before);
         }
-        if (presentDrives_.contains(id)) {
-            drives.insert(id);
-        }
     }
-    hidden_ = std::move(hidden);
     linkOf_ = std::move(linkOf);
     presentDrives_ = std::move(drives);
-    return toWithdraw;
 }
 
 /// The links that could have nodes and have none, without those that the plug-in has been asked for.
@@ -127,28 +136,66 @@ std::vector<const HostLinks::value_type*> TreeKeeper::unseen(const Named& named)
     return links;
 }
 
-void TreeKeeper::findNew(const Named& named, const Request& request) {
+/// Whether a bond has no team: the plug-in makes teams at its start alone.
+bool TreeKeeper::lacksTeam(const Named& named) const {
+    std::set<std::string> teams;
+    for (const NodeRef& node : shown()) {
+        if (isOfType(*node, {NodeType::team})) {
+            teams.insert(nameOf(*node));
+        }
+    }
+    std::error_code unknown;
+    return std::ranges::any_of(named, [&](const auto& entry) {
+        return entry.second->second.isBond && !teams.contains(entry.first) &&
+               std::filesystem::exists("/proc/net/bonding/" + entry.first, unknown);
+    });
+}
+
+/// A start costs a walk over everything, so it takes one part in ten of the time at most.
+bool TreeKeeper::restart(const Request& request) {
+    const auto begun = Clock::now();
+    const std::vector<NodeRef> nodes = agent_.nodes();
+    const auto own = std::ranges::find_if(
+        nodes, [](const NodeRef& node) { return isOfType(*node, {NodeType::networkController}); });
+    if (own == nodes.end()) {
+        return false;  // not that plug-in
+    }
+    if (begun < nextRestart_) {
+        retry_ = nextRestart_;
+        return false;
+    }
+    constexpr int kRest = 9;
+    agent_.restartPluginOf(*own, request);
+    const auto ended = Clock::now();
+    nextRestart_ = ended + std::max<Clock::duration>(kShortestRest, kRest * (ended - begun));
+    hidden_.clear();
+    presentDrives_.clear();
+    return true;
+}
+
+/// @return whether the plug-in was started anew
+bool TreeKeeper::findNew(const Named& named, const Request& request) {
     std::erase_if(offered_, [&named](const auto& entry) {
         const auto link = named.find(entry.second);
         return link == named.end() || link->second->first != entry.first ||
                !isOfferable(link->second->second);
     });
-    if (unseen(named).empty()) {
-        return;
-    }
-    agent_.lookForLinks(request);
+    const bool asked = unseen(named).empty() || agent_.lookForLinks(request);
+    retry_.reset();
+    const bool restarted = (!asked || lacksTeam(named)) && restart(request);
     const auto now = Clock::now();
     std::erase_if(leaving_, [now](const auto& entry) { return entry.second < now; });
     for (const HostLinks::value_type* link : unseen(named)) {
         if (leaving_.contains(link->second.name)) {
             retry_ = now + kRetry;  // its former node is still there for somebody
-        } else {
+        } else if (asked || restarted) {
             offered_[link->first] = link->second.name;
         }
     }
+    return restarted;
 }
 
-void TreeKeeper::follow(const HostLinks& links, const Request& request) {
+bool TreeKeeper::follow(const HostLinks& links, const Request& request) {
     Named named;
     for (const auto& link : links) {
         named.emplace(link.second.name, &link);
@@ -161,8 +208,9 @@ void TreeKeeper::follow(const HostLinks& links, const Request& request) {
             leaving_[nameOf(*node)] = Clock::now() + kLongestLeave;
         }
     }
-    retry_.reset();
-    findNew(named, request);
+    const bool restarted = findNew(named, request);
+    remember(named);
+    return restarted;
 }
 
 std::vector<NodeRef> TreeKeeper::shown() const {

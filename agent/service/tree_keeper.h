@@ -22,9 +22,10 @@ public:
     /// @param agent outlives it
     explicit TreeKeeper(Agent& agent) : agent_(agent) {}
 
-    /// Hides the nodes of what is gone and has new links found. Throws Problem (busy) when a write is at work
-    /// until the request's deadline; due() then says when to follow again.
-    void follow(const HostLinks& links, const Request& request);
+    /// Hides the nodes of what is gone and has new links found. Throws Problem (busy when a write is at work
+    /// until the request's deadline); due() then says when to follow again.
+    /// @return whether the plug-in was started anew for it, so that all of its nodes are other ones
+    bool follow(const HostLinks& links, const Request& request);
     /// The nodes of what there is.
     std::vector<NodeRef> shown() const;
     /// An alert has come of a node: if it was kept for that, it may go.
@@ -40,7 +41,10 @@ private:
     Judgement judgeLink(const NodeRef& node, const std::string& name, const Named& named) const;
     Judgement judgeDrive(const NodeRef& node, const std::string& name);
     std::vector<NodeRef> sort(const Named& named);
-    void findNew(const Named& named, const Request& request);
+    void remember(const Named& named);
+    bool findNew(const Named& named, const Request& request);
+    bool lacksTeam(const Named& named) const;
+    bool restart(const Request& request);
     std::vector<const HostLinks::value_type*> unseen(const Named& named) const;
 
     Agent& agent_;
@@ -51,6 +55,7 @@ private:
     std::map<std::string, Clock::time_point>
         leaving_;  // names of withdrawn nodes that somebody may still hold
     std::optional<Clock::time_point> retry_;
+    Clock::time_point nextRestart_;
 };
 
 /// The name in the last part of a node's path: "eth0" of "network-port:eth0".
