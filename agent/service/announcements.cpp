@@ -14,7 +14,7 @@ namespace cvagent::service {
 namespace {
 
 constexpr int kRoom = 4 << 20;  // of the socket, used only while much is announced at once
-constexpr int kAtOnce = 4096;   // messages, before others of the loop have their turn
+constexpr int kAtOnce = 65536;  // messages: more than there is room for
 constexpr time_t kDumpSeconds = 5;
 
 int opened(int protocol, std::uint32_t groups, int flags) {
@@ -82,11 +82,14 @@ Announcements::~Announcements() {
 bool Announcements::takeWaiting(const Take& take) const {
     static thread_local std::array<char, 65536> buffer;
     bool lost = false;
-    for (int count = 0; socket_ >= 0 && count < kAtOnce; ++count) {
+    for (int count = 0; socket_ >= 0; ++count) {
         std::string_view message;
         const Came came = receive(socket_, buffer, message);
         if (came == Came::nothing) {
             break;
+        }
+        if (count >= kAtOnce) {
+            return true;  // it comes faster than it can be taken
         }
         lost = lost || came == Came::lost;
         if (came == Came::message) {

@@ -1,6 +1,7 @@
 #include "agent/service/concerns.h"
 
 #include <algorithm>
+#include <iterator>
 
 #include "agent/service/host_links.h"
 
@@ -47,7 +48,14 @@ constexpr ConcernRow kConcernRows[] = {
     {NodeType::team, 198, concernsLink},         // TeamMode
 };
 
+constexpr const char* kOfDrives[] = {"drive", "drive-part", "file-system", "array", "mapping"};
+
 }  // namespace
+
+bool looksByItself(const std::string& nodeClass, unsigned int concern, bool drives) {
+    return ((concern & concernsLink) != 0 && nodeClass == "link") ||
+           (drives && std::ranges::find(kOfDrives, nodeClass) != std::end(kOfDrives));
+}
 
 std::vector<unsigned int> concernedProperties(unsigned int nodeType, unsigned int concern) {
     std::vector<unsigned int> properties;

@@ -16,6 +16,10 @@ namespace {
 /// What hangs is stale after this; the next look finds it again.
 constexpr std::chrono::seconds kLongestLook{15};
 
+/// When a plug-in that hears the kernel itself has looked.
+constexpr std::chrono::milliseconds kTheirLook{1500};
+constexpr unsigned int kLinkState = 123;
+
 Request lookRequest() {
     return Request("the service", Request::Clock::now() + kLongestLook);
 }
@@ -36,8 +40,24 @@ NodeView viewOf(const NodeRef& node, std::vector<Reading> readings) {
             {},
             node->getDescription(),
             std::move(readings),
-            {},
             wallClock()};
+}
+
+/// What a tree shows of it.
+std::vector<unsigned int> shownOf(const NodeRef& node) {
+    std::set<unsigned int> ids;
+    for (const auto& [id, value] : storedProperties(*node)) {
+        ids.insert(id);
+    }
+    if (const NodeClass* known = findClass(node->nodeType())) {
+        ids.insert(known->live.begin(), known->live.end());
+    }
+    return {ids.begin(), ids.end()};
+}
+
+bool isNewOf(const HostChange& change, const NodeRef& node) {
+    return change.any() &&
+           looksByItself(className(node->nodeType()), change.concernOf(nameOf(*node)), change.drives);
 }
 
 }  // namespace
@@ -109,8 +129,8 @@ Looker::Clock::time_point Looker::lookTime() const {
 Looker::Wanted Looker::waitForWanted() {
     std::unique_lock lock(guard_);
     const auto ready = [this] { return stopped_ || wanted_.any(); };
-    if (const auto due = keeper_.due()) {
-        wanted_.follow = !changed_.wait_until(lock, *due, ready);
+    if (const auto next = due()) {
+        wanted_.follow = !changed_.wait_until(lock, *next, ready);
     } else {
         changed_.wait(lock, ready);
     }
@@ -120,9 +140,30 @@ Looker::Wanted Looker::waitForWanted() {
     return stopped_ ? Wanted() : std::exchange(wanted_, {});
 }
 
+/// When to look though nothing is told.
+std::optional<Looker::Clock::time_point> Looker::due() const {
+    const auto tree = keeper_.due();
+    return tree && laterAt_ ? std::min(*tree, *laterAt_) : tree ? tree : laterAt_;
+}
+
+/// Adds what was put off until now, and puts off what was heard.
+void Looker::noteForLater(Wanted& wanted) {
+    const auto now = Clock::now();
+    const HostChange heard = wanted.host;
+    if (laterAt_ && *laterAt_ <= now) {
+        wanted.later = std::exchange(later_, {});
+        laterAt_.reset();
+    }
+    if (heard.any()) {
+        later_.add(heard);
+        laterAt_ = now + kTheirLook;
+    }
+}
+
 void Looker::run() {
     for (Wanted wanted = waitForWanted(); wanted.any(); wanted = waitForWanted()) {
         const auto begun = Clock::now();
+        noteForLater(wanted);
         deliver_(look(wanted));
         const auto ended = Clock::now();
         restUntil_ = ended + (ended - begun);
@@ -149,39 +190,44 @@ std::vector<NodeView> Looker::readAgain(const std::vector<Agent::Asked>& asked, 
     std::vector<std::vector<Reading>> readings = agent_.readAnew(asked, request);
     std::vector<NodeView> views;
     for (std::size_t i = 0; i < asked.size(); ++i) {
-        setStatus(asked[i].node);
         views.push_back(viewOf(asked[i].node, std::move(readings[i])));
         views.back().asked = asked[i].ids;
     }
     return views;
 }
 
-/// An IP configuration is as its link is listed, by the name or a longer one, as the plug-in looks for it.
-void Looker::setStatus(const NodeRef& node) const {
+/// An IP configuration is as its link is listed, by its name or any that has it within, as the plug-in looks
+/// for it.
+/// @return whether it is another status
+bool Looker::setStatus(const NodeRef& node) const {
     if (!links_ || node->nodeType() != static_cast<unsigned int>(NodeType::ipConfig)) {
-        return;
+        return false;
     }
     const std::string name = nameOf(*node);
     const bool isUp = std::ranges::any_of(*links_, [&name](const auto& link) {
         return link.second.isUp && link.second.name.find(name) != std::string::npos;
     });
-    agent_.setStatus(node, isUp ? IC::LinkState::up : IC::LinkState::down);
+    const unsigned int status = isUp ? IC::LinkState::up : IC::LinkState::down;
+    const bool differs = node->getStatus() != status;
+    agent_.setStatus(node, status);
+    return differs;
 }
 
 /// All that a tree shows of the node, or only what the kernel's news concern; none for nothing.
 std::vector<unsigned int> Looker::concernedOf(const NodeRef& node, const Wanted& wanted) const {
     if (!wanted.all && !wanted.nodes.contains(node->getNodeId())) {
-        const unsigned int concern = wanted.host.names.empty() ? 0 : wanted.host.concernOf(nameOf(*node));
-        return concernedProperties(node->nodeType(), concern);
+        if (isNewOf(wanted.later, node) || isNewOf(wanted.host, node)) {
+            return shownOf(node);
+        }
+        if (!wanted.host.any()) {
+            return {};
+        }
+        std::vector<unsigned int> concerned =
+            concernedProperties(node->nodeType(), wanted.host.concernOf(nameOf(*node)));
+        return setStatus(node) && concerned.empty() ? std::vector{kLinkState} : concerned;
     }
-    std::set<unsigned int> ids;
-    for (const auto& [id, value] : storedProperties(*node)) {
-        ids.insert(id);
-    }
-    if (const NodeClass* known = findClass(node->nodeType())) {
-        ids.insert(known->live.begin(), known->live.end());
-    }
-    return {ids.begin(), ids.end()};
+    setStatus(node);
+    return shownOf(node);
 }
 
 /// What is not done because a write is at work is done at the next look.

@@ -6,6 +6,7 @@
 #include <functional>
 #include <memory>
 #include <mutex>
+#include <optional>
 #include <set>
 #include <thread>
 #include <vector>
@@ -70,6 +71,7 @@ private:
         std::set<std::uint32_t> nodes;
         std::set<std::uint32_t> alerted;
         HostChange host;
+        HostChange later;  // was heard before
         bool any() const { return all || follow || !nodes.empty() || !alerted.empty() || host.any(); }
     };
     template <class Change>
@@ -79,11 +81,13 @@ private:
     Wanted waitForWanted();
     Clock::time_point lookTime() const;
     Look look(const Wanted& wanted);
+    std::optional<Clock::time_point> due() const;
+    void noteForLater(Wanted& wanted);
     void keepTree(const Wanted& wanted, const Request& request);
     std::vector<unsigned int> concernedOf(const NodeRef& node, const Wanted& wanted) const;
     std::vector<NodeView> readAgain(const std::vector<Agent::Asked>& asked, const Request& request);
     std::vector<NodeView> readFirst(const std::vector<NodeRef>& nodes, const Request& request);
-    void setStatus(const NodeRef& node) const;
+    bool setStatus(const NodeRef& node) const;
 
     Agent& agent_;
     const std::function<void(Look)> deliver_;
@@ -99,6 +103,8 @@ private:
     TreeKeeper keeper_;
     std::shared_ptr<const HostLinks> links_;  // null until they are told
     std::set<std::uint32_t> met_;             // nodes that were looked at
+    HostChange later_;                        // what others hear of, too, and look at by themselves
+    std::optional<Clock::time_point> laterAt_;
     Clock::time_point restUntil_;
     std::thread thread_;
 };

@@ -136,19 +136,24 @@ std::vector<const HostLinks::value_type*> TreeKeeper::unseen(const Named& named)
     return links;
 }
 
-/// Whether a bond has no team: the plug-in makes teams at its start alone.
-bool TreeKeeper::lacksTeam(const Named& named) const {
+/// The bonds that have no team: the plug-in makes teams at its start alone. Those that it made none of are
+/// left out.
+std::map<int, std::string> TreeKeeper::bondsWithoutTeam(const Named& named) const {
     std::set<std::string> teams;
     for (const NodeRef& node : shown()) {
         if (isOfType(*node, {NodeType::team})) {
             teams.insert(nameOf(*node));
         }
     }
-    std::error_code unknown;
-    return std::ranges::any_of(named, [&](const auto& entry) {
-        return entry.second->second.isBond && !teams.contains(entry.first) &&
-               std::filesystem::exists("/proc/net/bonding/" + entry.first, unknown);
-    });
+    std::map<int, std::string> bonds;
+    for (const auto& [name, link] : named) {
+        const auto refused = refusedBonds_.find(link->first);
+        if (link->second.isBond && !teams.contains(name) &&
+            (refused == refusedBonds_.end() || refused->second != name)) {
+            bonds.emplace(link->first, name);
+        }
+    }
+    return bonds;
 }
 
 /// A start costs a walk over everything, so it takes one part in ten of the time at most.
@@ -182,7 +187,11 @@ bool TreeKeeper::findNew(const Named& named, const Request& request) {
     });
     const bool asked = unseen(named).empty() || agent_.lookForLinks(request);
     retry_.reset();
-    const bool restarted = (!asked || lacksTeam(named)) && restart(request);
+    const bool restarted = (!asked || !bondsWithoutTeam(named).empty()) && restart(request);
+    if (restarted) {
+        refusedBonds_.clear();
+        refusedBonds_ = bondsWithoutTeam(named);
+    }
     const auto now = Clock::now();
     std::erase_if(leaving_, [now](const auto& entry) { return entry.second < now; });
     for (const HostLinks::value_type* link : unseen(named)) {

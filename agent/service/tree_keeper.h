@@ -43,7 +43,7 @@ private:
     std::vector<NodeRef> sort(const Named& named);
     void remember(const Named& named);
     bool findNew(const Named& named, const Request& request);
-    bool lacksTeam(const Named& named) const;
+    std::map<int, std::string> bondsWithoutTeam(const Named& named) const;
     bool restart(const Request& request);
     std::vector<const HostLinks::value_type*> unseen(const Named& named) const;
 

@@ -21,8 +21,8 @@ TEST(ServiceConfig, SaysNothingWhereNothingStands) {
 }
 
 TEST(ServiceConfig, TakesEachKey) {
-    const auto read = parseConfig(
-        "look-every=30\n settling-time =  200 \ncommand-timeout = 0\ntrusted-group = adm_2-x\n");
+    const auto read =
+        parseConfig("look-every=30\n settling-time =  200 \ncommand-timeout = 0\ntrusted-group = adm_2-x\n");
     EXPECT_THAT(read.complaints, IsEmpty());
     EXPECT_EQ(read.config.lookEvery.count(), 30);
     EXPECT_EQ(read.config.settlingTime.count(), 200);
@@ -33,17 +33,18 @@ TEST(ServiceConfig, TakesEachKey) {
 
 TEST(ServiceConfig, TellsEachWrongLineWithItsNumber) {
     EXPECT_THAT(
-        parseConfig("look-every = 9\n\nnonsense\nlook-sometimes = 1\nlook-every = 10\nsettling-time = 10001\n"
+        parseConfig("look-every = 9\n\nnonsense\nlook-sometimes = 1\nlook-every = 10\nsettling-time = 1001\n"
                     "command-timeout = 1.5\ntrusted-group = a b\ncommand-timeout = -1")
             .complaints,
         ElementsAre("line 1: look-every is '9', but takes seconds from 10 to 86400, or 0 for never",
                     "line 3: 'nonsense' is no \"key = value\"", "line 4: there is no key 'look-sometimes'",
                     "line 5: a second look-every",
-                    "line 6: settling-time is '10001', but takes milliseconds from 0 to 10000",
+                    "line 6: settling-time is '1001', but takes milliseconds from 0 to 1000",
                     "line 7: command-timeout is '1.5', but takes seconds from 1 to 3600, or 0 for no limit",
                     "line 8: trusted-group is 'a b', but takes the name of a group",
                     "line 9: a second command-timeout"));
-    EXPECT_EQ(parseConfig(std::string(1000, '\n') + "x\ny").complaints.front(), "line 1001: 'x' is no \"key = value\"");
+    EXPECT_EQ(parseConfig(std::string(1000, '\n') + "x\ny").complaints.front(),
+              "line 1001: 'x' is no \"key = value\"");
     std::string many;
     for (int i = 0; i < 1000; ++i) {
         many += "wrong\n";

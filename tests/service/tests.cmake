@@ -19,7 +19,8 @@ if(CORVISTA_SERVICE)
   corvista_test(service_freshness LIBRARIES agent_service agent_core agent_bus test_support SOURCES
     service/freshness_test.cpp
     service/service_run.cpp)
-  target_compile_definitions(service_freshness_test PRIVATE ${agent_test_programs} CVAGENTD_PROGRAM="$<TARGET_FILE:cvagentd>")
+  target_compile_definitions(service_freshness_test PRIVATE ${agent_test_programs} CVAGENTD_PROGRAM="$<TARGET_FILE:cvagentd>"
+    HARDWARE_FILE="$<TARGET_FILE:corvistahardware>")
   add_dependencies(service_freshness_test cvagent cvagentd corvistahardware vantrelcvicoshwmi corvista-hosttools)
   add_dependencies(service_test cvagent cvagentd fake_plugin corvistahardware tiny_front_end)
 endif()
