@@ -53,7 +53,7 @@ Came receive(int from, std::array<char, 65536>& buffer, std::string_view& messag
 
 /// Whether a dump ends with this message.
 bool endsDump(std::string_view message, bool& whole) {
-    auto left = static_cast<unsigned int>(message.size());
+    auto left = static_cast<int>(message.size());
     for (const auto* header = reinterpret_cast<const nlmsghdr*>(message.data()); NLMSG_OK(header, left);
          header = NLMSG_NEXT(header, left)) {
         whole = whole && (header->nlmsg_flags & NLM_F_DUMP_INTR) == 0 && header->nlmsg_type != NLMSG_ERROR;

@@ -18,11 +18,11 @@ constexpr unsigned short kEthernetAddress = 6;
 class Attributes {
 public:
     Attributes(const void* begin, std::size_t size)
-        : begin_(static_cast<const rtattr*>(begin)), size_(static_cast<unsigned int>(size)) {}
+        : begin_(static_cast<const rtattr*>(begin)), size_(static_cast<int>(size)) {}
 
     /// Its content; nothing when there is none.
     std::optional<std::string_view> find(unsigned short wanted) const {
-        unsigned int left = size_;
+        int left = size_;  // below zero behind the last one
         for (const rtattr* each = begin_; RTA_OK(each, left); each = RTA_NEXT(each, left)) {
             if ((each->rta_type & NLA_TYPE_MASK) == wanted) {
                 return std::string_view(static_cast<const char*>(RTA_DATA(each)), RTA_PAYLOAD(each));
@@ -45,7 +45,7 @@ public:
 
 private:
     const rtattr* begin_;
-    unsigned int size_;
+    int size_;
 };
 
 /// The fixed part of a message, and its attributes.
@@ -183,7 +183,7 @@ void HostChange::add(const HostChange& later) {
 }
 
 void takeRouteNews(std::string_view message, HostLinks& links, HeardNews& heard) {
-    auto left = static_cast<unsigned int>(message.size());
+    auto left = static_cast<int>(message.size());
     for (const auto* header = reinterpret_cast<const nlmsghdr*>(message.data()); NLMSG_OK(header, left);
          header = NLMSG_NEXT(header, left)) {
         const auto* const row = std::ranges::find(kNewsRows, header->nlmsg_type, &NewsRow::type);

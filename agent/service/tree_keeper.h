@@ -52,6 +52,7 @@ private:
     std::map<std::string, int> linkOf_;                  // by the name of a node: the index of its link
     std::set<std::uint32_t> presentDrives_;              // that have been there
     std::map<int, std::string> offered_;                 // links that the plug-in makes no node of, by index
+    std::map<int, std::string> refusedBonds_;            // that the plug-in made no team of, by index
     std::map<std::string, Clock::time_point>
         leaving_;  // names of withdrawn nodes that somebody may still hold
     std::optional<Clock::time_point> retry_;

@@ -4,6 +4,7 @@ if(CORVISTA_SERVICE)
     service/bus_test.cpp
     service/config_test.cpp
     service/consent_test.cpp
+    service/host_links_test.cpp
     service/interface_test.cpp
     service/model_test.cpp
     service/objects_test.cpp
