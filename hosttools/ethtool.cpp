@@ -12,10 +12,11 @@ constexpr int nothingKnown = 75;
 }  // namespace
 
 int runEthtool(Arguments arguments, Host&, Answer& answer) {
-    if (arguments.size() != 1 || *arguments.front() == '-') {
-        return answer.leaveToHost(toolName, firstOf(arguments));
+    const std::string_view name = firstOf(arguments);
+    const bool isAll = name == "*";  // to the tool itself it is no link's name, even where one is called so
+    if (arguments.size() != 1 || name.starts_with('-') || isAll) {
+        return answer.leaveToHost(toolName, name);
     }
-    const std::string_view name = arguments.front();
     if (name.size() > longestName) {
         answer.errors.add("device name '").add(name).add("' longer than ").number(longestName);
         answer.errors.add(" characters\n");

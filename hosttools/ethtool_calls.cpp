@@ -1,69 +1,16 @@
 #include "hosttools/ethtool_calls.h"
 
 #include <linux/ethtool.h>
-#include <linux/sockios.h>
 #include <net/if.h>
-#include <sys/ioctl.h>
-#include <sys/socket.h>
-#include <algorithm>
-#include <array>
 #include <cerrno>
 #include <cstring>
-#include <span>
 
+#include "hosttools/descriptor.h"
 #include "hosttools/ethtool_words.h"
-#include "hosttools/files.h"
-#include "hosttools/netlink.h"
+#include "hosttools/link_settings.h"
 
 namespace hosttools {
 namespace {
-
-// The kernel counts its masks in a signed byte.
-constexpr std::size_t mostWords = 127;
-constexpr int masks = 3;
-
-/// The settings and the three masks behind them, as the kernel fills them in.
-class Settings {
-public:
-    ethtool_link_settings& head() { return *reinterpret_cast<ethtool_link_settings*>(room_.data()); }
-    const ethtool_link_settings& head() const {
-        return *reinterpret_cast<const ethtool_link_settings*>(room_.data());
-    }
-    std::size_t wordsOfAMask() const {
-        return static_cast<std::size_t>(std::max<int>(head().link_mode_masks_nwords, 0));
-    }
-    std::uint32_t word(std::size_t number) const {
-        return readPadded<std::uint32_t>(
-            std::string_view(room_.data(), room_.size()).substr(sizeof(ethtool_link_settings) + 4 * number));
-    }
-
-private:
-    alignas(ethtool_link_settings)
-        std::array<char, sizeof(ethtool_link_settings) + masks * mostWords * sizeof(std::uint32_t)> room_{};
-};
-
-enum Mask { supported, advertised, partner };
-
-/// One of the three masks.
-class ModeMask {
-public:
-    ModeMask(const Settings& settings, Mask mask) : settings_(settings), mask_(mask) {}
-
-    bool has(unsigned bit) const { return bit / 32 < size() && (word(bit / 32) >> bit % 32 & 1U) != 0; }
-    bool any() const {
-        for (std::size_t number = 0; number < size(); ++number) {
-            if (word(number) != 0) return true;
-        }
-        return false;
-    }
-
-private:
-    std::size_t size() const { return settings_.wordsOfAMask(); }
-    std::uint32_t word(std::size_t number) const { return settings_.word(mask_ * size() + number); }
-
-    const Settings& settings_;
-    Mask mask_;
-};
 
 struct Named {
     unsigned bit;
@@ -165,7 +112,19 @@ constexpr Named speeds[] = {{0, "10baseT/Half"},
                             {91, "100baseFX/Full"},
                             {92, "10baseT1L/Full"}};
 
-void addErrorCorrections(Text& text, const ModeMask& modes) {
+/// One of the masks.
+class Modes {
+public:
+    Modes(const LinkSettings& settings, LinkSettings::Mask mask) : settings_(settings), mask_(mask) {}
+
+    bool has(unsigned bit) const { return settings_.has(mask_, bit); }
+
+private:
+    const LinkSettings& settings_;
+    LinkSettings::Mask mask_;
+};
+
+void addErrorCorrections(Text& text, const Modes& modes) {
     bool any = false;
     for (const auto& [bit, name] : errorCorrections) {
         if (!modes.has(bit)) continue;
@@ -176,7 +135,7 @@ void addErrorCorrections(Text& text, const ModeMask& modes) {
 }
 
 /// The full duplex of a speed stands on the line of its half duplex, should this be there or not.
-void addSpeeds(Text& text, const ModeMask& modes, std::size_t indent) {
+void addSpeeds(Text& text, const Modes& modes, std::size_t indent) {
     bool any = false;
     bool newLine = false;
     bool sameLine = false;
@@ -198,11 +157,11 @@ struct Labels {
     std::size_t indent;
 };
 
-constexpr Labels labels[masks] = {{"Supported", "Supports", 24},
-                                  {"Advertised", "Advertised", 24},
-                                  {"Link partner advertised", "Link partner advertised", 37}};
+constexpr Labels labels[LinkSettings::masks] = {{"Supported", "Supports", 24},
+                                                {"Advertised", "Advertised", 24},
+                                                {"Link partner advertised", "Link partner advertised", 37}};
 
-void addModes(Text& text, const ModeMask& modes, const Labels& label) {
+void addModes(Text& text, const Modes& modes, const Labels& label) {
     const std::size_t mark = text.size() + 1;
     text.add("\t").add(label.whose).add(" link modes:").padLeftAligned(mark, label.indent);
     addSpeeds(text, modes, label.indent);
@@ -215,15 +174,15 @@ void addModes(Text& text, const ModeMask& modes, const Labels& label) {
     text.add('\n');
 }
 
-void addSettings(Text& text, const Settings& settings) {
+void addSettings(Text& text, const LinkSettings& settings) {
     text.add("\tSupported ports: [ ");
     for (const auto& [bit, name] : ports) {
-        if (ModeMask(settings, supported).has(bit)) text.add(name).add(' ');
+        if (settings.has(LinkSettings::supported, bit)) text.add(name).add(' ');
     }
     text.add("]\n");
-    for (const Mask mask : {supported, advertised, partner}) {
-        const ModeMask modes(settings, mask);
-        if (mask != partner || modes.any()) addModes(text, modes, labels[mask]);
+    for (const auto mask : {LinkSettings::supported, LinkSettings::advertised, LinkSettings::partner}) {
+        const bool isTold = mask != LinkSettings::partner || settings.any(mask);
+        if (isTold) addModes(text, {settings, mask}, labels[mask]);
     }
     const ethtool_link_settings& head = settings.head();
     addSpeed(text.add("\tSpeed: "), head.speed);
@@ -255,8 +214,7 @@ void addMessageLevel(Text& text, std::uint32_t level) {
 /// complained of.
 class Calls {
 public:
-    Calls(std::string_view name, Answer& answer)
-        : socket_(socket(AF_INET, SOCK_DGRAM | SOCK_CLOEXEC, 0)), name_(name), answer_(answer) {}
+    Calls(std::string_view name, Answer& answer) : driver_(name), answer_(answer) {}
 
     void run() {
         addOf("device settings", [this] { return settings(); });
@@ -267,66 +225,46 @@ public:
     bool haveTold() const { return told_; }
 
 private:
+    /// @param question gives 0 or an error number
     template <typename Question>
     void addOf(std::string_view what, const Question& question) {
-        errno = 0;
-        if (question()) {
-            told_ = true;
-        } else if (errno != EOPNOTSUPP) {
-            answer_.errors.add("Cannot get ").add(what).add(": ").add(std::strerror(errno)).add('\n');
+        const int error = question();
+        told_ = told_ || error == 0;
+        if (error != 0 && error != EOPNOTSUPP) {
+            answer_.errors.add("Cannot get ").add(what).add(": ").add(std::strerror(error)).add('\n');
         }
     }
-    bool call(void* data) const {
-        ifreq request{};
-        name_.copy(request.ifr_name, IFNAMSIZ - 1);
-        request.ifr_data = static_cast<char*>(data);
-        return ioctl(socket_.get(), SIOCETHTOOL, &request) == 0;
+    int settings() const {
+        LinkSettings settings;
+        const int error = settings.read(driver_);
+        if (error == 0) addSettings(answer_.out, settings);
+        return error;
     }
-    /// @param words how long each of the masks is; 0 asks for that, and is answered with a negative number
-    bool fetch(int words, Settings& settings) const {
-        settings = {};
-        settings.head().cmd = ETHTOOL_GLINKSETTINGS;
-        settings.head().link_mode_masks_nwords = static_cast<std::int8_t>(words);
-        return call(&settings.head());
-    }
-    bool settings() const {
-        Settings settings;
-        if (!fetch(0, settings)) return false;
-        const int words = -settings.head().link_mode_masks_nwords;
-        if (words <= 0) {
-            errno = EOPNOTSUPP;
-            return false;
-        }
-        if (!fetch(words, settings)) return false;
-        addSettings(answer_.out, settings);
-        return true;
-    }
-    bool wakeUp() const {
+    int wakeUp() const {
         ethtool_wolinfo told{};
         told.cmd = ETHTOOL_GWOL;
-        if (!call(&told)) return false;
+        if (const int error = driver_.ask(&told); error != 0) return error;
         addWakeOnLan(answer_.out, told.supported, told.wolopts);
         const std::string_view password(reinterpret_cast<const char*>(told.sopass), sizeof told.sopass);
         if ((told.supported & WAKE_MAGICSECURE) != 0) addPassword(answer_.out, password);
-        return true;
+        return 0;
     }
-    bool messageLevel() const {
+    int messageLevel() const {
         ethtool_value told{};
         told.cmd = ETHTOOL_GMSGLVL;
-        if (!call(&told)) return false;
-        addMessageLevel(answer_.out, told.data);
-        return true;
+        const int error = driver_.ask(&told);
+        if (error == 0) addMessageLevel(answer_.out, told.data);
+        return error;
     }
-    bool link() const {
+    int link() const {
         ethtool_value told{};
         told.cmd = ETHTOOL_GLINK;
-        if (!call(&told)) return false;
-        answer_.out.add("\tLink detected: ").add(told.data != 0 ? "yes\n" : "no\n");
-        return true;
+        const int error = driver_.ask(&told);
+        if (error == 0) answer_.out.add("\tLink detected: ").add(told.data != 0 ? "yes\n" : "no\n");
+        return error;
     }
 
-    Descriptor socket_;
-    std::string_view name_;
+    DriverCalls driver_;
     Answer& answer_;
     bool told_ = false;
 };

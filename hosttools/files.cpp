@@ -8,15 +8,13 @@
 #include <charconv>
 #include <memory>
 
-namespace hosttools {
+#include "hosttools/descriptor.h"
 
-Descriptor::~Descriptor() {
-    if (valid()) close(descriptor_);
-}
+namespace hosttools {
 
 std::optional<std::string> readFile(const std::string& path) {
     const Descriptor file(open(path.c_str(), O_RDONLY | O_CLOEXEC));
-    if (!file.valid()) return std::nullopt;
+    if (!file.isOpen()) return std::nullopt;
     std::string content;
     for (;;) {
         const std::size_t used = content.size();
@@ -39,12 +37,17 @@ std::uint64_t readNumber(const std::string& path, std::uint64_t fallback) {
     return content ? parseNumber(*content).value_or(fallback) : fallback;
 }
 
-std::optional<std::uint64_t> parseNumber(std::string_view text, int base) {
-    if (base == 16 && text.starts_with("0x")) text.remove_prefix(2);
+std::optional<std::uint64_t> takeNumber(std::string_view& text, int base) {
+    const std::size_t prefix = base == 16 && text.starts_with("0x") ? 2 : 0;
     std::uint64_t value = 0;
-    const auto end = std::from_chars(text.data(), text.data() + text.size(), value, base);
+    const auto end = std::from_chars(text.data() + prefix, text.data() + text.size(), value, base);
     if (end.ec != std::errc()) return std::nullopt;
+    text.remove_prefix(static_cast<std::size_t>(end.ptr - text.data()));
     return value;
+}
+
+std::optional<std::uint64_t> parseNumber(std::string_view text, int base) {
+    return takeNumber(text, base);
 }
 
 std::vector<std::string> listDirectory(const std::string& path) {
@@ -52,7 +55,8 @@ std::vector<std::string> listDirectory(const std::string& path) {
     const std::unique_ptr<DIR, int (*)(DIR*)> directory(opendir(path.c_str()), closedir);
     if (!directory) return names;
     while (const dirent* entry = readdir(directory.get())) {
-        if (entry->d_name[0] != '.') names.emplace_back(entry->d_name);
+        const std::string_view name = entry->d_name;
+        if (name != "." && name != "..") names.emplace_back(name);
     }
     return names;
 }

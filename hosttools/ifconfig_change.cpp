@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "hosttools/addresses.h"
+#include "hosttools/descriptor.h"
 #include "hosttools/files.h"
 #include "hosttools/text.h"
 

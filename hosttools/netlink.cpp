@@ -87,7 +87,8 @@ std::string makeAttribute(unsigned type, std::string_view data) {
 }
 
 NetlinkSocket::NetlinkSocket(int protocol)
-    : socket_(socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC, protocol)), problem_(socket_.valid() ? 0 : errno) {}
+    : socket_(socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC, protocol)),
+      problem_(socket_.isOpen() ? 0 : errno) {}
 
 void NetlinkSocket::enable(int option) {
     const int on = 1;

@@ -8,6 +8,7 @@
 #include <string_view>
 #include <type_traits>
 
+#include "hosttools/descriptor.h"
 #include "hosttools/files.h"
 
 namespace hosttools {

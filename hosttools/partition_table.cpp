@@ -5,6 +5,7 @@
 #include <array>
 #include <span>
 
+#include "hosttools/descriptor.h"
 #include "hosttools/files.h"
 
 namespace hosttools {

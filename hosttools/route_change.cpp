@@ -11,6 +11,7 @@
 #include <string>
 
 #include "hosttools/addresses.h"
+#include "hosttools/descriptor.h"
 #include "hosttools/files.h"
 #include "hosttools/text.h"
 

@@ -98,8 +98,8 @@ void eachInterface(std::string_view devices, const std::string& sysfs, const Int
         const std::size_t colon = line.find(':');
         std::string_view before = line.substr(0, colon);
         const std::string_view name = takeWord(before);
-        if (colon == line.npos || name.empty() || name.front() == '.' || name.find('/') != name.npos)
-            continue;
+        const bool isPath = name == "." || name == ".." || name.find('/') != name.npos;
+        if (colon == line.npos || name.empty() || isPath) continue;
         const auto link = links.find(name);
         const std::string directory = sysfs + "/" + std::string(name);
         visit(line, name, Interface(directory, link != links.end() ? link->second : nullptr).standing());

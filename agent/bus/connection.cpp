@@ -68,7 +68,7 @@ Message Connection::newCall(const Target& target) const {
 }
 
 Message Connection::newSignal(const std::string& path, const std::string& interface,
-                           const std::string& member) const {
+                              const std::string& member) const {
     sd_bus_message* made = nullptr;
     checkDone(sd_bus_message_new_signal(get(), &made, path.c_str(), interface.c_str(), member.c_str()),
               "cannot make the signal " + member);
@@ -79,12 +79,14 @@ Message Connection::ask(const Message& call, Microseconds longest) const {
     sd_bus_error error{};
     sd_bus_message* answer = nullptr;
     const int result = sd_bus_call(get(), call.get(), limitOf(longest), &error, &answer);
+    const std::string name = error.name != nullptr ? error.name : "";
+    const std::string text = error.message != nullptr ? error.message : "";
+    sd_bus_error_free(&error);
+    if (result < 0 && name.empty()) {
+        throw Error::ofErrno("no answer", result);
+    }
     if (result < 0) {
-        const Error failure = error.name != nullptr
-                                  ? Error(error.name, error.message != nullptr ? error.message : "")
-                                  : Error::ofErrno("no answer", result);
-        sd_bus_error_free(&error);
-        throw failure;
+        throw Error(name, text);
     }
     return Message::adopt(answer);
 }

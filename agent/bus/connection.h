@@ -44,7 +44,8 @@ public:
     Message newCall(const Target& target) const;
     Message newSignal(const std::string& path, const std::string& interface, const std::string& member) const;
 
-    /// Sends a call and waits for its answer; never from inside a handler. Throws Error: what the answer says.
+    /// Sends a call and waits for its answer; never from inside a handler. Throws Error: what the answer
+    /// says.
     Message ask(const Message& call, Microseconds longest) const;
     /// Sends a call. The handler gets its answer, be it an error; the bus makes one when the time is over.
     [[nodiscard]] Slot askLater(const Message& call, Microseconds longest, Handler handler);

@@ -26,7 +26,8 @@ Error Error::ofErrno(const std::string& what, int error) {
 
 Message Message::adopt(sd_bus_message* message) {
     Message made;
-    made.message_ = std::shared_ptr<sd_bus_message>(message, [](sd_bus_message* it) { sd_bus_message_unref(it); });
+    made.message_ =
+        std::shared_ptr<sd_bus_message>(message, [](sd_bus_message* it) { sd_bus_message_unref(it); });
     return made;
 }
 

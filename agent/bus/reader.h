@@ -17,12 +17,14 @@ public:
     std::uint8_t byte();
     std::uint32_t number();
     std::uint64_t longNumber();
+    double real();
     std::string text();
     std::string path();
     std::vector<std::string> texts();
     std::vector<std::uint32_t> numbers();
     std::string bytes();
-    /// A basic value of any type that is one: "s", "o", "g" as they are, flags "1" and "0", numbers in decimal.
+    /// A basic value of any type that is one: "s", "o", "g" as they are, flags "1" and "0", numbers in
+    /// decimal.
     std::string asWord();
 
     /// Calls something for each element.

@@ -78,7 +78,7 @@ Writer& Writer::put(const std::vector<std::string>& texts) {
 
 Writer& Writer::put(const std::vector<std::uint32_t>& numbers) {
     checkTaken(sd_bus_message_append_array(message_, SD_BUS_TYPE_UINT32, numbers.data(),
-                                      numbers.size() * sizeof(std::uint32_t)));
+                                           numbers.size() * sizeof(std::uint32_t)));
     return *this;
 }
 

@@ -9,6 +9,7 @@
 #include <optional>
 
 #include "agent/core/text.h"
+#include "framework/qx/whole_number.h"
 
 namespace cvagent {
 
@@ -19,7 +20,7 @@ constexpr uid_t kNobodyLoggedIn = static_cast<uid_t>(-1);
 std::optional<uid_t> sudoUser;
 
 std::optional<uid_t> userOf(const std::string& text) {
-    const auto user = wholeNumber<uid_t>(text);
+    const auto user = QX::wholeNumber<uid_t>(text);
     return user && *user != kNobodyLoggedIn ? user : std::nullopt;
 }
 

@@ -5,6 +5,7 @@
 #include <nlohmann/json.hpp>
 
 #include "agent/cli/print.h"
+#include "framework/qx/whole_number.h"
 
 namespace cvagent::json {
 
@@ -30,7 +31,7 @@ Json numberValue(const IC::Number& number) {
             if (text.find('.') != std::string::npos) {
                 return number.toDouble();
             }
-            return std::stoll(text);
+            return QX::wholeNumber<long long>(text).value();
         default:
             return number.toUnsigned64();
     }

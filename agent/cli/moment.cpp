@@ -6,7 +6,9 @@
 #include <stdexcept>
 
 #include "agent/core/text.h"
+#include "framework/qx/whole_number.h"
 #include "framework/qx/date_time.h"
+#include "framework/qx/whole_number.h"
 
 namespace cvagent {
 
@@ -23,7 +25,7 @@ constexpr std::array kUnits = {TimeUnit{'s', 1}, TimeUnit{'m', 60}, TimeUnit{'h'
 std::optional<std::time_t> longAgo(const std::string& text) {
     const auto* const unit =
         std::ranges::find_if(kUnits, [&text](const TimeUnit& each) { return text.ends_with(each.letter); });
-    const auto count = wholeNumber<std::uint32_t>(text.substr(0, text.empty() ? 0 : text.size() - 1));
+    const auto count = QX::wholeNumber<std::uint32_t>(text.substr(0, text.empty() ? 0 : text.size() - 1));
     if (unit == kUnits.end() || !count) {
         return std::nullopt;
     }
@@ -43,7 +45,7 @@ std::optional<std::time_t> timeNamed(const std::string& text) {
 
 std::optional<Moment> momentNamed(const std::string& text) {
     if (!text.empty() && text.find_first_not_of("0123456789") == std::string::npos) {
-        const auto number = wholeNumber<std::int64_t>(text);  // as the history counts
+        const auto number = QX::wholeNumber<std::int64_t>(text);  // as the history counts
         return number ? std::optional(Moment{static_cast<std::uint64_t>(*number)}) : std::nullopt;
     }
     auto time = longAgo(text);

@@ -5,8 +5,8 @@
 #include <array>
 #include <string_view>
 
-#include "agent/core/text.h"
 #include "agent/core/value_check.h"
+#include "framework/qx/whole_number.h"
 
 namespace cvagent::check {
 
@@ -23,8 +23,12 @@ bool isLetter(char c) {
     return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z');
 }
 
+bool isHexDigit(char c) {
+    return isDigit(c) || (c >= 'a' && c <= 'f') || (c >= 'A' && c <= 'F');
+}
+
 bool isHexOrColon(char c) {
-    return isDigit(c) || (c >= 'a' && c <= 'f') || (c >= 'A' && c <= 'F') || c == ':' || c == '.';
+    return isHexDigit(c) || c == ':' || c == '.';
 }
 
 Value asText(Words words, bool good) {
@@ -83,6 +87,14 @@ bool isLabel(std::string_view text) {
                        [](char c) { return isDigit(c) || isLetter(c) || c == '-'; });
 }
 
+/// In digits, or in the hexadecimal ones behind 0x.
+bool isNumber(std::string_view label) {
+    const bool isHex = label.starts_with("0x") || label.starts_with("0X");
+    label.remove_prefix(isHex ? 2 : 0);
+    return std::ranges::all_of(label, isDigit) || (isHex && std::ranges::all_of(label, isHexDigit));
+}
+
+/// A resolver takes a name that ends in a number for an address: 10.0.0.07 is 10.0.0.7.
 bool isDomain(std::string_view text) {
     if (text.size() > kLongestDomain) {
         return false;
@@ -93,7 +105,7 @@ bool isDomain(std::string_view text) {
         }
         text.remove_prefix(dot + 1);
     }
-    return isLabel(text);
+    return isLabel(text) && !isNumber(text);
 }
 
 /// One empty word stands for the empty list.
@@ -139,7 +151,7 @@ Value prefixLength(const Property& /*property*/, Words words) {
     if (words.size() != 1 || words.front().empty() || words.front().front() == '0') {
         return std::nullopt;
     }
-    const auto bits = wholeNumber<unsigned int>(words.front());
+    const auto bits = QX::wholeNumber<unsigned int>(words.front());
     const bool good = bits && *bits >= 1 && *bits <= 128;
     return good ? Value(IC::PropertyValue(IC::Number(*bits), true)) : std::nullopt;
 }

@@ -2,14 +2,14 @@
 
 #include <algorithm>
 #include <stdexcept>
-#include <thread>
 #include <utility>
 
 #include "agent/core/announcer.h"
-#include "agent/core/catalogue_file.h"
 #include "agent/core/command_deadline.h"
 #include "agent/core/event_keeping.h"
 #include "agent/core/oshw/stored_facts.h"
+#include "agent/core/plugin_files.h"
+#include "agent/core/plugin_start.h"
 #include "agent/core/text.h"
 #include "agent/core/tree.h"
 
@@ -25,17 +25,8 @@ constexpr std::chrono::seconds kPatience{10};  // a hung command is ended by the
 struct Agent::Engine {
     explicit Engine(const AgentSettings& settings);
 
-    /// A plug-in on its way into the tree.
-    struct Beginner {
-        std::string file;
-        std::unique_ptr<Plugin> plugin;
-        std::optional<Problem> problem;
-    };
-
     NodesOfEach nodesOfEach() const;
-    void load(Beginner& beginner);
-    void start(Beginner& beginner, bool processors);
-    void startAll(std::vector<Beginner>& beginners, bool processors);
+    void startAll(std::vector<PluginStart>& starts, const AgentSettings& settings);
     void refresh();
     bool lists(const Handle& node) const;
     Listener& listenerOf(const std::shared_ptr<EventKeeper>& keeper);
@@ -67,16 +58,17 @@ Agent::Engine::Engine(const AgentSettings& settings)
     if (!data) {
         throw std::invalid_argument("an agent needs a data directory");
     }
-    std::vector<Beginner> beginners;
+    std::vector<PluginStart> starts;
     for (const std::string& file : settings.plugins) {
-        load(beginners.emplace_back(Beginner{file, nullptr, {}}));
+        starts.emplace_back(file, &announcer, tell,
+                            [this](const Plugin& plugin) { announcer.takeStock(plugin.interface()); });
     }
-    startAll(beginners, settings.processors);
-    for (Beginner& beginner : beginners) {
-        if (beginner.problem) {
-            failed.push_back({beginner.file, *beginner.problem});
+    startAll(starts, settings);
+    for (PluginStart& start : starts) {
+        if (const auto problem = start.problem()) {
+            failed.push_back({start.file(), *problem});
         } else {
-            plugins.push_back(std::move(beginner.plugin));
+            plugins.push_back(start.take());
         }
     }
     if (plugins.empty() && !failed.empty()) {
@@ -91,50 +83,21 @@ Listener& Agent::Engine::listenerOf(const std::shared_ptr<EventKeeper>& keeper) 
     return keeping.emplace(events, keeper);
 }
 
-void Agent::Engine::load(Beginner& beginner) {
-    try {
-        beginner.plugin = Plugin::loaded(beginner.file, &announcer, tell);
-    } catch (const Problem& problem) {
-        beginner.problem = problem;
-    }
-}
-
-void Agent::Engine::start(Beginner& beginner, bool processors) {
-    if (beginner.problem) {
-        return;
-    }
-    try {
-        loadCatalogueOf(beginner.file, tell);
-        beginner.plugin->start(processors);
-        announcer.takeStock(beginner.plugin->interface());
-        return;
-    } catch (const Problem& problem) {
-        beginner.problem = problem;
-    } catch (const std::exception& exception) {  // must not leave a thread, nor the first one the others
-        beginner.problem.emplace(Problem::failed, inQuotes(beginner.file) + ": " + exception.what());
-    }
-    beginner.plugin.reset();
-}
-
-/// The first one, which waits most for the host's tools, on the calling thread. Where the system gives no
-/// threads, all of them.
-void Agent::Engine::startAll(std::vector<Beginner>& beginners, bool processors) {
-    std::vector<std::thread> threads;
-    threads.reserve(beginners.size());
-    std::size_t here = 1;  // from here on there are threads for them
-    for (std::size_t i = beginners.size(); i > here; --i) {
-        try {
-            threads.emplace_back(
-                [this, &beginner = beginners[i - 1], processors] { start(beginner, processors); });
-        } catch (const std::exception&) {
-            here = i;
+/// The plug-in for this system waits most for the host's tools, whose time is limited, and starts on the
+/// calling thread; so do those for which the system gives no thread, and one that is alone.
+void Agent::Engine::startAll(std::vector<PluginStart>& starts, const AgentSettings& settings) {
+    std::vector<PluginStart*> here;
+    for (PluginStart& start : starts) {
+        const bool waits = starts.size() == 1 || isOfThisSystem(start.file());
+        if (waits || !start.aside(settings.processors)) {
+            here.push_back(&start);
         }
     }
-    for (std::size_t i = 0; i < std::min(here, beginners.size()); ++i) {
-        start(beginners[i], processors);
+    for (PluginStart* start : here) {
+        start->here(settings.processors);
     }
-    for (std::thread& thread : threads) {
-        thread.join();
+    for (PluginStart& start : starts) {
+        start.await(settings.startTime);
     }
 }
 

@@ -29,6 +29,9 @@ struct AgentSettings {
     bool processors = true;
     /// How long a command of a plug-in may take, in a write ten times as long; 0 for ever.
     std::chrono::duration<double> commandTime{10};
+    /// How long each of several plug-ins may take to start, but for the one for this system, whose commands
+    /// are limited; one that takes longer has failed and is left to itself.
+    std::chrono::milliseconds startTime{30'000};
     /// Held for as long as the agent is; there is none without.
     std::shared_ptr<DataDirectory> data;
     /// Hears of what belongs to no call. Any thread.

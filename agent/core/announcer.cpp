@@ -3,6 +3,8 @@
 #include <limits>
 #include <set>
 
+#include "framework/qx/whole_number.h"
+
 namespace cvagent {
 
 namespace {
@@ -55,7 +57,7 @@ void Announcer::forget(unsigned int node) {
 /// What a read has brought since the last event is not in the chain: its reader knows it.
 void Announcer::tellAlert(Event event) {
     if (!event.propertyName.empty()) {
-        const IC::PropertyValue after(IC::Number(static_cast<unsigned int>(std::stoul(event.after))), true);
+        const IC::PropertyValue after(IC::Number(QX::wholeNumber<unsigned int>(event.after).value()), true);
         const auto known = facts_.note(event.nodeId, event.property, after);
         const auto told = told_.find({event.nodeId, event.property});
         if (told != told_.end()) {

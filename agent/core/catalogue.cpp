@@ -8,8 +8,8 @@
 #include <stdexcept>
 
 #include "agent/core/oshw/tables.h"
-#include "agent/core/text.h"
 #include "agent/core/value_check.h"
+#include "framework/qx/whole_number.h"
 #include "framework/qx/zone_table.h"
 
 namespace cvagent {
@@ -159,7 +159,7 @@ const Property* findProperty(unsigned int nodeType, unsigned int id) {
 }
 
 const Property* findProperty(unsigned int nodeType, const std::string& text) {
-    if (const auto id = wholeNumber<unsigned int>(text)) {
+    if (const auto id = QX::wholeNumber<unsigned int>(text)) {
         return findProperty(nodeType, *id);
     }
     return firstOf(nodeType,

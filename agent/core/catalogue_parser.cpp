@@ -87,13 +87,15 @@ std::string lowered(std::string name) {
     return name;
 }
 
+std::optional<unsigned int> asId(const CatalogueJson& value) {
+    const bool fits =
+        value.is_number_unsigned() && value.get<std::uint64_t>() <= std::numeric_limits<unsigned int>::max();
+    return fits ? std::optional(value.get<unsigned int>()) : std::nullopt;
+}
+
 std::optional<unsigned int> numberIn(const CatalogueJson& row, const char* key) {
     const auto found = row.find(key);
-    if (found == row.end() || !found->is_number_unsigned() ||
-        found->get<std::uint64_t>() > std::numeric_limits<unsigned int>::max()) {
-        return std::nullopt;
-    }
-    return found->get<unsigned int>();
+    return found == row.end() ? std::nullopt : asId(*found);
 }
 
 /// "" where there is none.
@@ -202,8 +204,9 @@ private:
         std::vector<unsigned int> ids;
         if (const auto list = row.find("telling"); list != row.end() && list->is_array()) {
             for (const CatalogueJson& id : *list) {
-                if (id.is_number_unsigned() && ids.size() < 10) {
-                    ids.push_back(id.get<unsigned int>());
+                const auto number = asId(id);
+                if (number && ids.size() < 10) {
+                    ids.push_back(*number);
                 }
             }
         }

@@ -21,6 +21,8 @@ EventKeeping::~EventKeeping() {
     }
     if (thread_.joinable()) {
         thread_.join();
+    } else {
+        keeper_->settle();
     }
 }
 

@@ -165,6 +165,10 @@ std::vector<ToolReport> inspectHostTools(HostTools choice, Look look,
     return reports;
 }
 
+bool MissingTool::costsProperty(const std::string& name) const {
+    return (", " + costs + ",").find(", " + name + ",") != std::string::npos;
+}
+
 std::vector<MissingTool> missingTools() {
     std::vector<MissingTool> missing;
     for (const Tool& tool : kTools) {

@@ -56,6 +56,8 @@ struct MissingTool {
     std::string tool;
     std::string package;
     std::string costs;  ///< the properties, by their names, and nodes that are not known without it
+
+    bool costsProperty(const std::string& name) const;
 };
 /// As PATH is now. The tools without which nothing is missing that a node shows are left out.
 std::vector<MissingTool> missingTools();

@@ -107,7 +107,7 @@ private:
     [[noreturn]] void refuse(const std::string& place, const std::string& reason) const {
         throw Problem(
             Problem::failed,
-            "the data directory " + inQuotes(whole_) + " is not safe: " + inQuotes(place) + " " + reason,
+            "the " + role_.name + " " + inQuotes(whole_) + " is not safe: " + inQuotes(place) + " " + reason,
             role_.subject, role_.reason);
     }
 

@@ -10,6 +10,7 @@ namespace cvagent {
 struct DirectoryRole {
     Problem::Subject subject;
     std::string reason;
+    std::string name = "data directory";  ///< in words of a Problem
 };
 
 /// Walks the way to a directory of the caller's own, name by name, so that nothing is made or trusted behind

@@ -72,6 +72,7 @@ Plugin::Plugin(const std::string& file, Listener* listener, Tell tell, LoadOnly 
 Plugin::Plugin(const std::string& file, Listener* listener, Tell tell, bool processors)
     : Plugin(file, listener, std::move(tell), LoadOnly()) {
     start(processors);
+    tellEvents();
 }
 
 std::unique_ptr<Plugin> Plugin::loaded(const std::string& file, Listener* listener, Tell tell) {
@@ -132,6 +133,7 @@ void Plugin::takePlace() {
 void Plugin::start(bool processors) {
     begun_ = true;
     processors_ = processors;
+    events_.startHere();
     try {
         guarded("initialize of " + inQuotes(file_),
                 [this, processors] { initialize(processors, running_->ids().firstNode); });
@@ -139,7 +141,6 @@ void Plugin::start(bool processors) {
         events_.abandon();
         throw;
     }
-    events_.release();
 }
 
 void Plugin::noteIds() {

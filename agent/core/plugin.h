@@ -29,7 +29,8 @@ public:
     /// Throws Problem, with a text of its own for each way in which a file can be no plug-in.
     Plugin(const std::string& file, Listener* listener, Tell tell = tellNobody, bool processors = true);
     /// The same in two steps, so that several can start at once while the order in which they were loaded
-    /// decides their ids: loaded() loads the library and gives it its place, start() does the rest.
+    /// decides their ids: loaded() loads the library and gives it its place, start() and tellEvents() do the
+    /// rest.
     static std::unique_ptr<Plugin> loaded(const std::string& file, Listener* listener, Tell tell);
     /// At most once. Throws Problem; what is left then is good for nothing but its end.
     void start(bool processors);
@@ -38,6 +39,10 @@ public:
     void startAgain();
     /// Takes note of the ids that the plug-in has given away by now.
     void noteIds();
+    /// After the start: the listener hears what came meanwhile, and from now on everything.
+    void tellEvents() { events_.release(); }
+    /// Instead of that: the listener never hears anything, and nobody waits for him. While it starts, too.
+    void tellNothing() { events_.abandon(); }
     Plugin(const Plugin&) = delete;
     Plugin& operator=(const Plugin&) = delete;
     /// Unloads the plug-in and closes the library.

@@ -4,9 +4,12 @@
 
 namespace cvagent {
 
+/// Below another root (chroot) the kernel tells the way from the host's own as soon as the process has left
+/// the mounts that it was started in.
 std::string programDirectory() {
     std::error_code error;
-    return std::filesystem::read_symlink("/proc/self/exe", error).parent_path();
+    static const std::string atFirst = std::filesystem::read_symlink("/proc/self/exe", error).parent_path();
+    return atFirst;
 }
 
 std::optional<std::string> besideProgram(std::initializer_list<const char*> directories, const char* name) {

@@ -4,6 +4,7 @@
 
 #include "agent/core/problem.h"
 #include "agent/core/text.h"
+#include "framework/qx/whole_number.h"
 
 namespace cvagent {
 
@@ -26,7 +27,7 @@ unsigned int readableId(const IC::MutableNode& node, const std::string& word) {
         }
         return row->id;
     }
-    if (const auto id = wholeNumber<unsigned int>(word)) {
+    if (const auto id = QX::wholeNumber<unsigned int>(word)) {
         return *id;
     }
     failWithout(className(node.nodeType()), word);

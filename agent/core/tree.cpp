@@ -6,7 +6,7 @@
 #include <set>
 
 #include "agent/core/problem.h"
-#include "agent/core/text.h"
+#include "framework/qx/whole_number.h"
 
 namespace cvagent {
 
@@ -78,7 +78,7 @@ void setPaths(const IC::ManagementInterface& interface) {
 }
 
 Handle findNode(const NodesOfEach& plugins, const std::string& text) {
-    if (const std::optional<unsigned int> id = wholeNumber<unsigned int>(text)) {
+    if (const std::optional<unsigned int> id = QX::wholeNumber<unsigned int>(text)) {
         for (const std::vector<Handle>& nodes : plugins) {
             if (Handle node = withId(nodes, *id)) {
                 return node;

@@ -8,6 +8,7 @@
 #include "agent/core/text.h"
 #include "framework/qx/date_time.h"
 #include "framework/qx/utf8.h"
+#include "framework/qx/whole_number.h"
 #include "framework/qx/zone_table.h"
 
 namespace cvagent::check {
@@ -20,7 +21,7 @@ constexpr std::size_t kLongestDateTime = 40;
 /// A number as a person writes it: no needless zeros.
 template <class Number>
 std::optional<Number> decimal(const std::string& text) {
-    const auto number = wholeNumber<Number>(text);
+    const auto number = QX::wholeNumber<Number>(text);
     return number && std::to_string(*number) == text ? number : std::nullopt;
 }
 

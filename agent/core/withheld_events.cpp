@@ -16,10 +16,15 @@ bool WithheldEvents::isKept(const Event& event) {
     if (event.kind == Event::Kind::alert && std::this_thread::get_id() != starter_) {
         decided_.wait_for(lock, kLongestWait, [this] { return released_ || abandoned_; });
     }
-    if (!released_) {
+    if (!released_ && !abandoned_) {
         kept_.push_back(event);
     }
     return !released_;
+}
+
+void WithheldEvents::startHere() {
+    const std::lock_guard lock(guard_);
+    starter_ = std::this_thread::get_id();
 }
 
 /// Under the lock, so that nothing that comes meanwhile overtakes what was kept.
@@ -36,6 +41,7 @@ void WithheldEvents::release() {
 void WithheldEvents::abandon() {
     const std::lock_guard lock(guard_);
     abandoned_ = true;
+    kept_.clear();
     decided_.notify_all();
 }
 

@@ -19,9 +19,11 @@ public:
     explicit WithheldEvents(Listener* listener) : listener_(listener) {}
 
     void hear(const Event& event) override;
+    /// The calling thread is the one that starts.
+    void startHere();
     /// Hands on what was kept, in its order; what comes later goes straight on.
     void release();
-    /// The start has failed: nothing waits any more.
+    /// The start has failed: nothing waits any more, and nothing is kept.
     void abandon();
 
 private:
@@ -33,7 +35,7 @@ private:
     Listener* const listener_;
     std::mutex guard_;  // guards everything below
     std::condition_variable decided_;
-    const std::thread::id starter_ = std::this_thread::get_id();
+    std::thread::id starter_;
     bool released_ = false;
     bool abandoned_ = false;
     std::deque<Event> kept_;

@@ -58,8 +58,9 @@ History::~History() = default;
 /// Under the lock (alone).
 /// @param last the number to go on from in a file that has nothing in it
 void History::openAlone(std::uint64_t last) {
+    const bool hadOne = hasTraces(place_);
     prepareHistoryFile(place_);
-    if (!hasSchema(Database(place_.file(), Database::Access::read)) && last == 0 && hasMovedAside(place_)) {
+    if (!hasSchema(Database(place_.file(), Database::Access::read)) && last == 0 && hadOne) {
         last = beyondAll();
     }
     opened_ = std::make_unique<Opened>(place_.file(), std::max(last, kept_));

@@ -89,7 +89,7 @@ void syncDirectory(const std::string& directory) {
 
 /// A file that is there is not opened: closing it would take the locks from who has it open in this process.
 void makeFile(const HistoryPlace& place) {
-    const int made = open(place.file().c_str(), O_RDWR | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600);
+    const int made = open(place.file().c_str(), O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC, 0600);
     if (made < 0 && errno != EEXIST) {
         failWith(errno, inQuotes(place.file()));
     }
@@ -99,7 +99,7 @@ void makeFile(const HistoryPlace& place) {
     }
 }
 
-/// The directory as ownDirectory has made it; one that is there keeps its mode.
+/// As ownDirectory has made it; a directory that somebody has given another owner or mode keeps them.
 void letReadersIn(const HistoryPlace& place, const std::optional<gid_t>& group) {
     const auto found = look(place.directory);
     if (group && found && found->st_gid == 0 && (found->st_mode & 07777) == 0700 &&
@@ -160,8 +160,8 @@ HistoryPlace reachHistoryPlace(HistoryPlace place) {
 
 void prepareHistoryFile(const HistoryPlace& place) {
     const auto group = readers(place);
+    letReadersIn(place, group);
     if (!look(place.file())) {
-        letReadersIn(place, group);
         makeFile(place);
     }
     for (const char* part : kParts) {
@@ -210,11 +210,12 @@ std::string moveAside(const HistoryPlace& place) {
     return aside;
 }
 
-bool hasMovedAside(const HistoryPlace& place) {
-    const std::string start = place.file() + kDamaged;
+bool hasTraces(const HistoryPlace& place) {
+    const std::string file = place.file();
     std::error_code error;
     for (const auto& entry : std::filesystem::directory_iterator(place.directory, error)) {
-        if (entry.path().string().starts_with(start)) {
+        const std::string found = entry.path().string();
+        if (found.starts_with(file + "-") || found.starts_with(file + kDamaged)) {
             return true;
         }
     }

@@ -43,8 +43,9 @@ HistoryPlace judgeForReading(HistoryPlace place);
 
 /// Gives the file, and what belongs to it, a name that says that it is damaged. @return that name
 std::string moveAside(const HistoryPlace& place);
-/// Whether a damaged file lies there.
-bool hasMovedAside(const HistoryPlace& place);
+/// Whether there was a file before, though perhaps nothing is left in it: what went with it lies there, or one
+/// that was moved aside.
+bool hasTraces(const HistoryPlace& place);
 
 /// Held while the file under the name is written (shared), or made, changed in form or moved (alone).
 class HistoryLock {

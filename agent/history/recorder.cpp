@@ -30,7 +30,7 @@ void Recorder::keep(std::vector<Event>& events) noexcept {
         }
     } catch (const std::exception& error) {
         reason = error.what();
-        nextTry_ = std::chrono::steady_clock::now() + kPause;
+        nextTry_ = std::chrono::steady_clock::now() + pause_;
     }
     try {
         keepLater(events);

@@ -17,8 +17,10 @@ class Recorder : public EventKeeper {
 public:
     /// @param place asked for when the first event comes
     /// @param tell hears of trouble, and of its end
-    Recorder(std::function<HistoryPlace()> place, Tell tell)
-        : place_(std::move(place)), tell_(std::move(tell)) {}
+    /// @param pause after a failure nothing is tried for as long: each try can take the time of a busy disk
+    Recorder(std::function<HistoryPlace()> place, Tell tell,
+             std::chrono::milliseconds pause = std::chrono::seconds(5))
+        : place_(std::move(place)), tell_(std::move(tell)), pause_(pause) {}
     Recorder(const Recorder&) = delete;
     Recorder& operator=(const Recorder&) = delete;
     /// Tries once more to keep what was not.
@@ -33,8 +35,6 @@ public:
 
 private:
     static constexpr std::size_t kMostWaiting = 4096;
-    /// After a failure nothing is tried for as long: each try can take the time of a busy disk.
-    static constexpr std::chrono::seconds kPause{5};
 
     void keepAll(std::vector<Event>& events);
     void keepLater(std::vector<Event>& events);
@@ -43,6 +43,7 @@ private:
 
     const std::function<HistoryPlace()> place_;
     const Tell tell_;
+    const std::chrono::milliseconds pause_;
     std::optional<History> history_;
     EventQueue waiting_{kMostWaiting};  // what was numbered and not kept
     std::uint64_t lost_ = 0;            // what will not be kept

@@ -61,8 +61,8 @@ bool Callers::find(const std::string& name, Found found) {
 }
 
 void Callers::ask(const std::string& name) {
-    const bus::Message call = connection_.newCall(
-        {"org.freedesktop.DBus", "/org/freedesktop/DBus", "org.freedesktop.DBus", "GetConnectionCredentials"});
+    const bus::Message call = connection_.newCall({"org.freedesktop.DBus", "/org/freedesktop/DBus",
+                                                   "org.freedesktop.DBus", "GetConnectionCredentials"});
     bus::Writer(call).put(name);
     asked_[name].slot = connection_.askLater(
         call, kPatience, [this, name](const bus::Message& answer) { answered(name, answer); });

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <array>
+#include <limits>
 #include <utility>
 
 #include "agent/core/property_words.h"
@@ -102,8 +103,8 @@ void PendingCall::guarded(const std::function<void()>& work) const {
 
 void PendingCall::withCaller(std::function<void(const Caller& caller)> next) const {
     const PendingCall held = *this;
-    const bool asked = parts_.callers.find(
-        message_.sender(), [held, go = std::move(next)](const Caller* caller) {
+    const bool asked =
+        parts_.callers.find(message_.sender(), [held, go = std::move(next)](const Caller* caller) {
             if (caller == nullptr) {
                 held.fail(bus::kAccessDenied, "the bus does not tell who calls");
             } else {
@@ -147,16 +148,43 @@ void answerFind(const CallPointer& call) {
     });
 }
 
+namespace {
+
+/// @param after the number that was asked for
+void answerEvents(const PendingCall& call, std::uint64_t after, const std::vector<Event>& events,
+                  std::uint64_t dropped) {
+    const std::uint64_t missing = events.empty() ? 0 : events.front().number - after - 1;
+    call.answer([&](bus::Writer& writer) {
+        writer.array(kEventType, [&] {
+            for (std::size_t i = 0; i < std::min(events.size(), kMostEvents); ++i) {
+                putEvent(writer, events[i]);
+            }
+        });
+        writer.put(std::min(dropped, missing));
+    });
+}
+
+}  // namespace
+
+/// What the agent itself remembers, and behind that the history.
 void answerEventsSince(const CallPointer& call) {
     const std::uint64_t after = bus::Reader(call->message()).longNumber();
     const Subscription::Taken taken = call->parts().agent.subscribe(after)->take();
-    call->answer([&](bus::Writer& writer) {
-        writer.array(kEventType, [&] {
-            for (std::size_t i = 0; i < std::min(taken.events.size(), kMostEvents); ++i) {
-                putEvent(writer, taken.events[i]);
+    std::vector<Event> events(taken.events.begin(), taken.events.end());
+    const std::uint64_t upTo =
+        events.empty() ? std::numeric_limits<std::int64_t>::max() : events.front().number - 1;
+    if (taken.dropped == 0 || !call->parts().past || after >= upTo) {
+        answerEvents(*call, after, events, taken.dropped);
+        return;
+    }
+    call->withCaller([call, after, upTo, events, dropped = taken.dropped](const Caller& caller) {
+        submit(call, call->parts().readers, caller, [call, after, upTo, events, dropped] {
+            std::vector<Event> all = call->parts().past(after, upTo, kMostEvents);
+            if (all.size() < kMostEvents) {
+                all.insert(all.end(), events.begin(), events.end());
             }
+            comeBack(call, [call, after, all, dropped] { answerEvents(*call, after, all, dropped); });
         });
-        writer.put(std::uint64_t{taken.dropped});
     });
 }
 
@@ -177,8 +205,7 @@ void startRead(const CallPointer& call, std::optional<std::uint32_t> node) {
             const std::vector<unsigned int> ids =
                 wanted.empty() ? readableIds(*ref, {})
                                : std::vector<unsigned int>(wanted.begin(), wanted.end());
-            const auto readings =
-                call->parts().agent.read(ref, ids, cvagent::Freshness::now, request);
+            const auto readings = call->parts().agent.read(ref, ids, cvagent::Freshness::now, request);
             const std::vector<std::string> errors = request.errors().take().texts;
             comeBack(call, [call, id, withheld, readings, errors] {
                 call->parts().model.learn(id, readings);

@@ -17,6 +17,10 @@
 
 namespace cvagent::service {
 
+/// Events behind a number and up to another one, at most so many.
+using EventSource =
+    std::function<std::vector<Event>(std::uint64_t after, std::uint64_t upTo, std::size_t most)>;
+
 /// What the members of the service's objects need; all of it outlives them.
 struct Parts {
     bus::Connection& connection;
@@ -28,6 +32,8 @@ struct Parts {
     Workers& readers;
     Workers& writers;
     std::shared_ptr<Mailbox> mailbox;
+    /// Reads what happened behind a number, as many as are wanted; null where nothing is kept. Any thread.
+    EventSource past;
 };
 
 /// A call that is answered later. What goes wrong on the way is the answer.

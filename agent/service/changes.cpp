@@ -119,30 +119,37 @@ void Changes::tellRemoved(const Gone& gone) const {
 }
 
 void Changes::tellChanged(const NodeView& node, const Changed& changed) const {
-    const auto signalOf = [&] {
-        return connection_.newSignal(node.object, "org.freedesktop.DBus.Properties", "PropertiesChanged");
-    };
     if (!changed.node.empty()) {
-        const bus::Message signal = signalOf();
-        bus::Writer writer(signal);
-        writer.put(kNodeInterface).array("{sv}", [&] {
-            for (const std::string& name : changed.node) {
-                writer.entry("sv", [&] {
-                    writer.put(name);
-                    putNodeProperty(writer, *model_, node, name);
-                });
-            }
-        });
-        connection_.send((writer.put(std::vector<std::string>()), signal));
+        tellNodeProperties(node, changed.node);
     }
-    if (changed.own.empty()) {
-        return;
+    if (!changed.own.empty()) {
+        tellOwnProperties(node, changed.own);
     }
-    const bus::Message signal = signalOf();
+}
+
+void Changes::tellNodeProperties(const NodeView& node, const std::set<std::string>& names) const {
+    const bus::Message signal =
+        connection_.newSignal(node.object, "org.freedesktop.DBus.Properties", "PropertiesChanged");
+    bus::Writer writer(signal);
+    writer.put(kNodeInterface).array("{sv}", [&] {
+        for (const std::string& name : names) {
+            writer.entry("sv", [&] {
+                writer.put(name);
+                putNodeProperty(writer, *model_, node, name);
+            });
+        }
+    });
+    writer.put(std::vector<std::string>());
+    connection_.send(signal);
+}
+
+void Changes::tellOwnProperties(const NodeView& node, const std::set<std::string>& names) const {
+    const bus::Message signal =
+        connection_.newSignal(node.object, "org.freedesktop.DBus.Properties", "PropertiesChanged");
     bus::Writer writer(signal);
     std::vector<std::string> untold;  // no longer known, or not for everybody
     writer.put(node.interface).array("{sv}", [&] {
-        for (const std::string& name : changed.own) {
+        for (const std::string& name : names) {
             const Reading* reading = findByName(node, name);
             if (reading == nullptr || !isKnown(*reading) || isTrusted(*reading)) {
                 untold.push_back(name);

@@ -48,6 +48,8 @@ private:
     void tellAdded(const NodeView& node) const;
     void tellRemoved(const Gone& gone) const;
     void tellChanged(const NodeView& node, const Changed& changed) const;
+    void tellNodeProperties(const NodeView& node, const std::set<std::string>& names) const;
+    void tellOwnProperties(const NodeView& node, const std::set<std::string>& names) const;
 
     bus::Connection& connection_;
     Loop& loop_;

@@ -15,6 +15,7 @@
 #include "agent/core/owners.h"
 #include "agent/core/problem.h"
 #include "agent/core/text.h"
+#include "framework/qx/whole_number.h"
 
 namespace cvagent::service {
 
@@ -27,14 +28,14 @@ using Setter = bool (*)(Config& config, const std::string& value);
 
 /// The number when it lies within the bounds.
 std::optional<long> numberWithin(const std::string& value, long least, long most) {
-    const auto number = wholeNumber<long>(value);
+    const auto number = QX::wholeNumber<long>(value);
     return number && *number >= least && *number <= most ? number : std::nullopt;
 }
 
 template <auto Member, long Least, long Most, bool ZeroToo = false>
 bool setDuration(Config& config, const std::string& value) {
-    const auto number = numberWithin(value, ZeroToo ? 0 : Least, Most);
-    if (!number || (*number < Least && *number != 0)) {
+    const auto number = ZeroToo && value == "0" ? std::optional(0L) : numberWithin(value, Least, Most);
+    if (!number) {
         return false;
     }
     config.*Member = std::remove_reference_t<decltype(config.*Member)>(*number);
@@ -53,6 +54,20 @@ bool setGroup(Config& config, const std::string& value) {
     return true;
 }
 
+bool setHistoryAge(Config& config, const std::string& value) {
+    constexpr long kMostDays = 36500;
+    const auto days = numberWithin(value, 1, kMostDays);
+    config.historyAge = std::chrono::hours(24 * days.value_or(1));
+    return days.has_value();
+}
+
+bool setHistorySize(Config& config, const std::string& value) {
+    constexpr long kMostMebibytes = 65536;
+    const auto mebibytes = numberWithin(value, 1, kMostMebibytes);
+    config.historyBytes = static_cast<std::uint64_t>(mebibytes.value_or(1)) << 20U;
+    return mebibytes.has_value();
+}
+
 struct Key {
     const char* name;
     Setter set;
@@ -66,6 +81,8 @@ constexpr Key kKeys[] = {
     {"command-timeout", setDuration<&Config::commandTime, 1, 3600, true>,
      "seconds from 1 to 3600, or 0 for no limit"},
     {"trusted-group", setGroup, "the name of a group"},
+    {"history-days", setHistoryAge, "days from 1 to 36500"},
+    {"history-size", setHistorySize, "mebibytes from 1 to 65536"},
 };
 
 std::string trimmed(std::string_view text) {

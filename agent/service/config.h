@@ -1,6 +1,7 @@
 #pragma once
 
 #include <chrono>
+#include <cstdint>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -15,6 +16,8 @@ struct Config {
     std::chrono::milliseconds settlingTime{200};  ///< how long it must be quiet before a look
     std::chrono::seconds commandTime{10};         ///< of a plug-in's command; taken at the start
     std::string trustedGroup = "corvista";
+    std::chrono::seconds historyAge = std::chrono::hours(24 * 400);  ///< older entries of the history go
+    std::uint64_t historyBytes = std::uint64_t{64} << 20U;           ///< of its file
 };
 
 /// A file that is read: what it says, and what is wrong with it.

@@ -16,7 +16,7 @@ namespace {
 
 constexpr std::chrono::seconds kUserTime{300};  // a person finds the password
 constexpr std::chrono::seconds kPolkitTime{10};
-constexpr std::size_t kMostOfOne = 4;  // questions of one connection at a time
+constexpr std::size_t kMostOfOne = 8;  // questions about one user at a time
 
 /// One row an audience, in the order of the enumeration.
 struct Rule {
@@ -70,34 +70,37 @@ void Consent::ask(const Caller& caller, const Question& question, Decided decide
 }
 
 void Consent::askPolkit(const Caller& caller, const Question& question, Decided decided) {
-    if (pendingOf_[caller.name] >= kMostOfOne) {
+    if (pendingOf_[caller.user] >= kMostOfOne) {
         decided(false, "polkit has not decided about earlier calls yet");
         return;
     }
-    const bus::Message call = connection_.newCall({kPolkit, "/org/freedesktop/PolicyKit1/Authority",
-                                                "org.freedesktop.PolicyKit1.Authority", "CheckAuthorization"});
+    const bus::Message call =
+        connection_.newCall({kPolkit, "/org/freedesktop/PolicyKit1/Authority",
+                             "org.freedesktop.PolicyKit1.Authority", "CheckAuthorization"});
     bus::Writer writer(call);
     writer.structure("sa{sv}", [&] {
         writer.put("system-bus-name").array("{sv}", [&] {
-            writer.entry("sv", [&] {
-                writer.put("name").variant("s", [&] { writer.put(caller.name); });
-            });
+            writer.entry("sv", [&] { writer.put("name").variant("s", [&] { writer.put(caller.name); }); });
         });
     });
     writer.put(kRules.at(static_cast<std::size_t>(question.audience)).action);
-    writer.array("{ss}", [&] { writer.entry("ss", [&] { writer.put("deed").put(question.deed); }); });
+    writer.array("{ss}", [&] {
+        if (geteuid() == 0) {  // polkit takes details from root only
+            writer.entry("ss", [&] { writer.put("deed").put(question.deed); });
+        }
+    });
     writer.put(std::uint32_t{question.mayAskUser ? 1U : 0U}).put("");
     const std::uint64_t number = ++asked_;
-    ++pendingOf_[caller.name];
-    pending_[number] = connection_.askLater(
-        call, question.mayAskUser ? kUserTime : kPolkitTime,
-        [this, number, caller, held = std::move(decided)](const bus::Message& answer) {
-            const bus::Slot slot = std::move(pending_.extract(number).mapped());
-            if (--pendingOf_[caller.name] == 0) {
-                pendingOf_.erase(caller.name);
-            }
-            polkitAnswered(caller, answer, held);
-        });
+    ++pendingOf_[caller.user];
+    pending_[number] =
+        connection_.askLater(call, question.mayAskUser ? kUserTime : kPolkitTime,
+                             [this, number, caller, held = std::move(decided)](const bus::Message& answer) {
+                                 const bus::Slot slot = std::move(pending_.extract(number).mapped());
+                                 if (--pendingOf_[caller.user] == 0) {
+                                     pendingOf_.erase(caller.user);
+                                 }
+                                 polkitAnswered(caller, answer, held);
+                             });
 }
 
 void Consent::polkitAnswered(const Caller& caller, const bus::Message& answer, const Decided& decided) {

@@ -54,7 +54,7 @@ private:
     bool polkitFound_ = false;
     std::uint64_t asked_ = 0;
     std::map<std::uint64_t, bus::Slot> pending_;
-    std::map<std::string, std::size_t> pendingOf_;  // by connection
+    std::map<std::uint32_t, std::size_t> pendingOf_;  // by user
     bus::Slot look_;
 };
 

@@ -1,6 +1,9 @@
 #include "agent/service/daemon.h"
 
+#include <unistd.h>
+
 #include <algorithm>
+#include <csignal>
 #include <optional>
 
 #include "agent/core/catalogue_file.h"
@@ -9,6 +12,8 @@
 #include "agent/core/signals.h"
 #include "agent/service/log.h"
 #include "agent/service/manager.h"
+#include "agent/service/names.h"
+#include "agent/service/past.h"
 #include "agent/service/private_bus.h"
 #include "agent/service/service.h"
 #include "agent/service/stop_request.h"
@@ -43,7 +48,8 @@ ProcessSettings processSettings(Options& options) {
             settings.files.push_back(&file);
         }
     }
-    settings.log.advice = "; rename what has that name: letters, digits, dots, dashes and underscores are fine";
+    settings.log.advice =
+        "; rename what has that name: letters, digits, dots, dashes and underscores are fine";
     settings.commands = options.commands;
     settings.hostTools = options.hostTools;
     settings.linksMayCome = true;
@@ -59,10 +65,13 @@ std::optional<Config> goodConfig(const Options& options) {
     return read.complaints.empty() ? std::optional(read.config) : std::nullopt;
 }
 
-AgentSettings agentSettings(const PreparedProcess& process, const Options& options, const Config& config) {
+AgentSettings agentSettings(const PreparedProcess& process, const Options& options, const Config& config,
+                            const Past& past) {
     AgentSettings settings = process.agentSettings();
     settings.plugins = options.plugins;
     settings.commandTime = config.commandTime;
+    settings.keeper = past.keeper();
+    settings.lastEvent = past.last();
     settings.tell = [](const std::string& text) { log(Priority::warning, text); };
     return settings;
 }
@@ -83,13 +92,14 @@ public:
     Daemon(const Options& options, const Manager& manager, bus::Connection& connection, ErrorLines& errors)
         : options_(options), manager_(manager), connection_(connection), errors_(errors) {}
 
-    void run(Agent& agent, const Config& config) {
-        Service service(loop_, connection_, agent, config);
+    void run(Agent& agent, const Config& config, const Past& past) {
+        Service service(loop_, connection_, agent, config, Past::read, past.last());
         service_ = &service;
         sd_bus_attach_event(connection_.get(), loop_.get(), SD_EVENT_PRIORITY_NORMAL);
         signals_ = loop_.whenReadable(stop_.descriptor(), [this] { takeSignals(); });
         service.begin();
-        const std::string state = std::to_string(service.nodes()) + " nodes on the bus as " + connection_.uniqueName();
+        const std::string state =
+            std::to_string(service.nodes()) + " nodes on the bus as " + connection_.uniqueName();
         log(Priority::info, state);
         manager_.status(state);
         manager_.ready();
@@ -98,13 +108,23 @@ public:
         watchBus();
         loop_.run();
         sd_bus_detach_event(connection_.get());
-        connection_.flush();
+        leaveBus();
     }
     bool busLost() const { return busLost_; }
     int endedBy() const { return signal_; }
     void giveSignalsBack() { stop_.release(); }
 
 private:
+    /// When the bus has answered twice it has passed on what it was given before. A bus of our own ends next.
+    void leaveBus() const {
+        try {
+            connection_.releaseName(kBusName);
+            whoServes(connection_);
+        } catch (const bus::Error&) {
+            // It is gone.
+        }
+    }
+
     void takeSignals() {
         for (int signal = StopRequest::take(); signal != 0; signal = StopRequest::take()) {
             if (signal == SIGHUP) {
@@ -120,7 +140,7 @@ private:
 
     void endWhenWritten(std::chrono::steady_clock::time_point latest) {
         if (!service_->isWriting() || std::chrono::steady_clock::now() >= latest) {
-            loop_.stop();
+            loop_.mailbox()->post([this] { loop_.stop(); });  // behind the answer to the last write
             return;
         }
         writes_ = loop_.after(kLookForWrites, [this, latest] { endWhenWritten(latest); });
@@ -131,6 +151,7 @@ private:
         try {
             if (const auto config = goodConfig(options_)) {
                 service_->configure(*config);
+                Past::configure(*config);
                 log(Priority::info, "the configuration was read again");
             } else {
                 log(Priority::warning, "the configuration stays as it was");
@@ -193,16 +214,18 @@ ExitStatus serve(Options& options, const Manager& manager, bus::Connection& conn
         return ExitStatus::usage;
     }
     const OrderlyEnd orderly;
+    const Past past;
+    Past::configure(*config);
     Daemon daemon(options, manager, connection, process.errors());
     {
-        Agent agent(agentSettings(process, options, *config));
+        Agent agent(agentSettings(process, options, *config, past));
         for (const Agent::FailedPlugin& failed : agent.failedPlugins()) {
             log(Priority::warning, failed.problem.what());
         }
-        daemon.run(agent, *config);
+        daemon.run(agent, *config, past);
         daemon.giveSignalsBack();
         if (daemon.endedBy() != 0) {
-            raise(daemon.endedBy());  // from here on the end is a matter of a second
+            kill(getpid(), daemon.endedBy());  // from here on the end is a matter of a second
         }
     }
     showErrors(process.errors());

@@ -76,9 +76,10 @@ std::string classInterface(const NodeView& node) {
         if (isKnown(reading)) {
             text += "<property name=\"" + propertyNameOf(reading.id, reading.row) + "\" type=\"" +
                     typeOf(reading.value) + "\" access=\"read\"";
-            text += isTrusted(reading) ? "><annotation name=\"org.freedesktop.DBus.Property.EmitsChangedSignal"
-                                         "\" value=\"invalidates\"/></property>\n"
-                                       : "/>\n";
+            text += isTrusted(reading)
+                        ? "><annotation name=\"org.freedesktop.DBus.Property.EmitsChangedSignal"
+                          "\" value=\"invalidates\"/></property>\n"
+                        : "/>\n";
         }
     }
     return text + "</interface>\n";

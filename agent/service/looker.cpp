@@ -1,6 +1,7 @@
 #include "agent/service/looker.h"
 
 #include <algorithm>
+#include <set>
 #include <utility>
 
 #include "agent/service/concerns.h"

@@ -103,8 +103,7 @@ Loop::Source Loop::after(Duration time, Work work) {
 Loop::Source Loop::whenReadable(int descriptor, Work work) {
     const auto registered = std::make_shared<Registered>(Registered{this, std::move(work)});
     sd_event_source* source = nullptr;
-    checkLoop(
-        sd_event_add_io(get(), &source, descriptor, EPOLLIN, Registered::ready, registered.get()));
+    checkLoop(sd_event_add_io(get(), &source, descriptor, EPOLLIN, Registered::ready, registered.get()));
     return made(source, registered);
 }
 

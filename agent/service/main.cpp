@@ -2,7 +2,9 @@
 #include <string>
 
 #include "agent/bus/error.h"
+#include "agent/core/problem.h"
 #include "agent/core/signals.h"
+#include "agent/core/surroundings.h"
 #include "agent/service/daemon.h"
 #include "agent/service/log.h"
 #include "agent/service/options.h"

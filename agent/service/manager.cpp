@@ -10,6 +10,7 @@
 #include <ctime>
 
 #include "agent/core/text.h"
+#include "framework/qx/whole_number.h"
 
 namespace cvagent::service {
 
@@ -24,7 +25,7 @@ std::string variable(const char* name) {
 
 Manager::Manager() : socket_(variable("NOTIFY_SOCKET")) {
     const std::string process = variable("WATCHDOG_PID");
-    const auto longest = wholeNumber<long long>(variable("WATCHDOG_USEC"));
+    const auto longest = QX::wholeNumber<long long>(variable("WATCHDOG_USEC"));
     if (longest && *longest > 1 && (process.empty() || process == std::to_string(getpid()))) {
         watchdog_ = std::chrono::microseconds(*longest / 2);
     }
@@ -56,7 +57,8 @@ void Manager::tell(const std::string& state) const {
         return;
     }
     const auto length = static_cast<socklen_t>(offsetof(sockaddr_un, sun_path) + socket_.size());
-    sendto(descriptor, state.data(), state.size(), MSG_NOSIGNAL, reinterpret_cast<sockaddr*>(&address), length);
+    sendto(descriptor, state.data(), state.size(), MSG_NOSIGNAL, reinterpret_cast<sockaddr*>(&address),
+           length);
     close(descriptor);
 }
 

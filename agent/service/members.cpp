@@ -35,10 +35,8 @@ constexpr NodeProperty kNodeProperties[] = {
     {"Description",
      [](bus::Writer& writer, const Model&, const NodeView& node) { text(writer, node.description); }},
     {"Status", [](bus::Writer& writer, const Model&, const NodeView& node) { number(writer, node.status); }},
-    {"ReadAt",
-     [](bus::Writer& writer, const Model&, const NodeView& node) {
-         writer.variant("t", [&] { writer.put(node.readAt); });
-     }},
+    {"ReadAt", [](bus::Writer& writer, const Model&,
+                  const NodeView& node) { writer.variant("t", [&] { writer.put(node.readAt); }); }},
 };
 
 }  // namespace

@@ -149,7 +149,7 @@ void Model::learn(std::uint32_t id, const std::vector<Reading>& readings) {
         return;
     }
     for (const Reading& reading : readings) {
-        if (!reading.missing) {
+        if (!reading.failed() || reading.stale) {
             takeReading(known->second, reading);
         }
     }

@@ -5,9 +5,9 @@
 #include <iterator>
 #include <utility>
 
-#include "agent/service/standard_calls.h"
 #include "agent/service/introspection.h"
 #include "agent/service/names.h"
+#include "agent/service/standard_calls.h"
 
 namespace cvagent::service {
 
@@ -26,7 +26,8 @@ struct Method {
 
 constexpr Method kMethods[] = {
     {kAgentInterface, "Tree", "", On::agent, [](const CallPointer& call, const Place&) { answerTree(call); }},
-    {kAgentInterface, "Find", "s", On::agent, [](const CallPointer& call, const Place&) { answerFind(call); }},
+    {kAgentInterface, "Find", "s", On::agent,
+     [](const CallPointer& call, const Place&) { answerFind(call); }},
     {kAgentInterface, "Read", "uau", On::agent,
      [](const CallPointer& call, const Place&) { startRead(call, std::nullopt); }},
     {kAgentInterface, "Write", "uuv", On::agent,
@@ -59,9 +60,8 @@ const Method& methodOf(const bus::Message& message, const Place& place) {
     if (found != std::end(kMethods)) {
         return *found;
     }
-    const bool known = std::ranges::any_of(kMethods, [&](const Method& method) {
-        return interface == method.interface && isOn(method, place);
-    });
+    const bool known = std::ranges::any_of(
+        kMethods, [&](const Method& method) { return interface == method.interface && isOn(method, place); });
     throw bus::Error(known ? bus::kUnknownMethod : bus::kUnknownInterface,
                      place.object + " has no method " + interface + (interface.empty() ? "" : ".") + member);
 }

@@ -49,8 +49,9 @@ void addOptions(CLI::App& app, Options& options) {
     app.add_flag("--check", options.check, "Read the configuration, say what is wrong with it, and end");
     app.add_option("--config", options.config, "The configuration. Default: /etc/corvista/agent.conf")
         ->type_name("FILE");
-    auto* bus = app.add_option("--bus", options.bus, "The bus to serve: the system's (default) or one's address")
-                    ->type_name("system|ADDRESS");
+    auto* bus =
+        app.add_option("--bus", options.bus, "The bus to serve: the system's (default) or one's address")
+            ->type_name("system|ADDRESS");
     auto* own = app.add_flag("--private-bus", options.privateBus,
                              "Start a bus of its own, for hosts without a system bus, and serve that");
     own->excludes(bus);

@@ -12,14 +12,14 @@ namespace cvagent::service {
 
 /// What the command line asks for.
 struct Options {
-    bool check = false;                  ///< only read the configuration and say what is wrong
+    bool check = false;  ///< only read the configuration and say what is wrong
     std::string config = kConfigFile;
     bool configNamed = false;
-    std::string bus = "system";          ///< or an address
+    std::string bus = "system";  ///< or an address
     bool privateBus = false;
-    std::string runDirectory;            ///< of the private bus; "" for the standard one
-    std::vector<std::string> plugins;    ///< none: those beside the program
-    std::vector<std::string> catalogues; ///< beside them; not typed
+    std::string runDirectory;             ///< of the private bus; "" for the standard one
+    std::vector<std::string> plugins;     ///< none: those beside the program
+    std::vector<std::string> catalogues;  ///< beside them; not typed
     HostTools hostTools = HostTools::automatic;
     Commands commands = Commands::direct;
 };

@@ -19,7 +19,6 @@
 
 #include "agent/core/problem.h"
 #include "agent/core/text.h"
-#include "agent/service/names.h"
 
 namespace cvagent::service {
 
@@ -27,8 +26,54 @@ namespace {
 
 constexpr const char* kSocket = "bus";
 constexpr const char* kConfig = "bus.conf";
-constexpr int kPatience = 5000;  // milliseconds for its start
+constexpr int kStartTime = 5000;  // milliseconds for its start
 constexpr std::array kPrograms = {"/usr/bin/dbus-daemon", "/bin/dbus-daemon", "/usr/local/bin/dbus-daemon"};
+
+constexpr const char* kHead =
+    R"(<!DOCTYPE busconfig PUBLIC "-//freedesktop//DTD D-Bus Bus Configuration 1.0//EN"
+ "http://www.freedesktop.org/standards/dbus/1.0/busconfig.dtd">
+<busconfig>
+)";
+/// Everybody may call the agent and the bus, and own, send to and signal nothing else.
+constexpr const char* kEverybody = R"(  <auth>EXTERNAL</auth>
+  <policy context="default">
+    <allow user="*"/>
+    <deny own="*"/>
+    <deny send_type="method_call"/>
+    <deny send_type="signal"/>
+    <allow send_requested_reply="true" send_type="method_return"/>
+    <allow send_requested_reply="true" send_type="error"/>
+    <allow receive_type="method_call"/>
+    <allow receive_type="method_return"/>
+    <allow receive_type="error"/>
+    <allow receive_type="signal"/>
+    <allow send_destination="org.freedesktop.DBus"/>
+    <deny send_destination="org.freedesktop.DBus" send_interface="org.freedesktop.DBus"
+          send_member="UpdateActivationEnvironment"/>
+    <allow send_destination="com.vantrel.Corvista1"/>
+  </policy>
+)";
+constexpr const char* kOwner = R"(    <allow own="*"/>
+    <allow send_type="signal"/>
+    <allow send_type="method_call"/>
+)";
+struct Limit {
+    const char* name;
+    long value;
+};
+/// A reader that stops costs the daemon what may wait for him, and nobody else anything.
+constexpr std::array<Limit, 12> kLimits = {{{"max_outgoing_bytes", 4L << 20},
+                                            {"max_incoming_bytes", 4L << 20},
+                                            {"max_message_size", 32L << 20},
+                                            {"max_completed_connections", 512},
+                                            {"max_incomplete_connections", 256},
+                                            {"max_connections_per_user", 256},
+                                            {"max_pending_service_starts", 1},
+                                            {"max_names_per_connection", 4},
+                                            {"max_match_rules_per_connection", 64},
+                                            {"max_replies_per_connection", 128},
+                                            {"auth_timeout", 5000},
+                                            {"reply_timeout", 900000}}};
 
 [[noreturn]] void failToStart(const std::string& why) {
     throw Problem(Problem::failed, "cannot start a bus of our own: " + why);
@@ -53,8 +98,7 @@ std::string escapedXml(const std::string& text) {
 
 /// Bytes of an address that stand for themselves; others are written as %2f.
 std::string escapedAddress(const std::string& path) {
-    constexpr std::string_view kPlain =
-        "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789-_/.";
+    constexpr std::string_view kPlain = "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789-_/.";
     constexpr std::string_view kDigits = "0123456789abcdef";
     std::string escaped;
     for (const char byte : path) {
@@ -83,42 +127,16 @@ std::string escapedAddress(const std::string& path) {
 }  // namespace
 
 std::string privateBusConfig(const std::string& socket, uid_t owner) {
-    struct Limit {
-        const char* name;
-        long value;
-    };
-    // A reader that stops costs the daemon what may wait for him, and nobody else anything.
-    constexpr std::array<Limit, 12> kLimits = {{{"max_outgoing_bytes", 4L << 20},
-                                                {"max_incoming_bytes", 4L << 20},
-                                                {"max_message_size", 64L << 20},
-                                                {"max_completed_connections", 512},
-                                                {"max_incomplete_connections", 32},
-                                                {"max_connections_per_user", 256},
-                                                {"max_pending_service_starts", 1},
-                                                {"max_names_per_connection", 4},
-                                                {"max_match_rules_per_connection", 64},
-                                                {"max_replies_per_connection", 128},
-                                                {"auth_timeout", 5000},
-                                                {"reply_timeout", 900000}}};
-    std::string text = "<!DOCTYPE busconfig PUBLIC \"-//freedesktop//DTD D-Bus Bus Configuration 1.0//EN\"\n"
-                       " \"http://www.freedesktop.org/standards/dbus/1.0/busconfig.dtd\">\n<busconfig>\n";
-    text += "  <type>corvista</type>\n  <listen>unix:path=" + escapedXml(escapedAddress(socket)) + "</listen>\n";
-    text += "  <auth>EXTERNAL</auth>\n  <policy context=\"default\">\n    <allow user=\"*\"/>\n"
-            "    <deny own=\"*\"/>\n    <deny send_type=\"method_call\"/>\n    <deny send_type=\"signal\"/>\n"
-            "    <allow send_requested_reply=\"true\" send_type=\"method_return\"/>\n"
-            "    <allow send_requested_reply=\"true\" send_type=\"error\"/>\n"
-            "    <allow receive_type=\"method_call\"/>\n    <allow receive_type=\"method_return\"/>\n"
-            "    <allow receive_type=\"error\"/>\n    <allow receive_type=\"signal\"/>\n"
-            "    <allow send_destination=\"org.freedesktop.DBus\"/>\n"
-            "    <deny send_destination=\"org.freedesktop.DBus\" send_interface=\"org.freedesktop.DBus\" "
-            "send_member=\"UpdateActivationEnvironment\"/>\n    <allow send_destination=\"" +
-            std::string(kBusName) + "\"/>\n  </policy>\n";
+    std::string text = kHead;
+    text +=
+        "  <type>corvista</type>\n  <listen>unix:path=" + escapedXml(escapedAddress(socket)) + "</listen>\n";
+    text += kEverybody;
     for (const std::string& user : {std::string("0"), std::to_string(owner)}) {
-        text += "  <policy user=\"" + user + "\">\n    <allow own=\"*\"/>\n    <allow send_type=\"signal\"/>\n"
-                "    <allow send_type=\"method_call\"/>\n  </policy>\n";
+        text += "  <policy user=\"" + user + "\">\n" + kOwner + "  </policy>\n";
     }
     for (const Limit& limit : kLimits) {
-        text += "  <limit name=\"" + std::string(limit.name) + "\">" + std::to_string(limit.value) + "</limit>\n";
+        text +=
+            "  <limit name=\"" + std::string(limit.name) + "\">" + std::to_string(limit.value) + "</limit>\n";
     }
     return text + "</busconfig>\n";
 }
@@ -133,7 +151,7 @@ std::string PrivateBus::standardDirectory() {
 
 PrivateBus::PrivateBus(const std::string& directory) {
     try {
-        directory_.emplace(directory, DirectoryRole{Problem::none, ""});
+        directory_.emplace(directory, DirectoryRole{Problem::none, "", "directory of the bus"});
     } catch (const std::system_error& error) {
         failToStart("the directory " + inQuotes(directory) + ": " + error.code().message());
     } catch (const Problem& problem) {
@@ -181,7 +199,7 @@ void PrivateBus::start(const std::string& config) {
 void PrivateBus::waitForAddress(int pipe) {
     pollfd readable{pipe, POLLIN, 0};
     std::array<char, 512> text{};
-    if (poll(&readable, 1, kPatience) == 1 && read(pipe, text.data(), text.size()) > 0) {
+    if (poll(&readable, 1, kStartTime) == 1 && read(pipe, text.data(), text.size()) > 0) {
         address_ = "unix:path=" + escapedAddress(directory_->path() + kSocket);
     }
 }

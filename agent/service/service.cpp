@@ -17,7 +17,7 @@ constexpr Workers::Limits kWriters{1, 16, 64};
 constexpr std::chrono::seconds kBusTime{10};
 
 bus::Message busCall(const bus::Connection& connection, const std::string& member) {
-    const bus::Message call =
+    bus::Message call =
         connection.newCall({"org.freedesktop.DBus", "/org/freedesktop/DBus", "org.freedesktop.DBus", member});
     bus::Writer(call).put(kBusName);
     return call;
@@ -37,7 +37,8 @@ std::string whoServes(const bus::Connection& connection) {
     }
 }
 
-Service::Service(Loop& loop, bus::Connection& connection, Agent& agent, const Config& config)
+Service::Service(Loop& loop, bus::Connection& connection, Agent& agent, const Config& config,
+                 EventSource past, std::uint64_t lastEvent)
     : loop_(loop),
       connection_(connection),
       agent_(agent),
@@ -52,9 +53,11 @@ Service::Service(Loop& loop, bus::Connection& connection, Agent& agent, const Co
               }),
       readers_(kReaders),
       writers_(kWriters),
-      parts_{connection, agent, model_, callers_, consent_, looker_, readers_, writers_, loop.mailbox()},
+      parts_{connection, agent,    model_,   callers_,       consent_,
+             looker_,    readers_, writers_, loop.mailbox(), std::move(past)},
       objects_(parts_, standing_) {
     standing_.version = CORVISTA_VERSION;
+    standing_.lastEvent = lastEvent;
     configure(config);
 }
 

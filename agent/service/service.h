@@ -18,7 +18,10 @@ namespace cvagent::service {
 class Service {
 public:
     /// All outlive it.
-    Service(Loop& loop, bus::Connection& connection, Agent& agent, const Config& config);
+    /// @param past      what happened before; null where nothing is kept
+    /// @param lastEvent its last number
+    Service(Loop& loop, bus::Connection& connection, Agent& agent, const Config& config,
+            EventSource past = nullptr, std::uint64_t lastEvent = 0);
     Service(const Service&) = delete;
     Service& operator=(const Service&) = delete;
     /// What is under way is waited for.

@@ -31,18 +31,16 @@ void putText(bus::Writer& writer, const std::string& value) {
 constexpr AgentProperty kAgentProperties[] = {
     {"Version",
      [](bus::Writer& writer, const Parts&, const Standing& standing) { putText(writer, standing.version); }},
-    {"Plugins",
-     [](bus::Writer& writer, const Parts& parts, const Standing&) {
-         writer.variant("as", [&] { writer.put(parts.agent.plugins()); });
-     }},
-    {"StartedAt",
-     [](bus::Writer& writer, const Parts&, const Standing& standing) { putTime(writer, standing.startedAt); }},
+    {"Plugins", [](bus::Writer& writer, const Parts& parts,
+                   const Standing&) { writer.variant("as", [&] { writer.put(parts.agent.plugins()); }); }},
+    {"StartedAt", [](bus::Writer& writer, const Parts&,
+                     const Standing& standing) { putTime(writer, standing.startedAt); }},
     {"LookedAt",
      [](bus::Writer& writer, const Parts&, const Standing& standing) { putTime(writer, standing.lookedAt); }},
-    {"LastEvent",
-     [](bus::Writer& writer, const Parts&, const Standing& standing) { putTime(writer, standing.lastEvent); }},
-    {"Consent",
-     [](bus::Writer& writer, const Parts& parts, const Standing&) { putText(writer, parts.consent.source()); }},
+    {"LastEvent", [](bus::Writer& writer, const Parts&,
+                     const Standing& standing) { putTime(writer, standing.lastEvent); }},
+    {"Consent", [](bus::Writer& writer, const Parts& parts,
+                   const Standing&) { putText(writer, parts.consent.source()); }},
 };
 
 /// Those without properties of ours.
@@ -58,10 +56,9 @@ bool isStandard(const std::string& interface) {
 }
 
 void checkInterface(const Place& place, const std::string& interface) {
-    const bool known = interface.empty() || isStandard(interface) ||
-                       (place.isAgent && interface == kAgentInterface) ||
-                       (place.node != nullptr &&
-                        (interface == kNodeInterface || interface == place.node->interface));
+    const bool known =
+        interface.empty() || isStandard(interface) || (place.isAgent && interface == kAgentInterface) ||
+        (place.node != nullptr && (interface == kNodeInterface || interface == place.node->interface));
     if (!known) {
         failWithoutInterface(place, interface);
     }
@@ -169,9 +166,8 @@ void getProperty(const CallPointer& call, const Place& place) {
         place.isAgent && own != nullptr && meant(kAgentInterface)) {
         call->answer([&](bus::Writer& writer) { own->put(writer, call->parts(), place.standing); });
     } else if (isNodeProperty(place, name) && meant(kNodeInterface)) {
-        call->answer([&](bus::Writer& writer) {
-            putNodeProperty(writer, call->parts().model, *place.node, name);
-        });
+        call->answer(
+            [&](bus::Writer& writer) { putNodeProperty(writer, call->parts().model, *place.node, name); });
     } else if (place.node != nullptr && meant(place.node->interface)) {
         getOfClass(call, place, name);
     } else {
@@ -183,8 +179,7 @@ void getAllProperties(const CallPointer& call, const Place& place) {
     const std::string interface = bus::Reader(call->message()).text();
     checkInterface(place, interface);
     if (place.isAgent && (interface.empty() || interface == kAgentInterface)) {
-        call->answer(
-            [&](bus::Writer& writer) { putAgentProperties(writer, call->parts(), place.standing); });
+        call->answer([&](bus::Writer& writer) { putAgentProperties(writer, call->parts(), place.standing); });
     } else if (place.node != nullptr && (interface.empty() || interface == kNodeInterface)) {
         call->answer(
             [&](bus::Writer& writer) { putNodeProperties(writer, call->parts().model, *place.node); });
@@ -200,9 +195,9 @@ void setProperty(const CallPointer& call, const Place& place) {
     const std::string interface = arguments.text();
     const std::string name = arguments.text();
     checkInterface(place, interface);
-    const bool known = (place.isAgent && findAgentProperty(name) != nullptr) || isNodeProperty(place, name) ||
-                       (place.node != nullptr &&
-                        (findByName(*place.node, name) != nullptr || isOfClass(*place.node, name)));
+    const bool known =
+        (place.isAgent && findAgentProperty(name) != nullptr) || isNodeProperty(place, name) ||
+        (place.node != nullptr && (findByName(*place.node, name) != nullptr || isOfClass(*place.node, name)));
     if (!known) {
         throw bus::Error(bus::kUnknownProperty, place.object + " has no property " + name);
     }

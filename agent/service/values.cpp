@@ -1,5 +1,6 @@
 #include "agent/service/values.h"
 
+#include <algorithm>
 #include <array>
 #include <atomic>
 #include <chrono>
@@ -7,6 +8,7 @@
 #include <string_view>
 
 #include "agent/bus/text.h"
+#include "framework/qx/whole_number.h"
 
 namespace cvagent::service {
 
@@ -73,7 +75,7 @@ void putDecimal(bus::Writer& writer, const std::string& text) {
         digits.erase(point, 1);
     }
     writer.structure("xq", [&] {
-        writer.put(std::int64_t{std::strtoll(digits.c_str(), nullptr, 10)});
+        writer.put(QX::wholeNumber<std::int64_t>(digits).value_or(0));
         writer.put(static_cast<std::uint16_t>(scale));
     });
 }
@@ -113,8 +115,8 @@ void putMixed(bus::Writer& writer, const List& list, const Put& put) {
 }
 
 void putExactTexts(bus::Writer& writer, const std::vector<std::string>& texts) {
-    const bool plain = std::all_of(texts.begin(), texts.end(),
-                                   [](const std::string& text) { return bus::isText(text); });
+    const bool plain =
+        std::all_of(texts.begin(), texts.end(), [](const std::string& text) { return bus::isText(text); });
     if (plain) {
         writer.variant("as", [&] { writer.put(texts); });
     } else {
@@ -127,9 +129,7 @@ void putExactNumbers(bus::Writer& writer, const std::vector<IC::Number>& numbers
         putMixed(writer, numbers, putExactNumber);
         return;
     }
-    writer.variant("au", [&] {
-        writer.put(std::vector<std::uint32_t>(numbers.begin(), numbers.end()));
-    });
+    writer.variant("au", [&] { writer.put(std::vector<std::uint32_t>(numbers.begin(), numbers.end())); });
 }
 
 /// The very value, so that whoever reads it can make the same one of it.
@@ -167,8 +167,8 @@ std::uint64_t wallClock() {
 std::uint64_t wallClock(std::chrono::steady_clock::time_point moment) {
     constexpr std::int64_t kSet = 500000;  // by less the clock is only slewed
     static std::atomic<std::int64_t> offset{0};
-    const std::int64_t now = sinceEpoch(std::chrono::system_clock::now()) -
-                             sinceBoot(std::chrono::steady_clock::now());
+    const std::int64_t now =
+        sinceEpoch(std::chrono::system_clock::now()) - sinceBoot(std::chrono::steady_clock::now());
     if (std::abs(now - offset) > kSet) {
         offset = now;
     }
@@ -245,21 +245,28 @@ void putEvent(bus::Writer& writer, const Event& event) {
         row = findProperty(static_cast<unsigned int>(known->type), event.property);
     }
     const bool withheld = !event.propertyName.empty() && row != nullptr && row->trusted;
-    writer.structure("tstusssussssau", [&] {
+    writer.structure("tstusssussssssau", [&] {
         writer.put(std::uint64_t{event.number}).put(eventName(event.kind));
         writer.put(static_cast<std::uint64_t>(event.time) * kMicroseconds);
         writer.put(std::uint32_t{event.nodeId}).put(event.nodeClass).put(event.path).put(event.message);
         writer.put(std::uint32_t{event.property}).put(event.propertyName);
         writer.put(withheld ? "" : event.before).put(withheld ? "" : event.after).put(event.caller);
+        writer.put(withheld ? "" : event.wanted).put(event.verdict);
         writer.put(std::vector<std::uint32_t>{event.firstCode, event.secondCode, event.eventCode});
     });
 }
 
 std::vector<std::string> takeWords(bus::Reader& reader) {
+    constexpr std::size_t kMost = 1024;
     std::vector<std::string> words;
     reader.variant([&](const std::string& type) {
         if (type.size() == 2 && type.front() == 'a') {
-            reader.array(type.c_str() + 1, [&] { words.push_back(reader.asWord()); });
+            reader.array(type.c_str() + 1, [&] {
+                if (words.size() == kMost) {
+                    throw bus::Error(bus::kLimitsExceeded, "too many values in one call");
+                }
+                words.push_back(reader.asWord());
+            });
         } else {
             words.push_back(reader.asWord());
         }

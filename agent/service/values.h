@@ -28,7 +28,7 @@ std::string typeOf(const IC::PropertyValue& value);
 void putProperty(bus::Writer& writer, const IC::PropertyValue& value);
 
 inline constexpr const char* kReadingType = "(uyvtus)";
-inline constexpr const char* kEventType = "(tstusssussssau)";
+inline constexpr const char* kEventType = "(tstusssussssssau)";
 
 void putReading(bus::Writer& writer, const Reading& reading);
 /// An array; those that are trusted are left out, or told as missing, for who may not see them.

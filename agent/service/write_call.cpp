@@ -73,7 +73,8 @@ void perform(const CallPointer& call, const Wish& wish, Request::Clock::time_poi
     const std::vector<std::string> errors = request.errors().take().texts;
     const std::string verdict = result.problem ? "failed" : kVerdicts.at(result.outcome);
     note(Priority::notice, wish,
-         who + " wrote " + wish.target() + ": " + (result.problem ? result.problem->what() : verdict), verdict);
+         who + " wrote " + wish.target() + ": " + (result.problem ? result.problem->what() : verdict),
+         verdict);
     call->parts().mailbox->post([call, result, errors, id = wish.node->getNodeId()] {
         call->guarded([&] {
             if (!result.after.failed()) {
@@ -93,7 +94,8 @@ void decide(const CallPointer& call, const Wish& wish) {
         call->guarded([&] {
             if (!allowed) {
                 note(Priority::warning, wish,
-                     "uid " + std::to_string(wish.caller.user) + " may not write " + wish.target() + ": " + reason,
+                     "uid " + std::to_string(wish.caller.user) + " may not write " + wish.target() + ": " +
+                         reason,
                      "denied");
                 throw bus::Error(bus::kAccessDenied, "you may not write this: " + reason);
             }

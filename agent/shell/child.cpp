@@ -89,7 +89,7 @@ Register& processes() {
 /// Whoever reads there goes on. A pipe that is full keeps nobody waiting.
 void wakeReader(int output) {
     const std::string pipe = "/proc/self/fd/" + std::to_string(output);
-    const Descriptor writing(open(pipe.c_str(), O_WRONLY | O_NONBLOCK | O_CLOEXEC));
+    const hosttools::Descriptor writing(open(pipe.c_str(), O_WRONLY | O_NONBLOCK | O_CLOEXEC));
     [[maybe_unused]] const ssize_t written = write(writing.get(), "", 1);
 }
 
@@ -114,11 +114,11 @@ private:
 };
 
 /// Out of the way of the three standard descriptors, of which one may be free.
-int moveUp(Descriptor& end) {
+int moveUp(hosttools::Descriptor& end) {
     if (end.get() > STDERR_FILENO) {
         return 0;
     }
-    Descriptor higher(fcntl(end.get(), F_DUPFD_CLOEXEC, STDERR_FILENO + 1));
+    hosttools::Descriptor higher(fcntl(end.get(), F_DUPFD_CLOEXEC, STDERR_FILENO + 1));
     if (!higher.isOpen()) {
         return errno;
     }
@@ -126,13 +126,13 @@ int moveUp(Descriptor& end) {
     return 0;
 }
 
-int makePipe(Descriptor& reading, Descriptor& writing) {
+int makePipe(hosttools::Descriptor& reading, hosttools::Descriptor& writing) {
     std::array<int, 2> ends{};
     if (pipe2(ends.data(), O_CLOEXEC) != 0) {
         return errno;
     }
-    reading = Descriptor(ends[0]);
-    writing = Descriptor(ends[1]);
+    reading = hosttools::Descriptor(ends[0]);
+    writing = hosttools::Descriptor(ends[1]);
     const int error = moveUp(reading);
     return error != 0 ? error : moveUp(writing);
 }
@@ -218,7 +218,7 @@ void noteKill(pid_t process) {
 }
 
 int ProcessSource::start(const ProcessStart& start) {
-    Descriptor writing;
+    hosttools::Descriptor writing;
     int error = makePipe(output_, writing);
     error = error != 0 ? error : child_.start(start, writing.get());
     if (error == 0) {

@@ -10,8 +10,8 @@
 #include <utility>
 #include <vector>
 
-#include "agent/shell/descriptor.h"
 #include "agent/shell/source.h"
+#include "hosttools/descriptor.h"
 
 namespace cvagent::shell {
 
@@ -98,7 +98,7 @@ private:
     ssize_t readOutput(char* buffer);
 
     Child child_;
-    Descriptor output_;
+    hosttools::Descriptor output_;
     Child::End end_;
 };
 

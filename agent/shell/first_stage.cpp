@@ -50,7 +50,7 @@ class FileSource : public Source {
 public:
     /// @param complaint what the tool says before the reason when it cannot read on; "" for nothing
     /// @param isGreps grep reads it itself, and ends by it
-    FileSource(Descriptor file, std::string complaint, bool isGreps)
+    FileSource(hosttools::Descriptor file, std::string complaint, bool isGreps)
         : file_(std::move(file)), complaint_(std::move(complaint)), isGreps_(isGreps) {}
     bool pull(std::string& out) override {
         const std::size_t before = out.size();
@@ -71,7 +71,7 @@ public:
     int status() const override { return status_; }
 
 private:
-    Descriptor file_;
+    hosttools::Descriptor file_;
     std::string complaint_;
     bool isGreps_;
     bool failed_ = false;

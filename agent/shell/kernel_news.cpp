@@ -25,13 +25,13 @@ constexpr unsigned kGroups = group(RTNLGRP_LINK) | group(RTNLGRP_IPV4_IFADDR) | 
 /// A child process may have a network of its own, and its parent's socket tells of the parent's.
 bool KernelNews::subscribe() {
     owner_ = getpid();
-    Descriptor made(socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC | SOCK_NONBLOCK, NETLINK_ROUTE));
+    hosttools::Descriptor made(socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC | SOCK_NONBLOCK, NETLINK_ROUTE));
     sockaddr_nl address{};
     address.nl_family = AF_NETLINK;
     address.nl_groups = kGroups;
     const auto* const plain = reinterpret_cast<const sockaddr*>(&address);
     const bool bound = made.isOpen() && bind(made.get(), plain, sizeof address) == 0;
-    socket_ = bound ? std::move(made) : Descriptor();
+    socket_ = bound ? std::move(made) : hosttools::Descriptor();
     return bound;
 }
 

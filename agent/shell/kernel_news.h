@@ -2,7 +2,7 @@
 
 #include <sys/types.h>
 
-#include "agent/shell/descriptor.h"
+#include "hosttools/descriptor.h"
 
 namespace cvagent::shell {
 
@@ -18,7 +18,7 @@ private:
     bool subscribe();
     bool drain() const;
 
-    Descriptor socket_;
+    hosttools::Descriptor socket_;
     pid_t owner_ = 0;
 };
 

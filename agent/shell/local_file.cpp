@@ -25,33 +25,33 @@ public:
     explicit Place(const std::string& path) {
         const auto mount = localMountOf(path);
         if (mount) {
-            root_ = Descriptor(::open(mount->c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
+            root_ = hosttools::Descriptor(::open(mount->c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
             inside_ = path.substr(mount->size());
             inside_.erase(0, inside_.find_first_not_of('/'));
         }
     }
 
     bool isKnown() const { return root_.isOpen() && !inside_.empty(); }
-    Descriptor open(int flags) const {
+    hosttools::Descriptor open(int flags) const {
         struct open_how how {};
         how.flags = static_cast<unsigned>(flags | O_CLOEXEC);
         how.mode = (flags & O_CREAT) != 0 ? kMode : 0;
         how.resolve = RESOLVE_NO_XDEV | RESOLVE_NO_MAGICLINKS;
         const long number = syscall(SYS_openat2, root_.get(), inside_.c_str(), &how, sizeof how);
-        return Descriptor(static_cast<int>(number));
+        return hosttools::Descriptor(static_cast<int>(number));
     }
 
 private:
-    Descriptor root_;
+    hosttools::Descriptor root_;
     std::string inside_;
 };
 
-std::optional<mode_t> kindOf(const Descriptor& file) {
+std::optional<mode_t> kindOf(const hosttools::Descriptor& file) {
     struct stat found {};
     return fstat(file.get(), &found) == 0 ? std::optional(found.st_mode & S_IFMT) : std::nullopt;
 }
 
-bool isRegular(const Descriptor& file) {
+bool isRegular(const hosttools::Descriptor& file) {
     return kindOf(file) == static_cast<mode_t>(S_IFREG);
 }
 
@@ -60,7 +60,7 @@ LocalFile::Outcome outcomeOf(int error) {
 }
 
 /// Some files of /proc wait for news.
-bool answersAtOnce(const Descriptor& file) {
+bool answersAtOnce(const hosttools::Descriptor& file) {
     pollfd asked{file.get(), POLLIN, 0};
     return poll(&asked, 1, 0) == 1 && (asked.revents & POLLIN) != 0;
 }
@@ -78,14 +78,14 @@ LocalFile openForReading(const std::string& path, off_t most) {
     if (!place.isKnown()) {
         return {};
     }
-    const Descriptor looked = place.open(O_PATH);
+    const hosttools::Descriptor looked = place.open(O_PATH);
     if (!looked.isOpen()) {
         return {outcomeOf(errno)};
     }
     if (!isRegular(looked)) {
         return {kindOf(looked) == static_cast<mode_t>(S_IFDIR) ? LocalFile::missing : LocalFile::unfit};
     }
-    Descriptor file = place.open(O_RDONLY | O_NONBLOCK | O_NOCTTY);
+    hosttools::Descriptor file = place.open(O_RDONLY | O_NONBLOCK | O_NOCTTY);
     if (!file.isOpen()) {
         return {outcomeOf(errno)};
     }
@@ -104,11 +104,12 @@ LocalFile openForWriting(const std::string& path, bool append) {
     if (!place.isKnown() || sizeIsLimited()) {
         return {};
     }
-    const Descriptor looked = place.open(O_PATH);
+    const hosttools::Descriptor looked = place.open(O_PATH);
     if (looked.isOpen() ? !isRegular(looked) : errno != ENOENT) {
         return {};
     }
-    Descriptor file = place.open(O_WRONLY | O_CREAT | O_NONBLOCK | O_NOCTTY | (append ? O_APPEND : O_TRUNC));
+    hosttools::Descriptor file =
+        place.open(O_WRONLY | O_CREAT | O_NONBLOCK | O_NOCTTY | (append ? O_APPEND : O_TRUNC));
     if (!file.isOpen() || !isRegular(file)) {
         return {};
     }
@@ -120,7 +121,7 @@ LocalFile::Outcome removable(const std::string& path) {
     if (!place.isKnown()) {
         return LocalFile::unfit;
     }
-    const Descriptor looked = place.open(O_PATH | O_NOFOLLOW);
+    const hosttools::Descriptor looked = place.open(O_PATH | O_NOFOLLOW);
     if (!looked.isOpen()) {
         return errno == ENOENT ? LocalFile::missing : LocalFile::unfit;
     }

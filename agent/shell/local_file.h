@@ -4,7 +4,7 @@
 
 #include <string>
 
-#include "agent/shell/descriptor.h"
+#include "hosttools/descriptor.h"
 
 namespace cvagent::shell {
 
@@ -18,7 +18,7 @@ struct LocalFile {
         unfit     ///< anything else: for a tool, which can be killed
     };
     Outcome outcome = unfit;
-    Descriptor descriptor = {};
+    hosttools::Descriptor descriptor = {};
 };
 
 /// @param path from the root directory on

@@ -9,7 +9,7 @@
 #include <mutex>
 #include <vector>
 
-#include "agent/shell/descriptor.h"
+#include "hosttools/descriptor.h"
 
 namespace cvagent::shell {
 
@@ -91,7 +91,7 @@ std::optional<std::string> find(const Mounts& mounts, const std::string& path) {
     }
 }
 
-std::string readAll(const Descriptor& file) {
+std::string readAll(const hosttools::Descriptor& file) {
     std::string text;
     std::array<char, 4096> buffer{};
     for (off_t at = 0;;) {
@@ -111,7 +111,7 @@ public:
         const std::lock_guard lock(guard_);
         if (owner_ != getpid() || !file_.isOpen()) {
             // A child process may have mounts of its own.
-            file_ = Descriptor(open("/proc/self/mountinfo", O_RDONLY | O_CLOEXEC));
+            file_ = hosttools::Descriptor(open("/proc/self/mountinfo", O_RDONLY | O_CLOEXEC));
             owner_ = getpid();
             mounts_.clear();
         }
@@ -128,7 +128,7 @@ private:
     }
 
     std::mutex guard_;
-    Descriptor file_;
+    hosttools::Descriptor file_;
     pid_t owner_ = 0;
     Mounts mounts_;
 };

@@ -52,7 +52,7 @@ private:
     std::unique_ptr<Source> last_;
     ProcessSource* process_ = nullptr;
     bool filtered_ = false;
-    Descriptor file_;
+    hosttools::Descriptor file_;
     int writeStatus_ = 0;
     Child::End innerEnd_;
 };

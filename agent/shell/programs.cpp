@@ -15,7 +15,7 @@
 #include <mutex>
 #include <utility>
 
-#include "agent/shell/descriptor.h"
+#include "hosttools/descriptor.h"
 
 namespace cvagent::shell {
 
@@ -59,7 +59,7 @@ Identity identityOf(const struct stat& file) {
 
 std::string beginningOf(const std::string& path) {
     constexpr std::size_t kMost = 4UL << 20U;
-    const Descriptor file(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
+    const hosttools::Descriptor file(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
     std::string content;
     for (std::size_t used = 0; file.isOpen() && used < kMost;) {
         content.resize(used + 65536);

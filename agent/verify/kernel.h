@@ -1,12 +1,18 @@
 #pragma once
 
 #include <optional>
+#include <sstream>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "hosttools/interfaces.h"
+#include "hosttools/link_settings.h"
 
 namespace cvagent::verify {
+
+/// A file to be read line by line; without any lines when it is no regular file that can be read.
+std::istringstream linesOf(const std::string& path);
 
 /// What the kernel says at one moment: links and addresses by netlink, the rest out of /proc and /sys when it
 /// is asked for. No process is started.
@@ -20,18 +26,23 @@ public:
     const hosttools::Link* link(const std::string& name) const;
     const std::vector<hosttools::Link>& links() const { return interfaces_.links; }
     bool hasCarrier(const std::string& name) const;
-    /// What the driver says, of a link that is down as well.
-    struct LinkMode {
-        unsigned megabits = 0;  ///< 0 for not known
-        bool isFullDuplex = false;
-    };
-    static LinkMode modeOf(const std::string& name);
+    bool isUp(const std::string& name) const;
+    /// The first line of a file of the link in sysfs; "" when there is none.
+    static std::string attribute(const std::string& name, const std::string& file);
+    /// The bond that the link is a member of; "" for none.
+    static std::string bondOf(const std::string& name);
+    /// What the driver says, of a link that is down as well; nothing when it says nothing.
+    static std::optional<hosttools::LinkSettings> settingsOf(const std::string& name);
+    /// Whether the driver tells how the link wakes the host; only root is told.
+    static bool tellsWakeOnLan(const std::string& name);
     /// The first one of the link itself, not of an alias; null for none.
     const hosttools::InetAddress* inet(const std::string& name) const;
     /// The global ones, as texts with their prefix lengths.
     std::vector<std::pair<std::string, unsigned>> inet6(const std::string& name) const;
     /// Of the default routes; of one link, or of all for an empty name.
     static std::vector<std::string> gateways(const std::string& name);
+    /// Of all routes of a link.
+    static std::vector<std::string> inet6Gateways(const std::string& name);
 
 private:
     hosttools::Interfaces interfaces_;

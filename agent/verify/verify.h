@@ -22,8 +22,9 @@ struct Result {
     std::vector<Difference> differences;
 };
 
-/// Compares what a tree shows with what the kernel says at this moment, by netlink, /proc and /sys. Facts
-/// that the kernel knows nothing of (interface files, leases) are left out.
+/// Compares what a tree shows with what the kernel says at this moment, by netlink, /proc and /sys, and with
+/// the host's files where these decide (name servers, leases, the origin of an address). What is always the
+/// same, what the agent keeps itself (the owner) and what only a name server knows is left out.
 /// @param readings of each node, see Agent::readTree
 /// Throws Problem (failed) when the kernel tells no links.
 Result verify(const std::vector<NodeRef>& nodes, const std::vector<std::vector<Reading>>& readings);

@@ -1,21 +1,20 @@
 #include "framework/ic/property_value.h"
 
-#include <charconv>
 #include <limits>
 #include <ostream>
+
+#include "framework/qx/whole_number.h"
 
 namespace IC {
 namespace {
 
 unsigned int parseUnsigned(const std::string& text) {
-    long long value = 0;
-    const char* end = text.data() + text.size();
-    const auto [stop, problem] = std::from_chars(text.data(), end, value);
-    if (problem != std::errc() || stop != end || value < std::numeric_limits<int>::min() ||
-        value > std::numeric_limits<unsigned int>::max()) {
+    const auto value = QX::wholeNumber<long long>(text);
+    if (!value || *value < std::numeric_limits<int>::min() ||
+        *value > std::numeric_limits<unsigned int>::max()) {
         throw ConversionError("not a number of 32 bits: \"" + text + "\"");
     }
-    return static_cast<unsigned int>(value);
+    return static_cast<unsigned int>(*value);
 }
 
 const std::string& textOf(const std::string& text) {

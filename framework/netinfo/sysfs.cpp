@@ -2,10 +2,11 @@
 
 #include <algorithm>
 #include <array>
-#include <charconv>
 #include <filesystem>
 #include <fstream>
 #include <string_view>
+
+#include "framework/qx/whole_number.h"
 
 namespace netinfo {
 namespace {
@@ -66,11 +67,9 @@ bool isUpper(const fs::path& link, const std::string& type, bool hardware) {
 
 bool isUp(const fs::path& link) {
     const std::string text = firstLine(link / "flags");  // 0x1003
-    unsigned long flags = 0;
-    if (text.starts_with("0x")) {
-        std::from_chars(text.data() + 2, text.data() + text.size(), flags, 16);
-    }
-    return (flags & kInterfaceUp) != 0;
+    const auto flags =
+        text.starts_with("0x") ? QX::wholeNumber<unsigned long>(text.substr(2), 16) : std::nullopt;
+    return (flags.value_or(0) & kInterfaceUp) != 0;
 }
 
 /// The members of a bond all show the bond's address; what they had before is kept aside.

@@ -7,7 +7,6 @@
 
 #include <algorithm>
 #include <atomic>
-#include <charconv>
 #include <csignal>
 #include <fstream>
 #include <functional>
@@ -18,6 +17,8 @@
 #include <thread>
 #include <utility>
 #include <vector>
+
+#include "framework/qx/whole_number.h"
 
 namespace QX {
 namespace {
@@ -307,10 +308,8 @@ std::vector<int> numbersIn(const std::string& directory) {
     // Not by the iterators of libstdc++: those end the program when they find no memory.
     const std::unique_ptr<DIR, int (*)(DIR*)> listing(opendir(directory.c_str()), closedir);
     while (const dirent* entry = listing != nullptr ? readdir(listing.get()) : nullptr) {
-        const std::string name = entry->d_name;
-        int number = 0;
-        if (std::from_chars(name.data(), name.data() + name.size(), number).ec == std::errc()) {
-            numbers.push_back(number);
+        if (const auto number = wholeNumber<int>(entry->d_name)) {
+            numbers.push_back(*number);
         }
     }
     return numbers;

@@ -1,9 +1,8 @@
 #include "framework/qx/property_line.h"
 
-#include <charconv>
-
 #include "framework/qx/hex.h"
 #include "framework/qx/utf8.h"
+#include "framework/qx/whole_number.h"
 
 namespace QX {
 namespace {
@@ -43,14 +42,12 @@ std::optional<char> takeEscape(std::string_view& rest) {
     if (kind != 'x' || rest.size() < 2) {
         return {};
     }
-    unsigned char byte = 0;
-    const char* const end = rest.data() + 2;
-    const auto [stop, problem] = std::from_chars(rest.data(), end, byte, 16);
-    if (problem != std::errc() || stop != end) {
+    const auto byte = wholeNumber<unsigned char>(rest.substr(0, 2), 16);
+    if (!byte) {
         return {};
     }
     rest.remove_prefix(2);
-    return static_cast<char>(byte);
+    return static_cast<char>(*byte);
 }
 
 }  // namespace

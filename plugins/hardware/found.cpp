@@ -43,4 +43,12 @@ void Facts::flag(Id id, std::optional<bool> value) {
     }
 }
 
+void Facts::keepOld(const Facts& before) {
+    for (const Id id : unanswered_) {
+        if (const auto old = before.facts_.find(id); old != before.facts_.end()) {
+            facts_.insert(*old);
+        }
+    }
+}
+
 }  // namespace hardware

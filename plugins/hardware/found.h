@@ -2,6 +2,7 @@
 
 #include <map>
 #include <optional>
+#include <set>
 #include <string>
 #include <utility>
 #include <vector>
@@ -23,12 +24,19 @@ public:
     void real(Id id, std::optional<double> value);
     void flag(Id id, std::optional<bool> value);
 
+    /// Who knows it did not answer in time. What was known before stays, and is old.
+    void unanswered(Id id) { unanswered_.insert(id); }
+    bool isUnanswered(Id id) const { return unanswered_.contains(id); }
+    /// Takes over what was known before of what is unanswered.
+    void keepOld(const Facts& before);
+
     const Map& all() const { return facts_; }
 
 private:
     void put(Id id, IC::PropertyValue value);
 
     Map facts_;
+    std::set<Id> unanswered_;
 };
 
 /// One thing that was found: it becomes a node.

@@ -14,6 +14,10 @@ bool isLive(const Source& source, Id id) {
                        [id](const Row& row) { return row.id == id && row.live; });
 }
 
+IC::Error noAnswer() {
+    return {IC::Error::unanswered, IC::Number(), "the device did not answer in time"};
+}
+
 }  // namespace
 
 Found nameOnly(Class type, const std::string& name) {
@@ -66,8 +70,15 @@ void HardwareNode::store(const Known& known) {
 void HardwareNode::takeOver(const Known& known) const {
     const std::lock_guard lock(guard_);
     if (known.asOf >= known_.asOf) {
-        known_ = known;
+        Known next = known;
+        next.found.facts.keepOld(known_.found.facts);
+        known_ = std::move(next);
     }
+}
+
+bool HardwareNode::isOpen(Id id) const {
+    const std::lock_guard lock(guard_);
+    return known_.asOf == Known().asOf && !known_.found.facts.all().contains(id);
 }
 
 IC::Error HardwareNode::refresh() const {
@@ -79,22 +90,25 @@ IC::Error HardwareNode::refresh() const {
     }
     const std::optional<Known> known = ask(asking_, source_, {name_}).front();
     if (!known) {
-        return {IC::Error::unanswered, IC::Number(), "the device did not answer in time"};
+        return noAnswer();
     }
     takeOver(*known);
     return {};
 }
 
 IC::Error HardwareNode::getProperty(unsigned int id, IC::PropertyValue& out) const {
-    if (isLive(source_, id)) {
+    if (isLive(source_, id) || isOpen(id)) {
         if (IC::Error failure = refresh(); failure.getStatus() != 0) {
             return failure;
         }
     }
     const std::lock_guard lock(guard_);
-    const auto& facts = known_.found.facts.all();
-    const auto fact = facts.find(id);
-    if (fact == facts.end()) {
+    const Facts& facts = known_.found.facts;
+    if (facts.isUnanswered(id)) {
+        return noAnswer();
+    }
+    const auto fact = facts.all().find(id);
+    if (fact == facts.all().end()) {
         return {IC::Error::failure, IC::Number(IC::Error::kNoSuchProperty),
                 "no such property: " + std::to_string(id)};
     }

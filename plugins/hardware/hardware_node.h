@@ -46,8 +46,8 @@ public:
     };
     HardwareNode(const Place& place, const Source& source, std::string name, std::shared_ptr<Asking> asking);
 
-    /// A live property is read from the host, at most twice a second; Error::unanswered when the device does
-    /// not answer in time.
+    /// A live property is read from the host, at most twice a second, and every property until the thing has
+    /// answered once; Error::unanswered when who knows it does not answer in time.
     IC::Error getProperty(unsigned int id, IC::PropertyValue& out) const override;
     IC::Error getProperties(std::map<unsigned int, IC::PropertyValue>& out) const override;
     /// Nothing of the host is changed here.
@@ -60,6 +60,8 @@ public:
     void store(const Known& known);
 
 private:
+    /// Whether the thing has not answered yet that could tell it.
+    bool isOpen(Id id) const;
     IC::Error refresh() const;
     void takeOver(const Known& known) const;
 

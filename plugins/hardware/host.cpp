@@ -7,11 +7,12 @@
 #include <array>
 #include <cctype>
 #include <cerrno>
-#include <charconv>
-#include <cstdint>
 #include <filesystem>
 #include <sstream>
 #include <utility>
+
+#include "framework/qx/utf8.h"
+#include "framework/qx/whole_number.h"
 
 namespace hardware {
 
@@ -50,25 +51,9 @@ std::size_t endOfDigits(const std::string& text, std::size_t place) {
 
 /// The bytes of the printable UTF-8 letter at a place; 0 where there is none.
 std::size_t letterAt(const std::string& text, std::size_t place) {
-    const auto byte = [&](std::size_t at) -> std::uint32_t { return static_cast<unsigned char>(text[at]); };
-    const std::uint32_t first = byte(place);
-    if (first < 0x80) {
-        return first >= ' ' && first != 0x7f ? 1 : 0;
-    }
-    const std::size_t length = first >= 0xf0 ? 4 : first >= 0xe0 ? 3 : 2;
-    constexpr std::uint32_t kLeast[] = {0xa0, 0x800, 0x10000};  // below: controls, and longer than needed
-    if (first < 0xc0 || first > 0xf4 || place + length > text.size()) {
-        return 0;
-    }
-    std::uint32_t letter = first & (0xffU >> (length + 1));
-    for (std::size_t at = place + 1; at < place + length; ++at) {
-        if ((byte(at) & 0xc0U) != 0x80) {
-            return 0;
-        }
-        letter = letter << 6U | (byte(at) & 0x3fU);
-    }
-    const bool surrogate = letter >= 0xd800 && letter <= 0xdfff;
-    return letter < kLeast[length - 2] || letter > 0x10ffff || surrogate ? 0 : length;
+    const QX::Utf8Character letter = QX::firstUtf8Character(std::string_view(text).substr(place));
+    const bool control = letter.code < ' ' || (letter.code >= 0x7f && letter.code < 0xa0);
+    return control ? 0 : letter.length;
 }
 
 }  // namespace
@@ -105,12 +90,7 @@ std::optional<unsigned long long> Host::number(const std::string& path) const {
 
 std::optional<long long> Host::signedNumber(const std::string& path) const {
     const std::optional<std::string> first = line(path);
-    const bool negative = first && first->starts_with('-');
-    const auto value = first ? asNumber(first->substr(negative ? 1 : 0)) : std::nullopt;
-    if (!value || *value > static_cast<unsigned long long>(INT64_MAX)) {
-        return std::nullopt;
-    }
-    return negative ? -static_cast<long long>(*value) : static_cast<long long>(*value);
+    return first ? asSigned(*first) : std::nullopt;
 }
 
 std::optional<bool> Host::flag(const std::string& path) const {
@@ -201,11 +181,17 @@ std::string trimmed(const std::string& text) {
 
 std::optional<unsigned long long> asNumber(const std::string& text) {
     const bool hexadecimal = text.starts_with("0x");
-    const char* const start = text.data() + (hexadecimal ? 2 : 0);
-    const char* const end = text.data() + text.size();
-    unsigned long long value = 0;
-    const auto [stop, error] = std::from_chars(start, end, value, hexadecimal ? 16 : 10);
-    return error == std::errc() && stop == end ? std::optional(value) : std::nullopt;
+    return QX::wholeNumber<unsigned long long>(std::string_view(text).substr(hexadecimal ? 2 : 0),
+                                               hexadecimal ? 16 : 10);
+}
+
+std::optional<long long> asSigned(const std::string& text) {
+    const bool negative = text.starts_with('-');
+    const auto value = asNumber(text.substr(negative ? 1 : 0));
+    if (!value || *value > static_cast<unsigned long long>(INT64_MAX)) {
+        return std::nullopt;
+    }
+    return negative ? -static_cast<long long>(*value) : static_cast<long long>(*value);
 }
 
 }  // namespace hardware

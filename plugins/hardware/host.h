@@ -63,5 +63,7 @@ std::string printable(std::string text);
 std::string trimmed(const std::string& text);
 /// The whole text as a number; nothing for anything else.
 std::optional<unsigned long long> asNumber(const std::string& text);
+/// As asNumber, for what can be below zero.
+std::optional<long long> asSigned(const std::string& text);
 
 }  // namespace hardware

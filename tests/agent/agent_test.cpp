@@ -13,6 +13,7 @@
 #include "framework/cvlog/logger.h"
 #include "tests/agent/suse_host.h"
 #include "tests/support/fake_host.h"
+#include "tests/support/waiting.h"
 
 namespace {
 
@@ -169,6 +170,34 @@ HOST_TEST(AgentPlugins, NothingIsToldOfOneThatDoesNotStart) {
     const auto failed = pathsAndEvents("early publish late badstart");
     EXPECT_THAT(failed.second, IsEmpty());
     EXPECT_THAT(failed.first, testing::Not(testing::Contains(HasSubstr("hard-drive"))));
+}
+
+HOST_TEST(AgentPlugins, OneThatTakesTooLongToStartIsLeftToItself) {
+    const cvagent::QuietCommands quiet;
+    host.file("/proc/cpuinfo", "processor\t: 0\n");
+    host.file(kHold, "");
+    setenv("CORVISTA_FAKE_PLUGIN", "holdstart early publish", 1);
+    setenv("CORVISTA_FAKE_PLUGIN_HOLD", kHold, 1);
+    setenv("CORVISTA_FAKE_PLUGIN_DIARY", "/tmp/diary", 1);
+    AgentSettings settings = settingsOf({FAKE_PLUGIN_FILE, CORVISTA_PLUGIN_FILE});
+    settings.startTime = 60ms;
+    std::vector<std::string> told;
+    settings.tell = [&told](const std::string& text) { told.push_back(text); };
+    const std::size_t threads = runningThreads();
+    std::shared_ptr<cvagent::Subscription> events;
+    {
+        const Agent agent(settings);
+        ASSERT_EQ(agent.failedPlugins().size(), 1U);
+        EXPECT_THAT(agent.failedPlugins().front().problem.what(), HasSubstr("has not started after 1 s"));
+        EXPECT_THAT(told, ElementsAre(HasSubstr("waiting for the plug-in '/")));
+        EXPECT_THAT(agent.plugins(), ElementsAre(CORVISTA_PLUGIN_FILE));
+        EXPECT_THAT(pathsOf(agent), testing::Contains("/oshw/root/computer"));
+        events = agent.subscribe(0);
+    }
+    host.remove(kHold);  // it comes back when there is no agent any more
+    EXPECT_TRUE(eventually([threads] { return runningThreads() == threads; }));
+    EXPECT_THAT(*host.read("/tmp/diary"), testing::EndsWith("held no more\n")) << "it is not stopped";
+    EXPECT_THAT(events->take().events, IsEmpty());
 }
 
 HOST_TEST(AgentPlugins, AreLoadedWithADataDirectoryOnly) {

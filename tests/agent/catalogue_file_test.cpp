@@ -49,7 +49,7 @@ TEST(CatalogueFile, LiesBesideTheLibrary) {
 TEST(CatalogueFile, MakesRowsLikeThoseInTheProgram) {
     const auto all = parsed(R"({"classes": [
           {"type": 701, "name": "one"}, {"type": 702, "name": "many", "several": true},
-          {"type": 703, "name": "named", "nameProperty": 7, "telling": [8, 9]}],
+          {"type": 703, "name": "named", "nameProperty": 7, "telling": [8, 4294967304, -1, "7", 9]}],
         "properties": [
           {"class": 703, "id": 9, "name": "Weight", "kind": "number", "unit": "degrees Celsius",
            "source": "/sys/x", "meaning": "how warm", "trusted": true},

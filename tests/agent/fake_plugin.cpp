@@ -9,12 +9,14 @@
 //                           asks once more when the library is closed
 //   manyerrors              initialize logs sixty different errors
 //   hangstart, hangstop     initialize, unload never return
+//   holdstart               initialize hangs while it is held
 //   slowstop                unload takes a tenth of a second
 //   pipe                    initialize runs a command and notes who else has its pipe, and its end
 //   command                 initialize runs a command that hangs, and notes what it tells
 //   errors                  initialize logs errors
 //   churn                   a thread publishes and withdraws drives until unload
 //   alert                   a thread sends one alert
+//   heldalert               the same, once nothing is held any more
 //   early                   initialize sends one alert, before the agent has seen any node
 //   late                    unload sends one alert
 //   longalert               alerts have a text of a megabyte
@@ -205,6 +207,10 @@ public:
         if (told("hangstart")) {
             hang();
         }
+        if (told("holdstart")) {
+            waitWhileHeld();
+            note("held no more");
+        }
         if (told("pipe")) {
             FILE* const pipe = popen("exit 7", "r");
             note((fcntl(fileno(pipe), F_GETFD) & FD_CLOEXEC) != 0 ? "closed on exec" : "left open");
@@ -232,6 +238,12 @@ public:
         if (told("alert")) {
             alert_ = std::thread([this] {
                 std::this_thread::sleep_for(std::chrono::milliseconds(50));
+                sendAlert();
+            });
+        }
+        if (told("heldalert")) {
+            alert_ = std::thread([this] {
+                waitWhileHeld();
                 sendAlert();
             });
         }

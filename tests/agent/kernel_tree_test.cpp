@@ -241,6 +241,54 @@ HOST_TEST_F(KernelTree, WritesAnInterfaceWithOneOfTodaysNames) {
     EXPECT_THAT(ip(host, "-o link show ens18").out, testing::HasSubstr(",UP"));
 }
 
+/// With a user's own rights, each property that can be written.
+HOST_TEST_F(KernelTree, ChangesNothingWithoutRootAndSaysSo) {
+    wire(host, cable("eth0", "sw0"));
+    wire(host, {"address add 10.1.2.3/20 broadcast + dev eth0", "route add default via 10.1.0.1",
+                "-6 address add 2001:db8:1:42::3/56 dev eth0 nodad"});
+    interfaceFile(host, "eth0", "BOOTPROTO=static\nIPADDR=10.1.2.3/20\n");
+    host.file("/etc/sysconfig/network/routes", "default\t10.1.0.1\t-\n");
+    host.file("/etc/HOSTNAME", "linux-k.example.com");
+    host.directory("/home/x");
+    if (!host.giveToStranger("/home/x")) {
+        GTEST_SKIP() << "the tests do not run as root";
+    }
+    host.realTool("setpriv");
+    const auto asStranger = [&host](const Lines& words) {
+        Lines line = {"setpriv",      "--reuid=12345", "--regid=12345", "--keep-groups",     "env",
+                      "HOME=/home/x", CVAGENT_PROGRAM, "--plugin",      CORVISTA_PLUGIN_FILE};
+        line.insert(line.end(), words.begin(), words.end());
+        return host.run(line);
+    };
+    const auto network = [&host] {
+        return ip(host, "-4 -o address show up").out + ip(host, "route show").out +
+               ip(host, "-6 route show default").out;
+    };
+    const std::string before = network();
+    for (const auto& [property, value] : std::map<std::string, std::string>{{"InterfaceState", "down"},
+                                                                            {"IPOrigin", "1"},
+                                                                            {"IPv4Address", "10.1.2.4"},
+                                                                            {"SubnetMask", "255.255.255.0"},
+                                                                            {"IPv6Address", "2001:db8::20"},
+                                                                            {"IPv6PrefixLength", "48"},
+                                                                            {"IPv4Gateway", "10.1.0.2"},
+                                                                            {"IPv6Gateway", "fe80::2"},
+                                                                            {"DNSServers", "192.0.2.54"},
+                                                                            {"DNSSuffixes", "example.net"},
+                                                                            {"HostName", "earth"},
+                                                                            {"DomainName", "example.net"}}) {
+        const Finished run = asStranger({"set", "ip-config:eth0", property, value});
+        EXPECT_EQ(run.status, 1) << property << run.out;
+        EXPECT_THAT(run.err, testing::HasSubstr(property + " was not changed"));
+    }
+    EXPECT_THAT(asStranger({"set", "computer", "PowerAction", "9", "--yes"}).err,
+                testing::HasSubstr("PowerAction was not changed"));
+    EXPECT_EQ(asStranger({"set", "computer", "TimeZoneOffset", "330"}).status, 1);
+    EXPECT_EQ(asStranger({"set", "computer", "OwnerName", "x"}).status, 0) << "the user's own data";
+    EXPECT_EQ(network(), before);
+    EXPECT_EQ(host.read("/etc/HOSTNAME").value_or(""), "linux-k.example.com");
+}
+
 HOST_TEST_F(KernelTree, TellsOfAnInterfaceWithOneOfTodaysNames) {
     wireTodaysNames(host);
     wire(host, {"link set sw1 up", "link set ens18 up"});
@@ -265,6 +313,24 @@ HOST_TEST_F(KernelTree, IsTheSameOnABareHost) {
     const Json bare = shown(host);
     EXPECT_EQ(bare, equipped) << Json::diff(equipped, bare).dump(1);
     EXPECT_GT(equipped.size(), 10U);
+}
+
+/// As in a rescue system, or where a distribution is put together.
+HOST_TEST_F(KernelTree, IsTheSameBelowAnotherRoot) {
+    wireTodaysNames(host);
+    for (const char* tool : {"chroot", "mount"}) {
+        host.realTool(tool);
+    }
+    host.directory("/srv/root");
+    const Finished bound = host.run({"mount", "--rbind", "/", "/srv/root"});
+    ASSERT_EQ(bound.status, 0) << bound.err;
+    const Lines tree = {CVAGENT_PROGRAM, "--plugin", CORVISTA_PLUGIN_FILE, "tree"};
+    Lines below = {"chroot", "/srv/root"};
+    below.insert(below.end(), tree.begin(), tree.end());
+    const Finished run = host.run(below);
+    EXPECT_EQ(run.out, host.run(tree).out);
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.out, testing::HasSubstr("network-port:ens18"));
 }
 
 /// The words with which doctor compares.

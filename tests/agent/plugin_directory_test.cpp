@@ -173,6 +173,11 @@ HOST_TEST(StrangersPlugin, ThatOthersCanWriteIsLeftOut) {
         expectLeftOut(cvagent, "can be written by others");
         ASSERT_EQ(chmod(place.c_str(), 0755), 0);
     }
+    host.directory("/srv/elsewhere");
+    fs::rename(file, "/srv/elsewhere/lib.so");
+    host.symlink(file, "/srv/elsewhere/lib.so");
+    ASSERT_EQ(chmod(kPlugins.c_str(), 0777), 0);  // who has made the link is not known, wherever it leads
+    expectLeftOut(cvagent, "can be written by others");
     ASSERT_EQ(chmod(kPlugins.c_str(), 01777), 0);  // keeps who is there, not who comes
     expectLeftOut(cvagent, "can be written by others");
     ASSERT_EQ(chmod(kPlugins.c_str(), 0755), 0);

@@ -12,7 +12,7 @@ set(agent_test_programs
   FAKE_PLUGIN_FILE="$<TARGET_FILE:fake_plugin>"
   FRAMEWORK_FILE="$<TARGET_FILE:corvista_framework>")
 
-corvista_test(agent LIBRARIES agent_cli agent_core test_support util SOURCES
+corvista_test(agent PARTS 2 LIBRARIES agent_cli agent_core test_support util SOURCES
   agent/catalogue_test.cpp
   agent/core_parts_test.cpp
   agent/event_program_test.cpp
@@ -44,7 +44,7 @@ corvista_test(agent_signals LIBRARIES test_support util SOURCES
 target_compile_definitions(agent_signals_test PRIVATE ${agent_test_programs} FEW_PROCESSES_LIBRARY="$<TARGET_FILE:fewprocesses>")
 add_dependencies(agent_signals_test cvagent fake_plugin fewprocesses vantrelcvicoshwmi)
 
-corvista_test(agent_suse_host LIBRARIES test_support SOURCES
+corvista_test(agent_suse_host PARTS 3 LIBRARIES test_support SOURCES
   agent/alerts_told_test.cpp
   agent/suse_host_test.cpp
   agent/write_effects_test.cpp)
@@ -63,13 +63,14 @@ target_compile_definitions(agent_lifetime_test PRIVATE ${agent_test_programs})
 add_dependencies(agent_lifetime_test fake_plugin vantrelcvicoshwmi)
 
 # The tree on links of a real kernel, with our own adapters as a user's cvagent picks them.
-corvista_test(agent_kernel_tree LIBRARIES test_support SOURCES
+corvista_test(agent_kernel_tree LIBRARIES agent_verify test_support SOURCES
   agent/kernel_told.cpp
-  agent/kernel_tree_test.cpp)
+  agent/kernel_tree_test.cpp
+  agent/verify_test.cpp)
 target_compile_definitions(agent_kernel_tree_test PRIVATE ${agent_test_programs})
 add_dependencies(agent_kernel_tree_test cvagent vantrelcvicoshwmi corvista-hosttools)
 
-corvista_test(agent_hostile LIBRARIES agent_cli agent_core test_support LABELS threads SOURCES
+corvista_test(agent_hostile PARTS 4 LIBRARIES agent_cli agent_core test_support LABELS threads SOURCES
   agent/command_deadline_test.cpp
   agent/door_test.cpp
   agent/hostile_output_test.cpp
@@ -99,7 +100,7 @@ target_link_libraries(uptime PRIVATE corvista_framework corvista_options)
 set_target_properties(uptime PROPERTIES LIBRARY_OUTPUT_DIRECTORY ${CMAKE_BINARY_DIR}/example SOVERSION 1 UNITY_BUILD OFF
   BUILD_WITH_INSTALL_RPATH ON INSTALL_RPATH "$ORIGIN/../lib;$ORIGIN/../..")
 
-corvista_test(agent_plugins LIBRARIES agent_cli agent_core test_support LABELS threads SOURCES
+corvista_test(agent_plugins PARTS 2 LIBRARIES agent_cli agent_core test_support LABELS threads SOURCES
   agent/catalogue_file_test.cpp
   agent/plugin_directory_test.cpp)
 target_compile_definitions(agent_plugins_test PRIVATE ${agent_test_programs}

@@ -127,14 +127,16 @@ TEST(ValueCheck, HostileValuesReachNoCommand) {
 }
 
 TEST(ValueCheck, HostileNamesReachNoCommand) {
-    const std::string harmless = "01";  // digits alone are a host name
-    for (std::string text : hostileTexts()) {
-        const bool isName = text == harmless || text == "1e0" || text == "0x1" || text == "1.0" ||
-                            text == "99999999999999999999";
+    for (const std::string& text : hostileTexts()) {
+        const bool isName = text == "1e0";
+        // Digits alone are a host name. A domain that ends in a number would be taken for an address.
+        const bool isNumber = text == "01" || text == "0x1" || text == "99999999999999999999";
         if (!isName) {
-            expectRefused(kIpConfig, "HostName", {text});
             expectRefused(kIpConfig, "DomainName", {text});
             expectRefused(kIpConfig, "DNSSuffixes", {text});
+        }
+        if (!isName && !isNumber) {
+            expectRefused(kIpConfig, "HostName", {text});
         }
     }
 }
@@ -244,10 +246,15 @@ TEST(ValueCheck, DomainNamesAreLabelsJoinedByDots) {
     const std::string longest = label + "." + label + "." + label + "." + label + ".d";  // 253 characters
     ASSERT_EQ(longest.size(), 253U);
     expectAccepted(kIpConfig, "DomainName",
-                   {"", "example", "example.com", "a.b.c.d", "xn--bcher-kva.example", longest});
+                   {"", "example", "example.com", "a.b.c.d", "xn--bcher-kva.example", "10.0.0.7.example",
+                    "3com", "0xyz", longest});
     expectRefused(kIpConfig, "DomainName",
                   {".", ".com", "com.", "a..b", "-a.b", "a-.b", "a.-b", "a_b.c", longest + "d",
                    std::string(64, 'd') + ".com"});
+    const std::vector<std::string> addresses = {"10.0.0.07", "10.0.0.7", "example.07",
+                                                "7",         "0x7",      "10.0.0.0X1f"};
+    expectRefused(kIpConfig, "DomainName", addresses);
+    expectRefused(kIpConfig, "DNSSuffixes", addresses);
 }
 
 TEST(ValueCheck, SuffixesAreDomainsHoweverMany) {

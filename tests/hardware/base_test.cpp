@@ -69,6 +69,23 @@ TEST(HardwareFacts, TextsArePrintable) {
     EXPECT_EQ(golden::text(facts.all().at(2)), "b? | c");
 }
 
+TEST(HardwareFacts, WhatIsUnansweredKeepsItsOldValue) {
+    hardware::Facts before;
+    before.number(1, 10);
+    before.number(2, 20);
+    before.number(3, 30);
+    hardware::Facts facts;
+    facts.number(1, 11);
+    facts.unanswered(2);
+    facts.unanswered(4);
+    facts.keepOld(before);
+    EXPECT_EQ(facts.all().size(), 2U) << "what is not told any more is forgotten";
+    EXPECT_EQ(golden::text(facts.all().at(1)), "11");
+    EXPECT_EQ(golden::text(facts.all().at(2)), "20");
+    EXPECT_FALSE(facts.isUnanswered(1));
+    EXPECT_TRUE(facts.isUnanswered(2));
+}
+
 /// A source whose one device hangs when it is told to, and counts how often it is asked.
 struct Device {
     static inline std::mutex guard;
@@ -120,11 +137,11 @@ protected:
     HardwareNode node_{{5, 1, {1}, 1}, Device::kSource, "eth0", asking_};
 };
 
-TEST_F(OneNode, ALivePropertyIsAskedForAFixedOneIsNot) {
-    EXPECT_EQ(get(31002), "status 1");
-    EXPECT_EQ(Device::asked, 0);
-    EXPECT_EQ(get(31001), "1");
+TEST_F(OneNode, ALivePropertyIsAskedForAFixedOneUntilItIsKnown) {
     EXPECT_EQ(get(31002), "7");
+    EXPECT_EQ(get(31002), "7");
+    EXPECT_EQ(get(31003), "status 1");
+    EXPECT_EQ(Device::asked, 1);
     EXPECT_EQ(get(31000), "eth0");
     EXPECT_EQ(get(31001), "1") << "what is fresh is not asked for again";
     std::this_thread::sleep_for(std::chrono::milliseconds(520));
@@ -138,11 +155,31 @@ TEST_F(OneNode, ThatHangsIsUnansweredAndKeepsWhatIsKnown) {
     Device::hang(true);
     EXPECT_EQ(get(31001), "status 2");
     EXPECT_EQ(get(31000), "eth0");
+    EXPECT_EQ(get(31002), "status 2") << "it has never told whether it has one";
     hardware::Facts::Map stored;
     node_.getProperties(stored);
     EXPECT_EQ(golden::text(stored.at(31001)), "99");
     Device::hang(false);
     EXPECT_TRUE(eventually([this] { return get(31001) != "status 2"; }));
+}
+
+TEST_F(OneNode, APartThatDoesNotAnswerIsUnansweredAndKeepsWhatIsKnown) {
+    const auto now = std::chrono::steady_clock::now();
+    hardware::Found found = hardware::nameOnly(Class::link, "eth0");
+    found.facts.number(31001, 99);
+    found.facts.number(31002, 5);
+    node_.store({found, now});
+    hardware::Found later = hardware::nameOnly(Class::link, "eth0");
+    later.facts.unanswered(31001);
+    later.facts.number(31002, 6);
+    node_.store({later, now});
+    EXPECT_EQ(get(31001), "status 2");
+    EXPECT_EQ(get(31002), "6");
+    hardware::Facts::Map stored;
+    node_.getProperties(stored);
+    EXPECT_EQ(golden::text(stored.at(31001)), "99");
+    node_.store({found, now});
+    EXPECT_EQ(get(31001), "99");
 }
 
 TEST_F(OneNode, WhatWasAskedForEarlierDoesNotReplaceWhatIsKnown) {
@@ -160,7 +197,7 @@ TEST_F(OneNode, WhatWasAskedForEarlierDoesNotReplaceWhatIsKnown) {
 
 TEST_F(OneNode, NothingCanBeWritten) {
     EXPECT_NE(node_.setProperty(31002, IC::PropertyValue(IC::Number(1U), true)).getStatus(), 0);
-    EXPECT_EQ(get(31002), "status 1");
+    EXPECT_EQ(get(31002), "7");
 }
 
 TEST_F(OneNode, ManyReadersGetAnswers) {
@@ -297,6 +334,7 @@ TEST_F(Plugin, ASecondStartMakesTheTreeAnew) {
     ASSERT_EQ(start().getStatus(), 0);
     EXPECT_EQ(golden::tree(plugin_), tree);
     EXPECT_EQ(plugin_.holdAll()[1]->getNodeId(), 100U);
+    EXPECT_EQ(plugin_.holdAll()[1]->getIndex(), 1U) << "they are counted anew";
     addLink("eth1", "1500");
     plugin_.lookAgain("net");
     EXPECT_EQ(links().size(), 3U);

@@ -18,6 +18,7 @@ public:
     std::function<std::optional<hardware::ScsiAnswer>(const Command&)> drive;
     std::function<std::optional<hardware::Room>(const std::string&)> space;
     std::function<Contents(const hardware::DeviceFile&)> inside;
+    std::function<hardware::Neighbours()> lldp;
 
     std::optional<std::string> nvmeLog(const hardware::DeviceFile& controller, unsigned int page,
                                        std::size_t size) const override {
@@ -37,6 +38,10 @@ public:
     Contents contents(const hardware::DeviceFile& device) const override {
         note("contents: " + named(device));
         return inside ? inside(device) : Contents();
+    }
+    hardware::Neighbours neighbours() const override {
+        note("neighbours");
+        return lldp ? lldp() : hardware::Neighbours();
     }
 
     std::vector<std::string> asked() const {

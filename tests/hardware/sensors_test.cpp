@@ -164,6 +164,23 @@ TEST_F(Sensors, AnAverageStandsForAValue) {
     EXPECT_EQ(fact("x-virtual-0:power1", "Power"), "3");
 }
 
+TEST_F(Sensors, LimitsAreThoseOfTheChip) {
+    const std::string own = chip("x", "a", "");
+    recorded_.file(own + "/temp1_input", "20000");
+    const std::pair<const char*, const char*> limits[] = {{"lcrit", "LowCriticalLimit"},
+                                                          {"min", "LowLimit"},
+                                                          {"max", "HighLimit"},
+                                                          {"crit", "CriticalLimit"},
+                                                          {"emergency", "EmergencyLimit"}};
+    int value = -40;
+    for (const auto& [file, name] : limits) {
+        EXPECT_EQ(fact("x-virtual-0:temp1", name), "");
+        recorded_.file(own + "/temp1_" + file, std::to_string(value) + "000");
+        EXPECT_EQ(fact("x-virtual-0:temp1", name), std::to_string(value));
+        value += 30;
+    }
+}
+
 TEST_F(Sensors, AnAlarmOfAnyLimitIsOne) {
     const std::string own = chip("x", "a", "");
     recorded_.file(own + "/in0_input", "1");

@@ -34,12 +34,13 @@ std::string raw(std::initializer_list<int> values) {
 
 TEST(NvmeHealth, IsReadFromTheLogPage) {
     // 311 K, spare 98 %, threshold 10 %, 3 % used; 0x01e240 hours.
-    const Health health = hardware::nvmeHealth(
-        bytes(512, {{0, raw({0, 0x37, 0x01, 98, 10, 3})}, {128, raw({0x40, 0xe2, 0x01})}}));
+    const Health health = hardware::nvmeHealth(bytes(
+        512, {{0, raw({0, 0x37, 0x01, 98, 10, 3})}, {128, raw({0x40, 0xe2, 0x01})}, {160, raw({2, 1})}}));
     EXPECT_EQ(health.temperature, 38);
     EXPECT_EQ(health.spare, 98U);
     EXPECT_EQ(health.worn, 3U);
     EXPECT_EQ(health.hours, 123456U);
+    EXPECT_EQ(health.mediaErrors, 258U);
     EXPECT_THAT(health.warnings, IsEmpty());
 }
 
@@ -312,6 +313,15 @@ TEST(DriveHealth, WhatMustNotBeAskedIsNot) {
         host.devices->drive = AtaDrive();
         factsOf(host.asRoot(), Class::drive, "sda");
         EXPECT_THAT(host.devices->asked(), IsEmpty()) << file;
+    }
+}
+
+TEST(DriveHealth, ADriveThatTheKernelLetsSleepIsOnStandby) {
+    StorageHost host;
+    host.block("sda", "pci0/ata1/host0/target0:0:0/0:0:0:0", "8:0");
+    host.file("/sys/class/block/sda/device/power/runtime_status", "suspended");
+    for (const hardware::Host& seen : {host.asRoot(), host.asNobody(), host.host()}) {
+        EXPECT_EQ(factsOf(seen, Class::drive, "sda")["PowerState"], "standby");
     }
 }
 

@@ -37,7 +37,7 @@ public:
     /// The host as root sees it; its devices are waited for as long as told, and what they say is not kept.
     hardware::Host asRoot(std::chrono::milliseconds patience = std::chrono::seconds(20),
                           std::chrono::milliseconds kept = std::chrono::milliseconds(0)) const {
-        const hardware::Devices::Times times{patience, kept, kept, kept};
+        const hardware::Devices::Times times{patience, kept, kept, kept, kept};
         return hardware::Host(root(), true, std::make_shared<hardware::Devices>(devices, times));
     }
     hardware::Host asNobody() const {

@@ -1,7 +1,8 @@
 // The kernel's news: which are told, and when.
 #include "plugins/hardware/watcher.h"
 
-#include <gtest/gtest.h>
+#include <gmock/gmock.h>
+#include <linux/netlink.h>
 #include <sys/socket.h>
 #include <unistd.h>
 
@@ -9,6 +10,7 @@
 #include <memory>
 #include <mutex>
 #include <stdexcept>
+#include <utility>
 #include <vector>
 
 #include "tests/support/waiting.h"
@@ -132,6 +134,28 @@ TEST_F(Watched, WhatIsNoNewsIsNotTold) {
     EXPECT_EQ(heard(), Heard{});
     tellOfLink();
     EXPECT_TRUE(hears(1)) << "and it still listens";
+}
+
+TEST_F(Watched, WhatOthersThanTheKernelSendIsNoNews) {
+    const Watcher::News kernel = Watcher::kernelNews();
+    sockaddr_nl own{};
+    socklen_t size = sizeof own;
+    const int stranger = socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC, NETLINK_KOBJECT_UEVENT);
+    ASSERT_EQ(getsockname(kernel.devices, reinterpret_cast<sockaddr*>(&own), &size), 0);
+    own.nl_groups = 0;
+    const std::string forged = deviceNews("forged");
+    const bool sent =
+        sendto(stranger, forged.data(), forged.size(), 0, reinterpret_cast<sockaddr*>(&own), size) > 0;
+    close(stranger);
+    close(kernel.links);
+    close(std::exchange(devices_[0], kernel.devices));
+    watch(kQuick);
+    tellOfLink();
+    EXPECT_TRUE(hears(1));
+    EXPECT_THAT(heard(), testing::Not(testing::Contains("forged")));
+    if (!sent) {
+        GTEST_SKIP() << "only root can send any";
+    }
 }
 
 class WatchedByOneThatThrows : public Watched {

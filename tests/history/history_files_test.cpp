@@ -87,6 +87,7 @@ HOST_TEST(HistoryFile, CanBeReadByTheGroupWhereTheHostHasIt) {
     { History history(kPlace); }
     EXPECT_EQ(modeOf(kFile), 0640U);
     EXPECT_EQ(groupOf(kFile), readers);
+    EXPECT_EQ(modeOf("/var/lib/corvista"), 0750U);
     host.remove("/var/lib/corvista");
     History history(kPlace);
     kept::append(history, kept::event("x"));
@@ -96,6 +97,12 @@ HOST_TEST(HistoryFile, CanBeReadByTheGroupWhereTheHostHasIt) {
         EXPECT_EQ(groupOf(kFile + part), readers) << part;
     }
     EXPECT_EQ(modeOf("/var/lib/corvista/history.lock"), 0600U);
+}
+
+HOST_TEST(HistoryFile, LeavesWhatReadersNeedWithoutTheRightToMakeIt) {
+    kept::append(*std::make_unique<History>(kPlace), kept::event("x"));
+    EXPECT_TRUE(host.exists(kFile + "-wal"));
+    EXPECT_TRUE(host.exists(kFile + "-shm"));
 }
 
 HOST_TEST(HistoryFile, OfAStrangerIsRefused) {
@@ -184,6 +191,16 @@ HOST_TEST(HistoryFile, WithAHeaderOfZerosGoesOnBeyondAllNumbers) {
     }
     History history(kPlace);
     EXPECT_GT(kept::append(history, kept::event("x")), 1700000000U);
+}
+
+HOST_TEST(HistoryFile, ThatWasEmptiedGoesOnBeyondAllNumbers) {
+    {
+        History history(kPlace);
+        fill(history, 10);
+    }
+    std::filesystem::resize_file(kFile, 0);
+    std::filesystem::resize_file(kFile + "-wal", 0);
+    EXPECT_GT(kept::append(*std::make_unique<History>(kPlace), kept::event("x")), 1700000000U);
 }
 
 HOST_TEST(HistoryFile, ThatWasRemovedIsMadeAnewAndItsNumbersGoOn) {

@@ -58,6 +58,19 @@ HOST_TEST(Recorder, KeepsLaterWhatCouldNotBeKept) {
     EXPECT_EQ(told.lines.back(), "the history is kept again");
 }
 
+HOST_TEST(Recorder, KeepsOnceWhatItKeepsLater) {
+    Told told;
+    Recorder recorder([] { return kPlace; }, told.teller(), std::chrono::milliseconds(0));
+    keepOne(recorder, kept::event("first"));
+    host.readOnly("/var/lib/corvista");
+    keepOne(recorder, kept::event("second"));
+    host.restore("/var/lib/corvista");
+    EXPECT_EQ(keepOne(recorder, kept::event("third")), 3U);
+    EXPECT_EQ(keepOne(recorder, kept::event("fourth")), 4U);
+    EXPECT_THAT(kept::numbers(History(kPlace).read({}, kAll)), ElementsAre(1, 2, 3, 4));
+    EXPECT_THAT(told.lines, SizeIs(2));
+}
+
 HOST_TEST(Recorder, NumbersEventsThoughThereIsNoPlaceForThem) {
     Told told;
     host.readOnly("/var");

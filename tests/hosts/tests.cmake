@@ -1,4 +1,4 @@
-corvista_test(golden SOURCES
+corvista_test(golden PARTS 2 SOURCES
   hosts/golden_test.cpp
   LIBRARIES test_support)
 target_compile_definitions(golden_test PRIVATE
@@ -11,4 +11,4 @@ add_dependencies(golden_test corvista-hosttools cvagent vantrelcvicoshwmi)
 corvista_test(one_truth LIBRARIES agent_core test_support SOURCES
   hosts/one_truth_test.cpp)
 target_compile_definitions(one_truth_test PRIVATE CORVISTA_PLUGIN_FILE="$<TARGET_FILE:vantrelcvicoshwmi>")
-add_dependencies(one_truth_test vantrelcvicoshwmi)
+add_dependencies(one_truth_test corvista-hosttools vantrelcvicoshwmi)

@@ -44,8 +44,8 @@ TEST_P(AgainstRealTools, ToldAlike) {
     if (network().shell(commands.substr(0, end)).status != 0) GTEST_SKIP() << "this kernel has no such links";
     const std::string rest = end != commands.npos ? commands.substr(end + 1) : "true";
     ASSERT_EQ(network().shell("set -e\n" + rest).errors, "");
-    std::istringstream names(inside("ls /sys/class/net").output);
-    for (std::string name; std::getline(names, name);) expectSame("ethtool " + name);
+    std::istringstream names(inside("ls -A /sys/class/net").output);
+    for (std::string name; std::getline(names, name);) expectSame("ethtool '" + name + "'");
     expectSame("brctl show");
 }
 
@@ -62,6 +62,10 @@ constexpr Links kLinks[] = {
      "4096\n"
      "ip link set averylongbridge address 02:00:00:00:00:0a\nip link add Z9 type bridge\n"
      "ip tuntap add tap0 mode tap\nip link set tap0 master averylongbridge"},
+    {"odd_names",
+     "ip link add .br type bridge\nip link add .m type veth peer name .n\nip link set .m master .br\n"
+     "ip link add '**' type veth peer name abcdefghijklmno\nip link add '日本語日本' type bridge\n"
+     "ip link set abcdefghijklmno master '日本語日本'\nip link set .m up\nip link set .n up"},
     {"bond",
      "ip link add bond0 type bond\nip link add v0 type veth peer name v1\nip link set v0 master bond0\n"
      "ip link set bond0 up\nip link set v1 up"},
@@ -91,7 +95,7 @@ TEST_F(AgainstRealTools, Names) {
          {std::string("another_name_of_v0"), std::string("nosuch"), std::string("averylongname0123"),
           std::string("v0:1"), std::string("\"\""), std::string("'a b'"), std::string(127, 'x'),
           std::string(128, 'x')}) {
-        expectSame("ethtool " + name);
+        expectSame("ethtool '" + name + "'");
     }
 }
 

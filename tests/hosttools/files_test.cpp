@@ -57,8 +57,11 @@ TEST(Files, ListsDirectories) {
     HostTree tree;
     tree.addBytes("d/b", "");
     tree.addBytes("d/.hidden", "");
-    EXPECT_THAT(listDirectory(tree.root() + "/d"), TextsAre("b"));
+    EXPECT_THAT(listDirectory(tree.root() + "/d"), testing::UnorderedElementsAre("b", ".hidden"));
     EXPECT_THAT(listDirectory(tree.root() + "/missing"), testing::IsEmpty());
+    EXPECT_THAT(listDirectory(tree.root() + "/d/b"), testing::IsEmpty());
+    EXPECT_EQ(readFile(tree.root() + "/d"), std::nullopt);
+    EXPECT_EQ(readNumber(tree.root() + "/d", 7), 7U);
 }
 
 }  // namespace

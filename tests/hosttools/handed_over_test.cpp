@@ -57,6 +57,7 @@ constexpr const char* kBeyond[] = {
     "route add -net 10.9.0.0 netmask 255.255.0.0 reject",
     "route flush",
     "ethtool -i lo",
+    "ethtool '*'",
     "ethtool",
     "ethtool --version",
     "brctl show br0",

@@ -1,4 +1,4 @@
-corvista_test(mi SOURCES
+corvista_test(mi PARTS 2 SOURCES
   mi/command_gate_test.cpp
   mi/command_test.cpp
   mi/library_test.cpp

@@ -30,8 +30,11 @@ const std::map<std::string, std::set<std::string>> kMayInclude = {
     {"agent/bus", {"agent/bus"}},
     {"agent/history", {"agent/history", "agent/core"}},
     {"agent/service",
-     {"agent/service", "agent/bus", "agent/core", "agent/history", "agent/verify", "agent/shell", "framework"}},
-    {"agent/cli", {"agent/cli", "agent/core", "agent/history", "agent/verify", "agent/shell", "framework"}},
+     {"agent/service", "agent/bus", "agent/core", "agent/history", "agent/verify", "agent/shell",
+      "framework"}},
+    {"agent/cli",
+     {"agent/cli", "agent/core", "agent/bus", "agent/service", "agent/history", "agent/verify", "agent/shell",
+      "framework"}},
     {"hosttools", {"hosttools"}},
     {"plugins/hardware", {"plugins/hardware", "framework"}},
 };
@@ -119,6 +122,24 @@ TEST(CodeRules, ThePluginHasOneWayToTheLogger) {
             }
         }
     }
+}
+
+/// One reader of whole numbers for the framework and all above it, one for the host tools and what stands in
+/// for them, the C library's for what the tools of old print; and one for sizes, which fdisk prints as
+/// anything.
+TEST(CodeRules, NumbersAreReadInOnePlaceEach) {
+    const std::regex call(
+        R"re(\b(from_chars|strto(l|ul|ll|ull|f|d|ld|imax|umax)|ato(i|l|ll|f)|sto(i|l|ul|ll|ull|f|d|ld)|sscanf)\s*\()re");
+    std::set<std::string> readers;
+    for (const auto& [room, allowed] : kMayInclude) {
+        for (const fs::path& file : sources(room)) {
+            if (std::regex_search(codeOnly(file), call)) {
+                readers.insert(fs::relative(file, kTree));
+            }
+        }
+    }
+    EXPECT_EQ(readers, (std::set<std::string>{"framework/qx/whole_number.h", "hosttools/files.cpp",
+                                              "mi/text.cpp", "storage/drive_nodes.cpp"}));
 }
 
 TEST(CodeRules, TheAgentsLibraryPrintsNothingAndEndsNothing) {

@@ -16,12 +16,15 @@ TEST(BusText, IsUtf8WithoutZeros) {
     }
     using std::string;
     const std::pair<string, string> bad[] = {
-        {string("a\0b", 3), "a\xEF\xBF\xBD" "b"},                             // a zero
-        {"\xC3", "\xEF\xBF\xBD"},                                              // cut off
-        {"\xC0\x80", "\xEF\xBF\xBD\xEF\xBF\xBD"},                              // too long for what it says
-        {"\xED\xA0\x80x", "\xEF\xBF\xBD\xEF\xBF\xBD\xEF\xBF\xBDx"},            // half of a pair
-        {"\xF4\x90\x80\x80", "\xEF\xBF\xBD\xEF\xBF\xBD\xEF\xBF\xBD\xEF\xBF\xBD"},  // behind the last character
-        {"\xEF\xBF\xBF", "\xEF\xBF\xBD\xEF\xBF\xBD\xEF\xBF\xBD"},              // no character
+        {string("a\0b", 3),
+         "a\xEF\xBF\xBD"
+         "b"},                                                       // a zero
+        {"\xC3", "\xEF\xBF\xBD"},                                    // cut off
+        {"\xC0\x80", "\xEF\xBF\xBD\xEF\xBF\xBD"},                    // too long for what it says
+        {"\xED\xA0\x80x", "\xEF\xBF\xBD\xEF\xBF\xBD\xEF\xBF\xBDx"},  // half of a pair
+        {"\xF4\x90\x80\x80",
+         "\xEF\xBF\xBD\xEF\xBF\xBD\xEF\xBF\xBD\xEF\xBF\xBD"},      // behind the last character
+        {"\xEF\xBF\xBF", "\xEF\xBF\xBD\xEF\xBF\xBD\xEF\xBF\xBD"},  // no character
         {"\xFF", "\xEF\xBF\xBD"},
     };
     for (const auto& [bytes, text] : bad) {
@@ -54,7 +57,8 @@ HOST_TEST(BusMessages, BringWhatWasPutIntoThem) {
         bus::Writer(reply).put(got);
         server.send(reply);
     });
-    const bus::Message call = run.bus().newCall({"com.example.Echo", "/com/example/below", "com.example.E", "Echo"});
+    const bus::Message call =
+        run.bus().newCall({"com.example.Echo", "/com/example/below", "com.example.E", "Echo"});
     bus::Writer writer(call);
     writer.put(true).put(std::uint64_t{7}).put(2.5).put("x\xFF").array("{sv}", [&] {
         writer.entry("sv", [&] {
@@ -118,18 +122,19 @@ HOST_TEST(BusHandlers, AnswerWithWhatTheyThrow) {
     std::vector<std::string> answers;
     std::vector<bus::Slot> pending;
     for (const char* member : {"Own", "Other"}) {
-        pending.push_back(run.bus().askLater(
-            run.bus().newCall({"com.example.Thrower", "/x", "com.example.T", member}), 5s,
-            [&](const bus::Message& answer) {
-                answers.push_back(answer.error().name() + ": " + answer.error().what());
-            }));
+        pending.push_back(
+            run.bus().askLater(run.bus().newCall({"com.example.Thrower", "/x", "com.example.T", member}), 5s,
+                               [&](const bus::Message& answer) {
+                                   answers.push_back(answer.error().name() + ": " + answer.error().what());
+                               }));
     }
     EXPECT_TRUE(call::until(run.bus(), [&] {
         server.process();
         return answers.size() == 2;
     }));
-    EXPECT_THAT(answers, testing::ElementsAre("com.example.Wrong: it went wrong",
-                                              "org.freedesktop.DBus.Error.Failed: it went\xEF\xBF\xBD wrong"));
+    EXPECT_THAT(answers,
+                testing::ElementsAre("com.example.Wrong: it went wrong",
+                                     "org.freedesktop.DBus.Error.Failed: it went\xEF\xBF\xBD wrong"));
 }
 
 TEST(BusConnection, ToNowhereSaysSo) {

@@ -21,13 +21,16 @@ TEST(ServiceConfig, SaysNothingWhereNothingStands) {
 }
 
 TEST(ServiceConfig, TakesEachKey) {
-    const auto read =
-        parseConfig("look-every=30\n settling-time =  200 \ncommand-timeout = 0\ntrusted-group = adm_2-x\n");
+    const auto read = parseConfig(
+        "look-every=30\n settling-time =  200 \ncommand-timeout = 0\ntrusted-group = adm_2-x\n"
+        "history-days = 7\nhistory-size = 2\n");
     EXPECT_THAT(read.complaints, IsEmpty());
     EXPECT_EQ(read.config.lookEvery.count(), 30);
     EXPECT_EQ(read.config.settlingTime.count(), 200);
     EXPECT_EQ(read.config.commandTime.count(), 0);
     EXPECT_EQ(read.config.trustedGroup, "adm_2-x");
+    EXPECT_EQ(read.config.historyAge, std::chrono::hours(7 * 24));
+    EXPECT_EQ(read.config.historyBytes, 2097152U);
     EXPECT_EQ(parseConfig("look-every = 0").config.lookEvery.count(), 0);
 }
 

@@ -28,9 +28,7 @@ public:
         while (answers && !waiting_.empty()) {
             const bus::Message reply = waiting_.back().reply();
             bus::Writer writer(reply);
-            writer.structure("bba{ss}", [&] {
-                writer.put(yes).put(!yes).array("{ss}", [] {});
-            });
+            writer.structure("bba{ss}", [&] { writer.put(yes).put(!yes).array("{ss}", [] {}); });
             bus_.send(reply);
             waiting_.pop_back();
         }
@@ -92,12 +90,14 @@ protected:
 HOST_TEST_F(ServiceConsent, WithoutPolkitIsRootsAndTheGroups) {
     EXPECT_EQ(call::asUser(kUser, {}, [] { return writeOnce(); }), kDenied);
     EXPECT_EQ(run->diary().find('='), std::string::npos);
-    EXPECT_THAT(run->program().err(),
-                HasSubstr("uid 12345 may not write /oshw/root/computer OwnerContact: without polkit this is for root "
-                          "and the group corvista"));
+    EXPECT_THAT(
+        run->program().err(),
+        HasSubstr("uid 12345 may not write /oshw/root/computer OwnerContact: without polkit this is for root "
+                  "and the group corvista"));
     EXPECT_EQ(call::asUser(kUser, kGroup, [] { return writeOnce(); }), "written");
     EXPECT_EQ(call::asUser(0, {}, [] { return writeOnce(); }), "written");
-    EXPECT_THAT(run->program().err(), HasSubstr("alice (uid 12345) wrote /oshw/root/computer OwnerContact: applied"));
+    EXPECT_THAT(run->program().err(),
+                HasSubstr("alice (uid 12345) wrote /oshw/root/computer OwnerContact: applied"));
     EXPECT_EQ(call::get(run->bus(), ServiceRun::kRoot, call::kAgent, "Consent"), "group");
 }
 
@@ -126,7 +126,8 @@ HOST_TEST_F(ServiceConsent, IsPolkitsWhereThereIsOne) {
     EXPECT_THAT(polkit.questions[0], testing::EndsWith(" 0"));
     EXPECT_THAT(run->diary(), HasSubstr("115=mine\n"));
     EXPECT_EQ(call::get(run->bus(), ServiceRun::kRoot, call::kAgent, "Consent"), "polkit");
-    EXPECT_THAT(run->program().err(), HasSubstr("polkit would have to ask the user, and the call does not let it"));
+    EXPECT_THAT(run->program().err(),
+                HasSubstr("polkit would have to ask the user, and the call does not let it"));
     // The group does not help where polkit decides; what stops the host is a question of its own.
     polkit.yes = false;
     EXPECT_EQ(call::asUserBeside(
@@ -149,7 +150,8 @@ HOST_TEST_F(ServiceConsent, ThatIsSlowHoldsNobodyUp) {
             polkit.process();
             if (!asked && !polkit.questions.empty()) {
                 asked = true;
-                EXPECT_EQ(call::get(run->bus(), ServiceRun::kComputer, "com.vantrel.Corvista1.Computer", "HostName"),
+                EXPECT_EQ(call::get(run->bus(), ServiceRun::kComputer, "com.vantrel.Corvista1.Computer",
+                                    "HostName"),
                           "fake");
                 EXPECT_EQ(run->diary().find('='), std::string::npos);
                 polkit.answers = true;
@@ -214,8 +216,8 @@ protected:
                 }
             });
         });
-        const bus::Message managed = call::ask(own, ServiceRun::kRoot, "org.freedesktop.DBus.ObjectManager",
-                                               "GetManagedObjects");
+        const bus::Message managed =
+            call::ask(own, ServiceRun::kRoot, "org.freedesktop.DBus.ObjectManager", "GetManagedObjects");
         bus::Reader objects(managed);
         objects.array("{oa{sa{sv}}}", [&] {
             objects.entry("oa{sa{sv}}", [&] {

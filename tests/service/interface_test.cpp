@@ -25,7 +25,8 @@ const std::string interfaceFile = [] {
 }();
 
 std::string withoutBlanks(const std::string& text) {
-    return std::regex_replace(std::regex_replace(text, std::regex("<!--[^]*?-->"), ""), std::regex("\\s+"), " ");
+    return std::regex_replace(std::regex_replace(text, std::regex("<!--[^]*?-->"), ""), std::regex("\\s+"),
+                              " ");
 }
 
 /// The text of an interface, blanks made one.
@@ -41,7 +42,8 @@ TEST(ServiceNames, AreEscapedPaths) {
     EXPECT_EQ(objectOf("/oshw/network-port:eth0.5"), "/com/vantrel/Corvista1/oshw/network_2dport_3aeth0_2e5");
     EXPECT_EQ(objectOf(""), "/com/vantrel/Corvista1/_");
     EXPECT_EQ(objectOf("/a//b\xFF_"), "/com/vantrel/Corvista1/a/_/b_ff_5f");
-    EXPECT_EQ(objectOf("/" + std::string(5000, 'x')).size(), std::string("/com/vantrel/Corvista1/").size() + 200);
+    EXPECT_EQ(objectOf("/" + std::string(5000, 'x')).size(),
+              std::string("/com/vantrel/Corvista1/").size() + 200);
 }
 
 TEST(ServiceNames, OfClassesAreInterfaces) {
@@ -83,19 +85,22 @@ TEST(ServiceInterface, HasTheMethodsOfTheFile) {
 
 /// Every member has a comment of its own that begins with its name, and each argument is named in it.
 TEST(ServiceInterface, DescribesEveryMember) {
-    const std::regex member(R"re(<!--\s*(\w+):([^]*?)-->\s*<(method|signal|property) name="(\w+)"([^]*?)</\3>)re");
+    const std::regex member(
+        R"re(<!--\s*(\w+):([^]*?)-->\s*<(method|signal|property) name="(\w+)"([^]*?)</\3>)re");
     const std::regex any(R"re(<(method|signal|property) name=)re");
     const std::regex argument(R"re(<arg name="(\w+)")re");
     const std::sregex_iterator end;
     std::ptrdiff_t count = 0;
-    for (std::sregex_iterator at(interfaceFile.begin(), interfaceFile.end(), member); at != end; ++at, ++count) {
+    for (std::sregex_iterator at(interfaceFile.begin(), interfaceFile.end(), member); at != end;
+         ++at, ++count) {
         EXPECT_EQ((*at)[1], (*at)[4]);
         const std::string body = (*at)[5];
         for (std::sregex_iterator each(body.begin(), body.end(), argument); each != end; ++each) {
             EXPECT_THAT((*at)[2].str(), HasSubstr("@" + (*each)[1].str() + ":")) << (*at)[1];
         }
     }
-    EXPECT_EQ(std::distance(std::sregex_iterator(interfaceFile.begin(), interfaceFile.end(), any), end), count + 3)
+    EXPECT_EQ(std::distance(std::sregex_iterator(interfaceFile.begin(), interfaceFile.end(), any), end),
+              count + 3)
         << "Parent, Description and Status have no annotation and end differently";
 }
 
@@ -103,7 +108,8 @@ HOST_TEST(ServiceInterface, IsWhatObjectsSayOfThemselves) {
     ServiceRun run(host);
     run.start();
     const auto introspected = [&](const std::string& path) {
-        return bus::Reader(call::ask(run.bus(), path, "org.freedesktop.DBus.Introspectable", "Introspect")).text();
+        return bus::Reader(call::ask(run.bus(), path, "org.freedesktop.DBus.Introspectable", "Introspect"))
+            .text();
     };
     const std::string root = introspected(ServiceRun::kRoot);
     EXPECT_EQ(interfaceIn(root, call::kAgent), interfaceIn(interfaceFile, call::kAgent));
@@ -130,10 +136,9 @@ HOST_TEST(ServiceInterface, HasThePropertiesOfTheFile) {
         const std::regex property(R"re(<property name="(\w+)" type="(\w+)")re");
         std::size_t count = 0;
         for (std::sregex_iterator at(text.begin(), text.end(), property), end; at != end; ++at, ++count) {
-            const bus::Message answer = call::ask(run.bus(), path, call::kProperties, "Get",
-                                                  [&, name = (*at)[1].str()](bus::Writer& writer) {
-                                                      writer.put(interface).put(name);
-                                                  });
+            const bus::Message answer = call::ask(
+                run.bus(), path, call::kProperties, "Get",
+                [&, name = (*at)[1].str()](bus::Writer& writer) { writer.put(interface).put(name); });
             std::string type;
             bus::Reader reader(answer);
             call::variantText(reader, &type);

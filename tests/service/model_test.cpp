@@ -39,7 +39,8 @@ Reading known(unsigned int id, unsigned int value) {
 
 NodeView view(std::uint32_t id, const std::string& path, std::vector<Reading> readings = {}) {
     const auto node = std::make_shared<IC::MutableNode>(id, 0, std::vector<unsigned int>{1}, 99, 0);
-    return {NodeRefOfTest::of(node), id, 0, 99, 0, 1, "type-99", "x.Type99", path, {}, "", std::move(readings), 1};
+    return {NodeRefOfTest::of(node), id, 0, 99, 0, 1, "type-99", "x.Type99", path, {}, "",
+            std::move(readings),     1};
 }
 
 class ModelTest : public testing::Test {

@@ -36,15 +36,15 @@ HOST_TEST_F(ServiceObjects, ShowWhatIsKnownOfTheirNodes) {
     const auto node = call::getAll(run->bus(), ServiceRun::kPort, call::kNode);
     EXPECT_EQ(node.at("Path"), "/oshw/root/computer/chassis/network-controller/network-port:eth0");
     EXPECT_EQ(node.at("Class"), "network-port");
-    EXPECT_EQ(node.at("Parent"),
-              "/com/vantrel/Corvista1/oshw/root/computer/chassis/network_2dcontroller");
+    EXPECT_EQ(node.at("Parent"), "/com/vantrel/Corvista1/oshw/root/computer/chassis/network_2dcontroller");
     EXPECT_EQ(call::get(run->bus(), "/com/vantrel/Corvista1/oshw", call::kNode, "Parent"), ServiceRun::kRoot);
     EXPECT_EQ(call::getAll(run->bus(), ServiceRun::kPort, "").size(), node.size());
     EXPECT_EQ(call::getAll(run->bus(), ServiceRun::kPort, call::kProperties).size(), 0U);
 }
 
 HOST_TEST_F(ServiceObjects, SayWhatIsWrongWithAQuestion) {
-    EXPECT_EQ(errorOfGet(ServiceRun::kPort, kPortInterface, "TeamName"), "com.vantrel.Corvista1.Error.NotKnown");
+    EXPECT_EQ(errorOfGet(ServiceRun::kPort, kPortInterface, "TeamName"),
+              "com.vantrel.Corvista1.Error.NotKnown");
     EXPECT_EQ(errorOfGet(ServiceRun::kPort, kPortInterface, "Nonsense"), bus::kUnknownProperty);
     EXPECT_EQ(errorOfGet(ServiceRun::kPort, call::kNode, "LinkSpeed"), bus::kUnknownProperty);
     EXPECT_EQ(errorOfGet(ServiceRun::kPort, kComputerInterface, "HostName"), bus::kUnknownInterface);
@@ -52,10 +52,10 @@ HOST_TEST_F(ServiceObjects, SayWhatIsWrongWithAQuestion) {
     EXPECT_EQ(errorOfGet("/com/vantrel/Corvista1/none", call::kNode, "Id"), bus::kUnknownObject);
     EXPECT_EQ(errorOfGet("/com/vantrel/Corvista1/osh", call::kNode, "Id"), bus::kUnknownObject);
     const auto set = [&](const std::string& name) {
-        return call::errorOf(run->bus(), ServiceRun::kComputer, call::kProperties, "Set",
-                             [&](bus::Writer& writer) {
-                                 writer.put(kComputerInterface).put(name).variant("s", [&] { writer.put("x"); });
-                             });
+        return call::errorOf(
+            run->bus(), ServiceRun::kComputer, call::kProperties, "Set", [&](bus::Writer& writer) {
+                writer.put(kComputerInterface).put(name).variant("s", [&] { writer.put("x"); });
+            });
     };
     EXPECT_EQ(set("HostName"), bus::kPropertyReadOnly);
     EXPECT_EQ(set("Nonsense"), bus::kUnknownProperty);
@@ -184,7 +184,9 @@ HOST_TEST_F(ServiceObjects, ReadTheHostWhenAsked) {
     EXPECT_EQ(call::read(run->bus(), ServiceRun::kComputer, {904}).front().value, "2");
     EXPECT_GT(call::read(run->bus(), ServiceRun::kComputer, {}).size(), 5U);
     EXPECT_EQ(call::errorOf(run->bus(), ServiceRun::kRoot, call::kAgent, "Read",
-                            [](bus::Writer& writer) { writer.put(std::uint32_t{999999}).put(std::vector<std::uint32_t>()); }),
+                            [](bus::Writer& writer) {
+                                writer.put(std::uint32_t{999999}).put(std::vector<std::uint32_t>());
+                            }),
               "com.vantrel.Corvista1.Error.NotFound");
     EXPECT_EQ(call::errorOf(run->bus(), ServiceRun::kComputer, call::kNode, "Read",
                             [](bus::Writer& writer) { writer.put(std::vector<std::uint32_t>(5000, 108)); }),

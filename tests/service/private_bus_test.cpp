@@ -36,7 +36,9 @@ HOST_TEST(PrivateBus, LiesInItsDirectoryAndGoesWithIt) {
 HOST_TEST(PrivateBus, DoesNotLieWhereOthersCanWrite) {
     host.realTool("dbus-daemon");
     host.directory("/srv/open", 0777);
-    EXPECT_THAT(problemWith("/srv/open"), HasSubstr("is not safe: '/srv/open' can be written by others"));
+    EXPECT_THAT(
+        problemWith("/srv/open"),
+        HasSubstr("the directory of the bus '/srv/open' is not safe: '/srv/open' can be written by others"));
     host.directory("/srv/theirs");
     host.symlink("/srv/open/link", "/srv/theirs");
     EXPECT_THAT(problemWith("/srv/open/link"), HasSubstr("is not safe"));

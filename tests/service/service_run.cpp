@@ -124,8 +124,8 @@ std::string variantText(bus::Reader& reader, std::string* type) {
             text = reader.bytes();
         } else if (contents.size() == 2 && contents.front() == 'a') {
             reader.array(contents.c_str() + 1, [&] {
-                text += (text.empty() ? "" : " ") +
-                        (contents == "av" ? variantText(reader) : reader.asWord());
+                text +=
+                    (text.empty() ? "" : " ") + (contents == "av" ? variantText(reader) : reader.asWord());
             });
         } else if (contents == "(xq)") {
             reader.structure("xq", [&] {
@@ -160,7 +160,7 @@ std::vector<ToldReading> readings(bus::Reader& reader) {
 
 ToldEvent event(bus::Reader& reader) {
     ToldEvent told;
-    reader.structure("tstusssussssau", [&] {
+    reader.structure("tstusssussssssau", [&] {
         told.number = reader.longNumber();
         told.kind = reader.text();
         reader.skip();
@@ -173,15 +173,26 @@ ToldEvent event(bus::Reader& reader) {
         told.before = reader.text();
         told.after = reader.text();
         told.caller = reader.text();
+        told.wanted = reader.text();
+        told.verdict = reader.text();
         reader.skip();
     });
     return told;
 }
 
+ToldEvents eventsSince(const bus::Connection& bus, std::uint64_t number) {
+    const bus::Message answer =
+        ask(bus, ServiceRun::kRoot, kAgent, "EventsSince", [&](bus::Writer& writer) { writer.put(number); });
+    ToldEvents told;
+    bus::Reader reader(answer);
+    reader.array("(tstusssussssssau)", [&] { told.events.push_back(event(reader)); });
+    told.dropped = reader.longNumber();
+    return told;
+}
+
 std::vector<ToldReading> read(const bus::Connection& bus, const std::string& path,
                               const std::vector<std::uint32_t>& ids) {
-    const bus::Message answer =
-        ask(bus, path, kNode, "Read", [&](bus::Writer& writer) { writer.put(ids); });
+    const bus::Message answer = ask(bus, path, kNode, "Read", [&](bus::Writer& writer) { writer.put(ids); });
     bus::Reader reader(answer);
     return readings(reader);
 }
@@ -194,18 +205,23 @@ Arguments write(std::uint32_t property, const std::string& value) {
 
 bool until(bus::Connection& bus, const std::function<bool()>& condition) {
     const auto end = std::chrono::steady_clock::now() + 10s;
-    bus.process();
-    while (!condition() && std::chrono::steady_clock::now() < end) {
-        pollfd ready{bus.descriptor(), POLLIN, 0};
-        poll(&ready, 1, 10);
+    try {
         bus.process();
+        while (!condition() && std::chrono::steady_clock::now() < end) {
+            pollfd ready{bus.descriptor(), POLLIN, 0};
+            poll(&ready, 1, 10);
+            bus.process();
+        }
+    } catch (const bus::Error&) {
+        // The bus is gone; what came before counts.
     }
     return condition();
 }
 
 std::string asUser(unsigned user, std::optional<unsigned> group,
                    const std::function<std::string()>& function) {
-    return asUserBeside(user, function, [] {}, group);
+    return asUserBeside(
+        user, function, [] {}, group);
 }
 
 std::string asUserBeside(unsigned user, const std::function<std::string()>& function,

@@ -33,6 +33,8 @@ struct ToldEvent {
     std::string before;
     std::string after;
     std::string caller;
+    std::string wanted;
+    std::string verdict;
 };
 
 /// cvagentd with the fake plug-in on a bus of its own, in the fake host, and a client of it.
@@ -96,6 +98,12 @@ std::string variantText(bus::Reader& reader, std::string* type = nullptr);
 ToldReading reading(bus::Reader& reader);
 std::vector<ToldReading> readings(bus::Reader& reader);
 ToldEvent event(bus::Reader& reader);
+/// What EventsSince answers.
+struct ToldEvents {
+    std::vector<ToldEvent> events;
+    std::uint64_t dropped = 0;
+};
+ToldEvents eventsSince(const bus::Connection& bus, std::uint64_t number);
 std::vector<ToldReading> read(const bus::Connection& bus, const std::string& path,
                               const std::vector<std::uint32_t>& ids);
 Arguments write(std::uint32_t property, const std::string& value);

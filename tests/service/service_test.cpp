@@ -18,7 +18,8 @@ HOST_TEST(Service, HelpsAndTellsItsVersion) {
     EXPECT_EQ(host.run({CVAGENTD_PROGRAM, "--version"}).out, "cvagentd 1.0.0\n");
     EXPECT_EQ(host.run({CVAGENTD_PROGRAM, "--nonsense"}).status, 2);
     EXPECT_EQ(host.run({CVAGENTD_PROGRAM, "--private-bus", "--bus", "system"}).status, 2);
-    const Finished nowhere = host.run({CVAGENTD_PROGRAM, "--bus", "unix:path=/nowhere", "--plugin", FAKE_PLUGIN_FILE});
+    const Finished nowhere =
+        host.run({CVAGENTD_PROGRAM, "--bus", "unix:path=/nowhere", "--plugin", FAKE_PLUGIN_FILE});
     EXPECT_EQ(nowhere.status, 1);
     EXPECT_EQ(nowhere.err, "cvagentd: cannot reach the bus unix:path=/nowhere: No such file or directory\n");
 }
@@ -98,8 +99,9 @@ HOST_TEST(Service, StartsAgainAfterAnEndByForce) {
 HOST_TEST(Service, EndsWithItsBus) {
     ServiceRun run(host);
     run.start();
-    const Finished found = host.run({"sh", "-c", "cat /proc/" + std::to_string(run.program().pid()) + "/task/" +
-                                                     std::to_string(run.program().pid()) + "/children"});
+    const Finished found = host.run({"sh", "-c",
+                                     "cat /proc/" + std::to_string(run.program().pid()) + "/task/" +
+                                         std::to_string(run.program().pid()) + "/children"});
     kill(static_cast<pid_t>(std::stol(found.out)), SIGKILL);
     const Finished ended = run.program().wait();
     EXPECT_EQ(ended.status, 1);
@@ -140,6 +142,32 @@ HOST_TEST(Service, TellsItsManagerHowItIs) {
     close(manager);
 }
 
+/// Numbers of events go on after any end, and those of earlier runs are told.
+HOST_TEST(Service, RemembersWhatHappenedBefore) {
+    for (std::uint64_t round = 1; round <= 3; ++round) {
+        ServiceRun run(host);
+        run.start();
+        EXPECT_EQ(call::get(run.bus(), ServiceRun::kRoot, call::kAgent, "LastEvent"),
+                  std::to_string(round - 1));
+        call::ask(run.bus(), ServiceRun::kComputer, call::kNode, "Write",
+                  call::write(115, "room " + std::to_string(round)));
+        const call::ToldEvents all = call::eventsSince(run.bus(), 0);
+        ASSERT_EQ(all.events.size(), round);
+        EXPECT_EQ(all.dropped, 0U);
+        for (std::uint64_t i = 0; i < round; ++i) {
+            EXPECT_EQ(all.events[i].number, i + 1);
+            EXPECT_EQ(all.events[i].after, "room " + std::to_string(i + 1));
+        }
+        EXPECT_EQ(call::eventsSince(run.bus(), round - 1).events.size(), 1U);
+        EXPECT_EQ(call::eventsSince(run.bus(), round).events.size(), 0U);
+        EXPECT_EQ(call::eventsSince(run.bus(), 1U << 20U).events.size(), 0U);
+        EXPECT_EQ(call::get(run.bus(), ServiceRun::kRoot, call::kAgent, "LastEvent"), std::to_string(round));
+        run.program().signal(round == 1 ? SIGKILL : SIGTERM);
+        run.program().wait();
+        host.remove("/run/corvista");
+    }
+}
+
 /// One user's flood is refused beyond a measure, and costs another one nothing but his turn.
 HOST_TEST(ServiceFlood, OfOneUserHoldsNobodyUp) {
     ServiceRun run(host);
@@ -157,8 +185,9 @@ HOST_TEST(ServiceFlood, OfOneUserHoldsNobodyUp) {
             pending.push_back(more.back()->askLater(
                 call::make(*more.back(), ServiceRun::kComputer, call::kNode, "Read",
                            [](bus::Writer& writer) { writer.put(std::vector<std::uint32_t>{904}); }),
-                std::chrono::seconds(60),
-                [&](const bus::Message& answer) { ++answers[answer.isError() ? answer.error().name() : "done"]; }));
+                std::chrono::seconds(60), [&](const bus::Message& answer) {
+                    ++answers[answer.isError() ? answer.error().name() : "done"];
+                }));
         }
     }
     const auto processAll = [&] {
@@ -172,7 +201,8 @@ HOST_TEST(ServiceFlood, OfOneUserHoldsNobodyUp) {
         return count;
     };
     EXPECT_TRUE(call::until(flooder, [&] { return processAll() > 0; }));
-    EXPECT_EQ(call::get(run.bus(), ServiceRun::kComputer, "com.vantrel.Corvista1.Computer", "HostName"), "fake");
+    EXPECT_EQ(call::get(run.bus(), ServiceRun::kComputer, "com.vantrel.Corvista1.Computer", "HostName"),
+              "fake");
     host.remove("/var/hold");
     EXPECT_TRUE(call::until(flooder, [&] { return processAll() == 3 * kCalls; }));
     EXPECT_GT(answers[bus::kLimitsExceeded], 100);
@@ -194,7 +224,8 @@ HOST_TEST(ServiceFlood, OfAReaderThatNeverReadsIsLeftWithTheBus) {
     const auto begun = std::chrono::steady_clock::now();
     EXPECT_EQ(call::get(run.bus(), ServiceRun::kRoot, call::kAgent, "Version"), "1.0.0");
     EXPECT_LT(std::chrono::steady_clock::now() - begun, std::chrono::seconds(20));
-    const std::string status = host.read("/proc/" + std::to_string(run.program().pid()) + "/status").value_or("");
+    const std::string status =
+        host.read("/proc/" + std::to_string(run.program().pid()) + "/status").value_or("");
     EXPECT_LT(std::stol(status.substr(status.find("VmRSS:") + 6)), 100000) << status;
 }
 

@@ -1,4 +1,4 @@
-corvista_test(shell LIBRARIES agent_shell test_support SOURCES
+corvista_test(shell PARTS 2 LIBRARIES agent_shell test_support SOURCES
   shell/adapters_test.cpp
   shell/both_ways.cpp
   shell/both_ways_test.cpp

@@ -37,12 +37,19 @@ def load(context):
         expect(not context.alone, "the drives could not be made ready")
         context.alone = True
         context.guest.sh(SETUP)
-        plugin = context.guest.sh("find /usr/lib -name libcorvistahardware.so.1").strip()
-        nodes = context.guest.cvagent("--plugin", plugin, "tree")["nodes"]
-        listing = json.loads(context.guest.sh("lsblk --json --bytes --output-all --list"))["blockdevices"]
-        context.tree = ({(node["type"], by_id(node)[node["type"] * 100]): by_id(node) for node in nodes
-                         if DRIVE <= node["type"] <= MAPPING}, {row["kname"]: row for row in listing})
+        context.tree = look(context)
     return context.tree
+
+
+def look(context):
+    nodes = context.guest.cvagent("--plugin", plugin(context), "tree")["nodes"]
+    listing = json.loads(context.guest.sh("lsblk --json --bytes --output-all --list"))["blockdevices"]
+    return ({(node["type"], by_id(node)[node["type"] * 100]): by_id(node) for node in nodes
+             if DRIVE <= node["type"] <= MAPPING}, {row["kname"]: row for row in listing})
+
+
+def plugin(context):
+    return context.guest.sh("find /usr/lib -name libcorvistahardware.so.1").strip()
 
 
 def names(nodes, kind):
@@ -118,3 +125,43 @@ def health(context):
     for what, number in (("worn", 30520), ("spare", 30521), ("hours", 30522)):
         expect(number in nvme, f"NVMe: {what} is not told")
     expect_equal("SATA: hours told", 30522 in sata, True)
+
+
+@check("hardware: a drive that hangs costs what only it knows, and holds nothing up", MACHINE)
+def hanging(context):
+    before, _ = load(context)
+    context.machine.slow_down("sdc", 100)
+    try:
+        # The first piece is read at once, the second one when the first is paid for. Its commands follow one another.
+        context.guest.sh("dd if=/dev/sdc of=/dev/null bs=4096 count=2 iflag=direct > /dev/null 2>&1 & sleep 0.5")
+        start = float(context.guest.read("/proc/uptime").split()[0])
+        node = context.guest.cvagent("--plugin", plugin(context), "get", "drive:sdc", status=1)
+        took = float(context.guest.read("/proc/uptime").split()[0]) - start
+        expect("dd" in context.guest.sh("ps -e -o comm"), "the drive did not hang for long enough")
+    finally:
+        context.machine.slow_down("sdc", 0)
+    rows = {int(number): row for number, row in node["properties"].items()}
+    expect(took < 8, f"it took {took:.1f} s")
+    for number in (30507, 30503, 30504):
+        expect_equal(f"what the kernel knows: {number}", rows[number].get("value"), before[DRIVE, "sdc"][number])
+    for number in (30518, 30519, 30522):
+        expect("value" not in rows[number] and "did not answer in time" in json.dumps(rows[number]),
+               f"what only the drive knows: {number} {rows[number]}")
+    context.guest.sh("while pidof dd > /dev/null; do sleep 0.1; done")
+    nodes, _ = look(context)
+    expect_equal("it answers again", nodes[DRIVE, "sdc"].get(30518), "active")
+
+
+@check("hardware: a drive whose reads all fail is shown as it is", MACHINE)
+def failing(context):
+    load(context)
+    context.machine.add_disk("sdd", 16, broken=True)
+    context.guest.sh("i=0; until [ -e /dev/sdd ]; do sleep 0.2; i=$((i + 1)); [ $i -lt 100 ]; done")
+    context.guest.sh("! dd if=/dev/sdd of=/dev/null bs=4096 count=1 iflag=direct 2> /dev/null")
+    nodes, listing = look(context)
+    values = nodes[DRIVE, "sdd"]
+    expect_equal("size", values[30507], listing["sdd"]["size"])
+    counted = int(context.guest.read("/sys/block/sdd/device/ioerr_cnt"), 16)
+    expect(counted > 0, "the kernel counts no errors")
+    expect_equal("errors", values[30517], counted)
+    expect_equal("the others", sorted(set(names(nodes, DRIVE)) - {"sdd"}), names(context.tree[0], DRIVE))

@@ -36,11 +36,13 @@ class Guest:
         return [path.rsplit("/", 1)[1] for path in self.sh(f"for p in {pattern}; do echo $p; done").split()
                 if "*" not in path]
 
-    def cvagent(self, *words):
+    def cvagent(self, *words, status=0):
         """One run of cvagent, its JSON read. It gets files of its own: an agent may be running."""
         line = shlex.join(["cvagent", *words, "--json"])
         own = "mount -t tmpfs -o mode=700 none /opt/vantrel/corvista/data"
-        return json.loads(self.sh(f"unshare -m sh -c {shlex.quote(own + ' && exec ' + line)}"))
+        result = self.machine.run(f"unshare -m sh -c {shlex.quote(own + ' && exec ' + line)}")
+        expect(result.status == status, f"{line}\nended with status {result.status}:\n{result.out}{result.err}")
+        return json.loads(result.out)
 
     def set(self, node, name, *values, status=0):
         """Sets a property on the host's own files and returns the values before and after."""

@@ -132,7 +132,7 @@ class Machine:
             words += ["-device", "ahci,id=ahci", "-device", "sdhci-pci,id=sdhci"]
         for name, row in self.hardware.items():
             words += ["-blockdev", json.dumps(self._block_device(name)),
-                      "-device", f"{row[3]},drive=drive-{name}"]
+                      "-device", f"{row[3]},id={name},drive=drive-{name}"]
         return words
 
     def make_disk(self, name, megabytes):
@@ -169,15 +169,24 @@ class Machine:
     def cable(self, nic, plugged):
         self.qmp("set_link", name=f"nic{nic}", up=plugged)
 
-    def add_disk(self, name, megabytes):
+    def add_disk(self, name, megabytes, broken=False):
+        """A broken one answers every read with an error."""
         self.make_disk(name, megabytes)
-        self.qmp("blockdev-add", **self._block_device(name))
+        device = self._block_device(name)
+        if broken:
+            device = {"driver": "blkdebug", "node-name": device.pop("node-name"), "image": device,
+                      "inject-error": [{"event": "none", "iotype": "read", "errno": 5}]}
+        self.qmp("blockdev-add", **device)
         self.qmp("device_add", driver="scsi-hd", id=name, bus="scsi.0", drive="drive-" + name)
 
     def remove_disk(self, name):
         self.qmp("device_del", id=name)
         self.wait_event("DEVICE_DELETED")
         self.qmp("blockdev-del", **{"node-name": "drive-" + name})
+
+    def slow_down(self, name, bytes_per_second):
+        """How much a drive reads from now on; 0 for as much as it can."""
+        self.qmp("block_set_io_throttle", id=name, bps=0, bps_rd=bytes_per_second, bps_wr=0, iops=0, iops_rd=0, iops_wr=0)
 
     def add_nic(self, nic):
         self.qmp("netdev_add", type="hubport", id=f"wire{nic}", hubid=nic)

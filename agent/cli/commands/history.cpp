@@ -90,8 +90,11 @@ std::string adviceOn(const HistoryError& error, const HistoryPlace& place) {
 }
 
 [[noreturn]] void failWith(const HistoryError& error, const HistoryPlace& place) {
+    const std::string file = inQuotes(place.file());
+    const std::string reason = error.what();
     throw Failure(error.kind() == HistoryError::busy ? ExitStatus::busy : ExitStatus::failed,
-                  "the history " + inQuotes(place.file()) + ": " + error.what() + adviceOn(error, place));
+                  "the history cannot be read: " + (reason.starts_with(file) ? "" : file + ": ") + reason +
+                      adviceOn(error, place));
 }
 
 }  // namespace

@@ -6,17 +6,14 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <filesystem>
-#include <fstream>
-#include <iterator>
-#include <optional>
 #include <sstream>
-#include <system_error>
 
 #include "agent/core/environment.h"
+#include "agent/core/host_file.h"
 #include "agent/core/oshw/tables.h"
 #include "agent/core/text.h"
 #include "framework/ic/link_state.h"
+#include "framework/qx/whole_number.h"
 
 namespace cvagent::oshw {
 
@@ -28,19 +25,6 @@ constexpr const char* kHostNameFile = "/etc/HOSTNAME";
 constexpr int kDaylightSaving = 60;  // minutes
 
 using Texts = std::vector<std::string>;
-
-/// Nothing but a regular file is opened: another one could keep the reader waiting.
-std::optional<std::string> contentOf(const std::string& path) {
-    std::error_code unknown;
-    std::ifstream file;
-    if (std::filesystem::is_regular_file(path, unknown)) {
-        file.open(path);
-    }
-    if (!file.is_open()) {
-        return std::nullopt;
-    }
-    return std::string(std::istreambuf_iterator<char>(file), {});
-}
 
 std::string firstLineOf(const std::string& path) {
     const std::string content = contentOf(path).value_or("");
@@ -157,14 +141,15 @@ std::string domainName(const Taken& taken) {
 
 /// The property reads whether there is a link, which can take its time; the order itself shows in the flags.
 std::string interfaceState(const Taken& taken) {
-    const std::string text = attributeOf(taken, "flags");
-    unsigned int flags = 0;
-    if (!(std::istringstream(text) >> std::hex >> flags)) {
+    const std::string text = attributeOf(taken, "flags");  // 0x1003
+    const auto flags =
+        text.starts_with("0x") ? QX::wholeNumber<unsigned int>(text.substr(2), 16) : std::nullopt;
+    if (!flags) {
         return "the kernel tells no flags of the interface";
     }
     const auto order = static_cast<unsigned int>(taken.written);
     const bool wantsUp = order == IC::LinkState::up || order == IC::LinkState::bringUp;
-    const bool isUp = (flags & static_cast<unsigned int>(IFF_UP)) != 0;
+    const bool isUp = (*flags & static_cast<unsigned int>(IFF_UP)) != 0;
     return isUp == wantsUp ? "" : std::string("the interface is still ") + (isUp ? "up" : "down");
 }
 
@@ -189,8 +174,8 @@ std::string powerAction(const Taken& taken) {
 
 /// It is written without daylight saving and read with it.
 std::string timeZone(const Taken& taken) {
-    const auto minutes = wholeNumber<int>(textOf(taken.read));
-    const auto wanted = wholeNumber<int>(textOf(&taken.written));
+    const auto minutes = QX::wholeNumber<int>(textOf(taken.read));
+    const auto wanted = QX::wholeNumber<int>(textOf(&taken.written));
     return unlessRead(taken,
                       minutes && wanted && (*minutes == *wanted || *minutes == *wanted + kDaylightSaving));
 }

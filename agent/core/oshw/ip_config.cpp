@@ -88,7 +88,8 @@ constexpr Property kIpConfigRows[] = {
      {},
      "the host's DNS domain",
      check::domainName,
-     "a domain name: labels of letters, digits and inner hyphens joined by dots; \"\" removes it"},
+     "a domain name: labels of letters, digits and inner hyphens joined by dots, the last of them no "
+     "number; \"\" removes it"},
     {ip,
      99,
      "DNSSuffixes",

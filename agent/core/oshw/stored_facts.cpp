@@ -79,9 +79,25 @@ void settleAddressType(const IC::MutableNode& node, std::vector<Reading>& readin
     }
 }
 
+/// A tree shows what is stored, and does not show that a read of it fails; what only is late keeps its last
+/// value.
+void keepStored(const IC::MutableNode& node, std::vector<Reading>& readings) {
+    const NodeClass* known = findClass(node.nodeType());
+    const Properties stored = storedProperties(node);
+    for (Reading& reading : readings) {
+        const bool isLive =
+            known != nullptr && std::ranges::find(known->live, reading.id) != known->live.end();
+        const auto before = stored.find(reading.id);
+        if (reading.failed() && !reading.timedOut && !isLive && before != stored.end()) {
+            reading = {reading.id, reading.row, before->second, ""};
+        }
+    }
+}
+
 }  // namespace
 
 void storeAnew(IC::MutableNode& node, std::vector<Reading>& readings) {
+    keepStored(node, readings);
     derive(node, readings);
     settleAddressType(node, readings);
     const Reading* state = isOf(node, NodeType::networkPort) ? findReading(readings, kPortState) : nullptr;

@@ -1,8 +1,8 @@
-#include <charconv>
 #include <optional>
 
 #include "agent/shell/filters/filters.h"
 #include "agent/shell/filters/line_filter.h"
+#include "hosttools/files.h"
 
 namespace cvagent::shell {
 
@@ -65,13 +65,12 @@ std::unique_ptr<Filter> makeCut(Words words, Manner manner) {
     if (!delimiter || !list || !words.empty() || delimiter->size() != 1 || *delimiter == "\n") {
         return nullptr;
     }
-    unsigned field = 0;
-    const char* const end = list->data() + list->size();
-    const auto read = std::from_chars(list->data(), end, field);
-    if (read.ec != std::errc() || read.ptr != end || field < 1 || field > kMostFields) {
+    std::string_view rest = *list;
+    const auto field = hosttools::takeNumber(rest);
+    if (!field || !rest.empty() || *field < 1 || *field > kMostFields) {
         return nullptr;
     }
-    return std::make_unique<Cut>(delimiter->front(), field, manner.busybox);
+    return std::make_unique<Cut>(delimiter->front(), static_cast<unsigned>(*field), manner.busybox);
 }
 
 }  // namespace cvagent::shell

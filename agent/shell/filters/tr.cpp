@@ -26,18 +26,27 @@ public:
             if (!from().pull(chunk_)) {
                 return false;
             }
-            for (const char came : chunk_) {
-                const char letter = becomes_[number(came)];
-                if (last_ != letter || !squeezed_[number(letter)]) {
-                    out += letter;
-                }
-                last_ = letter;
-            }
+            out.resize(before + chunk_.size());
+            out.resize(before + translate(out.data() + before));
         }
         return true;
     }
 
 private:
+    /// @param to for as many letters as there are in the chunk
+    /// @return how many it became
+    std::size_t translate(char* to) {
+        char* end = to;
+        for (const char came : chunk_) {
+            const char letter = becomes_[number(came)];
+            if (last_ != letter || !squeezed_[number(letter)]) {
+                *end++ = letter;
+            }
+            last_ = letter;
+        }
+        return static_cast<std::size_t>(end - to);
+    }
+
     std::array<char, kLetters> becomes_;
     std::array<bool, kLetters> squeezed_;
     std::optional<char> last_;

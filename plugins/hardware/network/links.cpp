@@ -4,6 +4,7 @@
 #include <array>
 
 #include "plugins/hardware/network/link_driver.h"
+#include "plugins/hardware/storage/devices.h"
 
 namespace hardware {
 
@@ -36,6 +37,10 @@ enum : Id {
     kSendErrors,
     kSendDropped,
     kCarrierChanges,
+    kNeighbours,
+    kNeighbourChassis,
+    kNeighbourPorts,
+    kNeighbourPortDescriptions,
 };
 
 constexpr Row row(Id id, const char* name, Kind kind, const char* unit, const char* source,
@@ -78,6 +83,13 @@ constexpr Row kRows[] = {
         true),
     row(kCarrierChanges, "CarrierChanges", Kind::number, "", "carrier_changes",
         "how often the signal came or went", true),
+    row(kNeighbours, "Neighbours", Kind::texts, "", "lldpd", "names of what is at the other end", true),
+    row(kNeighbourChassis, "NeighbourChassis", Kind::texts, "", "lldpd",
+        "numbers of what is at the other end, one for each neighbour", true),
+    row(kNeighbourPorts, "NeighbourPorts", Kind::texts, "", "lldpd",
+        "which of their ports the link leads to, one for each neighbour", true),
+    row(kNeighbourPortDescriptions, "NeighbourPortDescriptions", Kind::texts, "", "lldpd",
+        "what those ports are called, one for each neighbour", true),
 };
 
 struct Counter {
@@ -147,6 +159,33 @@ std::optional<std::string> duplexOf(const Host& host, const std::string& link) {
     return duplex == "unknown" ? std::nullopt : duplex;
 }
 
+struct NeighbourFact {
+    Id id;
+    std::string Neighbour::*text;
+};
+
+constexpr std::array<NeighbourFact, 4> kNeighbourFacts = {
+    {{kNeighbours, &Neighbour::name},
+     {kNeighbourChassis, &Neighbour::chassis},
+     {kNeighbourPorts, &Neighbour::port},
+     {kNeighbourPortDescriptions, &Neighbour::portDescription}}};
+
+void addNeighbours(const Host& host, Found& found) {
+    if (host.devices() == nullptr) {
+        return;
+    }
+    const std::optional<Neighbours> all = host.devices()->neighbours();
+    for (const NeighbourFact& fact : kNeighbourFacts) {
+        if (!all) {
+            found.facts.unanswered(fact.id);
+        } else if (const auto own = all->find(found.name); own != all->end()) {
+            std::vector<std::string> texts(own->second.size());
+            std::ranges::transform(own->second, texts.begin(), fact.text);
+            found.facts.texts(fact.id, texts);
+        }
+    }
+}
+
 }  // namespace
 
 Rows linkRows() {
@@ -181,6 +220,7 @@ void describeLink(const Host& host, Found& found) {
     for (const Counter& counter : kCounters) {
         facts.number(counter.id, host.number(link + "/" + counter.file));
     }
+    addNeighbours(host, found);
 }
 
 }  // namespace hardware

@@ -118,19 +118,19 @@ std::string placeOf(const Host& host, const std::string& directory) {
     return "virtual-0";
 }
 
-}  // namespace
-
-std::vector<Chip> chips(const Host& host) {
+/// Those whose sort a name can begin with: where they sit is not looked up for all the others.
+std::vector<Chip> chipsNamedLike(const Host& host, const std::optional<std::string>& wanted) {
     std::vector<Chip> all;
     std::set<std::string> names;
     for (const std::string& entry : host.entries(kAll)) {
         const std::string directory = kAll + entry;
         const std::optional<std::string> sort = host.line(directory + "/name");
-        if (!sort) {
+        std::string name = sort.value_or("") + "-";
+        std::replace(name.begin(), name.end(), '/', '!');
+        if (!sort || (wanted && !wanted->starts_with(name))) {
             continue;
         }
-        std::string name = *sort + "-" + placeOf(host, directory);
-        std::replace(name.begin(), name.end(), '/', '!');
+        name += placeOf(host, directory);
         while (!names.insert(name).second) {
             name += "+";  // two chips of a careless driver
         }
@@ -139,8 +139,14 @@ std::vector<Chip> chips(const Host& host) {
     return all;
 }
 
+}  // namespace
+
+std::vector<Chip> chips(const Host& host) {
+    return chipsNamedLike(host, std::nullopt);
+}
+
 std::optional<Chip> findChip(const Host& host, const std::string& name) {
-    const std::vector<Chip> all = chips(host);
+    const std::vector<Chip> all = chipsNamedLike(host, name);
     const auto found =
         std::find_if(all.begin(), all.end(), [&](const Chip& chip) { return chip.name == name; });
     return found == all.end() ? std::nullopt : std::optional(*found);

@@ -5,6 +5,7 @@
 #include <string_view>
 
 #include "plugins/hardware/sensor/chips.h"
+#include "plugins/hardware/storage/drive_health.h"
 
 namespace hardware {
 
@@ -28,6 +29,8 @@ enum : Id {
     kCritical,
     kAlarm,
     kFault,
+    kLowCritical,
+    kEmergency,
 };
 
 constexpr Row row(Id id, const char* name, Kind kind, const char* unit, const char* source,
@@ -49,9 +52,13 @@ constexpr Row kRows[] = {
     row(kLow, "LowLimit", Kind::number, "as the value", "*_min", "what is too low"),
     row(kHigh, "HighLimit", Kind::number, "as the value", "*_max", "what is too high"),
     row(kCritical, "CriticalLimit", Kind::number, "as the value", "*_crit", "what does harm"),
-    row(kAlarm, "Alarm", Kind::flag, "", "*_alarm, *_min_alarm, *_max_alarm, *_crit_alarm",
+    row(kAlarm, "Alarm", Kind::flag, "", "*_alarm, *_min_alarm, *_max_alarm, *_crit_alarm and others",
         "whether the chip gives an alarm"),
     row(kFault, "Fault", Kind::flag, "", "*_fault", "whether the sensor is broken; it then has no value"),
+    row(kLowCritical, "LowCriticalLimit", Kind::number, "as the value", "*_lcrit",
+        "what does harm by being too low"),
+    row(kEmergency, "EmergencyLimit", Kind::number, "as the value", "*_emergency",
+        "beyond the critical limit: what stops the chip"),
 };
 
 struct Sort {
@@ -101,6 +108,14 @@ bool isCovered(const Host& host, const std::string& zone, const std::vector<std:
     });
 }
 
+/// A drive that sleeps would be woken by its temperature being read: its driver asks it each time.
+bool letsSleep(const Host& host, const Chip& chip) {
+    const auto drives = chip.sort == "drivetemp" ? host.entries(chip.directory + "/device/block")
+                                                 : std::vector<std::string>();
+    return std::any_of(drives.begin(), drives.end(),
+                       [&host](const std::string& drive) { return !isAwake(host, drive); });
+}
+
 std::optional<double> measured(const Host& host, const std::string& file, double perUnit) {
     const auto count = host.signedNumber(file);
     return count ? std::optional(static_cast<double>(*count) / perUnit) : std::nullopt;
@@ -121,7 +136,8 @@ void describeZone(const Host& host, Found& found) {
 /// Some chips give one alarm, others one for each limit. Nothing where there is none.
 std::optional<bool> alarmOf(const Host& host, const std::string& file) {
     std::optional<bool> any;
-    for (const char* ending : {"_alarm", "_min_alarm", "_max_alarm", "_crit_alarm", "_lcrit_alarm"}) {
+    for (const char* ending :
+         {"_alarm", "_min_alarm", "_max_alarm", "_crit_alarm", "_lcrit_alarm", "_emergency_alarm"}) {
         if (const auto alarm = host.flag(file + ending)) {
             any = any.value_or(false) || *alarm;
         }
@@ -173,13 +189,15 @@ void describeSensor(const Host& host, Found& found) {
     facts.text(kChip, chip->name);
     facts.text(kLabel, host.line(file + "_label"));
     const std::optional<bool> fault = host.flag(file + "_fault");
-    if (fault != true) {
+    if (fault != true && !letsSleep(host, *chip)) {
         const auto value = measured(host, file + "_input", sort->perUnit);
         facts.real(sort->value, value ? value : measured(host, file + "_average", sort->perUnit));
     }
     facts.real(kLow, measured(host, file + "_min", sort->perUnit));
     facts.real(kHigh, measured(host, file + "_max", sort->perUnit));
     facts.real(kCritical, measured(host, file + "_crit", sort->perUnit));
+    facts.real(kLowCritical, measured(host, file + "_lcrit", sort->perUnit));
+    facts.real(kEmergency, measured(host, file + "_emergency", sort->perUnit));
     facts.flag(kAlarm, alarmOf(host, file));
     facts.flag(kFault, fault);
 }

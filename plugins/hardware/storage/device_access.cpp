@@ -112,6 +112,10 @@ DeviceAccess::Contents OwnDevices::contents(const DeviceFile& device) const {
     return open.isOpen() ? probe(open.descriptor()) : Contents();
 }
 
+Neighbours OwnDevices::neighbours() const {
+    return askNeighbours();
+}
+
 std::shared_ptr<const DeviceAccess> ownDevices() {
     return std::make_shared<OwnDevices>();
 }

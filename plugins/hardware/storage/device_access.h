@@ -1,11 +1,14 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
 #include <map>
 #include <memory>
 #include <optional>
 #include <string>
 #include <vector>
+
+#include "plugins/hardware/network/neighbours.h"
 
 namespace hardware {
 
@@ -37,8 +40,15 @@ struct Room {
 class DeviceAccess {
 public:
     using Contents = std::map<std::string, std::string>;
+    /// Texts by their names; neither holds a line break, no name a '='.
+    using Told = std::map<std::string, std::string>;
 
     virtual ~DeviceAccess() = default;
+
+    /// Does work that asks a device. Who waits for a drive cannot be ended by anybody, so where that can be,
+    /// the work is done by another process: this one could not end before it.
+    /// @return what the work told; empty when it could not be done
+    virtual Told apart(const std::function<Told()>& work) const { return work(); }
 
     /// A log page of an NVMe controller, for the controller as a whole.
     /// @return nothing when it has none or may not be asked
@@ -52,6 +62,8 @@ public:
     virtual std::optional<Room> room(const std::string& where) const = 0;
     /// What libblkid finds on the device: TYPE, USAGE, LABEL, UUID. Nothing where the library is missing.
     virtual Contents contents(const DeviceFile& device) const = 0;
+    /// What lldpd has heard on all links.
+    virtual Neighbours neighbours() const = 0;
 };
 
 /// Those of this host.

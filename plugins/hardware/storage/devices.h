@@ -20,21 +20,27 @@ public:
         std::chrono::milliseconds health{60'000};
         std::chrono::milliseconds room{400};
         std::chrono::milliseconds contents{60'000};
+        std::chrono::milliseconds neighbours{10'000};
     };
     explicit Devices(std::shared_ptr<const DeviceAccess> access) : Devices(std::move(access), Times()) {}
     Devices(std::shared_ptr<const DeviceAccess> access, const Times& times);
 
-    /// Nothing when the drive does not answer, cannot tell or must not be asked.
+    /// Nothing when the drive does not answer in time; what it cannot tell is not filled in.
     std::optional<Health> health(const HealthSource& source);
+    /// In the same way.
     std::optional<Room> room(const std::string& where);
-    /// Empty when nothing is known.
+    /// What it was last where the device does not answer: a file system is not gone because of that. Empty
+    /// when nothing is known.
     DeviceAccess::Contents contents(const DeviceFile& device);
+    /// Nothing when lldpd does not answer in time.
+    std::optional<Neighbours> neighbours();
 
 private:
     const std::shared_ptr<const DeviceAccess> access_;
     Answers<Health> health_;
-    Answers<std::optional<Room>> room_;
+    Answers<Room> room_;
     Answers<DeviceAccess::Contents> contents_;
+    Answers<Neighbours> neighbours_;
 };
 
 }  // namespace hardware

@@ -5,6 +5,7 @@
 
 #include "plugins/hardware/storage/block.h"
 #include "plugins/hardware/storage/devices.h"
+#include "plugins/hardware/storage/identity.h"
 
 namespace hardware {
 
@@ -37,8 +38,12 @@ bool isDiskAtWork(const Host& host, const std::string& device) {
     return host.number(device + "/type") == 0ULL && host.line(device + "/state") == "running";
 }
 
+/// Whom to ask; nothing when nobody may be asked.
 std::optional<HealthSource> sourceOf(const Host& host, const std::string& name,
                                      const std::string& transport) {
+    if (!host.privileged() || host.devices() == nullptr || block::isSuspended(host, name)) {
+        return std::nullopt;
+    }
     const std::string device = block::directory(name) + "/device";
     if (transport == "nvme") {
         const auto controller = controllerOf(host, device);
@@ -79,10 +84,16 @@ void addHealth(const Host& host, const std::string& name, const std::string& tra
         facts.text(ids.power, "standby");
         return;
     }
-    const auto source =
-        host.privileged() && host.devices() != nullptr ? sourceOf(host, name, transport) : std::nullopt;
-    const auto health = source ? host.devices()->health(*source) : std::nullopt;
+    const auto source = sourceOf(host, name, transport);
+    if (!source) {
+        return;
+    }
+    const std::optional<Health> health = host.devices()->health(*source);
     if (!health) {
+        for (const Id id :
+             {ids.power, ids.temperature, ids.worn, ids.spare, ids.hours, ids.warnings, ids.mediaErrors}) {
+            facts.unanswered(id);
+        }
         return;
     }
     facts.text(ids.power, health->power);
@@ -91,6 +102,19 @@ void addHealth(const Host& host, const std::string& name, const std::string& tra
     facts.number(ids.spare, health->spare);
     facts.number(ids.hours, health->hours);
     facts.texts(ids.warnings, health->warnings);
+    facts.number(ids.mediaErrors, health->mediaErrors);
+}
+
+bool isAwake(const Host& host, const std::string& name) {
+    if (host.devices() == nullptr) {
+        return true;
+    }
+    if (host.flag(block::directory(name) + "/queue/rotational") == false) {
+        return !block::isSuspended(host, name);
+    }
+    const auto source = sourceOf(host, name, transportOf(host, name).value_or(""));
+    const auto health = source ? host.devices()->health(*source) : std::nullopt;
+    return health && (health->power == "active" || health->power == "idle");
 }
 
 }  // namespace hardware

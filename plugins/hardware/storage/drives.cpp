@@ -37,6 +37,7 @@ enum : Id {
     kSpare,
     kHours,
     kWarnings,
+    kMediaErrors,
 };
 
 constexpr Row row(Id id, const char* name, Kind kind, const char* unit, const char* source,
@@ -83,45 +84,9 @@ constexpr Row kRows[] = {
     row(kSpare, "Spare", Kind::number, "percent", "NVMe log page 2", "spare blocks that are left", true),
     row(kHours, "PowerOnHours", Kind::number, "hours", kHealth, "how long it has been running", true),
     row(kWarnings, "Warnings", Kind::texts, "", kHealth, "what is wrong with it, as it says itself", true),
+    row(kMediaErrors, "MediaErrors", Kind::number, "", "NVMe log page 2",
+        "pieces of data that it could not read or keep whole", true),
 };
-
-struct Attachment {
-    std::string_view part;  ///< of the way to the device
-    const char* transport;
-};
-
-// In this order: a USB case can hold a SATA drive, a SAS controller too.
-constexpr std::array<Attachment, 11> kAttachments = {{{"/usb", "usb"},
-                                                      {"/nvme", "nvme"},
-                                                      {"/virtio", "virtio"},
-                                                      {"/mmc", "mmc"},
-                                                      {"/end_device-", "sas"},
-                                                      {"/rport-", "fibre channel"},
-                                                      {"/session", "iscsi"},
-                                                      {"/ata", "ata"},
-                                                      {"/vbd-", "xen"},
-                                                      {"/ide", "ide"},
-                                                      {"/host", "scsi"}}};
-
-/// Whose bus it is, of the two that look the same: by the driver of the controller.
-bool isSerialAta(const Host& host, const std::string& way) {
-    const std::size_t start = way.find("/host");
-    const std::string controller =
-        start == std::string::npos ? "" : way.substr(start + 1, way.find('/', start + 1) - start - 1);
-    const std::string driver = host.line("/sys/class/scsi_host/" + controller + "/proc_name").value_or("");
-    return driver == "ahci" || driver.starts_with("sata");
-}
-
-std::optional<std::string> transportOf(const Host& host, const std::string& name) {
-    const std::string way = host.resolved(block::directory(name)).value_or("");
-    const auto found = std::find_if(kAttachments.begin(), kAttachments.end(), [&way](const Attachment& one) {
-        return way.find(one.part) != std::string::npos;
-    });
-    if (found == kAttachments.end()) {
-        return std::nullopt;
-    }
-    return found->part == "/ata" && isSerialAta(host, way) ? "sata" : found->transport;
-}
 
 }  // namespace
 
@@ -155,7 +120,7 @@ void describeDrive(const Host& host, Found& found) {
     block::count(host, found.name, {kReads, kReadBytes, kWrites, kWrittenBytes}, facts);
     facts.number(kErrors, host.number(directory + "/device/ioerr_cnt"));
     addHealth(host, found.name, transport.value_or(""),
-              {kPower, kTemperature, kWorn, kSpare, kHours, kWarnings}, facts);
+              {kPower, kTemperature, kWorn, kSpare, kHours, kWarnings, kMediaErrors}, facts);
 }
 
 }  // namespace hardware

@@ -72,19 +72,30 @@ std::vector<std::string> places(const std::vector<Mount>& mounted) {
 
 /// By a mount whose path leads there: what lies over others answers for itself, and a server that has gone
 /// does not answer at all.
-std::optional<Room> roomOf(const Host& host, const std::string& name) {
+std::optional<std::string> wayTo(const Host& host, const std::string& name) {
     constexpr std::size_t kTries = 8;
-    if (host.devices() == nullptr) {
-        return std::nullopt;
-    }
     const Within within = mountsWithinReach(host);
     const std::vector<Mount> own = mountsOf(host, name, within.mounts);
     for (std::size_t at = 0; at < std::min(own.size(), kTries); ++at) {
         if (leadsThere(own[at], within.mounts)) {
-            return host.devices()->room(within.root + own[at].where);
+            return within.root + own[at].where;
         }
     }
     return std::nullopt;
+}
+
+void addRoom(const Host& host, const std::string& name, Facts& facts) {
+    const auto way = host.devices() == nullptr ? std::nullopt : wayTo(host, name);
+    if (!way) {
+        return;
+    }
+    if (const std::optional<Room> room = host.devices()->room(*way)) {
+        facts.number(kSize, room->size);
+        facts.number(kFree, room->free);
+    } else {
+        facts.unanswered(kSize);
+        facts.unanswered(kFree);
+    }
 }
 
 }  // namespace
@@ -124,9 +135,8 @@ void describeFileSystem(const Host& host, Found& found) {
         facts.text(kUuid, contents.uuid);
     }
     facts.texts(kMountPoints, places(own));
-    if (const auto room = own.empty() ? std::nullopt : roomOf(host, found.name)) {
-        facts.number(kSize, room->size);
-        facts.number(kFree, room->free);
+    if (!own.empty()) {
+        addRoom(host, found.name, facts);
     }
 }
 

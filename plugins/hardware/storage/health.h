@@ -16,6 +16,7 @@ struct Health {
         worn;  ///< percent of the life that the maker promises; can be above 100
     std::optional<unsigned long long> spare;  ///< percent of the spare blocks that are left
     std::optional<unsigned long long> hours;
+    std::optional<unsigned long long> mediaErrors;
     std::vector<std::string> warnings;
 };
 
@@ -27,6 +28,10 @@ struct HealthSource {
     HealthWay way;
     DeviceFile file;
 };
+
+/// As texts, and from them.
+DeviceAccess::Told toldOf(const Health& health);
+Health healthFrom(const DeviceAccess::Told& told);
 
 /// Asks one drive. A drive that sleeps is asked nothing but whether it does.
 Health askHealth(const DeviceAccess& access, const HealthSource& source);

@@ -15,6 +15,12 @@ constexpr std::array<const char*, 6> kCritical = {
     "spare blocks run out", "temperature out of its limits",        "reliability is degraded",
     "can only be read",     "backup of volatile memory has failed", "persistent memory can only be read"};
 
+/// A counter has 128 bits; nothing for what 64 do not hold.
+std::optional<unsigned long long> counterAt(const std::string& page, std::size_t place) {
+    const bool fits = littleEndian(page, place + 8, 8) == 0;
+    return fits ? std::optional<unsigned long long>(littleEndian(page, place, 8)) : std::nullopt;
+}
+
 }  // namespace
 
 Health nvmeHealth(const std::string& page) {
@@ -33,9 +39,8 @@ Health nvmeHealth(const std::string& page) {
     }
     health.spare = byteAt(page, 3);
     health.worn = byteAt(page, 5);
-    if (littleEndian(page, 136, 8) == 0) {  // it has 128 bits
-        health.hours = littleEndian(page, 128, 8);
-    }
+    health.hours = counterAt(page, 128);
+    health.mediaErrors = counterAt(page, 160);
     return health;
 }
 

@@ -1,5 +1,8 @@
 #include "plugins/hardware/storage/identity.h"
 
+#include <algorithm>
+#include <array>
+#include <string_view>
 #include <utility>
 
 #include "plugins/hardware/storage/block.h"
@@ -67,7 +70,45 @@ Text nameOf(const Host& host, const std::string& directory) {
     return name && name->starts_with("t10.") ? std::nullopt : name;
 }
 
+struct Attachment {
+    std::string_view part;  ///< of the way to the device
+    const char* transport;
+};
+
+// In this order: a USB case can hold a SATA drive, a SAS controller too.
+constexpr std::array<Attachment, 11> kAttachments = {{{"/usb", "usb"},
+                                                      {"/nvme", "nvme"},
+                                                      {"/virtio", "virtio"},
+                                                      {"/mmc", "mmc"},
+                                                      {"/end_device-", "sas"},
+                                                      {"/rport-", "fibre channel"},
+                                                      {"/session", "iscsi"},
+                                                      {"/ata", "ata"},
+                                                      {"/vbd-", "xen"},
+                                                      {"/ide", "ide"},
+                                                      {"/host", "scsi"}}};
+
+/// Whose bus it is, of the two that look the same: by the driver of the controller.
+bool isSerialAta(const Host& host, const std::string& way) {
+    const std::size_t start = way.find("/host");
+    const std::string controller =
+        start == std::string::npos ? "" : way.substr(start + 1, way.find('/', start + 1) - start - 1);
+    const std::string driver = host.line("/sys/class/scsi_host/" + controller + "/proc_name").value_or("");
+    return driver == "ahci" || driver.starts_with("sata");
+}
+
 }  // namespace
+
+std::optional<std::string> transportOf(const Host& host, const std::string& name) {
+    const std::string way = host.resolved(block::directory(name)).value_or("");
+    const auto found = std::find_if(kAttachments.begin(), kAttachments.end(), [&way](const Attachment& one) {
+        return way.find(one.part) != std::string::npos;
+    });
+    if (found == kAttachments.end()) {
+        return std::nullopt;
+    }
+    return found->part == "/ata" && isSerialAta(host, way) ? "sata" : found->transport;
+}
 
 DriveIdentity identify(const Host& host, const std::string& name) {
     const std::string directory = block::directory(name);

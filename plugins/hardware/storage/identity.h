@@ -16,6 +16,9 @@ struct DriveIdentity {
     std::optional<std::string> wwn;
 };
 
+/// How it is attached: "nvme", "sata", "sas", "usb", "virtio" and others.
+std::optional<std::string> transportOf(const Host& host, const std::string& name);
+
 DriveIdentity identify(const Host& host, const std::string& name);
 
 }  // namespace hardware

@@ -1,10 +1,10 @@
 #include <blkid/blkid.h>
-#include <dlfcn.h>
 
 #include <array>
 #include <memory>
 
 #include "plugins/hardware/host.h"
+#include "plugins/hardware/library_function.h"
 #include "plugins/hardware/storage/own_devices.h"
 
 namespace hardware {
@@ -24,22 +24,16 @@ struct Library {
     bool whole = false;
 };
 
-template <class Function>
-bool find(void* library, const char* name, Function& function) {
-    function = reinterpret_cast<Function>(dlsym(library, name));
-    return function != nullptr;
-}
-
 Library load() {
     Library found;
     void* const library = dlopen("libblkid.so.1", RTLD_NOW | RTLD_LOCAL);
-    found.whole = library != nullptr && find(library, "blkid_new_probe", found.makeProbe) &&
-                  find(library, "blkid_free_probe", found.freeProbe) &&
-                  find(library, "blkid_probe_set_device", found.setDevice) &&
-                  find(library, "blkid_probe_enable_superblocks", found.enable) &&
-                  find(library, "blkid_probe_set_superblocks_flags", found.setFlags) &&
-                  find(library, "blkid_do_safeprobe", found.probe) &&
-                  find(library, "blkid_probe_lookup_value", found.value);
+    found.whole = findFunction(library, "blkid_new_probe", found.makeProbe) &&
+                  findFunction(library, "blkid_free_probe", found.freeProbe) &&
+                  findFunction(library, "blkid_probe_set_device", found.setDevice) &&
+                  findFunction(library, "blkid_probe_enable_superblocks", found.enable) &&
+                  findFunction(library, "blkid_probe_set_superblocks_flags", found.setFlags) &&
+                  findFunction(library, "blkid_do_safeprobe", found.probe) &&
+                  findFunction(library, "blkid_probe_lookup_value", found.value);
     return found;
 }
 

@@ -1,7 +1,7 @@
-# Which files of a test program are compiled as one, where CMAKE_UNITY_BUILD says so: each goes into the first group in which
+# Which files of a program are compiled as one, where CMAKE_UNITY_BUILD says so: each goes into the first group in which
 # nobody gives one of its names to something else. So a file may call its constants and helpers as it likes.
 
-# Leaves in ${out} a list of NAME=OWNER: what a file, or a header of the tests that it includes, defines outside of functions
+# Leaves in ${out} a list of NAME=OWNER: what a file, or a header of the tests or plug-ins that it includes, defines outside of functions
 # and classes, as far as the layout of clang-format tells. The owner is the file, or of a mere alias its text.
 function(names_defined_in file out)
   get_property(known GLOBAL PROPERTY names_of_${file} SET)
@@ -11,7 +11,7 @@ function(names_defined_in file out)
     file(READ ${CMAKE_SOURCE_DIR}/${file} text)
     string(REGEX REPLACE "[][;]" " " text "\n${text}")  # they are special in lists
     set(names "")
-    string(REGEX MATCHALL "\n#include \"tests/[^\"]+" includes "${text}")
+    string(REGEX MATCHALL "\n#include \"(tests|plugins)/[^\"]+" includes "${text}")
     foreach(line IN LISTS includes)
       string(REGEX REPLACE ".*\"" "" header "${line}")
       names_defined_in(${header} more)

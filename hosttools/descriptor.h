@@ -4,7 +4,7 @@
 
 #include <utility>
 
-namespace cvagent::shell {
+namespace hosttools {
 
 /// A descriptor that closes itself.
 class Descriptor {
@@ -21,13 +21,11 @@ public:
     int get() const { return number_; }
     bool isOpen() const { return number_ >= 0; }
     void reset() {
-        if (isOpen()) {
-            close(std::exchange(number_, -1));
-        }
+        if (isOpen()) close(std::exchange(number_, -1));
     }
 
 private:
     int number_ = -1;
 };
 
-}  // namespace cvagent::shell
+}  // namespace hosttools
