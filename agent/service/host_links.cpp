@@ -163,12 +163,11 @@ constexpr NewsRow kNewsRows[] = {
 
 }  // namespace
 
+/// The first plug-in finds a link's lines by its name anywhere in them: what is of eth10 is eth1's as well.
 unsigned int HostChange::concernOf(const std::string& name) const {
     unsigned int concern = 0;
-    for (const std::string& each : {name, std::string()}) {
-        if (const auto found = names.find(each); found != names.end()) {
-            concern |= found->second;
-        }
+    for (const auto& [changed, what] : names) {
+        concern |= changed.empty() || (!name.empty() && changed.find(name) != std::string::npos) ? what : 0;
     }
     return concern;
 }

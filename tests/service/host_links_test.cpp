@@ -140,6 +140,8 @@ TEST(HostChange, IsOfALinkOrOfAll) {
     change.add(later);
     EXPECT_EQ(change.concernOf("eth0"), concernsLink | concernsRoute);
     EXPECT_EQ(change.concernOf("eth1"), concernsRoute);
+    EXPECT_EQ(change.concernOf("eth"), concernsLink | concernsRoute)
+        << "the plug-in takes its lines for this one's";
     EXPECT_THAT(concernedProperties(29, concernsRoute), ElementsAre(100, 101));
     EXPECT_THAT(concernedProperties(12, concernsRoute), IsEmpty());
 }
