@@ -7,6 +7,7 @@
 #include "agent/core/announcer.h"
 #include "agent/core/command_deadline.h"
 #include "agent/core/event_keeping.h"
+#include "agent/core/oshw/stored_facts.h"
 #include "agent/core/plugin_files.h"
 #include "agent/core/plugin_start.h"
 #include "agent/core/text.h"
@@ -111,6 +112,7 @@ NodesOfEach Agent::Engine::nodesOfEach() const {
 void Agent::Engine::refresh() {
     for (const auto& plugin : plugins) {
         setPaths(plugin->interface());
+        plugin->noteIds();
         announcer.announceNew(plugin->interface());
     }
 }
@@ -183,6 +185,63 @@ std::vector<std::vector<Reading>> Agent::readTree(const std::vector<NodeRef>& no
         }
     }
     return all;
+}
+
+std::vector<std::vector<Reading>> Agent::readAnew(const std::vector<Asked>& asked,
+                                                  const Request& request) const {
+    std::vector<Reader::Question> questions;
+    for (const Asked& one : asked) {
+        for (const unsigned int id : one.ids) {
+            questions.push_back({one.node.node_, id});
+        }
+    }
+    const std::vector<Reading> read = engine_->reader.readNow(questions, request);
+    std::vector<std::vector<Reading>> all;
+    auto next = read.begin();
+    for (const Asked& one : asked) {
+        std::vector<Reading>& own = all.emplace_back(next, next + static_cast<long>(one.ids.size()));
+        next += static_cast<long>(one.ids.size());
+        oshw::storeAnew(*one.node.node_, own);
+    }
+    return all;
+}
+
+bool Agent::lookForLinks(const Request& request) const {
+    for (const std::vector<Handle>& nodes : engine_->nodesOfEach()) {
+        const auto node =
+            std::ranges::find_if(nodes, [](const Handle& each) { return oshw::takesLookForLinks(*each); });
+        if (node != nodes.end()) {
+            engine_->writer.between(request, [&node] { oshw::lookForLinks(**node); });
+            return true;
+        }
+    }
+    return false;
+}
+
+void Agent::withdraw(const std::vector<NodeRef>& nodes, const Request& request) const {
+    engine_->writer.between(request, [&] {
+        for (const NodeRef& node : nodes) {
+            for (const auto& plugin : engine_->plugins) {
+                plugin->interface().deleteNode(node.node_.get());  // one that another one has fails
+            }
+        }
+    });
+}
+
+void Agent::restartPluginOf(const NodeRef& node, const Request& request) const {
+    engine_->writer.between(request, [&] {
+        for (const auto& plugin : engine_->plugins) {
+            if (plugin->interface().hold(node->getNodeId()).get() == node.node_.get()) {
+                const std::vector<Handle> before = plugin->interface().holdAll();
+                plugin->startAgain();
+                engine_->announcer.announceRestart(before, plugin->interface());
+            }
+        }
+    });
+}
+
+void Agent::setStatus(const NodeRef& node, unsigned int status) const {
+    node.node_->setStatus(status);
 }
 
 WriteResult Agent::write(const NodeRef& node, const Property& row, const IC::PropertyValue& value,

@@ -82,9 +82,31 @@ public:
     /// otherwise is read now, on all nodes side by side.
     std::vector<std::vector<Reading>> readTree(const std::vector<NodeRef>& nodes,
                                                const Request& request) const;
+    /// Properties of a node that are asked together.
+    struct Asked {
+        NodeRef node;
+        std::vector<unsigned int> ids;
+    };
+    /// What is so now of many nodes, side by side. What the plug-in stores once, when it makes a node, and
+    /// does not read again, is stored anew as far as the answers tell it, so that the node is as a start
+    /// would make it (oshw/stored_facts.h).
+    /// @return the readings of each, in the order of the ids; nothing of what the host does not have
+    std::vector<std::vector<Reading>> readAnew(const std::vector<Asked>& asked, const Request& request) const;
     /// See Writer::write. What may be written is judged before: see property_words.h.
     WriteResult write(const NodeRef& node, const Property& row, const IC::PropertyValue& value,
                       const Request& request) const;
+
+    // Of long-lived front ends, which hear of changes before the plug-ins do. They keep out of writes, whose
+    // turns they wait for; they throw Problem (busy) when there is none until the request's deadline.
+    /// Has the plug-in of the links look for those that have appeared; new nodes are told as events.
+    /// @return false when no node is there through which it could be asked
+    bool lookForLinks(const Request& request) const;
+    /// Takes nodes out of their plug-ins whose things are gone; told as events.
+    void withdraw(const std::vector<NodeRef>& nodes, const Request& request) const;
+    /// Stops the plug-in of a node and starts it anew: what it finds at a start alone is found. Its nodes
+    /// have other ids then; told as events are those that come or go by their paths.
+    void restartPluginOf(const NodeRef& node, const Request& request) const;
+    void setStatus(const NodeRef& node, unsigned int status) const;
 
     /// A front end has found out by itself that something has changed.
     void announce(const Event& event) const;

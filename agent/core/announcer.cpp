@@ -1,6 +1,7 @@
 #include "agent/core/announcer.h"
 
 #include <limits>
+#include <set>
 
 #include "framework/qx/whole_number.h"
 
@@ -41,11 +42,16 @@ void Announcer::tellPublished(const Event& event) {
 }
 
 void Announcer::tellWithdrawn(const Event& event) {
-    early_.erase(event.nodeId);
-    facts_.forget(event.nodeId);
-    told_.erase(told_.lower_bound({event.nodeId, 0}),
-                told_.upper_bound({event.nodeId, std::numeric_limits<unsigned int>::max()}));
+    forget(event.nodeId);
     events_.hear(event);
+}
+
+/// guard_ is held.
+void Announcer::forget(unsigned int node) {
+    early_.erase(node);
+    facts_.forget(node);
+    told_.erase(told_.lower_bound({node, 0}),
+                told_.upper_bound({node, std::numeric_limits<unsigned int>::max()}));
 }
 
 /// What a read has brought since the last event is not in the chain: its reader knows it.
@@ -83,6 +89,32 @@ void Announcer::announceNew(const IC::ManagementInterface& interface) {
         // One that is withdrawn in this moment waits with its event for the guard.
         if (interface.hold(id) && facts_.meet(id)) {
             early_.insert(id);
+            events_.hear(nodeEvent(Event::Kind::published, *node));
+        }
+    }
+}
+
+void Announcer::announceRestart(const std::vector<std::shared_ptr<IC::MutableNode>>& before,
+                                const IC::ManagementInterface& interface) {
+    const auto after = interface.holdAll();
+    const auto pathsOf = [](const std::vector<std::shared_ptr<IC::MutableNode>>& nodes) {
+        std::set<std::string> paths;
+        for (const auto& node : nodes) {
+            paths.insert(node->getPath());
+        }
+        return paths;
+    };
+    const std::set<std::string> were = pathsOf(before);
+    const std::set<std::string> are = pathsOf(after);
+    const std::lock_guard lock(guard_);
+    for (const auto& node : before) {
+        forget(node->getNodeId());
+        if (!are.contains(node->getPath())) {
+            events_.hear(nodeEvent(Event::Kind::withdrawn, *node));
+        }
+    }
+    for (const auto& node : after) {
+        if (facts_.meet(node->getNodeId()) && !were.contains(node->getPath())) {
             events_.hear(nodeEvent(Event::Kind::published, *node));
         }
     }

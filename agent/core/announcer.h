@@ -28,6 +28,10 @@ public:
     void hear(const Event& event) override;
     /// The nodes of a start: no news, but known from now on.
     void takeStock(const IC::ManagementInterface& interface);
+    /// A plug-in has started anew: only the nodes that were there before alone, or are there now alone, are
+    /// told.
+    void announceRestart(const std::vector<std::shared_ptr<IC::MutableNode>>& before,
+                         const IC::ManagementInterface& interface);
     /// Nodes that have appeared without the plug-in's telling are told. A write can make some.
     void announceNew(const IC::ManagementInterface& interface);
     /// What a write came to; the texts are those of its event.
@@ -46,6 +50,7 @@ private:
 
     void tellPublished(const Event& event);
     void tellWithdrawn(const Event& event);
+    void forget(unsigned int node);
     void tellAlert(Event event);
 
     Listener& events_;

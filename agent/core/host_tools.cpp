@@ -184,6 +184,15 @@ void setUpCommands(Commands commands) {
     QX::setKillCallBack(shell::noteKill);
 }
 
+void findLinksOfAnyName(std::vector<ToolReport>& reports) {
+    for (ToolReport& report : reports) {
+        if (report.tool == kListingTool && !report.adapter.empty()) {
+            report.useAdapter = true;
+            report.standsBy = false;
+        }
+    }
+}
+
 void putAdaptersOnPath(const std::vector<ToolReport>& reports) {
     const char* const hosts = std::getenv("PATH");
     std::string front;

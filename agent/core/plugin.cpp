@@ -2,6 +2,7 @@
 
 #include <dlfcn.h>
 
+#include <algorithm>
 #include <exception>
 #include <filesystem>
 
@@ -114,22 +115,42 @@ void Plugin::takePlace() {
 
 void Plugin::start(bool processors) {
     begun_ = true;
+    processors_ = processors;
     events_.startHere();
     try {
-        guarded("initialize of " + inQuotes(file_), [this, processors] { initialize(processors); });
+        guarded("initialize of " + inQuotes(file_),
+                [this, processors] { initialize(processors, running_->ids().firstNode); });
     } catch (...) {
         events_.abandon();
         throw;
     }
 }
 
-void Plugin::initialize(bool processors) {
+void Plugin::noteIds() {
+    for (const Handle& node : interface_->holdAll()) {
+        lastId_ = std::max(lastId_, node->getNodeId());
+    }
+}
+
+void Plugin::startAgain() {
+    noteIds();
+    const std::vector<Handle> former = interface_->holdAll();
+    guarded("unload of " + inQuotes(file_), [this] { interface_->unload(); });
+    for (const Handle& node : former) {
+        interface_->deleteNode(
+            node.get());  // no longer listed: nobody is told, and it goes with its last holder
+    }
+    guarded("initialize of " + inQuotes(file_), [this] { initialize(processors_, lastId_ + 1); });
+    noteIds();
+}
+
+void Plugin::initialize(bool processors, unsigned int firstNode) {
     const IdRange ids = running_->ids();
     interface_->setLoadCallBack(nodeLoaded, this, running_->finder());
     interface_->setWithdrawCallBack(nodeWithdrawn, this);
     interface_->registerForAlerts(alertsCame, this);
     const IC::Error result =
-        interface_->initialize(ids.interfaceId, IC::Number(ids.ownNode), IC::Number(ids.firstNode));
+        interface_->initialize(ids.interfaceId, IC::Number(ids.ownNode), IC::Number(firstNode));
     if (result.getStatus() != 0) {
         fail("the plug-in " + inQuotes(file_) + " did not initialize: " + errorText(result));
     }

@@ -34,6 +34,11 @@ public:
     /// Problem; what is left then is good for nothing but its end.
     /// @param processors whether its builder of processor nodes is called
     void start(bool processors);
+    /// Stops it and starts it anew, with ids of its nodes that none has had before; the former nodes live for
+    /// as long as somebody holds them. Throws Problem; it then has no nodes.
+    void startAgain();
+    /// Takes note of the ids that the plug-in has given away by now.
+    void noteIds();
     /// After the start: the listener hears what came meanwhile, and from now on everything.
     void tellEvents() { events_.release(); }
     /// Instead of that: the listener never hears anything, and nobody waits for him. While it starts, too.
@@ -54,7 +59,7 @@ private:
     void load();
     void open();
     void takePlace();
-    void initialize(bool processors);
+    void initialize(bool processors, unsigned int firstNode);
     void checkIds() const;
     bool isOwnId(const IC::MutableNode& node) const;
     void stop();
@@ -66,6 +71,8 @@ private:
     IC::ManagementInterface* interface_ = nullptr;
     std::optional<RunningPlugin> running_;
     bool begun_ = false;  // there is something to stop
+    bool processors_ = false;
+    unsigned int lastId_ = 0;  // the highest that was given away; of the thread that has the turn to write
 };
 
 }  // namespace cvagent

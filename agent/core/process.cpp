@@ -25,7 +25,12 @@ PreparedProcess::PreparedProcess(ProcessSettings settings) {
     setUpCommands(settings.commands);
     StopSignals::install();
     if (settings.hostTools != HostTools::native) {
-        putAdaptersOnPath(inspectHostTools(settings.hostTools, Look::adapters, adapterDirectory()));
+        std::vector<ToolReport> reports =
+            inspectHostTools(settings.hostTools, Look::adapters, adapterDirectory());
+        if (settings.linksMayCome && settings.hostTools == HostTools::automatic) {
+            findLinksOfAnyName(reports);
+        }
+        putAdaptersOnPath(reports);
     }
 }
 

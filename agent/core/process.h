@@ -17,6 +17,8 @@ struct ProcessSettings {
     LogSettings log;  ///< its files are among them
     Commands commands = Commands::direct;
     HostTools hostTools = HostTools::automatic;
+    /// Links may come whose names the host's own tools do not find: the front end stays.
+    bool linksMayCome = false;
 };
 
 /// All that an agent needs and that changes the whole process: surroundings, the data directory and the

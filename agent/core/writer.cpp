@@ -161,6 +161,14 @@ WriteResult Writer::write(const Handle& node, const Property& row, const IC::Pro
     return timedOut(*node, row, begun);
 }
 
+void Writer::between(const Request& request, const std::function<void()>& work) {
+    const Turn turn(*this, request.deadline());
+    const ErrorScope errors(request.errors());
+    const CommandScope scope(CommandScope::write);
+    work();
+    tree_.refresh();
+}
+
 void Writer::giveUp(std::uint64_t turn) {
     const std::lock_guard lock(guard_);
     givenUp_ = givenUp_ || (busy_ && turn == turns_);  // it may have ended just now, and another one begun

@@ -55,6 +55,10 @@ public:
     WriteResult write(const Handle& node, const Property& row, const IC::PropertyValue& value,
                       const Request& request);
 
+    /// Runs what must not meet a write, on the calling thread, and has the tree refreshed behind it. Throws
+    /// Problem (busy) when a write is at work until the request's deadline.
+    void between(const Request& request, const std::function<void()>& work);
+
 private:
     struct Job;
     struct Pending;

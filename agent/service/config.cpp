@@ -77,7 +77,7 @@ struct Key {
 constexpr Key kKeys[] = {
     {"look-every", setDuration<&Config::lookEvery, 10, 86400, true>,
      "seconds from 10 to 86400, or 0 for never"},
-    {"settling-time", setDuration<&Config::settlingTime, 0, 10000>, "milliseconds from 0 to 10000"},
+    {"settling-time", setDuration<&Config::settlingTime, 0, 1000>, "milliseconds from 0 to 1000"},
     {"command-timeout", setDuration<&Config::commandTime, 1, 3600, true>,
      "seconds from 1 to 3600, or 0 for no limit"},
     {"trusted-group", setGroup, "the name of a group"},

@@ -12,9 +12,9 @@ inline constexpr const char* kConfigFile = "/etc/corvista/agent.conf";
 
 /// What /etc/corvista/agent.conf says; agent.conf(5) describes it.
 struct Config {
-    std::chrono::seconds lookEvery{600};         ///< between looks at everything; 0: only at the start
-    std::chrono::milliseconds settlingTime{50};  ///< how long news of a node are gathered
-    std::chrono::seconds commandTime{10};        ///< of a plug-in's command; taken at the start
+    std::chrono::seconds lookEvery{600};          ///< between looks at everything; 0: only at the start
+    std::chrono::milliseconds settlingTime{200};  ///< how long it must be quiet before a look
+    std::chrono::seconds commandTime{10};         ///< of a plug-in's command; taken at the start
     std::string trustedGroup = "corvista";
     std::chrono::seconds historyAge = std::chrono::hours(24 * 400);  ///< older entries of the history go
     std::uint64_t historyBytes = std::uint64_t{64} << 20U;           ///< of its file

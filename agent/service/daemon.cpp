@@ -52,6 +52,7 @@ ProcessSettings processSettings(Options& options) {
         "; rename what has that name: letters, digits, dots, dashes and underscores are fine";
     settings.commands = options.commands;
     settings.hostTools = options.hostTools;
+    settings.linksMayCome = true;
     return settings;
 }
 

@@ -1,13 +1,14 @@
 #include "agent/service/looker.h"
 
 #include <algorithm>
-#include <map>
 #include <set>
-#include <span>
 #include <utility>
 
+#include "agent/service/concerns.h"
+#include "agent/service/log.h"
 #include "agent/service/names.h"
 #include "agent/service/values.h"
+#include "framework/ic/link_state.h"
 
 namespace cvagent::service {
 
@@ -15,6 +16,10 @@ namespace {
 
 /// What hangs is stale after this; the next look finds it again.
 constexpr std::chrono::seconds kLongestLook{15};
+
+/// When a plug-in that hears the kernel itself has looked.
+constexpr std::chrono::milliseconds kTheirLook{1500};
+constexpr unsigned int kLinkState = 123;
 
 Request lookRequest() {
     return Request("the service", Request::Clock::now() + kLongestLook);
@@ -39,6 +44,23 @@ NodeView viewOf(const NodeRef& node, std::vector<Reading> readings) {
             wallClock()};
 }
 
+/// What a tree shows of it.
+std::vector<unsigned int> shownOf(const NodeRef& node) {
+    std::set<unsigned int> ids;
+    for (const auto& [id, value] : storedProperties(*node)) {
+        ids.insert(id);
+    }
+    if (const NodeClass* known = findClass(node->nodeType())) {
+        ids.insert(known->live.begin(), known->live.end());
+    }
+    return {ids.begin(), ids.end()};
+}
+
+bool isNewOf(const HostChange& change, const NodeRef& node) {
+    return change.any() &&
+           looksByItself(className(node->nodeType()), change.concernOf(nameOf(*node)), change.drives);
+}
+
 }  // namespace
 
 Looker::~Looker() {
@@ -49,16 +71,11 @@ Looker::~Looker() {
 }
 
 Look Looker::firstLook() {
-    const auto now = Clock::now();
     const std::vector<NodeRef> nodes = agent_.nodes();
-    std::vector<std::vector<Reading>> readings = agent_.readTree(nodes, lookRequest());
-    Look look{++begun_, true, {}, {}};
-    for (std::size_t i = 0; i < nodes.size(); ++i) {
-        for (Reading& reading : readings[i]) {
-            reading.asOf = reading.failed() ? reading.asOf : reading.asOf.value_or(now);
-        }
-        look.order.push_back(nodes[i]->getNodeId());
-        look.nodes.push_back(viewOf(nodes[i], std::move(readings[i])));
+    Look look{++begun_, true, {}, readFirst(nodes, lookRequest())};
+    for (const NodeRef& node : nodes) {
+        look.order.push_back(node->getNodeId());
+        met_.insert(node->getNodeId());
     }
     return look;
 }
@@ -73,68 +90,187 @@ void Looker::stop() {
     changed_.notify_all();
 }
 
-void Looker::lookAgain(std::uint32_t node) {
+template <class Change>
+void Looker::want(const Change& change) {
     const std::lock_guard lock(guard_);
-    wanted_.nodes.insert(node);
-    changed_.notify_all();
+    const bool none = !wanted_.any();
+    change(wanted_);
+    lastTold_ = Clock::now();
+    firstTold_ = none ? lastTold_ : firstTold_;
+    if (none) {
+        changed_.notify_all();
+    }
+}
+
+void Looker::lookAgain(std::uint32_t node) {
+    want([node](Wanted& wanted) { wanted.nodes.insert(node); });
 }
 
 void Looker::lookAtAll() {
-    const std::lock_guard lock(guard_);
-    wanted_.all = true;
-    changed_.notify_all();
+    want([](Wanted& wanted) { wanted.all = true; });
+}
+
+void Looker::hear(const HostChange& change) {
+    want([&change](Wanted& wanted) { wanted.host.add(change); });
+}
+
+void Looker::alertCame(std::uint32_t node) {
+    want([node](Wanted& wanted) { wanted.alerted.insert(node); });
+}
+
+/// When to look at what is wanted; guard_ is held.
+Looker::Clock::time_point Looker::lookTime() const {
+    constexpr std::chrono::milliseconds kLongest{1000};
+    constexpr int kMostSettlings = 5;
+    const std::chrono::milliseconds settling = settling_;
+    const auto longest = std::min(std::max(settling, kLongest), kMostSettlings * settling);
+    return std::max(restUntil_, std::min(lastTold_ + settling, firstTold_ + longest));
 }
 
 Looker::Wanted Looker::waitForWanted() {
     std::unique_lock lock(guard_);
-    changed_.wait(lock, [this] { return stopped_ || wanted_.any(); });
-    changed_.wait_for(lock, settling_.load(), [this] { return stopped_; });
+    const auto ready = [this] { return stopped_ || wanted_.any(); };
+    if (const auto next = due()) {
+        wanted_.follow = !changed_.wait_until(lock, *next, ready);
+    } else {
+        changed_.wait(lock, ready);
+    }
+    while (!stopped_ && Clock::now() < lookTime()) {
+        changed_.wait_until(lock, lookTime(), [this] { return stopped_; });
+    }
     return stopped_ ? Wanted() : std::exchange(wanted_, {});
+}
+
+/// When to look though nothing is told.
+std::optional<Looker::Clock::time_point> Looker::due() const {
+    const auto tree = keeper_.due();
+    return tree && laterAt_ ? std::min(*tree, *laterAt_) : tree ? tree : laterAt_;
+}
+
+/// Adds what was put off until now, and puts off what was heard.
+void Looker::noteForLater(Wanted& wanted) {
+    const auto now = Clock::now();
+    const HostChange heard = wanted.host;
+    if (laterAt_ && *laterAt_ <= now) {
+        wanted.later = std::exchange(later_, {});
+        laterAt_.reset();
+    }
+    if (heard.any()) {
+        later_.add(heard);
+        laterAt_ = now + kTheirLook;
+    }
 }
 
 void Looker::run() {
     for (Wanted wanted = waitForWanted(); wanted.any(); wanted = waitForWanted()) {
+        const auto begun = Clock::now();
+        noteForLater(wanted);
         deliver_(look(wanted));
+        const auto ended = Clock::now();
+        restUntil_ = ended + (ended - begun);
     }
 }
 
-/// What the node stores and what a read tells otherwise, all of it read now, as a new agent would show it:
-/// where a read fails of which a tree does not show the failure, what is stored stays. What the host does not
-/// tell in time is the last value.
-std::vector<Reading> Looker::readAgain(const NodeRef& node, const Request& request) const {
-    const NodeClass* known = findClass(node->nodeType());
-    const std::span<const unsigned int> live =
-        known != nullptr ? known->live : std::span<const unsigned int>();
-    std::map<unsigned int, Reading> stored;
-    std::set<unsigned int> ids(live.begin(), live.end());
-    for (const Reading& reading : storedReadings(*node)) {
-        stored.emplace(reading.id, reading);
-        ids.insert(reading.id);
-    }
-    std::vector<Reading> readings =
-        agent_.read(node, {ids.begin(), ids.end()}, cvagent::Freshness::now, request);
-    for (Reading& reading : readings) {
-        const bool isLive = std::ranges::find(live, reading.id) != live.end();
-        const auto before = stored.find(reading.id);
-        if (reading.failed() && !reading.timedOut && !isLive && before != stored.end()) {
-            reading = before->second;
+/// As a start shows a node: what is stored is as old as the node.
+std::vector<NodeView> Looker::readFirst(const std::vector<NodeRef>& nodes, const Request& request) {
+    const auto now = Clock::now();
+    std::vector<std::vector<Reading>> readings = agent_.readTree(nodes, request);
+    std::vector<NodeView> views;
+    for (std::size_t i = 0; i < nodes.size(); ++i) {
+        for (Reading& reading : readings[i]) {
+            reading.asOf = reading.failed() ? reading.asOf : reading.asOf.value_or(now);
         }
+        views.push_back(viewOf(nodes[i], std::move(readings[i])));
     }
-    std::erase_if(readings, [&stored](const Reading& reading) {
-        return reading.missing && !stored.contains(reading.id);
+    return views;
+}
+
+/// What the host tells now. A property that it no longer tells is not known any more; one of which it tells
+/// nothing in time keeps its last value.
+std::vector<NodeView> Looker::readAgain(const std::vector<Agent::Asked>& asked, const Request& request) {
+    std::vector<std::vector<Reading>> readings = agent_.readAnew(asked, request);
+    std::vector<NodeView> views;
+    for (std::size_t i = 0; i < asked.size(); ++i) {
+        views.push_back(viewOf(asked[i].node, std::move(readings[i])));
+        views.back().asked = asked[i].ids;
+    }
+    return views;
+}
+
+/// An IP configuration is as its link is listed, by its name or any that has it within, as the plug-in looks
+/// for it.
+/// @return whether it is another status
+bool Looker::setStatus(const NodeRef& node) const {
+    if (!links_ || node->nodeType() != static_cast<unsigned int>(NodeType::ipConfig)) {
+        return false;
+    }
+    const std::string name = nameOf(*node);
+    const bool isUp = std::ranges::any_of(*links_, [&name](const auto& link) {
+        return link.second.isUp && link.second.name.find(name) != std::string::npos;
     });
-    return readings;
+    const unsigned int status = isUp ? IC::LinkState::up : IC::LinkState::down;
+    const bool differs = node->getStatus() != status;
+    agent_.setStatus(node, status);
+    return differs;
+}
+
+/// All that a tree shows of the node, or only what the kernel's news concern; none for nothing.
+std::vector<unsigned int> Looker::concernedOf(const NodeRef& node, const Wanted& wanted) const {
+    if (!wanted.all && !wanted.nodes.contains(node->getNodeId())) {
+        if (isNewOf(wanted.later, node) || isNewOf(wanted.host, node)) {
+            return shownOf(node);
+        }
+        if (!wanted.host.any()) {
+            return {};
+        }
+        std::vector<unsigned int> concerned =
+            concernedProperties(node->nodeType(), wanted.host.concernOf(nameOf(*node)));
+        return setStatus(node) && concerned.empty() ? std::vector{kLinkState} : concerned;
+    }
+    setStatus(node);
+    return shownOf(node);
+}
+
+/// What is not done because a write is at work is done at the next look.
+void Looker::keepTree(const Wanted& wanted, const Request& request) {
+    links_ = wanted.host.links ? wanted.host.links : links_;
+    for (const std::uint32_t node : wanted.alerted) {
+        keeper_.alertCame(node);
+    }
+    const auto due = keeper_.due();
+    const bool isDue = due && *due <= Clock::now();
+    if (!links_ || !(wanted.host.linksDiffer || wanted.host.drives || wanted.all || isDue)) {
+        return;
+    }
+    try {
+        if (keeper_.follow(*links_, request)) {
+            met_.clear();
+        }
+    } catch (const Problem& problem) {
+        log(Priority::info, std::string("links are followed later: ") + problem.what());
+    }
 }
 
 Look Looker::look(const Wanted& wanted) {
     Look look{++begun_, wanted.all, {}, {}};
     const Request request = lookRequest();
-    for (const NodeRef& node : agent_.nodes()) {
+    keepTree(wanted, request);
+    std::vector<NodeRef> fresh;
+    std::vector<Agent::Asked> asked;
+    const std::set<std::uint32_t> met = std::exchange(met_, {});
+    for (const NodeRef& node : keeper_.shown()) {
         const std::uint32_t id = node->getNodeId();
         look.order.push_back(id);
-        if (wanted.all || wanted.nodes.contains(id)) {
-            look.nodes.push_back(viewOf(node, readAgain(node, request)));
+        met_.insert(id);
+        if (!met.contains(id)) {
+            fresh.push_back(node);
+        } else if (std::vector<unsigned int> ids = concernedOf(node, wanted); !ids.empty()) {
+            asked.push_back({node, std::move(ids)});
         }
+    }
+    look.nodes = readFirst(fresh, request);
+    for (NodeView& view : readAgain(asked, request)) {
+        look.nodes.push_back(std::move(view));
     }
     return look;
 }

@@ -4,12 +4,17 @@
 #include <chrono>
 #include <condition_variable>
 #include <functional>
+#include <memory>
 #include <mutex>
+#include <optional>
 #include <set>
 #include <thread>
+#include <vector>
 
 #include "agent/core/agent.h"
+#include "agent/service/host_links.h"
 #include "agent/service/model.h"
+#include "agent/service/tree_keeper.h"
 
 namespace cvagent::service {
 
@@ -23,16 +28,22 @@ public:
     virtual void lookAgain(std::uint32_t node) = 0;
     /// Anything may be different.
     virtual void lookAtAll() = 0;
+    /// The kernel has announced something. Links come with it, as they are now.
+    virtual void hear(const HostChange& change) = 0;
+    /// An alert has come of a node, which tells it apart from one that nobody heard of.
+    virtual void alertCame(std::uint32_t node) = 0;
 };
 
-/// Looks at nodes on a thread of its own.
+/// Looks at nodes on a thread of its own: once for all that is told until nothing has come for the settling
+/// time, or for five times as long, but a second at most; and for no more than half of the time.
 class Looker : public Freshness {
 public:
     using Clock = std::chrono::steady_clock;
 
     /// @param agent   outlives it
     /// @param deliver takes each look, on the looker's thread
-    Looker(Agent& agent, std::function<void(Look)> deliver) : agent_(agent), deliver_(std::move(deliver)) {}
+    Looker(Agent& agent, std::function<void(Look)> deliver)
+        : agent_(agent), deliver_(std::move(deliver)), keeper_(agent) {}
     Looker(const Looker&) = delete;
     Looker& operator=(const Looker&) = delete;
     /// Waits for a look that is under way.
@@ -46,6 +57,8 @@ public:
 
     void lookAgain(std::uint32_t node) override;
     void lookAtAll() override;
+    void hear(const HostChange& change) override;
+    void alertCame(std::uint32_t node) override;
     /// How long tellings are gathered before a look.
     void setSettlingTime(std::chrono::milliseconds time) { settling_ = time; }
     /// How many looks have begun.
@@ -54,23 +67,45 @@ public:
 private:
     struct Wanted {
         bool all = false;
+        bool follow = false;  // what nodes there are
         std::set<std::uint32_t> nodes;
-        bool any() const { return all || !nodes.empty(); }
+        std::set<std::uint32_t> alerted;
+        HostChange host;
+        HostChange later;  // was heard before
+        bool any() const { return all || follow || !nodes.empty() || !alerted.empty() || host.any(); }
     };
+    template <class Change>
+    void want(const Change& change);
 
     void run();
     Wanted waitForWanted();
+    Clock::time_point lookTime() const;
     Look look(const Wanted& wanted);
-    std::vector<Reading> readAgain(const NodeRef& node, const Request& request) const;
+    std::optional<Clock::time_point> due() const;
+    void noteForLater(Wanted& wanted);
+    void keepTree(const Wanted& wanted, const Request& request);
+    std::vector<unsigned int> concernedOf(const NodeRef& node, const Wanted& wanted) const;
+    std::vector<NodeView> readAgain(const std::vector<Agent::Asked>& asked, const Request& request);
+    std::vector<NodeView> readFirst(const std::vector<NodeRef>& nodes, const Request& request);
+    bool setStatus(const NodeRef& node) const;
 
     Agent& agent_;
     const std::function<void(Look)> deliver_;
-    std::atomic<std::chrono::milliseconds> settling_{std::chrono::milliseconds(50)};
+    std::atomic<std::chrono::milliseconds> settling_{std::chrono::milliseconds(200)};
     std::atomic<std::uint64_t> begun_{0};
     std::mutex guard_;
     std::condition_variable changed_;
-    Wanted wanted_;         // guarded by guard_
-    bool stopped_ = false;  // guarded by guard_
+    Wanted wanted_;                // guarded by guard_
+    Clock::time_point firstTold_;  // of what is wanted, guarded by guard_ ...
+    Clock::time_point lastTold_;   // ... and the last; guarded by guard_
+    bool stopped_ = false;         // guarded by guard_
+    // The thread's own, once it has started.
+    TreeKeeper keeper_;
+    std::shared_ptr<const HostLinks> links_;  // null until they are told
+    std::set<std::uint32_t> met_;             // nodes that were looked at
+    HostChange later_;                        // what others hear of, too, and look at by themselves
+    std::optional<Clock::time_point> laterAt_;
+    Clock::time_point restUntil_;
     std::thread thread_;
 };
 

@@ -15,6 +15,20 @@ bool tellsTheSame(const Reading& one, const Reading& other) {
     return isKnown(one) == isKnown(other) && (!isKnown(one) || one.value == other.value);
 }
 
+/// The readings of a look at some properties, with those of the others as they were.
+std::vector<Reading> merged(const NodeView& look, const std::vector<Reading>& before) {
+    std::vector<Reading> all = look.readings;
+    if (!look.asked.empty()) {
+        for (const Reading& reading : before) {
+            if (!std::ranges::binary_search(look.asked, reading.id)) {
+                all.push_back(reading);
+            }
+        }
+        std::ranges::sort(all, {}, &Reading::id);
+    }
+    return all;
+}
+
 }  // namespace
 
 const Reading* NodeView::find(unsigned int property) const {
@@ -24,17 +38,15 @@ const Reading* NodeView::find(unsigned int property) const {
 
 void Model::apply(Look look) {
     std::erase_if(gone_, [&look](const auto& entry) { return entry.second < look.number; });
-    if (look.whole) {
-        const std::set<std::uint32_t> listed(look.order.begin(), look.order.end());
-        std::vector<std::uint32_t> lost;
-        for (const auto& [id, view] : nodes_) {
-            if (!listed.contains(id)) {
-                lost.push_back(id);
-            }
+    const std::set<std::uint32_t> listed(look.order.begin(), look.order.end());
+    std::vector<std::uint32_t> lost;
+    for (const auto& [id, view] : nodes_) {
+        if (!listed.contains(id)) {
+            lost.push_back(id);
         }
-        for (const std::uint32_t id : lost) {
-            remove(id);
-        }
+    }
+    for (const std::uint32_t id : lost) {
+        remove(id);
     }
     for (NodeView& view : look.nodes) {
         if (gone_.contains(view.id)) {
@@ -74,10 +86,12 @@ void Model::replace(NodeView& known, NodeView view) {
     const bool moved = known.parent != view.parent;
     const bool described = known.description != view.description;
     const bool stated = known.status != view.status;
+    known.node = view.node;  // a plug-in that was started anew has another one
     known.parent = view.parent;
     known.status = view.status;
     known.description = std::move(view.description);
-    const std::vector<Reading> before = std::exchange(known.readings, std::move(view.readings));
+    const std::vector<Reading> before = std::move(known.readings);
+    known.readings = merged(view, before);
     known.readAt = view.readAt;
     for (const auto& [differs, name] :
          {std::pair(moved, "Parent"), std::pair(described, "Description"), std::pair(stated, "Status")}) {

@@ -24,6 +24,9 @@ struct NodeView {
     std::string description;
     std::vector<Reading> readings;  ///< ids ascending
     std::uint64_t readAt;           ///< microseconds since 1970
+    /// Of a look: the properties that were asked for, ascending; none: all, and the readings are all there
+    /// is.
+    std::vector<unsigned int> asked{};
 
     /// Null for none.
     const Reading* find(unsigned int property) const;

@@ -79,6 +79,7 @@ void Service::begin() {
     changes_.begin(model_);
     eventsCome_ = loop_.whenReadable(events_->descriptor(), [this] { takeEvents(); });
     looker_.start();
+    hostWatch_.emplace(loop_, looker_);
     armLook();
 }
 
@@ -115,6 +116,9 @@ void Service::takeEvents() {
             model_.withdraw(event.nodeId, looker_.begun());
         } else if (event.nodeId != 0) {
             looker_.lookAgain(event.nodeId);
+            if (event.kind == Event::Kind::alert) {
+                looker_.alertCame(event.nodeId);
+            }
         }
         changes_.happened(event);
     }
@@ -122,6 +126,7 @@ void Service::takeEvents() {
 
 void Service::windDown() {
     nextLook_.reset();
+    hostWatch_.reset();
     looker_.stop();
     readers_.stop();
 }

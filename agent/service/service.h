@@ -2,12 +2,14 @@
 
 #include <functional>
 #include <memory>
+#include <optional>
 #include <string>
 
 #include "agent/core/agent.h"
 #include "agent/service/calls.h"
 #include "agent/service/changes.h"
 #include "agent/service/config.h"
+#include "agent/service/host_watch.h"
 #include "agent/service/objects.h"
 
 namespace cvagent::service {
@@ -58,6 +60,7 @@ private:
     std::shared_ptr<Subscription> events_;
     Loop::Source eventsCome_;
     Loop::Source nextLook_;
+    std::optional<HostWatch> hostWatch_;
 };
 
 /// Who has the service's name on the bus: "process 123"; "" for nobody. Throws bus::Error.

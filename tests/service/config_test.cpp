@@ -36,13 +36,13 @@ TEST(ServiceConfig, TakesEachKey) {
 
 TEST(ServiceConfig, TellsEachWrongLineWithItsNumber) {
     EXPECT_THAT(
-        parseConfig("look-every = 9\n\nnonsense\nlook-sometimes = 1\nlook-every = 10\nsettling-time = 10001\n"
+        parseConfig("look-every = 9\n\nnonsense\nlook-sometimes = 1\nlook-every = 10\nsettling-time = 1001\n"
                     "command-timeout = 1.5\ntrusted-group = a b\ncommand-timeout = -1")
             .complaints,
         ElementsAre("line 1: look-every is '9', but takes seconds from 10 to 86400, or 0 for never",
                     "line 3: 'nonsense' is no \"key = value\"", "line 4: there is no key 'look-sometimes'",
                     "line 5: a second look-every",
-                    "line 6: settling-time is '10001', but takes milliseconds from 0 to 10000",
+                    "line 6: settling-time is '1001', but takes milliseconds from 0 to 1000",
                     "line 7: command-timeout is '1.5', but takes seconds from 1 to 3600, or 0 for no limit",
                     "line 8: trusted-group is 'a b', but takes the name of a group",
                     "line 9: a second command-timeout"));

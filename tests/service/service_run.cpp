@@ -28,6 +28,11 @@ ServiceRun& ServiceRun::plugin(const std::string& file) {
     return *this;
 }
 
+ServiceRun& ServiceRun::hostTools(const std::string& choice) {
+    hostTools_ = choice;
+    return *this;
+}
+
 ServiceRun& ServiceRun::config(const std::string& text) {
     host_.file("/etc/corvista/agent.conf", text);
     return *this;
@@ -41,7 +46,7 @@ std::vector<std::string> ServiceRun::commandLine() const {
             CVAGENTD_PROGRAM,
             "--private-bus",
             "--host-tools",
-            "native",
+            hostTools_,
             "--plugin",
             plugin_};
 }

@@ -46,6 +46,8 @@ public:
 
     ServiceRun& telling(const std::string& words);
     ServiceRun& plugin(const std::string& file);
+    /// "native" without a word about it.
+    ServiceRun& hostTools(const std::string& choice);
     ServiceRun& config(const std::string& text);
     /// Starts it and waits until it is on the bus.
     ServiceRun& start();
@@ -65,6 +67,7 @@ private:
     FakeHost& host_;
     std::string words_;
     std::string plugin_ = FAKE_PLUGIN_FILE;
+    std::string hostTools_ = "native";
     std::unique_ptr<RunningProgram> program_;
     std::optional<bus::Connection> bus_;
 };

@@ -4,6 +4,7 @@ if(CORVISTA_SERVICE)
     service/bus_test.cpp
     service/config_test.cpp
     service/consent_test.cpp
+    service/host_links_test.cpp
     service/interface_test.cpp
     service/model_test.cpp
     service/objects_test.cpp
@@ -14,6 +15,14 @@ if(CORVISTA_SERVICE)
     service/write_test.cpp)
   target_compile_definitions(service_test PRIVATE ${agent_test_programs} CVAGENTD_PROGRAM="$<TARGET_FILE:cvagentd>"
     HARDWARE_FILE="$<TARGET_FILE:corvistahardware>" INTERFACE_FILE="${CMAKE_SOURCE_DIR}/packaging/com.vantrel.Corvista1.xml")
+
+  # On links of a real kernel.
+  corvista_test(service_freshness LIBRARIES agent_service agent_core agent_bus test_support SOURCES
+    service/freshness_test.cpp
+    service/service_run.cpp)
+  target_compile_definitions(service_freshness_test PRIVATE ${agent_test_programs} CVAGENTD_PROGRAM="$<TARGET_FILE:cvagentd>"
+    HARDWARE_FILE="$<TARGET_FILE:corvistahardware>")
+  add_dependencies(service_freshness_test cvagent cvagentd corvistahardware vantrelcvicoshwmi corvista-hosttools)
   add_dependencies(service_test cvagent cvagentd fake_plugin corvistahardware tiny_front_end)
 
   # The command line as its client.
