@@ -6,8 +6,8 @@ import subprocess
 import sys
 
 # What the guest runs, apart from the kernel and our own programs; their dependencies come with them.
-TOOLS = ["bridge-utils", "busybox-static", "dash", "dbus-daemon", "dmidecode", "dmsetup", "ethtool", "hostname", "iproute2", "libsensors5", "libsqlite3-0",
-         "libstdc++6", "smartmontools", "tzdata", "util-linux"]
+TOOLS = ["bridge-utils", "busybox-static", "dash", "dbus-daemon", "dmidecode", "dmsetup", "ethtool", "hostname", "iproute2",
+         "libsensors5", "libsqlite3-0", "libstdc++6", "smartmontools", "tzdata", "util-linux"]
 ALONE = ["lm-sensors", "mdadm"]  # what they depend on besides the above is for what the guest does not run of them
 KERNEL = "linux-image-686-pae"
 
