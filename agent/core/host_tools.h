@@ -43,8 +43,8 @@ enum class Look { adapters, everything };
 std::vector<ToolReport> inspectHostTools(HostTools choice, Look look,
                                          const std::optional<std::string>& adapters);
 
-/// Has the adapter stand in that finds links of any name, also on a host whose links have classic ones: it finds the
-/// same there.
+/// Has the adapter stand in that finds links of any name, also on a host whose links have classic ones: it
+/// finds the same there.
 void findLinksOfAnyName(std::vector<ToolReport>& reports);
 
 /// Puts the directories of the adapters that are to be used in front of PATH. Those that stand by come at its
