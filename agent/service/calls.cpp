@@ -5,6 +5,7 @@
 #include <limits>
 #include <utility>
 
+#include "agent/bus/text.h"
 #include "agent/core/property_words.h"
 #include "agent/service/log.h"
 #include "agent/service/members.h"
@@ -85,7 +86,7 @@ void PendingCall::fail(const Problem& problem, const std::vector<std::string>& e
     }
     const bus::Message reply =
         message_.errorReply(std::string(kErrorPrefix) + kKindNames.at(problem.kind()), problem.what());
-    bus::Writer(reply).put(subjectName(problem.subject())).put(problem.detail()).put(errors);
+    bus::Writer(reply).put(subjectName(problem.subject())).put(bus::shortText(problem.detail())).put(errors);
     parts_.connection.send(reply);
 }
 

@@ -1,6 +1,7 @@
 # The agent as a service, on a bus of its own in the fake host.
 if(CORVISTA_SERVICE)
-  corvista_test(service LIBRARIES agent_service agent_core agent_bus test_support SOURCES
+  corvista_test(service LIBRARIES agent_service agent_core agent_bus test_support LABELS threads SOURCES
+    service/attack_test.cpp
     service/bus_test.cpp
     service/config_test.cpp
     service/consent_test.cpp
