@@ -164,7 +164,6 @@ std::string PrivateBus::standardDirectory() {
 }
 
 PrivateBus::PrivateBus(const std::string& directory) {
-    checkUserIsKnown(geteuid());
     try {
         directory_.emplace(directory, DirectoryRole{Problem::none, "", "directory of the bus"});
     } catch (const std::system_error& error) {
@@ -188,6 +187,7 @@ PrivateBus::PrivateBus(const std::string& directory) {
 
 void PrivateBus::start(const std::string& config) {
     const char* file = program();
+    checkUserIsKnown(geteuid());
     std::array<int, 2> pipe{-1, -1};
     if (pipe2(pipe.data(), O_CLOEXEC) != 0) {
         failToStart(std::strerror(errno));
