@@ -257,4 +257,43 @@ HOST_TEST(ServiceAttack, AnswersToOthersAreNotOverheard) {
     EXPECT_EQ(told, kDeniedCall);
 }
 
+long highestMemory(FakeHost& host, int process) {
+    const std::string status = host.read("/proc/" + std::to_string(process) + "/status").value_or("");
+    return std::stol(status.substr(status.find("VmHWM:") + 6));
+}
+
+/// Made at once, the answers to all that were asked for the whole tree would fill the memory.
+HOST_TEST(ServiceAttack, LargeAnswersWaitForTheBus) {
+    ServiceRun run(host);
+    run.telling("drives").start();
+    const long before = highestMemory(host, run.program().pid());
+    constexpr int kClients = 24;
+    constexpr int kCalls = 120;
+    std::map<std::string, int> answers;
+    std::vector<std::unique_ptr<bus::Connection>> clients;
+    std::vector<bus::Slot> pending;
+    for (int i = 0; i < kClients; ++i) {
+        clients.push_back(std::make_unique<bus::Connection>(ServiceRun::address()));
+        clients.back()->uniqueName();
+    }
+    for (const auto& client : clients) {
+        for (int i = 0; i < kCalls; ++i) {
+            pending.push_back(
+                client->askLater(call::make(*client, ServiceRun::kRoot, call::kAgent, "Tree"),
+                                 std::chrono::seconds(60), [&](const bus::Message& answer) {
+                                     ++answers[answer.isError() ? answer.error().name() : "done"];
+                                 }));
+        }
+    }
+    EXPECT_EQ(call::get(run.bus(), ServiceRun::kRoot, call::kAgent, "Version"), "1.0.0");
+    EXPECT_TRUE(call::until(run.bus(), [&] {
+        for (const auto& client : clients) {
+            client->process();
+        }
+        return answers["done"] + answers[bus::kLimitsExceeded] == kClients * kCalls;
+    }));
+    EXPECT_GE(answers["done"], 256);
+    EXPECT_LT(highestMemory(host, run.program().pid()) - before, 12000);
+}
+
 }  // namespace

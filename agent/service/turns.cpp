@@ -1,0 +1,55 @@
+#include "agent/service/turns.h"
+
+#include <chrono>
+#include <utility>
+
+namespace cvagent::service {
+
+namespace {
+
+constexpr std::size_t kMostWaiting = 512;
+constexpr std::size_t kMostOfOne = 256;  // each connection that a user may have can ask once
+constexpr std::uint64_t kMostUnsent = 4;
+constexpr std::chrono::milliseconds kLookAgain{2};
+
+}  // namespace
+
+bool Turns::submit(std::uint32_t user, Work work) {
+    const auto own = waiting_.find(user);
+    if (count_ >= kMostWaiting || (own != waiting_.end() && own->second.size() >= kMostOfOne)) {
+        return false;
+    }
+    waiting_[user].push_back(std::move(work));
+    ++count_;
+    if (!timer_) {
+        proceed();
+    }
+    return true;
+}
+
+void Turns::proceed() {
+    timer_.reset();
+    while (count_ > 0 && connection_.unsent() < kMostUnsent) {
+        next()();
+    }
+    if (count_ > 0) {
+        timer_ = loop_.after(kLookAgain, [this] { proceed(); });
+    }
+}
+
+Turns::Work Turns::next() {
+    auto user = waiting_.upper_bound(last_);
+    if (user == waiting_.end()) {
+        user = waiting_.begin();
+    }
+    last_ = user->first;
+    Work work = std::move(user->second.front());
+    user->second.pop_front();
+    if (user->second.empty()) {
+        waiting_.erase(user);
+    }
+    --count_;
+    return work;
+}
+
+}  // namespace cvagent::service
