@@ -7,16 +7,16 @@ namespace cvagent::service {
 
 namespace {
 
-constexpr std::size_t kMostWaiting = 512;
-constexpr std::size_t kMostOfOne = 256;  // each connection that a user may have can ask once
-constexpr std::uint64_t kMostUnsent = 4;
-constexpr std::chrono::milliseconds kLookAgain{2};
+constexpr std::size_t kMostTurns = 512;
+constexpr std::size_t kTurnsOfOne = 256;  // each connection that a user may have can ask once
+constexpr std::uint64_t kUnsentBeforeTurn = 4;
+constexpr std::chrono::milliseconds kNextTurn{2};
 
 }  // namespace
 
 bool Turns::submit(std::uint32_t user, Work work) {
     const auto own = waiting_.find(user);
-    if (count_ >= kMostWaiting || (own != waiting_.end() && own->second.size() >= kMostOfOne)) {
+    if (count_ >= kMostTurns || (own != waiting_.end() && own->second.size() >= kTurnsOfOne)) {
         return false;
     }
     waiting_[user].push_back(std::move(work));
@@ -29,11 +29,11 @@ bool Turns::submit(std::uint32_t user, Work work) {
 
 void Turns::proceed() {
     timer_.reset();
-    while (count_ > 0 && connection_.unsent() < kMostUnsent) {
+    while (count_ > 0 && connection_.unsent() < kUnsentBeforeTurn) {
         next()();
     }
     if (count_ > 0) {
-        timer_ = loop_.after(kLookAgain, [this] { proceed(); });
+        timer_ = loop_.after(kNextTurn, [this] { proceed(); });
     }
 }
 
