@@ -70,6 +70,12 @@ std::uint64_t Reader::longNumber() {
     return value;
 }
 
+double Reader::real() {
+    double value = 0;
+    basic(SD_BUS_TYPE_DOUBLE, &value);
+    return value;
+}
+
 std::string Reader::text() {
     const char* value = nullptr;
     basic(SD_BUS_TYPE_STRING, &value);

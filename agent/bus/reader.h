@@ -17,6 +17,7 @@ public:
     std::uint8_t byte();
     std::uint32_t number();
     std::uint64_t longNumber();
+    double real();
     std::string text();
     std::string path();
     std::vector<std::string> texts();

@@ -2,6 +2,7 @@
 
 #include <CLI/CLI.hpp>
 #include <algorithm>
+#include <array>
 #include <cmath>
 #include <sstream>
 
@@ -17,7 +18,8 @@ constexpr const char* kDescription =
     "Shows and changes what the Corvista OS/hardware plug-in knows of this host.\n";
 constexpr const char* kFooter =
     "\nExit status: 0 done, 1 the plug-in or the host failed, 2 wrong usage, 3 no such node or property,\n"
-    "4 value refused, 5 another agent holds the data directory.\n"
+    "4 value refused, or not allowed, 5 another agent holds the data directory, or too much is asked at "
+    "once.\n"
     "\nExamples:\n"
     "  cvagent tree\n"
     "  cvagent get network-port:eth0 LinkSpeed LinkState\n"
@@ -71,7 +73,26 @@ CLI::Validator oneOf(const std::map<std::string, Value>& words) {
         "");
 }
 
+// What an agent of this process is told; the service has its own.
+constexpr std::array kOwnOptions = {"--plugin",     "--log",      "--log-level",      "--trace",
+                                    "--host-tools", "--commands", "--command-timeout"};
+
+CLI::Validator busAddress() {
+    return CLI::Validator(
+        [](const std::string& text) {
+            const bool good = text == "none" || text == "system" || text.starts_with("unix:");
+            return good ? std::string() : inQuotes(text) + " is none of: none, system, unix:path=FILE";
+        },
+        "");
+}
+
 void addGlobalOptions(CLI::App& app, Options& options) {
+    app.add_option("--bus", options.bus,
+                   "Where to ask the service: on the system's bus (system, the default), at another bus's "
+                   "address, or not at all (none). Without a service, and with any of the options below, "
+                   "this program is the agent itself")
+        ->type_name("none|system|ADDRESS")
+        ->check(busAddress());
     app.add_option("--plugin", options.plugins,
                    "The plug-in to load, in place of all those beside this program. Several may be given")
         ->type_name("FILE")
@@ -307,6 +328,8 @@ std::optional<Options> parseCommandLine(int count, const char* const* words) {
     try {
         app.parse(marked(count, words));
         unmark(options);
+        options.byItself =
+            std::ranges::any_of(kOwnOptions, [&app](const char* name) { return app.count(name) > 0; });
         return options;
     } catch (const CLI::Success& help) {
         std::ostringstream text;

@@ -1,14 +1,17 @@
 #include <array>
+#include <chrono>
 #include <exception>
 #include <optional>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include "agent/cli/caller.h"
 #include "agent/cli/command_line.h"
 #include "agent/cli/commands/commands.h"
+#include "agent/cli/local_session.h"
 #include "agent/cli/print.h"
-#include "agent/cli/session.h"
+#include "agent/cli/remote/service.h"
 #include "agent/core/signals.h"
 
 namespace {
@@ -23,12 +26,59 @@ using Question = ExitStatus (*)(cvagent::Session& session, const Options& option
 constexpr std::array<Question, 7> kQuestions = {cvagent::commands::tree, cvagent::commands::get,
                                                 cvagent::commands::set, cvagent::commands::watch};
 
+constexpr int kAttempts = 10;  // to ask a service that has ended
+constexpr std::chrono::milliseconds kBetweenAttempts{100};
+
+bool onlyReads(const Options& options) {
+    return options.command != Command::watch && options.command != Command::set;
+}
+
+/// What a watch runs on alerts gets the surroundings that it has without a service.
+void prepareToAsk(Options& options) {
+    if (options.command == Command::watch) {
+        cvagent::prepareSurroundings({&options.program});
+    }
+    if (!onlyReads(options)) {
+        cvagent::StopSignals::install();
+    }
+}
+
+/// The service's answer; nothing where there is none. One that ends in the middle of an answer is mostly
+/// started again, and would be in the way of an agent of this process.
+std::optional<ExitStatus> askService(Question ask, Options& options) {
+    std::string gone;
+    for (int attempt = 0; attempt < kAttempts; ++attempt) {
+        try {
+            if (const auto service = cvagent::remote::openSession(options, attempt > 0)) {
+                options.byService = true;
+                prepareToAsk(options);
+                return ask(*service, options);
+            }
+        } catch (const cvagent::remote::ServiceGone& ended) {
+            gone = ended.what();
+            if (!onlyReads(options)) {
+                throw cvagent::Failure(ExitStatus::failed, gone + "; nothing was done");
+            }
+        }
+        options.byService = false;
+        if (gone.empty()) {
+            return std::nullopt;
+        }
+        std::this_thread::sleep_for(kBetweenAttempts);
+    }
+    cvagent::complain(gone + "; cvagent looks by itself");
+    return std::nullopt;
+}
+
 ExitStatus run(Options& options, cvagent::WantMessages& wants) {
     const Question ask = options.verify ? cvagent::commands::verifyTree
                                         : kQuestions.at(static_cast<std::size_t>(options.command));
     if (ask != nullptr) {
+        if (const auto status = askService(ask, options)) {
+            return *status;
+        }
         const cvagent::PreparedProcess process(cvagent::processSettings(options));
-        cvagent::Session session(process, options, wants);
+        cvagent::LocalSession session(process, options, wants);
         return session.statusAfter(ask(session, options));
     }
     std::vector<std::string*> files;
@@ -71,7 +121,7 @@ ExitStatus runAndJudge(Options& options) {
     cvagent::WantMessages wants;
     const ExitStatus status = runGuarded(options, wants);
     const bool ofHost = options.command != Command::properties && options.command != Command::history;
-    const bool wanting = ofHost && wants.tell();
+    const bool wanting = ofHost && !options.byService && wants.tell();
     const bool good = status == ExitStatus::done || status == ExitStatus::notFound;
     return wanting && good ? ExitStatus::failed : status;
 }

@@ -6,6 +6,7 @@
 #include <stdexcept>
 
 #include "agent/core/text.h"
+#include "framework/qx/whole_number.h"
 #include "framework/qx/date_time.h"
 #include "framework/qx/whole_number.h"
 

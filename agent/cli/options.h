@@ -18,6 +18,9 @@ struct Options {
     bool pluginMissing = false;           ///< one that is beside the program was left out; not typed
     bool pluginsNamed = false;            ///< on the command line; not typed
     bool processors = true;               ///< whether they can be meant; not typed
+    std::optional<std::string> bus;       ///< where the service is asked: "none", "system" or an address
+    bool byItself = false;                ///< an option concerns an agent of this process; not typed
+    bool byService = false;               ///< the service has answered; not typed
     std::optional<std::string> logFile;
     std::optional<std::string> traceFile;
     std::optional<int> logLevel;

@@ -3,69 +3,81 @@
 #include <functional>
 #include <memory>
 #include <optional>
+#include <string>
+#include <vector>
 
 #include "agent/cli/failure.h"
-#include "agent/cli/options.h"
-#include "agent/cli/print.h"
-#include "agent/cli/want_messages.h"
-#include "agent/core/process.h"
-#include "agent/core/signals.h"
+#include "agent/cli/kept_events.h"
+#include "agent/core/event_log.h"
+#include "agent/core/node_ref.h"
+#include "agent/core/request.h"
+#include "agent/core/writer.h"
 
 namespace cvagent {
 
-/// The plug-ins beside the program become the options' when they name none; what is left out is told. Throws
-/// Problem when there are none.
-void findPlugins(Options& options);
-
-/// The process as the command line needs it, with the plug-ins found. Throws Problem.
-/// @param options outlive the settings; names of files in them become absolute with the process
-ProcessSettings processSettings(Options& options);
-
-/// The agent as the command line needs it, with its errors and warnings on standard error.
+/// What the commands ask of an agent: one of this process (LocalSession) or the service
+/// (remote/remote_session.h). Errors and warnings of either go to standard error. Everything may throw
+/// Problem or Failure.
 class Session {
 public:
-    /// @param process outlives it
-    Session(const PreparedProcess& process, const Options& options, WantMessages& wants);
+    struct Tree {
+        std::vector<std::string> plugins;  ///< files of those at work
+        std::vector<NodeRef> nodes;
+        std::vector<std::vector<Reading>> readings;  ///< what a tree shows of each node
+    };
+
+    Session() = default;
     Session(const Session&) = delete;
     Session& operator=(const Session&) = delete;
-    /// As end().
-    ~Session();
+    virtual ~Session() = default;
 
-    Agent& agent() { return *agent_; }
+    virtual Tree tree(const Request& request) = 0;
+    /// The node a person means; see findNode in tree.h.
+    virtual NodeRef find(const std::string& word) = 0;
+    /// @param properties see readableIds in property_words.h
+    virtual std::vector<Reading> read(const NodeRef& node, const std::vector<std::string>& properties,
+                                      const Request& request) = 0;
+    /// @param words the value, as acceptedValue in property_words.h has accepted it
+    virtual WriteResult write(const NodeRef& node, const Property& row, const std::vector<std::string>& words,
+                              const Request& request) = 0;
+
+    /// Events from now on, and those that a local start brings.
+    virtual std::shared_ptr<Subscription> subscribe(std::optional<Event::Kind> only) = 0;
+    /// What this user was shown of them before; null where nobody knows.
+    virtual std::shared_ptr<ShownMarks> marks() = 0;
+    /// How many nodes those events are about.
+    virtual std::size_t countNodes() = 0;
+    /// From now on alerts go there, on whatever thread brings them, and not to standard error, and events of
+    /// the service come; null: back.
+    virtual void sendAlertsTo(std::function<void(const Event&)> receiver) = 0;
+
     /// Prints what the plug-in has reported because of a call, and then what it reported by itself.
-    void showErrors(const Request& request);
+    virtual void showErrors(const Request& request) = 0;
     /// Names the tools that are missing for good, and what they cost.
     /// @param properties those that were asked for; none: the whole tree is
-    void tellMissingTools(const std::vector<Reading>& properties = {}) const;
-    /// Stops the agent and shows what it reports on its way.
-    void end();
-    /// While it lives, alerts go there, on whatever thread brings them, and not to standard error.
-    class AlertsTo {
-    public:
-        AlertsTo(Session& session, std::function<void(const Event&)> receiver);
-        AlertsTo(const AlertsTo&) = delete;
-        AlertsTo& operator=(const AlertsTo&) = delete;
-        ~AlertsTo();
+    virtual void tellMissingTools(const std::vector<Reading>& properties) = 0;
+    /// No more events come, and what is reported on the way there is shown.
+    virtual void end() = 0;
+    /// What the command's own status comes to when a plug-in is missing.
+    virtual ExitStatus statusAfter(ExitStatus own) const = 0;
+};
 
-    private:
-        Session& session_;
-    };
-    /// What the command's own status comes to when a plug-in is missing: one that was named, or one whose
-    /// nodes the answer should hold. A question for a node of another one has its whole answer.
-    ExitStatus statusAfter(ExitStatus own) const;
+/// While it lives, alerts go elsewhere; see Session::sendAlertsTo.
+class AlertsTo {
+public:
+    AlertsTo(Session& session, std::function<void(const Event&)> receiver) : session_(session) {
+        session_.sendAlertsTo(std::move(receiver));
+    }
+    AlertsTo(const AlertsTo&) = delete;
+    AlertsTo& operator=(const AlertsTo&) = delete;
+    ~AlertsTo() { session_.sendAlertsTo(nullptr); }
 
 private:
-    void start(const AgentSettings& settings, WantMessages& wants);
-
-    struct Alerts;
-
-    ErrorLines& errors_;
-    const std::shared_ptr<Alerts> alerts_;  // a plug-in's thread that hangs at the end keeps it
-    std::optional<OrderlyEnd> watching_;    // what waits to be printed at a signal is printed
-    std::unique_ptr<Agent> agent_;
-    bool answersForAll_;  // the answer is about every plug-in
-    bool pluginMissing_;
+    Session& session_;
 };
+
+/// Prints errors that a plug-in has reported.
+void showLines(ErrorLines& errors);
 
 /// A request of whoever typed the command: he waits for as long as it takes.
 Request ownRequest();

@@ -58,10 +58,11 @@ public:
     int descriptor() const { return ready_; }
     /// Makes the descriptor readable although there may be nothing to take.
     void wake() const;
+    /// Another one for the subscriber, if it is of his kind.
+    void put(const Event& event);
 
 private:
     friend class EventLog;
-    void put(const Event& event);
 
     const std::optional<Event::Kind> only_;
     int ready_;

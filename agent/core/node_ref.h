@@ -7,8 +7,9 @@
 namespace cvagent {
 
 /// A node as front ends hold it. It keeps the node, the loaded plug-in whose code the node is, and the whole
-/// agent at work for as long as it lives; only the agent makes one. What it shows is what the plug-in has
-/// told; reading and writing go through the agent.
+/// agent at work for as long as it lives; only the agent makes one, and NodeCopy of what
+/// another process's agent has told. What it shows is what the plug-in has told; reading and writing go
+/// through the agent.
 class NodeRef {
 public:
     const IC::MutableNode& operator*() const& { return *node_; }
@@ -21,6 +22,7 @@ public:
 
 private:
     friend class Agent;
+    friend struct NodeCopy;
     friend struct NodeRefOfTest;  // for lists without an agent
 
     /// @param agent what must live as long as the node

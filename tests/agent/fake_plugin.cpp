@@ -16,6 +16,7 @@
 //   errors                  initialize logs errors
 //   churn                   a thread publishes and withdraws drives until unload
 //   alert                   a thread sends one alert
+//   heldalert               the same, once nothing is held any more
 //   early                   initialize sends one alert, before the agent has seen any node
 //   late                    unload sends one alert
 //   longalert               alerts have a text of a megabyte
@@ -237,6 +238,12 @@ public:
         if (told("alert")) {
             alert_ = std::thread([this] {
                 std::this_thread::sleep_for(std::chrono::milliseconds(50));
+                sendAlert();
+            });
+        }
+        if (told("heldalert")) {
+            alert_ = std::thread([this] {
+                waitWhileHeld();
                 sendAlert();
             });
         }

@@ -30,8 +30,11 @@ const std::map<std::string, std::set<std::string>> kMayInclude = {
     {"agent/bus", {"agent/bus"}},
     {"agent/history", {"agent/history", "agent/core"}},
     {"agent/service",
-     {"agent/service", "agent/bus", "agent/core", "agent/history", "agent/verify", "agent/shell", "framework"}},
-    {"agent/cli", {"agent/cli", "agent/core", "agent/history", "agent/verify", "agent/shell", "framework"}},
+     {"agent/service", "agent/bus", "agent/core", "agent/history", "agent/verify", "agent/shell",
+      "framework"}},
+    {"agent/cli",
+     {"agent/cli", "agent/core", "agent/bus", "agent/service", "agent/history", "agent/verify", "agent/shell",
+      "framework"}},
     {"hosttools", {"hosttools"}},
     {"plugins/hardware", {"plugins/hardware", "framework"}},
 };

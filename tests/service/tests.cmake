@@ -20,4 +20,12 @@ if(CORVISTA_SERVICE)
     set_tests_properties(service_${kind} PROPERTIES SKIP_RETURN_CODE 77 TIMEOUT 300)
   endforeach()
   add_dependencies(service_test cvagent cvagentd fake_plugin corvistahardware tiny_front_end)
+
+  # The command line as its client.
+  corvista_test(service_client LIBRARIES agent_cli agent_service agent_core agent_bus test_support SOURCES
+    service/command_line_test.cpp
+    service/service_run.cpp)
+  target_compile_definitions(service_client_test PRIVATE ${agent_test_programs} CVAGENTD_PROGRAM="$<TARGET_FILE:cvagentd>"
+    HARDWARE_FILE="$<TARGET_FILE:corvistahardware>")
+  add_dependencies(service_client_test cvagent cvagentd fake_plugin corvistahardware vantrelcvicoshwmi)
 endif()

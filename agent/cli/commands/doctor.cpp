@@ -4,6 +4,7 @@
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/json.h"
 #include "agent/cli/print.h"
+#include "agent/cli/remote/service.h"
 #include "agent/core/catalogue_file.h"
 #include "agent/core/host_tools.h"
 #include "agent/core/plugin_files.h"
@@ -97,6 +98,21 @@ std::string plugins(const Options& options, const Style& style) {
     return text + "\n";
 }
 
+const char* consentText(const std::string& consent) {
+    return consent == "polkit" ? "whom polkit lets" : "root and the group corvista";
+}
+
+std::string service(const Options& options, const Style& style) {
+    const remote::ServiceReport report = remote::describeService(options);
+    const std::string head = style.strong("SERVICE") + "\n  ";
+    if (!report.problem.empty()) {
+        return head + printable(report.problem) + "\n\n";
+    }
+    return head + style.good("running") + ", version " + printable(report.version) + "\n  since " +
+           report.since + ", last full look " + report.looked + "\n  read by everybody, written by " +
+           consentText(report.consent) + "\n\n";
+}
+
 }  // namespace
 
 ExitStatus doctor(const Options& options) {
@@ -104,7 +120,8 @@ ExitStatus doctor(const Options& options) {
     StopSignals::install();
     const std::vector<ToolReport> reports =
         inspectHostTools(options.hostTools, Look::everything, adapterDirectory());
-    print(options.json ? json::tools(reports) : plugins(options, style) + table(reports, style));
+    print(options.json ? json::tools(reports)
+                       : service(options, style) + plugins(options, style) + table(reports, style));
     return ExitStatus::done;
 }
 

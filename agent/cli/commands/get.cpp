@@ -3,7 +3,6 @@
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/json.h"
 #include "agent/cli/print.h"
-#include "agent/core/property_words.h"
 
 namespace cvagent::commands {
 
@@ -50,10 +49,9 @@ ExitStatus verdict(const IC::MutableNode& node, const std::vector<Reading>& read
 }  // namespace
 
 ExitStatus get(Session& session, const Options& options) {
-    const NodeRef node = session.agent().find(options.node);
+    const NodeRef node = session.find(options.node);
     const Request request = ownRequest();
-    const std::vector<Reading> readings =
-        session.agent().read(node, readableIds(*node, options.properties), Freshness::now, request);
+    const std::vector<Reading> readings = session.read(node, options.properties, request);
     session.tellMissingTools(readings);
     print(options.json ? json::node(*node, readings) : listing(*node, readings, Style::detect()));
     session.showErrors(request);

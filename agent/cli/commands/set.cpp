@@ -34,14 +34,14 @@ bool isDone(const WriteResult& result, const Property& row) {
 }  // namespace
 
 ExitStatus set(Session& session, const Options& options) {
-    const NodeRef node = session.agent().find(options.node);
+    const NodeRef node = session.find(options.node);
     const Property& row = writableRow(*node, options.property);
     const IC::PropertyValue value = acceptedValue(row, options.values);
     if (const Label* drastic = drasticLabel(row, value); drastic != nullptr && !options.yes) {
         confirm(drastic->text);
     }
     const Request request(callerName());
-    const WriteResult result = session.agent().write(node, row, value, request);
+    const WriteResult result = session.write(node, row, options.values, request);
     session.showErrors(request);
     session.tellMissingTools({result.after});
     if (result.problem) {

@@ -94,12 +94,10 @@ void hintAtLinks(const std::vector<std::string>& unshown) {
 }  // namespace
 
 ExitStatus tree(Session& session, const Options& options) {
-    const std::vector<NodeRef> nodes = session.agent().nodes();
-    session.tellMissingTools();
+    session.tellMissingTools({});
     const Request request = ownRequest();
-    const Readings readings = session.agent().readTree(nodes, request);
-    print(options.json ? json::tree(session.agent().plugins(), nodes, readings)
-                       : drawing(nodes, readings, Style::detect()));
+    const auto [plugins, nodes, readings] = session.tree(request);
+    print(options.json ? json::tree(plugins, nodes, readings) : drawing(nodes, readings, Style::detect()));
     session.showErrors(request);
     hintAtLinks(oshw::unshownLinks(nodes));
     return ExitStatus::done;

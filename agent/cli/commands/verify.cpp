@@ -25,10 +25,9 @@ std::string report(const verify::Result& result, const Style& style) {
 }  // namespace
 
 ExitStatus verifyTree(Session& session, const Options& options) {
-    const std::vector<NodeRef> nodes = session.agent().nodes();
     const Request request = ownRequest();
-    const auto readings = session.agent().readTree(nodes, request);
-    const verify::Result result = verify::verify(nodes, readings);
+    const Session::Tree tree = session.tree(request);
+    const verify::Result result = verify::verify(tree.nodes, tree.readings);
     print(options.json ? json::verdict(result) : report(result, Style::detect()));
     session.showErrors(request);
     return result.differences.empty() ? ExitStatus::done : ExitStatus::failed;

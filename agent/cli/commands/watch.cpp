@@ -9,16 +9,16 @@ namespace cvagent::commands {
 
 ExitStatus watch(Session& session, const Options& options) {
     print("");  // an output that is closed is told now, not at the first event
-    EventPrinter printer(session.agent().subscribe(0), options.json, shownMarks());
+    EventPrinter printer(session.subscribe({}), options.json, session.marks());
     std::optional<EventProgram> program;
     if (!options.program.empty()) {
         program.emplace(options.program, EventProgram::Seconds(options.programSeconds),
-                        session.agent().subscribe(0, Event::Kind::alert));
+                        session.subscribe(Event::Kind::alert));
     }
-    complain("watching " + std::to_string(session.agent().nodes().size()) + " nodes" +
+    complain("watching " + std::to_string(session.countNodes()) + " nodes" +
              (options.seconds ? "" : "; Ctrl-C ends it"));
     printer.printUnseen();
-    const Session::AlertsTo shown(session, [&printer](const Event&) { printer.printAll(); });
+    const AlertsTo shown(session, [&printer](const Event&) { printer.printAll(); });
     printer.follow(options.seconds);
     session.end();
     printer.printAll();  // what came while the plug-ins were stopped

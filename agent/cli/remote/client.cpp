@@ -1,0 +1,199 @@
+#include "agent/cli/remote/client.h"
+
+#include <poll.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+
+#include "agent/bus/writer.h"
+#include "agent/cli/failure.h"
+#include "agent/cli/remote/answer_errors.h"
+#include "agent/cli/remote/service.h"
+#include "agent/core/text.h"
+#include "agent/service/names.h"
+
+namespace cvagent::remote {
+
+namespace {
+
+constexpr const char* kBusObject = "/org/freedesktop/DBus";
+constexpr const char* kProperties = "org.freedesktop.DBus.Properties";
+constexpr const char* kPeer = "org.freedesktop.DBus.Peer";
+/// Between two looks whether the service is alive.
+constexpr std::chrono::seconds kPing{5};
+
+bus::Connection opened(const std::string& address) {
+    try {
+        return bus::Connection(address);
+    } catch (const bus::Error& error) {
+        throw NoService(error.what(), true);
+    }
+}
+
+/// As poll takes it, never 0 for what is left of a millisecond.
+int millisecondsTo(std::chrono::steady_clock::time_point end) {
+    using std::chrono::milliseconds;
+    const auto left = std::chrono::ceil<milliseconds>(end - std::chrono::steady_clock::now()).count();
+    return static_cast<int>(std::clamp<long long>(left, 0, 3600LL * 1000));
+}
+
+[[noreturn]] void failHanging(const char* who, std::chrono::seconds longest) {
+    throw Failure(ExitStatus::failed, std::string("the ") + who + " has not answered for " +
+                                          std::to_string(longest.count()) +
+                                          " s\nLook at it: systemctl status cvagentd");
+}
+
+}  // namespace
+
+/// Who owns the name is asked once, and then whose process that is: on a bus without a policy anybody can
+/// take a name.
+Client::Client(const std::string& address, int stop) : connection_(opened(address)), stop_(stop) {
+    std::uint32_t user = 0;
+    const bus::Message named = askBus("GetNameOwner", service::kBusName);
+    if (named.isError()) {
+        throw NoService("no service is there", true);
+    }
+    read(named, [this](bus::Reader& reader) { owner_ = reader.text(); });
+    const bus::Message owned = askBus("GetConnectionUnixUser", owner_);
+    if (owned.isError()) {
+        throw NoService("the service ended", true);
+    }
+    read(owned, [&user](bus::Reader& reader) { user = reader.number(); });
+    own_ = user == geteuid();
+    if (user != 0 && !own_) {
+        throw NoService("the service on the bus belongs to user " + std::to_string(user) +
+                            ", neither root nor you, and is not believed",
+                        false);
+    }
+}
+
+bus::Message Client::askBus(const char* member, const std::string& name) {
+    const bus::Message call = connection_.newCall({kBusDriver, kBusObject, kBusDriver, member});
+    bus::Writer(call).put(name);
+    try {
+        bus::Message answer = answerTo(call, kShort);
+        if (!answer) {
+            failHanging("bus", kShort);
+        }
+        return answer;
+    } catch (const ServiceGone& gone) {
+        throw NoService(gone.what(), true);
+    }
+}
+
+bus::Message Client::call(const std::string& member) const {
+    return connection_.newCall({owner_, service::kRootObject, service::kAgentInterface, member});
+}
+
+void Client::wait(Clock::time_point deadline) {
+    pollfd stopped{stop_, POLLIN, 0};
+    try {
+        const auto due = connection_.deadline().value_or(deadline);
+        pollfd ready[] = {{connection_.descriptor(), connection_.events(), 0}, stopped};
+        poll(ready, 2, millisecondsTo(std::min(due, deadline)));
+        stopped = ready[1];
+        connection_.process();
+    } catch (const bus::Error&) {
+        throw ServiceGone("the bus is gone");
+    }
+    if (stopped.revents != 0) {
+        throw Stopped();
+    }
+}
+
+/// None when the time is over.
+bus::Message Client::answerTo(const bus::Message& call, Seconds longest) {
+    bus::Message answer;
+    const auto deadline = Clock::now() + longest;
+    const bus::Slot waiting = connection_.askLater(call, longest + Seconds(1),
+                                                   [&answer](const bus::Message& come) { answer = come; });
+    while (!answer && Clock::now() < deadline) {
+        wait(deadline);
+    }
+    return answer;
+}
+
+void Client::checkAnswer(const bus::Message& answer) {
+    if (answer.isError() && !throwAnswer(answer)) {
+        failOtherVersion();
+    }
+    if (!answer.isError() && answer.sender() != owner_) {
+        throw Failure(ExitStatus::failed, "another one has answered in the service's place");
+    }
+}
+
+bus::Message Client::ask(const bus::Message& call, Seconds longest) {
+    bus::Message answer = answerTo(call, longest);
+    if (!answer) {
+        failHanging("service", longest);
+    }
+    checkAnswer(answer);
+    return answer;
+}
+
+bus::Message Client::askForLong(const bus::Message& call) {
+    constexpr std::chrono::hours kForEver{24 * 365};
+    bus::Message answer;
+    const bus::Slot waiting =
+        connection_.askLater(call, kForEver, [&answer](const bus::Message& come) { answer = come; });
+    while (!answer) {
+        for (const auto look = Clock::now() + kPing; !answer && Clock::now() < look;) {
+            wait(look);
+        }
+        if (!answer) {
+            ask(connection_.newCall({owner_, service::kRootObject, kPeer, "Ping"}), kShort);
+        }
+    }
+    checkAnswer(answer);
+    return answer;
+}
+
+bus::Message Client::propertyCall(const std::string& name) const {
+    bus::Message call = connection_.newCall({owner_, service::kRootObject, kProperties, "Get"});
+    bus::Writer(call).put(service::kAgentInterface).put(name);
+    return call;
+}
+
+bus::Message Client::askProperty(const std::string& name) {
+    return ask(propertyCall(name), kShort);
+}
+
+std::string Client::textProperty(const std::string& name) {
+    std::string text;
+    const bus::Message answer = askProperty(name);
+    read(answer, [&](bus::Reader& reader) {
+        reader.variant([&](const std::string& /*type*/) { text = reader.text(); });
+    });
+    return text;
+}
+
+std::uint64_t Client::numberProperty(const std::string& name) {
+    std::uint64_t number = 0;
+    const bus::Message answer = askProperty(name);
+    read(answer, [&](bus::Reader& reader) {
+        reader.variant([&](const std::string& /*type*/) { number = reader.longNumber(); });
+    });
+    return number;
+}
+
+/// The version is asked with no trust in the answer: the service may be any.
+void Client::failOtherVersion() {
+    std::string version = "another version";
+    try {
+        const bus::Message answer = answerTo(propertyCall("Version"), kShort);
+        if (answer && !answer.isError()) {
+            bus::Reader reader(answer);
+            reader.variant(
+                [&](const std::string& /*type*/) { version = "version " + inQuotes(reader.text()); });
+        }
+    } catch (const bus::Error&) {  // it has not even that
+    }
+    throw Failure(ExitStatus::failed,
+                  "the service is " + version +
+                      " and this is cvagent " CORVISTA_VERSION
+                      ": they do not understand each other\nInstall both from one package "
+                      "and restart the service: systemctl restart cvagentd");
+}
+
+}  // namespace cvagent::remote

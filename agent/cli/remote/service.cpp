@@ -1,0 +1,99 @@
+#include "agent/cli/remote/service.h"
+
+#include <unistd.h>
+
+#include <algorithm>
+#include <cstdlib>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "agent/cli/print.h"
+#include "agent/cli/remote/remote_session.h"
+#include "agent/core/text.h"
+
+namespace cvagent::remote {
+
+namespace {
+
+constexpr const char* kBusVariable = "CORVISTA_BUS";
+constexpr std::uint64_t kMicroseconds = 1000000;
+
+/// Where cvagentd --private-bus has its own, on hosts without a system bus.
+constexpr const char* kPrivateBus = "unix:path=/run/corvista/bus";
+
+/// In the order in which they are asked.
+std::vector<std::string> addressesOf(const Options& options) {
+    const char* named = std::getenv(kBusVariable);
+    const std::string address = options.bus ? *options.bus : named != nullptr ? named : "";
+    if (address == "none") {
+        return {};
+    }
+    return address.empty() ? std::vector<std::string>{"system", kPrivateBus} : std::vector{address};
+}
+
+struct Reached {
+    std::unique_ptr<Client> client;
+    std::string address;
+    std::string why;  ///< there is no client; "" for nothing to tell
+};
+
+Reached reach(const Options& options) {
+    Reached reached;
+    bool silent = !options.bus;
+    for (const std::string& address : addressesOf(options)) {
+        try {
+            reached.client = std::make_unique<Client>(address);
+            reached.address = address;
+            return reached;
+        } catch (const NoService& none) {
+            silent = silent && none.isSilent();
+            reached.why = reached.why.empty() || !none.isSilent() ? none.what() : reached.why;
+        }
+    }
+    reached.why = silent ? "" : reached.why;
+    return reached;
+}
+
+std::string timeOf(std::uint64_t microseconds) {
+    return timeText(static_cast<std::time_t>(microseconds / kMicroseconds));
+}
+
+}  // namespace
+
+std::unique_ptr<Session> openSession(const Options& options, bool silent) {
+    if (options.byItself) {
+        return nullptr;
+    }
+    Reached reached = reach(options);
+    if (reached.client) {
+        return std::make_unique<RemoteSession>(std::move(reached.client), reached.address,
+                                               isatty(STDIN_FILENO) == 1);
+    }
+    if (!silent && !reached.why.empty()) {
+        complain(reached.why + "; cvagent works by itself");
+    }
+    return nullptr;
+}
+
+ServiceReport describeService(const Options& options) {
+    ServiceReport report;
+    try {
+        const Reached reached = reach(options);
+        if (!reached.client) {
+            report.problem = reached.why.empty() ? "not running: cvagent works by itself" : reached.why;
+            return report;
+        }
+        Client& client = *reached.client;
+        report.version = client.textProperty("Version");
+        report.since = timeOf(client.numberProperty("StartedAt"));
+        report.looked = timeOf(client.numberProperty("LookedAt"));
+        report.consent = client.textProperty("Consent");
+    } catch (const std::runtime_error& error) {  // Failure, ServiceGone, Problem
+        report.problem = error.what();
+        report.problem.erase(std::min(report.problem.find('\n'), report.problem.size()));  // advice
+    }
+    return report;
+}
+
+}  // namespace cvagent::remote
