@@ -30,7 +30,7 @@ constexpr const char* kConfig = "bus.conf";
 constexpr int kStartTime = 5000;  // milliseconds for its start
 constexpr std::array kPrograms = {"/usr/bin/dbus-daemon", "/bin/dbus-daemon", "/usr/local/bin/dbus-daemon"};
 
-constexpr const char* kHead =
+constexpr const char* kConfigurationHead =
     R"(<!DOCTYPE busconfig PUBLIC "-//freedesktop//DTD D-Bus Bus Configuration 1.0//EN"
  "http://www.freedesktop.org/standards/dbus/1.0/busconfig.dtd">
 <busconfig>
@@ -141,7 +141,7 @@ std::string escapedAddress(const std::string& path) {
 }  // namespace
 
 std::string privateBusConfig(const std::string& socket, uid_t owner) {
-    std::string text = kHead;
+    std::string text = kConfigurationHead;
     text +=
         "  <type>corvista</type>\n  <listen>unix:path=" + escapedXml(escapedAddress(socket)) + "</listen>\n";
     text += kEverybody;

@@ -9,7 +9,6 @@ namespace {
 
 constexpr std::size_t kMostTurns = 512;
 constexpr std::size_t kTurnsOfOne = 256;  // each connection that a user may have can ask once
-constexpr std::uint64_t kUnsentBeforeTurn = 4;
 constexpr std::chrono::milliseconds kNextTurn{2};
 
 }  // namespace
@@ -27,9 +26,10 @@ bool Turns::submit(std::uint32_t user, Work work) {
     return true;
 }
 
+/// One at a time: what is asked meanwhile is read only when nothing waits to be sent.
 void Turns::proceed() {
     timer_.reset();
-    while (count_ > 0 && connection_.unsent() < kUnsentBeforeTurn) {
+    if (connection_.unsent() == 0) {
         next()();
     }
     if (count_ > 0) {
