@@ -257,7 +257,7 @@ HOST_TEST(ServiceAttack, AnswersToOthersAreNotOverheard) {
     EXPECT_EQ(told, kDeniedCall);
 }
 
-long highestMemory(FakeHost& host, int process) {
+[[maybe_unused]] long highestMemory(FakeHost& host, int process) {
     const std::string status = host.read("/proc/" + std::to_string(process) + "/status").value_or("");
     return std::stol(status.substr(status.find("VmHWM:") + 6));
 }
@@ -266,7 +266,7 @@ long highestMemory(FakeHost& host, int process) {
 HOST_TEST(ServiceAttack, LargeAnswersWaitForTheBus) {
     ServiceRun run(host);
     run.telling("drives").start();
-    const long before = highestMemory(host, run.program().pid());
+    [[maybe_unused]] const long before = highestMemory(host, run.program().pid());
     constexpr int kClients = 24;
     constexpr int kCalls = 120;
     std::map<std::string, int> answers;
@@ -293,7 +293,9 @@ HOST_TEST(ServiceAttack, LargeAnswersWaitForTheBus) {
         return answers["done"] + answers[bus::kLimitsExceeded] == kClients * kCalls;
     }));
     EXPECT_GE(answers["done"], 256);
+#if !defined(__SANITIZE_THREAD__) && !defined(__SANITIZE_ADDRESS__)  // which keep accounts of their own
     EXPECT_LT(highestMemory(host, run.program().pid()) - before, 12000);
+#endif
 }
 
 }  // namespace
