@@ -1,6 +1,7 @@
 #include "agent/bus/connection.h"
 
 #include <cerrno>
+#include <cstdlib>
 #include <exception>
 #include <limits>
 #include <optional>
@@ -23,17 +24,21 @@ std::uint64_t limitOf(Connection::Microseconds longest) {
     return longest.count() <= 0 ? 1 : static_cast<std::uint64_t>(longest.count());
 }
 
+std::string systemBus() {
+    const char* told = secure_getenv("DBUS_SYSTEM_BUS_ADDRESS");
+    return told != nullptr ? told : "unix:path=/run/dbus/system_bus_socket";
+}
+
+/// No descriptors: those of calls that wait would fill the process's table.
 sd_bus* opened(const std::string& address) {
-    const std::string failure = "cannot reach the bus " + address;
+    const bool system = address == "system";
+    const std::string failure = system ? "cannot reach the system's bus" : "cannot reach the bus " + address;
     sd_bus* bus = nullptr;
-    if (address == "system") {
-        checkDone(sd_bus_open_system(&bus), "cannot reach the system's bus");
-        return bus;
-    }
     checkDone(sd_bus_new(&bus), failure);
     std::unique_ptr<sd_bus, decltype(&sd_bus_unref)> held(bus, &sd_bus_unref);
-    checkDone(sd_bus_set_address(bus, address.c_str()), failure);
+    checkDone(sd_bus_set_address(bus, system ? systemBus().c_str() : address.c_str()), failure);
     checkDone(sd_bus_set_bus_client(bus, 1), failure);
+    checkDone(sd_bus_negotiate_fds(bus, 0), failure);
     checkDone(sd_bus_start(bus), failure);
     return held.release();
 }
@@ -192,7 +197,8 @@ void Connection::answerFailure(const Message& message, const Error& error) const
             tell_(error.what());
         }
     } else if (!message.wantsNoReply()) {
-        sd_bus_reply_method_errorf(message.get(), error.name().c_str(), "%s", asText(error.what()).c_str());
+        sd_bus_reply_method_errorf(message.get(), error.name().c_str(), "%s",
+                                   shortText(error.what()).c_str());
     }
 }
 

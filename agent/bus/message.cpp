@@ -87,7 +87,7 @@ Message Message::reply() const {
 }
 
 Message Message::errorReply(const std::string& name, const std::string& text) const {
-    const std::string message = asText(text);
+    const std::string message = shortText(text);
     const sd_bus_error error{name.c_str(), message.c_str(), 0};
     sd_bus_message* made = nullptr;
     check(sd_bus_message_new_method_error(get(), &made, &error), "cannot make an answer");

@@ -81,4 +81,9 @@ std::string asText(std::string_view bytes) {
     return text;
 }
 
+std::string shortText(std::string_view bytes) {
+    constexpr std::size_t kMost = std::size_t{64} << 10U;
+    return bytes.size() <= kMost ? asText(bytes) : asText(bytes.substr(0, kMost)) + "...";
+}
+
 }  // namespace cvagent::bus

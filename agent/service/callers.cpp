@@ -17,7 +17,7 @@ constexpr std::size_t kMostWaiting = 64;  // calls of one connection
 constexpr std::chrono::seconds kPatience{10};
 
 std::optional<Caller> readCaller(const std::string& name, const bus::Message& answer) {
-    if (answer.isError()) {
+    if (answer.isError() || answer.sender() != "org.freedesktop.DBus") {
         return std::nullopt;
     }
     Caller caller{name, 0, {}};

@@ -5,6 +5,7 @@
 #include <limits>
 #include <utility>
 
+#include "agent/bus/text.h"
 #include "agent/core/property_words.h"
 #include "agent/service/log.h"
 #include "agent/service/members.h"
@@ -85,7 +86,7 @@ void PendingCall::fail(const Problem& problem, const std::vector<std::string>& e
     }
     const bus::Message reply =
         message_.errorReply(std::string(kErrorPrefix) + kKindNames.at(problem.kind()), problem.what());
-    bus::Writer(reply).put(subjectName(problem.subject())).put(problem.detail()).put(errors);
+    bus::Writer(reply).put(subjectName(problem.subject())).put(bus::shortText(problem.detail())).put(errors);
     parts_.connection.send(reply);
 }
 
@@ -116,8 +117,18 @@ void PendingCall::withCaller(std::function<void(const Caller& caller)> next) con
     }
 }
 
+void PendingCall::inTurn(const std::function<void(const Caller& caller)>& next) const {
+    const PendingCall held = *this;
+    withCaller([held, next](const Caller& caller) {
+        const auto work = [held, next, caller] { held.guarded([&] { next(caller); }); };
+        if (!held.parts_.turns.submit(caller.user, work)) {
+            held.fail(bus::kLimitsExceeded, "too many calls wait for an answer already");
+        }
+    });
+}
+
 void answerTree(const CallPointer& call) {
-    call->withCaller([call](const Caller& caller) {
+    call->inTurn([call](const Caller& caller) {
         const Withheld withheld = withheldFrom(*call, caller, Withheld::leftOut);
         call->answer([&](bus::Writer& writer) {
             writer.put(call->parts().agent.plugins());
@@ -164,10 +175,7 @@ void answerEvents(const PendingCall& call, std::uint64_t after, const std::vecto
     });
 }
 
-}  // namespace
-
-/// What the agent itself remembers, and behind that the history.
-void answerEventsSince(const CallPointer& call) {
+void findEvents(const CallPointer& call, const Caller& caller) {
     const std::uint64_t after = bus::Reader(call->message()).longNumber();
     const Subscription::Taken taken = call->parts().agent.subscribe(after)->take();
     std::vector<Event> events(taken.events.begin(), taken.events.end());
@@ -177,15 +185,20 @@ void answerEventsSince(const CallPointer& call) {
         answerEvents(*call, after, events, taken.dropped);
         return;
     }
-    call->withCaller([call, after, upTo, events, dropped = taken.dropped](const Caller& caller) {
-        submit(call, call->parts().readers, caller, [call, after, upTo, events, dropped] {
-            std::vector<Event> all = call->parts().past(after, upTo, kMostEvents);
-            if (all.size() < kMostEvents) {
-                all.insert(all.end(), events.begin(), events.end());
-            }
-            comeBack(call, [call, after, all, dropped] { answerEvents(*call, after, all, dropped); });
-        });
+    submit(call, call->parts().readers, caller, [call, after, upTo, events, dropped = taken.dropped] {
+        std::vector<Event> all = call->parts().past(after, upTo, kMostEvents);
+        if (all.size() < kMostEvents) {
+            all.insert(all.end(), events.begin(), events.end());
+        }
+        comeBack(call, [call, after, all, dropped] { answerEvents(*call, after, all, dropped); });
     });
+}
+
+}  // namespace
+
+/// What the agent itself remembers, and behind that the history.
+void answerEventsSince(const CallPointer& call) {
+    call->inTurn([call](const Caller& caller) { findEvents(call, caller); });
 }
 
 void startRead(const CallPointer& call, std::optional<std::uint32_t> node) {

@@ -13,6 +13,7 @@
 #include "agent/service/looker.h"
 #include "agent/service/loop.h"
 #include "agent/service/model.h"
+#include "agent/service/turns.h"
 #include "agent/service/workers.h"
 
 namespace cvagent::service {
@@ -29,6 +30,7 @@ struct Parts {
     Callers& callers;
     Consent& consent;
     Looker& looker;
+    Turns& turns;
     Workers& readers;
     Workers& writers;
     std::shared_ptr<Mailbox> mailbox;
@@ -53,6 +55,8 @@ public:
     void guarded(const std::function<void()>& work) const;
     /// Goes on when it is known who calls.
     void withCaller(std::function<void(const Caller& caller)> next) const;
+    /// The same for a large answer: when it is its turn.
+    void inTurn(const std::function<void(const Caller& caller)>& next) const;
 
 private:
     Parts& parts_;

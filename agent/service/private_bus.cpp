@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <poll.h>
+#include <pwd.h>
 #include <spawn.h>
 #include <sys/prctl.h>
 #include <sys/stat.h>
@@ -50,7 +51,7 @@ constexpr const char* kEverybody = R"(  <auth>EXTERNAL</auth>
     <allow send_destination="org.freedesktop.DBus"/>
     <deny send_destination="org.freedesktop.DBus" send_interface="org.freedesktop.DBus"
           send_member="UpdateActivationEnvironment"/>
-    <allow send_destination="com.vantrel.Corvista1"/>
+    <allow send_destination="com.vantrel.Corvista1" send_type="method_call"/>
   </policy>
 )";
 constexpr const char* kOwner = R"(    <allow own="*"/>
@@ -86,6 +87,19 @@ const char* program() {
         }
     }
     failToStart("there is no dbus-daemon (package dbus-daemon)");
+}
+
+/// Without an entry its clients are turned away as soon as they are connected.
+void checkUserIsKnown(uid_t user) {
+    constexpr std::size_t kRoom = 65536;
+    std::string room(kRoom, '\0');
+    passwd entry{};
+    passwd* found = nullptr;
+    getpwuid_r(user, &entry, room.data(), room.size(), &found);
+    if (found == nullptr) {
+        failToStart("dbus-daemon lets nobody in who is not in /etc/passwd, and uid " + std::to_string(user) +
+                    " is not");
+    }
 }
 
 std::string escapedXml(const std::string& text) {
@@ -164,13 +178,16 @@ PrivateBus::PrivateBus(const std::string& directory) {
     chmod(path.c_str(), 0755);  // what others may do is the bus's business
     place_ = open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
     const std::string config = path + kConfig;
-    unlink(config.c_str());
+    for (const char* name : {kSocket, kConfig}) {  // of one that ended by force
+        unlinkat(place_, name, 0);
+    }
     std::ofstream(config) << privateBusConfig(path + kSocket, geteuid());
     start(config);
 }
 
 void PrivateBus::start(const std::string& config) {
     const char* file = program();
+    checkUserIsKnown(geteuid());
     std::array<int, 2> pipe{-1, -1};
     if (pipe2(pipe.data(), O_CLOEXEC) != 0) {
         failToStart(std::strerror(errno));

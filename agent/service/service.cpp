@@ -51,10 +51,11 @@ Service::Service(Loop& loop, bus::Connection& connection, Agent& agent, const Co
                   mailbox->post(
                       [this, held = std::make_shared<Look>(std::move(look))] { take(std::move(*held)); });
               }),
+      turns_(connection, loop),
       readers_(kReaders),
       writers_(kWriters),
-      parts_{connection, agent,    model_,   callers_,       consent_,
-             looker_,    readers_, writers_, loop.mailbox(), std::move(past)},
+      parts_{connection, agent,    model_,   callers_,       consent_,       looker_,
+             turns_,     readers_, writers_, loop.mailbox(), std::move(past)},
       objects_(parts_, standing_) {
     standing_.version = CORVISTA_VERSION;
     standing_.lastEvent = lastEvent;

@@ -53,6 +53,7 @@ private:
     Callers callers_;
     Consent consent_;
     Looker looker_;
+    Turns turns_;
     Workers readers_;
     Workers writers_;
     Parts parts_;

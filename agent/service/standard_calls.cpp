@@ -140,7 +140,7 @@ void introspectObject(const CallPointer& call, const Place& place) {
 }
 
 void managedObjects(const CallPointer& call, const Place& /*place*/) {
-    call->withCaller([call](const Caller& caller) {
+    call->inTurn([call](const Caller& caller) {
         const bool trusted = call->parts().consent.isTrusted(caller);
         const Model& model = call->parts().model;
         call->answer([&](bus::Writer& writer) {

@@ -45,6 +45,26 @@ HOST_TEST(PrivateBus, DoesNotLieWhereOthersCanWrite) {
     EXPECT_FALSE(host.exists("/srv/theirs/bus"));
 }
 
+/// What lies in the place of its files is of an earlier run.
+HOST_TEST(PrivateBus, TakesThePlaceOfWhatWasLeft) {
+    host.realTool("dbus-daemon");
+    host.file("/etc/passwd", "root:x:0:0::/root:/bin/sh\n");
+    host.file("/run/own/bus", "no socket");
+    host.file("/srv/theirs", "kept");
+    host.symlink("/run/own/bus.conf", "/srv/theirs");
+    const PrivateBus own("/run/own");
+    EXPECT_THAT(bus::Connection(own.address()).uniqueName(), HasSubstr(":1."));
+    EXPECT_EQ(host.read("/srv/theirs"), "kept");
+}
+
+/// The daemon lets nobody in whom the host does not know.
+HOST_TEST(PrivateBus, NeedsItsUserToBeKnown) {
+    host.realTool("dbus-daemon");
+    EXPECT_EQ(problemWith("/run/x"),
+              "cannot start a bus of our own: dbus-daemon lets nobody in who is not in /etc/passwd, and uid "
+              "0 is not");
+}
+
 HOST_TEST(PrivateBus, NeedsADaemon) {
     EXPECT_EQ(problemWith("/run/x"),
               "cannot start a bus of our own: there is no dbus-daemon (package dbus-daemon)");

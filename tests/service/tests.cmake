@@ -1,6 +1,7 @@
 # The agent as a service, on a bus of its own in the fake host.
 if(CORVISTA_SERVICE)
-  corvista_test(service LIBRARIES agent_service agent_core agent_bus test_support SOURCES
+  corvista_test(service LIBRARIES agent_service agent_core agent_bus test_support LABELS threads SOURCES
+    service/attack_test.cpp
     service/bus_test.cpp
     service/config_test.cpp
     service/consent_test.cpp
@@ -15,6 +16,13 @@ if(CORVISTA_SERVICE)
     service/write_test.cpp)
   target_compile_definitions(service_test PRIVATE ${agent_test_programs} CVAGENTD_PROGRAM="$<TARGET_FILE:cvagentd>"
     HARDWARE_FILE="$<TARGET_FILE:corvistahardware>" INTERFACE_FILE="${CMAKE_SOURCE_DIR}/packaging/com.vantrel.Corvista1.xml")
+  add_dependencies(service_test cvagent cvagentd fake_plugin corvistahardware tiny_front_end)
+
+  # With polkit itself, and with one that asks.
+  foreach(kind polkitd dbusmock)
+    add_test(NAME service_${kind} COMMAND ${CMAKE_CURRENT_SOURCE_DIR}/service/polkit_test.py ${kind} $<TARGET_FILE:cvagentd> $<TARGET_FILE:fake_plugin>)
+    set_tests_properties(service_${kind} PROPERTIES SKIP_RETURN_CODE 77 TIMEOUT 300)
+  endforeach()
 
   # On links of a real kernel.
   corvista_test(service_freshness LIBRARIES agent_service agent_core agent_bus test_support SOURCES
@@ -23,7 +31,6 @@ if(CORVISTA_SERVICE)
   target_compile_definitions(service_freshness_test PRIVATE ${agent_test_programs} CVAGENTD_PROGRAM="$<TARGET_FILE:cvagentd>"
     HARDWARE_FILE="$<TARGET_FILE:corvistahardware>")
   add_dependencies(service_freshness_test cvagent cvagentd corvistahardware vantrelcvicoshwmi corvista-hosttools)
-  add_dependencies(service_test cvagent cvagentd fake_plugin corvistahardware tiny_front_end)
 
   # The command line as its client.
   corvista_test(service_client LIBRARIES agent_cli agent_service agent_core agent_bus test_support SOURCES
