@@ -119,9 +119,7 @@ def main():
     run = Run(folder)
     try:
         run.start("dbus-daemon", "--nofork", "--nopidfile", f"--config-file={folder}/bus.conf")
-        end = time.monotonic() + 10
-        while not os.path.exists(f"{folder}/bus") and time.monotonic() < end:
-            time.sleep(0.01)
+        run.wait_for("org.freedesktop.DBus")
         run.start(program, "--bus", "system", "--plugin", plugin)
         run.wait_for("com.vantrel.Corvista1")
         (with_polkitd if kind == "polkitd" else with_dbusmock)(run)
