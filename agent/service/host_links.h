@@ -26,6 +26,7 @@ enum Concern : unsigned int {
     concernsAddress = 2,
     concernsRoute = 4,
     concernsAll = concernsLink | concernsAddress | concernsRoute,
+    concernsHost = 8,  ///< what host_files.h is about: all nodes tell the same
 };
 
 /// By the links' indices.

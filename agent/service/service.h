@@ -41,6 +41,7 @@ public:
 private:
     void take(Look look);
     void takeEvents();
+    void follow(const Event& event);
     void armLook();
 
     Loop& loop_;

@@ -26,6 +26,7 @@ if(CORVISTA_SERVICE)
 
   # On links of a real kernel.
   corvista_test(service_freshness LIBRARIES agent_service agent_core agent_bus test_support SOURCES
+    service/fresh_facts_test.cpp
     service/freshness_test.cpp
     service/service_run.cpp)
   target_compile_definitions(service_freshness_test PRIVATE ${agent_test_programs} CVAGENTD_PROGRAM="$<TARGET_FILE:cvagentd>"
