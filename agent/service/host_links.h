@@ -31,6 +31,10 @@ enum Concern : unsigned int {
 
 /// By the links' indices.
 using HostLinks = std::map<int, HostLink>;
+/// By the links' names; an index is never given twice.
+using LinkIndices = std::map<std::string, int>;
+/// Those of the host now, asked for.
+LinkIndices linkIndices();
 
 /// What some news have come to.
 struct HeardNews {

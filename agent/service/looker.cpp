@@ -58,7 +58,8 @@ Looker::~Looker() {
     }
 }
 
-Look Looker::firstLook() {
+Look Looker::firstLook(const LinkIndices& linksBefore) {
+    keeper_.noteStart(linksBefore);
     files_.haveChanged();
     const std::vector<NodeRef> nodes = agent_.nodes();
     Look look{++begun_, true, {}, readFirst(nodes, lookRequest())};

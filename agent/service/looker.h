@@ -54,7 +54,8 @@ public:
     ~Looker() override;
 
     /// The first one, on the calling thread: what the plug-ins stored at their start is that new.
-    Look firstLook();
+    /// @param linksBefore those that there were ahead of that start
+    Look firstLook(const LinkIndices& linksBefore);
     void start();
     /// No further look begins.
     void stop();

@@ -68,9 +68,9 @@ Service::~Service() {
     loop_.mailbox()->close();
 }
 
-void Service::begin() {
+void Service::begin(const LinkIndices& linksBefore) {
     events_ = agent_.subscribe(standing_.lastEvent);
-    take(looker_.firstLook());
+    take(looker_.firstLook(linksBefore));
     standing_.startedAt = standing_.lookedAt;
     objects_.serve();
     consent_.lookForPolkit();

@@ -4,6 +4,7 @@
 #include <sys/mount.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <nlohmann/json.hpp>
 #include <sstream>
 
@@ -111,6 +112,13 @@ protected:
             });
         });
         return tree;
+    }
+
+    static long linkNodesIn(const Tree& tree) {
+        return std::ranges::count_if(tree, [](const auto& node) {
+            return node.first.find("/network-port:") != std::string::npos ||
+                   node.first.find("/ip-config:") != std::string::npos;
+        });
     }
 
     static std::string differences(const Tree& known, const Tree& fresh) {
