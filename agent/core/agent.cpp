@@ -1,12 +1,14 @@
 #include "agent/core/agent.h"
 
 #include <algorithm>
+#include <set>
 #include <stdexcept>
 #include <utility>
 
 #include "agent/core/announcer.h"
 #include "agent/core/command_deadline.h"
 #include "agent/core/event_keeping.h"
+#include "agent/core/oshw/start_facts.h"
 #include "agent/core/oshw/stored_facts.h"
 #include "agent/core/plugin_files.h"
 #include "agent/core/plugin_start.h"
@@ -18,6 +20,21 @@ namespace cvagent {
 namespace {
 
 constexpr std::chrono::seconds kPatience{10};  // a hung command is ended by then
+
+/// What a tree shows of a node, and what it would show if the host told it by now; ascending.
+std::vector<unsigned int> shownOf(const IC::MutableNode& node) {
+    std::set<unsigned int> ids;
+    for (const auto& [id, value] : storedProperties(node)) {
+        ids.insert(id);
+    }
+    if (const NodeClass* known = findClass(node.nodeType())) {
+        ids.insert(known->live.begin(), known->live.end());
+    }
+    for (const unsigned int id : oshw::startFacts(node)) {
+        ids.insert(id);
+    }
+    return {ids.begin(), ids.end()};
+}
 
 }  // namespace
 
@@ -190,18 +207,21 @@ std::vector<std::vector<Reading>> Agent::readTree(const std::vector<NodeRef>& no
 std::vector<std::vector<Reading>> Agent::readAnew(const std::vector<Asked>& asked,
                                                   const Request& request) const {
     std::vector<Reader::Question> questions;
+    std::vector<long> counts;
     for (const Asked& one : asked) {
-        for (const unsigned int id : one.ids) {
-            questions.push_back({one.node.node_, id});
+        const std::vector<unsigned int> ids = one.ids.empty() ? shownOf(*one.node) : one.ids;
+        for (const unsigned int id : ids) {
+            questions.push_back({one.node.node_, id, Source::host});
         }
+        counts.push_back(static_cast<long>(ids.size()));
     }
     const std::vector<Reading> read = engine_->reader.readNow(questions, request);
     std::vector<std::vector<Reading>> all;
     auto next = read.begin();
-    for (const Asked& one : asked) {
-        std::vector<Reading>& own = all.emplace_back(next, next + static_cast<long>(one.ids.size()));
-        next += static_cast<long>(one.ids.size());
-        oshw::storeAnew(*one.node.node_, own);
+    for (std::size_t i = 0; i < asked.size(); ++i) {
+        std::vector<Reading>& own = all.emplace_back(next, next + counts[i]);
+        next += counts[i];
+        oshw::storeAnew(*asked[i].node.node_, own);
     }
     return all;
 }

@@ -82,14 +82,14 @@ public:
     /// otherwise is read now, on all nodes side by side.
     std::vector<std::vector<Reading>> readTree(const std::vector<NodeRef>& nodes,
                                                const Request& request) const;
-    /// Properties of a node that are asked together.
+    /// Properties of a node that are asked together, ascending; none: all that a tree shows of it.
     struct Asked {
         NodeRef node;
-        std::vector<unsigned int> ids;
+        std::vector<unsigned int> ids{};
     };
     /// What is so now of many nodes, side by side. What the plug-in stores once, when it makes a node, and
-    /// does not read again, is stored anew as far as the answers tell it, so that the node is as a start
-    /// would make it (oshw/stored_facts.h).
+    /// does not read again, is asked for (oshw/start_facts.h) or follows from the answers, and is stored anew
+    /// (oshw/stored_facts.h), so that the node is as a start would make it.
     /// @return the readings of each, in the order of the ids; nothing of what the host does not have
     std::vector<std::vector<Reading>> readAnew(const std::vector<Asked>& asked, const Request& request) const;
     /// See Writer::write. What may be written is judged before: see property_words.h.

@@ -16,9 +16,9 @@ void Facts::forget(unsigned int node) {
                  facts_.upper_bound({node, std::numeric_limits<unsigned int>::max()}));
 }
 
-Reading Facts::ask(const IC::MutableNode& node, unsigned int id) {
+Reading Facts::ask(const IC::MutableNode& node, unsigned int id, Source source) {
     const auto begun = Clock::now();
-    Reading reading = readProperty(node, id);
+    Reading reading = readProperty(node, id, source);
     judge(node, reading, begun);
     return reading;
 }

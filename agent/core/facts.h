@@ -20,8 +20,8 @@ public:
     /// A node is listed no more.
     void forget(unsigned int node);
 
-    /// Reads a property through the plug-in, on the calling thread, and judges what that brought.
-    Reading ask(const IC::MutableNode& node, unsigned int id);
+    /// Reads a property, on the calling thread, and judges what that brought.
+    Reading ask(const IC::MutableNode& node, unsigned int id, Source source = Source::plugin);
     /// Takes over what a read brought. One that was cut off gets the last value, marked stale.
     /// @param begun when the read began; an older answer never replaces a younger one
     void judge(const IC::MutableNode& node, Reading& reading, Clock::time_point begun);

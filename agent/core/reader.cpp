@@ -58,9 +58,9 @@ std::vector<Reading> Reader::read(const Handle& node, const std::vector<unsigned
 }
 
 /// The errors of a stop of the agent, which may come next on this thread, are not the request's.
-Reading Reader::askHere(const IC::MutableNode& node, unsigned int id, const Request& request) {
+Reading Reader::askHere(const Question& question, const Request& request) {
     const ErrorScope scope(request.errors());
-    return facts_.ask(node, id);
+    return facts_.ask(*question.node, question.id, question.source);
 }
 
 /// Whether there is no use in asking: nobody would wait for the answer, or the node has not answered others
@@ -94,12 +94,13 @@ std::vector<std::optional<Reading>> Reader::ask(const std::vector<Question>& que
     const auto answers = std::make_shared<Answers>(hopeful.size());
     for (std::size_t place = 0; place < hopeful.size(); ++place) {
         const Question& question = questions[hopeful[place]];
-        pool_.submit(question.node->getNodeId(), answers.get(),
-                     [held = question.node, id = question.id, place, answers, request, this]() mutable {
-                         Reading reading = askHere(*held, id, request);
-                         held.reset();  // whoever has his answer may end the agent and know that it has ended
-                         answers->put(place, std::move(reading));
-                     });
+        pool_.submit(
+            question.node->getNodeId(), answers.get(),
+            [held = question, place, answers, request, this]() mutable {
+                Reading reading = askHere(held, request);
+                held.node.reset();  // whoever has his answer may end the agent and know that it has ended
+                answers->put(place, std::move(reading));
+            });
     }
     auto come = answers->takeAt(request.deadline(), pool_);
     if (!std::all_of(come.begin(), come.end(), [](const auto& reading) { return reading.has_value(); })) {

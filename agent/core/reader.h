@@ -33,6 +33,7 @@ public:
     struct Question {
         Handle node;
         unsigned int id;
+        Source source = Source::plugin;
     };
     /// The same with what is so now, for many nodes side by side.
     std::vector<Reading> readNow(const std::vector<Question>& questions, const Request& request);
@@ -41,7 +42,7 @@ private:
     bool isHopeless(const IC::MutableNode& node, const Request& request) const;
     /// What comes until the request's deadline.
     std::vector<std::optional<Reading>> ask(const std::vector<Question>& questions, const Request& request);
-    Reading askHere(const IC::MutableNode& node, unsigned int id, const Request& request);
+    Reading askHere(const Question& question, const Request& request);
 
     Pool& pool_;
     Facts& facts_;

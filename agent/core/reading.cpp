@@ -6,6 +6,7 @@
 #include <utility>
 
 #include "agent/core/command_deadline.h"
+#include "agent/core/oshw/start_facts.h"
 
 namespace cvagent {
 
@@ -13,11 +14,15 @@ std::string errorText(const IC::Error& error) {
     return error.text().empty() ? "status " + std::to_string(error.getStatus()) : error.text();
 }
 
-Reading readProperty(const IC::MutableNode& node, unsigned int id) {
+Reading readProperty(const IC::MutableNode& node, unsigned int id, Source source) {
     Reading reading{id, findProperty(node.nodeType(), id), {}, {}};
     const CommandScope scope(CommandScope::read);
     try {
-        const IC::Error result = node.getProperty(id, reading.value);
+        const auto told = source == Source::host ? oshw::askStartFact(node, id) : std::nullopt;
+        if (told) {
+            reading.value = *told;
+        }
+        const IC::Error result = told ? IC::Error() : node.getProperty(id, reading.value);
         if (result.getStatus() != 0) {
             reading.error = errorText(result);
             reading.missing = result.code() == IC::Number(IC::Error::kNoSuchProperty);

@@ -30,8 +30,14 @@ struct Reading {
     std::string name() const { return row != nullptr ? row->name : std::to_string(id); }
 };
 
-/// Reads one property through the plug-in, on the calling thread. Never throws for what a read does.
-Reading readProperty(const IC::MutableNode& node, unsigned int id);
+/// Who is asked for a property.
+enum class Source {
+    plugin,
+    host,  ///< and the plug-in only where it would ask the host itself (oshw/start_facts.h)
+};
+
+/// Reads one property, on the calling thread. Never throws for what a read does.
+Reading readProperty(const IC::MutableNode& node, unsigned int id, Source source = Source::plugin);
 
 /// The stored properties as readings; nothing is asked of the host.
 std::vector<Reading> storedReadings(const IC::MutableNode& node);

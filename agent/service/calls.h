@@ -10,7 +10,6 @@
 #include "agent/core/agent.h"
 #include "agent/service/callers.h"
 #include "agent/service/consent.h"
-#include "agent/service/looker.h"
 #include "agent/service/loop.h"
 #include "agent/service/model.h"
 #include "agent/service/turns.h"
@@ -29,7 +28,6 @@ struct Parts {
     Model& model;
     Callers& callers;
     Consent& consent;
-    Looker& looker;
     Turns& turns;
     Workers& readers;
     Workers& writers;

@@ -17,14 +17,19 @@ struct ConcernRow {
 
 constexpr unsigned int kAddresses = concernsLink | concernsAddress;
 constexpr unsigned int kGateways = concernsAll;
+constexpr unsigned int kLease = kAddresses | concernsHost;
 
-// What the first plug-in reads of the kernel. 24, 96 and 186 are in files, but who gets an address from a
-// server gets the files by then.
+// What the first plug-in reads of the kernel and of the host's files. 24 is in a file, too, but who gets an
+// address otherwise has it by then.
 constexpr ConcernRow kConcernRows[] = {
+    {NodeType::networkPort, 38, concernsLink},   // SupportedSpeed
     {NodeType::networkPort, 57, concernsLink},   // LinkSpeed
     {NodeType::networkPort, 67, concernsLink},   // AutoNegotiation
     {NodeType::networkPort, 82, concernsLink},   // FullDuplex
     {NodeType::networkPort, 123, concernsLink},  // LinkState
+    {NodeType::networkPort, 182, concernsLink},  // WakeOnLanSupported
+    {NodeType::networkPort, 183, concernsLink},  // WakeOnLanEnabled
+    {NodeType::networkPort, 185, concernsLink},  // PortType
     {NodeType::networkPort, 193, concernsLink},  // IsTeamMember
     {NodeType::networkPort, 194, concernsLink},  // IsActiveMember
     {NodeType::networkPort, 195, concernsLink},  // MemberLinkStatus
@@ -37,12 +42,19 @@ constexpr ConcernRow kConcernRows[] = {
     {NodeType::ipConfig, 28, kAddresses},        // IPv6AddressType
     {NodeType::ipConfig, 29, kAddresses},        // IPv6InterfaceId
     {NodeType::ipConfig, 47, kAddresses},        // Protocol
-    {NodeType::ipConfig, 96, kAddresses},        // AddressOrigin
+    {NodeType::ipConfig, 93, concernsHost},      // DHCPServers
+    {NodeType::ipConfig, 94, concernsHost},      // DNSServers
+    {NodeType::ipConfig, 96, kLease},            // AddressOrigin
+    {NodeType::ipConfig, 97, concernsHost},      // HostName
+    {NodeType::ipConfig, 98, concernsHost},      // DomainName
+    {NodeType::ipConfig, 99, concernsHost},      // DNSSuffixes
     {NodeType::ipConfig, 100, kGateways},        // IPv4Gateway
     {NodeType::ipConfig, 101, kGateways},        // IPv6Gateway
     {NodeType::ipConfig, 102, kAddresses},       // IPv6PrefixLength
     {NodeType::ipConfig, 123, concernsLink},     // InterfaceState
-    {NodeType::ipConfig, 186, kAddresses},       // UsesDHCP
+    {NodeType::ipConfig, 186, kLease},           // UsesDHCP
+    {NodeType::computer, 108, concernsHost},     // HostName
+    {NodeType::computer, 127, concernsHost},     // TimeZoneOffset
     {NodeType::team, 165, concernsLink},         // MemberPorts
     {NodeType::team, 197, concernsLink},         // TeamName
     {NodeType::team, 198, concernsLink},         // TeamMode

@@ -7,8 +7,8 @@
 
 namespace cvagent::service {
 
-/// The properties of a node of that type that news of its link concern, ascending; what else it has does not
-/// follow from what the kernel announces.
+/// The properties of a node of that type that news of its link or of the host concern, ascending; what
+/// else it has does not follow from them.
 /// @param concern a mask of Concern (host_links.h)
 std::vector<unsigned int> concernedProperties(unsigned int nodeType, unsigned int concern);
 

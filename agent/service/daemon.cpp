@@ -92,12 +92,12 @@ public:
     Daemon(const Options& options, const Manager& manager, bus::Connection& connection, ErrorLines& errors)
         : options_(options), manager_(manager), connection_(connection), errors_(errors) {}
 
-    void run(Agent& agent, const Config& config, const Past& past) {
+    void run(Agent& agent, const Config& config, const Past& past, const LinkIndices& linksBefore) {
         Service service(loop_, connection_, agent, config, Past::read, past.last());
         service_ = &service;
         sd_bus_attach_event(connection_.get(), loop_.get(), SD_EVENT_PRIORITY_NORMAL);
         signals_ = loop_.whenReadable(stop_.descriptor(), [this] { takeSignals(); });
-        service.begin();
+        service.begin(linksBefore);
         const std::string state =
             std::to_string(service.nodes()) + " nodes on the bus as " + connection_.uniqueName();
         log(Priority::info, state);
@@ -218,11 +218,12 @@ ExitStatus serve(Options& options, const Manager& manager, bus::Connection& conn
     Past::configure(*config);
     Daemon daemon(options, manager, connection, process.errors());
     {
+        const LinkIndices linksBefore = linkIndices();
         Agent agent(agentSettings(process, options, *config, past));
         for (const Agent::FailedPlugin& failed : agent.failedPlugins()) {
             log(Priority::warning, failed.problem.what());
         }
-        daemon.run(agent, *config, past);
+        daemon.run(agent, *config, past, linksBefore);
         daemon.giveSignalsBack();
         if (daemon.endedBy() != 0) {
             kill(getpid(), daemon.endedBy());  // from here on the end is a matter of a second

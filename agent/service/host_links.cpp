@@ -1,8 +1,8 @@
 #include "agent/service/host_links.h"
 
-#include <linux/if.h>
 #include <linux/if_link.h>
 #include <linux/rtnetlink.h>
+#include <net/if.h>
 
 #include <algorithm>
 #include <cstring>
@@ -162,6 +162,18 @@ constexpr NewsRow kNewsRows[] = {
 };
 
 }  // namespace
+
+LinkIndices linkIndices() {
+    struct Free {
+        void operator()(struct if_nameindex* names) const { if_freenameindex(names); }
+    };
+    LinkIndices indices;
+    const std::unique_ptr<struct if_nameindex, Free> names(if_nameindex());
+    for (const struct if_nameindex* each = names.get(); each != nullptr && each->if_index != 0; ++each) {
+        indices.emplace(each->if_name, static_cast<int>(each->if_index));
+    }
+    return indices;
+}
 
 /// The first plug-in finds a link's lines by its name anywhere in them: what is of eth10 is eth1's as well.
 unsigned int HostChange::concernOf(const std::string& name) const {

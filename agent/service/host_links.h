@@ -26,10 +26,15 @@ enum Concern : unsigned int {
     concernsAddress = 2,
     concernsRoute = 4,
     concernsAll = concernsLink | concernsAddress | concernsRoute,
+    concernsHost = 8,  ///< what host_files.h is about: all nodes tell the same
 };
 
 /// By the links' indices.
 using HostLinks = std::map<int, HostLink>;
+/// By the links' names; an index is never given twice.
+using LinkIndices = std::map<std::string, int>;
+/// Those of the host now, asked for.
+LinkIndices linkIndices();
 
 /// What some news have come to.
 struct HeardNews {

@@ -44,18 +44,6 @@ NodeView viewOf(const NodeRef& node, std::vector<Reading> readings) {
             wallClock()};
 }
 
-/// What a tree shows of it.
-std::vector<unsigned int> shownOf(const NodeRef& node) {
-    std::set<unsigned int> ids;
-    for (const auto& [id, value] : storedProperties(*node)) {
-        ids.insert(id);
-    }
-    if (const NodeClass* known = findClass(node->nodeType())) {
-        ids.insert(known->live.begin(), known->live.end());
-    }
-    return {ids.begin(), ids.end()};
-}
-
 bool isNewOf(const HostChange& change, const NodeRef& node) {
     return change.any() &&
            looksByItself(className(node->nodeType()), change.concernOf(nameOf(*node)), change.drives);
@@ -70,7 +58,9 @@ Looker::~Looker() {
     }
 }
 
-Look Looker::firstLook() {
+Look Looker::firstLook(const LinkIndices& linksBefore) {
+    keeper_.noteStart(linksBefore);
+    files_.haveChanged();
     const std::vector<NodeRef> nodes = agent_.nodes();
     Look look{++begun_, true, {}, readFirst(nodes, lookRequest())};
     for (const NodeRef& node : nodes) {
@@ -97,13 +87,20 @@ void Looker::want(const Change& change) {
     change(wanted_);
     lastTold_ = Clock::now();
     firstTold_ = none ? lastTold_ : firstTold_;
-    if (none) {
+    if (none || wanted_.atOnce) {
         changed_.notify_all();
     }
 }
 
 void Looker::lookAgain(std::uint32_t node) {
     want([node](Wanted& wanted) { wanted.nodes.insert(node); });
+}
+
+void Looker::wrote(std::uint32_t node) {
+    want([node](Wanted& wanted) {
+        wanted.nodes.insert(node);
+        wanted.atOnce = true;
+    });
 }
 
 void Looker::lookAtAll() {
@@ -124,7 +121,8 @@ Looker::Clock::time_point Looker::lookTime() const {
     constexpr int kMostSettlings = 5;
     const std::chrono::milliseconds settling = settling_;
     const auto longest = std::min(std::max(settling, kLongest), kMostSettlings * settling);
-    return std::max(restUntil_, std::min(lastTold_ + settling, firstTold_ + longest));
+    const auto settled = std::min(lastTold_ + settling, firstTold_ + longest);
+    return std::max(restUntil_, wanted_.atOnce ? firstTold_ : settled);
 }
 
 Looker::Wanted Looker::waitForWanted() {
@@ -136,7 +134,7 @@ Looker::Wanted Looker::waitForWanted() {
         changed_.wait(lock, ready);
     }
     while (!stopped_ && Clock::now() < lookTime()) {
-        changed_.wait_until(lock, lookTime(), [this] { return stopped_; });
+        changed_.wait_until(lock, lookTime());
     }
     return stopped_ ? Wanted() : std::exchange(wanted_, {});
 }
@@ -165,6 +163,7 @@ void Looker::run() {
     for (Wanted wanted = waitForWanted(); wanted.any(); wanted = waitForWanted()) {
         const auto begun = Clock::now();
         noteForLater(wanted);
+        wanted.hostFiles = files_.haveChanged();
         deliver_(look(wanted));
         const auto ended = Clock::now();
         restUntil_ = ended + (ended - begun);
@@ -214,21 +213,31 @@ bool Looker::setStatus(const NodeRef& node) const {
     return differs;
 }
 
-/// All that a tree shows of the node, or only what the kernel's news concern; none for nothing.
-std::vector<unsigned int> Looker::concernedOf(const NodeRef& node, const Wanted& wanted) const {
-    if (!wanted.all && !wanted.nodes.contains(node->getNodeId())) {
-        if (isNewOf(wanted.later, node) || isNewOf(wanted.host, node)) {
-            return shownOf(node);
-        }
-        if (!wanted.host.any()) {
-            return {};
-        }
-        std::vector<unsigned int> concerned =
-            concernedProperties(node->nodeType(), wanted.host.concernOf(nameOf(*node)));
-        return setStatus(node) && concerned.empty() ? std::vector{kLinkState} : concerned;
+/// Whether all that a tree shows of the node may be different.
+bool Looker::isWhollyWanted(const NodeRef& node, const Wanted& wanted) {
+    return wanted.all || wanted.nodes.contains(node->getNodeId()) || isNewOf(wanted.later, node) ||
+           isNewOf(wanted.host, node);
+}
+
+/// What to ask of a node that is known; nothing when nothing of it may be different.
+std::optional<Agent::Asked> Looker::askedOf(const NodeRef& node, const Wanted& wanted) const {
+    if (isWhollyWanted(node, wanted)) {
+        setStatus(node);
+        return Agent::Asked{node};
     }
-    setStatus(node);
-    return shownOf(node);
+    const unsigned int ofHost = wanted.hostFiles ? concernsHost : 0U;
+    std::vector<unsigned int> ids =
+        concernedProperties(node->nodeType(), wanted.host.concernOf(nameOf(*node)) | ofHost);
+    if (wanted.host.any() && setStatus(node) && ids.empty()) {
+        ids.push_back(kLinkState);
+    }
+    return ids.empty() ? std::nullopt : std::optional(Agent::Asked{node, std::move(ids)});
+}
+
+/// What a new node stores of the host is as old as its plug-in's start.
+std::optional<Agent::Asked> Looker::askedOfNew(const NodeRef& node) {
+    std::vector<unsigned int> ids = concernedProperties(node->nodeType(), concernsHost);
+    return ids.empty() ? std::nullopt : std::optional(Agent::Asked{node, std::move(ids)});
 }
 
 /// What is not done because a write is at work is done at the next look.
@@ -262,10 +271,12 @@ Look Looker::look(const Wanted& wanted) {
         const std::uint32_t id = node->getNodeId();
         look.order.push_back(id);
         met_.insert(id);
-        if (!met.contains(id)) {
+        const bool isNew = !met.contains(id);
+        if (isNew) {
             fresh.push_back(node);
-        } else if (std::vector<unsigned int> ids = concernedOf(node, wanted); !ids.empty()) {
-            asked.push_back({node, std::move(ids)});
+        }
+        if (auto questions = isNew ? askedOfNew(node) : askedOf(node, wanted)) {
+            asked.push_back(*std::move(questions));
         }
     }
     look.nodes = readFirst(fresh, request);

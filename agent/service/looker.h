@@ -12,6 +12,7 @@
 #include <vector>
 
 #include "agent/core/agent.h"
+#include "agent/service/host_files.h"
 #include "agent/service/host_links.h"
 #include "agent/service/model.h"
 #include "agent/service/tree_keeper.h"
@@ -26,6 +27,8 @@ public:
     /// A node's facts may be others by now; it may also be new. It is looked at soon, once for all tellings
     /// until then.
     virtual void lookAgain(std::uint32_t node) = 0;
+    /// The agent itself has written to a node: what that may have changed is looked at as soon as may be.
+    virtual void wrote(std::uint32_t node) = 0;
     /// Anything may be different.
     virtual void lookAtAll() = 0;
     /// The kernel has announced something. Links come with it, as they are now.
@@ -35,7 +38,8 @@ public:
 };
 
 /// Looks at nodes on a thread of its own: once for all that is told until nothing has come for the settling
-/// time, or for five times as long, but a second at most; and for no more than half of the time.
+/// time, or for five times as long, but a second at most, or until the agent has written; and for no more
+/// than half of the time.
 class Looker : public Freshness {
 public:
     using Clock = std::chrono::steady_clock;
@@ -50,12 +54,14 @@ public:
     ~Looker() override;
 
     /// The first one, on the calling thread: what the plug-ins stored at their start is that new.
-    Look firstLook();
+    /// @param linksBefore those that there were ahead of that start
+    Look firstLook(const LinkIndices& linksBefore);
     void start();
     /// No further look begins.
     void stop();
 
     void lookAgain(std::uint32_t node) override;
+    void wrote(std::uint32_t node) override;
     void lookAtAll() override;
     void hear(const HostChange& change) override;
     void alertCame(std::uint32_t node) override;
@@ -68,6 +74,8 @@ private:
     struct Wanted {
         bool all = false;
         bool follow = false;  // what nodes there are
+        bool atOnce = false;
+        bool hostFiles = false;  // what is in them
         std::set<std::uint32_t> nodes;
         std::set<std::uint32_t> alerted;
         HostChange host;
@@ -84,7 +92,9 @@ private:
     std::optional<Clock::time_point> due() const;
     void noteForLater(Wanted& wanted);
     void keepTree(const Wanted& wanted, const Request& request);
-    std::vector<unsigned int> concernedOf(const NodeRef& node, const Wanted& wanted) const;
+    static bool isWhollyWanted(const NodeRef& node, const Wanted& wanted);
+    std::optional<Agent::Asked> askedOf(const NodeRef& node, const Wanted& wanted) const;
+    static std::optional<Agent::Asked> askedOfNew(const NodeRef& node);
     std::vector<NodeView> readAgain(const std::vector<Agent::Asked>& asked, const Request& request);
     std::vector<NodeView> readFirst(const std::vector<NodeRef>& nodes, const Request& request);
     bool setStatus(const NodeRef& node) const;
@@ -101,6 +111,7 @@ private:
     bool stopped_ = false;         // guarded by guard_
     // The thread's own, once it has started.
     TreeKeeper keeper_;
+    HostFiles files_;
     std::shared_ptr<const HostLinks> links_;  // null until they are told
     std::set<std::uint32_t> met_;             // nodes that were looked at
     HostChange later_;                        // what others hear of, too, and look at by themselves

@@ -54,7 +54,7 @@ Service::Service(Loop& loop, bus::Connection& connection, Agent& agent, const Co
       turns_(connection, loop),
       readers_(kReaders),
       writers_(kWriters),
-      parts_{connection, agent,    model_,   callers_,       consent_,       looker_,
+      parts_{connection, agent,    model_,   callers_,       consent_,
              turns_,     readers_, writers_, loop.mailbox(), std::move(past)},
       objects_(parts_, standing_) {
     standing_.version = CORVISTA_VERSION;
@@ -68,9 +68,9 @@ Service::~Service() {
     loop_.mailbox()->close();
 }
 
-void Service::begin() {
-    events_ = agent_.subscribe(0);
-    take(looker_.firstLook());
+void Service::begin(const LinkIndices& linksBefore) {
+    events_ = agent_.subscribe(standing_.lastEvent);
+    take(looker_.firstLook(linksBefore));
     standing_.startedAt = standing_.lookedAt;
     objects_.serve();
     consent_.lookForPolkit();
@@ -111,17 +111,27 @@ void Service::take(Look look) {
 }
 
 void Service::takeEvents() {
-    for (const Event& event : events_->take().events) {
+    const Subscription::Taken taken = events_->take();
+    if (taken.dropped > 0) {
+        looker_.lookAtAll();
+    }
+    for (const Event& event : taken.events) {
         standing_.lastEvent = event.number;
-        if (event.kind == Event::Kind::withdrawn) {
-            model_.withdraw(event.nodeId, looker_.begun());
-        } else if (event.nodeId != 0) {
-            looker_.lookAgain(event.nodeId);
-            if (event.kind == Event::Kind::alert) {
-                looker_.alertCame(event.nodeId);
-            }
-        }
+        follow(event);
         changes_.happened(event);
+    }
+}
+
+void Service::follow(const Event& event) {
+    if (event.kind == Event::Kind::withdrawn) {
+        model_.withdraw(event.nodeId, looker_.begun());
+    } else if (event.kind == Event::Kind::written) {
+        looker_.wrote(event.nodeId);
+    } else if (event.nodeId != 0) {
+        looker_.lookAgain(event.nodeId);
+    }
+    if (event.kind == Event::Kind::alert && event.nodeId != 0) {
+        looker_.alertCame(event.nodeId);
     }
 }
 

@@ -28,7 +28,8 @@ public:
     ~Service();
 
     /// Looks at the host and puts it onto the bus. Throws Problem (busy) when another one has the name.
-    void begin();
+    /// @param linksBefore those that there were ahead of the agent's start
+    void begin(const LinkIndices& linksBefore);
     void configure(const Config& config);
     /// No further call is answered but that it is over; what is under way comes to its end.
     void windDown();
@@ -41,6 +42,7 @@ public:
 private:
     void take(Look look);
     void takeEvents();
+    void follow(const Event& event);
     void armLook();
 
     Loop& loop_;

@@ -14,6 +14,7 @@ constexpr std::chrono::seconds kForItsAlert{65};
 /// A node that was withdrawn lives on, and keeps its name, for as long as a read of it hangs.
 constexpr std::chrono::seconds kLongestLeave{30};
 constexpr std::chrono::milliseconds kRetry{100};
+constexpr int kNoLink = -1;  // as an index
 constexpr std::chrono::milliseconds kShortestRest{1000};
 
 bool isOfType(const IC::MutableNode& node, std::initializer_list<NodeType> types) {
@@ -98,19 +99,39 @@ std::vector<NodeRef> TreeKeeper::sort(const Named& named) {
     return toWithdraw;
 }
 
-/// Which links and drives the nodes are of.
+/// Which links the nodes are of that the plug-in has made since. Where the link of that name was another one
+/// before than behind it, nobody knows which of them the plug-in has seen.
+/// @param old the nodes that there were; none at a start, which may have nodes from elsewhere
+void TreeKeeper::noteMade(const LinkIndices& before, const std::set<std::uint32_t>& old) {
+    const LinkIndices after = linkIndices();
+    const auto indexIn = [](const LinkIndices& links, const std::string& name) {
+        const auto link = links.find(name);
+        return link == links.end() ? kNoLink : link->second;
+    };
+    for (const NodeRef& node : agent_.nodes()) {
+        const std::string name = nameOf(*node);
+        const int index = indexIn(before, name);
+        const bool isSame = index == indexIn(after, name);
+        const bool isFromElsewhere = isSame && index == kNoLink && old.empty();
+        if (isOfLink(*node) && !old.contains(node->getNodeId()) && !isFromElsewhere) {
+            linkOf_[name] = isSame ? index : kNoLink;
+        }
+    }
+}
+
+/// Forgets what no node is of any more.
 void TreeKeeper::remember(const Named& named) {
-    std::map<std::string, int> linkOf;
+    LinkIndices linkOf;
     std::set<std::uint32_t> drives;
     for (const NodeRef& node : agent_.nodes()) {
         const std::string name = nameOf(*node);
         if (presentDrives_.contains(node->getNodeId())) {
             drives.insert(node->getNodeId());
         }
-        if (const auto link = named.find(name); isOfLink(*node) && link != named.end()) {
-            linkOf[name] = link->second->first;
-        } else if (const auto before = linkOf_.find(name); before != linkOf_.end()) {
+        if (const auto before = linkOf_.find(name); before != linkOf_.end()) {
             linkOf.insert(*before);
+        } else if (const auto link = named.find(name); isOfLink(*node) && link != named.end()) {
+            linkOf[name] = link->second->first;
         }
     }
     linkOf_ = std::move(linkOf);
@@ -209,6 +230,11 @@ bool TreeKeeper::follow(const HostLinks& links, const Request& request) {
     for (const auto& link : links) {
         named.emplace(link.second.name, &link);
     }
+    const LinkIndices before = linkIndices();
+    std::set<std::uint32_t> old;
+    for (const NodeRef& node : agent_.nodes()) {
+        old.insert(node->getNodeId());
+    }
     retry_ = Clock::now() + kRetry;  // unless all of this is done
     if (const std::vector<NodeRef> toWithdraw = sort(named); !toWithdraw.empty()) {
         agent_.withdraw(toWithdraw, request);
@@ -218,6 +244,7 @@ bool TreeKeeper::follow(const HostLinks& links, const Request& request) {
         }
     }
     const bool restarted = findNew(named, request);
+    noteMade(before, old);
     remember(named);
     return restarted;
 }

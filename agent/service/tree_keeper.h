@@ -22,6 +22,9 @@ public:
     /// @param agent outlives it
     explicit TreeKeeper(Agent& agent) : agent_(agent) {}
 
+    /// Notes which links the nodes are of that the plug-ins made at their start.
+    /// @param before the links ahead of it
+    void noteStart(const LinkIndices& before) { noteMade(before, {}); }
     /// Hides the nodes of what is gone and has new links found. Throws Problem (busy when a write is at work
     /// until the request's deadline); due() then says when to follow again.
     /// @return whether the plug-in was started anew for it, so that all of its nodes are other ones
@@ -41,6 +44,7 @@ private:
     Judgement judgeLink(const NodeRef& node, const std::string& name, const Named& named) const;
     Judgement judgeDrive(const NodeRef& node, const std::string& name);
     std::vector<NodeRef> sort(const Named& named);
+    void noteMade(const LinkIndices& before, const std::set<std::uint32_t>& old);
     void remember(const Named& named);
     bool findNew(const Named& named, const Request& request);
     std::map<int, std::string> bondsWithoutTeam(const Named& named) const;
@@ -49,7 +53,7 @@ private:
 
     Agent& agent_;
     std::map<std::uint32_t, Clock::time_point> hidden_;  // until when they are kept
-    std::map<std::string, int> linkOf_;                  // by the name of a node: the index of its link
+    LinkIndices linkOf_;                                 // by the name of a node
     std::set<std::uint32_t> presentDrives_;              // that have been there
     std::map<int, std::string> offered_;                 // links that the plug-in makes no node of, by index
     std::map<int, std::string> refusedBonds_;            // that the plug-in made no team of, by index

@@ -75,7 +75,6 @@ void perform(const CallPointer& call, const Wish& wish, Request::Clock::time_poi
             if (!result.after.failed()) {
                 call->parts().model.learn(id, {result.after});
             }
-            call->parts().looker.lookAgain(id);
             answerWrite(*call, result, errors);
         });
     });

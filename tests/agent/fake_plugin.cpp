@@ -17,6 +17,9 @@
 //   churn                   a thread publishes and withdraws drives until unload
 //   alert                   a thread sends one alert
 //   heldalert               the same, once nothing is held any more
+//   alerts                  a thread sends alerts with rising numbers, up to the one in the file
+//   DIARY.alerts; the
+//                           last one that was taken stands in DIARY.told, behind which the next start goes on
 //   early                   initialize sends one alert, before the agent has seen any node
 //   late                    unload sends one alert
 //   longalert               alerts have a text of a megabyte
@@ -270,6 +273,9 @@ public:
                 sendAlert();
             });
         }
+        if (told("alerts")) {
+            alert_ = std::thread([this] { sendAlerts(); });
+        }
         if (told("early")) {
             sendAlert();
         }
@@ -394,14 +400,33 @@ private:
         }
     }
 
-    void sendAlert() {
+    static unsigned long numberIn(const std::string& file) {
+        unsigned long number = 0;
+        std::ifstream(file) >> number;
+        return number;
+    }
+
+    void sendAlerts() {
+        const std::string files = std::getenv("CORVISTA_FAKE_PLUGIN_DIARY");
+        unsigned long number = numberIn(files + ".told");
+        while (running_) {
+            if (number < numberIn(files + ".alerts")) {
+                sendAlert("alert " + std::to_string(++number));
+                std::ofstream(files + ".new") << number << std::endl;
+                std::rename((files + ".new").c_str(), (files + ".told").c_str());
+            }
+            std::this_thread::sleep_for(std::chrono::milliseconds(2));
+        }
+    }
+
+    void sendAlert(const std::string& words = "NIC is Offline ") {
         std::string path;
         for (const auto& node : holdAll()) {
             path = node->nodeType() == 12 ? node->getPath() : path;
         }
         const auto [handler, context] = alertHandler();
         if (handler != nullptr) {
-            const std::string text = told("longalert") ? std::string(1 << 20, 'x') : "NIC is Offline ";
+            const std::string text = told("longalert") ? std::string(1 << 20, 'x') : words;
             handler({IC::Alert(1, 0, {path}, 12, text)}, context);
         }
     }

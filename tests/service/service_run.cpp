@@ -24,7 +24,12 @@ ServiceRun& ServiceRun::telling(const std::string& words) {
 }
 
 ServiceRun& ServiceRun::plugin(const std::string& file) {
-    plugin_ = file;
+    plugins_ = {file};
+    return *this;
+}
+
+ServiceRun& ServiceRun::andPlugin(const std::string& file) {
+    plugins_.push_back(file);
     return *this;
 }
 
@@ -39,16 +44,18 @@ ServiceRun& ServiceRun::config(const std::string& text) {
 }
 
 std::vector<std::string> ServiceRun::commandLine() const {
-    return {"env",
-            "CORVISTA_FAKE_PLUGIN_DIARY=/var/diary",
-            "CORVISTA_FAKE_PLUGIN_HOLD=/var/hold",
-            "CORVISTA_FAKE_PLUGIN=" + words_,
-            CVAGENTD_PROGRAM,
-            "--private-bus",
-            "--host-tools",
-            hostTools_,
-            "--plugin",
-            plugin_};
+    std::vector<std::string> words = {"env",
+                                      "CORVISTA_FAKE_PLUGIN_DIARY=/var/diary",
+                                      "CORVISTA_FAKE_PLUGIN_HOLD=/var/hold",
+                                      "CORVISTA_FAKE_PLUGIN=" + words_,
+                                      CVAGENTD_PROGRAM,
+                                      "--private-bus",
+                                      "--host-tools",
+                                      hostTools_};
+    for (const std::string& plugin : plugins_) {
+        words.insert(words.end(), {"--plugin", plugin});
+    }
+    return words;
 }
 
 ServiceRun& ServiceRun::start() {

@@ -46,6 +46,8 @@ public:
 
     ServiceRun& telling(const std::string& words);
     ServiceRun& plugin(const std::string& file);
+    /// One more.
+    ServiceRun& andPlugin(const std::string& file);
     /// "native" without a word about it.
     ServiceRun& hostTools(const std::string& choice);
     ServiceRun& config(const std::string& text);
@@ -66,7 +68,7 @@ public:
 private:
     FakeHost& host_;
     std::string words_;
-    std::string plugin_ = FAKE_PLUGIN_FILE;
+    std::vector<std::string> plugins_{FAKE_PLUGIN_FILE};
     std::string hostTools_ = "native";
     std::unique_ptr<RunningProgram> program_;
     std::optional<bus::Connection> bus_;

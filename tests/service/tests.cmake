@@ -26,11 +26,20 @@ if(CORVISTA_SERVICE)
 
   # On links of a real kernel.
   corvista_test(service_freshness LIBRARIES agent_service agent_core agent_bus test_support SOURCES
+    service/fresh_facts_test.cpp
     service/freshness_test.cpp
     service/service_run.cpp)
   target_compile_definitions(service_freshness_test PRIVATE ${agent_test_programs} CVAGENTD_PROGRAM="$<TARGET_FILE:cvagentd>"
     HARDWARE_FILE="$<TARGET_FILE:corvistahardware>")
   add_dependencies(service_freshness_test cvagent cvagentd corvistahardware vantrelcvicoshwmi corvista-hosttools)
+
+  # Over a long time; see scripts/endurance.
+  corvista_test(service_endurance LIBRARIES agent_service agent_history agent_core agent_bus test_support SOURCES
+    service/endurance_test.cpp
+    service/service_run.cpp)
+  target_compile_definitions(service_endurance_test PRIVATE ${agent_test_programs} CVAGENTD_PROGRAM="$<TARGET_FILE:cvagentd>"
+    HARDWARE_FILE="$<TARGET_FILE:corvistahardware>")
+  add_dependencies(service_endurance_test cvagent cvagentd fake_plugin vantrelcvicoshwmi corvista-hosttools)
 
   # The command line as its client.
   corvista_test(service_client LIBRARIES agent_cli agent_service agent_core agent_bus test_support SOURCES
