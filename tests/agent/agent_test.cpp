@@ -172,7 +172,7 @@ HOST_TEST(AgentPlugins, NothingIsToldOfOneThatDoesNotStart) {
     EXPECT_THAT(failed.first, testing::Not(testing::Contains(HasSubstr("hard-drive"))));
 }
 
-// At its end the program goes though there was a thread that nobody has joined, which ThreadSanitizer reports.
+// At its end the program goes though nobody has joined a thread, which ThreadSanitizer reports.
 #if !defined(__SANITIZE_THREAD__)
 HOST_TEST(AgentPlugins, OneThatTakesTooLongToStartIsLeftToItself) {
     const cvagent::QuietCommands quiet;
