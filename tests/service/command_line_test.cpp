@@ -219,6 +219,13 @@ HOST_TEST(ServiceClient, TheDoctorTellsOfTheService) {
                 testing::ContainsRegex("SERVICE\n  running, version 1.0.0\n  since 20.*Z, last full "
                                        "look 20.*Z\n  read by everybody, written by root and the "
                                        "group corvista\n"));
+    const auto report = nlohmann::json::parse(host.run(asking({"doctor", "--json"})).out)["service"];
+    EXPECT_EQ(report["running"], true);
+    EXPECT_EQ(report["problem"], nullptr);
+    EXPECT_EQ(report["version"], "1.0.0");
+    EXPECT_EQ(report["consent"], "group");
+    EXPECT_THAT(report["since"].get<std::string>(), testing::MatchesRegex("20.*Z"));
+    EXPECT_THAT(report["looked"].get<std::string>(), testing::MatchesRegex("20.*Z"));
 }
 
 /// A bus on which anybody may take any name, with somebody on it who took the service's.
