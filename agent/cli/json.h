@@ -41,8 +41,8 @@ struct PluginReport {
     std::vector<std::string> files;
     std::vector<std::string> leftOut;
 };
-/// {"service": {"running", "problem", "version", "since", "looked", "consent"}, "plugins": [FILE...], "leftOut": [TEXT...],
-/// "tools": [{"tool", "host", "classic", "adapter", "used", "package", "purpose"}]}
+/// {"service": {"running", "problem", "version", "since", "looked", "consent"}, "plugins": [FILE...],
+/// "leftOut": [TEXT...], "tools": [{"tool", "host", "classic", "adapter", "used", "package", "purpose"}]}
 std::string doctor(const remote::ServiceReport& service, const PluginReport& plugins,
                    const std::vector<ToolReport>& tools);
 /// {"compared", "differences": [{"path", "property", "shown", "kernel", "why"}]}

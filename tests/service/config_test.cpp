@@ -70,7 +70,7 @@ std::string contentOf(const std::string& file) {
 /// What agent.conf(5) says of a key.
 std::string sectionOf(const std::string& key) {
     const std::string page = contentOf(PACKAGING_DIR "/agent.conf.5");
-    const std::string name = std::regex_replace(key, std::regex("-"), "\\\\-");
+    const std::string name = std::regex_replace(key, std::regex("-"), "\\-");
     const std::size_t start = page.find(".TP\n.B " + name + "\n");
     return start == std::string::npos ? "" : page.substr(start, page.find("\n.", start + 7) - start);
 }

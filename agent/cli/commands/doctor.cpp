@@ -123,12 +123,11 @@ std::string serviceLines(const remote::ServiceReport& report, const Style& style
 
 }  // namespace
 
-ExitStatus doctor(const Options& options) {
+ExitStatus doctor(const Options& options, const remote::ServiceReport& service) {
     const Style style = Style::detect();
     StopSignals::install();
     const std::vector<ToolReport> reports =
         inspectHostTools(options.hostTools, Look::everything, adapterDirectory());
-    const remote::ServiceReport service = remote::describeService(options);
     const json::PluginReport plugins = findPlugins(options);
     print(options.json ? json::doctor(service, plugins, reports)
                        : serviceLines(service, style) + pluginLines(plugins, style) + table(reports, style));
