@@ -20,7 +20,8 @@ using Clock = std::chrono::steady_clock;
 /// "LinkState: 1 -> 12"; what is not known is left out.
 std::string changeText(const Event& event) {
     const std::string before = event.before.empty() ? "" : printable(event.before) + " -> ";
-    return event.propertyName + ": " + before + (event.after.empty() ? "not known" : printable(event.after));
+    return printable(event.propertyName) + ": " + before +
+           (event.after.empty() ? "not known" : printable(event.after));
 }
 
 }  // namespace

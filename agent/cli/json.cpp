@@ -226,10 +226,21 @@ std::string catalogue(const std::vector<const Property*>& rows) {
     return document(list, 2);
 }
 
-std::string tools(const std::vector<ToolReport>& reports) {
+namespace {
+
+Json orNull(const std::string& text) {
+    return text.empty() ? Json(nullptr) : Json(text);
+}
+
+Json serviceObject(const remote::ServiceReport& report) {
+    return {{"running", report.problem.empty()}, {"problem", orNull(report.problem)},
+            {"version", orNull(report.version)}, {"since", orNull(report.since)},
+            {"looked", orNull(report.looked)},   {"consent", orNull(report.consent)}};
+}
+
+Json toolList(const std::vector<ToolReport>& reports) {
     Json list = Json::array();
     for (const ToolReport& report : reports) {
-        const auto orNull = [](const std::string& text) { return text.empty() ? Json(nullptr) : Json(text); };
         list.push_back({{"tool", report.tool},
                         {"host", orNull(report.native)},
                         {"classic", report.classic},
@@ -238,7 +249,18 @@ std::string tools(const std::vector<ToolReport>& reports) {
                         {"package", report.package},
                         {"purpose", report.purpose}});
     }
-    return document(list, 2);
+    return list;
+}
+
+}  // namespace
+
+std::string doctor(const remote::ServiceReport& service, const PluginReport& plugins,
+                   const std::vector<ToolReport>& tools) {
+    return document({{"service", serviceObject(service)},
+                     {"plugins", plugins.files},
+                     {"leftOut", plugins.leftOut},
+                     {"tools", toolList(tools)}},
+                    2);
 }
 
 std::string verdict(const verify::Result& result) {

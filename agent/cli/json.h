@@ -3,6 +3,7 @@
 #include <string>
 #include <vector>
 
+#include "agent/cli/remote/service.h"
 #include "agent/core/event.h"
 #include "agent/core/host_tools.h"
 #include "agent/core/node_ref.h"
@@ -35,8 +36,15 @@ std::string event(const Event& event, const std::string& boot);
 /// [{"class", "type", "id", "name", "kind", "unit", "readable", "writable", "values", "accepts", "meaning"}];
 /// of a plug-in that brings its own catalogue also "source" and "trusted"
 std::string catalogue(const std::vector<const Property*>& rows);
-/// [{"tool", "host", "classic", "adapter", "used", "package", "purpose"}]
-std::string tools(const std::vector<ToolReport>& reports);
+/// The plug-ins that would be loaded, and in words why others would not.
+struct PluginReport {
+    std::vector<std::string> files;
+    std::vector<std::string> leftOut;
+};
+/// {"service": {"running", "problem", "version", "since", "looked", "consent"}, "plugins": [FILE...],
+/// "leftOut": [TEXT...], "tools": [{"tool", "host", "classic", "adapter", "used", "package", "purpose"}]}
+std::string doctor(const remote::ServiceReport& service, const PluginReport& plugins,
+                   const std::vector<ToolReport>& tools);
 /// {"compared", "differences": [{"path", "property", "shown", "kernel", "why"}]}
 std::string verdict(const verify::Result& result);
 

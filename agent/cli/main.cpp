@@ -85,8 +85,11 @@ ExitStatus run(Options& options, cvagent::WantMessages& wants) {
     for (std::string& plugin : options.plugins) {
         files.push_back(&plugin);
     }
+    const bool isDoctor = options.command == Command::doctor;
+    const auto service = isDoctor ? cvagent::remote::describeService(options)  // before the environment goes
+                                  : cvagent::remote::ServiceReport();
     cvagent::prepareSurroundings(files);
-    return options.command == Command::doctor    ? cvagent::commands::doctor(options)
+    return isDoctor                              ? cvagent::commands::doctor(options, service)
            : options.command == Command::history ? cvagent::commands::history(options)
                                                  : cvagent::commands::properties(options);
 }

@@ -21,6 +21,12 @@ struct TimeUnit {
 constexpr std::array kUnits = {TimeUnit{'s', 1}, TimeUnit{'m', 60}, TimeUnit{'h', 3600},
                                TimeUnit{'d', 86400}};
 
+/// The nearest one that there is: 32 bits end in 2038.
+std::time_t asTime(std::int64_t seconds) {
+    using Limits = std::numeric_limits<std::time_t>;
+    return static_cast<std::time_t>(std::clamp<std::int64_t>(seconds, Limits::min(), Limits::max()));
+}
+
 std::optional<std::time_t> longAgo(const std::string& text) {
     const auto* const unit =
         std::ranges::find_if(kUnits, [&text](const TimeUnit& each) { return text.ends_with(each.letter); });
@@ -28,13 +34,13 @@ std::optional<std::time_t> longAgo(const std::string& text) {
     if (unit == kUnits.end() || !count) {
         return std::nullopt;
     }
-    return static_cast<std::time_t>(std::time(nullptr) - *count * unit->seconds);
+    return asTime(std::time(nullptr) - *count * unit->seconds);
 }
 
 std::optional<std::time_t> timeNamed(const std::string& text) {
     const bool isDay = text.find('T') == std::string::npos;
     try {
-        return static_cast<std::time_t>(QX::DateTime(isDay ? text + "T00:00:00" : text, 3).seconds());
+        return asTime(QX::DateTime(isDay ? text + "T00:00:00" : text, 3).seconds());
     } catch (const std::invalid_argument&) {
         return std::nullopt;
     }

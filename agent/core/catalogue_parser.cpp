@@ -3,25 +3,19 @@
 #include <algorithm>
 #include <array>
 #include <deque>
-#include <limits>
 #include <memory>
 #include <mutex>
-#include <nlohmann/json.hpp>
 #include <optional>
 #include <set>
 
 #include "agent/core/catalogue_file.h"
+#include "agent/core/catalogue_rows.h"
 #include "agent/core/text.h"
 
 namespace cvagent {
 
 namespace {
 
-using CatalogueJson = nlohmann::json;
-
-constexpr int kDeepestRow = 4;  // the document, a list, a row, a list in it
-constexpr std::size_t kMostClasses = 200;
-constexpr std::size_t kMostProperties = 5000;
 constexpr std::size_t kLongestName = 40;
 constexpr std::size_t kLongestText = 500;
 constexpr std::size_t kMostComplaints = 10;
@@ -87,29 +81,6 @@ std::string lowered(std::string name) {
     return name;
 }
 
-std::optional<unsigned int> asId(const CatalogueJson& value) {
-    const bool fits =
-        value.is_number_unsigned() && value.get<std::uint64_t>() <= std::numeric_limits<unsigned int>::max();
-    return fits ? std::optional(value.get<unsigned int>()) : std::nullopt;
-}
-
-std::optional<unsigned int> numberIn(const CatalogueJson& row, const char* key) {
-    const auto found = row.find(key);
-    return found == row.end() ? std::nullopt : asId(*found);
-}
-
-/// "" where there is none.
-std::string textIn(const CatalogueJson& row, const char* key) {
-    const auto found = row.find(key);
-    const std::string* text = found == row.end() ? nullptr : found->get_ptr<const std::string*>();
-    return text == nullptr ? "" : *text;
-}
-
-bool flagIn(const CatalogueJson& row, const char* key) {
-    const auto found = row.find(key);
-    return found != row.end() && found->is_boolean() && found->get<bool>();
-}
-
 std::optional<Kind> kindNamed(const std::string& name) {
     for (const Kind kind :
          {Kind::number, Kind::enumeration, Kind::text, Kind::texts, Kind::numbers, Kind::flag}) {
@@ -125,14 +96,12 @@ public:
     explicit CatalogueParser(const std::string& owner) { own_->table.owner = keep(owner); }
 
     ParsedCatalogue parse(std::string_view text) {
-        const auto notTooDeep = [](int depth, CatalogueJson::parse_event_t /*event*/,
-                                   CatalogueJson& /*value*/) { return depth <= kDeepestRow; };
-        const CatalogueJson whole = CatalogueJson::parse(text.begin(), text.end(), notTooDeep, false);
-        if (!whole.is_object()) {
+        const auto lists = readCatalogueRows(text);
+        if (!lists) {
             return {nullptr, {"it is no JSON object"}};
         }
-        each(whole, "classes", kMostClasses, [this](const CatalogueJson& row) { addClass(row); });
-        each(whole, "properties", kMostProperties, [this](const CatalogueJson& row) { addProperty(row); });
+        each(lists->classes, "classes", [this](const CatalogueRow& row) { addClass(row); });
+        each(lists->properties, "properties", [this](const CatalogueRow& row) { addProperty(row); });
         std::ranges::sort(own_->properties, {},
                           [](const Property& row) { return std::pair(row.type, row.id); });
         return {kept(), std::move(complaints_)};
@@ -163,25 +132,21 @@ private:
     }
 
     template <class Add>
-    void each(const CatalogueJson& whole, const char* key, std::size_t most, const Add& add) {
-        const auto list = whole.find(key);
-        if (list == whole.end() || !list->is_array()) {
-            complain(std::string("it has no list of ") + key);
-            return;
+    void each(const CatalogueRows& list, const std::string& name, const Add& add) {
+        if (!list.isThere) {
+            complain("it has no list of " + name);
         }
-        std::size_t count = 0;
-        for (const CatalogueJson& row : *list) {
-            if (++count > most) {
-                complain("it has more than " + std::to_string(most) + " " + key);
-                return;
-            }
+        for (const CatalogueRow& row : list.rows) {
             add(row);
+        }
+        if (list.hasMore) {
+            complain("it has more than " + std::to_string(list.most) + " " + name);
         }
     }
 
-    void addClass(const CatalogueJson& row) {
-        const auto type = numberIn(row, "type");
-        const std::string name = textIn(row, "name");
+    void addClass(const CatalogueRow& row) {
+        const auto type = row.type;
+        const std::string& name = row.name;
         if (!type || *type == 0 || !isClassName(name)) {
             complain("a class without a number or a good name: " + inQuotes(name));
             return;
@@ -192,32 +157,18 @@ private:
             refused_.insert(*type);
             return;
         }
-        const auto nameProperty = numberIn(row, "nameProperty");
-        const auto naming = nameProperty             ? NodeClass::Naming::byProperty
-                            : flagIn(row, "several") ? NodeClass::Naming::byIndex
-                                                     : NodeClass::Naming::single;
-        own_->classes.push_back(
-            {NodeType{*type}, keep(name), naming, nameProperty.value_or(0), telling(row)});
+        const auto naming = row.nameProperty ? NodeClass::Naming::byProperty
+                            : row.several    ? NodeClass::Naming::byIndex
+                                             : NodeClass::Naming::single;
+        own_->classes.push_back({NodeType{*type}, keep(name), naming, row.nameProperty.value_or(0),
+                                 own_->telling.emplace_back(row.telling)});
     }
 
-    std::span<const unsigned int> telling(const CatalogueJson& row) {
-        std::vector<unsigned int> ids;
-        if (const auto list = row.find("telling"); list != row.end() && list->is_array()) {
-            for (const CatalogueJson& id : *list) {
-                const auto number = asId(id);
-                if (number && ids.size() < 10) {
-                    ids.push_back(*number);
-                }
-            }
-        }
-        return own_->telling.emplace_back(std::move(ids));
-    }
-
-    void addProperty(const CatalogueJson& row) {
-        const auto type = numberIn(row, "class");
-        const auto id = numberIn(row, "id");
-        const std::string name = textIn(row, "name");
-        const auto kind = kindNamed(textIn(row, "kind"));
+    void addProperty(const CatalogueRow& row) {
+        const auto type = row.nodeClass;
+        const auto id = row.id;
+        const std::string& name = row.name;
+        const auto kind = kindNamed(row.kind);
         if (type && refused_.contains(*type)) {
             return;  // told with its class
         }
@@ -233,11 +184,10 @@ private:
             complain("the property " + name + " is there twice");
             return;
         }
-        Property added{
-            NodeType{*type}, *id, keep(name), *kind, Unit::none, {}, keepText(textIn(row, "meaning"))};
-        setUnit(added, textIn(row, "unit"));
-        added.source = keepText(textIn(row, "source"));
-        added.trusted = flagIn(row, "trusted");
+        Property added{NodeType{*type}, *id, keep(name), *kind, Unit::none, {}, keepText(row.meaning)};
+        setUnit(added, row.unit);
+        added.source = keepText(row.source);
+        added.trusted = row.trusted;
         own_->properties.push_back(added);
     }
 

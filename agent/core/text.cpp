@@ -1,5 +1,6 @@
 #include "agent/core/text.h"
 
+#include <algorithm>
 #include <array>
 
 #include "framework/qx/utf8.h"
@@ -25,6 +26,9 @@ bool isControl(char32_t character) {
 }
 
 std::string printable(const std::string& text) {
+    if (std::ranges::all_of(text, [](char byte) { return byte >= ' ' && byte <= '~'; })) {
+        return text;
+    }
     std::string shown;
     for (std::size_t i = 0; i < text.size();) {
         const QX::Utf8Character next = QX::firstUtf8Character(std::string_view(text).substr(i));

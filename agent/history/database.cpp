@@ -76,6 +76,9 @@ Statement::Statement(sqlite3* database, const char* sql) : database_(database) {
     sqlite3_stmt* made = nullptr;
     const int code = sqlite3_prepare_v3(database, sql, -1, SQLITE_PREPARE_PERSISTENT, &made, nullptr);
     statement_.reset(made);
+    if ((code & 0xFF) == SQLITE_ERROR) {  // a statement of ours does not fit what ought to be in the file
+        throw HistoryError(HistoryError::damaged, sqlite3_errmsg(database));
+    }
     if (code != SQLITE_OK) {
         fail(database);
     }

@@ -8,6 +8,7 @@
 
 #include <array>
 #include <cerrno>
+#include <memory>
 
 namespace cvagent::service {
 
@@ -29,10 +30,13 @@ int opened(int protocol, std::uint32_t groups, int flags) {
     return made;
 }
 
+/// Not a variable of each thread: the C library would fill one for every thread of the process.
+using Buffer = std::array<char, 65536>;
+
 enum class Came { message, nothing, lost, other };
 
 /// One message; a link's can be long where it has many virtual functions.
-Came receive(int from, std::array<char, 65536>& buffer, std::string_view& message) {
+Came receive(int from, Buffer& buffer, std::string_view& message) {
     iovec piece{buffer.data(), buffer.size()};
     sockaddr_nl sender{};
     msghdr header{};
@@ -80,11 +84,11 @@ Announcements::~Announcements() {
 }
 
 bool Announcements::takeWaiting(const Take& take) const {
-    static thread_local std::array<char, 65536> buffer;
+    const auto buffer = std::make_unique_for_overwrite<Buffer>();
     bool lost = false;
     for (int count = 0; socket_ >= 0; ++count) {
         std::string_view message;
-        const Came came = receive(socket_, buffer, message);
+        const Came came = receive(socket_, *buffer, message);
         if (came == Came::nothing) {
             break;
         }
@@ -108,10 +112,10 @@ bool Announcements::askForAll(int protocol, std::uint16_t type, const Take& take
     const timeval patience{kDumpSeconds, 0};
     bool whole = asked >= 0 && setsockopt(asked, SOL_SOCKET, SO_RCVTIMEO, &patience, sizeof patience) == 0 &&
                  send(asked, &question, sizeof question, 0) == static_cast<ssize_t>(sizeof question);
-    static thread_local std::array<char, 65536> buffer;
+    const auto buffer = std::make_unique_for_overwrite<Buffer>();
     for (bool done = !whole; !done;) {
         std::string_view message;
-        const Came came = receive(asked, buffer, message);
+        const Came came = receive(asked, *buffer, message);
         if (came == Came::message) {
             take(message);
             done = endsDump(message, whole);

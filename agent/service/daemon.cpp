@@ -1,5 +1,6 @@
 #include "agent/service/daemon.h"
 
+#include <malloc.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -103,6 +104,7 @@ public:
         log(Priority::info, state);
         manager_.status(state);
         manager_.ready();
+        malloc_trim(0);  // the start needs more than the service at rest
         feedWatchdog();
         tellErrors();
         watchBus();

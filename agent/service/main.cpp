@@ -1,3 +1,5 @@
+#include <malloc.h>
+
 #include <exception>
 #include <string>
 
@@ -27,9 +29,13 @@ ExitStatus runGuarded(cvagent::service::Options& options) {
     }
 }
 
+/// Else each of the threads, most of which wait most of the time, would have a heap of its own.
+constexpr int kHeaps = 2;
+
 }  // namespace
 
 int main(int count, char** words) {
+    mallopt(M_ARENA_MAX, kHeaps);
     cvagent::openStandardDescriptors();
     cvagent::StopSignals::becomeWriteErrors();
     cvagent::service::findJournal();

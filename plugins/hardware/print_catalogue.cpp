@@ -35,30 +35,50 @@ Json idsOf(const hardware::ClassRow& type, const std::vector<hardware::Row>& row
     return ids;
 }
 
+Json classObject(const hardware::ClassRow& row, const std::vector<hardware::Row>& rows) {
+    Json one{{"type", static_cast<unsigned int>(row.type)}, {"name", row.name}};
+    if (row.several) {
+        one["nameProperty"] = hardware::firstId(row.type);
+    }
+    if (*row.telling != '\0') {
+        one["telling"] = idsOf(row, rows);
+    }
+    return one;
+}
+
+/// What holds where nothing is said is left out: each command that shows a node reads the file.
+Json propertyObject(const hardware::Row& row) {
+    Json one{{"class", static_cast<unsigned int>(hardware::classOfId(row.id))},
+             {"id", row.id},
+             {"name", row.name},
+             {"kind", kKindNames.at(static_cast<std::size_t>(row.kind))}};
+    if (*row.unit != '\0') {
+        one["unit"] = row.unit;
+    }
+    one["source"] = row.source;
+    one["meaning"] = row.meaning;
+    if (row.traits.trusted) {
+        one["trusted"] = true;
+    }
+    return one;
+}
+
+/// A line for each row.
+template <class Rows, class Make>
+std::string listOf(const Rows& rows, const Make& make) {
+    std::string text;
+    for (const auto& row : rows) {
+        text += (text.empty() ? "[\n" : ",\n") + make(row).dump();
+    }
+    return text + "]";
+}
+
 void printCatalogue() {
     const std::vector<hardware::Row> rows = hardware::allRows();
-    Json json{{"plugin", "hardware"}, {"classes", Json::array()}, {"properties", Json::array()}};
-    for (const hardware::ClassRow& row : hardware::classes()) {
-        Json one{{"type", static_cast<unsigned int>(row.type)}, {"name", row.name}};
-        if (row.several) {
-            one["nameProperty"] = hardware::firstId(row.type);
-        }
-        if (*row.telling != '\0') {
-            one["telling"] = idsOf(row, rows);
-        }
-        json["classes"].push_back(one);
-    }
-    for (const hardware::Row& row : rows) {
-        json["properties"].push_back({{"class", static_cast<unsigned int>(hardware::classOfId(row.id))},
-                                      {"id", row.id},
-                                      {"name", row.name},
-                                      {"kind", kKindNames.at(static_cast<std::size_t>(row.kind))},
-                                      {"unit", row.unit},
-                                      {"source", row.source},
-                                      {"meaning", row.meaning},
-                                      {"trusted", row.traits.trusted}});
-    }
-    std::puts(json.dump(1).c_str());
+    const std::string classes =
+        listOf(hardware::classes(), [&rows](const auto& row) { return classObject(row, rows); });
+    std::cout << R"({"plugin": "hardware", "classes": )" << classes << R"(, "properties": )"
+              << listOf(rows, propertyObject) << "}\n";
 }
 
 }  // namespace

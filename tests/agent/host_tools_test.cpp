@@ -249,7 +249,8 @@ HOST_TEST(Doctor, SpeaksJson) {
     const Finished run = host.run({CVAGENT_PROGRAM, "doctor", "--host-tools", "native", "--json"});
     ASSERT_EQ(run.status, 0) << run.err;
     std::map<std::string, nlohmann::json> tools;
-    for (const auto& tool : nlohmann::json::parse(run.out)) {
+    const auto report = nlohmann::json::parse(run.out);
+    for (const auto& tool : report["tools"]) {
         tools[tool["tool"]] = tool;
     }
     EXPECT_EQ(tools["ifconfig"]["host"], "/tools/ifconfig");
@@ -261,6 +262,9 @@ HOST_TEST(Doctor, SpeaksJson) {
     EXPECT_EQ(tools["brctl"]["used"], nullptr);
     EXPECT_EQ(tools["brctl"]["package"], "bridge-utils");
     EXPECT_NE(tools["brctl"]["purpose"], "");
+    EXPECT_EQ(report["plugins"].size() + report["leftOut"].size(), 2U);
+    EXPECT_EQ(report["service"]["running"], false);
+    EXPECT_EQ(report["service"]["version"], nullptr);
 }
 
 }  // namespace

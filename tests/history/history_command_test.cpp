@@ -89,6 +89,33 @@ HOST_TEST(HistoryCommand, ShowsAPartOfIt) {
     EXPECT_EQ(shown({"--node", "computer", "--kind", "written", "--kind", "alert"}), "123");
     EXPECT_EQ(shown({"--node", "eth0"}), "");
     EXPECT_EQ(shown({"--kind", "alert"}), "");
+    EXPECT_EQ(shown({"--since", "60000d"}), "123");
+    EXPECT_EQ(shown({"--since", "4294967295d", "--until", "2199-12-31"}), "123");
+    EXPECT_EQ(shown({"--since", "2199-12-31"}), "");
+}
+
+HOST_TEST(HistoryCommand, PrintsNothingThatATerminalWouldObey) {
+    const std::string hostile =
+        "\x1b]0;x\x07\x9b"
+        "2J\n\r\u202e";
+    cvagent::Event event = kept::event(hostile, cvagent::Event::Kind::alert);
+    event.path = "/oshw/drive:" + hostile;
+    cvagent::Event written = kept::event(hostile, cvagent::Event::Kind::written);
+    written.path = event.path;
+    for (std::string* text : {&written.propertyName, &written.before, &written.after, &written.caller,
+                              &written.wanted, &written.verdict, &written.nodeClass}) {
+        *text = hostile;
+    }
+    cvagent::History history(kept::kPlace);
+    kept::append(history, event);
+    kept::append(history, written);
+    CvagentRun run(host);
+    for (const Finished& shown : {run({"history"}), run({"watch", "--for", "0"})}) {
+        EXPECT_THAT(shown.out, Not(testing::ContainsRegex("[\x01-\x09\x0b-\x1f\x7f-\xff]"))) << shown.out;
+        EXPECT_THAT(shown.out, MatchesRegex("[^\n]*\n[^\n]*\n"));
+        EXPECT_THAT(shown.out, HasSubstr("/oshw/drive:\\x1b]0;x\\x07\\x9b2J\\x0a\\x0d"));
+    }
+    EXPECT_THAT(objects(run({"history", "--json"}).out), SizeIs(2));
 }
 
 HOST_TEST(HistoryCommand, RefusesWhatMeansNothing) {

@@ -193,6 +193,18 @@ HOST_TEST(HistoryFile, WithAHeaderOfZerosGoesOnBeyondAllNumbers) {
     EXPECT_GT(kept::append(history, kept::event("x")), 1700000000U);
 }
 
+HOST_TEST(HistoryFile, ThatLacksATableIsMovedAside) {
+    for (const char* table : {"entries", "runs", "facts"}) {
+        kept::append(*std::make_unique<History>(kPlace), kept::event("x"));
+        Database(kFile, Database::Access::write).execute((std::string("DROP TABLE ") + table).c_str());
+        const std::size_t before = movedAside(host).size();
+        History history(kPlace);
+        kept::append(history, kept::event("y"));
+        EXPECT_THAT(kept::messages(history.read({}, kAll)), ElementsAre("y")) << table;
+        EXPECT_THAT(movedAside(host), SizeIs(before + 1)) << table;
+    }
+}
+
 HOST_TEST(HistoryFile, ThatWasEmptiedGoesOnBeyondAllNumbers) {
     {
         History history(kPlace);

@@ -142,6 +142,26 @@ def write_denied(context):
     expect("alice" in host.sh("cat /opt/vantrel/corvista/data/asset.dat"), "nothing was written")
 
 
+def entries_of_writes(context):
+    """What the journal keeps of each write: {field: value}."""
+    fields = ("PRIORITY", "SYSLOG_IDENTIFIER", "CORVISTA_NODE", "CORVISTA_PROPERTY", "CORVISTA_CALLER_UID",
+              "CORVISTA_VERDICT")
+    text = context.host.sh(f"journalctl --no-pager -o json -u {UNIT} SYSLOG_IDENTIFIER=cvagentd")
+    entries = [json.loads(line) for line in text.splitlines()]
+    return [{name: entry.get(name) for name in fields} for entry in entries if "CORVISTA_VERDICT" in entry]
+
+
+@check("journal: a write that was denied and one that was made are entries with fields of their own")
+def fields(context):
+    nobody = context.host.sh("id -u nobody").strip()
+    common = {"SYSLOG_IDENTIFIER": "cvagentd", "CORVISTA_NODE": "/oshw/root/computer", "CORVISTA_PROPERTY": "OwnerName"}
+    expected = [{**common, "PRIORITY": "4", "CORVISTA_CALLER_UID": nobody, "CORVISTA_VERDICT": "denied"},
+                {**common, "PRIORITY": "5", "CORVISTA_CALLER_UID": "0", "CORVISTA_VERDICT": "applied"}]
+    expect_equal("entries of the two writes before", entries_of_writes(context), expected)
+    found = context.host.sh("journalctl --no-pager -o cat CORVISTA_VERDICT=denied").splitlines()
+    expect_equal("what is found by a field", len(found), 1)
+
+
 @check("cvagent: asks the service, shows what it shows by itself, and keeps one history with it")
 def client(context):
     host = context.host

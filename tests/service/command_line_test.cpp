@@ -160,7 +160,7 @@ HOST_TEST(ServiceClient, ASetIsTheServicesWork) {
 std::string asAlice(const Words& words) {
     return call::asUser(12345, {}, [&words] {
         std::string line;
-        for (const std::string& word : asking(words)) {
+        for (const std::string& word : words) {
             line += "'" + word + "' ";
         }
         std::string told(4096, '\0');
@@ -177,11 +177,29 @@ HOST_TEST(ServiceClient, TellsWhatAUserMayNot) {
     if (call::asUser(12345, {}, [] { return std::string("yes"); }) != "yes") {
         GTEST_SKIP() << "there is no other user";
     }
-    EXPECT_THAT(asAlice({"get", "computer", "HostName"}), HasSubstr("HostName  fake\nstatus 0\n"));
-    const std::string denied = asAlice({"set", "computer", "OwnerName", "alice"});
+    EXPECT_THAT(asAlice(asking({"get", "computer", "HostName"})), HasSubstr("HostName  fake\nstatus 0\n"));
+    const std::string denied = asAlice(asking({"set", "computer", "OwnerName", "alice"}));
     EXPECT_THAT(denied, StartsWith("cvagent: the service does not allow it: "));
     EXPECT_THAT(denied, HasSubstr("status 4\n"));
     EXPECT_THAT(run.diary(), Not(HasSubstr("alice")));
+}
+
+HOST_TEST(ServiceClient, AUserFindsTheServiceOnHisOwnBus) {
+    ServiceRun run(host);
+    run.start();
+    if (call::asUser(12345, {}, [] { return std::string("yes"); }) != "yes") {
+        GTEST_SKIP() << "there is no other user";
+    }
+    host.directory("/run/alice/corvista", 0755);
+    ASSERT_EQ(rename("/run/corvista/bus", "/run/alice/corvista/bus"), 0);
+    const auto doctor = [](const std::string& place) {
+        return Words{"env", "-u", "CORVISTA_BUS", "XDG_RUNTIME_DIR=" + place, CVAGENT_PROGRAM, "doctor"};
+    };
+    EXPECT_THAT(asAlice(doctor("/run/alice")), StartsWith("SERVICE\n  running, version "));
+    for (const char* place : {"run/alice", "/run/alice/../al%69ce", ""}) {
+        EXPECT_THAT(asAlice(doctor(place)), StartsWith("SERVICE\n  not running: ")) << place;
+    }
+    EXPECT_THAT(host.run(doctor("/run/alice")).out, StartsWith("SERVICE\n  not running: "));
 }
 
 HOST_TEST(ServiceClient, AReadWhoseServiceEndsIsMadeByItself) {
@@ -219,6 +237,13 @@ HOST_TEST(ServiceClient, TheDoctorTellsOfTheService) {
                 testing::ContainsRegex("SERVICE\n  running, version 1.0.0\n  since 20.*Z, last full "
                                        "look 20.*Z\n  read by everybody, written by root and the "
                                        "group corvista\n"));
+    const auto report = nlohmann::json::parse(host.run(asking({"doctor", "--json"})).out)["service"];
+    EXPECT_EQ(report["running"], true);
+    EXPECT_EQ(report["problem"], nullptr);
+    EXPECT_EQ(report["version"], "1.0.0");
+    EXPECT_EQ(report["consent"], "group");
+    EXPECT_THAT(report["since"].get<std::string>(), testing::MatchesRegex("20.*Z"));
+    EXPECT_THAT(report["looked"].get<std::string>(), testing::MatchesRegex("20.*Z"));
 }
 
 /// A bus on which anybody may take any name, with somebody on it who took the service's.

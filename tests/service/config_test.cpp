@@ -2,6 +2,10 @@
 
 #include <sys/stat.h>
 
+#include <fstream>
+#include <regex>
+#include <sstream>
+
 #include "agent/core/problem.h"
 #include "agent/service/config.h"
 #include "tests/support/fake_host.h"
@@ -55,6 +59,54 @@ TEST(ServiceConfig, TellsEachWrongLineWithItsNumber) {
     EXPECT_EQ(parseConfig(many).complaints.size(), 20U);
     EXPECT_THAT(parseConfig(std::string("look\0every = 1\n", 15)).complaints,
                 ElementsAre("line 1: there is no key 'look\\x00every'"));
+}
+
+std::string contentOf(const std::string& file) {
+    std::ostringstream text;
+    text << std::ifstream(file).rdbuf();
+    return text.str();
+}
+
+/// What agent.conf(5) says of a key.
+std::string sectionOf(const std::string& key) {
+    const std::string page = contentOf(PACKAGING_DIR "/agent.conf.5");
+    const std::string name = std::regex_replace(key, std::regex("-"), "\\-");
+    const std::size_t start = page.find(".TP\n.B " + name + "\n");
+    return start == std::string::npos ? "" : page.substr(start, page.find("\n.", start + 7) - start);
+}
+
+bool isTaken(const std::string& key, long value) {
+    return parseConfig(key + " = " + std::to_string(value)).complaints.empty();
+}
+
+TEST(ServiceConfig, TheInstalledFileAndThePageSayWhatHolds) {
+    const std::string file = contentOf(PACKAGING_DIR "/agent.conf");
+    const std::regex setting("(^|\n)#([a-z-]+) = (\\S+)");
+    std::string all;
+    for (std::sregex_iterator each(file.begin(), file.end(), setting); each != std::sregex_iterator();
+         ++each) {
+        const std::string key = (*each)[2];
+        const std::string section = sectionOf(key);
+        EXPECT_THAT(section, testing::HasSubstr("Default: " + (*each)[3].str() + ".")) << key;
+        std::smatch bounds;
+        if (std::regex_search(section, bounds, std::regex("([0-9]+) to ([0-9]+)"))) {
+            EXPECT_THAT(file, testing::HasSubstr(bounds.str())) << key;
+            EXPECT_TRUE(isTaken(key, std::stol(bounds[1])) && isTaken(key, std::stol(bounds[2]))) << key;
+            EXPECT_FALSE(isTaken(key, std::stol(bounds[2]) + 1)) << key;
+            EXPECT_TRUE(bounds[1] <= "1" || !isTaken(key, std::stol(bounds[1]) - 1)) << key;
+        }
+        all += key + " = " + (*each)[3].str() + "\n";
+    }
+    const auto read = parseConfig(all);
+    EXPECT_THAT(read.complaints, IsEmpty());
+    const cvagent::service::Config standard;
+    EXPECT_EQ(read.config.lookEvery, standard.lookEvery);
+    EXPECT_EQ(read.config.settlingTime, standard.settlingTime);
+    EXPECT_EQ(read.config.commandTime, standard.commandTime);
+    EXPECT_EQ(read.config.trustedGroup, standard.trustedGroup);
+    EXPECT_EQ(read.config.historyAge, standard.historyAge);
+    EXPECT_EQ(read.config.historyBytes, standard.historyBytes);
+    EXPECT_EQ(std::count(all.begin(), all.end(), '\n'), 6);
 }
 
 std::string problemOf(const std::string& file, bool mustExist = true) {

@@ -15,7 +15,8 @@ if(CORVISTA_SERVICE)
     service/workers_test.cpp
     service/write_test.cpp)
   target_compile_definitions(service_test PRIVATE ${agent_test_programs} CVAGENTD_PROGRAM="$<TARGET_FILE:cvagentd>"
-    HARDWARE_FILE="$<TARGET_FILE:corvistahardware>" INTERFACE_FILE="${CMAKE_SOURCE_DIR}/packaging/com.vantrel.Corvista1.xml")
+    HARDWARE_FILE="$<TARGET_FILE:corvistahardware>" INTERFACE_FILE="${CMAKE_SOURCE_DIR}/packaging/com.vantrel.Corvista1.xml"
+    PACKAGING_DIR="${CMAKE_SOURCE_DIR}/packaging")
   add_dependencies(service_test cvagent cvagentd fake_plugin corvistahardware tiny_front_end)
 
   # With polkit itself, and with one that asks.

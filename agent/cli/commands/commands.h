@@ -2,6 +2,7 @@
 
 #include "agent/cli/failure.h"
 #include "agent/cli/options.h"
+#include "agent/cli/remote/service.h"
 #include "agent/cli/session.h"
 
 /// The commands. Each prints its answer to standard output and returns the exit status; Failure, Problem and
@@ -16,7 +17,8 @@ ExitStatus watch(Session& session, const Options& options);
 ExitStatus verifyTree(Session& session, const Options& options);
 // These need no agent.
 ExitStatus properties(const Options& options);
-ExitStatus doctor(const Options& options);
+/// @param service as it was found with the caller's environment
+ExitStatus doctor(const Options& options, const remote::ServiceReport& service);
 ExitStatus history(const Options& options);
 
 }  // namespace cvagent::commands

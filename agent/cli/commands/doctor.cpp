@@ -79,21 +79,30 @@ std::string pluginLine(const std::string& file, const Style& style) {
 }
 
 /// They are looked at, not loaded.
-std::string plugins(const Options& options, const Style& style) {
-    std::string text = style.strong("PLUG-INS") + "\n";
+json::PluginReport findPlugins(const Options& options) {
     PluginFiles found{options.plugins, {}};
-    if (options.plugins.empty()) {
-        try {
+    json::PluginReport report;
+    try {
+        if (options.plugins.empty()) {
             found = pluginsBesideProgram();
-        } catch (const Problem& problem) {
-            return text + "  " + style.bad(printable(problem.what())) + "\n\n";
         }
+    } catch (const Problem& problem) {
+        report.leftOut.emplace_back(problem.what());
     }
-    for (const std::string& file : found.files) {
+    report.files = found.files;
+    for (const LeftOut& one : found.leftOut) {
+        report.leftOut.emplace_back(one.problem.what());
+    }
+    return report;
+}
+
+std::string pluginLines(const json::PluginReport& report, const Style& style) {
+    std::string text = style.strong("PLUG-INS") + "\n";
+    for (const std::string& file : report.files) {
         text += pluginLine(file, style);
     }
-    for (const LeftOut& one : found.leftOut) {
-        text += "  " + style.bad(printable(one.problem.what())) + "\n";
+    for (const std::string& why : report.leftOut) {
+        text += "  " + style.bad(printable(why)) + "\n";
     }
     return text + "\n";
 }
@@ -102,8 +111,7 @@ const char* consentText(const std::string& consent) {
     return consent == "polkit" ? "whom polkit lets" : "root and the group corvista";
 }
 
-std::string service(const Options& options, const Style& style) {
-    const remote::ServiceReport report = remote::describeService(options);
+std::string serviceLines(const remote::ServiceReport& report, const Style& style) {
     const std::string head = style.strong("SERVICE") + "\n  ";
     if (!report.problem.empty()) {
         return head + printable(report.problem) + "\n\n";
@@ -115,13 +123,14 @@ std::string service(const Options& options, const Style& style) {
 
 }  // namespace
 
-ExitStatus doctor(const Options& options) {
+ExitStatus doctor(const Options& options, const remote::ServiceReport& service) {
     const Style style = Style::detect();
     StopSignals::install();
     const std::vector<ToolReport> reports =
         inspectHostTools(options.hostTools, Look::everything, adapterDirectory());
-    print(options.json ? json::tools(reports)
-                       : service(options, style) + plugins(options, style) + table(reports, style));
+    const json::PluginReport plugins = findPlugins(options);
+    print(options.json ? json::doctor(service, plugins, reports)
+                       : serviceLines(service, style) + pluginLines(plugins, style) + table(reports, style));
     return ExitStatus::done;
 }
 

@@ -41,7 +41,7 @@ int millisecondsTo(std::chrono::steady_clock::time_point end) {
 [[noreturn]] void failHanging(const char* who, std::chrono::seconds longest) {
     throw Failure(ExitStatus::failed, std::string("the ") + who + " has not answered for " +
                                           std::to_string(longest.count()) +
-                                          " s\nLook at it: systemctl status cvagentd");
+                                          " s\nLook at it: systemctl status corvista-agent");
 }
 
 }  // namespace
@@ -193,7 +193,7 @@ void Client::failOtherVersion() {
                   "the service is " + version +
                       " and this is cvagent " CORVISTA_VERSION
                       ": they do not understand each other\nInstall both from one package "
-                      "and restart the service: systemctl restart cvagentd");
+                      "and restart the service: systemctl restart corvista-agent");
 }
 
 }  // namespace cvagent::remote

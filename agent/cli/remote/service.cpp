@@ -22,6 +22,16 @@ constexpr std::uint64_t kMicroseconds = 1000000;
 /// Where cvagentd --private-bus has its own, on hosts without a system bus.
 constexpr const char* kPrivateBus = "unix:path=/run/corvista/bus";
 
+/// Where it has his, when a user has started it; "" for nowhere. No runtime directory has a name that would
+/// have to be escaped.
+std::string ownBus() {
+    constexpr const char* kPlain = "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789-_/.";
+    const char* runtime = std::getenv("XDG_RUNTIME_DIR");
+    const std::string place = runtime != nullptr && geteuid() != 0 ? runtime : "";
+    const bool isPlain = place.starts_with('/') && place.find_first_not_of(kPlain) == std::string::npos;
+    return isPlain ? "unix:path=" + place + "/corvista/bus" : "";
+}
+
 /// In the order in which they are asked.
 std::vector<std::string> addressesOf(const Options& options) {
     const char* named = std::getenv(kBusVariable);
@@ -29,7 +39,14 @@ std::vector<std::string> addressesOf(const Options& options) {
     if (address == "none") {
         return {};
     }
-    return address.empty() ? std::vector<std::string>{"system", kPrivateBus} : std::vector{address};
+    if (!address.empty()) {
+        return {address};
+    }
+    std::vector<std::string> addresses{"system", kPrivateBus};
+    if (std::string own = ownBus(); !own.empty()) {
+        addresses.push_back(std::move(own));
+    }
+    return addresses;
 }
 
 struct Reached {
