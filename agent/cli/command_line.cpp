@@ -86,7 +86,7 @@ CLI::Validator busAddress() {
         "");
 }
 
-void addGlobalOptions(CLI::App& app, Options& options) {
+void addAgentOptions(CLI::App& app, Options& options) {
     app.add_option("--bus", options.bus,
                    "Where to ask the service: on the system's bus (system, the default), at another bus's "
                    "address, or not at all (none). Without a service, and with any of the options below, "
@@ -110,6 +110,9 @@ void addGlobalOptions(CLI::App& app, Options& options) {
         ->check(CLI::Range(0, 1000000));
     app.add_option("--trace", options.traceFile, "Append every line, whatever its level, to this file")
         ->type_name("FILE");
+}
+
+void addCommandOptions(CLI::App& app, Options& options) {
     const std::map<std::string, HostTools> choices{
         {"auto", HostTools::automatic}, {"native", HostTools::native}, {"classic", HostTools::classic}};
     app.add_option(
@@ -318,7 +321,8 @@ std::optional<Options> parseCommandLine(int count, const char* const* words) {
     app.set_version_flag("--version", "cvagent " CORVISTA_VERSION);
     app.require_subcommand(1);
     app.fallthrough();
-    addGlobalOptions(app, options);
+    addAgentOptions(app, options);
+    addCommandOptions(app, options);
     app.add_flag("--json", options.json)->group("");  // accepted in front of the command, too
     addReaders(app, options);
     addWatch(app, options);
