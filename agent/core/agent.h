@@ -88,8 +88,8 @@ public:
         std::vector<unsigned int> ids{};
     };
     /// What is so now of many nodes, side by side. What the plug-in stores once, when it makes a node, and
-    /// does not read again, is asked for (oshw/start_facts.h) or follows from the answers, and is stored anew
-    /// (oshw/stored_facts.h), so that the node is as a start would make it.
+    /// does not read again, is asked for (oshw/start_facts.h), or follows from the answers and is stored anew
+    /// (oshw/stored_facts.h).
     /// @return the readings of each, in the order of the ids; nothing of what the host does not have
     std::vector<std::vector<Reading>> readAnew(const std::vector<Asked>& asked, const Request& request) const;
     /// See Writer::write. What may be written is judged before: see property_words.h.

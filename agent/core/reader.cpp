@@ -41,11 +41,12 @@ private:
 
 std::vector<Reading> Reader::read(const Handle& node, const std::vector<unsigned int>& ids,
                                   Freshness freshness, const Request& request) {
-    if (freshness == Freshness::now) {
+    if (freshness != Freshness::known) {
+        const Source source = freshness == Freshness::anew ? Source::host : Source::plugin;
         std::vector<Question> questions;
         questions.reserve(ids.size());
         for (const unsigned int id : ids) {
-            questions.push_back({node, id});
+            questions.push_back({node, id, source});
         }
         return readNow(questions, request);
     }

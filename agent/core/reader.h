@@ -13,7 +13,8 @@ namespace cvagent {
 /// What a read is content with.
 enum class Freshness {
     known,  ///< what is known, with its age; nothing is asked of the host
-    now,    ///< what is so now
+    now,    ///< what is so now, as far as the plug-in reads it again
+    anew,   ///< the same, and what it asks for at its start alone (oshw/start_facts.h)
 };
 
 /// Reads properties side by side on the pool: most of a read is waiting for the host's tools. Any thread.

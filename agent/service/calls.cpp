@@ -107,6 +107,8 @@ void PendingCall::withCaller(std::function<void(const Caller& caller)> next) con
     const bool asked =
         parts_.callers.find(message_.sender(), [held, go = std::move(next)](const Caller* caller) {
             if (caller == nullptr) {
+                log(Priority::warning, "a call of " + held.message().sender() +
+                                           " is denied: the bus does not tell who calls, or he has gone");
                 held.fail(bus::kAccessDenied, "the bus does not tell who calls");
             } else {
                 held.guarded([&] { go(*caller); });
@@ -218,7 +220,7 @@ void startRead(const CallPointer& call, std::optional<std::uint32_t> node) {
             const std::vector<unsigned int> ids =
                 wanted.empty() ? readableIds(*ref, {})
                                : std::vector<unsigned int>(wanted.begin(), wanted.end());
-            const auto readings = call->parts().agent.read(ref, ids, cvagent::Freshness::now, request);
+            const auto readings = call->parts().agent.read(ref, ids, cvagent::Freshness::anew, request);
             const std::vector<std::string> errors = request.errors().take().texts;
             comeBack(call, [call, id, withheld, readings, errors] {
                 call->parts().model.learn(id, readings);

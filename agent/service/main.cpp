@@ -29,13 +29,17 @@ ExitStatus runGuarded(cvagent::service::Options& options) {
     }
 }
 
-/// Else each of the threads, most of which wait most of the time, would have a heap of its own.
-constexpr int kHeaps = 2;
+/// With a heap for each of its two dozen threads, what one of them has given back is of no use to the others,
+/// and the process grows for days.
+void shareHeaps() {
+    constexpr int kHeaps = 2;
+    mallopt(M_ARENA_MAX, kHeaps);
+}
 
 }  // namespace
 
 int main(int count, char** words) {
-    mallopt(M_ARENA_MAX, kHeaps);
+    shareHeaps();
     cvagent::openStandardDescriptors();
     cvagent::StopSignals::becomeWriteErrors();
     cvagent::service::findJournal();

@@ -15,9 +15,25 @@ bool tellsTheSame(const Reading& one, const Reading& other) {
     return isKnown(one) == isKnown(other) && (!isKnown(one) || one.value == other.value);
 }
 
-/// The readings of a look at some properties, with those of the others as they were.
+const Reading* findReading(const std::vector<Reading>& readings, unsigned int property) {
+    const auto found = std::ranges::lower_bound(readings, property, {}, &Reading::id);
+    return found != readings.end() && found->id == property ? &*found : nullptr;
+}
+
+bool isOlder(const Reading& one, const Reading& other) {
+    return one.asOf && other.asOf && *one.asOf < *other.asOf;
+}
+
+/// The readings of a look, but those that a call has brought since as they were; where it was at some
+/// properties, the others as they were, too.
 std::vector<Reading> merged(const NodeView& look, const std::vector<Reading>& before) {
     std::vector<Reading> all = look.readings;
+    for (Reading& reading : all) {
+        if (const Reading* known = findReading(before, reading.id);
+            known != nullptr && isOlder(reading, *known)) {
+            reading = *known;
+        }
+    }
     if (!look.asked.empty()) {
         for (const Reading& reading : before) {
             if (!std::ranges::binary_search(look.asked, reading.id)) {
@@ -32,8 +48,7 @@ std::vector<Reading> merged(const NodeView& look, const std::vector<Reading>& be
 }  // namespace
 
 const Reading* NodeView::find(unsigned int property) const {
-    const auto found = std::ranges::lower_bound(readings, property, {}, &Reading::id);
-    return found != readings.end() && found->id == property ? &*found : nullptr;
+    return findReading(readings, property);
 }
 
 void Model::apply(Look look) {
@@ -100,9 +115,8 @@ void Model::replace(NodeView& known, NodeView view) {
         }
     }
     for (const Reading& reading : known.readings) {
-        const auto old = std::ranges::lower_bound(before, reading.id, {}, &Reading::id);
-        const bool was = old != before.end() && old->id == reading.id;
-        if (was ? !tellsTheSame(*old, reading) : isKnown(reading)) {
+        const Reading* old = findReading(before, reading.id);
+        if (old != nullptr ? !tellsTheSame(*old, reading) : isKnown(reading)) {
             listener_.propertyChanged(known, propertyNameOf(reading.id, reading.row));
         }
     }
@@ -133,7 +147,7 @@ void Model::takeReading(NodeView& view, const Reading& reading) {
     if (place == view.readings.end() || place->id != reading.id) {
         return;  // what a look does not show is nobody's to see here
     }
-    if (reading.asOf && place->asOf && *reading.asOf < *place->asOf) {
+    if (isOlder(reading, *place)) {
         return;
     }
     const bool same = tellsTheSame(*place, reading);

@@ -7,6 +7,7 @@
 
 #include "agent/bus/reader.h"
 #include "agent/service/introspection.h"
+#include "agent/service/log.h"
 #include "agent/service/members.h"
 #include "agent/service/names.h"
 #include "agent/service/values.h"
@@ -99,14 +100,17 @@ void getOfClass(const CallPointer& call, const Place& place, const std::string& 
         tell();
         return;
     }
-    call->withCaller([call, tell](const Caller& caller) {
-        call->parts().consent.ask(caller, {Audience::trusted, "", false},
-                                  [&](bool allowed, const std::string& reason) {
-                                      if (!allowed) {
-                                          throw bus::Error(bus::kAccessDenied, reason);
-                                      }
-                                      tell();
-                                  });
+    const std::string target = place.node->path + " " + name;
+    call->withCaller([call, tell, target](const Caller& caller) {
+        call->parts().consent.ask(
+            caller, {Audience::trusted, "", false}, [&](bool allowed, const std::string& reason) {
+                if (!allowed) {
+                    log(Priority::warning,
+                        "uid " + std::to_string(caller.user) + " may not read " + target + ": " + reason);
+                    throw bus::Error(bus::kAccessDenied, reason);
+                }
+                tell();
+            });
     });
 }
 

@@ -244,6 +244,7 @@ HOST_TEST_F(ServiceSecrets, AreForRootAndTheGroup) {
     const std::string others = call::asUser(kUser, {}, look);
     EXPECT_THAT(others, Not(HasSubstr("S3CR3T")));
     EXPECT_THAT(others, HasSubstr(std::string("Model 1 ") + kDenied));
+    EXPECT_THAT(run->program().err(), HasSubstr("uid 12345 may not read "));
     EXPECT_THAT(others, HasSubstr("told to root and the trusted group only"));
     const std::string roots = call::asUser(0, {}, look);
     EXPECT_THAT(roots, HasSubstr("Model 1 S3CR3T"));

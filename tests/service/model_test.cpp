@@ -151,4 +151,19 @@ TEST_F(ModelTest, LearnsFromReads) {
     EXPECT_EQ(model.byId(1)->find(8), nullptr) << "a look does not show it";
 }
 
+/// As one that a write has overtaken.
+TEST_F(ModelTest, ALookThatIsOlderThanAReadTakesNothingBack) {
+    const auto now = std::chrono::steady_clock::now();
+    Reading first = known(5, 1);
+    first.asOf = now;
+    look({view(1, "/a", {first, known(6, 1)})});
+    Reading written = known(5, 2);
+    written.asOf = now + std::chrono::seconds(1);
+    model.learn(1, {written});
+    notes.taken();
+    look({view(1, "/a", {first, known(6, 2)})}, false);
+    EXPECT_EQ(model.byId(1)->find(5)->value, written.value);
+    EXPECT_THAT(notes.taken(), ElementsAre("1.Property6"));
+}
+
 }  // namespace

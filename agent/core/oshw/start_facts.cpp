@@ -17,7 +17,7 @@ namespace cvagent::oshw {
 
 namespace {
 
-constexpr unsigned int kInterfaceName = 108;
+constexpr unsigned int kLinkNameId = 108;
 constexpr unsigned int kSupportedSpeed = 38;
 constexpr unsigned int kDhcpServers = 93;
 constexpr unsigned int kPortType = 185;
@@ -46,7 +46,7 @@ void readLines(const std::string& command, const std::function<bool(const std::s
     }
 }
 
-std::optional<std::string> firstLineOf(const std::string& command) {
+std::optional<std::string> firstAnswerOf(const std::string& command) {
     std::optional<std::string> first;
     readLines(command, [&first](const std::string& line) {
         first = line;
@@ -58,8 +58,8 @@ std::optional<std::string> firstLineOf(const std::string& command) {
 /// "1000baseT" of a port whose first mode is 1000baseT/Full.
 std::string firstModeOfPort(const std::string& name) {
     const std::string mode =
-        firstLineOf("ethtool " + name +
-                    " 2> /dev/null | grep \"Supported link modes\" | tr -s ' ' | cut -d ' ' -f4")
+        firstAnswerOf("ethtool " + name +
+                      " 2> /dev/null | grep \"Supported link modes\" | tr -s ' ' | cut -d ' ' -f4")
             .value_or("");
     return mode.substr(0, mode.find('/'));
 }
@@ -105,12 +105,12 @@ IC::PropertyValue wakeOnLanEnabledOf(const std::string& name) {
 /// The servers of both leases; the one of IPv6 is known by its identity, and by the first lease of any link.
 IC::PropertyValue dhcpServersOf(const std::string& name) {
     std::vector<std::string> servers;
-    if (auto server = firstLineOf("cat /var/lib/dhcpcd/dhcpcd-" + name +
-                                  ".info 2> /dev/null | grep DHCPSID | cut -d '=' -f2 2> /dev/null")) {
+    if (auto server = firstAnswerOf("cat /var/lib/dhcpcd/dhcpcd-" + name +
+                                    ".info 2> /dev/null | grep DHCPSID | cut -d '=' -f2 2> /dev/null")) {
         std::erase_if(*server, [](char letter) { return letter == '\'' || letter == '"'; });
         servers.push_back(*server);
     }
-    if (const auto server = firstLineOf(
+    if (const auto server = firstAnswerOf(
             "cat /var/lib/dhcpv6/client6.leases* 2> /dev/null | grep SDUID | cut -d ' ' -f3 2> /dev/null")) {
         servers.push_back(server->substr(0, server->find_last_not_of(';') + 1));
     }
@@ -167,7 +167,7 @@ std::optional<IC::PropertyValue> askStartFact(const IC::MutableNode& node, unsig
         return std::nullopt;
     }
     const Properties stored = storedProperties(node);
-    const auto found = stored.find(kInterfaceName);
+    const auto found = stored.find(kLinkNameId);
     const std::string name = found == stored.end() ? "" : static_cast<std::string>(found->second);
     return stored.contains(fact->mark) && isPlainName(name) ? std::optional(fact->ask(name)) : std::nullopt;
 }

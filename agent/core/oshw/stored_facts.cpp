@@ -4,7 +4,6 @@
 #include <string>
 
 #include "agent/core/node_classes.h"
-#include "agent/core/oshw/start_facts.h"
 
 namespace cvagent::oshw {
 
@@ -72,19 +71,6 @@ void derive(IC::MutableNode& node, std::vector<Reading>& readings) {
     }
 }
 
-/// What was told once and is no more is stored as a value of no kind: nothing can be taken out of the store.
-void storeStartFacts(IC::MutableNode& node, const std::vector<Reading>& readings) {
-    const std::vector<unsigned int> facts = startFacts(node);
-    const Properties stored = storedProperties(node);
-    for (const Reading& reading : readings) {
-        const bool isTold = reading.value.kind() != IC::PropertyValue::none;
-        if (!reading.failed() && std::ranges::find(facts, reading.id) != facts.end() &&
-            (isTold || stored.contains(reading.id))) {
-            node.IC::MutableNode::setProperty(reading.id, reading.value);
-        }
-    }
-}
-
 /// A read that tells no type leaves the plug-in's own value for it.
 void settleAddressType(const IC::MutableNode& node, std::vector<Reading>& readings) {
     Reading* type = isOf(node, NodeType::ipConfig) ? findReading(readings, kIpv6AddressType) : nullptr;
@@ -114,7 +100,6 @@ void storeAnew(IC::MutableNode& node, std::vector<Reading>& readings) {
     keepStored(node, readings);
     derive(node, readings);
     settleAddressType(node, readings);
-    storeStartFacts(node, readings);
     const Reading* state = isOf(node, NodeType::networkPort) ? findReading(readings, kPortState) : nullptr;
     if (state != nullptr && !state->failed() && state->value.kind() == IC::PropertyValue::number) {
         node.setStatus(static_cast<unsigned int>(state->value));
