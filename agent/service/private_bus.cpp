@@ -62,9 +62,11 @@ struct Limit {
     const char* name;
     long value;
 };
-/// A reader that stops costs the daemon what may wait for him, and nobody else anything.
-constexpr std::array<Limit, 12> kLimits = {{{"max_outgoing_bytes", 4L << 20},
-                                            {"max_incoming_bytes", 4L << 20},
+/// A reader that stops costs the daemon what may wait for him (outgoing), and nobody else anything. What the
+/// agent has sent and nobody has read counts as incoming, and at that limit the daemon listens to the agent
+/// no more: it lies beyond what may wait for all connections together.
+constexpr std::array<Limit, 12> kLimits = {{{"max_outgoing_bytes", 1L << 20},
+                                            {"max_incoming_bytes", 2047L << 20},
                                             {"max_message_size", 32L << 20},
                                             {"max_completed_connections", 512},
                                             {"max_incomplete_connections", 256},

@@ -359,6 +359,20 @@ HOST_TEST(ServiceClient, TellsWhatFailsInTheService) {
     }
 }
 
+HOST_TEST(ServiceClient, AWriteWhoseServiceEndsBeforeIsNotMadeAtAll) {
+    Impostor other(host, 0);
+    other.answer([](bus::Connection& own, const bus::Message& call) {
+        if (call.member() == "Find") {
+            _exit(0);
+        }
+        answerWithText(own, call);
+    });
+    const Finished run = host.run(asking({"set", "computer", "OwnerName", "a"}, Impostor::kAddress));
+    EXPECT_EQ(run.status, 1);
+    EXPECT_THAT(run.err, testing::EndsWith("; nothing was done\n"));
+    EXPECT_EQ(run.out, "");
+}
+
 HOST_TEST(ServiceClient, DoesNotWaitForAServiceThatHangs) {
     ServiceRun run(host);
     run.start();

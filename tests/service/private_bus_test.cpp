@@ -57,6 +57,27 @@ HOST_TEST(PrivateBus, TakesThePlaceOfWhatWasLeft) {
     EXPECT_EQ(host.read("/srv/theirs"), "kept");
 }
 
+/// Whatever was sent to them and not read waits with the daemon.
+HOST_TEST(PrivateBus, ReadersThatNeverReadHoldNobodyUp) {
+    ServiceRun run(host);
+    run.telling("drives").start();
+    std::vector<std::unique_ptr<bus::Connection>> silent;
+    std::vector<bus::Slot> waiting;
+    for (int reader = 0; reader < 8; ++reader) {
+        silent.push_back(std::make_unique<bus::Connection>(ServiceRun::address()));
+    }
+    constexpr const char* kManager = "org.freedesktop.DBus.ObjectManager";
+    for (int round = 0; round < 120; ++round) {
+        for (const auto& one : silent) {
+            waiting.push_back(
+                one->askLater(call::make(*one, ServiceRun::kRoot, kManager, "GetManagedObjects"),
+                              std::chrono::hours(1), [](const bus::Message&) {}));
+            one->flush();
+        }
+        ASSERT_FALSE(call::ask(run.bus(), ServiceRun::kRoot, kManager, "GetManagedObjects").isError());
+    }
+}
+
 /// The daemon lets nobody in whom the host does not know.
 HOST_TEST(PrivateBus, NeedsItsUserToBeKnown) {
     host.realTool("dbus-daemon");

@@ -126,6 +126,7 @@ void EventFeed::signalled(const std::string& owner, const bus::Message& signal) 
     }
 }
 
+/// A signal may have come while its event was asked for.
 void EventFeed::tellPending(Client& client) {
     while (!pending_.empty()) {
         const NumberedEvent event = std::move(pending_.front());
@@ -162,9 +163,6 @@ void EventFeed::catchUp(Client& client) {
 }
 
 void EventFeed::tell(const NumberedEvent& event) {
-    if (event.number <= last_) {
-        return;
-    }
     last_ = event.number;
     const std::lock_guard lock(guard_);
     for (const auto& subscriber : subscribers_) {
