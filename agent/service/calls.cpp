@@ -220,7 +220,7 @@ void startRead(const CallPointer& call, std::optional<std::uint32_t> node) {
             const std::vector<unsigned int> ids =
                 wanted.empty() ? readableIds(*ref, {})
                                : std::vector<unsigned int>(wanted.begin(), wanted.end());
-            const auto readings = call->parts().agent.read(ref, ids, cvagent::Freshness::anew, request);
+            const auto readings = call->parts().agent.read(ref, ids, Freshness::anew, request);
             const std::vector<std::string> errors = request.errors().take().texts;
             comeBack(call, [call, id, withheld, readings, errors] {
                 call->parts().model.learn(id, readings);
