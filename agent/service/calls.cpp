@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <array>
+#include <iterator>
 #include <limits>
 #include <utility>
 
@@ -169,8 +170,8 @@ void answerEvents(const PendingCall& call, std::uint64_t after, const std::vecto
     const std::uint64_t missing = events.empty() ? 0 : events.front().number - after - 1;
     call.answer([&](bus::Writer& writer) {
         writer.array(kEventType, [&] {
-            for (std::size_t i = 0; i < std::min(events.size(), kMostEvents); ++i) {
-                putEvent(writer, events[i]);
+            for (const Event& event : events) {
+                putEvent(writer, event);
             }
         });
         writer.put(std::min(dropped, missing));
@@ -179,8 +180,10 @@ void answerEvents(const PendingCall& call, std::uint64_t after, const std::vecto
 
 void findEvents(const CallPointer& call, const Caller& caller) {
     const std::uint64_t after = bus::Reader(call->message()).longNumber();
-    const Subscription::Taken taken = call->parts().agent.subscribe(after)->take();
-    std::vector<Event> events(taken.events.begin(), taken.events.end());
+    Subscription::Taken taken = call->parts().agent.subscribe(after)->take();
+    const auto count = static_cast<long>(std::min(taken.events.size(), kMostEvents));
+    std::vector<Event> events(std::move_iterator(taken.events.begin()),
+                              std::move_iterator(taken.events.begin() + count));
     const std::uint64_t upTo =
         events.empty() ? std::numeric_limits<std::int64_t>::max() : events.front().number - 1;
     if (taken.dropped == 0 || !call->parts().past || after >= upTo) {
@@ -189,9 +192,8 @@ void findEvents(const CallPointer& call, const Caller& caller) {
     }
     submit(call, call->parts().readers, caller, [call, after, upTo, events, dropped = taken.dropped] {
         std::vector<Event> all = call->parts().past(after, upTo, kMostEvents);
-        if (all.size() < kMostEvents) {
-            all.insert(all.end(), events.begin(), events.end());
-        }
+        const std::size_t more = std::min(events.size(), kMostEvents - std::min(all.size(), kMostEvents));
+        all.insert(all.end(), events.begin(), events.begin() + static_cast<long>(more));
         comeBack(call, [call, after, all, dropped] { answerEvents(*call, after, all, dropped); });
     });
 }
@@ -220,7 +222,7 @@ void startRead(const CallPointer& call, std::optional<std::uint32_t> node) {
             const std::vector<unsigned int> ids =
                 wanted.empty() ? readableIds(*ref, {})
                                : std::vector<unsigned int>(wanted.begin(), wanted.end());
-            const auto readings = call->parts().agent.read(ref, ids, cvagent::Freshness::anew, request);
+            const auto readings = call->parts().agent.read(ref, ids, Freshness::anew, request);
             const std::vector<std::string> errors = request.errors().take().texts;
             comeBack(call, [call, id, withheld, readings, errors] {
                 call->parts().model.learn(id, readings);

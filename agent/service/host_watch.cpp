@@ -42,9 +42,9 @@ HostChange changeOf(const HeardNews& heard, const HostLinks& links) {
 
 }  // namespace
 
-HostWatch::HostWatch(Loop& loop, Freshness& freshness)
+HostWatch::HostWatch(Loop& loop, Looker& looker)
     : loop_(loop),
-      freshness_(freshness),
+      looker_(looker),
       routes_(NETLINK_ROUTE, kRouteGroups),
       devices_(NETLINK_KOBJECT_UEVENT, kDeviceGroups) {
     take();
@@ -89,7 +89,7 @@ void HostWatch::take() {
     change.drives = drives || lostDevices;
     if (change.any()) {
         change.links = std::make_shared<const HostLinks>(links_);
-        freshness_.hear(change);
+        looker_.hear(change);
     }
     pauseListening(lost || incomplete_ ? kPauseOfLost : kPause);
 }

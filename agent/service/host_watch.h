@@ -11,7 +11,7 @@ namespace cvagent::service {
 class HostWatch {
 public:
     /// Both outlive it. It begins with what links there are.
-    HostWatch(Loop& loop, Freshness& freshness);
+    HostWatch(Loop& loop, Looker& looker);
 
 private:
     void listen();
@@ -20,7 +20,7 @@ private:
     void pauseListening(std::chrono::milliseconds time);
 
     Loop& loop_;
-    Freshness& freshness_;
+    Looker& looker_;
     Announcements routes_;
     Announcements devices_;
     HostLinks links_;

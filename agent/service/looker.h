@@ -19,28 +19,10 @@
 
 namespace cvagent::service {
 
-/// What the service does not know any more because the host has changed; whoever hears of that tells it here.
-/// Any thread.
-class Freshness {
-public:
-    virtual ~Freshness() = default;
-    /// A node's facts may be others by now; it may also be new. It is looked at soon, once for all tellings
-    /// until then.
-    virtual void lookAgain(std::uint32_t node) = 0;
-    /// The agent itself has written to a node: what that may have changed is looked at as soon as may be.
-    virtual void wrote(std::uint32_t node) = 0;
-    /// Anything may be different.
-    virtual void lookAtAll() = 0;
-    /// The kernel has announced something. Links come with it, as they are now.
-    virtual void hear(const HostChange& change) = 0;
-    /// An alert has come of a node, which tells it apart from one that nobody heard of.
-    virtual void alertCame(std::uint32_t node) = 0;
-};
-
 /// Looks at nodes on a thread of its own: once for all that is told until nothing has come for the settling
 /// time, or for five times as long, but a second at most, or until the agent has written; and for no more
 /// than half of the time.
-class Looker : public Freshness {
+class Looker {
 public:
     using Clock = std::chrono::steady_clock;
 
@@ -51,7 +33,7 @@ public:
     Looker(const Looker&) = delete;
     Looker& operator=(const Looker&) = delete;
     /// Waits for a look that is under way.
-    ~Looker() override;
+    ~Looker();
 
     /// The first one, on the calling thread: what the plug-ins stored at their start is that new.
     /// @param linksBefore those that there were ahead of that start
@@ -60,11 +42,19 @@ public:
     /// No further look begins.
     void stop();
 
-    void lookAgain(std::uint32_t node) override;
-    void wrote(std::uint32_t node) override;
-    void lookAtAll() override;
-    void hear(const HostChange& change) override;
-    void alertCame(std::uint32_t node) override;
+    // What is not known any more because the host has changed; whoever hears of that tells it. Any thread.
+    /// A node's facts may be others by now; it may also be new. It is looked at soon, once for all tellings
+    /// until then.
+    void lookAgain(std::uint32_t node);
+    /// The agent itself has written to a node: what that may have changed is looked at as soon as may be.
+    void wrote(std::uint32_t node);
+    /// Anything may be different.
+    void lookAtAll();
+    /// The kernel has announced something. Links come with it, as they are now.
+    void hear(const HostChange& change);
+    /// An alert has come of a node, which tells it apart from one that nobody heard of.
+    void alertCame(std::uint32_t node);
+
     /// How long tellings are gathered before a look.
     void setSettlingTime(std::chrono::milliseconds time) { settling_ = time; }
     /// How many looks have begun.

@@ -1,5 +1,7 @@
 #include "agent/service/service.h"
 
+#include <malloc.h>
+
 #include <utility>
 
 #include "agent/bus/reader.h"
@@ -103,11 +105,15 @@ void Service::armLook() {
     }
 }
 
+/// What is free between pieces that live long adds up over the days; a look at everything is a good time to
+/// give it back.
 void Service::take(Look look) {
-    if (look.whole) {
-        standing_.lookedAt = wallClock();
-    }
+    const bool isWhole = look.whole;
     model_.apply(std::move(look));
+    if (isWhole) {
+        standing_.lookedAt = wallClock();
+        malloc_trim(0);
+    }
 }
 
 void Service::takeEvents() {

@@ -35,8 +35,6 @@ public:
     void windDown();
     /// Whether a write waits or is at work.
     bool isWriting() const { return writers_.isBusy(); }
-    /// Whoever hears of changes of the host tells them here.
-    Freshness& freshness() { return looker_; }
     std::size_t nodes() const { return model_.all().size(); }
 
 private:

@@ -14,12 +14,9 @@ constexpr std::chrono::milliseconds kNextTurn{2};
 }  // namespace
 
 bool Turns::submit(std::uint32_t user, Work work) {
-    const auto own = waiting_.find(user);
-    if (count_ >= kMostTurns || (own != waiting_.end() && own->second.size() >= kTurnsOfOne)) {
+    if (!waiting_.add(user, std::move(work), kTurnsOfOne, kMostTurns)) {
         return false;
     }
-    waiting_[user].push_back(std::move(work));
-    ++count_;
     if (!timer_) {
         proceed();
     }
@@ -30,26 +27,11 @@ bool Turns::submit(std::uint32_t user, Work work) {
 void Turns::proceed() {
     timer_.reset();
     if (connection_.unsent() == 0) {
-        next()();
+        waiting_.takeNext()();
     }
-    if (count_ > 0) {
+    if (waiting_.size() > 0) {
         timer_ = loop_.after(kNextTurn, [this] { proceed(); });
     }
-}
-
-Turns::Work Turns::next() {
-    auto user = waiting_.upper_bound(last_);
-    if (user == waiting_.end()) {
-        user = waiting_.begin();
-    }
-    last_ = user->first;
-    Work work = std::move(user->second.front());
-    user->second.pop_front();
-    if (user->second.empty()) {
-        waiting_.erase(user);
-    }
-    --count_;
-    return work;
 }
 
 }  // namespace cvagent::service

@@ -1,13 +1,11 @@
 #pragma once
 
-#include <cstddef>
 #include <cstdint>
-#include <deque>
 #include <functional>
-#include <map>
 
 #include "agent/bus/connection.h"
 #include "agent/service/loop.h"
+#include "agent/service/turn_queue.h"
 
 namespace cvagent::service {
 
@@ -24,14 +22,11 @@ public:
 
 private:
     void proceed();
-    Work next();
 
     const bus::Connection& connection_;
     Loop& loop_;
     Loop::Source timer_;
-    std::map<std::uint32_t, std::deque<Work>> waiting_;  // by user
-    std::size_t count_ = 0;
-    std::uint32_t last_ = 0;
+    TurnQueue<Work> waiting_;
 };
 
 }  // namespace cvagent::service

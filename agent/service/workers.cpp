@@ -13,36 +13,31 @@ Workers::~Workers() {
 }
 
 void Workers::stop() {
-    std::map<std::uint32_t, std::deque<Job>> dropped;  // they go outside of the lock
+    TurnQueue<Job> dropped;  // they go outside of the lock
     {
         const std::lock_guard lock(guard_);
         stopped_ = true;
-        count_ = 0;
-        dropped.swap(waiting_);
+        std::swap(dropped, waiting_);
     }
     changed_.notify_all();
 }
 
 bool Workers::isBusy() const {
     const std::lock_guard lock(guard_);
-    return count_ > 0 || atWork_ > 0;
+    return waiting_.size() > 0 || atWork_ > 0;
 }
 
 bool Workers::submit(std::uint32_t user, Job job) {
     const std::lock_guard lock(guard_);
-    const auto own = waiting_.find(user);
-    const std::size_t ofOne = own == waiting_.end() ? 0 : own->second.size();
-    if (stopped_ || count_ >= limits_.waiting || ofOne >= limits_.waitingOfOne) {
+    if (stopped_) {
         return false;
     }
-    if (atWork_ + count_ >= threads_.size() && threads_.size() < limits_.threads) {
+    if (atWork_ + waiting_.size() >= threads_.size() && threads_.size() < limits_.threads) {
         startThread();
     }
-    if (threads_.empty()) {
+    if (threads_.empty() || !waiting_.add(user, std::move(job), limits_.waitingOfOne, limits_.waiting)) {
         return false;
     }
-    waiting_[user].push_back(std::move(job));
-    ++count_;
     changed_.notify_one();
     return true;
 }
@@ -55,29 +50,14 @@ void Workers::startThread() {
     }
 }
 
-Workers::Job Workers::next() {
-    auto user = waiting_.upper_bound(last_);
-    if (user == waiting_.end()) {
-        user = waiting_.begin();
-    }
-    last_ = user->first;
-    Job job = std::move(user->second.front());
-    user->second.pop_front();
-    if (user->second.empty()) {
-        waiting_.erase(user);
-    }
-    --count_;
-    return job;
-}
-
 void Workers::run() {
     std::unique_lock lock(guard_);
     while (true) {
-        changed_.wait(lock, [this] { return stopped_ || count_ > 0; });
+        changed_.wait(lock, [this] { return stopped_ || waiting_.size() > 0; });
         if (stopped_) {
             return;
         }
-        Job job = next();
+        Job job = waiting_.takeNext();
         ++atWork_;
         lock.unlock();
         job();

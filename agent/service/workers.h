@@ -2,12 +2,12 @@
 
 #include <condition_variable>
 #include <cstdint>
-#include <deque>
 #include <functional>
-#include <map>
 #include <mutex>
 #include <thread>
 #include <vector>
+
+#include "agent/service/turn_queue.h"
 
 namespace cvagent::service {
 
@@ -37,16 +37,13 @@ public:
 
 private:
     void run();
-    Job next();
     void startThread();
 
     const Limits limits_;
     mutable std::mutex guard_;  // guards everything below
     std::condition_variable changed_;
-    std::map<std::uint32_t, std::deque<Job>> waiting_;  // no empty ones
-    std::size_t count_ = 0;                             // of those
+    TurnQueue<Job> waiting_;
     std::size_t atWork_ = 0;
-    std::uint32_t last_ = 0;  // who had the last turn
     bool stopped_ = false;
     std::vector<std::thread> threads_;
 };

@@ -27,7 +27,8 @@
 //   drives                  there are twenty drives more
 //   chatter                 the thread of churn reports an error each time
 //   foreignids              initialize numbers its nodes from 1, whatever the agent says
-// CORVISTA_FAKE_PLUGIN_HOLD names a file: while it is there, what waits for it hangs.
+// CORVISTA_FAKE_PLUGIN_HOLD names a file: while it is there, what waits for it hangs, and says so by a file
+// with .reached behind that name.
 // CORVISTA_FAKE_PLUGIN_DIARY names a file that gets a line for each write and for the unload.
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -112,6 +113,9 @@ bool isHeld() {
 }
 
 void waitWhileHeld() {
+    if (isHeld()) {
+        std::ofstream(std::getenv("CORVISTA_FAKE_PLUGIN_HOLD") + std::string(".reached")).flush();
+    }
     while (isHeld()) {
         std::this_thread::sleep_for(std::chrono::milliseconds(1));
     }

@@ -207,7 +207,7 @@ HOST_TEST(ServiceClient, AReadWhoseServiceEndsIsMadeByItself) {
     run.start();
     host.file("/var/hold", "");
     RunningProgram get = host.start(asking({"get", "computer", "904"}));
-    std::this_thread::sleep_for(std::chrono::milliseconds(100));
+    EXPECT_TRUE(eventually([&] { return host.exists("/var/hold.reached"); }));
     run.program().signal(SIGKILL);
     const Finished done = get.wait();
     EXPECT_THAT(done.err, HasSubstr("; cvagent looks by itself\n"));
@@ -263,7 +263,14 @@ public:
             "<allow eavesdrop='true'/></policy></busconfig>");
         bus_.emplace(std::vector<std::string>{"dbus-daemon", "--config-file=/etc/any.conf", "--nofork"},
                      "/var/any");
-        eventually([&host] { return host.exists("/run/any"); });
+        eventually([] {  // its socket is there before it listens
+            try {
+                const bus::Connection first(kAddress);
+                return !first.uniqueName().empty();
+            } catch (const bus::Error&) {
+                return false;
+            }
+        });
     }
     ~Impostor() {
         if (child_ > 0) {

@@ -77,7 +77,7 @@ IC::PropertyValue portTypeOf(const std::string& name) {
     const std::string mode = firstModeOfPort(name);
     const Property* row = findProperty(static_cast<unsigned int>(NodeType::networkPort), kPortType);
     for (const Label& label : row->labels) {
-        if (label.code != 0 && strcasecmp(label.text, mode.c_str()) == 0) {
+        if (strcasecmp(label.text, mode.c_str()) == 0) {
             return {IC::Number(label.code), true};
         }
     }
