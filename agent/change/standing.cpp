@@ -2,7 +2,9 @@
 
 #include <algorithm>
 #include <ctime>
+#include <filesystem>
 #include <iterator>
+#include <system_error>
 
 #include "agent/change/interface_settings.h"
 #include "agent/change/ip.h"
@@ -53,6 +55,14 @@ bool isSameText(const IC::PropertyValue& value, const IC::PropertyValue& read) {
     return wanted == found || (ip && ip == Ip::parse(found));
 }
 
+/// Hosts without this file have their name, which is as wanted, in another one.
+bool isKeptElsewhere(const Property& row, const IC::PropertyValue& value, const IC::PropertyValue& read) {
+    constexpr unsigned int kNames[] = {97, 98};
+    std::error_code unknown;
+    return isAmong(row, kNames) && isSameText(value, read) &&
+           !std::filesystem::exists("/etc/HOSTNAME", unknown);
+}
+
 bool isSameTime(const IC::PropertyValue& value, const IC::PropertyValue& read) {
     const long wanted = QX::DateTime(static_cast<std::string>(value), 3);
     const auto found = QX::wholeNumber<long>(static_cast<std::string>(read));
@@ -79,7 +89,8 @@ std::vector<std::string> plainWords(const Reading& reading) {
     }
     const std::string text = static_cast<std::string>(reading.value);
     const auto minutes = QX::wholeNumber<int>(text);
-    const bool isSummers = reading.row->type == NodeType::computer && reading.row->id == kZoneOffset && isSummer();
+    const bool isSummers =
+        reading.row->type == NodeType::computer && reading.row->id == kZoneOffset && isSummer();
     return {isSummers && minutes ? std::to_string(*minutes - kSummerTime) : text};
 }
 
@@ -110,7 +121,7 @@ Standing standingOf(const IC::MutableNode& node, const Property& row, const IC::
     if (effect != nullptr) {
         const NodeRef copy = named(node);
         const std::string lacking = effect->lacking({*copy, value, &reading.value});
-        if (!lacking.empty()) {
+        if (!lacking.empty() && !isKeptElsewhere(row, value, reading.value)) {
             return {WriteResult::differs, lacking};
         }
     }

@@ -87,14 +87,15 @@ void verifyWithin(Session& session, const std::vector<MeantChange>& changes, std
         Clock::now() + std::chrono::duration_cast<Clock::duration>(std::chrono::duration<double>(seconds));
     std::vector<bool> isLost(changes.size());  // changed back once: that is told, whatever comes then
     do {
+        bool isAny = false;
         for (std::size_t i = 0; i < changes.size(); ++i) {
             const bool wasSo = outcomes[i].kind == Outcome::applied;
             if (isWatched(outcomes[i]) && !isLost[i]) {
                 look(session, changes[i], outcomes[i], request);
                 isLost[i] = wasSo && outcomes[i].kind == Outcome::differs;
+                isAny = isAny || (isWatched(outcomes[i]) && !isLost[i]);
             }
         }
-        const bool isAny = std::ranges::any_of(outcomes, isWatched);
         if (!isAny || Clock::now() + kBetweenLooks > deadline) {
             return;
         }

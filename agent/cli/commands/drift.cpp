@@ -17,7 +17,7 @@ using Json = nlohmann::ordered_json;
 constexpr unsigned int kOrigin = 24;
 constexpr const char* kFixedOrigin = "3";
 
-/// Null for a node whose addresses are somebody else's.
+/// Else its addresses are somebody else's.
 bool hasFixedOrigin(const std::vector<Reading>& readings) {
     const auto origin = std::ranges::find(readings, kOrigin, &Reading::id);
     return origin != readings.end() && !origin->failed() &&
@@ -34,6 +34,12 @@ std::vector<std::string> writableIds(const IC::MutableNode& node) {
     return ids;
 }
 
+/// What is so for the moment only, without a file that has it, could not be told from drift.
+bool isSo(const IC::MutableNode& node, const Reading& reading, const std::vector<std::string>& words) {
+    const IC::PropertyValue value = acceptedValue(*reading.row, words);
+    return change::standingOf(node, *reading.row, value, reading).outcome == WriteResult::applied;
+}
+
 /// What the host has in common for all its interfaces is exported once.
 using Exported = std::set<std::pair<std::string, std::vector<std::string>>>;
 
@@ -46,7 +52,8 @@ void exportNode(Session& session, const NodeRef& node, const Request& request, E
     const std::vector<Reading> readings = session.read(node, ids, request);
     for (const Reading& reading : readings) {
         const auto words = change::wordsToSetBack(reading);
-        if (!words || (change::needsFixedOrigin(*reading.row) && !hasFixedOrigin(readings)) ||
+        if (!words || !isSo(*node, reading, *words) ||
+            (change::needsFixedOrigin(*reading.row) && !hasFixedOrigin(readings)) ||
             (change::isHosts(*reading.row) && !ofHost.insert({reading.row->name, *words}).second)) {
             continue;
         }
