@@ -2,7 +2,7 @@
 
 #include <sched.h>
 
-#include <algorithm>
+#include <memory>
 
 #include "agent/change/cannot.h"
 #include "agent/change/kernel_state.h"
@@ -67,7 +67,8 @@ Plan attempt(const RehearsalRequest& request, const Isolation& isolation) {
     shell::hearCommands(hear);
     AgentSettings settings = process.agentSettings();
     settings.plugins = plugins;
-    const Agent agent(settings);
+    // Its end would wait for monitors and take the nodes away, one by one; the process just ends.
+    const Agent& agent = *std::make_unique<Agent>(settings).release();
     // The threads that write are made later and inherit it.
     must(setns(isolation.network.handle.get(), CLONE_NEWNET), "the network's copy cannot be entered");
     Plan plan;

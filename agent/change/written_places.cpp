@@ -10,6 +10,7 @@
 #include <optional>
 
 #include "agent/change/directory.h"
+#include "agent/change/mount_calls.h"
 #include "agent/shell/mounts.h"
 #include "hosttools/descriptor.h"
 
@@ -22,6 +23,7 @@ using hosttools::Descriptor;
 
 constexpr const char* kSettings = "/opt/vantrel/corvista/data";
 constexpr const char* kLinkDirectories[] = {"/etc", "/etc/sysconfig", "/etc/sysconfig/network"};
+constexpr std::string_view kWithoutFiles[] = {"proc", "sysfs", "devtmpfs", "devpts", "cgroup", "cgroup2"};
 constexpr int kMostLinks = 40;  // as the kernel counts
 
 std::deque<std::string> namesOf(const std::string& path) {
@@ -71,6 +73,17 @@ std::optional<std::string> directoryOf(const std::string& path) {
     return reached;
 }
 
+/// Whether a directory lies on a file system that holds files, unlike /proc, where /etc/mtab leads.
+bool holdsFiles(const std::string& directory) {
+    MountPoint innermost;
+    for (const MountPoint& mount : mountPoints()) {
+        if (isBelow(directory, mount.path) && mount.path.size() >= innermost.path.size()) {
+            innermost = mount;
+        }
+    }
+    return std::ranges::find(kWithoutFiles, innermost.type) == std::end(kWithoutFiles);
+}
+
 /// Where it is, or the nearest directory above that is there.
 std::string existing(const std::string& path) {
     fs::path place = path;
@@ -90,7 +103,7 @@ void addLinkTargets(const std::string& directory, std::vector<std::string>& plac
         if (lstat(path.c_str(), &link) != 0 || !S_ISLNK(link.st_mode)) {
             continue;
         }
-        if (auto target = directoryOf(path); target && *target != "/") {
+        if (auto target = directoryOf(path); target && *target != "/" && holdsFiles(*target)) {
             places.push_back(*std::move(target));
         }
     }
