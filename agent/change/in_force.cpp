@@ -45,12 +45,24 @@ public:
 
 private:
     bool add() {
+        if (ip_.isIpv6) {
+            makeRoom();
+        }
         const int problem = addAddress(scene_.link, ip_, prefix_);
         if (problem != 0) {
             effect_.lacking =
                 "the running host does not take " + shown(ip_, prefix_) + ": " + reason(problem);
         }
         return problem == 0;
+    }
+
+    /// The kernel keeps one IPv6 address of a kind, with the prefix length that it had first.
+    void makeRoom() const {
+        for (const KernelAddress& each : KernelNetwork::read().addresses) {
+            if (each.link == scene_.link.index && each.ip == ip_) {
+                remove(each);
+            }
+        }
     }
 
     static std::string shown(const Ip& ip, unsigned prefix) {
@@ -87,8 +99,9 @@ private:
         }
         const KernelNetwork now = KernelNetwork::read();
         for (const KernelAddress& each : now.addresses) {
-            const bool isInFront = each.link == scene_.link.index && !each.ip.isIpv6 && !isWanted(each) &&
-                                   each.label == scene_.link.name;
+            const bool isRival = each.label == scene_.link.name || each.ip.sharesPrefix(ip_, prefix_);
+            const bool isInFront =
+                each.link == scene_.link.index && !each.ip.isIpv6 && !isWanted(each) && isRival;
             if (isWanted(each) && each.link == scene_.link.index) {
                 break;
             }

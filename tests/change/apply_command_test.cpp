@@ -54,7 +54,8 @@ HOST_TEST(ApplyCommand, ChangesNothingASecondTime) {
 HOST_TEST(ApplyCommand, TellsWhatBecameOfEachAsJson) {
     host.file("/root/changes", "[" + changeOf("computer", "OwnerContact", "room 6") + "," +
                                    changeOf("computer", "OwnerName", "bob") + "]");
-    const Finished run = CvagentRun(host)({"apply", "/root/changes", "--json", "--verify-within", "0"});
+    const Finished run =
+        CvagentRun(host)({"apply", "/root/changes", "--json", "--force", "--verify-within", "0"});
     EXPECT_EQ(run.status, 1);
     const Json changes = Json::parse(run.out)["changes"];
     ASSERT_EQ(changes.size(), 2U);
@@ -70,11 +71,21 @@ HOST_TEST(ApplyCommand, StopsAtTheFirstThatFails) {
     host.file("/root/changes", "[" + changeOf("computer", "OwnerName", "bob") + "," +
                                    changeOf("computer", "TimeZoneOffset", -60) + "]");
     CvagentRun cvagent(host);
-    const Finished run = cvagent({"apply", "/root/changes", "--verify-within", "0"});
+    const Finished run = cvagent({"apply", "/root/changes", "--force", "--verify-within", "0"});
     EXPECT_EQ(run.status, 1);
     EXPECT_THAT(run.out, HasSubstr("failed     /oshw/root/computer OwnerName"));
     EXPECT_THAT(run.out, HasSubstr("not made   /oshw/root/computer TimeZoneOffset\n"));
     EXPECT_THAT(cvagent.diary(), Not(HasSubstr("127=")));
+}
+
+HOST_TEST(ApplyCommand, DoesNothingOfWhatFailsWhenItIsTriedOut) {
+    host.file("/root/changes", "[" + changeOf("computer", "OwnerContact", "x") + "," +
+                                   changeOf("computer", "OwnerName", "bob") + "]");
+    CvagentRun cvagent(host);
+    const Finished run = cvagent({"apply", "/root/changes"});
+    EXPECT_EQ(run.status, 1);
+    EXPECT_THAT(run.err, HasSubstr("tried out, it fails: OwnerName was not changed: the disk is full"));
+    EXPECT_EQ(cvagent.diary(), kUntouched);
 }
 
 HOST_TEST(ApplyCommand, JudgesAllOfAFileBeforeAnythingIsDone) {
@@ -127,12 +138,13 @@ HOST_TEST(ExportCommand, WritesWhatDiffFindsSo) {
     const Finished exported = suse.run({"export"});
     ASSERT_EQ(exported.status, 0) << exported.err;
     std::set<std::string> names;
-    for (const Json& change : Json::parse(exported.out)["changes"]) {
+    const Json document = Json::parse(exported.out);
+    for (const Json& change : document["changes"]) {
         names.insert(change["property"].get<std::string>());
     }
-    EXPECT_EQ(names, (std::set<std::string>{"OwnerContact", "OwnerName", "TimeZoneOffset", "IPOrigin",
-                                            "IPv4Address", "SubnetMask", "DNSServers", "HostName",
-                                            "DomainName", "DNSSuffixes", "IPv4Gateway"}));
+    EXPECT_EQ(names,
+              (std::set<std::string>{"TimeZoneOffset", "IPOrigin", "IPv4Address", "SubnetMask", "DNSServers",
+                                     "HostName", "DomainName", "DNSSuffixes", "IPv4Gateway"}));
     EXPECT_THAT(suse.changes(), IsEmpty());
     host.file("/root/changes", exported.out);
     const Finished same = suse.run({"diff", "/root/changes"});
@@ -190,7 +202,7 @@ protected:
         host.useKernelNetwork();
         host.setHostName("linux");
         host.file("/etc/HOSTNAME", "linux.example.com");
-        host.file("/etc/hosts", "127.0.0.1\tlocalhost\n");
+        host.file("/etc/hosts", "127.0.0.1\tlocalhost\n192.0.2.10\tlinux.example.com linux\n");
         host.file("/etc/resolv.conf", "nameserver 192.0.2.53\n");
         host.file("/etc/sysconfig/network/routes", "default\t192.0.2.1\t-\n");
         host.file("/etc/sysconfig/network/config", "NETCONFIG_DNS_POLICY=\"\"\n");

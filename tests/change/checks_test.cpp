@@ -8,7 +8,6 @@
 namespace {
 
 using cvagent::change::HostFacts;
-using cvagent::change::InterfaceSettings;
 using cvagent::change::Ip;
 using cvagent::change::KernelAddress;
 using cvagent::change::KernelRoute;
@@ -124,8 +123,8 @@ TEST(Checks, LookAtEachChangeBesideTheOthers) {
 
 TEST(Checks, TakeTheFileForWhatIsNotRunning) {
     HostFacts facts = host();
-    facts.files["eth2"] =
-        InterfaceSettings{.origin = "static", .ipv4Address = "10.0.0.5", .mask = "255.255.0.0"};
+    facts.files["eth2"].ipv4Address = "10.0.0.5";
+    facts.files["eth2"].mask = "255.255.0.0";
     EXPECT_THAT(objections({ofLink(kMask, "255.255.255.0", "eth2")}, facts), IsEmpty());
     EXPECT_THAT(objections({ofLink(kAddress, "10.0.255.255", "eth2")}, facts),
                 ElementsAre(HasSubstr("broadcast address of 10.0.0.0/16")));
