@@ -279,6 +279,60 @@ HOST_TEST_F(ChangesInForce, SetBringsAnAddressIntoTheRunningHost) {
     EXPECT_THAT(state(host), HasSubstr("192.0.2.77/24 default via 192.0.2.1"));
 }
 
+/// What a plan foresees is what then is: of the kernel, of the files.
+HOST_TEST_F(ChangesInForce, APlanForeseesThem) {
+    host.file("/root/changes", moveFile());
+    const std::string before = state(host);
+    const Finished plan = cvagent(host, {"plan", "/root/changes", "--json"});
+    ASSERT_EQ(plan.status, 0) << plan.err;
+    EXPECT_EQ(state(host), before) << "nothing has happened";
+    const Json foreseen = Json::parse(plan.out)["plan"];
+    ASSERT_EQ(cvagent(host, {"apply", "/root/changes", "--verify-within", "0"}).status, 0);
+    const Finished then = cvagent(host, {"plan", "computer", "OwnerName", "x", "--json"});
+    const Json now = Json::parse(then.out)["plan"];
+    EXPECT_EQ(foreseen["kernelAfter"], now["kernelBefore"]);
+    for (const Json& file : foreseen["files"]) {
+        EXPECT_EQ(host.read(file["path"].get<std::string>()), file["after"]["content"].get<std::string>())
+            << file["path"];
+    }
+    EXPECT_GE(foreseen["files"].size(), 3U);
+}
+
+HOST_TEST_F(ChangesInForce, APlanIsReadByPeople) {
+    const Finished plan = cvagent(host, {"plan", "ip-config:eth0", "IPv4Address", "192.0.2.77"});
+    EXPECT_EQ(plan.status, 0) << plan.err;
+    EXPECT_THAT(plan.out, HasSubstr("    old  192.0.2.10\n    new  192.0.2.77\n"));
+    EXPECT_THAT(plan.out, HasSubstr("-IPADDR=192.0.2.10\n+IPADDR=192.0.2.77\n"));
+    EXPECT_THAT(plan.out, HasSubstr("\n- address eth0 192.0.2.10/24\n"));
+    EXPECT_THAT(plan.out, HasSubstr("\n+ address eth0 192.0.2.77/24\n"));
+    const Finished refused = cvagent(host, {"plan", "ip-config:eth0", "IPv4Address", "192.0.2.255"});
+    EXPECT_EQ(refused.status, 4);
+    EXPECT_THAT(refused.err, HasSubstr("refused without --force"));
+    EXPECT_THAT(refused.out, HasSubstr("+IPADDR=192.0.2.255\n"));
+    const Finished same = cvagent(host, {"plan", "ip-config:eth0", "IPv4Address", "192.0.2.10"});
+    EXPECT_EQ(same.status, 0);
+    EXPECT_THAT(same.out, testing::StartsWith("unchanged  "));
+}
+
+/// The history has the plan with the first of the writes, and the verdict of each.
+HOST_TEST_F(ChangesInForce, AreKeptWithTheirPlan) {
+    host.file("/root/changes", moveFile());
+    ASSERT_EQ(cvagent(host, {"apply", "/root/changes", "--verify-within", "0"}).status, 0);
+    const Finished history = host.run({CVAGENT_PROGRAM, "history", "--json", "--kind", "written"});
+    std::istringstream lines(history.out);
+    std::vector<Json> entries;
+    for (std::string line; std::getline(lines, line);) {
+        entries.push_back(Json::parse(line));
+    }
+    ASSERT_EQ(entries.size(), 3U) << history.out << history.err;
+    EXPECT_EQ(entries[0]["property"]["name"], "IPv4Address");
+    EXPECT_GE(entries[0]["plan"]["files"].size(), 3U);
+    EXPECT_EQ(entries[0]["verdict"], "applied");
+    EXPECT_FALSE(entries[1].contains("plan"));
+    EXPECT_THAT(entries[2]["verdict"].get<std::string>(),
+                HasSubstr("applied: the route default via 192.0.2.1 dev eth0 is replaced"));
+}
+
 /// Somebody who sets the old address again as soon as the new one is there.
 HOST_TEST_F(ChangesInForce, WhoeverChangesItBackIsTold) {
     host.file("/root/changes", "[" + changeOf("ip-config:eth0", "IPv4Address", "192.0.2.77") + "]");

@@ -1,6 +1,5 @@
 #include <unistd.h>
 #include <algorithm>
-#include <nlohmann/json.hpp>
 
 #include "agent/cli/caller.h"
 #include "agent/cli/commands/commands.h"
@@ -60,8 +59,10 @@ void take(const WriteResult& result, Outcome& outcome) {
 }
 
 /// Stops at the first change that fails: the ones behind it count on it.
+/// @param plan for the record, with the first write
 void make(Session& session, const std::vector<MeantChange>& changes, const std::vector<std::size_t>& order,
-          std::vector<Outcome>& outcomes, const Request& request) {
+          std::vector<Outcome>& outcomes, const std::string& plan) {
+    Request request(callerName(), Request::Clock::time_point::max(), plan);
     for (const std::size_t i : order) {
         const MeantChange& change = changes[i];
         const Found found = findNow(session, change, request);  // one before it may have brought it about
@@ -72,6 +73,7 @@ void make(Session& session, const std::vector<MeantChange>& changes, const std::
         }
         take(session.write(change.node, *change.row, change.words, request), outcomes[i]);
         session.showErrors(request);
+        request = Request(callerName());
         if (outcomes[i].kind == Outcome::failed) {
             return;
         }
@@ -103,9 +105,8 @@ ExitStatus apply(Session& session, const Options& options) {
         for (const std::size_t i : order) {
             outcomes[i].kind = Outcome::notMade;
         }
-        const Request writing(callerName(), Request::Clock::time_point::max(),
-                              triedOut(options, changes, order));
-        make(session, changes, order, outcomes, writing);
+        const std::string plan = triedOut(options, changes, order);
+        make(session, changes, order, outcomes, plan);
         verifyWithin(session, changes, outcomes, options.verifySeconds.value_or(kVerifySeconds), request);
     }
     print(options.json ? outcomesJson(changes, outcomes) : outcomesText(changes, outcomes));
