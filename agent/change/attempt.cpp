@@ -63,6 +63,8 @@ Plan attempt(const RehearsalRequest& request, const Isolation& isolation) {
     for (std::string& plugin : plugins) {
         wanted.files.push_back(&plugin);
     }
+    wanted.hostTools = request.hostTools;
+    wanted.commands = request.commands;
     const PreparedProcess process(wanted);
     putRecordersOnPath();
     shell::hearCommands(hear);

@@ -129,7 +129,9 @@ private:
 Plan rehearse(const RehearsalSettings& settings, const std::vector<Change>& changes) {
     const auto end = Clock::now() + settings.longest;
     const Rehearsal rehearsal(settings.program.empty() ? findProgram() : settings.program);
-    rehearsal.ask(toJson({settings.plugins, settings.dataDirectory, changes}) + '\n');
+    rehearsal.ask(
+        toJson({settings.plugins, settings.dataDirectory, settings.hostTools, settings.commands, changes}) +
+        '\n');
     const std::string text = rehearsal.answer(end);
     try {
         RehearsalAnswer answer = answerFromJson(text);

@@ -7,6 +7,7 @@
 
 #include "agent/change/change.h"
 #include "agent/change/plan.h"
+#include "agent/core/host_tools.h"
 
 namespace cvagent::change {
 
@@ -17,6 +18,9 @@ struct RehearsalSettings {
     /// Where the agent keeps its data, whichever way it was named; "": the rehearsal finds it as an agent
     /// does.
     std::string dataDirectory;
+    /// As the agent runs the plug-in's commands.
+    HostTools hostTools = HostTools::automatic;
+    Commands commands = Commands::direct;
     /// Until then it has ended, with all that it started.
     std::chrono::milliseconds longest{30'000};
     /// The program; "": the one beside this program.

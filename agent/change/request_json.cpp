@@ -20,14 +20,21 @@ auto parsed(std::string_view text, const Read& read) {
 std::string toJson(const RehearsalRequest& request) {
     return Json{{"plugins", texts(request.plugins)},
                 {"data", bytes(request.dataDirectory)},
+                {"tools", static_cast<unsigned>(request.hostTools)},
+                {"commands", static_cast<unsigned>(request.commands)},
                 {"changes", list(request.changes, changeObject)}}
         .dump();
 }
 
 RehearsalRequest requestFromJson(std::string_view json) {
     return parsed(json, [](const Json& request) {
-        return RehearsalRequest{textsFrom(request.at("plugins")), bytesFrom(request.at("data")),
-                                listFrom<Change>(request.at("changes"), changeFrom)};
+        RehearsalRequest asked;
+        asked.plugins = textsFrom(request.at("plugins"));
+        asked.dataDirectory = bytesFrom(request.at("data"));
+        asked.hostTools = static_cast<HostTools>(request.at("tools").get<unsigned>());
+        asked.commands = static_cast<Commands>(request.at("commands").get<unsigned>());
+        asked.changes = listFrom<Change>(request.at("changes"), changeFrom);
+        return asked;
     });
 }
 

@@ -6,6 +6,7 @@
 
 #include "agent/change/change.h"
 #include "agent/change/plan.h"
+#include "agent/core/host_tools.h"
 
 /// What rehearse() and its program say to each other.
 namespace cvagent::change {
@@ -14,6 +15,8 @@ namespace cvagent::change {
 struct RehearsalRequest {
     std::vector<std::string> plugins;
     std::string dataDirectory;
+    HostTools hostTools = HostTools::automatic;
+    Commands commands = Commands::direct;
     std::vector<Change> changes;
 };
 
