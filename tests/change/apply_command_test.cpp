@@ -329,8 +329,9 @@ HOST_TEST_F(ChangesInForce, AreKeptWithTheirPlan) {
     EXPECT_GE(entries[0]["plan"]["files"].size(), 3U);
     EXPECT_EQ(entries[0]["verdict"], "applied");
     EXPECT_FALSE(entries[1].contains("plan"));
-    EXPECT_THAT(entries[2]["verdict"].get<std::string>(),
-                HasSubstr("applied: the route default via 192.0.2.1 dev eth0 is replaced"));
+    EXPECT_THAT(entries[1]["verdict"].get<std::string>(),
+                HasSubstr("applied: the route default via 192.0.2.1 dev eth0 is gone: "));
+    EXPECT_EQ(entries[2]["verdict"], "applied");
 }
 
 /// Somebody who sets the old address again as soon as the new one is there.

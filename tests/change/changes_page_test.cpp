@@ -16,9 +16,8 @@ std::vector<std::string> cellsOf(const std::string& line) {
     std::vector<std::string> cells;
     for (std::string cell; std::getline(in, cell, '|');) {
         const std::size_t first = cell.find_first_not_of(' ');
-        cells.push_back(first == std::string::npos
-                            ? ""
-                            : cell.substr(first, cell.find_last_not_of(' ') + 1 - first));
+        cells.push_back(
+            first == std::string::npos ? "" : cell.substr(first, cell.find_last_not_of(' ') + 1 - first));
     }
     return cells;
 }

@@ -1,5 +1,5 @@
-// Files of changes: whatever they hold, they are read or refused, and what was read is read again from what is
-// written of it.
+// Files of changes: whatever they hold, they are read or refused, and what was read is read again from what
+// is written of it.
 #include "agent/change/change_file.h"
 
 #include "agent/core/text.h"

@@ -48,8 +48,9 @@ HOST_TEST(History, KeepsEverythingOfAnEvent) {
     EXPECT_EQ(found.event.firstCode, 1U);
     EXPECT_EQ(found.event.secondCode, 2U);
     EXPECT_EQ(found.event.eventCode, 3U);
-    for (const auto text : {&Event::path, &Event::message, &Event::nodeClass, &Event::propertyName,
-                            &Event::before, &Event::after, &Event::caller, &Event::wanted, &Event::verdict, &Event::plan}) {
+    for (const auto text :
+         {&Event::path, &Event::message, &Event::nodeClass, &Event::propertyName, &Event::before,
+          &Event::after, &Event::caller, &Event::wanted, &Event::verdict, &Event::plan}) {
         EXPECT_EQ(found.event.*text, event.*text);
     }
     EXPECT_EQ(found.boot.size(), found.boot.empty() ? 0U : 36U);

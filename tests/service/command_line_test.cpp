@@ -99,7 +99,8 @@ HOST_TEST(ServiceClient, AnswersTheSameOfARecordedHost) {
 
 HOST_TEST(ServiceClient, ExportsAndComparesAsAnAgentOfItsOwnDoes) {
     host.copyTree("suse-two-nics");
-    host.file("/root/drift", R"([{"node": "ip-config:eth0", "property": "DNSServers", "value": "192.0.2.99"}])");
+    host.file("/root/drift",
+              R"([{"node": "ip-config:eth0", "property": "DNSServers", "value": "192.0.2.99"}])");
     expectSame(host,
                {{"export"},
                 {"export", "ip-config:eth1"},
@@ -113,8 +114,9 @@ HOST_TEST(ServiceClient, ExportsAndComparesAsAnAgentOfItsOwnDoes) {
 HOST_TEST(ServiceClient, AppliesAFileWriteByWrite) {
     ServiceRun run(host);
     run.start();
-    host.file("/root/changes", R"([{"node": "computer", "property": "OwnerContact", "value": "room 4"},)"
-                               R"( {"node": "ip-config:eth0", "property": "DNSServers", "value": "192.0.2.9"}])");
+    host.file("/root/changes",
+              R"([{"node": "computer", "property": "OwnerContact", "value": "room 4"},)"
+              R"( {"node": "ip-config:eth0", "property": "DNSServers", "value": "192.0.2.9"}])");
     const Finished first = host.run(asking({"apply", "/root/changes", "--verify-within", "0"}));
     EXPECT_EQ(first.status, 0) << first.out << first.err;
     EXPECT_THAT(first.out, HasSubstr("applied    /oshw/root/computer OwnerContact  room 4\n"));
