@@ -64,7 +64,7 @@ std::vector<std::string> listenersToAddresses() {
             }
         }
     }
-    std::ranges::stable_partition(found, isKeeper);
+    std::stable_partition(found.begin(), found.end(), isKeeper);
     std::vector<std::string> names;
     for (const Process& each : found) {
         const std::string name = printable(each.name) + " (pid " + std::to_string(each.id) + ")";
