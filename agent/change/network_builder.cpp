@@ -161,15 +161,24 @@ int set(NetlinkSocket& socket, const Model& link, const std::string& attributes,
     return tell(socket, makeRequest(RTM_NEWLINK, NLM_F_ACK, bytesOf(wanted), attributes));
 }
 
-/// The addresses that the kernel would make by itself come from the copied network instead.
-void keepFromOwnAddresses(NetlinkSocket& socket, const Model& link) {
-    const auto none = static_cast<std::uint8_t>(IN6_ADDR_GEN_MODE_NONE);
-    set(socket, link, nested(IFLA_AF_SPEC, nested(AF_INET6, attribute(IFLA_INET6_ADDR_GEN_MODE, none))));
+void setOwnAddresses(NetlinkSocket& socket, const Model& link, std::uint8_t mode) {
+    set(socket, link, nested(IFLA_AF_SPEC, nested(AF_INET6, attribute(IFLA_INET6_ADDR_GEN_MODE, mode))));
+}
+
+/// The addresses that the kernel would make by itself come from the copied network; only what is raised later
+/// gets its own again.
+void makeNoAddresses(NetlinkSocket& socket, const Model& link) {
+    setOwnAddresses(socket, link, IN6_ADDR_GEN_MODE_NONE);
+}
+void makeAddressesLater(NetlinkSocket& socket, const Model& link) {
+    const std::string_view ofIpv6 = attributeOf(link.part(IFLA_AF_SPEC), 0, AF_INET6);
+    const std::string_view mode = attributeOf(ofIpv6, 0, IFLA_INET6_ADDR_GEN_MODE);
+    setOwnAddresses(socket, link, readPlain<std::uint8_t>(mode).value_or(IN6_ADDR_GEN_MODE_EUI64));
 }
 
 void joinAndRaise(NetlinkSocket& socket, const std::vector<Model>& links) {
     for (const Model& link : links) {
-        keepFromOwnAddresses(socket, link);
+        makeNoAddresses(socket, link);
         if (!link.part(IFLA_MASTER).empty()) {
             set(socket, link, makeAttribute(IFLA_MASTER, link.part(IFLA_MASTER)));
         }
@@ -280,6 +289,9 @@ void buildNetwork(const NetworkMessages& like) {
     makeLinks(socket, links);
     joinAndRaise(socket, links);
     tellAll(socket, requests(like.addresses, addressRequest));
+    for (const Model& link : links) {
+        makeAddressesLater(socket, link);
+    }
     tellAll(socket, requests(like.nextHops, nextHopRequest));
     auto routes = requests(like.routes, routeRequest);
     routes.resize(std::min(routes.size(), kMostRoutes));
