@@ -193,9 +193,11 @@ void joinAndRaise(NetlinkSocket& socket, const std::vector<Model>& links) {
     }
 }
 
-std::string addressRequest(const NetworkMessage& message) {
+/// @param flags on top of those that the address has
+std::string addressRequest(const NetworkMessage& message, unsigned how, unsigned more) {
     constexpr std::size_t kFixed = NLMSG_ALIGN(sizeof(ifaddrmsg));
-    constexpr unsigned kKeptFlags = IFA_F_NOPREFIXROUTE | IFA_F_HOMEADDRESS;
+    constexpr unsigned kKeptFlags =
+        IFA_F_NOPREFIXROUTE | IFA_F_HOMEADDRESS | IFA_F_NODAD | IFA_F_MANAGETEMPADDR;
     auto fixed = readPlain<ifaddrmsg>(message.body).value_or(ifaddrmsg{});
     unsigned flags = fixed.ifa_flags;
     const std::string attributes =
@@ -207,9 +209,25 @@ std::string addressRequest(const NetworkMessage& message) {
                                                    IFA_LABEL,   IFA_CACHEINFO, IFA_RT_PRIORITY};
             return kTaken.contains(type);
         });
-    flags = (flags & kKeptFlags) | IFA_F_NODAD;
+    flags = (flags & kKeptFlags) | more;
     fixed.ifa_flags = static_cast<std::uint8_t>(flags);
-    return makeRequest(RTM_NEWADDR, kNew, bytesOf(fixed), attributes + attribute(IFA_FLAGS, flags));
+    return makeRequest(RTM_NEWADDR, how, bytesOf(fixed), attributes + attribute(IFA_FLAGS, flags));
+}
+
+/// An IPv6 address is there at once when nobody is asked whether he has it; afterwards it is one like any
+/// other.
+void copyAddresses(NetlinkSocket& socket, const std::vector<NetworkMessage>& addresses) {
+    std::vector<std::string> requests;
+    for (const NetworkMessage& message : addresses) {
+        requests.push_back(addressRequest(message, kNew, IFA_F_NODAD));
+    }
+    tellAll(socket, std::move(requests));
+    for (const NetworkMessage& message : addresses) {
+        const auto fixed = readPlain<ifaddrmsg>(message.body).value_or(ifaddrmsg{});
+        if (fixed.ifa_family == AF_INET6 && fixed.ifa_scope != RT_SCOPE_HOST) {
+            tell(socket, addressRequest(message, NLM_F_REPLACE | NLM_F_ACK, 0));
+        }
+    }
 }
 
 /// What the kernel tells of a way's state cannot be asked for.
@@ -288,7 +306,7 @@ void buildNetwork(const NetworkMessages& like) {
     }
     makeLinks(socket, links);
     joinAndRaise(socket, links);
-    tellAll(socket, requests(like.addresses, addressRequest));
+    copyAddresses(socket, like.addresses);
     for (const Model& link : links) {
         makeAddressesLater(socket, link);
     }

@@ -194,9 +194,10 @@ void bringUpRealLinks(FakeHost& host) {
          {"link add eth0 address 02:00:00:00:00:10 type veth peer name sw0", "link set eth0 up",
           "link set sw0 up", "address add 192.0.2.7/24 broadcast + dev eth0",
           "address add 192.0.2.8/24 broadcast + dev eth0 label eth0:1",
-          "-6 address add 2001:db8::7/64 dev eth0 nodad", "route add default via 192.0.2.1",
-          "route add 10.0.0.0/8 via 192.0.2.2 table 7", "rule add from 192.0.2.8 lookup 7",
-          "-6 route add default via 2001:db8::1 dev eth0", "link set eth0 mtu 1400"}) {
+          "-6 address add 2001:db8::7/64 dev eth0 nodad", "-6 address replace 2001:db8::7/64 dev eth0",
+          "route add default via 192.0.2.1", "route add 10.0.0.0/8 via 192.0.2.2 table 7",
+          "rule add from 192.0.2.8 lookup 7", "-6 route add default via 2001:db8::1 dev eth0",
+          "link set eth0 mtu 1400"}) {
         Texts words{"ip"};
         std::istringstream split(line);
         for (std::string word; split >> word;) {
