@@ -18,6 +18,7 @@
 
 #include "agent/change/attempt.h"
 #include "agent/change/cannot.h"
+#include "agent/change/name_service.h"
 #include "agent/change/namespaces.h"
 #include "agent/change/recorders.h"
 #include "agent/change/request_json.h"
@@ -112,6 +113,7 @@ std::string tryChanges(const cvagent::change::RehearsalRequest& request, cvagent
     must(unshare(CLONE_NEWNS), "no mounts of its own");
     must(mount(nullptr, "/", nullptr, MS_REC | MS_PRIVATE, nullptr), "no mounts of its own");
     isolation.covers = cvagent::change::isolateFiles(isolation.asUser, isolation.dataDirectory);
+    cvagent::change::askNoNameServer();
     cvagent::change::enterFence([&turns] {
         if (!passTurn(turns.ask) || !takeTurn(turns.granted)) {
             throw Cannot("the users of a namespace cannot be named");

@@ -88,6 +88,9 @@ void limitCapabilities() {
 }  // namespace
 
 bool gainRightToIsolate() {
+    // Else what /proc has of this process would be root's, as after a start with other rights than the
+    // caller's.
+    prctl(PR_SET_DUMPABLE, 1, 0, 0, 0);
     const pid_t self = getpid();
     __user_cap_header_struct header{_LINUX_CAPABILITY_VERSION_3, 0};
     std::array<__user_cap_data_struct, 2> sets{};

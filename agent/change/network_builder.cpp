@@ -161,15 +161,24 @@ int set(NetlinkSocket& socket, const Model& link, const std::string& attributes,
     return tell(socket, makeRequest(RTM_NEWLINK, NLM_F_ACK, bytesOf(wanted), attributes));
 }
 
-/// The addresses that the kernel would make by itself come from the copied network instead.
-void keepFromOwnAddresses(NetlinkSocket& socket, const Model& link) {
-    const auto none = static_cast<std::uint8_t>(IN6_ADDR_GEN_MODE_NONE);
-    set(socket, link, nested(IFLA_AF_SPEC, nested(AF_INET6, attribute(IFLA_INET6_ADDR_GEN_MODE, none))));
+void setOwnAddresses(NetlinkSocket& socket, const Model& link, std::uint8_t mode) {
+    set(socket, link, nested(IFLA_AF_SPEC, nested(AF_INET6, attribute(IFLA_INET6_ADDR_GEN_MODE, mode))));
+}
+
+/// The addresses that the kernel would make by itself come from the copied network; only what is raised later
+/// gets its own again.
+void makeNoAddresses(NetlinkSocket& socket, const Model& link) {
+    setOwnAddresses(socket, link, IN6_ADDR_GEN_MODE_NONE);
+}
+void makeAddressesLater(NetlinkSocket& socket, const Model& link) {
+    const std::string_view ofIpv6 = attributeOf(link.part(IFLA_AF_SPEC), 0, AF_INET6);
+    const std::string_view mode = attributeOf(ofIpv6, 0, IFLA_INET6_ADDR_GEN_MODE);
+    setOwnAddresses(socket, link, readPlain<std::uint8_t>(mode).value_or(IN6_ADDR_GEN_MODE_EUI64));
 }
 
 void joinAndRaise(NetlinkSocket& socket, const std::vector<Model>& links) {
     for (const Model& link : links) {
-        keepFromOwnAddresses(socket, link);
+        makeNoAddresses(socket, link);
         if (!link.part(IFLA_MASTER).empty()) {
             set(socket, link, makeAttribute(IFLA_MASTER, link.part(IFLA_MASTER)));
         }
@@ -184,9 +193,11 @@ void joinAndRaise(NetlinkSocket& socket, const std::vector<Model>& links) {
     }
 }
 
-std::string addressRequest(const NetworkMessage& message) {
+/// @param flags on top of those that the address has
+std::string addressRequest(const NetworkMessage& message, unsigned how, unsigned more) {
     constexpr std::size_t kFixed = NLMSG_ALIGN(sizeof(ifaddrmsg));
-    constexpr unsigned kKeptFlags = IFA_F_NOPREFIXROUTE | IFA_F_HOMEADDRESS;
+    constexpr unsigned kKeptFlags =
+        IFA_F_NOPREFIXROUTE | IFA_F_HOMEADDRESS | IFA_F_NODAD | IFA_F_MANAGETEMPADDR;
     auto fixed = readPlain<ifaddrmsg>(message.body).value_or(ifaddrmsg{});
     unsigned flags = fixed.ifa_flags;
     const std::string attributes =
@@ -198,9 +209,25 @@ std::string addressRequest(const NetworkMessage& message) {
                                                    IFA_LABEL,   IFA_CACHEINFO, IFA_RT_PRIORITY};
             return kTaken.contains(type);
         });
-    flags = (flags & kKeptFlags) | IFA_F_NODAD;
+    flags = (flags & kKeptFlags) | more;
     fixed.ifa_flags = static_cast<std::uint8_t>(flags);
-    return makeRequest(RTM_NEWADDR, kNew, bytesOf(fixed), attributes + attribute(IFA_FLAGS, flags));
+    return makeRequest(RTM_NEWADDR, how, bytesOf(fixed), attributes + attribute(IFA_FLAGS, flags));
+}
+
+/// An IPv6 address is there at once when nobody is asked whether he has it; afterwards it is one like any
+/// other.
+void copyAddresses(NetlinkSocket& socket, const std::vector<NetworkMessage>& addresses) {
+    std::vector<std::string> requests;
+    for (const NetworkMessage& message : addresses) {
+        requests.push_back(addressRequest(message, kNew, IFA_F_NODAD));
+    }
+    tellAll(socket, std::move(requests));
+    for (const NetworkMessage& message : addresses) {
+        const auto fixed = readPlain<ifaddrmsg>(message.body).value_or(ifaddrmsg{});
+        if (fixed.ifa_family == AF_INET6 && fixed.ifa_scope != RT_SCOPE_HOST) {
+            tell(socket, addressRequest(message, NLM_F_REPLACE | NLM_F_ACK, 0));
+        }
+    }
 }
 
 /// What the kernel tells of a way's state cannot be asked for.
@@ -279,7 +306,10 @@ void buildNetwork(const NetworkMessages& like) {
     }
     makeLinks(socket, links);
     joinAndRaise(socket, links);
-    tellAll(socket, requests(like.addresses, addressRequest));
+    copyAddresses(socket, like.addresses);
+    for (const Model& link : links) {
+        makeAddressesLater(socket, link);
+    }
     tellAll(socket, requests(like.nextHops, nextHopRequest));
     auto routes = requests(like.routes, routeRequest);
     routes.resize(std::min(routes.size(), kMostRoutes));

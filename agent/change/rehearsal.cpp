@@ -14,6 +14,7 @@
 #include <utility>
 
 #include "agent/change/request_json.h"
+#include "agent/core/command_deadline.h"
 #include "agent/core/program_path.h"
 #include "agent/core/text.h"
 #include "agent/shell/starts.h"
@@ -128,6 +129,7 @@ private:
 
 Plan rehearse(const RehearsalSettings& settings, const std::vector<Change>& changes) {
     const auto end = Clock::now() + settings.longest;
+    const CommandScope own(CommandScope::ours);  // no command of a plug-in, whose time is limited otherwise
     const Rehearsal rehearsal(settings.program.empty() ? findProgram() : settings.program);
     rehearsal.ask(
         toJson({settings.plugins, settings.dataDirectory, settings.hostTools, settings.commands, changes}) +

@@ -38,6 +38,14 @@ void addDhcp(const Plan& plan, Sentences& sentences) {
     }
 }
 
+void addNames(const Plan& plan, Sentences& sentences) {
+    const bool asks = std::ranges::any_of(
+        plan.commands, [](const PlannedCommand& command) { return command.text.starts_with("hostname "); });
+    if (asks) {
+        sentences.emplace_back("What name servers say of the host: names were looked up in files alone.");
+    }
+}
+
 void addLines(const std::vector<std::string>& lines, const std::string& start, Sentences& sentences) {
     for (std::size_t at = 0; at < std::min(lines.size(), kMostLines); ++at) {
         sentences.push_back(start + lines[at]);
@@ -53,6 +61,7 @@ std::vector<std::string> unforeseen(const Plan& plan, const Isolation& isolation
     Sentences sentences;
     addRecorded(plan, sentences);
     addDhcp(plan, sentences);
+    addNames(plan, sentences);
     if (plan.changes.size() > 1) {
         sentences.emplace_back(
             "Each change but the first was tried on what those before it left here, which the host may "

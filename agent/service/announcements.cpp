@@ -13,8 +13,8 @@ namespace cvagent::service {
 
 namespace {
 
-constexpr int kRoom = 4 << 20;  // of the socket, used only while much is announced at once
-constexpr int kAtOnce = 65536;  // messages: more than there is room for
+constexpr int kBuffer = 4 << 20;  // of the socket, used only while much is announced at once
+constexpr int kAtOnce = 65536;    // messages: more than there is room for
 constexpr time_t kDumpSeconds = 5;
 
 int opened(int protocol, std::uint32_t groups, int flags) {
@@ -68,8 +68,8 @@ bool endsDump(std::string_view message, bool& whole) {
 
 Announcements::Announcements(int protocol, std::uint32_t groups)
     : socket_(opened(protocol, groups, SOCK_NONBLOCK)) {
-    if (socket_ >= 0 && setsockopt(socket_, SOL_SOCKET, SO_RCVBUFFORCE, &kRoom, sizeof kRoom) != 0) {
-        setsockopt(socket_, SOL_SOCKET, SO_RCVBUF, &kRoom, sizeof kRoom);  // as much as a user may have
+    if (socket_ >= 0 && setsockopt(socket_, SOL_SOCKET, SO_RCVBUFFORCE, &kBuffer, sizeof kBuffer) != 0) {
+        setsockopt(socket_, SOL_SOCKET, SO_RCVBUF, &kBuffer, sizeof kBuffer);  // as much as a user may have
     }
 }
 

@@ -1,6 +1,5 @@
 #include "agent/service/consent.h"
 
-#include <grp.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -9,6 +8,7 @@
 
 #include "agent/bus/reader.h"
 #include "agent/bus/writer.h"
+#include "agent/service/users.h"
 
 namespace cvagent::service {
 
@@ -45,13 +45,8 @@ bool isOurs(const Caller& caller) {
 }  // namespace
 
 void Consent::setTrustedGroup(const std::string& group) {
-    constexpr std::size_t kRoom = 65536;
     groupName_ = group;
-    std::string room(kRoom, '\0');
-    struct group entry {};
-    struct group* found = nullptr;
-    getgrnam_r(group.c_str(), &entry, room.data(), room.size(), &found);
-    group_ = found != nullptr ? std::optional(found->gr_gid) : std::nullopt;
+    group_ = groupNamed(group);
 }
 
 bool Consent::isTrusted(const Caller& caller) const {

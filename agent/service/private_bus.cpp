@@ -2,7 +2,6 @@
 
 #include <fcntl.h>
 #include <poll.h>
-#include <pwd.h>
 #include <spawn.h>
 #include <sys/prctl.h>
 #include <sys/stat.h>
@@ -20,6 +19,7 @@
 
 #include "agent/core/problem.h"
 #include "agent/core/text.h"
+#include "agent/service/users.h"
 
 namespace cvagent::service {
 
@@ -91,12 +91,7 @@ const char* program() {
 
 /// Without an entry its clients are turned away as soon as they are connected.
 void checkUserIsKnown(uid_t user) {
-    constexpr std::size_t kRoom = 65536;
-    std::string room(kRoom, '\0');
-    passwd entry{};
-    passwd* found = nullptr;
-    getpwuid_r(user, &entry, room.data(), room.size(), &found);
-    if (found == nullptr) {
+    if (!nameOfUser(user)) {
         failToStart("dbus-daemon lets nobody in who is not in /etc/passwd, and uid " + std::to_string(user) +
                     " is not");
     }

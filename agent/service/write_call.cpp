@@ -1,6 +1,4 @@
 // The method Write: judged, consented to, done, told.
-#include <pwd.h>
-
 #include <array>
 #include <utility>
 
@@ -9,6 +7,7 @@
 #include "agent/service/calls.h"
 #include "agent/service/log.h"
 #include "agent/service/names.h"
+#include "agent/service/users.h"
 #include "agent/service/values.h"
 
 namespace cvagent::service {
@@ -31,13 +30,9 @@ struct Wish {
 };
 
 std::string userName(std::uint32_t user) {
-    constexpr std::size_t kRoom = 65536;
-    std::string room(kRoom, '\0');
-    passwd entry{};
-    passwd* found = nullptr;
-    getpwuid_r(user, &entry, room.data(), room.size(), &found);
     const std::string id = "uid " + std::to_string(user);
-    return found != nullptr ? std::string(found->pw_name) + " (" + id + ")" : id;
+    const std::optional<std::string> name = nameOfUser(user);
+    return name ? *name + " (" + id + ")" : id;
 }
 
 void note(Priority priority, const Wish& wish, const std::string& what, const std::string& verdict) {

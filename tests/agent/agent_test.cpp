@@ -172,6 +172,7 @@ HOST_TEST(AgentPlugins, NothingIsToldOfOneThatDoesNotStart) {
     EXPECT_THAT(failed.first, testing::Not(testing::Contains(HasSubstr("hard-drive"))));
 }
 
+#if !defined(__SANITIZE_THREAD__)  // for at its end the program goes while there was a thread that nobody joins
 HOST_TEST(AgentPlugins, OneThatTakesTooLongToStartIsLeftToItself) {
     const cvagent::QuietCommands quiet;
     host.file("/proc/cpuinfo", "processor\t: 0\n");
@@ -199,6 +200,7 @@ HOST_TEST(AgentPlugins, OneThatTakesTooLongToStartIsLeftToItself) {
     EXPECT_THAT(*host.read("/tmp/diary"), testing::EndsWith("held no more\n")) << "it is not stopped";
     EXPECT_THAT(events->take().events, IsEmpty());
 }
+#endif
 
 HOST_TEST(AgentPlugins, AreLoadedWithADataDirectoryOnly) {
     AgentSettings settings = settingsOf({FAKE_PLUGIN_FILE});

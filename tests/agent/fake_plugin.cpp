@@ -362,7 +362,9 @@ private:
         port->setProperty(108, PropertyValue("eth0", true));
         port->setProperty(57, PropertyValue(Number(1000000ULL), true));
         port->setProperty(123, PropertyValue(Number(12U), true));
+        port->setStatus(12);
         auto* ip = make(add(port), 29, 1, "IP Configuration");
+        ip->setStatus(12);
         ip->setProperty(108, PropertyValue("eth0", true));
         ip->setProperty(24, PropertyValue(IC::EnumValue(3), true));
         ip->setProperty(94, PropertyValue(std::vector<std::string>{"192.0.2.53"}, true));

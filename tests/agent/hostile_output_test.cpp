@@ -56,7 +56,7 @@ HOST_TEST(HugeOutput, OfAListingIsReadAsFarAsASaneOneGoes) {
     host.tool("brctl show", ToolAnswer{.out = "",
                                        .action = "yes 'br0\t8000.000000000000\tno\t\t" +
                                                  std::string(400, 'x') + "'" + kGigabyte});
-    const Finished run = suse.run({"tree"});
+    const Finished run = suse.run({"--command-timeout", "100", "tree"});
     EXPECT_EQ(run.status, 0);
     EXPECT_THAT(run.out, HasSubstr("network-port:eth0"));
     EXPECT_THAT(run.out, HasSubstr("ip-config:br0"));

@@ -12,6 +12,7 @@
 
 #include <fstream>
 
+#include "agent/change/name_service.h"
 #include "tests/change/rehearsed.h"
 
 namespace {
@@ -27,7 +28,6 @@ constexpr const char* kConfig = "ip-config:eth0";
 void addLink(FakeHost& host) {
     host.copyTree("suse-two-nics");
     host.expectUnrecorded();
-    host.directory("/opt/vantrel/corvista/data");
     moveRecords(host);
 }
 
@@ -185,6 +185,14 @@ HOST_TEST(Rehearsal, SaysThatUserNamespacesAreSwitchedOff) {
     }
     std::ofstream("/.proc/sys/user/max_user_namespaces") << "0" << std::flush;
     EXPECT_THAT(whyNotRehearsed(kNameServer), HasSubstr("user.max_user_namespaces"));
+}
+
+TEST(NameService, AsksFilesAlone) {
+    using cvagent::change::withoutServers;
+    EXPECT_EQ(withoutServers(""), "hosts: files\n");
+    EXPECT_EQ(withoutServers("# all\npasswd:\tfiles systemd sss\ngroup: ldap\nhosts: files "
+                             "mdns4_minimal [NOTFOUND=return] dns myhostname # last\nhalf line"),
+              "passwd: files\ngroup: files\nhosts: files myhostname\n");
 }
 
 /// A program in place of the rehearsal's.

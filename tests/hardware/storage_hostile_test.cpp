@@ -2,7 +2,7 @@
 // that lead in rings, and more of everything than usual.
 #include <gmock/gmock.h>
 
-#include <chrono>
+#include <ctime>
 
 #include "plugins/hardware/storage/storage.h"
 #include "tests/hardware/storage_host.h"
@@ -132,11 +132,11 @@ TEST(HostileStorage, TenThousandMountsAreReadAsFastAsTheyAreMany) {
                 " rw - ext4 /dev/" + name + " rw\n";
     }
     host.file("/proc/1/mountinfo", rows);
-    const auto start = std::chrono::steady_clock::now();
+    const std::clock_t start = std::clock();
     EXPECT_EQ(hardware::listFileSystems(host.asRoot()).size(), 20U) << "those behind the first MiB are there";
     EXPECT_EQ(factsOf(host.asRoot(), Class::fileSystem, "vdt").at("MountPoints"), "/vdt");
     // Quadratic would be minutes; this takes some ten milliseconds.
-    EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(5));
+    EXPECT_LT(std::clock() - start, 5 * CLOCKS_PER_SEC);
 }
 
 TEST(HostileStorage, ADriverThatWritesItsNamesWithSlashesHasItsOwnFiles) {

@@ -345,7 +345,9 @@ HOST_TEST_F(Freshness, AFloodCostsLittleAndEndsRight) {
     std::printf("%u changes in %.2f s: %.2f s of processor time, %ld kB\n", kFlood, took.count(), cost,
                 mostKilobytes(host, service) - memory);
     EXPECT_LT(cost, 0.5 * took.count() + 1) << "in " << took.count() << " s";
+#if !defined(__SANITIZE_ADDRESS__)  // which keeps what is freed for a while
     EXPECT_LT(mostKilobytes(host, service) - memory, 16 << 10);
+#endif
 }
 
 }  // namespace
