@@ -15,6 +15,8 @@ change::Plan rehearsed(const Options& options, const std::vector<MeantChange>& c
         findPlugins(found);
     }
     settings.plugins = found.plugins;
+    settings.hostTools = options.hostTools;
+    settings.commands = options.commands;
     std::vector<change::Change> plain;
     std::ranges::transform(changes, std::back_inserter(plain), [](const MeantChange& each) {
         return change::Change{each.node->getPath(), each.row->id, each.words};
