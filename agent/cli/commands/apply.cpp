@@ -54,7 +54,8 @@ void take(const WriteResult& result, Outcome& outcome) {
         outcome.kind = Outcome::failed;
         outcome.reason = "the plug-in reported errors";
     } else {
-        outcome.kind = Outcome::differs;  // until a look has told
+        const bool isSo = result.outcome == WriteResult::applied && result.lacking.empty();
+        outcome.kind = isSo ? Outcome::applied : Outcome::differs;  // until a look has told
     }
 }
 
