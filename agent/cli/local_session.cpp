@@ -204,6 +204,10 @@ void LocalSession::end() {
     stop();
 }
 
+void LocalSession::announce(const Event& event) {
+    agent_->announce(event);
+}
+
 void LocalSession::showErrors(const Request& request) {
     showLines(request.errors());
     showLines(errors_);

@@ -57,6 +57,17 @@ Outcome::Kind kindOf(WriteResult::Outcome outcome) {
     return kKinds.at(outcome);
 }
 
+/// For the record: it was as written, and is no more.
+void announceLoss(Session& session, const MeantChange& change, const Outcome& outcome) {
+    Event event = nodeEvent(Event::Kind::changed, *change.node);
+    event.property = change.row->id;
+    event.propertyName = change.row->name;
+    event.before = event.wanted = static_cast<std::string>(change.value);
+    event.after = outcome.after.failed() ? "" : static_cast<std::string>(outcome.after.value);
+    event.verdict = "differs: " + outcome.reason;
+    session.announce(event);
+}
+
 void look(Session& session, const MeantChange& change, Outcome& outcome, const Request& request) {
     const Found found = findNow(session, change, request);
     const bool wasSo = outcome.kind == Outcome::applied;
@@ -93,6 +104,9 @@ void verifyWithin(Session& session, const std::vector<MeantChange>& changes, std
             if (isWatched(outcomes[i]) && !isLost[i]) {
                 look(session, changes[i], outcomes[i], request);
                 isLost[i] = wasSo && outcomes[i].kind == Outcome::differs;
+                if (isLost[i]) {
+                    announceLoss(session, changes[i], outcomes[i]);
+                }
                 isAny = isAny || (isWatched(outcomes[i]) && !isLost[i]);
             }
         }

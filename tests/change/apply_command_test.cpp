@@ -347,6 +347,8 @@ HOST_TEST_F(ChangesInForce, WhoeverChangesItBackIsTold) {
     EXPECT_EQ(run.status, 1) << run.out;
     EXPECT_THAT(run.out, HasSubstr("differs    "));
     EXPECT_THAT(run.out, HasSubstr("somebody has changed it back"));
+    const Finished history = host.run({CVAGENT_PROGRAM, "history", "--kind", "changed"});
+    EXPECT_THAT(history.out, HasSubstr("IPv4Address: 192.0.2.77 -> 192.0.2.10  (differs: "));
     daemon.signal(SIGKILL);
 }
 
