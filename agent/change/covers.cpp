@@ -128,15 +128,32 @@ Cover coverOf(const std::string& place) {
     return {place, Cover::Kind::overlay, path(place), {}};
 }
 
-/// A user has what is his own copied, and nothing of /run but what links lead to. His /tmp becomes another
-/// one later.
-std::vector<Cover> placesToCopy(const std::vector<std::string>& written) {
+/// A user has what is his own copied, and of what links lead to elsewhere the file alone. /run is empty but
+/// for that. His /tmp becomes another one later.
+std::vector<Cover> placesToCopy(std::vector<std::string> written) {
+    std::vector<std::string> files;
+    for (const LinkTarget& target : linkTargets()) {
+        if (isBelow(target.directory, kRun)) {
+            written.push_back(target.directory);
+        } else if (!target.name.empty()) {
+            files.push_back(target.directory + "/" + target.name);
+        }
+    }
+    const std::vector<std::string> directories = outermost(std::move(written));
     std::vector<Cover> covers;
-    for (const std::string& place : outermost(written)) {
+    const auto add = [&](const std::string& place) {
         if (!isBelow(place, kTmp) && place != kRun) {
             covers.push_back(coverOf(place));
         }
+    };
+    std::ranges::for_each(directories, add);
+    for (const std::string& file : outermost(std::move(files))) {
+        const auto holds = [&file](const std::string& directory) { return isBelow(file, directory); };
+        if (std::ranges::none_of(directories, holds)) {
+            add(file);
+        }
     }
+    std::erase_if(covers, [](const Cover& each) { return !canBeCovered(each.original); });
     return covers;
 }
 
@@ -148,6 +165,9 @@ std::vector<Cover> placesToCover(std::vector<std::string> written) {
         if (lstat(place, &found) == 0 && S_ISDIR(found.st_mode)) {
             written.emplace_back(place);
         }
+    }
+    for (const LinkTarget& target : linkTargets()) {
+        written.push_back(target.directory);
     }
     const std::vector<std::string> places = outermost(std::move(written));
     std::vector<Cover> covers;
@@ -261,8 +281,8 @@ void showOwnProcesses(const std::vector<MountPoint>& mounts) {
 
 std::vector<Cover> isolateFiles(bool copies, const std::string& dataDirectory) {
     const std::vector<MountPoint> mounts = mountPoints();
-    const std::vector<std::string> written = writtenPlaces(dataDirectory);
-    std::vector<Cover> covers = copies ? placesToCopy(written) : placesToCover(written);
+    std::vector<Cover> covers = copies ? placesToCopy(writtenPlaces(dataDirectory, Missing::leftOut))
+                                       : placesToCover(writtenPlaces(dataDirectory, Missing::nearestAbove));
     const Devices devices = plainDevices();
     if (!restrict("/", MOUNT_ATTR_RDONLY | MOUNT_ATTR_NODEV | MOUNT_ATTR_NOSUID)) {
         throw Cannot(std::string("the host's files cannot be made read-only: ") + std::strerror(errno));

@@ -18,13 +18,13 @@ namespace {
 
 using hosttools::Descriptor;
 
-constexpr const char* kSettings = "/etc/nsswitch.conf";
+constexpr const char* kNameSettings = "/etc/nsswitch.conf";
 constexpr std::array kLocal = {"files", "compat", "db", "myhostname"};
 constexpr std::size_t kLargest = 65536;
 constexpr mode_t kMode = 0644;
 
 std::string readSettings() {
-    const Descriptor file(openRegular(AT_FDCWD, kSettings));
+    const Descriptor file(openRegular(AT_FDCWD, kNameSettings));
     std::string text(kLargest, '\0');
     const ssize_t got = file.isOpen() ? read(file.get(), text.data(), text.size()) : 0;
     text.resize(static_cast<std::size_t>(std::max<ssize_t>(got, 0)));
@@ -58,8 +58,8 @@ void askNoNameServer() {
     if (access("/etc", F_OK) != 0) {
         return;
     }
-    unlink(kSettings);
-    const Descriptor file(open(kSettings, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kMode));
+    unlink(kNameSettings);
+    const Descriptor file(open(kNameSettings, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, kMode));
     must(file.get(), "names cannot be looked up without name servers");
     if (!hosttools::writeAll(file.get(), settings)) {
         throw Cannot("names cannot be looked up without name servers");

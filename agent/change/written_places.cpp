@@ -36,9 +36,9 @@ std::deque<std::string> namesOf(const std::string& path) {
     return names;
 }
 
-/// The directory that a path ends in when all links on its way are followed, be the last name there or not.
-/// Nothing when it leads in a circle or to another machine, where a look could take for ever.
-std::optional<std::string> directoryOf(const std::string& path) {
+/// Where a path ends when all links on its way are followed. Nothing when it leads in a circle or to another
+/// machine, where a look could take for ever.
+std::optional<LinkTarget> endOf(const std::string& path) {
     std::string reached = "/";
     auto left = namesOf(path);
     for (int links = 0; !left.empty();) {
@@ -48,15 +48,13 @@ std::optional<std::string> directoryOf(const std::string& path) {
             reached = fs::path(reached).parent_path();
             continue;
         }
-        std::string next = (reached == "/" ? "" : reached) + "/" + name;
+        const std::string next = (reached == "/" ? "" : reached) + "/" + name;
         struct stat found {};
         if (!shell::localMountOf(next)) {
             return std::nullopt;
         }
-        if (lstat(next.c_str(), &found) != 0) {
-            return left.empty() ? std::optional(reached) : std::nullopt;
-        }
-        if (S_ISLNK(found.st_mode)) {
+        const bool isThere = lstat(next.c_str(), &found) == 0;
+        if (isThere && S_ISLNK(found.st_mode)) {
             const std::string target = targetOf(AT_FDCWD, next);
             if (++links > kMostLinks) {
                 return std::nullopt;
@@ -64,13 +62,13 @@ std::optional<std::string> directoryOf(const std::string& path) {
             const auto names = namesOf(target);
             left.insert(left.begin(), names.begin(), names.end());
             reached = target.starts_with('/') ? "/" : reached;
-        } else if (S_ISDIR(found.st_mode)) {
+        } else if (isThere && S_ISDIR(found.st_mode)) {
             reached = next;
         } else {
-            return left.empty() ? std::optional(reached) : std::nullopt;
+            return left.empty() ? std::optional(LinkTarget{reached, name}) : std::nullopt;
         }
     }
-    return reached;
+    return LinkTarget{reached, ""};
 }
 
 /// Whether a directory lies on a file system that holds files, unlike /proc, where /etc/mtab leads.
@@ -95,7 +93,7 @@ std::string existing(const std::string& path) {
     return error ? "/" : plain.string();
 }
 
-void addLinkTargets(const std::string& directory, std::vector<std::string>& places) {
+void addLinkTargets(const std::string& directory, std::vector<LinkTarget>& targets) {
     const Descriptor opened(open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
     for (const std::string& name : opened.isOpen() ? namesIn(opened.get()) : std::vector<std::string>()) {
         const std::string path = directory + "/" + name;
@@ -103,8 +101,8 @@ void addLinkTargets(const std::string& directory, std::vector<std::string>& plac
         if (lstat(path.c_str(), &link) != 0 || !S_ISLNK(link.st_mode)) {
             continue;
         }
-        if (auto target = directoryOf(path); target && *target != "/" && holdsFiles(*target)) {
-            places.push_back(*std::move(target));
+        if (auto target = endOf(path); target && target->directory != "/" && holdsFiles(target->directory)) {
+            targets.push_back(*std::move(target));
         }
     }
 }
@@ -126,15 +124,23 @@ std::vector<std::string> outermost(std::vector<std::string> places) {
     return kept;
 }
 
-std::vector<std::string> writtenPlaces(const std::string& dataDirectory) {
-    std::vector<std::string> places{existing("/etc"), existing(kSettings)};
-    if (!dataDirectory.empty()) {
-        places.push_back(existing(dataDirectory));
-    }
-    for (const char* directory : kLinkDirectories) {
-        addLinkTargets(directory, places);
+std::vector<std::string> writtenPlaces(const std::string& dataDirectory, Missing missing) {
+    std::vector<std::string> places;
+    for (const std::string& place : {std::string("/etc"), std::string(kSettings), dataDirectory}) {
+        std::error_code error;
+        if (!place.empty() && (missing == Missing::nearestAbove || fs::is_directory(place, error))) {
+            places.push_back(existing(place));
+        }
     }
     return places;
+}
+
+std::vector<LinkTarget> linkTargets() {
+    std::vector<LinkTarget> targets;
+    for (const char* directory : kLinkDirectories) {
+        addLinkTargets(directory, targets);
+    }
+    return targets;
 }
 
 }  // namespace cvagent::change

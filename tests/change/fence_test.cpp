@@ -5,6 +5,7 @@
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/un.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include <csignal>
@@ -91,6 +92,14 @@ std::vector<std::string> processes(const FakeHost& host) {
     return numbers;
 }
 
+bool become(const FakeHost& host, const std::vector<std::string>& wanted) {
+    const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(60);
+    while (processes(host) != wanted && std::chrono::steady_clock::now() < end) {
+        usleep(10'000);
+    }
+    return processes(host) == wanted;
+}
+
 HOST_TEST(Fence, LeavesNothingBehindWhenTimeIsOver) {
     moveRecords(host);
     const auto before = processes(host);
@@ -99,11 +108,26 @@ HOST_TEST(Fence, LeavesNothingBehindWhenTimeIsOver) {
     settings.program = REHEARSAL_PROGRAM;
     settings.longest = std::chrono::seconds(2);
     EXPECT_THROW(rehearse(settings, {reaching("hang")}), cvagent::change::CannotRehearse);
-    const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(30);
-    while (processes(host) != before && std::chrono::steady_clock::now() < end) {
+    EXPECT_TRUE(become(host, before));
+}
+
+HOST_TEST(Fence, EndsWithItsCaller) {
+    moveRecords(host);
+    const auto before = processes(host);
+    const pid_t caller = fork();
+    if (caller == 0) {
+        rehearsed({reaching("hang")}, REACHING_PLUGIN_FILE);
+        _exit(1);
+    }
+    // The caller, the program, the first process inside, and the one that hangs.
+    const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(60);
+    while (processes(host).size() < before.size() + 4 && std::chrono::steady_clock::now() < end) {
         usleep(10'000);
     }
-    EXPECT_EQ(processes(host), before);
+    EXPECT_GE(processes(host).size(), before.size() + 4);
+    kill(caller, SIGKILL);
+    waitpid(caller, nullptr, 0);
+    EXPECT_TRUE(become(host, before));
 }
 
 }  // namespace
