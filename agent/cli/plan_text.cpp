@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <array>
-#include <cstdio>
 
 #include "agent/change/unified_diff.h"
 
@@ -35,9 +34,13 @@ std::string answerText(const change::Answer& answer, const Style& style) {
 }
 
 std::string octal(mode_t mode) {
-    std::array<char, 16> digits{};
-    std::snprintf(digits.data(), digits.size(), "%04o", static_cast<unsigned>(mode));
-    return digits.data();
+    constexpr unsigned kDigits = 4;
+    constexpr unsigned kBits = 3;
+    std::string digits(kDigits, '0');
+    for (unsigned i = 0; i < kDigits; ++i) {
+        digits[kDigits - 1 - i] = static_cast<char>('0' + ((mode >> (kBits * i)) & 7U));
+    }
+    return digits;
 }
 
 /// What a file is besides its content.
