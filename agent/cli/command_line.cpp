@@ -3,11 +3,11 @@
 #include <CLI/CLI.hpp>
 #include <algorithm>
 #include <array>
-#include <cmath>
 #include <sstream>
 
 #include "agent/cli/failure.h"
 #include "agent/cli/moment.h"
+#include "agent/cli/option_parts.h"
 #include "agent/cli/print.h"
 
 namespace cvagent {
@@ -29,31 +29,6 @@ constexpr const char* kNodeHelp =
     "The node: its id, its path, or the last part of its path when only one node has it; of several "
     "plug-ins' "
     "nodes the first plug-in's";
-
-/// Numbers are decimal: "+1" and "0x10" are none, here as in ids and values.
-CLI::Validator wholeDecimal() {
-    return CLI::Validator(
-        [](const std::string& text) {
-            const bool good = text.find_first_not_of("0123456789") == std::string::npos;
-            return good ? std::string() : inQuotes(text) + " is no decimal number";
-        },
-        "");
-}
-
-/// Seconds up to a limit; the range check of the parser lets "nan" through.
-CLI::Validator secondsUpTo(double most) {
-    return CLI::Validator(
-        [most](const std::string& text) {
-            double seconds = 0;
-            const bool good = !text.starts_with('+') &&
-                              text.find_first_not_of("0123456789.eE+-") == std::string::npos &&
-                              CLI::detail::lexical_cast(text, seconds) && seconds >= 0 && seconds <= most;
-            return good ? std::string()
-                        : inQuotes(text) + " is no number of seconds from 0 to " +
-                              std::to_string(std::lround(most));
-        },
-        "");
-}
 
 /// The words of an enumeration, and nothing else.
 template <class Value>
@@ -134,10 +109,6 @@ void addCommandOptions(CLI::App& app, Options& options) {
         ->check(secondsUpTo(1e6));
 }
 
-void addJson(CLI::App& command, Options& options) {
-    command.add_flag("--json", options.json, "Print JSON");
-}
-
 // The parser would take a word in brackets apart ("[a,b]"); a mark in front keeps it whole.
 constexpr char kMark = '\x01';
 
@@ -158,13 +129,13 @@ void unmark(std::string& word) {
 
 void unmark(Options& options) {
     for (std::vector<std::string>* list :
-         {&options.values, &options.properties, &options.plugins, &options.kinds}) {
+         {&options.values, &options.properties, &options.plugins, &options.kinds, &options.nodes}) {
         for (std::string& word : *list) {
             unmark(word);
         }
     }
     for (std::string* word : {&options.node, &options.property, &options.nodeClass, &options.program,
-                              &options.since, &options.until}) {
+                              &options.since, &options.until, &options.changeFile}) {
         unmark(*word);
     }
     for (std::optional<std::string>* file : {&options.logFile, &options.traceFile}) {
@@ -229,7 +200,9 @@ void addSet(CLI::App& app, Options& options) {
     set->add_option("VALUE", options.values, "The new value; several for a list, \"\" empties it")
         ->required()
         ->type_name("");
-    set->add_flag("-y,--yes", options.yes, "Do not ask before the host is restarted or halted");
+    addYes(*set, options);
+    addForce(*set, options);
+    addVerifyWithin(*set, options, "0");
     addJson(*set, options);
     set->footer(
         "What a property accepts is told by: cvagent properties CLASS.\n"
@@ -303,7 +276,8 @@ std::string whyNoCommand(const CLI::App& app) {
     }
     unmark(*word);
     return "there is no command " + inQuotes(*word) +
-           "; the commands are: tree, get, set, watch, history, properties, doctor";
+           "; the commands are: tree, get, set, plan, apply, export, diff, watch, history, properties, "
+           "doctor";
 }
 
 /// The subcommand that was being read, for the hint.
@@ -327,6 +301,7 @@ std::optional<Options> parseCommandLine(int count, const char* const* words) {
     addReaders(app, options);
     addWatch(app, options);
     addSet(app, options);
+    addChanges(app, options);
     addHistory(app, options);
     addOffline(app, options);
     try {

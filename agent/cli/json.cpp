@@ -183,6 +183,10 @@ Json eventObject(const Event& event) {
         object["wanted"] = event.wanted;
         object["verdict"] = event.verdict;
     }
+    if (!event.plan.empty()) {
+        const Json plan = Json::parse(event.plan, nullptr, false);
+        object["plan"] = plan.is_discarded() ? Json(event.plan) : plan;  // a long one is kept in part
+    }
     if (event.number != 0) {
         object["number"] = event.number;
     }

@@ -29,7 +29,7 @@ std::string node(const IC::MutableNode& node, const std::vector<Reading>& readin
 std::string change(const IC::MutableNode& node, const Reading& before, const Reading& after);
 /// One line: {"time", "event", "path", ...}; with "number" when the agent has given one, "property":
 /// {"id", "name", "before", "after"} when the event is about one, and "caller", "wanted" and "verdict" when
-/// somebody has written it.
+/// somebody has written it; "plan" when that change had one.
 std::string event(const Event& event);
 /// The same with the "boot" in which it happened.
 std::string event(const Event& event, const std::string& boot);

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <mutex>
 
+#include "agent/change/in_force.h"
 #include "agent/cli/event_printer.h"
 #include "agent/cli/kept_events.h"
 #include "agent/cli/print.h"
@@ -20,6 +21,10 @@ constexpr const char* kRenameAdvice =
     "; rename the interface, bridge, team, disk or host of that name, or correct the file that names it: "
     "letters, digits, dots, dashes and underscores are fine";
 
+// Of two changes at once the second waits.
+constexpr std::chrono::seconds kWaitOfSet{3};
+constexpr std::chrono::seconds kWaitOfApply{120};
+
 void hint(const std::string& text, const std::string& advice = "") {
     if (!text.empty()) {
         complain(text + advice);
@@ -29,7 +34,8 @@ void hint(const std::string& text, const std::string& advice = "") {
 /// A question for one node needs the processors only if it can mean one of them: by a path, by an id, by a
 /// bare number. Another plug-in's builder may build anything, and a log is to be whole.
 bool needsProcessors(const Options& options) {
-    const bool ofOneNode = options.command == Command::get || options.command == Command::set;
+    const bool ofChanges = options.command >= Command::plan && options.command <= Command::diff;
+    const bool ofOneNode = options.command == Command::get || options.command == Command::set || ofChanges;
     if (!ofOneNode || !options.plugins.empty() || options.logFile || options.traceFile || options.logLevel) {
         return true;
     }
@@ -87,6 +93,9 @@ ProcessSettings processSettings(Options& options) {
     settings.log = {options.logFile, options.traceFile,          options.logLevel.value_or(kErrorLevel),
                     shown,           shown && !options.logLevel, kRenameAdvice};
     settings.commands = options.commands;
+    settings.waitForData = options.command == Command::set     ? kWaitOfSet
+                           : options.command == Command::apply ? kWaitOfApply
+                                                               : std::chrono::seconds(0);
     settings.hostTools = options.hostTools;
     return settings;
 }
@@ -108,6 +117,7 @@ LocalSession::LocalSession(const PreparedProcess& process, const Options& option
     settings.processors = options.processors;
     settings.tell = complain;
     settings.keeper = eventKeeper();
+    settings.bringIntoForce = change::bringingIntoForce();
     settings.alertTold = [alerts = alerts_](const Event& alert) { alerts->tell(alert); };
     hint(limitsOfUser(process.data()), "\nTo see everything run: sudo cvagent");
     hint(limitsOfData(process.data()));
@@ -192,6 +202,10 @@ void LocalSession::stop() {
 
 void LocalSession::end() {
     stop();
+}
+
+void LocalSession::announce(const Event& event) {
+    agent_->announce(event);
 }
 
 void LocalSession::showErrors(const Request& request) {

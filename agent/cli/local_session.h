@@ -37,6 +37,7 @@ public:
     std::shared_ptr<ShownMarks> marks() override { return shownMarks(); }
     std::size_t countNodes() override;
     void sendAlertsTo(std::function<void(const Event&)> receiver) override;
+    void announce(const Event& event) override;
     void showErrors(const Request& request) override;
     void tellMissingTools(const std::vector<Reading>& properties) override;
     /// Stops the agent.

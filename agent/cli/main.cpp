@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "agent/cli/caller.h"
+#include "agent/cli/changes.h"
 #include "agent/cli/command_line.h"
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/local_session.h"
@@ -23,14 +24,17 @@ using cvagent::Options;
 using Question = ExitStatus (*)(cvagent::Session& session, const Options& options);
 
 /// What needs an agent, in the order of Command; null for what does not.
-constexpr std::array<Question, 7> kQuestions = {cvagent::commands::tree, cvagent::commands::get,
-                                                cvagent::commands::set, cvagent::commands::watch};
+constexpr std::array<Question, 11> kQuestions = {cvagent::commands::tree,          cvagent::commands::get,
+                                                 cvagent::commands::set,           cvagent::commands::watch,
+                                                 cvagent::commands::plan,          cvagent::commands::apply,
+                                                 cvagent::commands::exportChanges, cvagent::commands::diff};
 
 constexpr int kAttempts = 10;  // to ask a service that has ended
 constexpr std::chrono::milliseconds kBetweenAttempts{100};
 
 bool onlyReads(const Options& options) {
-    return options.command != Command::watch && options.command != Command::set;
+    return options.command != Command::watch && options.command != Command::set &&
+           options.command != Command::apply;
 }
 
 /// What a watch runs on alerts gets the surroundings that it has without a service.
@@ -73,6 +77,9 @@ std::optional<ExitStatus> askService(Question ask, Options& options) {
 ExitStatus run(Options& options, cvagent::WantMessages& wants) {
     const Question ask = options.verify ? cvagent::commands::verifyTree
                                         : kQuestions.at(static_cast<std::size_t>(options.command));
+    if (!options.changeFile.empty()) {
+        options.changeText = cvagent::readChangeFile(options.changeFile);  // before the directory is left
+    }
     if (ask != nullptr) {
         if (const auto status = askService(ask, options)) {
             return *status;

@@ -8,7 +8,10 @@
 
 namespace cvagent {
 
-enum class Command { tree, get, set, watch, properties, doctor, history };
+enum class Command { tree, get, set, watch, plan, apply, exportChanges, diff, properties, doctor, history };
+
+/// How long apply looks whether a change comes about and stays.
+inline constexpr double kVerifySeconds = 3;
 
 /// What the command line asks for.
 struct Options {
@@ -38,6 +41,14 @@ struct Options {
     std::string property;
     std::vector<std::string> values;
     std::string nodeClass;
+    // of changes
+    std::vector<std::string> nodes;  ///< that are exported; none: all
+    std::vector<std::string> words;  ///< of a plan: a file, or node, property and values
+    std::string changeFile;          ///< "" for a change that was typed, "-" for standard input
+    std::string changeText;          ///< what is in it; not typed
+    bool force = false;              ///< although something speaks against it
+    bool dryRun = false;             ///< apply tells the plan only
+    std::optional<double> verifySeconds;
     // of the history
     std::string since;  ///< as moment.h reads it; "" for the beginning
     std::string until;  ///< the same; "" for the end

@@ -51,6 +51,9 @@ public:
     /// the service come; null: back.
     virtual void sendAlertsTo(std::function<void(const Event&)> receiver) = 0;
 
+    /// What this program has found out by itself becomes an event of its agent's; a service finds out by
+    /// itself.
+    virtual void announce(const Event& event) = 0;
     /// Prints what the plug-in has reported because of a call, and then what it reported by itself.
     virtual void showErrors(const Request& request) = 0;
     /// Names the tools that are missing for good, and what they cost.

@@ -60,8 +60,7 @@ struct Agent::Engine {
     std::vector<FailedPlugin> failed;
     Pool pool;
     Reader reader{pool, facts};
-    Writer writer{
-        pool, facts, announcer, {[this] { refresh(); }, [this](const Handle& node) { return lists(node); }}};
+    Writer writer;
 };
 
 Agent::Engine::Engine(const AgentSettings& settings)
@@ -71,7 +70,10 @@ Agent::Engine::Engine(const AgentSettings& settings)
                        : std::make_shared<LogOutput>(LogSettings(), std::make_shared<ErrorLines>())),
       deadline(settings.commandTime, settings.tell),
       events(EventLog::kMost, settings.lastEvent),
-      announcer(listenerOf(settings.keeper), facts, settings.alertTold) {
+      announcer(listenerOf(settings.keeper), facts, settings.alertTold),
+      writer(pool, facts, announcer,
+             {[this] { refresh(); }, [this](const Handle& node) { return lists(node); }},
+             settings.bringIntoForce) {
     if (!data) {
         throw std::invalid_argument("an agent needs a data directory");
     }

@@ -42,6 +42,8 @@ struct AgentSettings {
     /// Gives the events their numbers and keeps them, before anybody hears of them. Null: they are numbered
     /// and kept by the agent alone.
     std::shared_ptr<EventKeeper> keeper;
+    /// Behind each write; null: what a plug-in writes to files only stays there until the host reads them.
+    BringIntoForce bringIntoForce = nullptr;
     /// Number of the last event that was told before; the agent's begin behind it where no keeper gives
     /// others.
     std::uint64_t lastEvent = 0;

@@ -129,6 +129,7 @@ void Announcer::announceWrite(const IC::MutableNode& node, const Write& write) {
     event.caller = write.caller;
     event.wanted = write.wanted;
     event.verdict = write.verdict;
+    event.plan = write.plan;
     const std::lock_guard lock(guard_);
     const auto told = told_.find({event.nodeId, event.property});
     if (told != told_.end() && !write.refused) {

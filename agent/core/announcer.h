@@ -41,7 +41,8 @@ public:
         std::string caller;
         std::string wanted;
         std::string verdict;
-        bool refused;  ///< by the plug-in: the host is as it was told last
+        std::string plan;  ///< see Request
+        bool refused;      ///< by the plug-in: the host is as it was told last
     };
     void announceWrite(const IC::MutableNode& node, const Write& write);
 

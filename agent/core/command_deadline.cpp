@@ -175,6 +175,12 @@ CommandScope::~CommandScope() {
     scopes().all.erase(thread_);
 }
 
+bool CommandScope::isWriting() {
+    const std::lock_guard lock(scopes().guard);
+    const auto own = scopes().all.find(gettid());
+    return own != scopes().all.end() && own->second->kind_ == write;
+}
+
 std::string CommandScope::complaint() const {
     const std::lock_guard lock(scopes().guard);
     return complaint_;

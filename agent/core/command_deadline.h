@@ -62,6 +62,8 @@ public:
     CommandScope& operator=(const CommandScope&) = delete;
     ~CommandScope();
 
+    /// Whether the calling thread is in a write.
+    static bool isWriting();
     /// "timed out after 10 s: ethtool eth0" of the first command that was killed; empty when none was.
     std::string complaint() const;
 

@@ -9,6 +9,7 @@
 #include <cstdlib>
 #include <filesystem>
 #include <system_error>
+#include <thread>
 
 #include "agent/core/own_directory.h"
 #include "agent/core/problem.h"
@@ -44,6 +45,19 @@ int openLock(const std::string& path) {
     return lock;
 }
 
+/// @return 0 or an errno
+int lockWithin(int file, std::chrono::milliseconds wait) {
+    constexpr std::chrono::milliseconds kBetween{20};
+    const auto deadline = std::chrono::steady_clock::now() + wait;
+    while (flock(file, LOCK_EX | LOCK_NB) != 0) {
+        if (errno != EWOULDBLOCK || std::chrono::steady_clock::now() >= deadline) {
+            return errno;
+        }
+        std::this_thread::sleep_for(kBetween);
+    }
+    return 0;
+}
+
 std::string standardDirectory() {
     const char* path = QX::CorvistaUtilities::getMoraineDataDir();
     return path != nullptr ? path : "";
@@ -67,20 +81,21 @@ std::string userDirectory() {
     return home != nullptr && *home == '/' ? std::string(home) + "/.local/state/corvista/data/" : "";
 }
 
-HeldDirectory::HeldDirectory(const std::string& path, const DirectoryRole& role)
+HeldDirectory::HeldDirectory(const std::string& path, const DirectoryRole& role,
+                             std::chrono::milliseconds wait)
     : path_(ownDirectory(path, role)), lock_(openLock(path_ + kLockFile)) {
     if (lock_ >= 0) {
-        hold(role);
+        hold(role, wait);
     }
 }
 
-void HeldDirectory::hold(const DirectoryRole& role) const {
+void HeldDirectory::hold(const DirectoryRole& role, std::chrono::milliseconds wait) const {
     struct stat found {};
     const bool isOurs = fstat(lock_, &found) == 0 && S_ISREG(found.st_mode) && found.st_uid == geteuid();
     if (isOurs && (found.st_mode & 077U) != 0) {
         fchmod(lock_, 0600);
     }
-    const int error = !isOurs ? EPERM : flock(lock_, LOCK_EX | LOCK_NB) != 0 ? errno : 0;
+    const int error = isOurs ? lockWithin(lock_, wait) : EPERM;
     if (error == 0) {
         return;
     }
@@ -98,7 +113,7 @@ HeldDirectory::~HeldDirectory() {
     }
 }
 
-DataDirectory::DataDirectory() {
+DataDirectory::DataDirectory(std::chrono::milliseconds wait) {
     const char* chosen = std::getenv(kDataVariable);
     if (chosen != nullptr && *chosen == '\0') {
         throw Problem(Problem::refused, std::string(kDataVariable) + " is empty", Problem::dataVariable);
@@ -111,13 +126,13 @@ DataDirectory::DataDirectory() {
     // Root is held to the standard directory anyway, for the settings that are saved there.
     isStandard_ = chosen == nullptr && !isUsers;
     try {
-        own_.emplace(path, DirectoryRole{isStandard_ ? Problem::dataFixed : Problem::dataOwn, ""});
+        own_.emplace(path, DirectoryRole{isStandard_ ? Problem::dataFixed : Problem::dataOwn, ""}, wait);
     } catch (const std::system_error& error) {
         throw Problem(Problem::failed,
                       "cannot use the data directory " + inQuotes(path) + ": " + error.code().message(),
                       Problem::dataUse);
     }
-    holdSettings();
+    holdSettings(wait);
 }
 
 void DataDirectory::nameInEnvironment() const {
@@ -126,7 +141,7 @@ void DataDirectory::nameInEnvironment() const {
     }
 }
 
-void DataDirectory::holdSettings() {
+void DataDirectory::holdSettings(std::chrono::milliseconds wait) {
     const std::string fixed = fixedDirectory();
     std::error_code missing;
     if (fixed.empty() || fs::equivalent(own_->path(), fixed, missing)) {
@@ -135,7 +150,7 @@ void DataDirectory::holdSettings() {
     const std::string why = fixed == kSettings ? "; settings of interfaces are saved there whatever "
                                                : "; files in /tmp have the same names whatever ";
     try {
-        settings_.emplace(fixed, DirectoryRole{Problem::dataFixed, why + kDataVariable + " is"});
+        settings_.emplace(fixed, DirectoryRole{Problem::dataFixed, why + kDataVariable + " is"}, wait);
     } catch (const std::system_error&) {
         // Where it cannot be made, no agent saves or removes settings.
     } catch (const Problem& problem) {

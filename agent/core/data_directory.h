@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <optional>
 #include <string>
 
@@ -20,7 +21,9 @@ class HeldDirectory {
 public:
     /// Throws Problem when somebody else could change the directory and, as `busy`, when another agent holds
     /// it; std::system_error when it cannot be made or opened.
-    HeldDirectory(const std::string& path, const DirectoryRole& role);
+    /// @param wait how long another one may go on holding it
+    HeldDirectory(const std::string& path, const DirectoryRole& role,
+                  std::chrono::milliseconds wait = std::chrono::milliseconds(0));
     HeldDirectory(const HeldDirectory&) = delete;
     HeldDirectory& operator=(const HeldDirectory&) = delete;
     ~HeldDirectory();
@@ -29,7 +32,7 @@ public:
     const std::string& path() const { return path_; }
 
 private:
-    void hold(const DirectoryRole& role) const;
+    void hold(const DirectoryRole& role, std::chrono::milliseconds wait) const;
 
     std::string path_;
     int lock_;
@@ -41,7 +44,8 @@ private:
 class DataDirectory {
 public:
     /// Throws Problem; busy when another agent holds one of them.
-    DataDirectory();
+    /// @param wait how long it may go on holding it
+    explicit DataDirectory(std::chrono::milliseconds wait = std::chrono::milliseconds(0));
 
     /// Has the plug-ins find it. To be called before any thread.
     void nameInEnvironment() const;
@@ -49,7 +53,7 @@ public:
     const std::string& path() const { return own_->path(); }
 
 private:
-    void holdSettings();
+    void holdSettings(std::chrono::milliseconds wait);
 
     bool isStandard_ = false;  ///< the one that plug-ins use where none is named
     std::optional<HeldDirectory> own_;

@@ -34,6 +34,7 @@ struct Event {
     std::string caller;   ///< who has written; empty for what nobody asked for
     std::string wanted;   ///< the value that was to be, as text
     std::string verdict;  ///< "applied", "differs", "unknown" or "failed"; behind a colon the reason
+    std::string plan;     ///< of the change that the write belongs to, as JSON; empty where there is none
     // of alerts
     unsigned int firstCode = 0;
     unsigned int secondCode = 0;

@@ -17,7 +17,7 @@ PreparedProcess::PreparedProcess(ProcessSettings settings) {
         }
     }
     prepareSurroundings(settings.files);
-    data_ = std::make_shared<DataDirectory>();
+    data_ = std::make_shared<DataDirectory>(settings.waitForData);
     data_->nameInEnvironment();
     quiet_.emplace();
     log_ = std::make_shared<LogOutput>(settings.log, errors_);  // before /tmp becomes another one

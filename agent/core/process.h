@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <memory>
 #include <string>
 #include <vector>
@@ -19,6 +20,8 @@ struct ProcessSettings {
     HostTools hostTools = HostTools::automatic;
     /// Links may come whose names the host's own tools do not find: the front end stays.
     bool linksMayCome = false;
+    /// How long another agent may go on holding the data directory.
+    std::chrono::milliseconds waitForData{0};
 };
 
 /// All that an agent needs and that changes the whole process: surroundings, the data directory and the

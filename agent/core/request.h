@@ -17,16 +17,20 @@ public:
     /// @param caller for the record, events of writes carry it: a user, a connection
     /// @param deadline when the caller wants an answer, whatever it is; the default waits for as long as it
     ///                 takes
-    explicit Request(std::string caller, Clock::time_point deadline = Clock::time_point::max())
-        : caller_(std::move(caller)), deadline_(deadline) {}
+    /// @param plan of the change that its writes belong to, as JSON; "" where there is none
+    explicit Request(std::string caller, Clock::time_point deadline = Clock::time_point::max(),
+                     std::string plan = {})
+        : caller_(std::move(caller)), plan_(std::move(plan)), deadline_(deadline) {}
 
     const std::string& caller() const { return caller_; }
+    const std::string& plan() const { return plan_; }
     Clock::time_point deadline() const { return deadline_; }
     /// What the plug-in reported because of this call, and of no other.
     ErrorLines& errors() const { return *errors_; }
 
 private:
     std::string caller_;
+    std::string plan_;
     Clock::time_point deadline_;
     std::shared_ptr<ErrorLines> errors_ = std::make_shared<ErrorLines>();
 };

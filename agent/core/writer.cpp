@@ -52,6 +52,10 @@ std::string lackingEffect(const IC::MutableNode& node, const Property& row, cons
     return effect == nullptr ? "" : effect->lacking({node, written, after.failed() ? nullptr : &after.value});
 }
 
+std::string joined(const std::string& first, const std::string& second) {
+    return first + (first.empty() || second.empty() ? "" : ", and ") + second;
+}
+
 /// Why nothing is known of the property after its write, when it was not read.
 const char* afterUnread(const WriteResult& result, bool refused) {
     return refused ? "not asked" : result.problem ? "cut off" : "can only be written";
@@ -66,8 +70,12 @@ std::string verdictOf(const WriteResult& result, bool refused) {
         return "differs: " + result.lacking;
     }
     static constexpr std::array kWords = {"applied", "differs", "unknown"};
-    return std::string(kWords.at(result.outcome)) +
-           (result.complained ? ": the plug-in reported errors" : "");
+    std::string text = kWords.at(result.outcome);
+    text += result.complained ? ": the plug-in reported errors" : "";
+    for (const std::string& note : result.notes) {
+        text += (text.find(':') == std::string::npos ? ": " : "; ") + note;
+    }
+    return text;
 }
 
 }  // namespace
@@ -198,20 +206,23 @@ WriteResult Writer::perform(const Job& job, const Request& request) {
     if (row.readable) {
         result.before = facts_.ask(*job.node, row.id);
     }
+    const auto inForce = bringIntoForce_ ? bringIntoForce_(*job.node, row, job.value) : nullptr;
     const std::size_t errorsBefore = request.errors().count();
     result.problem = setGuarded(*job.node, row, job.value);
     result.complained = request.errors().count() > errorsBefore;
+    EffectInForce effect = inForce && !result.problem ? inForce() : EffectInForce();
     tree_.refresh();
     const bool refused = result.problem && result.problem->kind() == Problem::failed;
     result.after = {row.id, &row, {}, afterUnread(result, refused)};
     if (!result.problem && row.readable) {
         result.after = facts_.ask(*job.node, row.id);
         result.outcome = compare(row, job.value, result.after);
-        result.lacking = lackingEffect(*job.node, row, job.value, result.after);
+        result.lacking = joined(lackingEffect(*job.node, row, job.value, result.after), effect.lacking);
+        result.notes = std::move(effect.notes);
     }
     announcer_.announceWrite(
         *job.node, {result.before, result.after, request.caller(), static_cast<std::string>(job.value),
-                    verdictOf(result, refused), refused});
+                    verdictOf(result, refused), request.plan(), refused});
     return result;
 }
 

@@ -7,6 +7,7 @@
 #include <mutex>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "agent/core/announcer.h"
 #include "agent/core/pool.h"
@@ -28,8 +29,19 @@ struct WriteResult {
     Outcome outcome = notKnown;
     bool complained = false;         ///< the plug-in reported errors of the write, though it took the value
     std::string lacking;             ///< what is not to be seen on the host, for people; "" when nothing is
+    std::vector<std::string> notes;  ///< what else has happened on the running host because of it
     std::optional<Problem> problem;  ///< why it failed, or was cut off; nothing when the plug-in took it
 };
+
+/// What came of a write on the running host; see WriteResult.
+struct EffectInForce {
+    std::string lacking;
+    std::vector<std::string> notes;
+};
+/// Brings into the running host what a plug-in only writes to files. Called before a write; what it gives is
+/// called behind one that the plug-in took. May give none.
+using BringIntoForce = std::function<std::function<EffectInForce()>(
+    const IC::MutableNode& node, const Property& row, const IC::PropertyValue& value)>;
 
 /// Writes properties, one at a time: each write reads files of the host, changes them and puts them back, and
 /// two at once would lose lines. Reads go on beside it. Any thread.
@@ -42,8 +54,12 @@ public:
     };
 
     /// All outlive the writer.
-    Writer(Pool& pool, Facts& facts, Announcer& announcer, Tree tree)
-        : pool_(pool), facts_(facts), announcer_(announcer), tree_(std::move(tree)) {}
+    Writer(Pool& pool, Facts& facts, Announcer& announcer, Tree tree, BringIntoForce bringIntoForce = nullptr)
+        : pool_(pool),
+          facts_(facts),
+          announcer_(announcer),
+          tree_(std::move(tree)),
+          bringIntoForce_(std::move(bringIntoForce)) {}
     Writer(const Writer&) = delete;
     Writer& operator=(const Writer&) = delete;
 
@@ -72,6 +88,7 @@ private:
     Facts& facts_;
     Announcer& announcer_;
     Tree tree_;
+    const BringIntoForce bringIntoForce_;
     std::mutex guard_;  // guards everything below
     std::condition_variable turnOver_;
     bool busy_ = false;

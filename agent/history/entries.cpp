@@ -14,11 +14,12 @@ constexpr const char* kHas = "SELECT 1 FROM entries WHERE number = :number";
 constexpr const char* kAdd =
     "INSERT INTO entries (number, run, kind, time, path, message, node, class, property, name, before, "
     "after, "
-    "caller, wanted, verdict, first_code, second_code, event_code) VALUES (:number, :run, :kind, :time, "
+    "caller, wanted, verdict, first_code, second_code, event_code, plan) VALUES (:number, :run, :kind, "
+    ":time, "
     ":path, "
     ":message, :node, :class, :property, :name, :before, :after, :caller, :wanted, :verdict, :first, "
     ":second, "
-    ":event)";
+    ":event, :plan)";
 constexpr const char* kLastAlert =
     "SELECT number, message, first_code, second_code, event_code, number > "
     "ifnull((SELECT value FROM facts WHERE name = 'settled'), 0) "
@@ -31,7 +32,13 @@ constexpr const char* kCondition =
 // In the order of Column.
 constexpr const char* kColumns =
     "SELECT number, kind, time, path, message, node, class, property, name, before, after, caller, wanted, "
-    "verdict, first_code, second_code, event_code, boot";
+    "verdict, first_code, second_code, event_code, plan, boot";
+// The form before had no plans; it is read as it is until somebody writes.
+constexpr const char* kHasPlans = "SELECT count(*) FROM pragma_table_info('entries') WHERE name = 'plan'";
+constexpr const char* kColumnsBefore =
+    "SELECT number, kind, time, path, message, node, class, property, name, before, after, caller, wanted, "
+    "verdict, first_code, second_code, event_code, '', boot";
+constexpr const char* kNothing = "SELECT 1";
 constexpr const char* kInOrder = "ORDER BY number LIMIT :most";
 constexpr const char* kCount = "SELECT count(*)";
 constexpr const char* kPlace = "SELECT number - 1";
@@ -60,6 +67,7 @@ enum Column : int {
     firstCode,
     secondCode,
     eventCode,
+    plan,
     boot,
 };
 
@@ -129,6 +137,7 @@ HistoryEntry entryOf(const Statement& row) {
     event.caller = row.text(Column::caller);
     event.wanted = row.text(Column::wanted);
     event.verdict = row.text(Column::verdict);
+    event.plan = row.text(Column::plan);
     event.firstCode = plain(row, Column::firstCode);
     event.secondCode = plain(row, Column::secondCode);
     event.eventCode = plain(row, Column::eventCode);
@@ -141,9 +150,9 @@ HistoryEntry entryOf(const Statement& row) {
 Entries::Entries(const Database& database)
     : last_(database.handle(), kLast),
       has_(database.handle(), kHas),
-      add_(database.handle(), kAdd),
+      add_(database.handle(), database.number(kHasPlans) != 0 ? kAdd : kNothing),
       alert_(database.handle(), kLastAlert),
-      read_(ofQuery(database, kColumns, kInOrder)),
+      read_(ofQuery(database, database.number(kHasPlans) != 0 ? kColumns : kColumnsBefore, kInOrder)),
       count_(ofQuery(database, kCount)),
       place_(ofQuery(database, kPlace, kFromTheEnd)) {}
 
@@ -163,9 +172,10 @@ void Entries::add(std::uint64_t number, std::int64_t run, const Event& event) {
     const std::string kind = eventName(event.kind);
     const std::array texts = {kept(event.path),         kept(event.message), kept(event.nodeClass),
                               kept(event.propertyName), kept(event.before),  kept(event.after),
-                              kept(event.caller),       kept(event.wanted),  kept(event.verdict)};
-    constexpr std::array kNames = {":path",  ":message", ":class",  ":name",   ":before",
-                                   ":after", ":caller",  ":wanted", ":verdict"};
+                              kept(event.caller),       kept(event.wanted),  kept(event.verdict),
+                              kept(event.plan)};
+    constexpr std::array kNames = {":path",  ":message", ":class",  ":name",    ":before",
+                                   ":after", ":caller",  ":wanted", ":verdict", ":plan"};
     static_assert(kNames.size() == std::tuple_size_v<decltype(texts)>);
     for (std::size_t i = 0; i < texts.size(); ++i) {
         add_.set(kNames.at(i), texts.at(i));

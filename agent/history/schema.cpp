@@ -53,6 +53,8 @@ CREATE TABLE facts (
   value INTEGER NOT NULL
 );
 )sql",
+    // What a change was foreseen to do, kept with the write that began it.
+    "ALTER TABLE entries ADD COLUMN plan TEXT NOT NULL DEFAULT ''",
 };
 constexpr std::int64_t kVersion = std::size(kSteps);
 

@@ -7,6 +7,7 @@
 #include <csignal>
 #include <optional>
 
+#include "agent/change/in_force.h"
 #include "agent/core/catalogue_file.h"
 #include "agent/core/plugin_files.h"
 #include "agent/core/process.h"
@@ -73,6 +74,7 @@ AgentSettings agentSettings(const PreparedProcess& process, const Options& optio
     settings.commandTime = config.commandTime;
     settings.keeper = past.keeper();
     settings.lastEvent = past.last();
+    settings.bringIntoForce = change::bringingIntoForce();
     settings.tell = [](const std::string& text) { log(Priority::warning, text); };
     return settings;
 }

@@ -85,6 +85,7 @@ int ranByShell(const char* command) {
 
 CVAGENT_EXPORT FILE* popen(const char* command, const char* mode) {
     countBegun();
+    cvagent::shell::tellCommand(command);
     FILE* const pipe = opened(command, mode);
     if (pipe == nullptr) {
         countEnded();
@@ -109,6 +110,7 @@ CVAGENT_EXPORT int system(const char* command) {
         return 1;  // there is a shell
     }
     countBegun();
+    cvagent::shell::tellCommand(command);
     const auto direct = cvagent::shell::runCommand(command);
     const int status = direct ? *direct : ranByShell(command);
     countEnded();

@@ -3,6 +3,7 @@
 #include <linux/netlink.h>
 #include <linux/rtnetlink.h>
 #include <sys/socket.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <array>
@@ -20,11 +21,19 @@ constexpr unsigned kGroups = group(RTNLGRP_LINK) | group(RTNLGRP_IPV4_IFADDR) | 
                              group(RTNLGRP_IPV4_ROUTE) | group(RTNLGRP_IPV6_ROUTE) |
                              group(RTNLGRP_IPV6_PREFIX) | group(RTNLGRP_IPV6_IFINFO) | group(RTNLGRP_NEXTHOP);
 
+/// The network that this thread is in; 0 where nobody tells.
+ino_t ownNetwork() {
+    struct stat found {};
+    return stat("/proc/thread-self/ns/net", &found) == 0 ? found.st_ino : 0;
+}
+
 }  // namespace
 
-/// A child process may have a network of its own, and its parent's socket tells of the parent's.
+/// A child process may have a network of its own, and its parent's socket tells of the parent's; so does one
+/// of before this process has gone to another network.
 bool KernelNews::subscribe() {
     owner_ = getpid();
+    network_ = ownNetwork();
     hosttools::Descriptor made(socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC | SOCK_NONBLOCK, NETLINK_ROUTE));
     sockaddr_nl address{};
     address.nl_family = AF_NETLINK;
@@ -49,7 +58,7 @@ bool KernelNews::drain() const {
 }
 
 bool KernelNews::isQuiet() {
-    if (!socket_.isOpen() || owner_ != getpid()) {
+    if (!socket_.isOpen() || owner_ != getpid() || network_ != ownNetwork()) {
         subscribe();
         return false;
     }

@@ -20,6 +20,7 @@ private:
 
     hosttools::Descriptor socket_;
     pid_t owner_ = 0;
+    ino_t network_ = 0;
 };
 
 }  // namespace cvagent::shell

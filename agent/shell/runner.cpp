@@ -18,6 +18,7 @@ namespace cvagent::shell {
 namespace {
 
 std::atomic<bool> allToShell = false;
+std::atomic<void (*)(const char*)> listener = nullptr;
 
 struct Streams {
     std::mutex guard;
@@ -77,6 +78,16 @@ std::optional<FILE*> openedBy(const char* text, Outcome (Command::*begin)() noex
 
 void leaveAllToShell(bool all) {
     allToShell = all;
+}
+
+void hearCommands(void (*hear)(const char* command)) {
+    listener = hear;
+}
+
+void tellCommand(const char* command) {
+    if (const auto hear = listener.load(); hear != nullptr) {
+        hear(command);
+    }
 }
 
 std::optional<FILE*> openCommand(const char* command) {

@@ -9,6 +9,12 @@ namespace cvagent::shell {
 /// any.
 void leaveAllToShell(bool all);
 
+/// Has every command told before it begins, on the thread that gives it. To be set once, before there are
+/// any.
+void hearCommands(void (*hear)(const char* command));
+/// A command begins.
+void tellCommand(const char* command);
+
 /// Runs a command as popen(command, "r") does.
 /// @return nothing when it is for a shell to run; null with errno when the system has no room for it
 std::optional<FILE*> openCommand(const char* command);

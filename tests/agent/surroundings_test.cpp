@@ -84,7 +84,9 @@ HOST_TEST(CommandLine, NamesTheWordThatIsWrong) {
     CvagentRun cvagent(host);
     for (const auto& [words, complaint] : std::vector<std::pair<std::vector<std::string>, std::string>>{
              {{"foo"},
-              "there is no command 'foo'; the commands are: tree, get, set, watch, history, properties, "
+              "there is no command 'foo'; the commands are: tree, get, set, plan, apply, export, diff, "
+              "watch, "
+              "history, properties, "
               "doctor"},
              {{"--json", "foo", "eth0"}, "there is no command 'foo'"},
              {{"--host-tools", "some", "tree"}, "'some' is none of: auto, classic, native"},

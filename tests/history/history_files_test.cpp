@@ -234,6 +234,54 @@ HOST_TEST(HistoryFile, OfALaterVersionIsRefusedAndLeftAsItIs) {
     EXPECT_THAT(movedAside(host), IsEmpty());
 }
 
+/// A history of the first form, with one entry, as its program left it.
+void makeOfFirstForm(FakeHost& host) {
+    host.directory("/var/lib/corvista", 0700);
+    host.file(kFile, "", 0600);
+    const Database database(kFile, Database::Access::write);
+    database.execute(R"sql(
+CREATE TABLE runs (run INTEGER PRIMARY KEY AUTOINCREMENT, boot TEXT NOT NULL, began INTEGER NOT NULL);
+CREATE TABLE entries (
+  number INTEGER PRIMARY KEY AUTOINCREMENT, run INTEGER NOT NULL REFERENCES runs, kind TEXT NOT NULL,
+  time INTEGER NOT NULL, path TEXT NOT NULL, message TEXT NOT NULL, node INTEGER NOT NULL,
+  class TEXT NOT NULL, property INTEGER NOT NULL, name TEXT NOT NULL, before TEXT NOT NULL,
+  after TEXT NOT NULL, caller TEXT NOT NULL, wanted TEXT NOT NULL, verdict TEXT NOT NULL,
+  first_code INTEGER NOT NULL, second_code INTEGER NOT NULL, event_code INTEGER NOT NULL);
+CREATE INDEX alerts_of_paths ON entries (path, number) WHERE kind = 'alert';
+CREATE TABLE marks (uid INTEGER PRIMARY KEY, number INTEGER NOT NULL);
+CREATE TABLE facts (name TEXT PRIMARY KEY, value INTEGER NOT NULL);
+INSERT INTO runs VALUES (1, 'a boot', 1795262400);
+INSERT INTO entries VALUES (41, 1, 'written', 1795262400, '/oshw/root/computer', 'of old', 3, 'computer',
+  116, 'OwnerName', 'a', 'b', 'root', 'b', 'applied', 0, 0, 0);
+PRAGMA application_id = 0x43764873;
+PRAGMA user_version = 1)sql");
+    database.execute("PRAGMA wal_checkpoint(TRUNCATE)");
+}
+
+HOST_TEST(HistoryFile, OfTheFormWithoutPlansIsReadAsItIs) {
+    makeOfFirstForm(host);
+    const auto before = host.read(kFile);
+    const auto entries = HistoryReader(kPlace).read({}, kAll);
+    ASSERT_THAT(kept::messages(entries), ElementsAre("of old"));
+    EXPECT_EQ(entries[0].event.verdict, "applied");
+    EXPECT_EQ(entries[0].event.plan, "");
+    EXPECT_EQ(entries[0].boot, "a boot");
+    EXPECT_EQ(host.read(kFile), before);
+}
+
+HOST_TEST(HistoryFile, OfTheFormWithoutPlansGetsThemWithTheNextEntry) {
+    makeOfFirstForm(host);
+    History history(kPlace);
+    Event planned = kept::event("new");
+    planned.plan = R"({"files": []})";
+    EXPECT_EQ(kept::append(history, planned), 42U);
+    const auto entries = HistoryReader(kPlace).read({}, kAll);
+    ASSERT_THAT(kept::messages(entries), ElementsAre("of old", "new"));
+    EXPECT_EQ(entries[0].event.plan, "");
+    EXPECT_EQ(entries[1].event.plan, planned.plan);
+    EXPECT_EQ(Database(kFile, Database::Access::read).number("PRAGMA user_version"), 2);
+}
+
 HOST_TEST(HistoryFile, OfAnotherProgramIsRefusedAndLeftAsItIs) {
     host.directory("/var/lib/corvista", 0700);
     host.file(kFile, "", 0600);

@@ -34,6 +34,7 @@ HOST_TEST(History, KeepsEverythingOfAnEvent) {
     event.caller = "anna (uid 1000) as root (uid 0)";
     event.wanted = "room 5";
     event.verdict = "differs: why";
+    event.plan = "{}";
     event.firstCode = 1;
     event.secondCode = 2;
     event.eventCode = 3;
@@ -47,8 +48,9 @@ HOST_TEST(History, KeepsEverythingOfAnEvent) {
     EXPECT_EQ(found.event.firstCode, 1U);
     EXPECT_EQ(found.event.secondCode, 2U);
     EXPECT_EQ(found.event.eventCode, 3U);
-    for (const auto text : {&Event::path, &Event::message, &Event::nodeClass, &Event::propertyName,
-                            &Event::before, &Event::after, &Event::caller, &Event::wanted, &Event::verdict}) {
+    for (const auto text :
+         {&Event::path, &Event::message, &Event::nodeClass, &Event::propertyName, &Event::before,
+          &Event::after, &Event::caller, &Event::wanted, &Event::verdict, &Event::plan}) {
         EXPECT_EQ(found.event.*text, event.*text);
     }
     EXPECT_EQ(found.boot.size(), found.boot.empty() ? 0U : 36U);

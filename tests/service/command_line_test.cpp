@@ -97,6 +97,34 @@ HOST_TEST(ServiceClient, AnswersTheSameOfARecordedHost) {
                CORVISTA_PLUGIN_FILE);
 }
 
+HOST_TEST(ServiceClient, ExportsAndComparesAsAnAgentOfItsOwnDoes) {
+    host.copyTree("suse-two-nics");
+    host.file("/root/drift",
+              R"([{"node": "ip-config:eth0", "property": "DNSServers", "value": "192.0.2.99"}])");
+    expectSame(host,
+               {{"export"},
+                {"export", "ip-config:eth1"},
+                {"diff", "/root/drift"},
+                {"diff", "/root/drift", "--json"},
+                {"diff", "/root/none"},
+                {"apply", "/root/none"}},
+               CORVISTA_PLUGIN_FILE);
+}
+
+HOST_TEST(ServiceClient, AppliesAFileWriteByWrite) {
+    ServiceRun run(host);
+    run.start();
+    host.file("/root/changes",
+              R"([{"node": "computer", "property": "OwnerContact", "value": "room 4"},)"
+              R"( {"node": "ip-config:eth0", "property": "DNSServers", "value": "192.0.2.9"}])");
+    const Finished first = host.run(asking({"apply", "/root/changes", "--verify-within", "0"}));
+    EXPECT_EQ(first.status, 0) << first.out << first.err;
+    EXPECT_THAT(first.out, HasSubstr("applied    /oshw/root/computer OwnerContact  room 4\n"));
+    const Finished second = host.run(asking({"apply", "/root/changes"}));
+    EXPECT_EQ(second.status, 0) << second.out << second.err;
+    EXPECT_THAT(second.out, testing::Not(HasSubstr("applied")));
+}
+
 HOST_TEST(ServiceClient, TellsThePropertiesOfARecordedHost) {
     host.copyTree("suse-two-nics");
     const auto nodes = [&host](const Words& line) {

@@ -105,12 +105,16 @@ extern "C" __attribute__((visibility("default"))) FILE* popen(const char* line, 
         errno = EMFILE;
         return nullptr;
     }
+    cvagent::shell::tellCommand(line);
     return shell_stub::open(line, mode, run);
 }
 
 extern "C" __attribute__((visibility("default"))) int system(const char* line) {
     static const auto next = reinterpret_cast<System>(dlsym(RTLD_NEXT, "system"));
     const bool shell = line == nullptr || inShells();
+    if (line != nullptr) {
+        cvagent::shell::tellCommand(line);
+    }
     const auto direct = shell ? std::nullopt : cvagent::shell::runCommand(line);
     return direct ? *direct : next(line);
 }

@@ -13,6 +13,10 @@ ExitStatus tree(Session& session, const Options& options);
 ExitStatus get(Session& session, const Options& options);
 ExitStatus set(Session& session, const Options& options);
 ExitStatus watch(Session& session, const Options& options);
+ExitStatus plan(Session& session, const Options& options);
+ExitStatus apply(Session& session, const Options& options);
+ExitStatus exportChanges(Session& session, const Options& options);
+ExitStatus diff(Session& session, const Options& options);
 /// doctor --verify
 ExitStatus verifyTree(Session& session, const Options& options);
 // These need no agent.

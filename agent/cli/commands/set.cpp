@@ -1,6 +1,10 @@
+#include <algorithm>
+
 #include "agent/cli/caller.h"
+#include "agent/cli/changes.h"
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/json.h"
+#include "agent/cli/outcomes.h"
 #include "agent/cli/print.h"
 #include "agent/cli/prompt.h"
 #include "agent/core/property_words.h"
@@ -33,6 +37,22 @@ bool isDone(const WriteResult& result, const Property& row) {
 
 }  // namespace
 
+namespace {
+
+/// Whether it stays so as long as was asked for.
+bool isKept(Session& session, const std::vector<MeantChange>& change, double seconds,
+            const Request& request) {
+    std::vector<Outcome> outcomes(1);
+    outcomes.front().kind = Outcome::differs;
+    verifyWithin(session, change, outcomes, seconds, request);
+    if (outcomes.front().kind == Outcome::differs) {
+        complain(printable(change.front().target()) + " differs: " + outcomes.front().reason);
+    }
+    return outcomes.front().kind != Outcome::differs;
+}
+
+}  // namespace
+
 ExitStatus set(Session& session, const Options& options) {
     const NodeRef node = session.find(options.node);
     const Property& row = writableRow(*node, options.property);
@@ -40,16 +60,20 @@ ExitStatus set(Session& session, const Options& options) {
     if (const Label* drastic = drasticLabel(row, value); drastic != nullptr && !options.yes) {
         confirm(drastic->text);
     }
+    const std::vector<MeantChange> change{{node, &row, options.values, value, ""}};
+    refuseUnlessForced(change, objectionsTo(change), options.force);
     const Request request(callerName());
     const WriteResult result = session.write(node, row, options.values, request);
     session.showErrors(request);
+    std::ranges::for_each(result.notes, [](const std::string& note) { complain(printable(note)); });
     session.tellMissingTools({result.after});
     if (result.problem) {
         throw Problem(*result.problem);
     }
     print(options.json ? json::change(*node, row.readable ? result.before : result.after, result.after)
                        : report(*node, result, row.readable, Style::detect()));
-    return isDone(result, row) ? ExitStatus::done : ExitStatus::failed;
+    const bool isSo = !options.verifySeconds || isKept(session, change, *options.verifySeconds, request);
+    return isSo && isDone(result, row) ? ExitStatus::done : ExitStatus::failed;
 }
 
 }  // namespace cvagent::commands

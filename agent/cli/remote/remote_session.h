@@ -32,6 +32,7 @@ public:
     std::size_t countNodes() override;
     /// The service has told the alerts to its plug-ins' satisfaction: only who watches hears of them here.
     void sendAlertsTo(std::function<void(const Event&)> receiver) override;
+    void announce(const Event& /*event*/) override {}
     void showErrors(const Request& request) override;
     /// That is the service's to tell: its commands are run there.
     void tellMissingTools(const std::vector<Reading>& properties) override;

@@ -1,0 +1,292 @@
+#include "agent/change/in_force.h"
+
+#include <linux/rtnetlink.h>
+
+#include <algorithm>
+#include <cstring>
+#include <iterator>
+
+#include "agent/change/interface_settings.h"
+#include "agent/change/kernel_network.h"
+
+namespace cvagent::change {
+
+namespace {
+
+/// A link, and its network before the plug-in wrote.
+struct Scene {
+    KernelNetwork before;
+    KernelLink link;
+    std::string value;  ///< that is written
+};
+
+std::string reason(int problem) {
+    return std::strerror(problem);
+}
+
+class AddressMove {
+public:
+    AddressMove(const Scene& scene, const Ip& ip, unsigned prefix)
+        : scene_(scene),
+          ip_(ip),
+          prefix_(prefix),
+          old_(scene.before.mainAddress(scene.link.index, ip.isIpv6)) {}
+
+    EffectInForce make() {
+        if (KernelNetwork::read().find(scene_.link.index, ip_, prefix_) == nullptr && !add()) {
+            return effect_;
+        }
+        removeOld();
+        putFirst();
+        putBackAddresses();
+        putBackRoutes();
+        return effect_;
+    }
+
+private:
+    bool add() {
+        if (ip_.isIpv6) {
+            makeRoom();
+        }
+        const int problem = addAddress(scene_.link, ip_, prefix_);
+        if (problem != 0) {
+            effect_.lacking =
+                "the running host does not take " + shown(ip_, prefix_) + ": " + reason(problem);
+        }
+        return problem == 0;
+    }
+
+    /// The kernel keeps one IPv6 address of a kind, with the prefix length that it had first.
+    void makeRoom() const {
+        for (const KernelAddress& each : KernelNetwork::read().addresses) {
+            if (each.link == scene_.link.index && each.ip == ip_) {
+                remove(each);
+            }
+        }
+    }
+
+    static std::string shown(const Ip& ip, unsigned prefix) {
+        return ip.text() + "/" + std::to_string(prefix);
+    }
+
+    bool isWanted(const KernelAddress& address) const {
+        return address.ip == ip_ && address.prefix == prefix_;
+    }
+
+    bool isOld(const KernelAddress& address) const {
+        return old_ != nullptr && address.ip == old_->ip && address.prefix == old_->prefix;
+    }
+
+    /// The plug-in gives a running address its mask: the old one may have it by now, or be gone.
+    void removeOld() {
+        for (const KernelAddress& each : KernelNetwork::read().addresses) {
+            const bool isSame = each.link == scene_.link.index && old_ != nullptr && each.ip == old_->ip;
+            if (isSame && !isWanted(each)) {
+                noteIf(remove(each), "the old address " + shown(each.ip, each.prefix) + " stays");
+                if (!each.isPermanent) {
+                    effect_.notes.push_back(each.ip.text() +
+                                            " was leased: a DHCP client that still runs may bring it back");
+                }
+            }
+        }
+    }
+
+    /// A link is known by its first address, and one that was added beside the old one in its subnet has gone
+    /// with it or stands behind others.
+    void putFirst() {
+        if (ip_.isIpv6) {
+            return;
+        }
+        const KernelNetwork now = KernelNetwork::read();
+        for (const KernelAddress& each : now.addresses) {
+            const bool isRival = each.label == scene_.link.name || each.ip.sharesPrefix(ip_, prefix_);
+            const bool isInFront =
+                each.link == scene_.link.index && !each.ip.isIpv6 && !isWanted(each) && isRival;
+            if (isWanted(each) && each.link == scene_.link.index) {
+                break;
+            }
+            if (isInFront) {
+                remove(each);
+            }
+        }
+        if (KernelNetwork::read().find(scene_.link.index, ip_, prefix_) == nullptr) {
+            add();
+        }
+    }
+
+    void putBackAddresses() {
+        for (const KernelAddress& each : scene_.before.addresses) {
+            const bool isOther = each.link == scene_.link.index && each.ip.isIpv6 == ip_.isIpv6 &&
+                                 !isOld(each) && each.ip != ip_;
+            if (isOther && KernelNetwork::read().find(each.link, each.ip, each.prefix) == nullptr) {
+                noteIf(addAgain(each), "the address " + shown(each.ip, each.prefix) + " is gone");
+            }
+        }
+    }
+
+    /// Those that the kernel makes of an address come and go with it.
+    void putBackRoutes() {
+        for (const KernelRoute& each : scene_.before.routes) {
+            const bool preferred = old_ != nullptr && each.source == old_->ip;
+            const bool isOurs = each.destination.isIpv6 == ip_.isIpv6 && each.table != RT_TABLE_LOCAL &&
+                                each.protocol != RTPROT_KERNEL &&
+                                (each.link == scene_.link.index || preferred);
+            if (isOurs && !KernelNetwork::read().has(each)) {
+                noteIf(addAgain(each, preferred ? std::optional(ip_) : std::nullopt),
+                       "the route " + textOf(each, scene_.before) + " is gone");
+            }
+        }
+    }
+
+    void noteIf(int problem, const std::string& what) {
+        if (problem != 0) {
+            effect_.notes.push_back(what + ": " + reason(problem));
+        }
+    }
+
+    const Scene& scene_;
+    Ip ip_;
+    unsigned prefix_;
+    const KernelAddress* old_;
+    EffectInForce effect_;
+};
+
+/// @param keys of the address and of what tells its subnet, in the interface's file
+EffectInForce moveAddress(const Scene& scene, const std::optional<Ip>& ip, std::optional<unsigned> prefix) {
+    if (!ip) {
+        return {};
+    }
+    if (!prefix) {
+        const KernelAddress* old = scene.before.mainAddress(scene.link.index, ip->isIpv6);
+        if (old == nullptr) {
+            return {"no mask or prefix length is known of it, so the running host has not got it", {}};
+        }
+        prefix = old->prefix;
+    }
+    return AddressMove(scene, *ip, *prefix).make();
+}
+
+/// Whether the link's own address is another one than the file's: then the file's is not in force, and a
+/// change of its mask alone does not bring it there.
+bool isForeign(const Scene& scene, const std::optional<Ip>& ip) {
+    const KernelAddress* old = ip ? scene.before.mainAddress(scene.link.index, ip->isIpv6) : nullptr;
+    return old != nullptr && old->ip != *ip;
+}
+
+std::optional<unsigned> runningPrefix(const Scene& scene, bool isIpv6) {
+    const KernelAddress* old = scene.before.mainAddress(scene.link.index, isIpv6);
+    return old == nullptr ? std::nullopt : std::optional(old->prefix);
+}
+
+EffectInForce ipv4Address(const Scene& scene) {
+    const InterfaceSettings file = settingsOf(scene.link.name);
+    if (file.ipv4Address != scene.value) {
+        return {};
+    }
+    const auto running = runningPrefix(scene, false);
+    return moveAddress(scene, Ip::parse(scene.value), running ? running : prefixOfMask(file.mask));
+}
+
+EffectInForce subnetMask(const Scene& scene) {
+    const InterfaceSettings file = settingsOf(scene.link.name);
+    const auto ip = Ip::parse(file.ipv4Address);
+    if (file.mask != scene.value) {
+        return {};
+    }
+    // The plug-in itself gives the running address its mask, and routes go with that.
+    const KernelAddress* running = scene.before.mainAddress(scene.link.index, false);
+    return moveAddress(scene, running != nullptr ? std::optional(running->ip) : ip,
+                       prefixOfMask(scene.value));
+}
+
+EffectInForce ipv6Address(const Scene& scene) {
+    const InterfaceSettings file = settingsOf(scene.link.name);
+    if (file.ipv6Address != scene.value) {
+        return {};
+    }
+    const auto inFile = prefixIn(file);
+    return moveAddress(scene, Ip::parse(scene.value), inFile ? inFile : runningPrefix(scene, true));
+}
+
+EffectInForce prefixLength(const Scene& scene) {
+    const InterfaceSettings file = settingsOf(scene.link.name);
+    const auto ip = Ip::parse(file.ipv6Address);
+    if (file.prefixLength != scene.value || isForeign(scene, ip)) {
+        return {};
+    }
+    return moveAddress(scene, ip, prefixIn(file));
+}
+
+/// The link whose subnet the gateway is in, first of all the given one; null for none.
+const KernelAddress* wayTo(const KernelNetwork& network, const Ip& gateway, unsigned link) {
+    const KernelAddress* way = nullptr;
+    for (const KernelAddress& each : network.addresses) {
+        if (each.ip.sharesPrefix(gateway, each.prefix) && (way == nullptr || each.link == link)) {
+            way = each.link == link || way == nullptr ? &each : way;
+        }
+    }
+    return way;
+}
+
+std::vector<KernelRoute> defaultRoutes(const KernelNetwork& network) {
+    std::vector<KernelRoute> found;
+    std::ranges::copy_if(network.routes, std::back_inserter(found), [](const KernelRoute& each) {
+        return !each.destination.isIpv6 && each.isDefault() && each.table == RT_TABLE_MAIN &&
+               each.type == RTN_UNICAST;
+    });
+    std::ranges::stable_sort(found, {}, &KernelRoute::metric);
+    return found;
+}
+
+EffectInForce ipv4Gateway(const Scene& scene) {
+    const auto gateway = Ip::parse(scene.value);
+    const KernelNetwork now = KernelNetwork::read();
+    const std::vector<KernelRoute> routes = defaultRoutes(now);
+    const bool isThere =
+        std::ranges::any_of(routes, [&gateway](const KernelRoute& each) { return each.gateway == gateway; });
+    if (!gateway || isThere || !isDefaultInRoutesFile(scene.value)) {
+        return {};
+    }
+    const KernelAddress* way = wayTo(now, *gateway, scene.link.index);
+    if (way == nullptr) {
+        return {"no interface has a subnet with this gateway, so the running host has not got it", {}};
+    }
+    const auto own = std::ranges::find(routes, way->link, &KernelRoute::link);
+    const auto replaced = own != routes.end() ? own : routes.begin();
+    const unsigned metric = replaced != routes.end() ? replaced->metric : 0;
+    EffectInForce effect;
+    if (const int problem = setDefaultRoute(*gateway, way->link, metric); problem != 0) {
+        effect.lacking = "the running host does not take the gateway: " + reason(problem);
+    } else if (replaced != routes.end()) {
+        effect.notes.push_back("the route " + textOf(*replaced, now) + " is replaced");
+    }
+    return effect;
+}
+
+struct Effector {
+    unsigned int property;
+    EffectInForce (*act)(const Scene& scene);
+};
+constexpr Effector kEffectors[] = {
+    {25, ipv4Address}, {26, subnetMask}, {27, ipv6Address}, {100, ipv4Gateway}, {102, prefixLength}};
+
+}  // namespace
+
+BringIntoForce bringingIntoForce() {
+    return [](const IC::MutableNode& node, const Property& row,
+              const IC::PropertyValue& value) -> std::function<EffectInForce()> {
+        const auto* effector = std::ranges::find(kEffectors, row.id, &Effector::property);
+        if (row.type != NodeType::ipConfig || effector == std::end(kEffectors)) {
+            return nullptr;
+        }
+        Scene scene{KernelNetwork::read(), {}, static_cast<std::string>(value)};
+        const KernelLink* link = scene.before.link(interfaceNameOf(node));
+        if (link == nullptr) {
+            return nullptr;
+        }
+        scene.link = *link;
+        return [scene = std::move(scene), act = effector->act] { return act(scene); };
+    };
+}
+
+}  // namespace cvagent::change

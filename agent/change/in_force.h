@@ -1,0 +1,14 @@
+#pragma once
+
+#include "agent/core/writer.h"
+
+namespace cvagent::change {
+
+/// What a plug-in writes to files only is brought into the running host: an address, its mask or prefix
+/// length, the IPv4 gateway. To be given to an agent (AgentSettings::bringIntoForce). Nothing is done for a
+/// link that the kernel does not have, and nothing when the plug-in has not written the file. The new address
+/// comes before the old one goes; other addresses and routes that go with the old one are put back as far as
+/// they still can be, and the rest is told.
+BringIntoForce bringingIntoForce();
+
+}  // namespace cvagent::change

@@ -1,0 +1,133 @@
+// Whatever the code does that makes a change beforehand, nothing of the host is reached.
+#include <gmock/gmock.h>
+#include <linux/capability.h>
+#include <sys/prctl.h>
+#include <sys/socket.h>
+#include <sys/stat.h>
+#include <sys/un.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <csignal>
+#include <cstring>
+
+#include "agent/change/kernel_state.h"
+#include "tests/change/rehearsed.h"
+
+namespace {
+
+using cvagent::change::Change;
+using cvagent::change::Plan;
+using testing::Contains;
+using testing::HasSubstr;
+
+/// A daemon's socket that takes calls.
+int listening(const char* path) {
+    sockaddr_un place{};
+    place.sun_family = AF_UNIX;
+    std::strcpy(place.sun_path, path);
+    const int handle = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0);
+    EXPECT_EQ(bind(handle, reinterpret_cast<const sockaddr*>(&place), sizeof place), 0);
+    EXPECT_EQ(listen(handle, 1), 0);
+    return handle;
+}
+
+Change reaching(const std::string& text) {
+    return {"computer", 115, {text}};
+}
+
+/// Should the fence not hold, the clock and the power are out of reach all the same.
+void giveUpClockAndPower() {
+    for (const int right : {CAP_SYS_TIME, CAP_SYS_BOOT}) {
+        ASSERT_EQ(prctl(PR_CAPBSET_DROP, right, 0, 0, 0), 0);
+    }
+}
+
+HOST_TEST(Fence, HoldsAgainstCodeThatReachesForTheHost) {
+    giveUpClockAndPower();
+    host.useKernelNetwork();
+    host.realTool("ip");
+    host.run({"ip", "link", "add", "veth0", "type", "veth", "peer", "name", "veth1"});
+    host.run({"ip", "link", "set", "veth0", "up"});
+    host.file("/etc/hosts", "127.0.0.1 localhost\n");
+    host.file("/var/precious", "kept");
+    host.directory("/run/dbus");
+    ASSERT_EQ(mkfifo("/run/initctl", 0600), 0);
+    const int daemon = listening("/run/dbus/system_bus_socket");
+    moveRecords(host);
+    const auto files = writtenPart(host);
+    const auto kernel = cvagent::change::readKernelState();
+
+    const Plan plan = rehearsed({reaching("now")}, REACHING_PLUGIN_FILE);
+
+    ASSERT_EQ(plan.answers.size(), 1U);
+    EXPECT_THAT(plan.answers[0].problem, HasSubstr("reached: ."));
+    EXPECT_EQ(accept(daemon, nullptr, nullptr), -1);
+    EXPECT_EQ(errno, EAGAIN);
+    close(daemon);
+    EXPECT_EQ(writtenPart(host), files);
+    EXPECT_EQ(cvagent::change::readKernelState(), kernel);
+    EXPECT_EQ(host.read("/var/precious"), "kept");
+    EXPECT_FALSE(host.exists("/usr/reached") || host.exists("/reached"));
+    EXPECT_TRUE(host.clockCalls().empty());
+    // What it did to its own is in the plan.
+    EXPECT_THAT(plan.kernelAfter, Contains("host name reached"));
+    EXPECT_THAT(plan.kernelAfter, Contains(HasSubstr("link veth0 mtu 1500 down")));
+    EXPECT_THAT(kernel, Contains(HasSubstr("link veth0 mtu 1500 up")));
+    ASSERT_EQ(plan.files.size(), 2U);
+    EXPECT_EQ(plan.files[0].path, "/etc/hosts");
+    EXPECT_EQ(plan.files[0].after, std::nullopt);
+    EXPECT_EQ(plan.files[1].path, "/etc/reached");
+    EXPECT_EQ(plan.files[1].before, std::nullopt);
+}
+
+/// The numbers of all processes of the host.
+std::vector<std::string> processes(const FakeHost& host) {
+    std::vector<std::string> numbers;
+    for (const std::string& name : host.listDirectory("/.proc")) {
+        if (name.find_first_not_of("0123456789") == std::string::npos) {
+            numbers.push_back(name);
+        }
+    }
+    return numbers;
+}
+
+bool become(const FakeHost& host, const std::vector<std::string>& wanted) {
+    const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(60);
+    while (processes(host) != wanted && std::chrono::steady_clock::now() < end) {
+        usleep(10'000);
+    }
+    return processes(host) == wanted;
+}
+
+HOST_TEST(Fence, LeavesNothingBehindWhenTimeIsOver) {
+    moveRecords(host);
+    const auto before = processes(host);
+    cvagent::change::RehearsalSettings settings;
+    settings.plugins = {REACHING_PLUGIN_FILE};
+    settings.program = REHEARSAL_PROGRAM;
+    settings.longest = std::chrono::seconds(2);
+    EXPECT_THROW(rehearse(settings, {reaching("hang")}), cvagent::change::CannotRehearse);
+    EXPECT_TRUE(become(host, before));
+}
+
+HOST_TEST(Fence, EndsWithItsCaller) {
+    moveRecords(host);
+    const auto before = processes(host);
+    const pid_t caller = fork();
+    if (caller == 0) {
+        rehearsed({reaching("hang")}, REACHING_PLUGIN_FILE);
+        _exit(1);
+    }
+    // The caller, the program, the first process inside, and the one that hangs.
+    const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(60);
+    while (processes(host).size() < before.size() + 4 && std::chrono::steady_clock::now() < end) {
+        usleep(10'000);
+    }
+    EXPECT_GE(processes(host).size(), before.size() + 4);
+    kill(caller, SIGKILL);
+    waitpid(caller, nullptr, 0);
+    EXPECT_TRUE(become(host, before));
+}
+
+}  // namespace

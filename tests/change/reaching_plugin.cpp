@@ -1,0 +1,158 @@
+// A plug-in whose one write reaches for the host in every way that the fence has to hold against. It asks the
+// kernel itself, past whatever stands in for a library's function. What it could do comes back as the error.
+#include <fcntl.h>
+#include <linux/reboot.h>
+#include <net/if.h>
+#include <sys/ioctl.h>
+#include <sys/mount.h>
+#include <sys/ptrace.h>
+#include <sys/socket.h>
+#include <sys/stat.h>
+#include <sys/sysmacros.h>
+#include <sys/time.h>
+#include <sys/un.h>
+#include <sys/wait.h>
+#include <syscall.h>
+#include <unistd.h>
+
+#include <csignal>
+#include <cstdlib>
+#include <cstring>
+#include <ctime>
+#include <string>
+
+#include "framework/ic/management_interface.h"
+
+namespace {
+
+using IC::Error;
+using IC::Number;
+using IC::PropertyValue;
+
+std::string done;
+
+void tried(const char* what, bool could) {
+    done += could ? std::string(done.empty() ? "" : ", ") + what : "";
+}
+
+bool canWrite(const char* path, int flags = 0) {
+    const int file = open(path, O_WRONLY | O_NONBLOCK | flags, 0600);
+    if (file >= 0) {
+        close(file);
+    }
+    return file >= 0;
+}
+
+void reachForClock() {
+    timeval time{};
+    tried("settimeofday", syscall(SYS_settimeofday, &time, nullptr) == 0);
+    timespec moment{};
+    tried("clock_settime", syscall(SYS_clock_settime, CLOCK_REALTIME, &moment) == 0);
+}
+
+void reachForPower() {
+    tried("reboot", syscall(SYS_reboot, LINUX_REBOOT_MAGIC1, LINUX_REBOOT_MAGIC2, LINUX_REBOOT_CMD_CAD_ON,
+                            nullptr) == 0);
+    tried("sysrq", canWrite("/proc/sysrq-trigger") || canWrite("/.proc/sysrq-trigger"));
+}
+
+void reachForFiles() {
+    tried("a new file in /usr", canWrite("/usr/reached", O_CREAT));
+    tried("a new file in /", canWrite("/reached", O_CREAT));
+    tried("a file of the host", canWrite("/var/precious"));
+    tried("kernel settings", canWrite("/proc/sys/kernel/hostname") || canWrite("/.proc/sys/kernel/hostname"));
+    tried("a pipe of a daemon", canWrite("/run/initctl"));
+    tried("a file made writable", mount(nullptr, "/", nullptr, MS_REMOUNT | MS_BIND, nullptr) == 0 ||
+                                      mount(nullptr, "/usr", nullptr, MS_REMOUNT | MS_BIND, nullptr) == 0);
+    tried("the file below", umount2("/etc", MNT_DETACH) == 0);
+    tried("a device", mknod("/etc/disk", S_IFBLK | 0600, makedev(7, 0)) == 0);
+}
+
+void reachForDaemons() {
+    sockaddr_un place{};
+    place.sun_family = AF_UNIX;
+    std::strcpy(place.sun_path, "/run/dbus/system_bus_socket");
+    const int handle = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
+    tried("a daemon's socket", connect(handle, reinterpret_cast<const sockaddr*>(&place), sizeof place) == 0);
+    close(handle);
+}
+
+/// Every process that it can name, but itself and what it has started.
+void reachForProcesses() {
+    for (pid_t process = 1; process < 40000; ++process) {
+        const bool isOwnThread = access(("/proc/self/task/" + std::to_string(process)).c_str(), F_OK) == 0;
+        tried("a process of the host", !isOwnThread && kill(process, 0) == 0);
+    }
+    tried("the parent", ptrace(PTRACE_ATTACH, getppid(), nullptr, nullptr) == 0);
+}
+
+/// These do take place, in what the process has of its own.
+void reachForNames() {
+    static_cast<void>(sethostname("reached", 7));
+    ifreq request{};
+    std::strcpy(request.ifr_name, "lo");
+    const int handle = socket(AF_INET, SOCK_DGRAM | SOCK_CLOEXEC, 0);
+    ioctl(handle, SIOCSIFFLAGS, &request);
+    std::strcpy(request.ifr_name, "veth0");
+    ioctl(handle, SIOCSIFFLAGS, &request);
+    close(handle);
+    static_cast<void>(canWrite("/etc/reached", O_CREAT));
+    static_cast<void>(unlink("/etc/hosts"));
+}
+
+bool ready = false;
+
+class ReachingNode : public IC::MutableNode {
+public:
+    using MutableNode::MutableNode;
+    Error setProperty(const unsigned int& id, const PropertyValue& value) override {
+        if (!ready) {
+            return MutableNode::setProperty(id, value);
+        }
+        if (value == PropertyValue("hang", true)) {
+            const int child = fork();
+            for (;;) {
+                static_cast<void>(child);
+                pause();
+            }
+        }
+        reachForClock();
+        reachForPower();
+        reachForFiles();
+        reachForDaemons();
+        reachForProcesses();
+        reachForNames();
+        return {Error::failure, Number(), "reached: " + done + "."};
+    }
+};
+
+class ReachingInterface : public IC::ManagementInterface {
+public:
+    Error initialize(unsigned int miId, const Number& own, const Number& first) override {
+        Error result = ManagementInterface::initialize(miId, own, first);
+        add(ownNodeId(), 0, 38);
+        const unsigned int root = add(takeNodeId(), ownNodeId(), 59);
+        add(takeNodeId(), root, 40);
+        ready = true;
+        return result;
+    }
+
+private:
+    unsigned int add(unsigned int id, unsigned int parent, unsigned int type) {
+        auto* node = new ReachingNode(id, parent, miIds(), type, 0);
+        node->MutableNode::setProperty(115, PropertyValue("nobody", true));
+        appendNode(node);
+        return id;
+    }
+};
+
+ReachingInterface interface;
+Error error;
+
+}  // namespace
+
+extern "C" __attribute__((visibility("default"))) int OpenMI(IC::ManagementInterface** mi, Error** last) {
+    *mi = &interface;
+    *last = &error;
+    return 0;
+}

@@ -1,0 +1,224 @@
+// Hosts that are not as a rehearsal would like them.
+#include "agent/change/rehearsal.h"
+
+#include <fcntl.h>
+#include <gmock/gmock.h>
+#include <linux/capability.h>
+#include <sys/mount.h>
+#include <sys/prctl.h>
+#include <sys/stat.h>
+#include <syscall.h>
+#include <unistd.h>
+
+#include <fstream>
+
+#include "agent/change/name_service.h"
+#include "tests/change/rehearsed.h"
+
+namespace {
+
+using cvagent::change::Change;
+using cvagent::change::FileState;
+using cvagent::change::Plan;
+using testing::HasSubstr;
+
+constexpr const char* kConfig = "ip-config:eth0";
+
+/// A host with one link whose name server can be set.
+void addLink(FakeHost& host) {
+    host.copyTree("suse-two-nics");
+    host.expectUnrecorded();
+    moveRecords(host);
+}
+
+const std::vector<Change> kNameServer{{kConfig, 94, {"192.0.2.153"}}};
+
+std::string after(const Plan& plan, const std::string& path) {
+    for (const auto& file : plan.files) {
+        if (file.path == path) {
+            return file.after ? file.after->content : "(gone)";
+        }
+    }
+    return "(unchanged)";
+}
+
+HOST_TEST(Rehearsal, FollowsALinkIntoRun) {
+    addLink(host);
+    host.file("/run/systemd/resolve/stub.conf", "nameserver 127.0.0.53\n");
+    host.remove("/etc/resolv.conf");
+    host.symlink("/etc/resolv.conf", "../run/systemd/resolve/stub.conf");
+    const Plan plan = rehearsed(kNameServer);
+    EXPECT_EQ(plan.answers[0].problem, "");
+    EXPECT_THAT(after(plan, "/run/systemd/resolve/stub.conf"), HasSubstr("nameserver 192.0.2.153"));
+    EXPECT_EQ(after(plan, "/etc/resolv.conf"), "(unchanged)");
+    EXPECT_EQ(host.read("/run/systemd/resolve/stub.conf"), "nameserver 127.0.0.53\n");
+}
+
+HOST_TEST(Rehearsal, FollowsALinkOutOfAllThatIsWrittenElse) {
+    addLink(host);
+    host.file("/var/elsewhere/resolv.conf", "nameserver 127.0.0.53\n");
+    host.remove("/etc/resolv.conf");
+    host.symlink("/etc/resolv.conf", "/var/elsewhere/resolv.conf");
+    const Plan plan = rehearsed(kNameServer);
+    EXPECT_THAT(after(plan, "/var/elsewhere/resolv.conf"), HasSubstr("nameserver 192.0.2.153"));
+    EXPECT_EQ(host.read("/var/elsewhere/resolv.conf"), "nameserver 127.0.0.53\n");
+}
+
+HOST_TEST(Rehearsal, TakesAFileThatIsMountedForWhatItIs) {
+    addLink(host);
+    host.file("/var/containers/resolv.conf", "nameserver 127.0.0.11\n");
+    host.file("/etc/resolv.conf", "");
+    ASSERT_EQ(mount("/var/containers/resolv.conf", "/etc/resolv.conf", nullptr, MS_BIND, nullptr), 0);
+    const Plan plan = rehearsed(kNameServer);
+    EXPECT_THAT(after(plan, "/etc/resolv.conf"), HasSubstr("nameserver 192.0.2.153"));
+    EXPECT_EQ(plan.files[0].before->content, "nameserver 127.0.0.11\n");
+    EXPECT_EQ(host.read("/etc/resolv.conf"), "nameserver 127.0.0.11\n");
+    EXPECT_EQ(host.read("/var/containers/resolv.conf"), "nameserver 127.0.0.11\n");
+}
+
+HOST_TEST(Rehearsal, IsNotHeldByPipesLinksInCirclesAndManyMounts) {
+    addLink(host);
+    host.symlink("/etc/one", "two");
+    host.symlink("/etc/two", "one");
+    host.symlink("/etc/nowhere", "/no/such/place");
+    ASSERT_EQ(mkfifo("/etc/pipe", 0600), 0);
+    host.file("/etc/\x1b[2J\nname", "odd");
+    for (int at = 0; at < 200; ++at) {
+        const std::string place = "/etc/mounts/" + std::to_string(at);
+        host.directory(place);
+        ASSERT_EQ(mount("/var", place.c_str(), nullptr, MS_BIND, nullptr), 0);
+    }
+    const Plan plan = rehearsed(kNameServer);
+    EXPECT_THAT(after(plan, "/etc/resolv.conf"), HasSubstr("nameserver 192.0.2.153"));
+    for (int at = 0; at < 200; ++at) {
+        umount2(("/etc/mounts/" + std::to_string(at)).c_str(), MNT_DETACH);
+    }
+}
+
+HOST_TEST(Rehearsal, TakesWhatAnAgentAtWorkHolds) {
+    addLink(host);
+    const cvagent::DataDirectory held;
+    EXPECT_EQ(whyNotRehearsed(kNameServer), "");
+}
+
+HOST_TEST(Rehearsal, TellsWhatIsNoChange) {
+    addLink(host);
+    const Plan plan = rehearsed({{"no-such-node", 94, {"192.0.2.1"}},
+                                 {kConfig, 95, {"1"}},
+                                 {kConfig, 94, {"name server"}},
+                                 {kConfig, 94, {"192.0.2.1"}}});
+    ASSERT_EQ(plan.answers.size(), 4U);
+    for (std::size_t at = 0; at < 3; ++at) {
+        EXPECT_NE(plan.answers[at].problem, "") << at;
+    }
+    EXPECT_EQ(plan.answers[3].problem, "");
+    EXPECT_EQ(plan.answers[3].property, "DNSServers");
+}
+
+HOST_TEST(Rehearsal, RecordsWhatNoNamespaceKeepsApart) {
+    addLink(host);
+    const Plan plan = rehearsed({{"computer", 123, {"12"}}, {"computer", 126, {"2026-11-20T21:03:00Z"}}});
+    ASSERT_EQ(plan.commands.size(), 2U);
+    EXPECT_EQ(plan.commands[0].text, "shutdown -h now");
+    EXPECT_TRUE(plan.commands[0].recorded);
+    EXPECT_EQ(plan.commands[1].text, "settimeofday 1795208580");
+    EXPECT_TRUE(plan.commands[1].recorded);
+    EXPECT_EQ(plan.commands[1].change, 1U);
+    EXPECT_THAT(host.callsOf("shutdown"), testing::IsEmpty());
+    EXPECT_TRUE(host.clockCalls().empty());
+}
+
+/// From here on this process and its children are as a user's: without any right. The one that is left lets a
+/// process whose number is 0 keep it in a user namespace, as any user can keep his.
+void giveUpRights() {
+    for (int right = 0; prctl(PR_CAPBSET_READ, right, 0, 0, 0) >= 0; ++right) {
+        ASSERT_TRUE(right == CAP_SETFCAP || prctl(PR_CAPBSET_DROP, right, 0, 0, 0) == 0);
+    }
+    __user_cap_header_struct header{_LINUX_CAPABILITY_VERSION_3, 0};
+    __user_cap_data_struct none[2]{};
+    ASSERT_EQ(syscall(SYS_capset, &header, none), 0);
+}
+
+/// The kernel shows a process table of its own only to who sees all of the present one.
+void showWholeProc() {
+    for (const char* cover :
+         {"/.proc/sys/net", "/.proc/sys", "/.proc/sysrq-trigger", "/.proc/irq", "/.proc/bus", "/.proc/fs"}) {
+        umount2(cover, MNT_DETACH);
+    }
+}
+
+HOST_TEST(Rehearsal, TriesAsAUserOnCopies) {
+    addLink(host);
+    host.file("/run/systemd/resolve/stub.conf", "nameserver 127.0.0.53\n");
+    host.remove("/etc/resolv.conf");
+    host.symlink("/etc/resolv.conf", "../run/systemd/resolve/stub.conf");
+    ASSERT_EQ(mkfifo("/etc/pipe", 0600), 0);
+    showWholeProc();
+    giveUpRights();
+    const auto files = writtenPart(host);
+    const Plan plan = rehearsed(kNameServer);
+    EXPECT_EQ(plan.answers[0].problem, "");
+    EXPECT_THAT(after(plan, "/run/systemd/resolve/stub.conf"), HasSubstr("nameserver 192.0.2.153"));
+    EXPECT_EQ(after(plan, "/etc/pipe"), "(unchanged)");
+    EXPECT_THAT(plan.unforeseen, testing::Contains(HasSubstr("as a user")));
+    EXPECT_EQ(writtenPart(host), files);
+}
+
+HOST_TEST(Rehearsal, SaysWhyThereIsNoUserNamespace) {
+    addLink(host);
+    host.directory("/jail");
+    ASSERT_EQ(mount("/", "/jail", nullptr, MS_BIND | MS_REC, nullptr), 0);
+    ASSERT_EQ(chroot("/jail"), 0);  // where the kernel gives none
+    const auto files = writtenPart(host);
+    EXPECT_THAT(whyNotRehearsed(kNameServer),
+                HasSubstr("the host allows no user namespace here: Operation not permitted"));
+    EXPECT_EQ(writtenPart(host), files);
+}
+
+HOST_TEST(Rehearsal, SaysThatUserNamespacesAreSwitchedOff) {
+    addLink(host);
+    showWholeProc();
+    std::string map;
+    std::getline(std::ifstream("/.proc/self/uid_map"), map);
+    if (map.find("4294967295") != std::string::npos) {
+        GTEST_SKIP() << "the limit would be the machine's";
+    }
+    std::ofstream("/.proc/sys/user/max_user_namespaces") << "0" << std::flush;
+    EXPECT_THAT(whyNotRehearsed(kNameServer), HasSubstr("user.max_user_namespaces"));
+}
+
+TEST(NameService, AsksFilesAlone) {
+    using cvagent::change::withoutServers;
+    EXPECT_EQ(withoutServers(""), "hosts: files\n");
+    EXPECT_EQ(withoutServers("# all\npasswd:\tfiles systemd sss\ngroup: ldap\nhosts: files "
+                             "mdns4_minimal [NOTFOUND=return] dns myhostname # last\nhalf line"),
+              "passwd: files\ngroup: files\nhosts: files myhostname\n");
+}
+
+/// A program in place of the rehearsal's.
+std::string whyNotWith(FakeHost& host, const std::string& script) {
+    host.file("/opt/other", "#!/bin/sh\n" + script + "\n", 0755);
+    cvagent::change::RehearsalSettings settings;
+    settings.program = "/opt/other";
+    settings.longest = std::chrono::seconds(1);
+    try {
+        rehearse(settings, kNameServer);
+        return "";
+    } catch (const cvagent::change::CannotRehearse& reason) {
+        return reason.what();
+    }
+}
+
+HOST_TEST(Rehearsal, TakesNothingForAPlanThatIsNone) {
+    EXPECT_THAT(whyNotWith(host, "echo junk"), HasSubstr("has failed"));
+    EXPECT_THAT(whyNotWith(host, "exit 1"), HasSubstr("has failed"));
+    EXPECT_THAT(whyNotWith(host, "echo '{\"plan\": {}}'"), HasSubstr("has failed"));
+    EXPECT_THAT(whyNotWith(host, "echo '{\"cannot\": \"not today\"}'"), HasSubstr("not today"));
+    EXPECT_THAT(whyNotWith(host, "exec cat"), HasSubstr("in time"));
+    host.remove("/opt/other");
+    cvagent::change::RehearsalSettings settings;
+    settings.program = "/no/such/program";
+    EXPECT_THROW(rehearse(settings, kNameServer), cvagent::change::CannotRehearse);
+}
+
+}  // namespace
