@@ -10,12 +10,14 @@
 
 #include <array>
 #include <cerrno>
+#include <chrono>
 #include <csignal>
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
 #include <fstream>
 #include <system_error>
+#include <thread>
 
 #include "agent/core/problem.h"
 #include "agent/core/text.h"
@@ -160,17 +162,30 @@ std::string PrivateBus::standardDirectory() {
     return std::string(runtime) + "/corvista";
 }
 
-PrivateBus::PrivateBus(const std::string& directory) {
-    try {
-        directory_.emplace(directory, DirectoryRole{Problem::none, "", "directory of the bus"});
-    } catch (const std::system_error& error) {
-        failToStart("the directory " + inQuotes(directory) + ": " + error.code().message());
-    } catch (const Problem& problem) {
-        if (problem.kind() == Problem::busy) {
-            throw Problem(Problem::busy, "another cvagentd has a bus of its own in " + inQuotes(directory));
+/// One that was killed a moment ago may have left a child that has the lock until it becomes another program.
+void PrivateBus::takeDirectory(const std::string& directory) {
+    constexpr int kAttempts = 20;
+    constexpr std::chrono::milliseconds kBetween{50};
+    for (int attempt = 1; !directory_; ++attempt) {
+        try {
+            directory_.emplace(directory, DirectoryRole{Problem::none, "", "directory of the bus"});
+        } catch (const std::system_error& error) {
+            failToStart("the directory " + inQuotes(directory) + ": " + error.code().message());
+        } catch (const Problem& problem) {
+            if (problem.kind() != Problem::busy) {
+                failToStart(problem.what());
+            }
+            if (attempt == kAttempts) {
+                throw Problem(Problem::busy,
+                              "another cvagentd has a bus of its own in " + inQuotes(directory));
+            }
+            std::this_thread::sleep_for(kBetween);
         }
-        failToStart(problem.what());
     }
+}
+
+PrivateBus::PrivateBus(const std::string& directory) {
+    takeDirectory(directory);
     const std::string path = directory_->path();
     chmod(path.c_str(), 0755);  // what others may do is the bus's business
     place_ = open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);

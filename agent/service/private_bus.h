@@ -26,6 +26,7 @@ public:
     static std::string standardDirectory();
 
 private:
+    void takeDirectory(const std::string& directory);
     void start(const std::string& config);
     void waitForAddress(int pipe);
 
