@@ -172,7 +172,8 @@ HOST_TEST(AgentPlugins, NothingIsToldOfOneThatDoesNotStart) {
     EXPECT_THAT(failed.first, testing::Not(testing::Contains(HasSubstr("hard-drive"))));
 }
 
-#if !defined(__SANITIZE_THREAD__)  // for at its end the program goes while there was a thread that nobody joins
+#if !defined( \
+    __SANITIZE_THREAD__)  // for at its end the program goes while there was a thread that nobody joins
 HOST_TEST(AgentPlugins, OneThatTakesTooLongToStartIsLeftToItself) {
     const cvagent::QuietCommands quiet;
     host.file("/proc/cpuinfo", "processor\t: 0\n");
