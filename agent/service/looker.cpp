@@ -226,8 +226,11 @@ std::optional<Agent::Asked> Looker::askedOf(const NodeRef& node, const Wanted& w
         return Agent::Asked{node};
     }
     const unsigned int ofHost = wanted.hostFiles ? concernsHost : 0U;
+    const std::string name = nameOf(*node);
+    // A list of routes that is read while others come and go may lack some: once more when they have settled.
+    const unsigned int ofRoutes = wanted.later.concernOf(name) & concernsRoute;
     std::vector<unsigned int> ids =
-        concernedProperties(node->nodeType(), wanted.host.concernOf(nameOf(*node)) | ofHost);
+        concernedProperties(node->nodeType(), wanted.host.concernOf(name) | ofHost | ofRoutes);
     if (wanted.host.any() && setStatus(node) && ids.empty()) {
         ids.push_back(kLinkState);
     }

@@ -99,22 +99,19 @@ std::vector<NodeRef> TreeKeeper::sort(const Named& named) {
     return toWithdraw;
 }
 
-/// Which links the nodes are of that the plug-in has made since. Where the link of that name was another one
-/// before than behind it, nobody knows which of them the plug-in has seen.
+/// Which links the nodes are of that the plug-in has made since: those that had their names then. Where none
+/// had, nobody knows which one the plug-in has seen.
 /// @param old the nodes that there were; none at a start, which may have nodes from elsewhere
 void TreeKeeper::noteMade(const LinkIndices& before, const std::set<std::uint32_t>& old) {
-    const LinkIndices after = linkIndices();
-    const auto indexIn = [](const LinkIndices& links, const std::string& name) {
-        const auto link = links.find(name);
-        return link == links.end() ? kNoLink : link->second;
-    };
     for (const NodeRef& node : agent_.nodes()) {
+        if (!isOfLink(*node) || old.contains(node->getNodeId())) {
+            continue;
+        }
         const std::string name = nameOf(*node);
-        const int index = indexIn(before, name);
-        const bool isSame = index == indexIn(after, name);
-        const bool isFromElsewhere = isSame && index == kNoLink && old.empty();
-        if (isOfLink(*node) && !old.contains(node->getNodeId()) && !isFromElsewhere) {
-            linkOf_[name] = isSame ? index : kNoLink;
+        if (const auto link = before.find(name); link != before.end()) {
+            linkOf_[name] = link->second;
+        } else if (!old.empty()) {
+            linkOf_[name] = kNoLink;
         }
     }
 }

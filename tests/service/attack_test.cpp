@@ -294,7 +294,7 @@ HOST_TEST(ServiceAttack, LargeAnswersWaitForTheBus) {
     }));
     EXPECT_GE(answers["done"], 256);
 #if !defined(__SANITIZE_THREAD__) && !defined(__SANITIZE_ADDRESS__)  // which keep accounts of their own
-    EXPECT_LT(highestMemory(host, run.program().pid()) - before, 12000);
+    EXPECT_LT(highestMemory(host, run.program().pid()) - before, 6000);
 #endif
 }
 

@@ -52,6 +52,16 @@ HOST_TEST_F(ServiceWrites, ChangeTheHostAndTellHow) {
     EXPECT_THAT(run->diary(), HasSubstr("115=room 4\n115=room 5\n"));
 }
 
+/// The node's other facts can be others, too; the next look at everything is ten minutes away.
+HOST_TEST_F(ServiceWrites, HaveTheirNodeLookedAtAgain) {
+    const auto readAt = [this] {
+        return std::stoull(call::get(run->bus(), ServiceRun::kComputer, call::kNode, "ReadAt"));
+    };
+    const auto before = readAt();
+    EXPECT_EQ(write(kContact, "room 4"), "applied '' 'room 4'");
+    EXPECT_TRUE(eventually([&] { return readAt() > before; }));
+}
+
 HOST_TEST_F(ServiceWrites, ThatMustNotBeChangeNothing) {
     const std::string prefix = "com.vantrel.Corvista1.Error.";
     EXPECT_EQ(errorOfWrite(kContact, "two\nlines"), prefix + "Refused");
