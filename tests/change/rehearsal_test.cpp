@@ -13,6 +13,7 @@
 #include <fstream>
 
 #include "agent/change/name_service.h"
+#include "agent/change/recorders.h"
 #include "tests/change/rehearsed.h"
 
 namespace {
@@ -185,6 +186,17 @@ HOST_TEST(Rehearsal, SaysThatUserNamespacesAreSwitchedOff) {
     }
     std::ofstream("/.proc/sys/user/max_user_namespaces") << "0" << std::flush;
     EXPECT_THAT(whyNotRehearsed(kNameServer), HasSubstr("user.max_user_namespaces"));
+}
+
+TEST(Recorders, AreKnownByTheProgramThatACommandBeginsWith) {
+    using cvagent::change::isRecorded;
+    for (const char* command : {"shutdown -h now", "rpm -qa | grep dhcpv6*",
+                                "cat /etc/x|/sbin/service a restart", "true;reboot", "echo `hwclock -r`"}) {
+        EXPECT_TRUE(isRecorded(command)) << command;
+    }
+    for (const char* command : {"", "hostname reboot", "grep service /etc/x", "cat /sbin/shutdown | wc"}) {
+        EXPECT_FALSE(isRecorded(command)) << command;
+    }
 }
 
 TEST(NameService, AsksFilesAlone) {
