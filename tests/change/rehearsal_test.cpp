@@ -118,6 +118,7 @@ HOST_TEST(Rehearsal, TellsWhatIsNoChange) {
 
 HOST_TEST(Rehearsal, RecordsWhatNoNamespaceKeepsApart) {
     addLink(host);
+    host.tool("shutdown -h now", ToolAnswer{.out = "", .action = "touch /etc/ran"});
     const Plan plan = rehearsed({{"computer", 123, {"12"}}, {"computer", 126, {"2026-11-20T21:03:00Z"}}});
     ASSERT_EQ(plan.commands.size(), 2U);
     EXPECT_EQ(plan.commands[0].text, "shutdown -h now");
@@ -125,6 +126,7 @@ HOST_TEST(Rehearsal, RecordsWhatNoNamespaceKeepsApart) {
     EXPECT_EQ(plan.commands[1].text, "settimeofday 1795208580");
     EXPECT_TRUE(plan.commands[1].recorded);
     EXPECT_EQ(plan.commands[1].change, 1U);
+    EXPECT_EQ(after(plan, "/etc/ran"), "(unchanged)");
     EXPECT_THAT(host.callsOf("shutdown"), testing::IsEmpty());
     EXPECT_TRUE(host.clockCalls().empty());
 }
