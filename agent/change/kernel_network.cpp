@@ -36,12 +36,12 @@ std::string bytesOfIp(const Ip& ip) {
     return {ip.bytes.begin(), ip.bytes.begin() + ip.bits() / 8};
 }
 
-unsigned numberOf(std::string_view data) {
+unsigned numberIn(std::string_view data) {
     return readPlain<std::uint32_t>(data).value_or(0);
 }
 
 /// A text without the zero at its end.
-std::string textOf(std::string_view data) {
+std::string nameIn(std::string_view data) {
     return std::string(data.substr(0, data.find('\0')));
 }
 
@@ -54,7 +54,7 @@ void takeLink(KernelNetwork& network, std::string_view message) {
     const auto attributes = message.substr(NLMSG_ALIGN(sizeof(ifinfomsg)));
     hosttools::eachAttribute(attributes, [&link](unsigned type, std::string_view data) {
         if (type == IFLA_IFNAME) {
-            link.name = textOf(data);
+            link.name = nameIn(data);
         }
     });
     network.links.push_back(std::move(link));
@@ -64,9 +64,9 @@ void takeAddressAttribute(KernelAddress& address, bool isIpv6, unsigned type, st
     if (type == IFA_LOCAL || (type == IFA_ADDRESS && isIpv6)) {
         address.ip = ipOf(data, isIpv6).value_or(address.ip);
     } else if (type == IFA_LABEL) {
-        address.label = textOf(data);
+        address.label = nameIn(data);
     } else if (type == IFA_FLAGS) {
-        address.isPermanent = (numberOf(data) & IFA_F_PERMANENT) != 0;
+        address.isPermanent = (numberIn(data) & IFA_F_PERMANENT) != 0;
     } else if (type == IFA_PROTO) {
         address.protocol = data.empty() ? 0 : static_cast<unsigned char>(data.front());
     }
@@ -102,13 +102,13 @@ void takeRouteAttribute(KernelRoute& route, bool isIpv6, unsigned type, std::str
             route.source = ipOf(data, isIpv6);
             break;
         case RTA_OIF:
-            route.link = numberOf(data);
+            route.link = numberIn(data);
             break;
         case RTA_PRIORITY:
-            route.metric = numberOf(data);
+            route.metric = numberIn(data);
             break;
         case RTA_TABLE:
-            route.table = numberOf(data);
+            route.table = numberIn(data);
             break;
         default:
             break;

@@ -172,12 +172,13 @@ int main(int count, char** words) {
     cvagent::openStandardDescriptors();
     const std::string request = readRequest(STDIN_FILENO);
     Descriptor socket;
+    int status = EXIT_SUCCESS;
     try {
         socket = takeSocket();
         rehearse(socket, request);
     } catch (const std::exception& problem) {
         hosttools::writeAll(socket.get(), cvagent::change::answerOf(std::string(problem.what())));
-        return EXIT_FAILURE;
+        status = EXIT_FAILURE;
     }
-    return EXIT_SUCCESS;
+    _exit(status);  // what is done at an end may need a thread, and the table that it would stand in is gone
 }

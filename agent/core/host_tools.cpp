@@ -142,7 +142,7 @@ void probeFormats(std::vector<ToolReport>& reports) {
 
 std::optional<std::string> adapterDirectory() {
     const auto built = besideProgram({"../hosttools"}, "adapters");
-    return built ? built : besideProgram({"../lib/corvista"}, "adapters");
+    return built ? built : besideProgram({"../lib/corvista", "."}, "adapters");
 }
 
 std::vector<ToolReport> inspectHostTools(HostTools choice, Look look,

@@ -81,23 +81,24 @@ HOST_TEST(Fence, HoldsAgainstCodeThatReachesForTheHost) {
     EXPECT_EQ(plan.files[1].before, std::nullopt);
 }
 
-/// The numbers of all processes of the host.
+/// All processes of the host, with their names.
 std::vector<std::string> processes(const FakeHost& host) {
-    std::vector<std::string> numbers;
+    std::vector<std::string> found;
     for (const std::string& name : host.listDirectory("/.proc")) {
         if (name.find_first_not_of("0123456789") == std::string::npos) {
-            numbers.push_back(name);
+            const std::string stat = host.read("/.proc/" + name + "/stat").value_or("");
+            found.push_back(stat.substr(0, stat.find(')') + 1));
         }
     }
-    return numbers;
+    return found;
 }
 
-bool become(const FakeHost& host, const std::vector<std::string>& wanted) {
+void expectProcesses(const FakeHost& host, const std::vector<std::string>& wanted) {
     const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(60);
     while (processes(host) != wanted && std::chrono::steady_clock::now() < end) {
         usleep(10'000);
     }
-    return processes(host) == wanted;
+    EXPECT_EQ(processes(host), wanted);
 }
 
 HOST_TEST(Fence, LeavesNothingBehindWhenTimeIsOver) {
@@ -108,7 +109,7 @@ HOST_TEST(Fence, LeavesNothingBehindWhenTimeIsOver) {
     settings.program = REHEARSAL_PROGRAM;
     settings.longest = std::chrono::seconds(2);
     EXPECT_THROW(rehearse(settings, {reaching("hang")}), cvagent::change::CannotRehearse);
-    EXPECT_TRUE(become(host, before));
+    expectProcesses(host, before);
 }
 
 HOST_TEST(Fence, EndsWithItsCaller) {
@@ -127,7 +128,7 @@ HOST_TEST(Fence, EndsWithItsCaller) {
     EXPECT_GE(processes(host).size(), before.size() + 4);
     kill(caller, SIGKILL);
     waitpid(caller, nullptr, 0);
-    EXPECT_TRUE(become(host, before));
+    expectProcesses(host, before);
 }
 
 }  // namespace

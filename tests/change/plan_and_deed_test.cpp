@@ -234,6 +234,12 @@ void bringUpRealLinks(FakeHost& host) {
 HOST_TEST(PlanAndDeed, HoldsOnLinksOfARealKernel) {
     bringUpRealLinks(host);
     moveRecords(host);
+    EXPECT_THAT(cvagent::change::readKernelState(),
+                testing::IsSupersetOf({"address eth0 192.0.2.8/24 label eth0:1",
+                                       "link eth0 mtu 1400 up address 02:00:00:00:00:10",
+                                       "route 10.0.0.0/8 via 192.0.2.2 dev eth0 table 7",
+                                       "route default (IPv6) via 2001:db8::1 dev eth0 table main metric 1024",
+                                       "rule 32765: from 192.0.2.8 lookup 7", "host name localhost"}));
     compareAll(host, HostTools::automatic);
 }
 

@@ -61,7 +61,7 @@ void reachForFiles() {
     tried("a new file in /", canWrite("/reached", O_CREAT));
     tried("a file of the host", canWrite("/var/precious"));
     tried("kernel settings", canWrite("/proc/sys/kernel/hostname") || canWrite("/.proc/sys/kernel/hostname"));
-    tried("a pipe of a daemon", canWrite("/run/initctl"));
+    tried("a pipe of a daemon", canWrite("/run/initctl") || access("/run/initctl", F_OK) == 0);
     tried("a file made writable", mount(nullptr, "/", nullptr, MS_REMOUNT | MS_BIND, nullptr) == 0 ||
                                       mount(nullptr, "/usr", nullptr, MS_REMOUNT | MS_BIND, nullptr) == 0);
     tried("the file below", umount2("/etc", MNT_DETACH) == 0);

@@ -13,6 +13,7 @@
 #include <fstream>
 
 #include "agent/change/name_service.h"
+#include "agent/change/recorders.h"
 #include "tests/change/rehearsed.h"
 
 namespace {
@@ -117,6 +118,7 @@ HOST_TEST(Rehearsal, TellsWhatIsNoChange) {
 
 HOST_TEST(Rehearsal, RecordsWhatNoNamespaceKeepsApart) {
     addLink(host);
+    host.tool("shutdown -h now", ToolAnswer{.out = "", .action = "touch /etc/ran"});
     const Plan plan = rehearsed({{"computer", 123, {"12"}}, {"computer", 126, {"2026-11-20T21:03:00Z"}}});
     ASSERT_EQ(plan.commands.size(), 2U);
     EXPECT_EQ(plan.commands[0].text, "shutdown -h now");
@@ -124,6 +126,7 @@ HOST_TEST(Rehearsal, RecordsWhatNoNamespaceKeepsApart) {
     EXPECT_EQ(plan.commands[1].text, "settimeofday 1795208580");
     EXPECT_TRUE(plan.commands[1].recorded);
     EXPECT_EQ(plan.commands[1].change, 1U);
+    EXPECT_EQ(after(plan, "/etc/ran"), "(unchanged)");
     EXPECT_THAT(host.callsOf("shutdown"), testing::IsEmpty());
     EXPECT_TRUE(host.clockCalls().empty());
 }
@@ -185,6 +188,17 @@ HOST_TEST(Rehearsal, SaysThatUserNamespacesAreSwitchedOff) {
     }
     std::ofstream("/.proc/sys/user/max_user_namespaces") << "0" << std::flush;
     EXPECT_THAT(whyNotRehearsed(kNameServer), HasSubstr("user.max_user_namespaces"));
+}
+
+TEST(Recorders, AreKnownByTheProgramThatACommandBeginsWith) {
+    using cvagent::change::isRecorded;
+    for (const char* command : {"shutdown -h now", "rpm -qa | grep dhcpv6*",
+                                "cat /etc/x|/sbin/service a restart", "true;reboot", "echo `hwclock -r`"}) {
+        EXPECT_TRUE(isRecorded(command)) << command;
+    }
+    for (const char* command : {"", "hostname reboot", "grep service /etc/x", "cat /sbin/shutdown | wc"}) {
+        EXPECT_FALSE(isRecorded(command)) << command;
+    }
 }
 
 TEST(NameService, AsksFilesAlone) {

@@ -1,5 +1,6 @@
 #include <unistd.h>
 #include <algorithm>
+#include <iterator>
 
 #include "agent/cli/caller.h"
 #include "agent/cli/commands/commands.h"
@@ -21,9 +22,8 @@ std::string triedOut(const Options& options, const std::vector<MeantChange>& cha
         return {};
     }
     std::vector<MeantChange> ordered;
-    for (const std::size_t i : order) {
-        ordered.push_back(changes[i]);
-    }
+    std::ranges::transform(order, std::back_inserter(ordered),
+                           [&changes](std::size_t i) { return changes[i]; });
     change::Plan plan;
     try {
         plan = rehearsed(options, ordered);

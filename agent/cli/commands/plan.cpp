@@ -1,5 +1,6 @@
 #include <unistd.h>
 #include <algorithm>
+#include <iterator>
 #include <nlohmann/json.hpp>
 
 #include "agent/cli/caller.h"
@@ -66,15 +67,12 @@ ExitStatus plan(Session& session, const Options& options) {
     const Request request(callerName());
     const std::vector<MeantChange> changes = meantChanges(session, options);
     std::vector<Found> found;
-    for (const MeantChange& change : changes) {
-        found.push_back(findNow(session, change, request));
-    }
+    std::ranges::transform(changes, std::back_inserter(found),
+                           [&](const MeantChange& change) { return findNow(session, change, request); });
     const std::vector<std::size_t> order = toBeMade(changes, found);
     std::vector<MeantChange> made;
+    std::ranges::transform(order, std::back_inserter(made), [&changes](std::size_t i) { return changes[i]; });
     std::vector<MeantChange> unchanged;
-    for (const std::size_t i : order) {
-        made.push_back(changes[i]);
-    }
     for (std::size_t i = 0; i < changes.size(); ++i) {
         if (std::ranges::find(order, i) == order.end()) {
             unchanged.push_back(changes[i]);
