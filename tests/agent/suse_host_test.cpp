@@ -260,7 +260,7 @@ HOST_TEST(SuseComputer, TheClockIsSet) {
     EXPECT_EQ(calls[0].seconds, 1795208583);
     EXPECT_FALSE(calls[0].timeZone);
     host.clockFails(EPERM);
-    EXPECT_EQ(suse.run({"set", "computer", "CurrentTime", "2026-11-20T21:03:03Z"}).status, 1);
+    EXPECT_EQ(suse.run({"set", "computer", "CurrentTime", "2026-11-20T21:03:03Z", "--force"}).status, 1);
 }
 
 HOST_TEST(SuseComputer, TheTimeZoneIsSwitched) {

@@ -105,7 +105,7 @@ HOST_TEST_F(ComputerThroughAgent, RefusesAnOffsetWithoutAZone) {
 }
 
 HOST_TEST_F(ComputerThroughAgent, SetsItsClock) {
-    EXPECT_EQ(agent(host, {"set", "computer", "CurrentTime", "2001-09-09T01:46:40Z"}).status, 0);
+    EXPECT_EQ(agent(host, {"set", "computer", "CurrentTime", "2001-09-09T01:46:40Z", "--force"}).status, 0);
     ASSERT_EQ(host.clockCalls().size(), 1U);
     EXPECT_EQ(host.clockCalls()[0].function, "settimeofday");
     EXPECT_EQ(host.clockCalls()[0].seconds, 1000000000);
@@ -115,7 +115,7 @@ HOST_TEST_F(ComputerThroughAgent, SetsItsClock) {
 }
 
 HOST_TEST_F(ComputerThroughAgent, SaysHonestlyWhichYearItsHostCannotHold) {
-    const Finished run = agent(host, {"set", "computer", "CurrentTime", "2040-01-01T00:00:00Z"});
+    const Finished run = agent(host, {"set", "computer", "CurrentTime", "2040-01-01T00:00:00Z", "--force"});
     if (sizeof(long) == 4) {
         EXPECT_EQ(run.status, 4);
         EXPECT_THAT(run.err, HasSubstr("CurrentTime"));
@@ -129,7 +129,7 @@ HOST_TEST_F(ComputerThroughAgent, SaysHonestlyWhichYearItsHostCannotHold) {
 
 HOST_TEST_F(ComputerThroughAgent, SaysWhenItsClockCannotBeSet) {
     host.clockFails(EPERM);
-    const Finished run = agent(host, {"set", "computer", "CurrentTime", "2001-09-09T01:46:40Z"});
+    const Finished run = agent(host, {"set", "computer", "CurrentTime", "2001-09-09T01:46:40Z", "--force"});
     EXPECT_EQ(run.status, 1);
     EXPECT_THAT(run.err, HasSubstr("CurrentTime"));
 }
