@@ -217,12 +217,12 @@ EffectInForce prefixLength(const Scene& scene) {
     return moveAddress(scene, ip, prefixIn(file));
 }
 
-/// The link whose subnet the gateway is in, first of all the given one; null for none.
+/// An address in whose subnet the gateway is, of the given link when it has one; null for none.
 const KernelAddress* wayTo(const KernelNetwork& network, const Ip& gateway, unsigned link) {
     const KernelAddress* way = nullptr;
     for (const KernelAddress& each : network.addresses) {
         if (each.ip.sharesPrefix(gateway, each.prefix) && (way == nullptr || each.link == link)) {
-            way = each.link == link || way == nullptr ? &each : way;
+            way = &each;
         }
     }
     return way;
