@@ -10,7 +10,6 @@ using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::Not;
 
-constexpr const char* kManager = "org.freedesktop.DBus.ObjectManager";
 constexpr const char* kComputerInterface = "com.vantrel.Corvista1.Computer";
 constexpr const char* kPortInterface = "com.vantrel.Corvista1.NetworkPort";
 
@@ -71,7 +70,7 @@ HOST_TEST_F(ServiceObjects, SayWhatIsWrongWithAQuestion) {
 }
 
 HOST_TEST_F(ServiceObjects, AreListedByTheirManager) {
-    const bus::Message answer = call::ask(run->bus(), ServiceRun::kRoot, kManager, "GetManagedObjects");
+    const bus::Message answer = call::ask(run->bus(), ServiceRun::kRoot, call::kManager, "GetManagedObjects");
     std::map<std::string, std::vector<std::string>> listed;
     bus::Reader reader(answer);
     reader.array("{oa{sa{sv}}}", [&] {
@@ -88,7 +87,7 @@ HOST_TEST_F(ServiceObjects, AreListedByTheirManager) {
     EXPECT_THAT(listed[ServiceRun::kPort], ElementsAre(call::kNode, kPortInterface));
     EXPECT_THAT(listed[ServiceRun::kComputer], ElementsAre(call::kNode, kComputerInterface));
     EXPECT_FALSE(listed.contains(ServiceRun::kRoot));
-    EXPECT_EQ(call::errorOf(run->bus(), ServiceRun::kPort, kManager, "GetManagedObjects"),
+    EXPECT_EQ(call::errorOf(run->bus(), ServiceRun::kPort, call::kManager, "GetManagedObjects"),
               bus::kUnknownInterface);
 }
 

@@ -66,15 +66,14 @@ HOST_TEST(PrivateBus, ReadersThatNeverReadHoldNobodyUp) {
     for (int reader = 0; reader < 8; ++reader) {
         silent.push_back(std::make_unique<bus::Connection>(ServiceRun::address()));
     }
-    constexpr const char* kManager = "org.freedesktop.DBus.ObjectManager";
     for (int round = 0; round < 120; ++round) {
         for (const auto& one : silent) {
             waiting.push_back(
-                one->askLater(call::make(*one, ServiceRun::kRoot, kManager, "GetManagedObjects"),
+                one->askLater(call::make(*one, ServiceRun::kRoot, call::kManager, "GetManagedObjects"),
                               std::chrono::hours(1), [](const bus::Message&) {}));
             one->flush();
         }
-        ASSERT_FALSE(call::ask(run.bus(), ServiceRun::kRoot, kManager, "GetManagedObjects").isError());
+        ASSERT_FALSE(call::ask(run.bus(), ServiceRun::kRoot, call::kManager, "GetManagedObjects").isError());
     }
 }
 

@@ -80,6 +80,7 @@ namespace bus = cvagent::bus;
 using Arguments = std::function<void(bus::Writer&)>;
 
 constexpr const char* kAgent = "com.vantrel.Corvista1.Agent";
+constexpr const char* kManager = "org.freedesktop.DBus.ObjectManager";
 constexpr const char* kNode = "com.vantrel.Corvista1.Node";
 constexpr const char* kProperties = "org.freedesktop.DBus.Properties";
 
