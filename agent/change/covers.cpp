@@ -171,6 +171,7 @@ std::vector<Cover> placesToCover(std::vector<std::string> written) {
     }
     const std::vector<std::string> places = outermost(std::move(written));
     std::vector<Cover> covers;
+    covers.reserve(places.size());
     for (const std::string& place : places) {
         covers.push_back(coverOf(place));
     }

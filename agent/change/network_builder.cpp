@@ -214,14 +214,22 @@ std::string addressRequest(const NetworkMessage& message, unsigned how, unsigned
     return makeRequest(RTM_NEWADDR, how, bytesOf(fixed), attributes + attribute(IFA_FLAGS, flags));
 }
 
+template <class Request>
+std::vector<std::string> requests(const std::vector<NetworkMessage>& messages, Request make) {
+    std::vector<std::string> all;
+    all.reserve(messages.size());
+    for (const NetworkMessage& message : messages) {
+        all.push_back(make(message));
+    }
+    return all;
+}
+
 /// An IPv6 address is there at once when nobody is asked whether he has it; afterwards it is one like any
 /// other.
 void copyAddresses(NetlinkSocket& socket, const std::vector<NetworkMessage>& addresses) {
-    std::vector<std::string> requests;
-    for (const NetworkMessage& message : addresses) {
-        requests.push_back(addressRequest(message, kNew, IFA_F_NODAD));
-    }
-    tellAll(socket, std::move(requests));
+    tellAll(socket, requests(addresses, [](const NetworkMessage& message) {
+                return addressRequest(message, kNew, IFA_F_NODAD);
+            }));
     for (const NetworkMessage& message : addresses) {
         const auto fixed = readPlain<ifaddrmsg>(message.body).value_or(ifaddrmsg{});
         if (fixed.ifa_family == AF_INET6 && fixed.ifa_scope != RT_SCOPE_HOST) {
@@ -285,15 +293,6 @@ void copyRules(NetlinkSocket& socket, const std::vector<NetworkMessage>& wanted)
     for (const std::string& rule : missing) {
         tell(socket, makeRequest(RTM_NEWRULE, kNew, rule));
     }
-}
-
-template <class Request>
-std::vector<std::string> requests(const std::vector<NetworkMessage>& messages, Request make) {
-    std::vector<std::string> all;
-    for (const NetworkMessage& message : messages) {
-        all.push_back(make(message));
-    }
-    return all;
 }
 
 }  // namespace
