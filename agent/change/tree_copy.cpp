@@ -66,7 +66,8 @@ bool copyEntry(int from, int to, const std::string& name, CopyBudget& budget) {
     } else if (S_ISREG(found.st_mode)) {
         done = copyFile(from, to, name, found, budget);
     } else if (S_ISLNK(found.st_mode)) {
-        symlinkat(targetOf(from, name).c_str(), to, name.c_str());
+        const bool copied = symlinkat(targetOf(from, name).c_str(), to, name.c_str()) == 0;
+        done = copied || errno == ENOENT;  // it has gone meanwhile
     }
     copyTimes(to, name, found);
     return done;
