@@ -26,7 +26,7 @@ void prepareForWriting(const Database& database) {
     database.execute("PRAGMA journal_mode = WAL");
     database.execute("PRAGMA synchronous = FULL");
     database.execute("PRAGMA journal_size_limit = 1048576");
-    database.execute("PRAGMA cache_size = -512");
+    database.execute("PRAGMA cache_size = -128");
     database.execute("PRAGMA temp_store = MEMORY");
     database.execute("PRAGMA foreign_keys = OFF");
 }

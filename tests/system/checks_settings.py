@@ -94,12 +94,17 @@ def origin_static(context):
     expect_line(context, NETWORK + "config", 'NETCONFIG_DNS_POLICY=""')
 
 
-@check("set: the IPv4 address reaches the interface file and waits for the interface to be brought up")
+def expect_running(context, address):
+    expect(f" {address} " in context.guest.sh("ip address show dev eth0"), f"{address} is not in force")
+
+
+@check("set: the IPv4 address reaches the interface file and the running interface")
 def ipv4_address(context):
     one_interface(context)
     context.guest.set(CONFIG, "IPv4Address", "192.0.2.20")
     expect_equal("IPADDR", settings(context, INTERFACE_FILE)["IPADDR"], "192.0.2.20")
-    expect("192.0.2.10/" in context.guest.sh("ip address show dev eth0"), "the running address has changed")
+    expect_running(context, "192.0.2.20/24")
+    expect("192.0.2.10/" not in context.guest.sh("ip address show dev eth0"), "the old address is still there")
 
 
 @check("set: the subnet mask reaches the interface file and the running interface")
@@ -107,7 +112,7 @@ def subnet_mask(context):
     one_interface(context)
     context.guest.set(CONFIG, "SubnetMask", "255.255.0.0")
     expect_equal("NETMASK", settings(context, INTERFACE_FILE)["NETMASK"], "255.255.0.0")
-    expect("192.0.2.10/16" in context.guest.sh("ip address show dev eth0"), "the running mask has not changed")
+    expect_running(context, "192.0.2.20/16")
 
 
 @check("set: the IPv6 address reaches the interface file and /etc/hosts")
@@ -117,6 +122,7 @@ def ipv6_address(context):
     file = settings(context, INTERFACE_FILE)
     expect_equal("IPADDR_1, LABEL_1", (file["IPADDR_1"], file["LABEL_1"]), ("2001:db8::20", "1"))
     expect_line(context, "/etc/hosts", "2001:db8::20\tlathe.works.example.net\tlathe")
+    expect("2001:db8::20/" in context.guest.sh("ip address show dev eth0"), "the address is not in force")
 
 
 @check("set: the IPv6 prefix length reaches the interface file")
@@ -124,15 +130,18 @@ def ipv6_prefix(context):
     one_interface(context)
     context.guest.set(CONFIG, "IPv6PrefixLength", "56")
     expect_equal("PREFIXLEN_1", settings(context, INTERFACE_FILE)["PREFIXLEN_1"], "56")
+    expect_running(context, "2001:db8::20/56")
 
 
 @check("set: the IPv4 gateway reaches the interface's and the host's route files")
 def ipv4_gateway(context):
     one_interface(context)
     context.guest.set(CONFIG, "IPv4Gateway", "192.0.2.254")
-    expect_equal("ifroute-eth0", context.guest.read(NETWORK + "ifroute-eth0"), "192.0.2.10\t192.0.2.254\t-\n")
+    expect_equal("ifroute-eth0", context.guest.read(NETWORK + "ifroute-eth0"), "192.0.2.20\t192.0.2.254\t-\n")
     expect_equal("routes", context.guest.read(NETWORK + "routes"),
                  "default\t192.0.2.254\t-\n# Static routes\ndefault\tfe80::1\t-\t-\n")
+    running = re.findall(r"default via (\S+) dev eth0", context.guest.sh("ip route show"))
+    expect_equal("running default routes", running, ["192.0.2.254"])
 
 
 @check("set: the IPv6 gateway reaches the running routes and the route file")
