@@ -157,9 +157,18 @@ std::vector<Cover> placesToCopy(std::vector<std::string> written) {
     return covers;
 }
 
+/// What the agent needs may be mounted below /tmp, its programs and data (private_tmp.h).
+bool isOursBelowTmp(const std::string& mount, const std::vector<std::string>& written) {
+    return isBelow(mount, kTmp) && mount != kTmp &&
+           std::ranges::any_of(written, [&mount](const std::string& place) {
+               return isBelow(place, mount) || isBelow(mount, place);
+           });
+}
+
 /// Each place and what of this machine's own is mounted below it, the upper first. Of /run and /tmp the
-/// mounts below are others' business.
+/// mounts below are others' business, but for those of what is written.
 std::vector<Cover> placesToCover(std::vector<std::string> written) {
+    const std::vector<std::string> data = written;
     for (const char* place : {kRun, kTmp}) {
         struct stat found {};
         if (lstat(place, &found) == 0 && S_ISDIR(found.st_mode)) {
@@ -180,13 +189,37 @@ std::vector<Cover> placesToCover(std::vector<std::string> written) {
             return place != kTmp && place != kRun && isBelow(mount.path, place);
         });
         const bool known = std::ranges::find(covers, mount.path, &Cover::path) != covers.end();
-        if (wanted && !known && shell::localMountOf(mount.path)) {
+        if ((wanted || isOursBelowTmp(mount.path, data)) && !known && shell::localMountOf(mount.path)) {
             covers.push_back(coverOf(mount.path));
         }
     }
     std::erase_if(covers, [](const Cover& each) { return !canBeCovered(each.original); });
     std::ranges::stable_sort(covers, {}, &Cover::path);
     return covers;
+}
+
+struct View {
+    std::string path;
+    Descriptor mount;
+};
+
+/// What is mounted below /tmp and would be hidden with it, the upper first.
+std::vector<View> viewsBelowTmp(const std::vector<MountPoint>& mounts) {
+    std::vector<View> views;
+    for (const MountPoint& mount : mounts) {
+        if (isBelow(mount.path, kTmp) && mount.path != kTmp && shell::localMountOf(mount.path)) {
+            views.push_back({mount.path, sameAgain(mount.path)});
+        }
+    }
+    return views;
+}
+
+void showAgain(const std::vector<View>& views) {
+    for (const View& view : views) {
+        if (view.mount.isOpen()) {
+            attach(view.mount, view.path);
+        }
+    }
 }
 
 void cover(Cover& place, bool copies, Work& work, CopyBudget& budget) {
@@ -293,8 +326,12 @@ std::vector<Cover> isolateFiles(bool copies, const std::string& dataDirectory) {
     if (copies && std::filesystem::is_directory(kRun)) {
         emptyRun(covers, work);
     }
+    const std::vector<View> views = viewsBelowTmp(mounts);
     for (Cover& place : covers) {
         cover(place, copies, work, budget);
+        if (place.path == kTmp) {
+            showAgain(views);
+        }
     }
     hideDaemons();
     showDevices(devices);

@@ -10,6 +10,7 @@
 #include <syscall.h>
 #include <unistd.h>
 
+#include <filesystem>
 #include <fstream>
 
 #include "agent/change/name_service.h"
@@ -75,6 +76,16 @@ HOST_TEST(Rehearsal, TakesAFileThatIsMountedForWhatItIs) {
     EXPECT_EQ(plan.files[0].before->content, "nameserver 127.0.0.11\n");
     EXPECT_EQ(host.read("/etc/resolv.conf"), "nameserver 127.0.0.11\n");
     EXPECT_EQ(host.read("/var/containers/resolv.conf"), "nameserver 127.0.0.11\n");
+}
+
+/// As the agent itself mounts what is its own below a /tmp of its own.
+HOST_TEST(Rehearsal, HasThePluginThatIsMountedBelowTmp) {
+    addLink(host);
+    const std::filesystem::path plugin = CORVISTA_PLUGIN_FILE;
+    host.directory("/tmp/checkout");
+    ASSERT_EQ(mount(plugin.parent_path().c_str(), "/tmp/checkout", nullptr, MS_BIND, nullptr), 0);
+    const Plan plan = rehearsed(kNameServer, "/tmp/checkout/" + plugin.filename().string());
+    EXPECT_THAT(after(plan, "/etc/resolv.conf"), HasSubstr("nameserver 192.0.2.153"));
 }
 
 HOST_TEST(Rehearsal, IsNotHeldByPipesLinksInCirclesAndManyMounts) {
