@@ -24,6 +24,13 @@ std::string valueText(const Reading& reading) {
     return reading.failed() ? "" : printable(static_cast<std::string>(reading.value));
 }
 
+/// Whether an interface is up is looked up in /sys, which is the host's: it shows nothing of the copy's
+/// links.
+bool isSeenInCopy(const Property& row) {
+    constexpr unsigned int kInterfaceState = 123;
+    return row.type != NodeType::ipConfig || row.id != kInterfaceState;
+}
+
 void makeChange(const Agent& agent, const Change& change, Answer& answer) {
     const NodeRef node = agent.find(change.node);
     answer.node = node->getPath();
@@ -36,7 +43,7 @@ void makeChange(const Agent& agent, const Change& change, Answer& answer) {
     answer.problem = result.problem ? result.problem->what() : "";
     answer.before = valueText(result.before);
     answer.after = valueText(result.after);
-    answer.lacking = result.lacking;
+    answer.lacking = isSeenInCopy(row) ? result.lacking : "";
 }
 
 Answer tried(const Agent& agent, const Change& change) {

@@ -298,6 +298,21 @@ HOST_TEST_F(ChangesInForce, APlanForeseesThem) {
     EXPECT_GE(foreseen["files"].size(), 3U);
 }
 
+/// /sys shows the host's links, which nothing was done to.
+HOST_TEST_F(ChangesInForce, APlanTakesAnInterfaceDown) {
+    const Finished plan = cvagent(host, {"plan", "ip-config:eth0", "InterfaceState", "12"});
+    EXPECT_EQ(plan.status, 0) << plan.err;
+    EXPECT_THAT(plan.out, HasSubstr("ifconfig eth0 down"));
+    EXPECT_THAT(plan.out, Not(HasSubstr("still up")));
+}
+
+HOST_TEST_F(ChangesInForce, APlanOfWhatCannotTakeFails) {
+    host.run({"sh", "-c", "rm /etc/sysconfig/network/ifcfg-eth-id-*"});
+    const Finished plan = cvagent(host, {"plan", "ip-config:eth0", "IPv4Address", "192.0.2.77"});
+    EXPECT_EQ(plan.status, 1);
+    EXPECT_THAT(plan.out, HasSubstr("there is no file "));
+}
+
 HOST_TEST_F(ChangesInForce, APlanIsReadByPeople) {
     const Finished plan = cvagent(host, {"plan", "ip-config:eth0", "IPv4Address", "192.0.2.77"});
     EXPECT_EQ(plan.status, 0) << plan.err;
