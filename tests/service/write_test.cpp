@@ -108,9 +108,8 @@ HOST_TEST_F(ServiceWrites, AreToldToEverybody) {
                            bus::Reader reader(signal);
                            events.push_back(call::event(reader));
                        });
-    const bus::Slot changeSlot = listener.match(
-        std::string("type='signal',member='PropertiesChanged',path='") + ServiceRun::kComputer + "'",
-        [&](const bus::Message& signal) {
+    const bus::Slot changeSlot =
+        listener.match("type='signal',member='PropertiesChanged'", [&](const bus::Message& signal) {
             bus::Reader reader(signal);
             const std::string interface = reader.text();
             reader.array("{sv}", [&] {

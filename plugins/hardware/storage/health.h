@@ -40,7 +40,7 @@ Health askNvme(const DeviceAccess& access, const DeviceFile& controller);
 Health askAta(const DeviceAccess& access, const DeviceFile& drive);
 Health askScsi(const DeviceAccess& access, const DeviceFile& drive);
 
-/// What log page 2 of an NVMe controller says (NVM Express base specification, "SMART / Health Information").
+/// What log page 2 of an NVMe controller says (NVM Express, "SMART / Health Information").
 Health nvmeHealth(const std::string& page);
 
 }  // namespace hardware
