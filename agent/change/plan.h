@@ -49,6 +49,9 @@ struct Answer {
     std::string before;               ///< printable values; "" where nothing could be read
     std::string after;
     std::string lacking;  ///< see WriteResult
+
+    /// Why the change does not come about; "" when it does.
+    const std::string& failure() const { return problem.empty() ? lacking : problem; }
 };
 
 /// What the kernel holds, in lines that a person understands, sorted: "link eth0 mtu 1500 up address

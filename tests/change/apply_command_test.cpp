@@ -313,6 +313,20 @@ HOST_TEST_F(ChangesInForce, APlanOfWhatCannotTakeFails) {
     EXPECT_THAT(plan.out, HasSubstr("there is no file "));
 }
 
+/// None is made when one of them, tried out, does not come about.
+HOST_TEST_F(ChangesInForce, WhatCannotTakeKeepsAllOfThemBack) {
+    host.run({"sh", "-c", "rm /etc/sysconfig/network/ifcfg-eth-id-*"});
+    host.file("/root/changes",
+              R"([{"node": "ip-config:eth0", "property": "IPv4Address", "value": "192.0.2.77"},
+                                   {"node": "computer", "property": "OwnerName", "value": "x"}])");
+    const Finished run = cvagent(host, {"apply", "/root/changes"});
+    EXPECT_EQ(run.status, 1);
+    EXPECT_THAT(run.err, HasSubstr("tried out, it fails: there is no file "));
+    EXPECT_EQ(cvagent(host, {"get", "computer", "OwnerName"}).out.find("OwnerName  x"), std::string::npos);
+    EXPECT_EQ(cvagent(host, {"apply", "/root/changes", "--force", "--verify-within", "0"}).status, 1);
+    EXPECT_NE(cvagent(host, {"get", "computer", "OwnerName"}).out.find("OwnerName  x"), std::string::npos);
+}
+
 HOST_TEST_F(ChangesInForce, APlanIsReadByPeople) {
     const Finished plan = cvagent(host, {"plan", "ip-config:eth0", "IPv4Address", "192.0.2.77"});
     EXPECT_EQ(plan.status, 0) << plan.err;

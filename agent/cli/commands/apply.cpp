@@ -34,8 +34,8 @@ std::string triedOut(const Options& options, const std::vector<MeantChange>& cha
     for (const change::Answer& answer : plan.answers) {
         // One that was not found there tells nothing of the deed.
         const bool isFound = answer.property.find_first_not_of("0123456789") != std::string::npos;
-        if (!answer.problem.empty() && isFound && !options.force) {
-            throw Failure(ExitStatus::failed, "tried out, it fails: " + printable(answer.problem) +
+        if (!answer.failure().empty() && isFound && !options.force) {
+            throw Failure(ExitStatus::failed, "tried out, it fails: " + printable(answer.failure()) +
                                                   "\nNothing was done; --force does it all the same");
         }
     }

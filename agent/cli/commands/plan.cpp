@@ -56,9 +56,8 @@ ExitStatus verdictOn(const change::Plan& plan, const std::vector<change::Objecti
     if (!objections.empty()) {
         return ExitStatus::refused;
     }
-    const bool fails = std::ranges::any_of(plan.answers, [](const change::Answer& answer) {
-        return !answer.problem.empty() || !answer.lacking.empty();
-    });
+    const bool fails = std::ranges::any_of(
+        plan.answers, [](const change::Answer& answer) { return !answer.failure().empty(); });
     return fails ? ExitStatus::failed : ExitStatus::done;
 }
 
