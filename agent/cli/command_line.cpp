@@ -8,6 +8,7 @@
 #include "agent/cli/failure.h"
 #include "agent/cli/moment.h"
 #include "agent/cli/option_parts.h"
+#include "agent/cli/plain_question.h"
 #include "agent/cli/print.h"
 
 namespace cvagent {
@@ -289,6 +290,9 @@ std::string helpCommand(const CLI::App& app) {
 }  // namespace
 
 std::optional<Options> parseCommandLine(int count, const char* const* words) {
+    if (auto plain = plainQuestion(count, words)) {
+        return plain;
+    }
     Options options;
     CLI::App app{kDescription, "cvagent"};
     app.footer(kFooter);

@@ -1,12 +1,11 @@
 #include "agent/history/database.h"
 
-#include <sqlite3.h>
-
 #include <cerrno>
 #include <cstring>
 #include <limits>
 
 #include "agent/history/history_error.h"
+#include "agent/history/sqlite_library.h"
 
 namespace cvagent {
 
@@ -41,11 +40,11 @@ HistoryError::Kind kindOf(int code, int systemError) {
 
 /// The system's own error counts only for what is done with files: it is that of the last such call.
 [[noreturn]] void fail(sqlite3* database) {
-    const int code = sqlite3_extended_errcode(database);
+    const int code = sqlite().errorCode(database);
     const int kind = code & 0xFF;
     const bool ofFiles = kind == SQLITE_IOERR || kind == SQLITE_CANTOPEN || kind == SQLITE_FULL;
-    const int systemError = ofFiles ? sqlite3_system_errno(database) : 0;
-    std::string text = sqlite3_errmsg(database);
+    const int systemError = ofFiles ? sqlite().systemError(database) : 0;
+    std::string text = sqlite().errorText(database);
     if (systemError != 0) {
         text += std::string(" (") + std::strerror(systemError) + ")";
     }
@@ -69,15 +68,15 @@ std::string asUri(const std::string& file) {
 }  // namespace
 
 void Statement::Finalize::operator()(sqlite3_stmt* statement) const {
-    sqlite3_finalize(statement);  // what it returns is the error of the last run, which was thrown
+    sqlite().finalize(statement);  // what it returns is the error of the last run, which was thrown
 }
 
 Statement::Statement(sqlite3* database, const char* sql) : database_(database) {
     sqlite3_stmt* made = nullptr;
-    const int code = sqlite3_prepare_v3(database, sql, -1, SQLITE_PREPARE_PERSISTENT, &made, nullptr);
+    const int code = sqlite().prepare(database, sql, -1, SQLITE_PREPARE_PERSISTENT, &made, nullptr);
     statement_.reset(made);
     if ((code & 0xFF) == SQLITE_ERROR) {  // a statement of ours does not fit what ought to be in the file
-        throw HistoryError(HistoryError::damaged, sqlite3_errmsg(database));
+        throw HistoryError(HistoryError::damaged, sqlite().errorText(database));
     }
     if (code != SQLITE_OK) {
         fail(database);
@@ -85,7 +84,7 @@ Statement::Statement(sqlite3* database, const char* sql) : database_(database) {
 }
 
 int Statement::placeOf(const char* parameter) const {
-    const int place = sqlite3_bind_parameter_index(statement_.get(), parameter);
+    const int place = sqlite().placeOf(statement_.get(), parameter);
     if (place == 0) {
         throw std::logic_error(std::string("no such parameter: ") + parameter);
     }
@@ -93,15 +92,15 @@ int Statement::placeOf(const char* parameter) const {
 }
 
 Statement& Statement::set(const char* parameter, std::int64_t value) {
-    if (sqlite3_bind_int64(statement_.get(), placeOf(parameter), value) != SQLITE_OK) {
+    if (sqlite().setNumber(statement_.get(), placeOf(parameter), value) != SQLITE_OK) {
         fail(database_);
     }
     return *this;
 }
 
 Statement& Statement::set(const char* parameter, const std::string& value) {
-    const int code = sqlite3_bind_text64(statement_.get(), placeOf(parameter), value.data(), value.size(),
-                                         SQLITE_STATIC, SQLITE_UTF8);
+    const int code = sqlite().setText(statement_.get(), placeOf(parameter), value.data(), value.size(),
+                                      SQLITE_STATIC, SQLITE_UTF8);
     if (code != SQLITE_OK) {
         fail(database_);
     }
@@ -109,7 +108,7 @@ Statement& Statement::set(const char* parameter, const std::string& value) {
 }
 
 bool Statement::next() {
-    const int code = sqlite3_step(statement_.get());
+    const int code = sqlite().step(statement_.get());
     if (code == SQLITE_ROW) {
         return true;
     }
@@ -131,21 +130,21 @@ void Statement::run() {
 }
 
 void Statement::reset() {
-    sqlite3_reset(statement_.get());
+    sqlite().reset(statement_.get());
 }
 
 std::int64_t Statement::number(int column) const {
-    return sqlite3_column_int64(statement_.get(), column);
+    return sqlite().number(statement_.get(), column);
 }
 
 std::string Statement::text(int column) const {
-    const auto* bytes = static_cast<const char*>(sqlite3_column_blob(statement_.get(), column));
-    const int size = sqlite3_column_bytes(statement_.get(), column);
+    const auto* bytes = static_cast<const char*>(sqlite().bytes(statement_.get(), column));
+    const int size = sqlite().size(statement_.get(), column);
     return bytes == nullptr ? std::string() : std::string(bytes, static_cast<std::size_t>(size));
 }
 
 void Database::Close::operator()(sqlite3* database) const {
-    sqlite3_close_v2(database);
+    sqlite().close(database);
 }
 
 Database::Database(const std::string& file, Access access) {
@@ -153,7 +152,7 @@ Database::Database(const std::string& file, Access access) {
     const bool frozen = access == Access::frozen;
     const int rights = access == Access::write ? SQLITE_OPEN_READWRITE : SQLITE_OPEN_READONLY;
     const int flags = rights | SQLITE_OPEN_NOFOLLOW | SQLITE_OPEN_EXRESCODE | (frozen ? SQLITE_OPEN_URI : 0);
-    const int code = sqlite3_open_v2((frozen ? asUri(file) : file).c_str(), &made, flags, nullptr);
+    const int code = sqlite().open((frozen ? asUri(file) : file).c_str(), &made, flags, nullptr);
     handle_.reset(made);
     if (made == nullptr) {
         throw std::bad_alloc();
@@ -161,21 +160,21 @@ Database::Database(const std::string& file, Access access) {
     if (code != SQLITE_OK) {
         fail(made);
     }
-    sqlite3_busy_timeout(made, kPatience);
-    sqlite3_db_config(made, SQLITE_DBCONFIG_DEFENSIVE, 1, nullptr);
-    sqlite3_db_config(made, SQLITE_DBCONFIG_TRUSTED_SCHEMA, 0, nullptr);
+    sqlite().setPatience(made, kPatience);
+    sqlite().configure(made, SQLITE_DBCONFIG_DEFENSIVE, 1, nullptr);
+    sqlite().configure(made, SQLITE_DBCONFIG_TRUSTED_SCHEMA, 0, nullptr);
     if (access != Access::write) {
         // Who only looks leaves the file as it is.
-        sqlite3_db_config(made, SQLITE_DBCONFIG_NO_CKPT_ON_CLOSE, 1, nullptr);
+        sqlite().configure(made, SQLITE_DBCONFIG_NO_CKPT_ON_CLOSE, 1, nullptr);
     } else {
         // Readers without the right to make the files beside it find them.
         int keep = 1;
-        sqlite3_file_control(made, "main", SQLITE_FCNTL_PERSIST_WAL, &keep);
+        sqlite().controlFile(made, "main", SQLITE_FCNTL_PERSIST_WAL, &keep);
     }
 }
 
 void Database::execute(const char* sql) const {
-    if (sqlite3_exec(handle_.get(), sql, nullptr, nullptr, nullptr) != SQLITE_OK) {
+    if (sqlite().execute(handle_.get(), sql, nullptr, nullptr, nullptr) != SQLITE_OK) {
         fail(handle_.get());
     }
 }
@@ -192,8 +191,8 @@ Transaction::Transaction(const Database& database) : database_(database) {
 }
 
 Transaction::~Transaction() {
-    if (open_ && sqlite3_get_autocommit(database_.handle()) == 0) {
-        sqlite3_exec(database_.handle(), "ROLLBACK", nullptr, nullptr, nullptr);
+    if (open_ && sqlite().isOutsideTransaction(database_.handle()) == 0) {
+        sqlite().execute(database_.handle(), "ROLLBACK", nullptr, nullptr, nullptr);
     }
 }
 

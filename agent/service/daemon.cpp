@@ -27,7 +27,7 @@ namespace {
 /// A write that was begun has this long before a stop cuts it off; shorter than a manager waits.
 constexpr std::chrono::seconds kWriteAtStop{60};
 constexpr std::chrono::milliseconds kLookForWrites{50};
-constexpr std::chrono::seconds kLookForErrors{10};
+constexpr std::chrono::seconds kTidyUp{10};
 
 void findPlugins(Options& options) {
     if (options.plugins.empty()) {
@@ -108,7 +108,7 @@ public:
         manager_.ready();
         malloc_trim(0);  // the start needs more than the service at rest
         feedWatchdog();
-        tellErrors();
+        tidyUp();
         watchBus();
         loop_.run();
         sd_bus_detach_event(connection_.get());
@@ -173,10 +173,11 @@ private:
         }
     }
 
-    /// What the plug-ins' own threads report.
-    void tellErrors() {
+    /// Tells what the plug-ins' own threads report, and gives back what is not needed any more.
+    void tidyUp() {
         showErrors(errors_);
-        errorsDue_ = loop_.after(kLookForErrors, [this] { tellErrors(); });
+        service_->giveBack();
+        tidyDue_ = loop_.after(kTidyUp, [this] { tidyUp(); });
     }
 
     void watchBus() {
@@ -199,7 +200,7 @@ private:
     Loop::Source signals_;
     Loop::Source watchdog_;
     Loop::Source writes_;
-    Loop::Source errorsDue_;
+    Loop::Source tidyDue_;
     bus::Slot lost_;
     int signal_ = 0;
     bool busLost_ = false;

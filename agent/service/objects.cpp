@@ -84,6 +84,7 @@ void Objects::handle(const bus::Message& message) {
     if (!message.isMethodCall()) {
         return;
     }
+    ++handled_;
     const auto call = std::make_shared<const PendingCall>(parts_, message);
     call->guarded([&] {
         const std::string object = message.path();

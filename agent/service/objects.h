@@ -25,6 +25,8 @@ public:
 
     /// From now on calls are answered.
     void serve();
+    /// How many calls have come.
+    std::uint64_t handled() const { return handled_; }
     /// The methods that the tables know, as "interface member signature", for who compares them with what the
     /// interface file says.
     static std::vector<std::string> methods();
@@ -35,6 +37,7 @@ private:
 
     Parts& parts_;
     const Standing& standing_;
+    std::uint64_t handled_ = 0;
     bus::Slot slot_;
 };
 

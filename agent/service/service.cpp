@@ -105,13 +105,18 @@ void Service::armLook() {
     }
 }
 
-/// What is free between pieces that live long adds up over the days; a look at everything is a good time to
-/// give it back.
 void Service::take(Look look) {
     const bool isWhole = look.whole;
     model_.apply(std::move(look));
+    ++looks_;
     if (isWhole) {
         standing_.lookedAt = wallClock();
+    }
+}
+
+/// The library keeps what is free between pieces that live long.
+void Service::giveBack() {
+    if (const std::uint64_t done = looks_ + objects_.handled(); std::exchange(doneBefore_, done) != done) {
         malloc_trim(0);
     }
 }

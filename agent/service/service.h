@@ -35,6 +35,8 @@ public:
     void windDown();
     /// Whether a write waits or is at work.
     bool isWriting() const { return writers_.isBusy(); }
+    /// Gives the memory back that looks and answers have needed since the last time.
+    void giveBack();
     std::size_t nodes() const { return model_.all().size(); }
 
 private:
@@ -58,6 +60,8 @@ private:
     Workers writers_;
     Parts parts_;
     Objects objects_;
+    std::uint64_t looks_ = 0;
+    std::uint64_t doneBefore_ = 0;
     std::shared_ptr<Subscription> events_;
     Loop::Source eventsCome_;
     Loop::Source nextLook_;

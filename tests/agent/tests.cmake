@@ -19,6 +19,7 @@ corvista_test(agent PARTS 2 LIBRARIES agent_cli agent_core test_support util SOU
   agent/host_tools_test.cpp
   agent/json_test.cpp
   agent/owners_test.cpp
+  agent/plain_question_test.cpp
   agent/print_test.cpp
   agent/read_commands_test.cpp
   agent/data_directory_test.cpp

@@ -67,6 +67,22 @@ HOST_TEST(HistoryCommand, ShowsTheAlertThatACommandWasTold) {
     EXPECT_TRUE(all[0].contains("boot"));
 }
 
+/// It is loaded when a history is opened, and nothing else needs it.
+HOST_TEST(HistoryCommand, TellsThatSqliteIsMissing) {
+    host.file("/odd/libsqlite3.so.0", "");
+    CvagentRun run(host);
+    run.setting("LD_LIBRARY_PATH=/odd");
+    const Finished written = run({"set", "computer", "OwnerContact", "room 4"});
+    EXPECT_EQ(written.status, 0);
+    EXPECT_THAT(written.err, HasSubstr("SQLite cannot be loaded: /odd/libsqlite3.so.0: file too short"));
+    host.remove("/odd");
+    EXPECT_EQ(run({"set", "computer", "OwnerContact", "room 4"}).status, 0);
+    host.file("/odd/libsqlite3.so.0", "");
+    const Finished shown = run({"history"});
+    EXPECT_EQ(shown.status, 1);
+    EXPECT_THAT(shown.err, HasSubstr("SQLite cannot be loaded"));
+}
+
 HOST_TEST(HistoryCommand, ShowsAPartOfIt) {
     CvagentRun run(host);
     for (const char* room : {"1", "2", "3"}) {

@@ -104,6 +104,39 @@ HOST_TEST_F(FreshFacts, OfAPortFollowItsLink) {
     }
 }
 
+class FreshRoutes : public FreshFacts {
+protected:
+    void setUpHost(FakeHost& host) override { Freshness::setUpHost(host); }
+};
+
+/// A list of routes that is read while others come and go may lack one, of which nothing more is heard.
+HOST_TEST_F(FreshRoutes, AreReadOnceMoreWhenTheyHaveSettled) {
+    host.tool("route %any", "");
+    host.tool("route -n", {"Kernel IP routing table\n", 0, "", 0,
+                           "if ip -4 route show default | grep -q via; then "
+                           "[ ! -e /was-left-out ] || echo '0.0.0.0  10.1.0.1  0.0.0.0  UG  0  0  0  eth0'; "
+                           "touch /was-left-out; fi"});
+    ip(host, {"link add eth0 type veth peer name sw0"});
+    for (const char* link : {"eth0", "sw0"}) {  // no address that the kernel makes later, which would be news
+        host.run({"ip", "link", "set", link, "addrgenmode", "none"});
+        ip(host, {std::string("link set ") + link + " up"});
+    }
+    ServiceRun run(host);
+    run.config("look-every = 0\n");
+    start(host, run);
+    const auto becomes = [&run](const std::string& property, const std::string& value) {
+        return eventually([&] {
+            return fact(run, "/chassis/network-controller/network-port:eth0/ip-config:eth0", property) ==
+                   value;
+        });
+    };
+    ip(host, {"address add 10.1.2.3/20 dev eth0"});
+    ASSERT_TRUE(becomes("25", "10.1.2.3"));
+    ip(host, {"route add default via 10.1.0.1"});
+    EXPECT_TRUE(becomes("100", "10.1.0.1"));
+    EXPECT_TRUE(host.exists("/was-left-out"));
+}
+
 /// A name can be more than a name to a shell.
 HOST_TEST_F(FreshFacts, OfALinkWithAHostileNameAreNotAskedFor) {
     ip(host, {"link add 'eth$(>m)' type veth peer name sw2", "link set sw2 up"});

@@ -211,7 +211,7 @@ Arguments write(std::uint32_t property, const std::string& value) {
 }
 
 bool until(bus::Connection& bus, const std::function<bool()>& condition) {
-    const auto end = std::chrono::steady_clock::now() + 10s;
+    const auto end = std::chrono::steady_clock::now() + 60s;
     try {
         bus.process();
         while (!condition() && std::chrono::steady_clock::now() < end) {

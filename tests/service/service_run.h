@@ -111,7 +111,7 @@ std::vector<ToldReading> read(const bus::Connection& bus, const std::string& pat
                               const std::vector<std::uint32_t>& ids);
 Arguments write(std::uint32_t property, const std::string& value);
 
-/// Processes the connection until something comes true, for at most ten seconds.
+/// Processes the connection until something comes true, for at most a minute.
 bool until(bus::Connection& bus, const std::function<bool()>& condition);
 
 /// What a function tells that runs as another user, in a process of its own; "?" when it does not end well.

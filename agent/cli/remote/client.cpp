@@ -48,14 +48,19 @@ int millisecondsTo(std::chrono::steady_clock::time_point end) {
 
 /// Who owns the name is asked once, and then whose process that is: on a bus without a policy anybody can
 /// take a name.
-Client::Client(const std::string& address, int stop) : connection_(opened(address)), stop_(stop) {
-    std::uint32_t user = 0;
+Client::Client(const std::string& address, int stop, Question first)
+    : connection_(opened(address)), stop_(stop), first_(std::move(first)) {
     const bus::Message named = askBus("GetNameOwner", service::kBusName);
     if (named.isError()) {
         throw NoService("no service is there", true);
     }
     read(named, [this](bus::Reader& reader) { owner_ = reader.text(); });
-    const bus::Message owned = askBus("GetConnectionUnixUser", owner_);
+    checkUser();
+}
+
+void Client::checkUser() {
+    std::uint32_t user = 0;
+    const bus::Message owned = askBus("GetConnectionUnixUser", owner_, [this] { askFirst(); });
     if (owned.isError()) {
         throw NoService("the service ended", true);
     }
@@ -68,11 +73,12 @@ Client::Client(const std::string& address, int stop) : connection_(opened(addres
     }
 }
 
-bus::Message Client::askBus(const char* member, const std::string& name) {
+bus::Message Client::askBus(const char* member, const std::string& name,
+                            const std::function<void()>& behind) {
     const bus::Message call = connection_.newCall({kBusDriver, kBusObject, kBusDriver, member});
     bus::Writer(call).put(name);
     try {
-        bus::Message answer = answerTo(call, kShort);
+        bus::Message answer = answerTo(call, kShort, behind);
         if (!answer) {
             failHanging("bus", kShort);
         }
@@ -102,15 +108,41 @@ void Client::wait(Clock::time_point deadline) {
     }
 }
 
-/// None when the time is over.
-bus::Message Client::answerTo(const bus::Message& call, Seconds longest) {
-    bus::Message answer;
+bus::Message Client::callOf(const Question& question) const {
+    bus::Message made = call(question.member);
+    if (question.word) {
+        bus::Writer(made).put(*question.word);
+    }
+    return made;
+}
+
+void Client::askFirst() {
+    if (first_.member.empty()) {
+        return;
+    }
+    waitsForFirst_ = connection_.askLater(callOf(first_), 3 * kShort,
+                                          [this](const bus::Message& come) { firstAnswer_ = come; });
+}
+
+bool Client::waitFor(const bus::Message& answer, Seconds longest) {
     const auto deadline = Clock::now() + longest;
-    const bus::Slot waiting = connection_.askLater(call, longest + Seconds(1),
-                                                   [&answer](const bus::Message& come) { answer = come; });
     while (!answer && Clock::now() < deadline) {
         wait(deadline);
     }
+    return static_cast<bool>(answer);
+}
+
+/// None when the time is over.
+/// @param behind sends something more
+bus::Message Client::answerTo(const bus::Message& call, Seconds longest,
+                              const std::function<void()>& behind) {
+    bus::Message answer;
+    const bus::Slot waiting = connection_.askLater(call, longest + Seconds(1),
+                                                   [&answer](const bus::Message& come) { answer = come; });
+    if (behind) {
+        behind();
+    }
+    waitFor(answer, longest);
     return answer;
 }
 
@@ -121,6 +153,18 @@ void Client::checkAnswer(const bus::Message& answer) {
     if (!answer.isError() && answer.sender() != owner_) {
         throw Failure(ExitStatus::failed, "another one has answered in the service's place");
     }
+}
+
+bus::Message Client::ask(const Question& question) {
+    if (first_ != question) {
+        return ask(callOf(question), kShort);
+    }
+    first_ = {};
+    if (!waitFor(firstAnswer_, kShort)) {
+        failHanging("service", kShort);
+    }
+    checkAnswer(firstAnswer_);
+    return std::move(firstAnswer_);
 }
 
 bus::Message Client::ask(const bus::Message& call, Seconds longest) {

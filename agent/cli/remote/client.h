@@ -2,11 +2,14 @@
 
 #include <chrono>
 #include <cstdint>
+#include <functional>
+#include <optional>
 #include <stdexcept>
 #include <string>
 
 #include "agent/bus/connection.h"
 #include "agent/bus/reader.h"
+#include "agent/bus/slot.h"
 
 namespace cvagent::remote {
 
@@ -35,10 +38,20 @@ public:
     /// What the service gives a read, and some more.
     static constexpr Seconds kRead{30};
 
+    /// A call of the agent's interface with one text, or none.
+    struct Question {
+        std::string member;  ///< "" for no question
+        std::optional<std::string> word;
+        bool operator==(const Question&) const = default;
+    };
+
     /// Throws NoService, or Failure when the bus does not answer.
     /// @param address "system" or a bus's own
     /// @param stop    a descriptor that ends all waiting when it can be read; -1 for none
-    explicit Client(const std::string& address, int stop = -1);
+    /// @param first   what will be asked first. It goes out while the bus is still asked whose the service
+    /// is;
+    ///                of one that is not believed nobody sees the answer
+    explicit Client(const std::string& address, int stop = -1, Question first = {});
     /// Thrown by all that waits.
     struct Stopped {};
 
@@ -50,6 +63,8 @@ public:
 
     /// A call of the agent's interface.
     bus::Message call(const std::string& member) const;
+    /// The same for a question, whose answer may have come already.
+    bus::Message ask(const Question& question);
     /// The answer to a call. Throws what an error in place of one stands for: Problem of the service's own,
     /// Failure, ServiceGone.
     bus::Message ask(const bus::Message& call, Seconds longest);
@@ -79,15 +94,24 @@ public:
 private:
     using Clock = std::chrono::steady_clock;
 
-    bus::Message askBus(const char* member, const std::string& name);
+    bus::Message askBus(const char* member, const std::string& name,
+                        const std::function<void()>& behind = nullptr);
     bus::Message propertyCall(const std::string& name) const;
-    bus::Message answerTo(const bus::Message& call, Seconds longest);
+    void checkUser();
+    bus::Message callOf(const Question& question) const;
+    void askFirst();
+    bus::Message answerTo(const bus::Message& call, Seconds longest,
+                          const std::function<void()>& behind = nullptr);
+    bool waitFor(const bus::Message& answer, Seconds longest);
     void checkAnswer(const bus::Message& answer);
 
     bus::Connection connection_;
     int stop_;
     std::string owner_;
     bool own_ = false;
+    Question first_;            // "" once its answer was taken
+    bus::Message firstAnswer_;  // once it has come
+    bus::Slot waitsForFirst_;
 };
 
 }  // namespace cvagent::remote

@@ -47,7 +47,7 @@ void RemoteSession::learnClasses(const std::vector<NodeCopy>& nodes) {
 Session::Tree RemoteSession::tree(const Request& /*request*/) {
     std::vector<NodeCopy> nodes;
     Tree whole;
-    const bus::Message answer = client_->ask(client_->call("Tree"), Client::kShort);
+    const bus::Message answer = client_->ask({"Tree", std::nullopt});
     client_->read(answer, [&](bus::Reader& reader) {
         whole.plugins = reader.texts();
         reader.array("(uuuuosssua(uyvtus))", [&] {
@@ -69,10 +69,8 @@ Session::Tree RemoteSession::tree(const Request& /*request*/) {
 }
 
 NodeRef RemoteSession::find(const std::string& word) {
-    const bus::Message call = client_->call("Find");
-    bus::Writer(call).put(word);
     NodeCopy node;
-    const bus::Message answer = client_->ask(call, Client::kShort);
+    const bus::Message answer = client_->ask({"Find", word});
     client_->read(answer, [&node](bus::Reader& reader) {
         reader.structure(kNodeContents, [&] { node = takeNode(reader); });
     });

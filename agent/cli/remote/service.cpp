@@ -55,12 +55,20 @@ struct Reached {
     std::string why;  ///< there is no client; "" for nothing to tell
 };
 
-Reached reach(const Options& options) {
+/// What a command begins with.
+Client::Question firstQuestion(const Options& options) {
+    const bool ofNode = options.command == Command::get || options.command == Command::set;
+    return options.command == Command::tree ? Client::Question{"Tree", std::nullopt}
+           : ofNode                         ? Client::Question{"Find", options.node}
+                                            : Client::Question();
+}
+
+Reached reach(const Options& options, const Client::Question& first = {}) {
     Reached reached;
     bool silent = !options.bus;
     for (const std::string& address : addressesOf(options)) {
         try {
-            reached.client = std::make_unique<Client>(address);
+            reached.client = std::make_unique<Client>(address, -1, first);
             reached.address = address;
             return reached;
         } catch (const NoService& none) {
@@ -82,7 +90,7 @@ std::unique_ptr<Session> openSession(const Options& options, bool silent) {
     if (options.byItself) {
         return nullptr;
     }
-    Reached reached = reach(options);
+    Reached reached = reach(options, firstQuestion(options));
     if (reached.client) {
         return std::make_unique<RemoteSession>(std::move(reached.client), reached.address,
                                                isatty(STDIN_FILENO) == 1);
