@@ -20,6 +20,7 @@ namespace {
 constexpr std::chrono::seconds kReadTime{20};  // below the 25 s after which most clients give up
 constexpr std::size_t kMostEvents = 512;
 constexpr std::size_t kMostProperties = 1024;  // of one read
+constexpr unsigned int kWeightOfLarge = 8;
 
 /// In the order of Problem::Kind.
 constexpr std::array kKindNames = {"NotFound", "Ambiguous", "Refused", "Busy", "TimedOut", "Failed"};
@@ -91,6 +92,14 @@ void PendingCall::fail(const Problem& problem, const std::vector<std::string>& e
     parts_.connection.send(reply);
 }
 
+bool PendingCall::isRead(unsigned int weight) const {
+    const Unread::Answer answer = parts_.unread.answerFor(message_.sender(), weight);
+    if (answer == Unread::Answer::refusal) {
+        fail(bus::kLimitsExceeded, "too much of what was sent to you is not read yet");
+    }
+    return answer == Unread::Answer::whole;
+}
+
 void PendingCall::guarded(const std::function<void()>& work) const {
     try {
         work();
@@ -123,7 +132,11 @@ void PendingCall::withCaller(std::function<void(const Caller& caller)> next) con
 void PendingCall::inTurn(const std::function<void(const Caller& caller)>& next) const {
     const PendingCall held = *this;
     withCaller([held, next](const Caller& caller) {
-        const auto work = [held, next, caller] { held.guarded([&] { next(caller); }); };
+        const auto work = [held, next, caller] {
+            if (held.isRead(kWeightOfLarge)) {
+                held.guarded([&] { next(caller); });
+            }
+        };
         if (!held.parts_.turns.submit(caller.user, work)) {
             held.fail(bus::kLimitsExceeded, "too many calls wait for an answer already");
         }

@@ -13,6 +13,7 @@
 #include "agent/service/loop.h"
 #include "agent/service/model.h"
 #include "agent/service/turns.h"
+#include "agent/service/unread.h"
 #include "agent/service/workers.h"
 
 namespace cvagent::service {
@@ -29,6 +30,7 @@ struct Parts {
     Callers& callers;
     Consent& consent;
     Turns& turns;
+    Unread& unread;
     Workers& readers;
     Workers& writers;
     std::shared_ptr<Mailbox> mailbox;
@@ -49,6 +51,8 @@ public:
     void fail(const std::string& name, const std::string& text) const;
     /// @param errors what the plug-in reported on the way
     void fail(const Problem& problem, const std::vector<std::string>& errors = {}) const;
+    /// Whether the caller reads what he gets; one who does not is refused, or gets nothing at all.
+    bool isRead(unsigned int weight = 1) const;
     /// Runs something for the call on the loop's thread; what it throws is the answer.
     void guarded(const std::function<void()>& work) const;
     /// Goes on when it is known who calls.

@@ -86,6 +86,9 @@ void Objects::handle(const bus::Message& message) {
     }
     ++handled_;
     const auto call = std::make_shared<const PendingCall>(parts_, message);
+    if (!call->isRead()) {
+        return;
+    }
     call->guarded([&] {
         const std::string object = message.path();
         const Place place{object, parts_.model.byObject(object), object == kRootObject, standing_};

@@ -54,10 +54,11 @@ Service::Service(Loop& loop, bus::Connection& connection, Agent& agent, const Co
                       [this, held = std::make_shared<Look>(std::move(look))] { take(std::move(*held)); });
               }),
       turns_(connection, loop),
+      unread_(connection, loop),
       readers_(kReaders),
       writers_(kWriters),
-      parts_{connection, agent,    model_,   callers_,       consent_,
-             turns_,     readers_, writers_, loop.mailbox(), std::move(past)},
+      parts_{connection, agent,    model_,   callers_,       consent_,       turns_,
+             unread_,    readers_, writers_, loop.mailbox(), std::move(past)},
       objects_(parts_, standing_) {
     standing_.version = CORVISTA_VERSION;
     standing_.lastEvent = lastEvent;

@@ -56,6 +56,7 @@ private:
     Consent consent_;
     Looker looker_;
     Turns turns_;
+    Unread unread_;
     Workers readers_;
     Workers writers_;
     Parts parts_;
