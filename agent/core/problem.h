@@ -22,6 +22,7 @@ public:
         none,
         node,
         property,
+        objection,  ///< something speaks against it, but a person may know better
         pluginSearch,
         pluginFile,
         pluginLoad,
