@@ -28,7 +28,7 @@ void complainOf(change::Preview& preview, const Options& options) {
         preview.objections.clear();
     }
     for (const change::Preview::Target& each : preview.objections) {
-        complain("refused without --force: " + printable(each.path) + " " + each.property + ": " +
+        complain("refused without --force: " + printable(each.path) + " " + printable(each.property) + ": " +
                  printable(each.reason));
     }
 }
@@ -46,7 +46,7 @@ change::Preview ownPreview(Session& session, const std::vector<change::MeantChan
 std::string previewText(const change::Preview& preview) {
     std::string text;
     for (const change::Preview::Target& each : preview.unchanged) {
-        text += "unchanged  " + printable(each.path) + " " + each.property + "\n";
+        text += "unchanged  " + printable(each.path) + " " + printable(each.property) + "\n";
     }
     return text + (preview.plan.changes.empty() ? "" : planText(preview.plan, Style::detect()));
 }
