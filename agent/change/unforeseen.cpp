@@ -46,6 +46,15 @@ void addNames(const Plan& plan, Sentences& sentences) {
     }
 }
 
+void addUntold(const Plan& plan, Sentences& sentences) {
+    for (const FileChange& file : plan.files) {
+        if ((file.before && file.before->withheld) || (file.after && file.after->withheld)) {
+            sentences.push_back("What changes within " + printable(file.path) +
+                                ": it is longer than 1 MiB, or cannot be read.");
+        }
+    }
+}
+
 void addLines(const std::vector<std::string>& lines, const std::string& start, Sentences& sentences) {
     for (std::size_t at = 0; at < std::min(lines.size(), kMostLines); ++at) {
         sentences.push_back(start + lines[at]);
@@ -62,6 +71,7 @@ std::vector<std::string> unforeseen(const Plan& plan, const Isolation& isolation
     addRecorded(plan, sentences);
     addDhcp(plan, sentences);
     addNames(plan, sentences);
+    addUntold(plan, sentences);
     if (plan.changes.size() > 1) {
         sentences.emplace_back(
             "Each change but the first was tried on what those before it left here, which the host may "

@@ -41,7 +41,8 @@ void noteOutcomes(const Application& application, const std::vector<change::Outc
             continue;
         }
         const change::MeantChange& change = application.changes[i];
-        const std::string verdict = change::verdictName(outcome.kind);
+        const bool isUnknown = outcome.kind == change::Outcome::notKnown;
+        const std::string verdict = isUnknown ? "unknown" : change::verdictName(outcome.kind);
         noteWrite(Priority::notice, {change.node->getPath(), change.row->name, application.caller.user},
                   who + " wrote " + change.target() + ": " + verdict +
                       (outcome.reason.empty() ? "" : ": " + outcome.reason),

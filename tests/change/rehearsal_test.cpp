@@ -66,6 +66,20 @@ HOST_TEST(Rehearsal, FollowsALinkOutOfAllThatIsWrittenElse) {
     EXPECT_EQ(host.read("/var/elsewhere/resolv.conf"), "nameserver 127.0.0.53\n");
 }
 
+HOST_TEST(Rehearsal, SaysOfWhichFileItTellsNoContent) {
+    addLink(host);
+    std::string content = "nameserver 127.0.0.53\n";
+    while (content.size() <= 1U << 20U) {
+        content += "# a long comment, as nobody writes it\n";
+    }
+    host.file("/etc/resolv.conf", content);
+    const Plan plan = rehearsed(kNameServer);
+    EXPECT_THAT(
+        plan.unforeseen,
+        testing::Contains("What changes within /etc/resolv.conf: it is longer than 1 MiB, or cannot be "
+                          "read."));
+}
+
 HOST_TEST(Rehearsal, TakesAFileThatIsMountedForWhatItIs) {
     addLink(host);
     host.file("/var/containers/resolv.conf", "nameserver 127.0.0.11\n");
