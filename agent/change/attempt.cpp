@@ -77,7 +77,7 @@ Plan attempt(const RehearsalRequest& request, const Isolation& isolation) {
     shell::hearCommands(hear);
     AgentSettings settings = process.agentSettings();
     settings.plugins = plugins;
-    settings.bringIntoForce = bringingIntoForce();
+    settings.bringIntoForce = bringingIntoForce(Neighbours::notAsked);
     // Its end would wait for monitors and take the nodes away, one by one; the process just ends.
     const Agent& agent = *std::make_unique<Agent>(settings).release();
     // The threads that write are made later and inherit it.

@@ -47,6 +47,15 @@ struct Turns {
         granted = Descriptor(done[0]);
         grant = Descriptor(done[1]);
     }
+    /// Each side keeps its own ends, so that it hears when the other one has gone.
+    void keepInside() {
+        asked.reset();
+        grant.reset();
+    }
+    void keepOutside() {
+        ask.reset();
+        granted.reset();
+    }
     Descriptor asked, ask, granted, grant;
 };
 
@@ -153,9 +162,11 @@ void rehearse(const Descriptor& socket, const std::string& text) {
     isolation.dataDirectory = dataDirectory(request);
     isolation.asUser = cvagent::change::gainRightToIsolate();
     Turns turns;
-    const pid_t process = cvagent::change::startFirstProcess(
-        [&] { return runInside(socket, request, std::move(isolation), turns); });
-    turns.ask.reset();
+    const pid_t process = cvagent::change::startFirstProcess([&] {
+        turns.keepInside();
+        return runInside(socket, request, std::move(isolation), turns);
+    });
+    turns.keepOutside();
     if (takeTurn(turns.asked)) {
         cvagent::change::mapUsersOf(process);
         passTurn(turns.grant);
@@ -170,6 +181,7 @@ int main(int count, char** words) {
         return *status;
     }
     cvagent::openStandardDescriptors();
+    close_range(STDERR_FILENO + 1, ~0U, 0);  // what the caller has open is the host's
     const std::string request = readRequest(STDIN_FILENO);
     Descriptor socket;
     int status = EXIT_SUCCESS;

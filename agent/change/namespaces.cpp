@@ -121,6 +121,7 @@ pid_t startFirstProcess(const std::function<int()>& body) {
     must(process, "no process");
     if (process == 0) {
         prctl(PR_SET_PDEATHSIG, SIGKILL, 0, 0, 0);
+        setsid();  // a signal to its own process group would reach those who started it
         _exit(body());
     }
     return process;

@@ -12,8 +12,8 @@ namespace cvagent::change {
 /// Throws Cannot.
 bool gainRightToIsolate();
 
-/// Starts a process that is the first one of a process table of its own, and with whose end all others there
-/// end; it ends with this one. Throws Cannot.
+/// Starts a process that is the first one of a process table and of a session of its own, and with whose end
+/// all others there end; it ends with this one. Throws Cannot.
 /// @param body runs there; what it returns is the process's status
 pid_t startFirstProcess(const std::function<int()>& body);
 

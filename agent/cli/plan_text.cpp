@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <array>
 
+#include "agent/change/kernel_state.h"
 #include "agent/change/unified_diff.h"
 
 namespace cvagent {
@@ -104,15 +105,12 @@ std::string commandsText(const std::vector<change::PlannedCommand>& commands) {
 /// Those lines that come and go, and where none does, that.
 std::string kernelText(const change::Plan& plan, const Style& style) {
     std::string text;
-    const auto addMissing = [&text](const auto& from, const auto& in, const auto& shown) {
-        for (const std::string& line : from) {
-            text += std::ranges::find(in, line) == in.end() ? shown(line) + "\n" : "";
-        }
-    };
-    addMissing(plan.kernelBefore, plan.kernelAfter,
-               [&style](const std::string& line) { return style.bad("- " + printable(line)); });
-    addMissing(plan.kernelAfter, plan.kernelBefore,
-               [&style](const std::string& line) { return style.good("+ " + printable(line)); });
+    for (const std::string& line : change::missingFrom(plan.kernelAfter, plan.kernelBefore)) {
+        text += style.bad("- " + printable(line)) + "\n";
+    }
+    for (const std::string& line : change::missingFrom(plan.kernelBefore, plan.kernelAfter)) {
+        text += style.good("+ " + printable(line)) + "\n";
+    }
     return text.empty() ? "  as before\n" : text;
 }
 

@@ -1,4 +1,5 @@
 // Whatever the code does that makes a change beforehand, nothing of the host is reached.
+#include <fcntl.h>
 #include <gmock/gmock.h>
 #include <linux/capability.h>
 #include <sys/prctl.h>
@@ -43,6 +44,8 @@ void giveUpClockAndPower() {
     }
 }
 
+volatile std::sig_atomic_t isSignalled = 0;
+
 HOST_TEST(Fence, HoldsAgainstCodeThatReachesForTheHost) {
     giveUpClockAndPower();
     host.useKernelNetwork();
@@ -53,7 +56,12 @@ HOST_TEST(Fence, HoldsAgainstCodeThatReachesForTheHost) {
     host.file("/var/precious", "kept");
     host.directory("/run/dbus");
     ASSERT_EQ(mkfifo("/run/initctl", 0600), 0);
-    const int daemon = listening("/run/dbus/system_bus_socket");
+    host.directory("/var/a daemon");
+    const std::vector<int> daemons{listening("/run/dbus/system_bus_socket"),
+                                   listening("/var/a daemon/its socket")};
+    // As a caller has a file open that he hands down without a thought, and belongs to a group of processes.
+    const int precious = open("/var/precious", O_WRONLY);
+    std::signal(SIGURG, [](int) { isSignalled = 1; });
     moveRecords(host);
     const auto files = writtenPart(host);
     const auto kernel = cvagent::change::readKernelState();
@@ -62,9 +70,13 @@ HOST_TEST(Fence, HoldsAgainstCodeThatReachesForTheHost) {
 
     ASSERT_EQ(plan.answers.size(), 1U);
     EXPECT_THAT(plan.answers[0].problem, HasSubstr("reached: ."));
-    EXPECT_EQ(accept(daemon, nullptr, nullptr), -1);
-    EXPECT_EQ(errno, EAGAIN);
-    close(daemon);
+    for (const int daemon : daemons) {
+        EXPECT_EQ(accept(daemon, nullptr, nullptr), -1);
+        EXPECT_EQ(errno, EAGAIN);
+        close(daemon);
+    }
+    close(precious);
+    EXPECT_EQ(isSignalled, 0) << "the whole process group of the caller";
     EXPECT_EQ(writtenPart(host), files);
     EXPECT_EQ(cvagent::change::readKernelState(), kernel);
     EXPECT_EQ(host.read("/var/precious"), "kept");

@@ -69,13 +69,24 @@ void reachForFiles() {
 }
 
 void reachForDaemons() {
-    sockaddr_un place{};
-    place.sun_family = AF_UNIX;
-    std::strcpy(place.sun_path, "/run/dbus/system_bus_socket");
-    const int handle = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
     tried("a daemon's socket in sight", access("/run/dbus/system_bus_socket", F_OK) == 0);
-    tried("a daemon's socket", connect(handle, reinterpret_cast<const sockaddr*>(&place), sizeof place) == 0);
-    close(handle);
+    for (const char* name : {"/run/dbus/system_bus_socket", "/var/a daemon/its socket"}) {
+        sockaddr_un place{};
+        place.sun_family = AF_UNIX;
+        std::strcpy(place.sun_path, name);
+        const int handle = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
+        tried(name, connect(handle, reinterpret_cast<const sockaddr*>(&place), sizeof place) == 0);
+        close(handle);
+    }
+}
+
+void reachForOpenFiles() {
+    for (int file = 0; file < 1024; ++file) {
+        char name[64] = {};
+        static_cast<void>(readlink(("/proc/self/fd/" + std::to_string(file)).c_str(), name, sizeof name - 1));
+        tried("an open file of the caller",
+              std::strcmp(name, "/var/precious") == 0 && write(file, "!", 1) == 1);
+    }
 }
 
 /// Every process that it can name, but itself and what it has started.
@@ -84,6 +95,7 @@ void reachForProcesses() {
         const bool isOwnThread = access(("/proc/self/task/" + std::to_string(process)).c_str(), F_OK) == 0;
         tried("a process of the host", !isOwnThread && kill(process, 0) == 0);
     }
+    kill(0, SIGURG);  // whoever is in its process group
     tried("the parent", ptrace(PTRACE_ATTACH, getppid(), nullptr, nullptr) == 0);
 }
 
@@ -121,6 +133,7 @@ public:
         reachForPower();
         reachForFiles();
         reachForDaemons();
+        reachForOpenFiles();
         reachForProcesses();
         reachForNames();
         return {Error::failure, Number(), "reached: " + done + "."};

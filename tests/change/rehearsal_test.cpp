@@ -10,6 +10,7 @@
 #include <syscall.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <filesystem>
 #include <fstream>
 
@@ -20,7 +21,7 @@
 namespace {
 
 using cvagent::change::Change;
-using cvagent::change::FileState;
+using cvagent::change::FileChange;
 using cvagent::change::Plan;
 using testing::HasSubstr;
 
@@ -107,6 +108,22 @@ HOST_TEST(Rehearsal, IsNotHeldByPipesLinksInCirclesAndManyMounts) {
     }
 }
 
+/// A list of hosts that are to be blocked has megabytes.
+HOST_TEST(Rehearsal, TellsThatAFileChangesThatIsTooLongToBeTold) {
+    addLink(host);
+    std::string servers;
+    while (servers.size() <= 1U << 20U) {
+        servers += "# nothing but a long file\n";
+    }
+    host.file("/etc/resolv.conf", servers + "nameserver 192.0.2.53\n");
+    host.file("/etc/long", servers);
+    const Plan plan = rehearsed(kNameServer);
+    const auto file = std::ranges::find(plan.files, "/etc/resolv.conf", &FileChange::path);
+    ASSERT_NE(file, plan.files.end());
+    EXPECT_TRUE(file->before->withheld && file->after->withheld);
+    EXPECT_EQ(after(plan, "/etc/long"), "(unchanged)");
+}
+
 HOST_TEST(Rehearsal, TakesWhatAnAgentAtWorkHolds) {
     addLink(host);
     const cvagent::DataDirectory held;
@@ -178,6 +195,16 @@ HOST_TEST(Rehearsal, TriesAsAUserOnCopies) {
     EXPECT_EQ(writtenPart(host), files);
 }
 
+HOST_TEST(Rehearsal, TriesAsAUserWhoseDataLieInTmp) {
+    addLink(host);
+    host.directory("/tmp/of a user", 0700);
+    setenv("CORVISTA_DATA_DIR", "/tmp/of a user", 1);
+    showWholeProc();
+    giveUpRights();
+    EXPECT_EQ(whyNotRehearsed(kNameServer), "");
+    EXPECT_THAT(host.listDirectory("/tmp/of a user"), testing::IsEmpty());
+}
+
 HOST_TEST(Rehearsal, SaysWhyThereIsNoUserNamespace) {
     addLink(host);
     host.directory("/jail");
@@ -221,13 +248,15 @@ TEST(NameService, AsksFilesAlone) {
 }
 
 /// A program in place of the rehearsal's.
-std::string whyNotWith(FakeHost& host, const std::string& script) {
+std::string whyNotWith(FakeHost& host, const std::string& script,
+                       std::chrono::seconds longest = std::chrono::seconds(60),
+                       const std::vector<Change>& changes = kNameServer) {
     host.file("/opt/other", "#!/bin/sh\n" + script + "\n", 0755);
     cvagent::change::RehearsalSettings settings;
     settings.program = "/opt/other";
-    settings.longest = std::chrono::seconds(1);
+    settings.longest = longest;
     try {
-        rehearse(settings, kNameServer);
+        rehearse(settings, changes);
         return "";
     } catch (const cvagent::change::CannotRehearse& reason) {
         return reason.what();
@@ -239,7 +268,11 @@ HOST_TEST(Rehearsal, TakesNothingForAPlanThatIsNone) {
     EXPECT_THAT(whyNotWith(host, "exit 1"), HasSubstr("has failed"));
     EXPECT_THAT(whyNotWith(host, "echo '{\"plan\": {}}'"), HasSubstr("has failed"));
     EXPECT_THAT(whyNotWith(host, "echo '{\"cannot\": \"not today\"}'"), HasSubstr("not today"));
-    EXPECT_THAT(whyNotWith(host, "exec cat"), HasSubstr("in time"));
+    EXPECT_THAT(whyNotWith(host, "head -c 20000000 /dev/zero | tr '\\0' '['"), HasSubstr("too much"));
+    const std::chrono::seconds soon(1);
+    EXPECT_THAT(whyNotWith(host, "exec cat", soon), HasSubstr("in time"));
+    const Change endless{kConfig, 94, {std::string(4U << 20U, 'x')}};
+    EXPECT_THAT(whyNotWith(host, "while :; do :; done", soon, {endless}), HasSubstr("in time"));
     host.remove("/opt/other");
     cvagent::change::RehearsalSettings settings;
     settings.program = "/no/such/program";
