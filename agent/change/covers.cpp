@@ -133,7 +133,7 @@ Cover coverOf(const std::string& place) {
 }
 
 /// A user has what is his own copied, and of what links lead to elsewhere the file alone. /run is empty but
-/// for that. His /tmp becomes another one later.
+/// for that. Of /tmp his agent keeps what it needs and hides the rest later (private_tmp.h).
 std::vector<Cover> placesToCopy(std::vector<std::string> written) {
     std::vector<std::string> files;
     for (const LinkTarget& target : linkTargets()) {
@@ -146,7 +146,7 @@ std::vector<Cover> placesToCopy(std::vector<std::string> written) {
     const std::vector<std::string> directories = outermost(std::move(written));
     std::vector<Cover> covers;
     const auto add = [&](const std::string& place) {
-        if (!isBelow(place, kTmp) && place != kRun) {
+        if (place != kTmp && place != kRun) {
             covers.push_back(coverOf(place));
         }
     };

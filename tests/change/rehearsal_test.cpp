@@ -201,8 +201,10 @@ HOST_TEST(Rehearsal, TriesAsAUserWhoseDataLieInTmp) {
     setenv("CORVISTA_DATA_DIR", "/tmp/of a user", 1);
     showWholeProc();
     giveUpRights();
+    const cvagent::DataDirectory held;
+    const auto files = host.listDirectory("/tmp/of a user");
     EXPECT_EQ(whyNotRehearsed(kNameServer), "");
-    EXPECT_THAT(host.listDirectory("/tmp/of a user"), testing::IsEmpty());
+    EXPECT_EQ(host.listDirectory("/tmp/of a user"), files);
 }
 
 HOST_TEST(Rehearsal, SaysWhyThereIsNoUserNamespace) {
