@@ -98,4 +98,8 @@ NetworkCopy copyNetwork() {
     return copy;
 }
 
+void enterNetwork(const NetworkCopy& copy) {
+    must(setns(copy.handle.get(), CLONE_NEWNET), "the network's copy cannot be entered");
+}
+
 }  // namespace cvagent::change

@@ -2,6 +2,7 @@
 #include <fcntl.h>
 #include <gmock/gmock.h>
 #include <linux/capability.h>
+#include <sys/mount.h>
 #include <sys/prctl.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
@@ -46,7 +47,8 @@ void giveUpClockAndPower() {
 
 volatile std::sig_atomic_t isSignalled = 0;
 
-HOST_TEST(Fence, HoldsAgainstCodeThatReachesForTheHost) {
+/// @return the plan of what the plug-in did to its own
+Plan reachForTheHost(FakeHost& host) {
     giveUpClockAndPower();
     host.useKernelNetwork();
     host.realTool("ip");
@@ -55,7 +57,9 @@ HOST_TEST(Fence, HoldsAgainstCodeThatReachesForTheHost) {
     host.file("/etc/hosts", "127.0.0.1 localhost\n");
     host.file("/var/precious", "kept");
     host.directory("/run/dbus");
-    ASSERT_EQ(mkfifo("/run/initctl", 0600), 0);
+    EXPECT_EQ(mkfifo("/run/initctl", 0600), 0);
+    host.file("/var/network of the host", "");
+    EXPECT_EQ(mount("/.proc/self/ns/net", "/var/network of the host", nullptr, MS_BIND, nullptr), 0);
     host.directory("/var/a daemon");
     const std::vector<int> daemons{listening("/run/dbus/system_bus_socket"),
                                    listening("/var/a daemon/its socket")};
@@ -66,10 +70,9 @@ HOST_TEST(Fence, HoldsAgainstCodeThatReachesForTheHost) {
     const auto files = writtenPart(host);
     const auto kernel = cvagent::change::readKernelState();
 
-    const Plan plan = rehearsed({reaching("now")}, REACHING_PLUGIN_FILE);
+    Plan plan = rehearsed({reaching("now")}, REACHING_PLUGIN_FILE);
 
-    ASSERT_EQ(plan.answers.size(), 1U);
-    EXPECT_THAT(plan.answers[0].problem, HasSubstr("reached: ."));
+    EXPECT_THAT(plan.answers.at(0).problem, HasSubstr("reached: ."));
     for (const int daemon : daemons) {
         EXPECT_EQ(accept(daemon, nullptr, nullptr), -1);
         EXPECT_EQ(errno, EAGAIN);
@@ -82,15 +85,30 @@ HOST_TEST(Fence, HoldsAgainstCodeThatReachesForTheHost) {
     EXPECT_EQ(host.read("/var/precious"), "kept");
     EXPECT_FALSE(host.exists("/usr/reached") || host.exists("/reached"));
     EXPECT_TRUE(host.clockCalls().empty());
-    // What it did to its own is in the plan.
-    EXPECT_THAT(plan.kernelAfter, Contains("host name reached"));
     EXPECT_THAT(plan.kernelAfter, Contains(HasSubstr("link veth0 mtu 1500 down")));
     EXPECT_THAT(kernel, Contains(HasSubstr("link veth0 mtu 1500 up")));
+    umount2("/var/network of the host", MNT_DETACH);
+    return plan;
+}
+
+HOST_TEST(Fence, HoldsAgainstCodeThatReachesForTheHost) {
+    const Plan plan = reachForTheHost(host);
+    EXPECT_THAT(plan.kernelAfter, Contains("host name reached"));
     ASSERT_EQ(plan.files.size(), 2U);
     EXPECT_EQ(plan.files[0].path, "/etc/hosts");
     EXPECT_EQ(plan.files[0].after, std::nullopt);
     EXPECT_EQ(plan.files[1].path, "/etc/reached");
     EXPECT_EQ(plan.files[1].before, std::nullopt);
+}
+
+/// Where root gets no user namespace, the rights that it gives up have to do.
+HOST_TEST(Fence, HoldsWithoutAUserNamespace) {
+    host.directory("/jail");
+    ASSERT_EQ(mount("/", "/jail", nullptr, MS_BIND | MS_REC, nullptr), 0);
+    ASSERT_EQ(chroot("/jail"), 0);
+    const Plan plan = reachForTheHost(host);
+    EXPECT_THAT(plan.unforeseen, Contains(HasSubstr("no user namespace")));
+    EXPECT_EQ(plan.files.size(), 2U);
 }
 
 /// All processes of the host, with their names.

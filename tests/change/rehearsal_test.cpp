@@ -23,6 +23,7 @@ namespace {
 using cvagent::change::Change;
 using cvagent::change::FileChange;
 using cvagent::change::Plan;
+using cvagent::change::PlannedCommand;
 using testing::HasSubstr;
 
 constexpr const char* kConfig = "ip-config:eth0";
@@ -207,15 +208,36 @@ HOST_TEST(Rehearsal, TriesAsAUserWhoseDataLieInTmp) {
     EXPECT_EQ(host.listDirectory("/tmp/of a user"), files);
 }
 
-HOST_TEST(Rehearsal, SaysWhyThereIsNoUserNamespace) {
-    addLink(host);
+/// The kernel gives no user namespace there.
+void enterJail(FakeHost& host) {
     host.directory("/jail");
     ASSERT_EQ(mount("/", "/jail", nullptr, MS_BIND | MS_REC, nullptr), 0);
-    ASSERT_EQ(chroot("/jail"), 0);  // where the kernel gives none
+    ASSERT_EQ(chroot("/jail"), 0);
+}
+
+HOST_TEST(Rehearsal, SaysWhyThereIsNoUserNamespace) {
+    addLink(host);
+    enterJail(host);
+    giveUpRights();
     const auto files = writtenPart(host);
     EXPECT_THAT(whyNotRehearsed(kNameServer),
                 HasSubstr("the host allows no user namespace here: Operation not permitted"));
     EXPECT_EQ(writtenPart(host), files);
+}
+
+/// The copy's host name is set although nothing there may set one.
+HOST_TEST(Rehearsal, SetsTheHostsNameWithoutAUserNamespace) {
+    addLink(host);
+    host.realTool("hostname");
+    host.file("/etc/hosts", "127.0.0.1\tlocalhost\n");
+    enterJail(host);
+    const Plan plan = rehearsed({{kConfig, 97, {"earth"}}, {kConfig, 98, {"example.org"}}});
+    EXPECT_EQ(plan.answers[1].failure(), "");
+    EXPECT_THAT(plan.kernelAfter, testing::Contains("host name earth.example.org"));
+    EXPECT_THAT(after(plan, "/etc/hosts"), HasSubstr("earth.example.org\tearth"));
+    const auto set = std::ranges::find(plan.commands, "hostname earth", &PlannedCommand::text);
+    ASSERT_NE(set, plan.commands.end());
+    EXPECT_FALSE(set->recorded);
 }
 
 HOST_TEST(Rehearsal, SaysThatUserNamespacesAreSwitchedOff) {
@@ -227,6 +249,8 @@ HOST_TEST(Rehearsal, SaysThatUserNamespacesAreSwitchedOff) {
         GTEST_SKIP() << "the limit would be the machine's";
     }
     std::ofstream("/.proc/sys/user/max_user_namespaces") << "0" << std::flush;
+    EXPECT_EQ(whyNotRehearsed(kNameServer), "") << "root can do without";
+    giveUpRights();
     EXPECT_THAT(whyNotRehearsed(kNameServer), HasSubstr("user.max_user_namespaces"));
 }
 
