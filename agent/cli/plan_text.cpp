@@ -81,11 +81,11 @@ std::string coloured(const std::string& diff, const Style& style) {
 
 std::string fileText(const FileChange& file, const Style& style) {
     const std::string name = printable(file.path);
-    std::string text =
-        "--- " + (file.before ? name : "/dev/null") + "\n+++ " + (file.after ? name : "/dev/null") + "\n";
+    std::string text;
     if (kindOf(file.before) != kindOf(file.after)) {
-        text += "    " + kindOf(file.before) + " becomes " + kindOf(file.after) + "\n";
+        text = "    " + kindOf(file.before) + " becomes " + kindOf(file.after) + "\n";
     }
+    text += "--- " + (file.before ? name : "/dev/null") + "\n+++ " + (file.after ? name : "/dev/null") + "\n";
     const bool isWithheld = (file.before && file.before->withheld) || (file.after && file.after->withheld);
     return text + (isWithheld
                        ? "    its content is not told\n"
