@@ -122,8 +122,11 @@ Plan planFrom(const Json& json) {
     plan.answers = listFrom<Answer>(json.at("answers"), answerFrom);
     plan.files = listFrom<FileChange>(json.at("files"), fileChangeFrom);
     plan.commands = listFrom<PlannedCommand>(json.at("commands"), commandFrom);
-    plan.kernelBefore = textsFrom(json.at("kernelBefore"));
-    plan.kernelAfter = textsFrom(json.at("kernelAfter"));
+    for (const auto& [key, state] :
+         {std::pair("kernelBefore", &plan.kernelBefore), {"kernelAfter", &plan.kernelAfter}}) {
+        *state = textsFrom(json.at(key));
+        std::ranges::sort(*state);  // whatever the other process has told
+    }
     plan.unforeseen = textsFrom(json.at("unforeseen"));
     checkTogether(plan);
     return plan;
@@ -142,7 +145,7 @@ std::string toJson(const Plan& plan) {
 
 Plan planFromJson(std::string_view json) {
     try {
-        return planFrom(Json::parse(json));
+        return planFrom(parsedParts(json));
     } catch (const nlohmann::json::exception& damaged) {
         throw BadPlan(damaged.what());
     }

@@ -31,7 +31,7 @@ using Clock = std::chrono::steady_clock;
 
 constexpr const char* kProgram = "corvista-rehearsal";
 /// Files of a host are kilobytes; a plug-in that prints without end is not read to it.
-constexpr std::size_t kMostAnswer = 64U << 20U;
+constexpr std::size_t kMostAnswer = 16U << 20U;
 constexpr long long kBetweenQuestions = 200;  // milliseconds
 constexpr long kConnectTime = 10;             // seconds
 
@@ -99,10 +99,12 @@ public:
         }
     }
 
-    void ask(std::string_view request) const {
+    void ask(std::string_view request, Clock::time_point end) const {
         while (!request.empty()) {
-            const ssize_t sent = send(ours_.get(), request.data(), request.size(), MSG_NOSIGNAL);
-            if (sent < 0 && errno != EINTR) {
+            waitFor(POLLOUT, end);
+            const ssize_t sent =
+                send(ours_.get(), request.data(), request.size(), MSG_NOSIGNAL | MSG_DONTWAIT);
+            if (sent < 0 && errno != EINTR && errno != EAGAIN) {
                 return;  // it has ended; its answer tells why
             }
             request.remove_prefix(sent > 0 ? static_cast<std::size_t>(sent) : 0);
@@ -113,7 +115,7 @@ public:
         std::string text;
         std::array<char, 65536> part{};
         for (;;) {
-            waitForMore(end);
+            waitFor(POLLIN, end);
             const ssize_t got = recv(ours_.get(), part.data(), part.size(), 0);
             if (got == 0 || (got < 0 && errno != EINTR)) {
                 return text;
@@ -141,10 +143,10 @@ private:
         }
     }
 
-    void waitForMore(Clock::time_point end) const {
+    void waitFor(short what, Clock::time_point end) const {
         for (;;) {
             const auto left = std::chrono::ceil<std::chrono::milliseconds>(end - Clock::now()).count();
-            pollfd ready{ours_.get(), POLLIN, 0};
+            pollfd ready{ours_.get(), what, 0};
             const auto slice = goesOn_ ? std::min<long long>(left, kBetweenQuestions) : left;
             const int result = left > 0 ? poll(&ready, 1, static_cast<int>(slice)) : 0;
             if (result > 0) {
@@ -172,7 +174,8 @@ Plan rehearse(const RehearsalSettings& settings, const std::vector<Change>& chan
     const Rehearsal rehearsal(settings);
     rehearsal.ask(
         toJson({settings.plugins, settings.dataDirectory, settings.hostTools, settings.commands, changes}) +
-        '\n');
+            '\n',
+        end);
     const std::string text = rehearsal.answer(end);
     try {
         RehearsalAnswer answer = answerFromJson(text);

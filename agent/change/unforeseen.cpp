@@ -79,6 +79,12 @@ std::vector<std::string> unforeseen(const Plan& plan, const Isolation& isolation
     }
     addLines(isolation.network.missing, "Tried without what the network has: ", sentences);
     addLines(isolation.network.added, "Tried with what the network has not: ", sentences);
+    if (isolation.fence == Fence::droppedRights) {
+        sentences.emplace_back(
+            "What the plug-in asks the network's drivers at its start: as the host allows no user namespace, "
+            "it "
+            "was in the copy from the beginning.");
+    }
     if (isolation.asUser) {
         sentences.emplace_back(
             "Tried as a user on copies of the files that he may read; on the host it takes root.");

@@ -48,6 +48,12 @@ TEST(Plan, ComesBackAsItWent) {
     EXPECT_EQ(back.unforeseen, plan.unforeseen);
 }
 
+TEST(Plan, HasItsKernelStateInOrderWhateverWasTold) {
+    Plan plan = wholePlan();
+    plan.kernelAfter = {"route default", "link lo"};
+    EXPECT_THAT(planFromJson(toJson(plan)).kernelAfter, testing::ElementsAre("link lo", "route default"));
+}
+
 TEST(Plan, IsNotReadFromWhatIsNone) {
     const std::string whole = toJson(wholePlan());
     EXPECT_NO_THROW(planFromJson(whole));
@@ -61,6 +67,8 @@ TEST(Plan, IsNotReadFromWhatIsNone) {
         return text;
     };
     EXPECT_THROW(planFromJson(with("\"link\"", "\"door\"")), BadPlan);
+    const std::string nested = std::string(1'000'000, '[') + std::string(1'000'000, ']');
+    EXPECT_THAT([&] { planFromJson(nested); }, testing::ThrowsMessage<BadPlan>(testing::HasSubstr("levels")));
     EXPECT_THROW(planFromJson(with("\"change\": 1", "\"change\": 2")), BadPlan);
     EXPECT_THROW(planFromJson(with("\"change\": 1", "\"change\": \"x\"")), BadPlan);
     EXPECT_THROW(planFromJson(with("\"base64\": \"", "\"base64\": \"*")), BadPlan);
