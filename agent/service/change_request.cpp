@@ -106,6 +106,9 @@ std::vector<change::NamedChange> takeChanges(bus::Reader& reader) {
                         " bytes");
         }
     });
+    if (changes.size() == 1) {
+        changes.front().place.clear();  // which one is meant is no question
+    }
     return changes;
 }
 

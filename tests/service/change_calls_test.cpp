@@ -163,6 +163,7 @@ HOST_TEST_F(ServiceChanges, ThatMakeNoSenseOrAreTooManyChangeNothing) {
         {{good, {"computer", "HostName", {"x"}}}, error + "Refused: changes[1]: "},
         {{good, {"computer", "115", {"two\nlines"}}}, error + "Refused: changes[1]: "},
         {{good, {"3", "115", {"y"}}}, error + "Refused: changes[1]: "},
+        {{{"nowhere", "115", {"x"}}}, error + "NotFound: there is no node"},
         {std::vector<Wanted>(1001, good), limits + "more than 1000 changes"},
         {{{"computer", "115", std::vector<std::string>(257, "x")}}, limits + "changes[0] has more than 256"},
         {{good, {"computer", "116", {std::string(1 << 20, 'x')}}}, limits + "the changes are longer than"},
@@ -308,6 +309,31 @@ HOST_TEST_F(ServicePlans, AreThoseByHand) {
     EXPECT_EQ(asked.status, 0);
     EXPECT_THAT(host.read(file).value_or(""), HasSubstr("IPADDR=192.0.2.10\n")) << "nothing was changed";
     EXPECT_EQ(Json::parse(own.out)["plan"]["answers"][3]["before"], "1") << "the host's, not the copy's";
+}
+
+/// What is refused, forced and told of a single change is the same, whoever makes it.
+HOST_TEST_F(ServicePlans, GoWithASetThatIsTheSameAsByHand) {
+    const std::vector<std::vector<std::string>> changes = {
+        {"set", "ip-config:eth0", "IPv4Address", "192.0.2.255"},
+        {"set", "ip-config:eth0", "IPv4Gateway", "203.0.113.1"},
+        {"set", "ip-config:eth0", "IPv4Address", "192.0.2.255", "--force"},
+        {"set", "ip-config:eth0", "IPv4Address", "192.0.2.10", "--verify-within", "0.1", "--json"}};
+    std::vector<Finished> own;
+    for (const auto& words : changes) {
+        std::vector<std::string> line = {CVAGENT_PROGRAM, "--bus", "none", "--plugin", CORVISTA_PLUGIN_FILE};
+        line.insert(line.end(), words.begin(), words.end());
+        own.push_back(host.run(line));
+    }
+    serve(host);
+    for (std::size_t i = 0; i < changes.size(); ++i) {
+        std::vector<std::string> line = {"env", "CORVISTA_BUS=" + ServiceRun::address(), CVAGENT_PROGRAM};
+        line.insert(line.end(), changes[i].begin(), changes[i].end());
+        const Finished asked = host.run(line);
+        EXPECT_EQ(asked.err, own[i].err);
+        EXPECT_EQ(asked.out, own[i].out);
+        EXPECT_EQ(asked.status, own[i].status);
+        EXPECT_EQ(asked.status, i < 2 ? 4 : 0);
+    }
 }
 
 /// Whom the service lets have a plan has root's, but for what only root may read.
