@@ -24,6 +24,11 @@ using hosttools::Descriptor;
 constexpr const char* kRuntimeFiles = "/run";
 constexpr int kDaemonDepth = 6;  // directories below /run that daemons have their sockets in
 
+/// One that has gone meanwhile is hidden as well.
+void mustHide(bool isHidden) {
+    must(isHidden || errno == ENOENT ? 0 : -1, "a daemon's socket cannot be hidden");
+}
+
 void removeDaemonsFrom(int directory, int depth) {
     for (const std::string& name : namesIn(directory)) {
         struct stat found {};
@@ -31,7 +36,7 @@ void removeDaemonsFrom(int directory, int depth) {
             continue;
         }
         if (S_ISSOCK(found.st_mode) || S_ISFIFO(found.st_mode)) {
-            must(unlinkat(directory, name.c_str(), 0), "a daemon's socket cannot be hidden");
+            mustHide(unlinkat(directory, name.c_str(), 0) == 0);
         } else if (S_ISDIR(found.st_mode) && depth > 0) {
             const Descriptor below(
                 openat(directory, name.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
@@ -48,8 +53,7 @@ bool isSocketHere(const std::string& name) {
 }
 
 void layOver(const std::string& name, const std::string& file) {
-    const bool isHidden = attach(sameAgain(file), name);
-    must(isHidden || errno == ENOENT ? 0 : -1, "a daemon's socket cannot be hidden");
+    mustHide(attach(sameAgain(file), name));
 }
 
 }  // namespace
@@ -80,7 +84,7 @@ void hideDaemons(const std::string& directory) {
     }
     const std::string nothing = directory + "/nothing";
     const Descriptor made(open(nothing.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0444));
-    must(made.get(), "a daemon's socket cannot be hidden");
+    mustHide(made.isOpen());
     for (const std::string& name : socketNames(contentOf("/proc/net/unix").value_or(""))) {
         if (isSocketHere(name)) {
             layOver(name, nothing);

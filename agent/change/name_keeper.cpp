@@ -21,7 +21,7 @@ using hosttools::Descriptor;
 constexpr std::size_t kLongestName = 64;  // of the kernel
 
 /// A name without a file, which only the copy of the network knows.
-sockaddr_un place(socklen_t& size) {
+sockaddr_un placeOfKeeper(socklen_t& size) {
     constexpr std::string_view kName{"\0corvista-rehearsal-name", 24};
     sockaddr_un address{};
     address.sun_family = AF_UNIX;
@@ -33,7 +33,7 @@ sockaddr_un place(socklen_t& size) {
 template <int (*Call)(int, const sockaddr*, socklen_t)>
 long atPlace(const Descriptor& handle) {
     socklen_t size = 0;
-    const sockaddr_un address = place(size);
+    const sockaddr_un address = placeOfKeeper(size);
     return Call(handle.get(), reinterpret_cast<const sockaddr*>(&address), size);
 }
 

@@ -65,8 +65,8 @@ bool isKeptElsewhere(const Property& row, const IC::PropertyValue& value, const 
 }
 
 bool isDuplicate(const IC::MutableNode& node, const Property& row, const IC::PropertyValue& value) {
-    constexpr unsigned int kIpv6Address[] = {27};
-    const auto ip = isAmong(row, kIpv6Address) ? Ip::parse(static_cast<std::string>(value)) : std::nullopt;
+    constexpr unsigned int kAskedFor[] = {27};
+    const auto ip = isAmong(row, kAskedFor) ? Ip::parse(static_cast<std::string>(value)) : std::nullopt;
     return ip && duplicateOf(interfaceNameOf(node), *ip) == Duplicate::yes;
 }
 
