@@ -1,10 +1,7 @@
 #include "agent/change/attempt.h"
 
-#include <sched.h>
-
 #include <memory>
 
-#include "agent/change/cannot.h"
 #include "agent/change/in_force.h"
 #include "agent/change/kernel_state.h"
 #include "agent/change/record.h"
@@ -73,15 +70,17 @@ Plan attempt(const RehearsalRequest& request, const Isolation& isolation) {
     wanted.hostTools = request.hostTools;
     wanted.commands = request.commands;
     const PreparedProcess process(wanted);
-    putRecordersOnPath();
+    putRecordersOnPath(isolation.fence == Fence::droppedRights);
     shell::hearCommands(hear);
     AgentSettings settings = process.agentSettings();
     settings.plugins = plugins;
-    settings.bringIntoForce = bringingIntoForce();
+    settings.bringIntoForce = bringingIntoForce(Neighbours::notAsked);
     // Its end would wait for monitors and take the nodes away, one by one; the process just ends.
     const Agent& agent = *std::make_unique<Agent>(settings).release();
     // The threads that write are made later and inherit it.
-    must(setns(isolation.network.handle.get(), CLONE_NEWNET), "the network's copy cannot be entered");
+    if (isolation.fence == Fence::userNamespace) {
+        enterNetwork(isolation.network);
+    }
     Plan plan;
     plan.changes = request.changes;
     const WrittenFiles before = writtenFiles(isolation.covers);

@@ -5,8 +5,6 @@
 #include <algorithm>
 #include <array>
 
-#include "agent/change/processes.h"
-
 namespace cvagent::change {
 
 namespace {
@@ -17,16 +15,20 @@ constexpr std::array kSteering = {"chronyd",         "ntpd",  "openntpd", "ntpd-
 
 }  // namespace
 
-std::string clockSteeredBy() {
-    for (const Process& each : runningProcesses()) {
+std::string clockSteeredBy(const std::vector<Process>& running, std::optional<unsigned> status) {
+    for (const Process& each : running) {
         if (std::ranges::find(kSteering, each.name) != kSteering.end()) {
             return each.name;
         }
     }
+    return status && (*status & STA_UNSYNC) == 0 ? "something" : "";
+}
+
+std::string clockSteeredBy() {
     timex state{};  // modes 0: asks only
-    const int answer = adjtimex(&state);
-    const bool isSteered = answer >= 0 && (static_cast<unsigned>(state.status) & STA_UNSYNC) == 0;
-    return isSteered ? "something" : "";
+    const bool isTold = adjtimex(&state) >= 0;
+    return clockSteeredBy(runningProcesses(),
+                          isTold ? std::optional(static_cast<unsigned>(state.status)) : std::nullopt);
 }
 
 }  // namespace cvagent::change

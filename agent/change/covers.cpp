@@ -12,7 +12,7 @@
 #include <filesystem>
 
 #include "agent/change/cannot.h"
-#include "agent/change/directory.h"
+#include "agent/change/daemons.h"
 #include "agent/change/mount_calls.h"
 #include "agent/change/tree_copy.h"
 #include "agent/change/written_places.h"
@@ -24,10 +24,9 @@ namespace {
 
 using hosttools::Descriptor;
 
-constexpr std::array kDevices = {"null", "zero", "full", "random", "urandom", "tty"};
+constexpr std::array kDevices = {"null", "zero", "full", "random", "urandom"};
 constexpr const char* kWork = "/dev";  // where our own memory lies until the devices come there
 constexpr const char* kSize = "256m";
-constexpr int kDaemonDepth = 6;  // directories below /run that daemons have their sockets in
 
 Descriptor path(const std::string& name) {
     return Descriptor(open(name.c_str(), O_PATH | O_CLOEXEC));
@@ -109,6 +108,11 @@ void coverFile(Cover& cover, Work& work, CopyBudget& budget) {
     if (!out.isOpen() || (in.isOpen() && !copyContent(in.get(), out.get(), budget))) {
         throw Cannot(cover.path + " cannot be copied");
     }
+    struct stat found {};
+    if (fstat(cover.original.get(), &found) == 0) {
+        const std::array<timespec, 2> times{found.st_atim, found.st_mtim};
+        futimens(out.get(), times.data());
+    }
     liken(place, cover.original);
     cover.ours = path(place);
     if (!attach(sameAgain(place), cover.path)) {
@@ -129,7 +133,7 @@ Cover coverOf(const std::string& place) {
 }
 
 /// A user has what is his own copied, and of what links lead to elsewhere the file alone. /run is empty but
-/// for that. His /tmp becomes another one later.
+/// for that. Of /tmp his agent keeps what it needs and hides the rest later (private_tmp.h).
 std::vector<Cover> placesToCopy(std::vector<std::string> written) {
     std::vector<std::string> files;
     for (const LinkTarget& target : linkTargets()) {
@@ -142,7 +146,7 @@ std::vector<Cover> placesToCopy(std::vector<std::string> written) {
     const std::vector<std::string> directories = outermost(std::move(written));
     std::vector<Cover> covers;
     const auto add = [&](const std::string& place) {
-        if (!isBelow(place, kTmp) && place != kRun) {
+        if (place != kTmp && place != kRun) {
             covers.push_back(coverOf(place));
         }
     };
@@ -244,32 +248,6 @@ void emptyRun(const std::vector<Cover>& covers, Work& work) {
     }
 }
 
-/// Daemons of the host listen there, whom nothing may reach.
-void removeDaemonsFrom(int directory, int depth) {
-    for (const std::string& name : namesIn(directory)) {
-        struct stat found {};
-        if (fstatat(directory, name.c_str(), &found, AT_SYMLINK_NOFOLLOW) != 0) {
-            continue;
-        }
-        if (S_ISSOCK(found.st_mode) || S_ISFIFO(found.st_mode)) {
-            must(unlinkat(directory, name.c_str(), 0), "a daemon's socket cannot be hidden");
-        } else if (S_ISDIR(found.st_mode) && depth > 0) {
-            const Descriptor below(
-                openat(directory, name.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
-            if (below.isOpen()) {
-                removeDaemonsFrom(below.get(), depth - 1);
-            }
-        }
-    }
-}
-
-void hideDaemons() {
-    const Descriptor run(open(kRun, O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-    if (run.isOpen()) {
-        removeDaemonsFrom(run.get(), kDaemonDepth);
-    }
-}
-
 using Devices = std::vector<std::pair<std::string, Descriptor>>;
 
 Devices plainDevices() {
@@ -333,7 +311,7 @@ std::vector<Cover> isolateFiles(bool copies, const std::string& dataDirectory) {
             showAgain(views);
         }
     }
-    hideDaemons();
+    hideDaemons(work.directory("nothing"));
     showDevices(devices);
     showOwnProcesses(mounts);
     return covers;

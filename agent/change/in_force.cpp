@@ -3,8 +3,10 @@
 #include <linux/rtnetlink.h>
 
 #include <algorithm>
+#include <chrono>
 #include <cstring>
 #include <iterator>
+#include <thread>
 
 #include "agent/change/interface_settings.h"
 #include "agent/change/kernel_network.h"
@@ -18,6 +20,7 @@ struct Scene {
     KernelNetwork before;
     KernelLink link;
     std::string value;  ///< that is written
+    Neighbours neighbours = Neighbours::awaited;
 };
 
 std::string reason(int problem) {
@@ -34,6 +37,11 @@ public:
 
     EffectInForce make() {
         if (KernelNetwork::read().find(scene_.link.index, ip_, prefix_) == nullptr && !add()) {
+            return effect_;
+        }
+        if (isAnothers()) {
+            effect_.lacking =
+                "another host has " + ip_.text() + ", so the running host does not use it; the old one stays";
             return effect_;
         }
         removeOld();
@@ -54,6 +62,19 @@ private:
                 "the running host does not take " + shown(ip_, prefix_) + ": " + reason(problem);
         }
         return problem == 0;
+    }
+
+    /// The kernel asks a link that has a carrier.
+    bool isAnothers() const {
+        constexpr std::chrono::milliseconds kBetweenLooks{50};
+        const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(4);
+        const bool isAsked = ip_.isIpv6 && scene_.link.isRunning && scene_.neighbours == Neighbours::awaited;
+        Duplicate found = isAsked ? Duplicate::beingAsked : Duplicate::no;
+        while (isAsked && (found = duplicateOf(scene_.link.name, ip_)) == Duplicate::beingAsked &&
+               std::chrono::steady_clock::now() < end) {
+            std::this_thread::sleep_for(kBetweenLooks);
+        }
+        return found == Duplicate::yes;
     }
 
     /// The kernel keeps one IPv6 address of a kind, with the prefix length that it had first.
@@ -77,11 +98,12 @@ private:
         return old_ != nullptr && address.ip == old_->ip && address.prefix == old_->prefix;
     }
 
-    /// The plug-in gives a running address its mask: the old one may have it by now, or be gone.
+    /// The plug-in gives a running address its mask: the old one may have it by now, or be gone. One that
+    /// another host has is of no use either.
     void removeOld() {
         for (const KernelAddress& each : KernelNetwork::read().addresses) {
-            const bool isSame = each.link == scene_.link.index && old_ != nullptr && each.ip == old_->ip;
-            if (isSame && !isWanted(each)) {
+            const bool isSame = (old_ != nullptr && each.ip == old_->ip) || each.duplicate == Duplicate::yes;
+            if (isSame && each.link == scene_.link.index && !isWanted(each)) {
                 noteIf(remove(each), "the old address " + shown(each.ip, each.prefix) + " stays");
                 if (!each.isPermanent) {
                     effect_.notes.push_back(each.ip.text() +
@@ -117,7 +139,7 @@ private:
     void putBackAddresses() {
         for (const KernelAddress& each : scene_.before.addresses) {
             const bool isOther = each.link == scene_.link.index && each.ip.isIpv6 == ip_.isIpv6 &&
-                                 !isOld(each) && each.ip != ip_;
+                                 !isOld(each) && each.ip != ip_ && each.duplicate != Duplicate::yes;
             if (isOther && KernelNetwork::read().find(each.link, each.ip, each.prefix) == nullptr) {
                 noteIf(addAgain(each), "the address " + shown(each.ip, each.prefix) + " is gone");
             }
@@ -272,14 +294,14 @@ constexpr Effector kEffectors[] = {
 
 }  // namespace
 
-BringIntoForce bringingIntoForce() {
-    return [](const IC::MutableNode& node, const Property& row,
-              const IC::PropertyValue& value) -> std::function<EffectInForce()> {
+BringIntoForce bringingIntoForce(Neighbours neighbours) {
+    return [neighbours](const IC::MutableNode& node, const Property& row,
+                        const IC::PropertyValue& value) -> std::function<EffectInForce()> {
         const auto* effector = std::ranges::find(kEffectors, row.id, &Effector::property);
         if (row.type != NodeType::ipConfig || effector == std::end(kEffectors)) {
             return nullptr;
         }
-        Scene scene{KernelNetwork::read(), {}, static_cast<std::string>(value)};
+        Scene scene{KernelNetwork::read(), {}, static_cast<std::string>(value), neighbours};
         const KernelLink* link = scene.before.link(interfaceNameOf(node));
         if (link == nullptr) {
             return nullptr;

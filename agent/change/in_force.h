@@ -9,6 +9,9 @@ namespace cvagent::change {
 /// link that the kernel does not have, and nothing when the plug-in has not written the file. The new address
 /// comes before the old one goes; other addresses and routes that go with the old one are put back as far as
 /// they still can be, and the rest is told.
-BringIntoForce bringingIntoForce();
+/// @param neighbours whether it is waited for what the other hosts of a link say of a new IPv6 address, which
+///                   takes a second or two; one that another host has is told, and the old one stays
+enum class Neighbours { awaited, notAsked };
+BringIntoForce bringingIntoForce(Neighbours neighbours = Neighbours::awaited);
 
 }  // namespace cvagent::change

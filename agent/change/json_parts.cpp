@@ -16,7 +16,23 @@ bool isUtf8(const std::string& text) {
     }
 }
 
+/// The answer, its plan, the files, one of them, a state, its content in base64.
+constexpr int kDeepestPlan = 6;
+
 }  // namespace
+
+Json parsedParts(std::string_view text) {
+    try {
+        return Json::parse(text, [](int depth, Json::parse_event_t /*event*/, Json& /*part*/) {
+            if (depth > kDeepestPlan) {
+                throw BadPlan("it has more levels than a plan has");
+            }
+            return true;
+        });
+    } catch (const Json::exception& damaged) {
+        throw BadPlan(damaged.what());
+    }
+}
 
 Json bytes(const std::string& text) {
     return isUtf8(text) ? Json(text) : Json{{"base64", toBase64(text)}};

@@ -2,6 +2,7 @@
 
 #include <nlohmann/json.hpp>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "agent/change/change.h"
@@ -16,6 +17,9 @@ using Json = nlohmann::ordered_json;
 
 Json bytes(const std::string& text);
 Json texts(const std::vector<std::string>& all);
+
+/// A document of another process: no deeper than a plan is. Throws BadPlan.
+Json parsedParts(std::string_view text);
 
 // What reads them throws BadPlan or nlohmann::json::exception.
 

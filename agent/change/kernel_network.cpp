@@ -50,7 +50,8 @@ void takeLink(KernelNetwork& network, std::string_view message) {
     if (!head) {
         return;
     }
-    KernelLink link{static_cast<unsigned>(head->ifi_index), "", (head->ifi_flags & IFF_UP) != 0};
+    KernelLink link{static_cast<unsigned>(head->ifi_index), "", (head->ifi_flags & IFF_UP) != 0,
+                    (head->ifi_flags & IFF_RUNNING) != 0};
     const auto attributes = message.substr(NLMSG_ALIGN(sizeof(ifinfomsg)));
     hosttools::eachAttribute(attributes, [&link](unsigned type, std::string_view data) {
         if (type == IFLA_IFNAME) {
@@ -66,7 +67,11 @@ void takeAddressAttribute(KernelAddress& address, bool isIpv6, unsigned type, st
     } else if (type == IFA_LABEL) {
         address.label = nameIn(data);
     } else if (type == IFA_FLAGS) {
-        address.isPermanent = (numberIn(data) & IFA_F_PERMANENT) != 0;
+        const unsigned flags = numberIn(data);
+        address.isPermanent = (flags & IFA_F_PERMANENT) != 0;
+        address.duplicate = (flags & IFA_F_DADFAILED) != 0   ? Duplicate::yes
+                            : (flags & IFA_F_TENTATIVE) != 0 ? Duplicate::beingAsked
+                                                             : Duplicate::no;
     } else if (type == IFA_PROTO) {
         address.protocol = data.empty() ? 0 : static_cast<unsigned char>(data.front());
     }
@@ -193,7 +198,8 @@ std::string KernelNetwork::nameOf(unsigned link) const {
 const KernelAddress* KernelNetwork::mainAddress(unsigned link, bool isIpv6) const {
     const std::string name = nameOf(link);
     const auto found = std::ranges::find_if(addresses, [&](const KernelAddress& address) {
-        const bool isKnownBy = isIpv6 ? address.isGlobal && address.isPermanent : address.label == name;
+        const bool isInUse = address.isGlobal && address.isPermanent && address.duplicate != Duplicate::yes;
+        const bool isKnownBy = isIpv6 ? isInUse : address.label == name;
         return address.link == link && address.ip.isIpv6 == isIpv6 && isKnownBy;
     });
     return found == addresses.end() ? nullptr : &*found;
@@ -204,6 +210,22 @@ const KernelAddress* KernelNetwork::find(unsigned link, const Ip& ip, unsigned p
         return address.link == link && address.ip == ip && address.prefix == prefix;
     });
     return found == addresses.end() ? nullptr : &*found;
+}
+
+Duplicate duplicateOf(const std::string& link, const Ip& ip) {
+    ifaddrmsg asked{};
+    asked.ifa_family = AF_INET6;
+    KernelNetwork network;
+    hosttools::NetlinkSocket socket(NETLINK_ROUTE);
+    const int problem = socket.ask(
+        makeRequest(RTM_GETADDR, NLM_F_DUMP, bytesOf(asked)),
+        [&network](unsigned /*type*/, std::string_view message) { takeAddress(network, message); });
+    const unsigned index = problem == 0 || problem == EINTR ? if_nametoindex(link.c_str()) : 0;
+    Duplicate found = Duplicate::no;
+    for (const KernelAddress& each : network.addresses) {
+        found = each.link == index && each.ip == ip ? each.duplicate : found;
+    }
+    return found;
 }
 
 bool KernelNetwork::has(const KernelRoute& route) const {

@@ -9,10 +9,14 @@
 
 namespace cvagent::change {
 
+/// Whether other hosts have an IPv6 address, which the kernel asks the link for when it is added.
+enum class Duplicate { no, beingAsked, yes };
+
 struct KernelLink {
     unsigned index = 0;
     std::string name;
     bool isUp = false;
+    bool isRunning = false;  ///< it has a carrier
 };
 
 struct KernelAddress {
@@ -22,6 +26,7 @@ struct KernelAddress {
     std::string label;         ///< of IPv4: the link's name, or an alias such as "eth0:1"
     bool isPermanent = false;  ///< no lease and no advertisement limits its life
     bool isGlobal = false;
+    Duplicate duplicate = Duplicate::no;
     unsigned protocol = 0;  ///< IFAPROT_...; 0 where the kernel tells none
     std::string message;    ///< all of it, as the kernel told it
 };
@@ -54,12 +59,15 @@ struct KernelNetwork {
     const KernelLink* link(const std::string& name) const;
     std::string nameOf(unsigned link) const;
     /// The address that a link is known by: of IPv4 the first one that is no alias's, of IPv6 the first
-    /// global one that stays. Null for none.
+    /// global one that stays and that no other host has. Null for none.
     const KernelAddress* mainAddress(unsigned link, bool isIpv6) const;
     const KernelAddress* find(unsigned link, const Ip& ip, unsigned prefix) const;
     /// The same route, whatever its flags are.
     bool has(const KernelRoute& route) const;
 };
+
+/// Of one address of a link; "no" for one that it has not. Asks for addresses alone.
+Duplicate duplicateOf(const std::string& link, const Ip& ip);
 
 /// "default via 192.0.2.1 dev eth0"
 std::string textOf(const KernelRoute& route, const KernelNetwork& network);

@@ -18,17 +18,20 @@
 
 #include "agent/change/attempt.h"
 #include "agent/change/cannot.h"
+#include "agent/change/name_keeper.h"
 #include "agent/change/name_service.h"
 #include "agent/change/namespaces.h"
 #include "agent/change/recorders.h"
 #include "agent/change/request_json.h"
 #include "agent/core/data_directory.h"
+#include "agent/core/program_path.h"
 #include "agent/core/surroundings.h"
 #include "hosttools/text.h"
 
 namespace {
 
 using cvagent::change::Cannot;
+using cvagent::change::Fence;
 using cvagent::change::must;
 using hosttools::Descriptor;
 
@@ -46,6 +49,15 @@ struct Turns {
         ask = Descriptor(asking[1]);
         granted = Descriptor(done[0]);
         grant = Descriptor(done[1]);
+    }
+    /// Each side keeps its own ends, so that it hears when the other one has gone.
+    void keepInside() {
+        asked.reset();
+        grant.reset();
+    }
+    void keepOutside() {
+        ask.reset();
+        granted.reset();
     }
     Descriptor asked, ask, granted, grant;
 };
@@ -109,24 +121,30 @@ void nameData(const std::string& directory, bool asUser) {
 }
 
 std::string tryChanges(const cvagent::change::RehearsalRequest& request, cvagent::change::Isolation isolation,
-                       const Turns& turns) {
+                       Turns& turns) {
     must(unshare(CLONE_NEWNS), "no mounts of its own");
     must(mount(nullptr, "/", nullptr, MS_REC | MS_PRIVATE, nullptr), "no mounts of its own");
     isolation.covers = cvagent::change::isolateFiles(isolation.asUser, isolation.dataDirectory);
     cvagent::change::askNoNameServer();
-    cvagent::change::enterFence([&turns] {
+    isolation.fence = cvagent::change::enterFence(isolation.asUser, [&turns] {
         if (!passTurn(turns.ask) || !takeTurn(turns.granted)) {
             throw Cannot("the users of a namespace cannot be named");
         }
     });
+    turns.ask.reset();  // it may not have been needed
     isolation.network = cvagent::change::copyNetwork();
+    if (isolation.fence == Fence::droppedRights) {  // whose right to the network is one to the host's as well
+        cvagent::change::enterNetwork(isolation.network);
+        cvagent::change::startNameKeeper();
+    }
+    cvagent::change::limitRights(isolation.fence);
     nameData(isolation.dataDirectory, isolation.asUser);
     return answerOf(cvagent::change::attempt(request, isolation));
 }
 
 /// Ends without the plug-in's own end, which has nothing to put in order here.
 int runInside(const Descriptor& socket, const cvagent::change::RehearsalRequest& request,
-              cvagent::change::Isolation isolation, const Turns& turns) {
+              cvagent::change::Isolation isolation, Turns& turns) {
     std::string answer;
     try {
         answer = tryChanges(request, std::move(isolation), turns);
@@ -151,11 +169,14 @@ void rehearse(const Descriptor& socket, const std::string& text) {
     const auto request = cvagent::change::requestFromJson(text);
     cvagent::change::Isolation isolation;
     isolation.dataDirectory = dataDirectory(request);
+    cvagent::programDirectory();  // is found now: below another root it cannot be told later
     isolation.asUser = cvagent::change::gainRightToIsolate();
     Turns turns;
-    const pid_t process = cvagent::change::startFirstProcess(
-        [&] { return runInside(socket, request, std::move(isolation), turns); });
-    turns.ask.reset();
+    const pid_t process = cvagent::change::startFirstProcess([&] {
+        turns.keepInside();
+        return runInside(socket, request, std::move(isolation), turns);
+    });
+    turns.keepOutside();
     if (takeTurn(turns.asked)) {
         cvagent::change::mapUsersOf(process);
         passTurn(turns.grant);
@@ -170,6 +191,7 @@ int main(int count, char** words) {
         return *status;
     }
     cvagent::openStandardDescriptors();
+    close_range(STDERR_FILENO + 1, ~0U, 0);  // what the caller has open is the host's
     const std::string request = readRequest(STDIN_FILENO);
     Descriptor socket;
     int status = EXIT_SUCCESS;

@@ -1,9 +1,12 @@
 #include "agent/change/namespaces.h"
 
 #include <linux/capability.h>
+#include <linux/magic.h>
 #include <sched.h>
+#include <sys/mount.h>
 #include <sys/prctl.h>
 #include <sys/syscall.h>
+#include <sys/vfs.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -14,8 +17,10 @@
 #include <fstream>
 #include <sstream>
 #include <string>
+#include <vector>
 
 #include "agent/change/cannot.h"
+#include "agent/change/mount_calls.h"
 
 namespace cvagent::change {
 
@@ -30,7 +35,7 @@ namespace {
 
 constexpr std::array kKeptRights = {CAP_CHOWN,     CAP_DAC_OVERRIDE, CAP_DAC_READ_SEARCH, CAP_FOWNER,
                                     CAP_FSETID,    CAP_KILL,         CAP_SETGID,          CAP_SETUID,
-                                    CAP_NET_ADMIN, CAP_NET_RAW,      CAP_SYS_ADMIN};
+                                    CAP_NET_ADMIN, CAP_NET_RAW};
 
 void put(const std::string& file, const std::string& text) {
     std::ofstream out(file);
@@ -68,14 +73,34 @@ void newUserNamespace() {
     }
 }
 
-void limitCapabilities() {
+/// Names of other networks, through which links could be made there.
+void hideNetworks() {
+    for (const MountPoint& mount : mountPoints()) {
+        struct statfs found {};
+        if (mount.type == "nsfs") {
+            umount2(mount.path.c_str(), MNT_DETACH);
+            const bool isSeen = statfs(mount.path.c_str(), &found) == 0 && found.f_type == NSFS_MAGIC;
+            must(isSeen ? -1 : 0, "a network of the host cannot be hidden");
+        }
+    }
+}
+
+}  // namespace
+
+void limitRights(Fence fence) {
+    std::vector<int> kept(kKeptRights.begin(), kKeptRights.end());
+    if (fence == Fence::userNamespace) {
+        kept.push_back(CAP_SYS_ADMIN);
+    } else {
+        hideNetworks();
+    }
     for (int capability = 0; prctl(PR_CAPBSET_READ, capability, 0, 0, 0) >= 0; ++capability) {
-        if (std::find(kKeptRights.begin(), kKeptRights.end(), capability) == kKeptRights.end()) {
+        if (std::ranges::find(kept, capability) == kept.end()) {
             must(prctl(PR_CAPBSET_DROP, capability, 0, 0, 0), "a right cannot be given up");
         }
     }
     std::array<__user_cap_data_struct, 2> sets{};
-    for (const int capability : kKeptRights) {
+    for (const int capability : kept) {
         auto& set = sets.at(static_cast<std::size_t>(CAP_TO_INDEX(capability)));
         set.effective |= CAP_TO_MASK(capability);
         set.permitted |= CAP_TO_MASK(capability);
@@ -84,8 +109,6 @@ void limitCapabilities() {
     must(syscall(SYS_capset, &header, sets.data()), "rights cannot be given up");
     must(prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0), "further rights cannot be refused");
 }
-
-}  // namespace
 
 bool gainRightToIsolate() {
     // Else what /proc has of this process would be root's, as after a start with other rights than the
@@ -121,17 +144,25 @@ pid_t startFirstProcess(const std::function<int()>& body) {
     must(process, "no process");
     if (process == 0) {
         prctl(PR_SET_PDEATHSIG, SIGKILL, 0, 0, 0);
+        setsid();  // a signal to its own process group would reach those who started it
         _exit(body());
     }
     return process;
 }
 
-void enterFence(const std::function<void()>& mapUsers) {
-    newUserNamespace();
-    mapUsers();
+Fence enterFence(bool asUser, const std::function<void()>& mapUsers) {
+    Fence fence = Fence::userNamespace;
+    if (asUser) {
+        newUserNamespace();
+    } else if (unshare(CLONE_NEWUSER) != 0) {
+        fence = Fence::droppedRights;
+    }
+    if (fence == Fence::userNamespace) {
+        mapUsers();
+    }
     must(unshare(CLONE_NEWUTS | CLONE_NEWIPC), "no host name of its own");
     prctl(PR_SET_PDEATHSIG, SIGKILL, 0, 0, 0);  // a change of rights forgets it
-    limitCapabilities();
+    return fence;
 }
 
 void mapUsersOf(pid_t process) {

@@ -7,6 +7,7 @@
 #include <linux/nexthop.h>
 #include <linux/rtnetlink.h>
 #include <net/if.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <array>
@@ -126,9 +127,15 @@ bool makeAlike(NetlinkSocket& socket, const Model& link) {
     return isThere(tell(socket, requestFor(link, more)));
 }
 
+/// The kernel would load a driver that it lacks, and that of dummy or ifb makes links in the host's network
+/// at once. A bridge's makes none.
+bool canBeAskedFor(const std::string& kind) {
+    return kind == "bridge" || access(("/sys/module/" + kind).c_str(), F_OK) == 0;
+}
+
 void makeSubstitute(NetlinkSocket& socket, const Model& link) {
     for (const char* kind : kSubstitutes) {
-        if (isThere(tell(socket, requestFor(link, linkInfo(kind, {}))))) {
+        if (canBeAskedFor(kind) && isThere(tell(socket, requestFor(link, linkInfo(kind, {}))))) {
             return;
         }
     }

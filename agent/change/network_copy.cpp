@@ -85,7 +85,10 @@ NetworkCopy copyNetwork() {
     copy.handle =
         Descriptor(open(("/proc/" + std::to_string(builder) + "/ns/net").c_str(), O_RDONLY | O_CLOEXEC));
     end(builder);
-    const Json json = Json::parse(told);
+    const Json json = Json::parse(told, nullptr, false);
+    if (!json.is_object()) {
+        throw Cannot("the network could not be copied");
+    }
     if (json.contains("cannot")) {
         throw Cannot(json.at("cannot").get<std::string>());
     }
@@ -93,6 +96,10 @@ NetworkCopy copyNetwork() {
     copy.missing = textsFrom(json.at("missing"));
     copy.added = textsFrom(json.at("added"));
     return copy;
+}
+
+void enterNetwork(const NetworkCopy& copy) {
+    must(setns(copy.handle.get(), CLONE_NEWNET), "the network's copy cannot be entered");
 }
 
 }  // namespace cvagent::change

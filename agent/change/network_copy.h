@@ -18,4 +18,7 @@ struct NetworkCopy {
 /// Makes one, which belongs to the user namespace of the calling process. Single-threaded. Throws Cannot.
 NetworkCopy copyNetwork();
 
+/// The calling thread, and those that it starts later, are in it from here on. Throws Cannot.
+void enterNetwork(const NetworkCopy& copy);
+
 }  // namespace cvagent::change

@@ -91,6 +91,18 @@ void checkTogether(const Plan& plan) {
     }
 }
 
+/// Whether every directory above lets everybody in; one that is not there yet does.
+bool isReachedByEverybody(const std::string& path) {
+    for (std::size_t end = path.rfind('/'); end != std::string::npos && end > 0;
+         end = path.rfind('/', end - 1)) {
+        struct stat found {};
+        if (stat(path.substr(0, end).c_str(), &found) == 0 && (found.st_mode & S_IXOTH) == 0) {
+            return false;
+        }
+    }
+    return true;
+}
+
 bool isForEverybody(const FileState& state) {
     return state.type != FileState::Type::file || (state.mode & S_IROTH) != 0;
 }
@@ -110,8 +122,11 @@ Plan planFrom(const Json& json) {
     plan.answers = listFrom<Answer>(json.at("answers"), answerFrom);
     plan.files = listFrom<FileChange>(json.at("files"), fileChangeFrom);
     plan.commands = listFrom<PlannedCommand>(json.at("commands"), commandFrom);
-    plan.kernelBefore = textsFrom(json.at("kernelBefore"));
-    plan.kernelAfter = textsFrom(json.at("kernelAfter"));
+    for (const auto& [key, state] :
+         {std::pair("kernelBefore", &plan.kernelBefore), {"kernelAfter", &plan.kernelAfter}}) {
+        *state = textsFrom(json.at(key));
+        std::ranges::sort(*state);  // whatever the other process has told
+    }
     plan.unforeseen = textsFrom(json.at("unforeseen"));
     checkTogether(plan);
     return plan;
@@ -130,7 +145,7 @@ std::string toJson(const Plan& plan) {
 
 Plan planFromJson(std::string_view json) {
     try {
-        return planFrom(Json::parse(json));
+        return planFrom(parsedParts(json));
     } catch (const nlohmann::json::exception& damaged) {
         throw BadPlan(damaged.what());
     }
@@ -138,8 +153,8 @@ Plan planFromJson(std::string_view json) {
 
 Plan withoutSecrets(Plan plan) {
     for (FileChange& file : plan.files) {
-        const bool open =
-            (!file.before || isForEverybody(*file.before)) && (!file.after || isForEverybody(*file.after));
+        const bool open = isReachedByEverybody(file.path) && (!file.before || isForEverybody(*file.before)) &&
+                          (!file.after || isForEverybody(*file.after));
         if (!open) {
             withhold(file.before);
             withhold(file.after);

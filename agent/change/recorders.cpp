@@ -10,6 +10,8 @@
 #include <sstream>
 
 #include "agent/change/cannot.h"
+#include "agent/change/name_keeper.h"
+#include "agent/core/program_path.h"
 
 namespace cvagent::change {
 
@@ -17,11 +19,12 @@ namespace {
 
 namespace fs = std::filesystem;
 
-constexpr const char* kDirectory = "/tmp/.corvista-rehearsal";
+constexpr const char* kDirectories = "/tmp/.corvista-rehearsal-";  // one of ours begins so
 constexpr std::array kNames = {"shutdown", "reboot", "halt",    "poweroff", "service",
                                "rpm",      "init",   "telinit", "hwclock",  "systemctl"};
-/// Only asks the clock, mostly.
+// Only ask, mostly.
 constexpr const char* kDate = "date";
+constexpr const char* kHostName = "hostname";
 constexpr int kCannotRun = 127;  // as a shell ends
 
 bool isName(std::string_view name) {
@@ -38,7 +41,7 @@ int runHostsOwn(const char* name, char** words) {
     const char* variable = std::getenv("PATH");
     std::istringstream directories(variable != nullptr ? variable : "");
     for (std::string directory; std::getline(directories, directory, ':');) {
-        if (directory != kDirectory && !directory.empty()) {
+        if (!directory.starts_with(kDirectories) && !directory.empty()) {
             execv((directory + "/" + name).c_str(), words);
         }
     }
@@ -47,23 +50,33 @@ int runHostsOwn(const char* name, char** words) {
 
 }  // namespace
 
-void putRecordersOnPath() {
-    const std::string program = fs::read_symlink("/proc/self/exe");
-    must(mkdir(kDirectory, S_IRWXU), "no place for what stands in for commands");
-    const auto link = [&program](const char* name) {
-        must(symlink(program.c_str(), (std::string(kDirectory) + "/" + name).c_str()),
+void putRecordersOnPath(bool withHostName) {
+    const std::string program = fs::path(programDirectory()) / fs::read_symlink("/proc/self/exe").filename();
+    must(access(program.c_str(), X_OK), "nothing can stand in for commands");
+    std::string directory = std::string(kDirectories) + "XXXXXX";
+    must(mkdtemp(directory.data()) != nullptr ? 0 : -1, "no place for what stands in for commands");
+    const auto link = [&](const char* name) {
+        must(symlink(program.c_str(), (directory + "/" + name).c_str()),
              std::string("nothing can stand in for ") + name);
     };
     std::ranges::for_each(kNames, link);
     link(kDate);
+    if (withHostName) {
+        link(kHostName);
+    }
     const char* path = std::getenv("PATH");
-    setenv("PATH", (std::string(kDirectory) + ":" + (path != nullptr ? path : "")).c_str(), 1);
+    setenv("PATH", (directory + ":" + (path != nullptr ? path : "")).c_str(), 1);
 }
 
 std::optional<int> runAsRecorder(int count, char** words) {
     const std::string name = count > 0 ? fs::path(words[0]).filename().string() : "";
     if (isName(name)) {
         return EXIT_SUCCESS;
+    }
+    if (name == kHostName) {
+        const bool sets = count == 2 && !std::string_view(words[1]).starts_with('-');
+        const bool done = sets && nameKeeperSets(words[1]);
+        return done ? EXIT_SUCCESS : sets ? EXIT_FAILURE : runHostsOwn(kHostName, words);
     }
     if (name != kDate) {
         return std::nullopt;

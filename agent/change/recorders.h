@@ -10,7 +10,8 @@ namespace cvagent::change {
 /// rehearsal: programs of ours that do nothing stand in for these.
 
 /// Puts them in front of PATH. They are links to this program below /tmp. Throws Cannot.
-void putRecordersOnPath();
+/// @param withHostName besides them one that has the host's name set (name_keeper.h)
+void putRecordersOnPath(bool withHostName);
 /// Runs as one of them when the program was called by such a name.
 /// @return the status to end with; nothing when the name is none of theirs
 std::optional<int> runAsRecorder(int count, char** words);

@@ -9,7 +9,7 @@ namespace {
 template <class Read>
 auto parsed(std::string_view text, const Read& read) {
     try {
-        return read(Json::parse(text));
+        return read(parsedParts(text));
     } catch (const nlohmann::json::exception& damaged) {
         throw BadPlan(damaged.what());
     }

@@ -8,6 +8,7 @@
 
 #include "agent/change/interface_settings.h"
 #include "agent/change/ip.h"
+#include "agent/change/kernel_network.h"
 #include "agent/core/catalogue.h"
 #include "agent/core/node_copy.h"
 #include "framework/qx/date_time.h"
@@ -61,6 +62,12 @@ bool isKeptElsewhere(const Property& row, const IC::PropertyValue& value, const 
     std::error_code unknown;
     return isAmong(row, kNames) && isSameText(value, read) &&
            !std::filesystem::exists("/etc/HOSTNAME", unknown);
+}
+
+bool isDuplicate(const IC::MutableNode& node, const Property& row, const IC::PropertyValue& value) {
+    constexpr unsigned int kAskedFor[] = {27};
+    const auto ip = isAmong(row, kAskedFor) ? Ip::parse(static_cast<std::string>(value)) : std::nullopt;
+    return ip && duplicateOf(interfaceNameOf(node), *ip) == Duplicate::yes;
 }
 
 bool isSameTime(const IC::PropertyValue& value, const IC::PropertyValue& read) {
@@ -124,6 +131,9 @@ Standing standingOf(const IC::MutableNode& node, const Property& row, const IC::
         if (!lacking.empty() && !isKeptElsewhere(row, value, reading.value)) {
             return {WriteResult::differs, lacking};
         }
+    }
+    if (isDuplicate(node, row, value)) {
+        return {WriteResult::differs, "another host has it, so this one does not use it"};
     }
     const bool isRead = effect == nullptr || isAmong(row, kInFileOnly);
     if (isRead && !isSameText(value, reading.value)) {

@@ -46,6 +46,15 @@ void addNames(const Plan& plan, Sentences& sentences) {
     }
 }
 
+void addUntold(const Plan& plan, Sentences& sentences) {
+    for (const FileChange& file : plan.files) {
+        if ((file.before && file.before->withheld) || (file.after && file.after->withheld)) {
+            sentences.push_back("What changes within " + printable(file.path) +
+                                ": it is longer than 1 MiB, or cannot be read.");
+        }
+    }
+}
+
 void addLines(const std::vector<std::string>& lines, const std::string& start, Sentences& sentences) {
     for (std::size_t at = 0; at < std::min(lines.size(), kMostLines); ++at) {
         sentences.push_back(start + lines[at]);
@@ -62,6 +71,7 @@ std::vector<std::string> unforeseen(const Plan& plan, const Isolation& isolation
     addRecorded(plan, sentences);
     addDhcp(plan, sentences);
     addNames(plan, sentences);
+    addUntold(plan, sentences);
     if (plan.changes.size() > 1) {
         sentences.emplace_back(
             "Each change but the first was tried on what those before it left here, which the host may "
@@ -69,6 +79,12 @@ std::vector<std::string> unforeseen(const Plan& plan, const Isolation& isolation
     }
     addLines(isolation.network.missing, "Tried without what the network has: ", sentences);
     addLines(isolation.network.added, "Tried with what the network has not: ", sentences);
+    if (isolation.fence == Fence::droppedRights) {
+        sentences.emplace_back(
+            "What the plug-in asks the network's drivers at its start: as the host allows no user namespace, "
+            "it "
+            "was in the copy from the beginning.");
+    }
     if (isolation.asUser) {
         sentences.emplace_back(
             "Tried as a user on copies of the files that he may read; on the host it takes root.");

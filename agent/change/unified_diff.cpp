@@ -81,10 +81,23 @@ std::vector<Edit> editsOf(const Lines& before, const Lines& after) {
     return edits;
 }
 
+/// Tabs, of which settings files are full, stay what they are, so that the difference can be applied.
+std::string withTabs(std::string_view line) {
+    std::string text;
+    for (;;) {
+        const std::size_t tab = std::min(line.find('\t'), line.size());
+        text += printable(std::string(line.substr(0, tab)));
+        if (tab == line.size()) {
+            return text;
+        }
+        text += '\t';
+        line.remove_prefix(tab + 1);
+    }
+}
+
 std::string shown(const Edit& edit) {
     const bool isWhole = edit.line.ends_with('\n');
-    std::string text =
-        edit.sign + printable(std::string(edit.line.substr(0, edit.line.size() - (isWhole ? 1 : 0))));
+    const std::string text = edit.sign + withTabs(edit.line.substr(0, edit.line.size() - (isWhole ? 1 : 0)));
     return text + (isWhole ? "\n" : "\n\\ No newline at end of file\n");
 }
 

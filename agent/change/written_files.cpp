@@ -44,13 +44,20 @@ FileState::Type typeOf(mode_t mode) {
                            : FileState::Type::other;
 }
 
+/// A copy keeps the time, a write does not.
+std::string stampOf(const struct stat& found) {
+    return std::to_string(found.st_size) + " " + std::to_string(found.st_mtim.tv_sec) + " " +
+           std::to_string(found.st_mtim.tv_nsec);
+}
+
 /// @param name "" for what the descriptor itself stands for
-std::optional<FileState> stateOf(int directory, const std::string& name) {
+std::optional<SeenFile> stateOf(int directory, const std::string& name) {
     struct stat found {};
     if (fstatat(directory, name.c_str(), &found, AT_SYMLINK_NOFOLLOW | AT_EMPTY_PATH) != 0) {
         return std::nullopt;
     }
-    FileState state;
+    SeenFile seen;
+    FileState& state = seen.state;
     state.type = typeOf(found.st_mode);
     state.mode = found.st_mode & kModeBits;
     state.owner = found.st_uid;
@@ -65,8 +72,9 @@ std::optional<FileState> stateOf(int directory, const std::string& name) {
     }
     if (state.withheld) {
         state.content.clear();
+        seen.stamp = stampOf(found);
     }
-    return state;
+    return seen;
 }
 
 bool isDirectory(int directory, const std::string& name) {
@@ -85,7 +93,7 @@ Descriptor below(int directory, const std::string& name) {
     return Descriptor(openat(directory, name.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
 }
 
-std::optional<FileState> present(int directory, const std::string& name) {
+std::optional<SeenFile> present(int directory, const std::string& name) {
     return directory < 0 ? std::nullopt : stateOf(directory, name);
 }
 
@@ -129,12 +137,12 @@ public:
         }
     }
 
-    void note(const std::string& path, std::optional<FileState> now, std::optional<FileState> was) {
+    void note(const std::string& path, std::optional<SeenFile> now, const std::optional<SeenFile>& was) {
         if (now && was && owners_ == Owners::differ) {
-            now->owner = was->owner;
-            now->group = was->group;
+            now->state.owner = was->state.owner;
+            now->state.group = was->state.group;
         }
-        if (now != was || (now && now->withheld)) {
+        if (now != was) {
             found_[path] = std::move(now);
         }
     }
@@ -155,7 +163,7 @@ private:
             return false;
         }
         const auto was = present(original, name);
-        return !was || was->type == FileState::Type::other || was->withheld;
+        return !was || was->state.type == FileState::Type::other || was->state.withheld;
     }
 
     void noteDirectory(bool existed, int ours, const std::string& name, const std::string& path) {
@@ -192,7 +200,7 @@ void look(const Cover& cover, WrittenFiles& all) {
 }
 
 /// What the host itself has there. The innermost place is the one that is seen.
-std::optional<FileState> originally(const std::string& path, const std::vector<Cover>& covers) {
+std::optional<SeenFile> originally(const std::string& path, const std::vector<Cover>& covers) {
     const Cover* innermost = nullptr;
     for (const Cover& cover : covers) {
         if (isBelow(path, cover.path) &&
@@ -205,6 +213,10 @@ std::optional<FileState> originally(const std::string& path, const std::vector<C
     }
     const std::string rest = path.substr(std::min(path.size(), innermost->path.size() + 1));
     return stateOf(innermost->original.get(), rest);
+}
+
+std::optional<FileState> stateIn(const std::optional<SeenFile>& seen) {
+    return seen ? std::optional(seen->state) : std::nullopt;
 }
 
 }  // namespace
@@ -232,9 +244,10 @@ std::vector<FileChange> changesBetween(const WrittenFiles& before, const Written
             const auto found = side.find(path);
             return found == side.end() ? originally(path, covers) : found->second;
         };
-        FileChange change{path, at(before), at(after)};
-        if (!isOwn && change.before != change.after) {
-            changes.push_back(std::move(change));
+        const std::optional<SeenFile> was = at(before);
+        const std::optional<SeenFile> now = at(after);
+        if (!isOwn && was != now) {
+            changes.push_back({path, stateIn(was), stateIn(now)});
         }
     }
     return changes;

@@ -9,8 +9,15 @@
 
 namespace cvagent::change {
 
+struct SeenFile {
+    FileState state;
+    std::string stamp;  ///< of a content that is not told: another one when that is another
+
+    bool operator==(const SeenFile&) const = default;
+};
+
 /// What covered places have that the host has not, by path; nothing stands for what is gone there.
-using WrittenFiles = std::map<std::string, std::optional<FileState>>;
+using WrittenFiles = std::map<std::string, std::optional<SeenFile>>;
 
 /// What was written so far into the covered places.
 WrittenFiles writtenFiles(const std::vector<Cover>& covers);

@@ -86,7 +86,7 @@ bool holdsFiles(const std::string& directory) {
 std::string existing(const std::string& path) {
     fs::path place = path;
     std::error_code error;
-    while (!fs::is_directory(place, error)) {
+    while (!fs::is_directory(place, error) && place.has_relative_path()) {
         place = place.parent_path();
     }
     const fs::path plain = fs::canonical(place, error);

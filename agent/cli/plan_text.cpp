@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <array>
 
+#include "agent/change/kernel_state.h"
 #include "agent/change/unified_diff.h"
 
 namespace cvagent {
@@ -80,11 +81,11 @@ std::string coloured(const std::string& diff, const Style& style) {
 
 std::string fileText(const FileChange& file, const Style& style) {
     const std::string name = printable(file.path);
-    std::string text =
-        "--- " + (file.before ? name : "/dev/null") + "\n+++ " + (file.after ? name : "/dev/null") + "\n";
+    std::string text;
     if (kindOf(file.before) != kindOf(file.after)) {
-        text += "    " + kindOf(file.before) + " becomes " + kindOf(file.after) + "\n";
+        text = "    " + kindOf(file.before) + " becomes " + kindOf(file.after) + "\n";
     }
+    text += "--- " + (file.before ? name : "/dev/null") + "\n+++ " + (file.after ? name : "/dev/null") + "\n";
     const bool isWithheld = (file.before && file.before->withheld) || (file.after && file.after->withheld);
     return text + (isWithheld
                        ? "    its content is not told\n"
@@ -104,15 +105,12 @@ std::string commandsText(const std::vector<change::PlannedCommand>& commands) {
 /// Those lines that come and go, and where none does, that.
 std::string kernelText(const change::Plan& plan, const Style& style) {
     std::string text;
-    const auto addMissing = [&text](const auto& from, const auto& in, const auto& shown) {
-        for (const std::string& line : from) {
-            text += std::ranges::find(in, line) == in.end() ? shown(line) + "\n" : "";
-        }
-    };
-    addMissing(plan.kernelBefore, plan.kernelAfter,
-               [&style](const std::string& line) { return style.bad("- " + printable(line)); });
-    addMissing(plan.kernelAfter, plan.kernelBefore,
-               [&style](const std::string& line) { return style.good("+ " + printable(line)); });
+    for (const std::string& line : change::missingFrom(plan.kernelAfter, plan.kernelBefore)) {
+        text += style.bad("- " + printable(line)) + "\n";
+    }
+    for (const std::string& line : change::missingFrom(plan.kernelBefore, plan.kernelAfter)) {
+        text += style.good("+ " + printable(line)) + "\n";
+    }
     return text.empty() ? "  as before\n" : text;
 }
 

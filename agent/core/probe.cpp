@@ -74,7 +74,7 @@ bool Probe::finish(std::chrono::milliseconds longest) {
     using Clock = std::chrono::steady_clock;
     const auto end = Clock::now() + longest;
     std::array<char, 4096> part{};
-    while (process_ > 0 && output_.size() < kMostOutput) {
+    while (process_ > 0) {
         const auto left = std::chrono::duration_cast<std::chrono::milliseconds>(end - Clock::now()).count();
         pollfd ready{pipe_, POLLIN, 0};
         const int result = poll(&ready, 1, static_cast<int>(std::max<long long>(0, left)));
@@ -88,7 +88,9 @@ bool Probe::finish(std::chrono::milliseconds longest) {
             }
             break;
         }
-        output_.append(part.data(), static_cast<std::size_t>(size));
+        if (output_.size() < kMostOutput) {  // the rest is read, too, or the program would wait for ever
+            output_.append(part.data(), static_cast<std::size_t>(size));
+        }
     }
     return process_ > 0 && collect() == 0;
 }

@@ -171,6 +171,14 @@ HOST_TEST(Probe, KillsAProgramThatTakesTooLong) {
     EXPECT_FALSE(probe.finish(std::chrono::milliseconds(100)));
 }
 
+/// A router's table has tens of thousands of lines.
+HOST_TEST(Probe, ReadsToTheEndWhatIsTooLongToBeKept) {
+    cvagent::Probe probe({"/usr/bin/head", "-c", "2000000", "/dev/zero"});
+    EXPECT_TRUE(probe.finish(std::chrono::seconds(60)));
+    EXPECT_GE(probe.output().size(), 1U << 20U);
+    EXPECT_LT(probe.output().size(), 1100000U);
+}
+
 HOST_TEST(Probe, KillsAProgramThatNobodyWaitsFor) {
     const auto start = std::chrono::steady_clock::now();
     { const cvagent::Probe probe({"/usr/bin/sleep", "60"}); }

@@ -2,7 +2,9 @@
 #include "agent/change/checks.h"
 
 #include <gmock/gmock.h>
+#include <sys/timex.h>
 
+#include "agent/change/clock_source.h"
 #include "agent/change/order.h"
 
 namespace {
@@ -143,6 +145,15 @@ TEST(Checks, KeepTheClockFromWhoSteersIt) {
     facts.clockSteeredBy = "chronyd";
     EXPECT_THAT(objections(clock, facts), ElementsAre(HasSubstr("chronyd keeps the clock in step")));
     EXPECT_THAT(objections({ofLink(kClock, "x")}, facts), IsEmpty()) << "that is no computer's";
+}
+
+TEST(ClockSource, IsAProgramAtWorkOrWhatTheKernelTells) {
+    using cvagent::change::clockSteeredBy;
+    EXPECT_EQ(clockSteeredBy({{1, "init"}, {2, "chronyd"}}, STA_UNSYNC), "chronyd");
+    EXPECT_EQ(clockSteeredBy({{1, "init"}, {2, "chronyd2"}}, STA_UNSYNC), "");
+    EXPECT_EQ(clockSteeredBy({}, STA_PLL), "something");
+    EXPECT_EQ(clockSteeredBy({}, STA_PLL | STA_UNSYNC), "");
+    EXPECT_EQ(clockSteeredBy({}, std::nullopt), "") << "the kernel tells nothing";
 }
 
 TEST(Order, LetsEachChangeFindWhatItNeeds) {

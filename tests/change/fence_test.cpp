@@ -1,6 +1,8 @@
 // Whatever the code does that makes a change beforehand, nothing of the host is reached.
+#include <fcntl.h>
 #include <gmock/gmock.h>
 #include <linux/capability.h>
+#include <sys/mount.h>
 #include <sys/prctl.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
@@ -43,7 +45,10 @@ void giveUpClockAndPower() {
     }
 }
 
-HOST_TEST(Fence, HoldsAgainstCodeThatReachesForTheHost) {
+volatile std::sig_atomic_t isSignalled = 0;
+
+/// @return the plan of what the plug-in did to its own
+Plan reachForTheHost(FakeHost& host) {
     giveUpClockAndPower();
     host.useKernelNetwork();
     host.realTool("ip");
@@ -52,33 +57,58 @@ HOST_TEST(Fence, HoldsAgainstCodeThatReachesForTheHost) {
     host.file("/etc/hosts", "127.0.0.1 localhost\n");
     host.file("/var/precious", "kept");
     host.directory("/run/dbus");
-    ASSERT_EQ(mkfifo("/run/initctl", 0600), 0);
-    const int daemon = listening("/run/dbus/system_bus_socket");
+    EXPECT_EQ(mkfifo("/run/initctl", 0600), 0);
+    host.file("/var/network of the host", "");
+    EXPECT_EQ(mount("/.proc/self/ns/net", "/var/network of the host", nullptr, MS_BIND, nullptr), 0);
+    host.directory("/var/a daemon");
+    const std::vector<int> daemons{listening("/run/dbus/system_bus_socket"),
+                                   listening("/var/a daemon/its socket")};
+    // As a caller has a file open that he hands down without a thought, and belongs to a group of processes.
+    const int precious = open("/var/precious", O_WRONLY);
+    std::signal(SIGURG, [](int) { isSignalled = 1; });
     moveRecords(host);
     const auto files = writtenPart(host);
     const auto kernel = cvagent::change::readKernelState();
 
-    const Plan plan = rehearsed({reaching("now")}, REACHING_PLUGIN_FILE);
+    Plan plan = rehearsed({reaching("now")}, REACHING_PLUGIN_FILE);
 
-    ASSERT_EQ(plan.answers.size(), 1U);
-    EXPECT_THAT(plan.answers[0].problem, HasSubstr("reached: ."));
-    EXPECT_EQ(accept(daemon, nullptr, nullptr), -1);
-    EXPECT_EQ(errno, EAGAIN);
-    close(daemon);
+    EXPECT_THAT(plan.answers.at(0).problem, HasSubstr("reached: ."));
+    for (const int daemon : daemons) {
+        EXPECT_EQ(accept(daemon, nullptr, nullptr), -1);
+        EXPECT_EQ(errno, EAGAIN);
+        close(daemon);
+    }
+    close(precious);
+    EXPECT_EQ(isSignalled, 0) << "the whole process group of the caller";
     EXPECT_EQ(writtenPart(host), files);
     EXPECT_EQ(cvagent::change::readKernelState(), kernel);
     EXPECT_EQ(host.read("/var/precious"), "kept");
     EXPECT_FALSE(host.exists("/usr/reached") || host.exists("/reached"));
     EXPECT_TRUE(host.clockCalls().empty());
-    // What it did to its own is in the plan.
-    EXPECT_THAT(plan.kernelAfter, Contains("host name reached"));
     EXPECT_THAT(plan.kernelAfter, Contains(HasSubstr("link veth0 mtu 1500 down")));
     EXPECT_THAT(kernel, Contains(HasSubstr("link veth0 mtu 1500 up")));
+    umount2("/var/network of the host", MNT_DETACH);
+    return plan;
+}
+
+HOST_TEST(Fence, HoldsAgainstCodeThatReachesForTheHost) {
+    const Plan plan = reachForTheHost(host);
+    EXPECT_THAT(plan.kernelAfter, Contains("host name reached"));
     ASSERT_EQ(plan.files.size(), 2U);
     EXPECT_EQ(plan.files[0].path, "/etc/hosts");
     EXPECT_EQ(plan.files[0].after, std::nullopt);
     EXPECT_EQ(plan.files[1].path, "/etc/reached");
     EXPECT_EQ(plan.files[1].before, std::nullopt);
+}
+
+/// Where root gets no user namespace, the rights that it gives up have to do.
+HOST_TEST(Fence, HoldsWithoutAUserNamespace) {
+    host.directory("/jail");
+    ASSERT_EQ(mount("/", "/jail", nullptr, MS_BIND | MS_REC, nullptr), 0);
+    ASSERT_EQ(chroot("/jail"), 0);
+    const Plan plan = reachForTheHost(host);
+    EXPECT_THAT(plan.unforeseen, Contains(HasSubstr("no user namespace")));
+    EXPECT_EQ(plan.files.size(), 2U);
 }
 
 /// All processes of the host, with their names.

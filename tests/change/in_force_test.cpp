@@ -3,6 +3,7 @@
 
 #include <gmock/gmock.h>
 
+#include "agent/change/standing.h"
 #include "tests/support/fake_host.h"
 
 namespace {
@@ -31,6 +32,7 @@ protected:
         for (const char* link : {"eth0", "sw0", "eth1", "sw1"}) {
             ip(host, std::string("link set ") + link + " up");
         }
+        host.run({"sh", "-c", "echo 0 > /proc/sys/net/ipv6/conf/eth0/dad_transmits"});
         hardware_ = host.run({"cat", "/sys/class/net/eth0/address"}).out;
         hardware_.pop_back();
     }
@@ -52,6 +54,15 @@ protected:
         const auto after = cvagent::change::bringingIntoForce()(node, *row, IC::PropertyValue(value, true));
         deed();
         return after ? after() : EffectInForce{"nothing was to be done", {}};
+    }
+    /// Whether another host has an IPv6 address is asked at once, not within a second.
+    static void askTheLink(FakeHost& host) {
+        ASSERT_EQ(host.run({"sh", "-c",
+                            "cd /proc/sys/net/ipv6/conf/eth0; echo 1 > dad_transmits; echo 0 > "
+                            "router_solicitation_delay; echo 200 > "
+                            "/proc/sys/net/ipv6/neigh/eth0/retrans_time_ms"})
+                      .status,
+                  0);
     }
     /// The addresses of eth0, in the kernel's order.
     static std::vector<std::string> addresses(FakeHost& host, const std::string& family = "-4") {
@@ -183,6 +194,29 @@ HOST_TEST_F(InForce, AnIpv6AddressComesAndTheOldOneGoes) {
     write(kPrefixLength, "48", [&] { file(host, "IPADDR_1=2001:db8::9\nPREFIXLEN_1=48\n"); });
     EXPECT_THAT(addresses(host, "-6"), testing::Contains("2001:db8::9/48"));
     EXPECT_THAT(addresses(host, "-6"), testing::SizeIs(2));
+}
+
+/// The host at the other end of the cable has it.
+HOST_TEST_F(InForce, AnIpv6AddressOfAnotherHostIsToldAndTheOldOneStays) {
+    const auto write9 = [&](const std::string& address) {
+        return write(kIpv6Address, address,
+                     [&] { file(host, "IPADDR_1=" + address + "\nPREFIXLEN_1=64\n"); });
+    };
+    askTheLink(host);
+    ip(host, "-6 address add 2001:db8::1/64 dev eth0 nodad");
+    ip(host, "-6 address add 2001:db8::9/64 dev sw0 nodad");
+    EXPECT_THAT(write9("2001:db8::9").lacking, HasSubstr("another host has 2001:db8::9"));
+    EXPECT_THAT(addresses(host, "-6"), testing::UnorderedElementsAre("2001:db8::1/64", "2001:db8::9/64"));
+    IC::MutableNode node(7, 1, {}, static_cast<unsigned int>(NodeType::ipConfig), 1);
+    node.setPath("/oshw/network-port:eth0/ip-config:eth0");
+    cvagent::Reading reading;
+    reading.row = findProperty(static_cast<unsigned int>(NodeType::ipConfig), kIpv6Address);
+    reading.value = IC::PropertyValue("2001:db8::9", true);
+    EXPECT_EQ(cvagent::change::standingOf(node, *reading.row, reading.value, reading).reason,
+              "another host has it, so this one does not use it");
+    // The next one takes the place of both.
+    EXPECT_EQ(write9("2001:db8::7").lacking, "");
+    EXPECT_THAT(addresses(host, "-6"), ElementsAre("2001:db8::7/64"));
 }
 
 HOST_TEST_F(InForce, AGatewayTakesThePlaceOfTheOneWithItsMetric) {

@@ -2,6 +2,10 @@
 #include "agent/change/plan.h"
 
 #include <gmock/gmock.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cstdlib>
 
 #include "agent/change/base64.h"
 
@@ -44,6 +48,12 @@ TEST(Plan, ComesBackAsItWent) {
     EXPECT_EQ(back.unforeseen, plan.unforeseen);
 }
 
+TEST(Plan, HasItsKernelStateInOrderWhateverWasTold) {
+    Plan plan = wholePlan();
+    plan.kernelAfter = {"route default", "link lo"};
+    EXPECT_THAT(planFromJson(toJson(plan)).kernelAfter, testing::ElementsAre("link lo", "route default"));
+}
+
 TEST(Plan, IsNotReadFromWhatIsNone) {
     const std::string whole = toJson(wholePlan());
     EXPECT_NO_THROW(planFromJson(whole));
@@ -57,6 +67,8 @@ TEST(Plan, IsNotReadFromWhatIsNone) {
         return text;
     };
     EXPECT_THROW(planFromJson(with("\"link\"", "\"door\"")), BadPlan);
+    const std::string nested = std::string(1'000'000, '[') + std::string(1'000'000, ']');
+    EXPECT_THAT([&] { planFromJson(nested); }, testing::ThrowsMessage<BadPlan>(testing::HasSubstr("levels")));
     EXPECT_THROW(planFromJson(with("\"change\": 1", "\"change\": 2")), BadPlan);
     EXPECT_THROW(planFromJson(with("\"change\": 1", "\"change\": \"x\"")), BadPlan);
     EXPECT_THROW(planFromJson(with("\"base64\": \"", "\"base64\": \"*")), BadPlan);
@@ -75,6 +87,19 @@ TEST(Plan, ShowsEverybodyNothingThatNotEverybodyMayRead) {
     EXPECT_TRUE(shown.files[1].before->withheld);
     EXPECT_TRUE(shown.files[1].after->withheld);
     EXPECT_EQ(shown.files[2].after->content, "");
+}
+
+/// The file's own mode means nothing where nobody gets to it.
+TEST(Plan, ShowsEverybodyNothingBelowAClosedDirectory) {
+    std::string place = testing::TempDir() + "/planXXXXXX";
+    ASSERT_NE(mkdtemp(place.data()), nullptr);
+    Plan plan;
+    const FileState open{FileState::Type::file, "secret", 0644, 0, 0, false};
+    plan.files = {{place + "/below/file", open, open}};
+    EXPECT_EQ(toJson(withoutSecrets(plan)).find("secret"), std::string::npos);
+    chmod(place.c_str(), 0755);
+    EXPECT_NE(toJson(withoutSecrets(plan)).find("secret"), std::string::npos);
+    rmdir(place.c_str());
 }
 
 TEST(Base64, IsThatOfEverybody) {

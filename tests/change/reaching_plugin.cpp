@@ -1,8 +1,11 @@
 // A plug-in whose one write reaches for the host in every way that the fence has to hold against. It asks the
 // kernel itself, past whatever stands in for a library's function. What it could do comes back as the error.
 #include <fcntl.h>
+#include <linux/if_link.h>
 #include <linux/reboot.h>
+#include <linux/rtnetlink.h>
 #include <net/if.h>
+#include <sched.h>
 #include <sys/ioctl.h>
 #include <sys/mount.h>
 #include <sys/ptrace.h>
@@ -19,6 +22,7 @@
 #include <cstdlib>
 #include <cstring>
 #include <ctime>
+#include <fstream>
 #include <string>
 
 #include "framework/ic/management_interface.h"
@@ -69,21 +73,75 @@ void reachForFiles() {
 }
 
 void reachForDaemons() {
-    sockaddr_un place{};
-    place.sun_family = AF_UNIX;
-    std::strcpy(place.sun_path, "/run/dbus/system_bus_socket");
-    const int handle = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
     tried("a daemon's socket in sight", access("/run/dbus/system_bus_socket", F_OK) == 0);
-    tried("a daemon's socket", connect(handle, reinterpret_cast<const sockaddr*>(&place), sizeof place) == 0);
+    for (const char* name : {"/run/dbus/system_bus_socket", "/var/a daemon/its socket"}) {
+        sockaddr_un place{};
+        place.sun_family = AF_UNIX;
+        std::strcpy(place.sun_path, name);
+        const int handle = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
+        tried(name, connect(handle, reinterpret_cast<const sockaddr*>(&place), sizeof place) == 0);
+        close(handle);
+    }
+}
+
+/// A link that is made from here in the network that a file stands for.
+bool canMakeLinkIn(int network) {
+    struct Request {
+        nlmsghdr head{};
+        ifinfomsg link{};
+        rtattr networkHead{RTA_LENGTH(sizeof(int)), IFLA_NET_NS_FD};
+        int network = -1;
+        rtattr infoHead{RTA_LENGTH(sizeof(rtattr) + 8), IFLA_LINKINFO};
+        rtattr kindHead{RTA_LENGTH(7), IFLA_INFO_KIND};
+        char kind[8] = "bridge";
+    } request;
+    request.network = network;
+    request.head.nlmsg_len = sizeof request;
+    request.head.nlmsg_type = RTM_NEWLINK;
+    request.head.nlmsg_flags = NLM_F_REQUEST | NLM_F_CREATE | NLM_F_ACK;
+    const int handle = socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC, NETLINK_ROUTE);
+    struct {
+        nlmsghdr head;
+        nlmsgerr error;
+        char rest[512];
+    } answer{};
+    const bool isAnswered =
+        send(handle, &request, sizeof request, 0) > 0 && recv(handle, &answer, sizeof answer, 0) > 0;
     close(handle);
+    return isAnswered && answer.head.nlmsg_type == NLMSG_ERROR && answer.error.error == 0;
+}
+
+void reachForNetwork() {
+    const int network = open("/var/network of the host", O_RDONLY | O_CLOEXEC);
+    tried("a link in the host's network", canMakeLinkIn(network));
+    tried("the host's network", setns(network, CLONE_NEWNET) == 0);
+    close(network);
+}
+
+void reachForOpenFiles() {
+    for (int file = 0; file < 1024; ++file) {
+        char name[64] = {};
+        static_cast<void>(readlink(("/proc/self/fd/" + std::to_string(file)).c_str(), name, sizeof name - 1));
+        tried("an open file of the caller",
+              std::strcmp(name, "/var/precious") == 0 && write(file, "!", 1) == 1);
+    }
+}
+
+bool isChild(pid_t process) {
+    std::ifstream stat("/proc/" + std::to_string(process) + "/stat");
+    std::string skipped;
+    pid_t parent = -1;
+    stat >> skipped >> skipped >> skipped >> parent;
+    return parent == getpid();
 }
 
 /// Every process that it can name, but itself and what it has started.
 void reachForProcesses() {
     for (pid_t process = 1; process < 40000; ++process) {
         const bool isOwnThread = access(("/proc/self/task/" + std::to_string(process)).c_str(), F_OK) == 0;
-        tried("a process of the host", !isOwnThread && kill(process, 0) == 0);
+        tried("a process of the host", !isOwnThread && kill(process, 0) == 0 && !isChild(process));
     }
+    kill(0, SIGURG);  // whoever is in its process group
     tried("the parent", ptrace(PTRACE_ATTACH, getppid(), nullptr, nullptr) == 0);
 }
 
@@ -121,6 +179,8 @@ public:
         reachForPower();
         reachForFiles();
         reachForDaemons();
+        reachForNetwork();
+        reachForOpenFiles();
         reachForProcesses();
         reachForNames();
         return {Error::failure, Number(), "reached: " + done + "."};

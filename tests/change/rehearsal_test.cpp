@@ -10,6 +10,7 @@
 #include <syscall.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <filesystem>
 #include <fstream>
 
@@ -20,8 +21,9 @@
 namespace {
 
 using cvagent::change::Change;
-using cvagent::change::FileState;
+using cvagent::change::FileChange;
 using cvagent::change::Plan;
+using cvagent::change::PlannedCommand;
 using testing::HasSubstr;
 
 constexpr const char* kConfig = "ip-config:eth0";
@@ -66,6 +68,20 @@ HOST_TEST(Rehearsal, FollowsALinkOutOfAllThatIsWrittenElse) {
     EXPECT_EQ(host.read("/var/elsewhere/resolv.conf"), "nameserver 127.0.0.53\n");
 }
 
+HOST_TEST(Rehearsal, SaysOfWhichFileItTellsNoContent) {
+    addLink(host);
+    std::string content = "nameserver 127.0.0.53\n";
+    while (content.size() <= 1U << 20U) {
+        content += "# a long comment, as nobody writes it\n";
+    }
+    host.file("/etc/resolv.conf", content);
+    const Plan plan = rehearsed(kNameServer);
+    EXPECT_THAT(
+        plan.unforeseen,
+        testing::Contains("What changes within /etc/resolv.conf: it is longer than 1 MiB, or cannot be "
+                          "read."));
+}
+
 HOST_TEST(Rehearsal, TakesAFileThatIsMountedForWhatItIs) {
     addLink(host);
     host.file("/var/containers/resolv.conf", "nameserver 127.0.0.11\n");
@@ -105,6 +121,22 @@ HOST_TEST(Rehearsal, IsNotHeldByPipesLinksInCirclesAndManyMounts) {
     for (int at = 0; at < 200; ++at) {
         umount2(("/etc/mounts/" + std::to_string(at)).c_str(), MNT_DETACH);
     }
+}
+
+/// A list of hosts that are to be blocked has megabytes.
+HOST_TEST(Rehearsal, TellsThatAFileChangesThatIsTooLongToBeTold) {
+    addLink(host);
+    std::string servers;
+    while (servers.size() <= 1U << 20U) {
+        servers += "# nothing but a long file\n";
+    }
+    host.file("/etc/resolv.conf", servers + "nameserver 192.0.2.53\n");
+    host.file("/etc/long", servers);
+    const Plan plan = rehearsed(kNameServer);
+    const auto file = std::ranges::find(plan.files, "/etc/resolv.conf", &FileChange::path);
+    ASSERT_NE(file, plan.files.end());
+    EXPECT_TRUE(file->before->withheld && file->after->withheld);
+    EXPECT_EQ(after(plan, "/etc/long"), "(unchanged)");
 }
 
 HOST_TEST(Rehearsal, TakesWhatAnAgentAtWorkHolds) {
@@ -178,15 +210,48 @@ HOST_TEST(Rehearsal, TriesAsAUserOnCopies) {
     EXPECT_EQ(writtenPart(host), files);
 }
 
-HOST_TEST(Rehearsal, SaysWhyThereIsNoUserNamespace) {
+HOST_TEST(Rehearsal, TriesAsAUserWhoseDataLieInTmp) {
     addLink(host);
+    host.directory("/tmp/of a user", 0700);
+    setenv("CORVISTA_DATA_DIR", "/tmp/of a user", 1);
+    showWholeProc();
+    giveUpRights();
+    const cvagent::DataDirectory held;
+    const auto files = host.listDirectory("/tmp/of a user");
+    EXPECT_EQ(whyNotRehearsed(kNameServer), "");
+    EXPECT_EQ(host.listDirectory("/tmp/of a user"), files);
+}
+
+/// The kernel gives no user namespace there.
+void enterJail(FakeHost& host) {
     host.directory("/jail");
     ASSERT_EQ(mount("/", "/jail", nullptr, MS_BIND | MS_REC, nullptr), 0);
-    ASSERT_EQ(chroot("/jail"), 0);  // where the kernel gives none
+    ASSERT_EQ(chroot("/jail"), 0);
+}
+
+HOST_TEST(Rehearsal, SaysWhyThereIsNoUserNamespace) {
+    addLink(host);
+    enterJail(host);
+    giveUpRights();
     const auto files = writtenPart(host);
     EXPECT_THAT(whyNotRehearsed(kNameServer),
                 HasSubstr("the host allows no user namespace here: Operation not permitted"));
     EXPECT_EQ(writtenPart(host), files);
+}
+
+/// The copy's host name is set although nothing there may set one.
+HOST_TEST(Rehearsal, SetsTheHostsNameWithoutAUserNamespace) {
+    addLink(host);
+    host.realTool("hostname");
+    host.file("/etc/hosts", "127.0.0.1\tlocalhost\n");
+    enterJail(host);
+    const Plan plan = rehearsed({{kConfig, 97, {"earth"}}, {kConfig, 98, {"example.org"}}});
+    EXPECT_EQ(plan.answers[1].failure(), "");
+    EXPECT_THAT(plan.kernelAfter, testing::Contains("host name earth.example.org"));
+    EXPECT_THAT(after(plan, "/etc/hosts"), HasSubstr("earth.example.org\tearth"));
+    const auto set = std::ranges::find(plan.commands, "hostname earth", &PlannedCommand::text);
+    ASSERT_NE(set, plan.commands.end());
+    EXPECT_FALSE(set->recorded);
 }
 
 HOST_TEST(Rehearsal, SaysThatUserNamespacesAreSwitchedOff) {
@@ -198,6 +263,8 @@ HOST_TEST(Rehearsal, SaysThatUserNamespacesAreSwitchedOff) {
         GTEST_SKIP() << "the limit would be the machine's";
     }
     std::ofstream("/.proc/sys/user/max_user_namespaces") << "0" << std::flush;
+    EXPECT_EQ(whyNotRehearsed(kNameServer), "") << "root can do without";
+    giveUpRights();
     EXPECT_THAT(whyNotRehearsed(kNameServer), HasSubstr("user.max_user_namespaces"));
 }
 
@@ -221,13 +288,15 @@ TEST(NameService, AsksFilesAlone) {
 }
 
 /// A program in place of the rehearsal's.
-std::string whyNotWith(FakeHost& host, const std::string& script) {
+std::string whyNotWith(FakeHost& host, const std::string& script,
+                       std::chrono::seconds longest = std::chrono::seconds(60),
+                       const std::vector<Change>& changes = kNameServer) {
     host.file("/opt/other", "#!/bin/sh\n" + script + "\n", 0755);
     cvagent::change::RehearsalSettings settings;
     settings.program = "/opt/other";
-    settings.longest = std::chrono::seconds(1);
+    settings.longest = longest;
     try {
-        rehearse(settings, kNameServer);
+        rehearse(settings, changes);
         return "";
     } catch (const cvagent::change::CannotRehearse& reason) {
         return reason.what();
@@ -239,7 +308,11 @@ HOST_TEST(Rehearsal, TakesNothingForAPlanThatIsNone) {
     EXPECT_THAT(whyNotWith(host, "exit 1"), HasSubstr("has failed"));
     EXPECT_THAT(whyNotWith(host, "echo '{\"plan\": {}}'"), HasSubstr("has failed"));
     EXPECT_THAT(whyNotWith(host, "echo '{\"cannot\": \"not today\"}'"), HasSubstr("not today"));
-    EXPECT_THAT(whyNotWith(host, "exec cat"), HasSubstr("in time"));
+    EXPECT_THAT(whyNotWith(host, "head -c 20000000 /dev/zero | tr '\\0' '['"), HasSubstr("too much"));
+    const std::chrono::seconds soon(1);
+    EXPECT_THAT(whyNotWith(host, "exec cat", soon), HasSubstr("in time"));
+    const Change endless{kConfig, 94, {std::string(4U << 20U, 'x')}};
+    EXPECT_THAT(whyNotWith(host, "while :; do :; done", soon, {endless}), HasSubstr("in time"));
     host.remove("/opt/other");
     cvagent::change::RehearsalSettings settings;
     settings.program = "/no/such/program";

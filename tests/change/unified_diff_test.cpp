@@ -25,7 +25,10 @@ TEST(UnifiedDiff, TellsWhatComesAndGoes) {
 
 TEST(UnifiedDiff, CannotSteerTheTerminal) {
     EXPECT_EQ(unifiedDiff("", "\x1b[2J\u202e\xff\t\r\n"),
-              "@@ -0,0 +1 @@\n+\\x1b[2J\\xe2\\x80\\xae\\xff\\x09\\x0d\n");
+              "@@ -0,0 +1 @@\n+\\x1b[2J\\xe2\\x80\\xae\\xff\t\\x0d\n");
+    EXPECT_EQ(unifiedDiff("", "default\t192.0.2.1\t-\n\t\n"),
+              "@@ -0,0 +1,2 @@\n+default\t192.0.2.1\t-\n+\t\n")
+        << "a tab steers nothing";
 }
 
 TEST(UnifiedDiff, OfHugeTextsIsToldAsAWhole) {

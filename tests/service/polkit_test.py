@@ -15,7 +15,7 @@ SKIPPED = 77
 ACTION = '<action id="com.vantrel.corvista1.{0}"><description>{0}</description><message>{0}</message>' \
     "<defaults><allow_any>no</allow_any><allow_inactive>no</allow_inactive><allow_active>no</allow_active></defaults></action>"
 RULE = """polkit.addRule(function(action, subject) {
-  if (action.id == "com.vantrel.corvista1.write" && subject.user == "games") { return polkit.Result.YES; }
+  if (/^com.vantrel.corvista1.(write|plan)$/.test(action.id) && subject.user == "games") { return polkit.Result.YES; }
 });
 """
 BUS = """<busconfig><type>system</type><listen>unix:path={0}/bus</listen><auth>EXTERNAL</auth>
@@ -59,6 +59,14 @@ class Run:
     def change(self, user, text):
         return self.busctl(user, "call", "com.vantrel.Corvista1", COMPUTER, "com.vantrel.Corvista1.Node", "Write", "uv", CONTACT, "s", text)
 
+    def plan(self, user):
+        return self.busctl(user, "--timeout=60", "call", "com.vantrel.Corvista1", "/com/vantrel/Corvista1", "com.vantrel.Corvista1.Agent", "Plan", "a(ssv)",
+                           "1", "computer", "OwnerContact", "s", "planned")
+
+    def apply(self, user, text):
+        return self.busctl(user, "--timeout=60", "call", "com.vantrel.Corvista1", "/com/vantrel/Corvista1", "com.vantrel.Corvista1.Agent", "Apply",
+                           "a(ssv)a{sv}", "1", "computer", "OwnerContact", "s", text, "1", "plain", "b", "true")
+
     def diary(self):
         with open(f"{self.folder}/diary") as file:
             return file.read()
@@ -85,6 +93,13 @@ def with_polkitd(run):
     expect('"applied"' in allowed, allowed)
     expect("=" in run.diary(), run.diary())
     expect('"applied"' in run.change("root", "roots"))
+    for refused in (run.plan("nobody"), run.apply("nobody", "mine")):
+        expect("you may not" in refused or "Access denied" in refused, refused)
+    # Whether namespaces can be had here or not: polkit has let it pass.
+    planned = run.plan("games")
+    expect("planned" in planned or "there is no plan" in planned, planned)
+    expect('"applied"' in run.apply("games", "all at once"))
+    expect("mine" not in run.diary(), run.diary())
 
 
 def with_dbusmock(run):
@@ -110,7 +125,7 @@ def main():
     for place in ("/usr/share/polkit-1/actions", "/usr/share/polkit-1/rules.d", "/etc/polkit-1", "/run", "/tmp"):
         if os.path.isdir(place) and not program.startswith(place + "/"):
             subprocess.run(["mount", "-t", "tmpfs", "-o", "mode=755", "none", place], check=True)
-    write(f"<policyconfig>{ACTION.format('write')}{ACTION.format('power')}</policyconfig>",
+    write(f"<policyconfig>{''.join(map(ACTION.format, ('write', 'power', 'plan')))}</policyconfig>",
           "/usr/share/polkit-1/actions/com.vantrel.corvista1.policy")
     write(RULE, "/etc/polkit-1/rules.d/50-test.rules")
     folder = tempfile.mkdtemp(dir="/run")

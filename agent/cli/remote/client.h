@@ -49,8 +49,7 @@ public:
     /// @param address "system" or a bus's own
     /// @param stop    a descriptor that ends all waiting when it can be read; -1 for none
     /// @param first   what will be asked first. It goes out while the bus is still asked whose the service
-    /// is;
-    ///                of one that is not believed nobody sees the answer
+    ///                is; of one that is not believed nobody sees the answer
     explicit Client(const std::string& address, int stop = -1, Question first = {});
     /// Thrown by all that waits.
     struct Stopped {};
@@ -70,6 +69,9 @@ public:
     bus::Message ask(const bus::Message& call, Seconds longest);
     /// The same for what may take any time, as long as the service is alive.
     bus::Message askForLong(const bus::Message& call);
+    /// The same with the error as an answer.
+    bus::Message waitForLong(const bus::Message& call);
+    void checkAnswer(const bus::Message& answer);
     // Properties of the agent's interface.
     std::string textProperty(const std::string& name);
     std::uint64_t numberProperty(const std::string& name);
@@ -103,7 +105,6 @@ private:
     bus::Message answerTo(const bus::Message& call, Seconds longest,
                           const std::function<void()>& behind = nullptr);
     bool waitFor(const bus::Message& answer, Seconds longest);
-    void checkAnswer(const bus::Message& answer);
 
     bus::Connection connection_;
     int stop_;
