@@ -1,5 +1,6 @@
 #include "agent/service/workers.h"
 
+#include <algorithm>
 #include <system_error>
 #include <utility>
 
@@ -11,11 +12,20 @@ Workers::~Workers() {
 
 void Workers::end() {
     stop();
-    for (std::thread& thread : threads_) {
-        if (thread.joinable()) {
-            thread.join();
-        }
+    std::vector<std::thread> threads;
+    {
+        const std::lock_guard lock(guard_);
+        threads.swap(threads_);
+        joinEnded();
     }
+    for (std::thread& thread : threads) {
+        thread.join();
+    }
+}
+
+std::size_t Workers::threads() const {
+    const std::lock_guard lock(guard_);
+    return threads_.size();
 }
 
 void Workers::stop() {
@@ -50,16 +60,35 @@ bool Workers::submit(std::uint32_t user, Job job) {
 
 /// Where the system gives no more, those that are there do it.
 void Workers::startThread() {
+    joinEnded();
     try {
         threads_.emplace_back([this] { run(); });
     } catch (const std::system_error&) {
     }
 }
 
+/// Of a thread that had nothing to do, on that thread; guard_ is held, as in the next one.
+void Workers::retire() {
+    const auto own = std::ranges::find(threads_, std::this_thread::get_id(), &std::thread::get_id);
+    ended_.push_back(std::move(*own));
+    threads_.erase(own);
+}
+
+/// They have let the guard go.
+void Workers::joinEnded() {
+    for (std::thread& thread : ended_) {
+        thread.join();
+    }
+    ended_.clear();
+}
+
 void Workers::run() {
     std::unique_lock lock(guard_);
     while (true) {
-        changed_.wait(lock, [this] { return stopped_ || waiting_.size() > 0; });
+        if (!changed_.wait_for(lock, limits_.idle, [this] { return stopped_ || waiting_.size() > 0; })) {
+            retire();
+            return;
+        }
         if (stopped_) {
             return;
         }

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <condition_variable>
 #include <cstdint>
 #include <functional>
@@ -18,8 +19,9 @@ public:
     using Job = std::function<void()>;
     struct Limits {
         std::size_t threads;
-        std::size_t waitingOfOne;  ///< jobs of one user
-        std::size_t waiting;       ///< jobs of all
+        std::size_t waitingOfOne;                                   ///< jobs of one user
+        std::size_t waiting;                                        ///< jobs of all
+        std::chrono::milliseconds idle = std::chrono::seconds(10);  ///< after which a thread ends
     };
 
     explicit Workers(const Limits& limits) : limits_(limits) {}
@@ -36,10 +38,13 @@ public:
     void end();
     /// Whether one is at work or waits.
     bool isBusy() const;
+    std::size_t threads() const;
 
 private:
     void run();
     void startThread();
+    void retire();
+    void joinEnded();
 
     const Limits limits_;
     mutable std::mutex guard_;  // guards everything below
@@ -48,6 +53,7 @@ private:
     std::size_t atWork_ = 0;
     bool stopped_ = false;
     std::vector<std::thread> threads_;
+    std::vector<std::thread> ended_;  // that only wait to be joined
 };
 
 }  // namespace cvagent::service

@@ -56,6 +56,17 @@ TEST(ServiceWorkers, RefuseWhatIsTooMuch) {
     EXPECT_TRUE(workers.submit(9, nothing));
 }
 
+TEST(ServiceWorkers, EndWhenThereIsNothingToDo) {
+    std::atomic<int> done{0};
+    Workers workers({4, 100, 100, std::chrono::milliseconds(1)});
+    for (int round = 1; round <= 20; ++round) {
+        for (int job = 0; job < 5; ++job) {
+            ASSERT_TRUE(workers.submit(7, [&done] { ++done; }));
+        }
+        ASSERT_TRUE(eventually([&] { return done == 5 * round && workers.threads() == 0; }));
+    }
+}
+
 TEST(ServiceWorkers, DropAtTheirEndWhatHasNotBegun) {
     std::atomic<int> done{0};
     std::mutex hold;
