@@ -47,7 +47,7 @@ void perform(const CallPointer& call, const Caller& caller, const std::vector<ch
 
 void startPlan(const CallPointer& call) {
     bus::Reader arguments(call->message());
-    ifAllowed(call, takeChanges(arguments), {plannersOf, "plan"},
+    ifAllowed(call, takeChanges(arguments), {plannersOf, "plan", false},
               [call](const Caller& caller, const std::vector<change::MeantChange>& changes) {
                   submit(call, call->parts().planners, caller,
                          [call, caller, changes] { perform(call, caller, changes); });
