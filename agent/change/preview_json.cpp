@@ -31,7 +31,7 @@ std::string toJson(const Preview& preview) {
 
 Preview previewFromJson(std::string_view json) {
     try {
-        const Json whole = Json::parse(json);
+        const Json whole = parsedParts(json);
         return {listFrom<Preview::Target>(whole.at("objections"), targetFrom),
                 listFrom<Preview::Target>(whole.at("unchanged"), targetFrom), planFrom(whole.at("plan"))};
     } catch (const nlohmann::json::exception& damaged) {

@@ -63,11 +63,15 @@ void noteDenied(const Caller& caller, const ChangeQuestion& question,
                 const std::vector<change::MeantChange>& changes, const std::string& reason) {
     const bool isOne = changes.size() == 1;
     const std::string what = isOne ? changes.front().target() : std::to_string(changes.size()) + " changes";
-    noteWrite(
-        Priority::warning,
-        {isOne ? changes.front().node->getPath() : "", isOne ? changes.front().row->name : "", caller.user},
-        "uid " + std::to_string(caller.user) + " may not " + question.deed + " " + what + ": " + reason,
-        "denied");
+    const std::string user = std::to_string(caller.user);
+    const std::string text = "uid " + user + " may not " + question.deed + " " + what + ": " + reason;
+    if (question.isWrite) {
+        const std::string node = isOne ? changes.front().node->getPath() : "";
+        noteWrite(Priority::warning, {node, isOne ? changes.front().row->name : "", caller.user}, text,
+                  "denied");
+    } else {
+        log(Priority::warning, text, {{"CORVISTA_CALLER_UID", user}});
+    }
 }
 
 void askWhetherAllowed(const CallPointer& call, const Caller& caller, const ChangeQuestion& question,

@@ -21,13 +21,14 @@ struct ApplyWishes {
 /// The argument a{sv}. Throws bus::Error for one that nobody knows.
 ApplyWishes takeWishes(bus::Reader& reader);
 
-/// Finds out what the changes mean and who calls, then whether he may, and goes on on the loop's thread.
 struct ChangeQuestion {
-    /// Of the changes, which decide who is asked.
+    /// Who may make these changes.
     std::function<Audience(const std::vector<change::MeantChange>& changes)> audience;
     std::string deed;  ///< "apply", "plan"
+    bool isWrite = true;
 };
 using MayChange = std::function<void(const Caller& caller, const std::vector<change::MeantChange>& changes)>;
+/// Finds out who calls and what the changes mean, then whether he may, and goes on, on the loop's thread.
 void ifAllowed(const CallPointer& call, const std::vector<change::NamedChange>& named,
                const ChangeQuestion& question, const MayChange& next);
 

@@ -7,7 +7,7 @@ namespace cvagent::service {
 
 namespace {
 
-constexpr std::chrono::seconds kReadTime{30};
+constexpr std::chrono::seconds kLookTime{30};
 /// A message of the bus may be twice as long.
 constexpr std::size_t kLongestPlan = std::size_t{16} << 20;
 
@@ -19,7 +19,7 @@ Audience plannersOf(const std::vector<change::MeantChange>& /*changes*/) {
 std::string previewText(Agent& agent, const change::RehearsalSettings& settings, const Caller& caller,
                         const std::vector<change::MeantChange>& changes) {
     AgentHost host(agent);
-    const Request request("a plan on the bus", Request::Clock::now() + kReadTime);
+    const Request request("a plan on the bus", Request::Clock::now() + kLookTime);
     const change::Proposal proposal = change::propose(host, changes, request);
     change::Plan plan = change::rehearse(settings, proposal);
     if (!Consent::isOwn(caller)) {
@@ -47,7 +47,7 @@ void perform(const CallPointer& call, const Caller& caller, const std::vector<ch
 
 void startPlan(const CallPointer& call) {
     bus::Reader arguments(call->message());
-    ifAllowed(call, takeChanges(arguments), {plannersOf, "plan"},
+    ifAllowed(call, takeChanges(arguments), {plannersOf, "plan", false},
               [call](const Caller& caller, const std::vector<change::MeantChange>& changes) {
                   submit(call, call->parts().planners, caller,
                          [call, caller, changes] { perform(call, caller, changes); });

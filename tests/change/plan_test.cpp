@@ -8,6 +8,7 @@
 #include <cstdlib>
 
 #include "agent/change/base64.h"
+#include "agent/change/proposal.h"
 
 namespace {
 
@@ -73,6 +74,28 @@ TEST(Plan, IsNotReadFromWhatIsNone) {
     EXPECT_THROW(planFromJson(with("\"change\": 1", "\"change\": \"x\"")), BadPlan);
     EXPECT_THROW(planFromJson(with("\"base64\": \"", "\"base64\": \"*")), BadPlan);
     EXPECT_THROW(planFromJson(with("\"answers\": [", "\"answers\": {}, \"others\": [")), BadPlan);
+}
+
+TEST(Preview, TravelsAsItIs) {
+    const Preview preview{
+        {{"/a\xff", "IPv4Address", "in no\nsubnet"}}, {{"/b", "OwnerName", ""}}, wholePlan()};
+    const std::string text = toJson(preview);
+    const Preview back = previewFromJson(text);
+    EXPECT_EQ(toJson(back), text);
+    EXPECT_EQ(back.objections[0].path, "/a\xff");
+    EXPECT_EQ(back.objections[0].reason, "in no\nsubnet");
+    EXPECT_EQ(back.unchanged[0].property, "OwnerName");
+    EXPECT_EQ(back.plan.changes.size(), 2U);
+}
+
+TEST(Preview, IsNotReadFromWhatIsNone) {
+    for (const std::string text :
+         {std::string(), std::string("{}"), std::string("[]"), std::string("{\"objections\": []"),
+          std::string(R"({"objections": {}, "unchanged": [], "plan": {}})"),
+          std::string(R"({"objections": [{"path": 1}], "unchanged": [], "plan": {}})"),
+          std::string(100'000, '[')}) {
+        EXPECT_THROW(previewFromJson(text), BadPlan) << text.substr(0, 40);
+    }
 }
 
 TEST(Plan, ShowsEverybodyNothingThatNotEverybodyMayRead) {
