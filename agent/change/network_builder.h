@@ -1,11 +1,11 @@
 #pragma once
 
-#include "agent/change/network_messages.h"
+#include "agent/undo/network_messages.h"
 
 namespace cvagent::change {
 
 /// Makes the network of the calling thread, which has nothing but a loopback, like another one. What the
 /// kernel refuses is left out.
-void buildNetwork(const NetworkMessages& like);
+void buildNetwork(const undo::NetworkMessages& like);
 
 }  // namespace cvagent::change
