@@ -4,6 +4,7 @@
 #include <linux/nexthop.h>
 #include <linux/rtnetlink.h>
 
+#include <algorithm>
 #include <cstdint>
 #include <cstring>
 #include <set>
@@ -44,8 +45,8 @@ std::string addressRequest(const NetworkMessage& message, unsigned how, unsigned
             if (type == IFA_FLAGS) {
                 flags = readPlain<std::uint32_t>(data).value_or(0);
             }
-            static const std::set<unsigned> kTaken{IFA_ADDRESS, IFA_LOCAL,     IFA_BROADCAST,
-                                                   IFA_LABEL,   IFA_CACHEINFO, IFA_RT_PRIORITY};
+            static const std::set<unsigned> kTaken{IFA_ADDRESS,   IFA_LOCAL,       IFA_BROADCAST, IFA_LABEL,
+                                                   IFA_CACHEINFO, IFA_RT_PRIORITY, IFA_PROTO};
             return kTaken.contains(type);
         });
     flags = (flags & kKeptFlags) | more;
@@ -74,9 +75,15 @@ std::string routeRequest(const NetworkMessage& message, unsigned how) {
 std::string nextHopRequest(const NetworkMessage& message, unsigned how) {
     auto fixed = readPlain<nhmsg>(message.body).value_or(nhmsg{});
     fixed.nh_flags &= RTNH_F_ONLINK;
-    return makeRequest(RTM_NEWNEXTHOP, how, bytesOf(fixed),
-                       attributesOf(message.body, NLMSG_ALIGN(sizeof(nhmsg)),
-                                    [](unsigned, const std::string&) { return true; }));
+    fixed.nh_scope = 0;
+    std::string attributes;
+    const auto body =
+        std::string_view(message.body).substr(std::min(message.body.size(), NLMSG_ALIGN(sizeof(nhmsg))));
+    hosttools::eachAttribute(body, [&attributes](unsigned type, std::string_view data) {
+        const bool isNested = type == NHA_ENCAP || type == NHA_RES_GROUP;
+        attributes += type <= NHA_RES_GROUP ? makeAttribute(type | (isNested ? NLA_F_NESTED : 0U), data) : "";
+    });
+    return makeRequest(RTM_NEWNEXTHOP, how, bytesOf(fixed), attributes);
 }
 
 }  // namespace cvagent::undo
