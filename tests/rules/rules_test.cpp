@@ -28,6 +28,7 @@ const std::map<std::string, std::set<std::string>> kMayInclude = {
     {"agent/core", {"agent/core", "agent/shell", "framework"}},
     {"agent/verify", {"agent/verify", "agent/core", "hosttools", "framework"}},
     {"agent/undo", {"agent/undo", "hosttools"}},
+    {"agent/guard", {"agent/guard", "agent/undo", "hosttools"}},
     {"agent/change", {"agent/change", "agent/core", "agent/shell", "agent/undo", "hosttools", "framework"}},
     {"agent/bus", {"agent/bus"}},
     {"agent/history", {"agent/history", "agent/core"}},
