@@ -91,6 +91,18 @@ void checkTogether(const Plan& plan) {
     }
 }
 
+/// Whether every directory above lets everybody in; one that is not there yet does.
+bool isReachedByEverybody(const std::string& path) {
+    for (std::size_t end = path.rfind('/'); end != std::string::npos && end > 0;
+         end = path.rfind('/', end - 1)) {
+        struct stat found {};
+        if (stat(path.substr(0, end).c_str(), &found) == 0 && (found.st_mode & S_IXOTH) == 0) {
+            return false;
+        }
+    }
+    return true;
+}
+
 bool isForEverybody(const FileState& state) {
     return state.type != FileState::Type::file || (state.mode & S_IROTH) != 0;
 }
@@ -138,8 +150,8 @@ Plan planFromJson(std::string_view json) {
 
 Plan withoutSecrets(Plan plan) {
     for (FileChange& file : plan.files) {
-        const bool open =
-            (!file.before || isForEverybody(*file.before)) && (!file.after || isForEverybody(*file.after));
+        const bool open = isReachedByEverybody(file.path) && (!file.before || isForEverybody(*file.before)) &&
+                          (!file.after || isForEverybody(*file.after));
         if (!open) {
             withhold(file.before);
             withhold(file.after);

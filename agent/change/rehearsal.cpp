@@ -4,9 +4,11 @@
 #include <poll.h>
 #include <spawn.h>
 #include <sys/socket.h>
+#include <sys/un.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <csignal>
@@ -30,6 +32,8 @@ using Clock = std::chrono::steady_clock;
 constexpr const char* kProgram = "corvista-rehearsal";
 /// Files of a host are kilobytes; a plug-in that prints without end is not read to it.
 constexpr std::size_t kMostAnswer = 64U << 20U;
+constexpr long long kBetweenQuestions = 200;  // milliseconds
+constexpr long kConnectTime = 10;             // seconds
 
 [[noreturn]] void fail(const std::string& what, int error) {
     throw CannotRehearse("cannot try the change: " + what + ": " + std::strerror(error));
@@ -44,11 +48,39 @@ std::string findProgram() {
     return *std::move(found);
 }
 
+/// Only root's processes are believed there.
+Descriptor connectedTo(const std::string& place) {
+    sockaddr_un address{};
+    if (place.size() >= sizeof(address.sun_path)) {
+        throw CannotRehearse("cannot try the change: the name of the socket is too long");
+    }
+    address.sun_family = AF_UNIX;
+    std::memcpy(address.sun_path, place.data(), place.size());
+    Descriptor socket(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
+    const timeval longest{kConnectTime, 0};
+    if (!socket.isOpen() ||
+        setsockopt(socket.get(), SOL_SOCKET, SO_SNDTIMEO, &longest, sizeof(longest)) != 0 ||
+        connect(socket.get(), reinterpret_cast<const sockaddr*>(&address), sizeof(address)) != 0) {
+        fail("nobody answers at " + inQuotes(place), errno);
+    }
+    ucred peer{};
+    socklen_t size = sizeof(peer);
+    if (getsockopt(socket.get(), SOL_SOCKET, SO_PEERCRED, &peer, &size) != 0 || peer.uid != 0) {
+        throw CannotRehearse("cannot try the change: it is not root who answers at " + inQuotes(place));
+    }
+    return socket;
+}
+
 /// The program at work. It ends with everything that it has started when the other end of its socket is
 /// closed, so it cannot outlive this process either.
 class Rehearsal {
 public:
-    explicit Rehearsal(std::string program) {
+    explicit Rehearsal(const RehearsalSettings& settings) : goesOn_(settings.goesOn) {
+        if (!settings.socket.empty()) {
+            ours_ = connectedTo(settings.socket);
+            return;
+        }
+        std::string program = settings.program.empty() ? findProgram() : settings.program;
         std::array<int, 2> ends{-1, -1};
         if (socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, ends.data()) != 0) {
             fail("no socket", errno);
@@ -60,8 +92,10 @@ public:
     Rehearsal(const Rehearsal&) = delete;
     Rehearsal& operator=(const Rehearsal&) = delete;
     ~Rehearsal() {
-        kill(process_, SIGKILL);
-        while (waitpid(process_, nullptr, 0) < 0 && errno == EINTR) {
+        if (process_ > 0) {
+            kill(process_, SIGKILL);
+            while (waitpid(process_, nullptr, 0) < 0 && errno == EINTR) {
+            }
         }
     }
 
@@ -111,16 +145,21 @@ private:
         for (;;) {
             const auto left = std::chrono::ceil<std::chrono::milliseconds>(end - Clock::now()).count();
             pollfd ready{ours_.get(), POLLIN, 0};
-            const int result = left > 0 ? poll(&ready, 1, static_cast<int>(left)) : 0;
+            const auto slice = goesOn_ ? std::min<long long>(left, kBetweenQuestions) : left;
+            const int result = left > 0 ? poll(&ready, 1, static_cast<int>(slice)) : 0;
             if (result > 0) {
                 return;
             }
-            if (result == 0) {
+            if (goesOn_ && !goesOn_()) {
+                throw CannotRehearse("the agent ends");
+            }
+            if (left <= 0) {
                 throw CannotRehearse("the change did not come to an end in time where it was tried");
             }
         }
     }
 
+    const std::function<bool()> goesOn_;
     Descriptor ours_;
     pid_t process_ = -1;
 };
@@ -130,7 +169,7 @@ private:
 Plan rehearse(const RehearsalSettings& settings, const std::vector<Change>& changes) {
     const auto end = Clock::now() + settings.longest;
     const CommandScope own(CommandScope::ours);  // no command of a plug-in, whose time is limited otherwise
-    const Rehearsal rehearsal(settings.program.empty() ? findProgram() : settings.program);
+    const Rehearsal rehearsal(settings);
     rehearsal.ask(
         toJson({settings.plugins, settings.dataDirectory, settings.hostTools, settings.commands, changes}) +
         '\n');

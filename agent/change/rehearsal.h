@@ -1,6 +1,7 @@
 #pragma once
 
 #include <chrono>
+#include <functional>
 #include <stdexcept>
 #include <string>
 #include <vector>
@@ -25,6 +26,11 @@ struct RehearsalSettings {
     std::chrono::milliseconds longest{30'000};
     /// The program; "": the one beside this program.
     std::string program;
+    /// Where it is started by somebody else, with a socket of his as its standard streams, and belongs to
+    /// root; "" for a process of our own.
+    std::string socket;
+    /// Asked now and then while it is waited for; null: always.
+    std::function<bool()> goesOn;
 };
 
 /// Why nothing could be tried: the host gives no namespaces, the program is missing or was cut off.

@@ -8,11 +8,10 @@
 #include <array>
 #include <cerrno>
 #include <cstring>
-#include <set>
 
+#include "agent/cli/local_session.h"
 #include "agent/cli/print.h"
 #include "agent/cli/prompt.h"
-#include "agent/core/property_words.h"
 
 namespace cvagent {
 
@@ -39,41 +38,7 @@ int openChangeFile(const std::string& file) {
     return descriptor;
 }
 
-std::string withPlace(const change::NamedChange& named, const std::string& text) {
-    return named.place.empty() ? text : named.place + ": " + text;
-}
-
-MeantChange meant(Session& session, const change::NamedChange& named) {
-    try {
-        MeantChange change{session.find(named.node), nullptr, named.words, {}, named.place};
-        change.row = &writableRow(*change.node, named.property);
-        change.value = acceptedValue(*change.row, named.words);
-        return change;
-    } catch (const Problem& problem) {
-        throw Problem(problem.kind(), withPlace(named, problem.what()), problem.subject(), problem.detail());
-    }
-}
-
-std::vector<change::NamedChange> namedChanges(const Options& options) {
-    if (options.changeFile.empty()) {
-        return {{options.node, options.property, options.values, ""}};
-    }
-    try {
-        return change::parseChanges(options.changeText);
-    } catch (const change::BadChangeFile& bad) {
-        throw Failure(ExitStatus::usage, inQuotes(options.changeFile) + ": " + bad.what());
-    }
-}
-
 }  // namespace
-
-/// In one spelling, codes as numbers.
-change::Wanted MeantChange::wanted() const {
-    const std::vector<std::string>* list = value.asTexts();
-    const auto plain = list != nullptr ? *list : std::vector<std::string>{static_cast<std::string>(value)};
-    return {row->id, plain, row->type == NodeType::ipConfig ? change::interfaceNameOf(*node) : "",
-            row->type == NodeType::computer};
-}
 
 std::string readChangeFile(const std::string& file) {
     const int descriptor = openChangeFile(file);
@@ -92,66 +57,44 @@ std::string readChangeFile(const std::string& file) {
     return text;
 }
 
-std::vector<MeantChange> meantChanges(Session& session, const Options& options) {
-    std::vector<MeantChange> changes;
-    std::set<std::pair<unsigned int, unsigned int>> known;
-    for (const change::NamedChange& named : namedChanges(options)) {
-        changes.push_back(meant(session, named));
-        const MeantChange& last = changes.back();
-        if (!known.insert({last.node->getNodeId(), last.row->id}).second) {
-            throw Failure(ExitStatus::usage,
-                          withPlace(named, printable(last.target()) + " stands in the file twice"));
-        }
+std::vector<change::NamedChange> namedChanges(const Options& options) {
+    if (options.changeFile.empty()) {
+        return {{options.node, options.property, options.values, ""}};
     }
-    return changes;
+    try {
+        return change::parseChanges(options.changeText);
+    } catch (const change::BadChangeFile& bad) {
+        throw Failure(ExitStatus::usage, inQuotes(options.changeFile) + ": " + bad.what());
+    }
 }
 
-std::vector<change::Objection> objectionsTo(const std::vector<MeantChange>& changes) {
-    std::vector<change::Wanted> wanted;
-    std::ranges::transform(changes, std::back_inserter(wanted), &MeantChange::wanted);
-    return change::objectionsTo(wanted, change::HostFacts::of(wanted));
+std::vector<change::MeantChange> meantChanges(Session& session, const Options& options) {
+    const std::vector<change::NamedChange> named = namedChanges(options);
+    try {
+        return change::meantChanges(session, named);
+    } catch (const change::BadChangeFile& twice) {
+        throw Failure(ExitStatus::usage, twice.what());
+    }
 }
 
-void refuseUnlessForced(const std::vector<MeantChange>& changes,
-                        const std::vector<change::Objection>& objections, bool force) {
-    std::string text;
-    for (const change::Objection& each : objections) {
-        const MeantChange& change = changes.at(each.change);
-        text += (text.empty() ? "" : "\n") + (change.place.empty() ? "" : change.place + ": ") +
-                printable(change.target()) + ": " + printable(each.reason);
-    }
-    if (text.empty()) {
-        return;
-    }
-    if (force) {
-        complain("done all the same: " + text);
-        return;
-    }
-    throw Failure(ExitStatus::refused, text + "\nNothing was done; --force does it all the same");
-}
-
-void confirmDrastic(const std::vector<MeantChange>& changes, const Options& options) {
-    for (const MeantChange& change : changes) {
-        if (const Label* drastic = drasticLabel(*change.row, change.value);
-            drastic != nullptr && !options.yes) {
+void confirmDrastic(const std::vector<change::MeantChange>& changes, const Options& options) {
+    for (const change::MeantChange& change : changes) {
+        if (const Label* drastic = change.drastic(); drastic != nullptr && !options.yes) {
             confirm(drastic->text);
         }
     }
 }
 
-Found findNow(Session& session, const MeantChange& change, const Request& request) {
-    Found found;
-    found.reading.id = change.row->id;
-    found.reading.row = change.row;
-    found.reading.error = "it can only be written";
-    if (change.row->readable) {
-        const std::vector<Reading> readings =
-            session.read(change.node, {std::to_string(change.row->id)}, request);
-        found.reading = readings.empty() ? found.reading : readings.front();
-        found.reading.row = change.row;
+change::RehearsalSettings rehearsalSettings(const Options& options) {
+    change::RehearsalSettings settings;
+    Options found = options;
+    if (found.plugins.empty()) {  // the service has answered so far
+        findPlugins(found);
     }
-    found.standing = change::standingOf(*change.node, *change.row, change.value, found.reading);
-    return found;
+    settings.plugins = found.plugins;
+    settings.hostTools = options.hostTools;
+    settings.commands = options.commands;
+    return settings;
 }
 
 }  // namespace cvagent

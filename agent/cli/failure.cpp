@@ -17,6 +17,8 @@ ExitStatus statusOf(const Problem& problem) {
     return problem.subject() == Problem::dataVariable ? ExitStatus::usage : kStatuses.at(problem.kind());
 }
 
+constexpr const char* kForce = "\nNothing was done; --force does it all the same";
+
 struct Advice {
     Problem::Kind kind;
     Problem::Subject subject;
@@ -28,6 +30,8 @@ constexpr Advice kAdvice[] = {
     {Problem::ambiguous, Problem::node, "; give the id or the path of one of them:"},
     {Problem::notFound, Problem::property, "; see: cvagent properties "},
     {Problem::refused, Problem::property, "; see: cvagent properties "},
+    {Problem::refused, Problem::objection, kForce},
+    {Problem::failed, Problem::objection, kForce},
     {Problem::failed, Problem::pluginSearch, "; name the plug-in with --plugin FILE"},
     {Problem::failed, Problem::pluginFile, "; name the right one with --plugin FILE"},
     {Problem::failed, Problem::pluginLoad,

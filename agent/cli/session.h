@@ -6,6 +6,7 @@
 #include <string>
 #include <vector>
 
+#include "agent/change/apply.h"
 #include "agent/cli/failure.h"
 #include "agent/cli/kept_events.h"
 #include "agent/core/event_log.h"
@@ -15,10 +16,18 @@
 
 namespace cvagent {
 
+/// How a service is to make changes.
+struct ApplyOptions {
+    bool force = false;
+    bool plain = false;  ///< neither tried out nor left out where it is so already
+    /// How long to look at what was written; nothing: not at all.
+    std::optional<double> verifySeconds;
+};
+
 /// What the commands ask of an agent: one of this process (LocalSession) or the service
 /// (remote/remote_session.h). Errors and warnings of either go to standard error. Everything may throw
 /// Problem or Failure.
-class Session {
+class Session : public change::ChangedHost {
 public:
     struct Tree {
         std::vector<std::string> plugins;  ///< files of those at work
@@ -26,20 +35,17 @@ public:
         std::vector<std::vector<Reading>> readings;  ///< what a tree shows of each node
     };
 
-    Session() = default;
-    Session(const Session&) = delete;
-    Session& operator=(const Session&) = delete;
-    virtual ~Session() = default;
-
     virtual Tree tree(const Request& request) = 0;
-    /// The node a person means; see findNode in tree.h.
-    virtual NodeRef find(const std::string& word) = 0;
-    /// @param properties see readableIds in property_words.h
-    virtual std::vector<Reading> read(const NodeRef& node, const std::vector<std::string>& properties,
-                                      const Request& request) = 0;
-    /// @param words the value, as acceptedValue in property_words.h has accepted it
-    virtual WriteResult write(const NodeRef& node, const Property& row, const std::vector<std::string>& words,
-                              const Request& request) = 0;
+    // A service makes plans and changes by itself, as its user, and judges, tries out, writes and looks in
+    // one. Null: this process does it, since the service does not know how, or does not let this user, which
+    // is told.
+    virtual std::unique_ptr<change::Preview> preview(const std::vector<change::MeantChange>& /*changes*/) {
+        return nullptr;
+    }
+    virtual std::unique_ptr<std::vector<change::Outcome>> apply(
+        const std::vector<change::MeantChange>& /*changes*/, const ApplyOptions& /*options*/) {
+        return nullptr;
+    }
 
     /// Events from now on, and those that a local start brings.
     virtual std::shared_ptr<Subscription> subscribe(std::optional<Event::Kind> only) = 0;
@@ -51,11 +57,10 @@ public:
     /// the service come; null: back.
     virtual void sendAlertsTo(std::function<void(const Event&)> receiver) = 0;
 
-    /// What this program has found out by itself becomes an event of its agent's; a service finds out by
-    /// itself.
-    virtual void announce(const Event& event) = 0;
+    /// Becomes an event of its agent's; a service finds out by itself.
+    void announce(const Event& event) override = 0;
     /// Prints what the plug-in has reported because of a call, and then what it reported by itself.
-    virtual void showErrors(const Request& request) = 0;
+    void showErrors(const Request& request) override = 0;
     /// Names the tools that are missing for good, and what they cost.
     /// @param properties those that were asked for; none: the whole tree is
     virtual void tellMissingTools(const std::vector<Reading>& properties) = 0;

@@ -22,6 +22,8 @@ public:
         none,
         node,
         property,
+        plan,       ///< it cannot be made here, but perhaps by somebody else
+        objection,  ///< something speaks against it, but a person may know better
         pluginSearch,
         pluginFile,
         pluginLoad,

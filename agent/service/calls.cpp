@@ -25,7 +25,11 @@ constexpr std::size_t kMostProperties = 1024;  // of one read
 constexpr std::array kKindNames = {"NotFound", "Ambiguous", "Refused", "Busy", "TimedOut", "Failed"};
 
 const char* subjectName(Problem::Subject subject) {
-    return subject == Problem::node ? "node" : subject == Problem::property ? "property" : "";
+    return subject == Problem::node        ? "node"
+           : subject == Problem::property  ? "property"
+           : subject == Problem::plan      ? "plan"
+           : subject == Problem::objection ? "force"
+                                           : "";
 }
 
 /// The node of an id. Throws Problem.
@@ -41,12 +45,16 @@ Withheld withheldFrom(const PendingCall& call, const Caller& caller, Withheld ho
     return call.parts().consent.isTrusted(caller) ? Withheld::nothing : how;
 }
 
-/// Runs what a job has come to on the loop's thread.
+}  // namespace
+
+const char* errorNameOf(const Problem& problem) {
+    return kKindNames.at(problem.kind());
+}
+
 void comeBack(const CallPointer& call, std::function<void()> work) {
     call->parts().mailbox->post([call, held = std::move(work)] { call->guarded(held); });
 }
 
-/// Has a job done for the caller in his turn.
 void submit(const CallPointer& call, Workers& workers, const Caller& caller, Workers::Job job) {
     const auto safely = [call, held = std::move(job)] {
         try {
@@ -62,8 +70,6 @@ void submit(const CallPointer& call, Workers& workers, const Caller& caller, Wor
         call->fail(bus::kLimitsExceeded, "too many calls wait for an answer already");
     }
 }
-
-}  // namespace
 
 void PendingCall::answer(const std::function<void(bus::Writer& writer)>& fill) const {
     if (message_.wantsNoReply()) {
@@ -86,7 +92,7 @@ void PendingCall::fail(const Problem& problem, const std::vector<std::string>& e
         return;
     }
     const bus::Message reply =
-        message_.errorReply(std::string(kErrorPrefix) + kKindNames.at(problem.kind()), problem.what());
+        message_.errorReply(std::string(kErrorPrefix) + errorNameOf(problem), problem.what());
     bus::Writer(reply).put(subjectName(problem.subject())).put(bus::shortText(problem.detail())).put(errors);
     parts_.connection.send(reply);
 }

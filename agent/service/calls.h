@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <functional>
 #include <memory>
 #include <optional>
@@ -7,6 +8,7 @@
 
 #include "agent/bus/reader.h"
 #include "agent/bus/writer.h"
+#include "agent/change/rehearsal.h"
 #include "agent/core/agent.h"
 #include "agent/service/callers.h"
 #include "agent/service/consent.h"
@@ -31,10 +33,17 @@ struct Parts {
     Turns& turns;
     Workers& readers;
     Workers& writers;
+    Workers& planners;
+    Workers& lookups;  ///< of what changes mean
     std::shared_ptr<Mailbox> mailbox;
+    /// How changes are tried out.
+    change::RehearsalSettings rehearsal;
     /// Reads what happened behind a number, as many as are wanted; null where nothing is kept. Any thread.
     EventSource past;
 };
+
+/// As long as a person waits for a host to change; a write that waits its turn that long is told so.
+inline constexpr std::chrono::seconds kWriteTime{150};
 
 /// A call that is answered later. What goes wrong on the way is the answer.
 class PendingCall {
@@ -63,6 +72,13 @@ private:
 
 using CallPointer = std::shared_ptr<const PendingCall>;
 
+/// The last part of the name that a problem has as an error on the bus: "Busy".
+const char* errorNameOf(const Problem& problem);
+/// Has a job done for the caller in his turn; what it throws is the answer.
+void submit(const CallPointer& call, Workers& workers, const Caller& caller, Workers::Job job);
+/// Runs what a job has come to on the loop's thread.
+void comeBack(const CallPointer& call, std::function<void()> work);
+
 // The methods of com.vantrel.Corvista1.Agent and com.vantrel.Corvista1.Node. They take the arguments from the
 // call; the message has the types that the interface says.
 void answerTree(const CallPointer& call);
@@ -71,5 +87,7 @@ void answerEventsSince(const CallPointer& call);
 /// @param node the id; nothing: it is the first argument
 void startRead(const CallPointer& call, std::optional<std::uint32_t> node);
 void startWrite(const CallPointer& call, std::optional<std::uint32_t> node);
+void startPlan(const CallPointer& call);
+void startApply(const CallPointer& call);
 
 }  // namespace cvagent::service

@@ -23,11 +23,12 @@ struct Rule {
     bool everybody;
     const char* action;  ///< what polkit is asked; null: it is not
 };
-constexpr std::array<Rule, 4> kRules = {{
+constexpr std::array<Rule, 5> kRules = {{
     {true, nullptr},
     {false, nullptr},
     {false, "com.vantrel.corvista1.write"},
     {false, "com.vantrel.corvista1.power"},
+    {false, "com.vantrel.corvista1.plan"},
 }};
 
 constexpr const char* kPolkit = "org.freedesktop.PolicyKit1";
@@ -51,6 +52,10 @@ void Consent::setTrustedGroup(const std::string& group) {
 
 bool Consent::isTrusted(const Caller& caller) const {
     return isOurs(caller) || (group_ && caller.isIn(*group_));
+}
+
+bool Consent::isOwn(const Caller& caller) {
+    return isOurs(caller);
 }
 
 void Consent::ask(const Caller& caller, const Question& question, Decided decided) {

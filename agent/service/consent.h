@@ -16,6 +16,7 @@ enum class Audience {
     trusted,    ///< root and the trusted group
     writers,    ///< whom polkit lets change the host; without polkit root and the trusted group
     stoppers,   ///< the same for what stops the host
+    planners,   ///< the same for who lets the host try a change out
 };
 
 /// The one place where is judged who may. Root may everything, and so may the user the service runs as. The
@@ -37,6 +38,8 @@ public:
     /// @param group by its name; there need be none
     void setTrustedGroup(const std::string& group);
     bool isTrusted(const Caller& caller) const;
+    /// Root, or the user that the service runs as.
+    static bool isOwn(const Caller& caller);
     /// Decides at once, or when polkit has; polkit may ask the user first, who can take his time.
     void ask(const Caller& caller, const Question& question, Decided decided);
     /// "polkit", or "group" where it was not there when somebody last looked.

@@ -5,10 +5,12 @@
 
 #include <algorithm>
 #include <csignal>
+#include <cstdlib>
 #include <optional>
 
 #include "agent/change/in_force.h"
 #include "agent/core/catalogue_file.h"
+#include "agent/core/data_directory.h"
 #include "agent/core/plugin_files.h"
 #include "agent/core/process.h"
 #include "agent/core/signals.h"
@@ -79,6 +81,20 @@ AgentSettings agentSettings(const PreparedProcess& process, const Options& optio
     return settings;
 }
 
+/// The unit's sandbox makes no namespaces: there the manager starts another one when it is asked.
+change::RehearsalSettings rehearsalSettings(const Agent& agent, const Options& options,
+                                            const Manager& manager) {
+    constexpr const char* kPlanSocket = "/run/corvista/plan";
+    change::RehearsalSettings settings;
+    settings.plugins = agent.plugins();
+    const char* data = std::getenv(kDataVariable);
+    settings.dataDirectory = data != nullptr ? data : "";
+    settings.hostTools = options.hostTools;
+    settings.commands = options.commands;
+    settings.socket = manager.isThere() ? kPlanSocket : "";
+    return settings;
+}
+
 void showErrors(ErrorLines& errors) {
     const ErrorLines::Taken taken = errors.take();
     for (const std::string& text : taken.texts) {
@@ -96,7 +112,8 @@ public:
         : options_(options), manager_(manager), connection_(connection), errors_(errors) {}
 
     void run(Agent& agent, const Config& config, const Past& past, const LinkIndices& linksBefore) {
-        Service service(loop_, connection_, agent, config, Past::read, past.last());
+        Service service(loop_, connection_, agent, config, rehearsalSettings(agent, options_, manager_),
+                        Past::read, past.last());
         service_ = &service;
         sd_bus_attach_event(connection_.get(), loop_.get(), SD_EVENT_PRIORITY_NORMAL);
         signals_ = loop_.whenReadable(stop_.descriptor(), [this] { takeSignals(); });

@@ -61,4 +61,12 @@ void log(Priority priority, const std::string& text, const std::vector<LogField>
     [[maybe_unused]] const ssize_t written = write(messageDescriptor(), whole.data(), whole.size());
 }
 
+void noteWrite(Priority priority, const Deed& deed, const std::string& text, const std::string& verdict) {
+    log(priority, text,
+        {{"CORVISTA_NODE", deed.node},
+         {"CORVISTA_PROPERTY", deed.property},
+         {"CORVISTA_CALLER_UID", std::to_string(deed.user)},
+         {"CORVISTA_VERDICT", verdict}});
+}
+
 }  // namespace cvagent::service

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstdint>
 #include <string>
 #include <utility>
 #include <vector>
@@ -17,5 +18,14 @@ void findJournal();
 /// One line for whoever looks after the service: into the journal with its fields, else on standard error.
 /// Any thread.
 void log(Priority priority, const std::string& text, const std::vector<LogField>& fields = {});
+
+/// A write, as the log's fields have it.
+struct Deed {
+    std::string node;
+    std::string property;
+    std::uint32_t user = 0;
+};
+/// What became of it, or was not let become.
+void noteWrite(Priority priority, const Deed& deed, const std::string& text, const std::string& verdict);
 
 }  // namespace cvagent::service

@@ -12,6 +12,7 @@ class Manager {
 public:
     Manager();
 
+    bool isThere() const { return !socket_.empty(); }
     void ready() const { tell("READY=1"); }
     /// What the service does now, for people.
     void status(const std::string& text) const { tell("STATUS=" + text); }

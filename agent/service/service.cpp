@@ -16,6 +16,9 @@ namespace {
 // Most of a read is waiting for the host's tools; one write at a time is the agent's rule anyway.
 constexpr Workers::Limits kReaders{8, 128, 512};
 constexpr Workers::Limits kWriters{1, 16, 64};
+// A plan is a walk over the host; and each of these may hold a long list of changes.
+constexpr Workers::Limits kPlanners{1, 16, 64};
+constexpr Workers::Limits kLookups{1, 8, 32};
 constexpr std::chrono::seconds kBusTime{10};
 
 bus::Message busCall(const bus::Connection& connection, const std::string& member) {
@@ -40,7 +43,7 @@ std::string whoServes(const bus::Connection& connection) {
 }
 
 Service::Service(Loop& loop, bus::Connection& connection, Agent& agent, const Config& config,
-                 EventSource past, std::uint64_t lastEvent)
+                 change::RehearsalSettings rehearsal, EventSource past, std::uint64_t lastEvent)
     : loop_(loop),
       connection_(connection),
       agent_(agent),
@@ -56,18 +59,25 @@ Service::Service(Loop& loop, bus::Connection& connection, Agent& agent, const Co
       turns_(connection, loop),
       readers_(kReaders),
       writers_(kWriters),
-      parts_{connection, agent,    model_,   callers_,       consent_,
-             turns_,     readers_, writers_, loop.mailbox(), std::move(past)},
+      planners_(kPlanners),
+      lookups_(kLookups),
+      parts_{connection,     agent,    model_,    callers_, consent_,       turns_,
+             readers_,       writers_, planners_, lookups_, loop.mailbox(), std::move(rehearsal),
+             std::move(past)},
       objects_(parts_, standing_) {
+    parts_.rehearsal.goesOn = [this] { return !ends_; };
     standing_.version = CORVISTA_VERSION;
     standing_.lastEvent = lastEvent;
     configure(config);
 }
 
-/// What comes back from other threads would find nothing of this any more.
+/// What comes back from other threads would find nothing of this any more, and they nothing of the parts.
 Service::~Service() {
     windDown();
     loop_.mailbox()->close();
+    for (Workers* workers : {&lookups_, &planners_, &readers_, &writers_}) {
+        workers->end();
+    }
 }
 
 void Service::begin(const LinkIndices& linksBefore) {
@@ -145,7 +155,10 @@ void Service::windDown() {
     nextLook_.reset();
     hostWatch_.reset();
     looker_.stop();
+    ends_ = true;
     readers_.stop();
+    planners_.stop();
+    lookups_.stop();
 }
 
 }  // namespace cvagent::service

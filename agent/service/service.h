@@ -1,5 +1,6 @@
 #pragma once
 
+#include <atomic>
 #include <functional>
 #include <memory>
 #include <optional>
@@ -20,8 +21,9 @@ public:
     /// All outlive it.
     /// @param past      what happened before; null where nothing is kept
     /// @param lastEvent its last number
+    /// @param rehearsal how changes are tried out
     Service(Loop& loop, bus::Connection& connection, Agent& agent, const Config& config,
-            EventSource past = nullptr, std::uint64_t lastEvent = 0);
+            change::RehearsalSettings rehearsal, EventSource past = nullptr, std::uint64_t lastEvent = 0);
     Service(const Service&) = delete;
     Service& operator=(const Service&) = delete;
     /// What is under way is waited for.
@@ -55,7 +57,10 @@ private:
     Looker looker_;
     Turns turns_;
     Workers readers_;
+    std::atomic<bool> ends_ = false;  // read by those below
     Workers writers_;
+    Workers planners_;
+    Workers lookups_;
     Parts parts_;
     Objects objects_;
     std::shared_ptr<Subscription> events_;

@@ -19,6 +19,12 @@ std::optional<std::string> nameOfUser(uid_t user) {
     return found != nullptr ? std::optional<std::string>(found->pw_name) : std::nullopt;
 }
 
+std::string userText(uid_t user) {
+    const std::string id = "uid " + std::to_string(user);
+    const std::optional<std::string> name = nameOfUser(user);
+    return name ? *name + " (" + id + ")" : id;
+}
+
 std::optional<gid_t> groupNamed(const std::string& name) {
     std::string texts(kEntrySize, '\0');
     struct group entry {};

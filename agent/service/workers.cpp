@@ -6,9 +6,15 @@
 namespace cvagent::service {
 
 Workers::~Workers() {
+    end();
+}
+
+void Workers::end() {
     stop();
     for (std::thread& thread : threads_) {
-        thread.join();
+        if (thread.joinable()) {
+            thread.join();
+        }
     }
 }
 

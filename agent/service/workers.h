@@ -25,13 +25,15 @@ public:
     explicit Workers(const Limits& limits) : limits_(limits) {}
     Workers(const Workers&) = delete;
     Workers& operator=(const Workers&) = delete;
-    /// Jobs that have not begun never do; those at work are waited for.
+    /// As end().
     ~Workers();
 
     /// @return false when too many wait already, and nothing is done
     bool submit(std::uint32_t user, Job job);
     /// No further job begins.
     void stop();
+    /// Jobs that have not begun never do; those at work are waited for.
+    void end();
     /// Whether one is at work or waits.
     bool isBusy() const;
 

@@ -14,9 +14,6 @@ namespace cvagent::service {
 
 namespace {
 
-/// As long as a person waits for a host to change; one that waits its turn that long is told so.
-constexpr std::chrono::seconds kWriteTime{150};
-
 /// In the order of WriteResult::Outcome.
 constexpr std::array kVerdicts = {"applied", "differs", "unknown"};
 
@@ -27,21 +24,8 @@ struct Wish {
     Caller caller;
 
     std::string target() const { return node->getPath() + " " + row.name; }
+    Deed deed() const { return {node->getPath(), row.name, caller.user}; }
 };
-
-std::string userName(std::uint32_t user) {
-    const std::string id = "uid " + std::to_string(user);
-    const std::optional<std::string> name = nameOfUser(user);
-    return name ? *name + " (" + id + ")" : id;
-}
-
-void note(Priority priority, const Wish& wish, const std::string& what, const std::string& verdict) {
-    log(priority, what,
-        {{"CORVISTA_NODE", wish.node->getPath()},
-         {"CORVISTA_PROPERTY", wish.row.name},
-         {"CORVISTA_CALLER_UID", std::to_string(wish.caller.user)},
-         {"CORVISTA_VERDICT", verdict}});
-}
 
 void answerWrite(const PendingCall& call, const WriteResult& result, const std::vector<std::string>& errors) {
     if (result.problem) {
@@ -57,7 +41,7 @@ void answerWrite(const PendingCall& call, const WriteResult& result, const std::
 
 /// On a thread of its own, since a host can take its time.
 void perform(const CallPointer& call, const Wish& wish, Request::Clock::time_point until) {
-    const std::string who = userName(wish.caller.user);
+    const std::string who = userText(wish.caller.user);
     const Request request(who, until);
     WriteResult result;
     try {
@@ -66,10 +50,10 @@ void perform(const CallPointer& call, const Wish& wish, Request::Clock::time_poi
         result.problem = problem;
     }
     const std::vector<std::string> errors = request.errors().take().texts;
-    const std::string verdict = result.problem ? "failed" : kVerdicts.at(result.outcome);
-    note(Priority::notice, wish,
-         who + " wrote " + wish.target() + ": " + (result.problem ? result.problem->what() : verdict),
-         verdict);
+    const char* verdict = result.problem ? "failed" : kVerdicts.at(result.outcome);
+    noteWrite(Priority::notice, wish.deed(),
+              who + " wrote " + wish.target() + ": " + (result.problem ? result.problem->what() : verdict),
+              verdict);
     call->parts().mailbox->post([call, result, errors, id = wish.node->getNodeId()] {
         call->guarded([&] {
             if (!result.after.failed()) {
@@ -87,10 +71,10 @@ void decide(const CallPointer& call, const Wish& wish) {
     call->parts().consent.ask(wish.caller, question, [call, wish](bool allowed, const std::string& reason) {
         call->guarded([&] {
             if (!allowed) {
-                note(Priority::warning, wish,
-                     "uid " + std::to_string(wish.caller.user) + " may not write " + wish.target() + ": " +
-                         reason,
-                     "denied");
+                noteWrite(Priority::warning, wish.deed(),
+                          "uid " + std::to_string(wish.caller.user) + " may not write " + wish.target() +
+                              ": " + reason,
+                          "denied");
                 throw bus::Error(bus::kAccessDenied, "you may not write this: " + reason);
             }
             const auto until = Request::Clock::now() + kWriteTime;

@@ -2,6 +2,10 @@
 #include "agent/change/plan.h"
 
 #include <gmock/gmock.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cstdlib>
 
 #include "agent/change/base64.h"
 
@@ -75,6 +79,19 @@ TEST(Plan, ShowsEverybodyNothingThatNotEverybodyMayRead) {
     EXPECT_TRUE(shown.files[1].before->withheld);
     EXPECT_TRUE(shown.files[1].after->withheld);
     EXPECT_EQ(shown.files[2].after->content, "");
+}
+
+/// The file's own mode means nothing where nobody gets to it.
+TEST(Plan, ShowsEverybodyNothingBelowAClosedDirectory) {
+    std::string place = testing::TempDir() + "/planXXXXXX";
+    ASSERT_NE(mkdtemp(place.data()), nullptr);
+    Plan plan;
+    const FileState open{FileState::Type::file, "secret", 0644, 0, 0, false};
+    plan.files = {{place + "/below/file", open, open}};
+    EXPECT_EQ(toJson(withoutSecrets(plan)).find("secret"), std::string::npos);
+    chmod(place.c_str(), 0755);
+    EXPECT_NE(toJson(withoutSecrets(plan)).find("secret"), std::string::npos);
+    rmdir(place.c_str());
 }
 
 TEST(Base64, IsThatOfEverybody) {

@@ -111,7 +111,7 @@ HOST_TEST(ServiceClient, ExportsAndComparesAsAnAgentOfItsOwnDoes) {
                CORVISTA_PLUGIN_FILE);
 }
 
-HOST_TEST(ServiceClient, AppliesAFileWriteByWrite) {
+HOST_TEST(ServiceClient, AppliesAFile) {
     ServiceRun run(host);
     run.start();
     host.file("/root/changes",
@@ -392,6 +392,69 @@ HOST_TEST(ServiceClient, TellsWhatFailsInTheService) {
         EXPECT_EQ(run.status, status) << name;
         EXPECT_THAT(run.err, HasSubstr("no\\x1b[2J")) << name;
     }
+}
+
+/// As a service answered that was made before it could make plans and several changes as one.
+void answerAsBefore(bus::Connection& own, const bus::Message& call) {
+    constexpr std::uint32_t kComputerType = 40;
+    const bus::Message reply = call.reply();
+    bus::Writer writer(reply);
+    const auto reading = [&writer](const char* value) {
+        writer.structure("uyvtus", [&] {
+            writer.put(std::uint32_t{115}).put(std::uint8_t{2}).variant("s", [&] { writer.put(value); });
+            writer.put(std::uint64_t{1}).put(std::uint32_t{0}).put("");
+        });
+    };
+    if (call.member() == "Find") {
+        writer.structure("uuuuosssu", [&] {
+            writer.put(std::uint32_t{3}).put(std::uint32_t{2}).put(kComputerType).put(std::uint32_t{0});
+            writer.putPath("/a").put("computer").put("/oshw/root/computer").put("Computer");
+            writer.put(std::uint32_t{1});
+        });
+    } else if (call.member() == "Read") {
+        writer.array("(uyvtus)", [&] { reading("old"); });
+        writer.put(std::vector<std::string>());
+    } else if (call.member() == "Write") {
+        reading("old");
+        reading("room 4");
+        writer.put("applied").put(false).put("").put(std::vector<std::string>());
+    } else {
+        own.send(call.errorReply(bus::kUnknownMethod, "no such method"));
+        return;
+    }
+    own.send(reply);
+}
+
+HOST_TEST(ServiceClient, ChangesByItselfThroughAServiceThatIsOlder) {
+    Impostor other(host, 0);
+    other.answer(answerAsBefore);
+    const std::string told = "cvagent: the service is older than this cvagent";
+    host.file("/root/changes", R"([{"node": "computer", "property": "OwnerContact", "value": "room 4"}])");
+    const Finished set = host.run(asking({"set", "computer", "OwnerContact", "room 4"}, Impostor::kAddress));
+    EXPECT_EQ(set.status, 0) << set.err;
+    EXPECT_EQ(set.err, told + ": the changes are made by single writes\n");
+    EXPECT_THAT(set.out, HasSubstr("    old  old\n    new  room 4\n"));
+    const Finished apply = host.run(asking({"apply", "/root/changes", "--json"}, Impostor::kAddress));
+    EXPECT_THAT(apply.err, StartsWith(told + ": the changes are made by single writes\n"));
+    EXPECT_THAT(apply.out, HasSubstr("OwnerContact"));
+    const Finished plan = host.run(asking({"plan", "/root/changes"}, Impostor::kAddress));
+    EXPECT_THAT(plan.err, StartsWith(told + " and makes no plans\n"));
+}
+
+/// Who may not have the service's plan gets one of his own, as far as he can see.
+HOST_TEST(ServiceClient, PlansByItselfForWhomTheServiceDoesNot) {
+    ServiceRun run(host);
+    run.start();
+    if (call::asUser(12345, {}, [] { return std::string("yes"); }) != "yes") {
+        GTEST_SKIP() << "there is no other user";
+    }
+    EXPECT_THAT(asAlice(asking({"plan", "computer", "OwnerContact", "x"})),
+                StartsWith("cvagent: the service does not let you have its plan: you may not plan "
+                           "this: without polkit this is for root and the group corvista\n"
+                           "cvagent: the plan is made as this user: "));
+    EXPECT_THAT(asAlice(asking({"set", "computer", "OwnerContact", "x"})),
+                StartsWith("cvagent: the service does not allow it: you may not apply this: "));
+    EXPECT_EQ(run.diary().find('='), std::string::npos);
 }
 
 HOST_TEST(ServiceClient, AWriteWhoseServiceEndsBeforeIsNotMadeAtAll) {

@@ -84,6 +84,29 @@ protected:
         return "written";
     }
 
+    /// "planned", "made", or the name of the error.
+    static std::string changeOnce(const char* member, const std::string& property = "OwnerContact",
+                                  const std::string& value = "mine", bool interactive = false) {
+        bus::Connection own(ServiceRun::address());
+        bus::Message message =
+            call::make(own, ServiceRun::kRoot, call::kAgent, member, [&](bus::Writer& writer) {
+                writer.array("(ssv)", [&] {
+                    writer.structure("ssv", [&] {
+                        writer.put("computer").put(property);
+                        writer.variant("s", [&] { writer.put(value); });
+                    });
+                });
+                if (member == std::string("Apply")) {
+                    writer.array("{sv}", [] {});
+                }
+            });
+        if (interactive) {
+            message.allowInteraction();
+        }
+        own.ask(message, std::chrono::seconds(60));
+        return member == std::string("Plan") ? "planned" : "made";
+    }
+
     std::optional<ServiceRun> run;
 };
 
@@ -136,6 +159,48 @@ HOST_TEST_F(ServiceConsent, IsPolkitsWhereThereIsOne) {
     EXPECT_THAT(polkit.questions[2], HasSubstr("com.vantrel.corvista1.power "));
     EXPECT_THAT(polkit.questions[2], testing::EndsWith(" 1"));
     EXPECT_EQ(run->diary().find("123="), std::string::npos);
+}
+
+HOST_TEST_F(ServiceConsent, ToPlansAndChangesIsRootsAndTheGroupsWithoutPolkit) {
+    for (const char* member : {"Plan", "Apply"}) {
+        EXPECT_EQ(call::asUser(kUser, {}, [&] { return changeOnce(member); }), kDenied);
+    }
+    EXPECT_EQ(run->diary().find('='), std::string::npos);
+    EXPECT_THAT(run->program().err(), HasSubstr("uid 12345 may not plan /oshw/root/computer OwnerContact: "
+                                                "without polkit this is for root"));
+    EXPECT_THAT(run->program().err(), HasSubstr("uid 12345 may not apply /oshw/root/computer OwnerContact"));
+    EXPECT_EQ(call::asUser(kUser, kGroup, [] { return changeOnce("Plan"); }), "planned");
+    EXPECT_EQ(call::asUser(kUser, kGroup, [] { return changeOnce("Apply"); }), "made");
+    EXPECT_THAT(run->diary(), HasSubstr("115=mine\n"));
+}
+
+/// Each has its question; what stops the host its own; nothing is done before the answer.
+HOST_TEST_F(ServiceConsent, ToPlansAndChangesIsPolkitsWhereThereIsOne) {
+    Polkit polkit;
+    polkit.answers = false;
+    const auto asked = [&](const std::function<std::string()>& question, bool yes) {
+        polkit.answers = false;
+        polkit.yes = yes;
+        const std::size_t before = polkit.questions.size();
+        return call::asUserBeside(kUser, question, [&] {
+            polkit.process();
+            polkit.answers = polkit.answers || polkit.questions.size() > before;
+        });
+    };
+    for (const bool yes : {false, true}) {
+        EXPECT_EQ(asked([] { return changeOnce("Plan"); }, yes), yes ? "planned" : kDenied);
+        EXPECT_EQ(run->diary().find('='), std::string::npos);
+        EXPECT_EQ(asked([&] { return changeOnce("Apply", "OwnerContact", "x", true); }, yes),
+                  yes ? "made" : kDenied);
+    }
+    EXPECT_EQ(asked([] { return changeOnce("Apply", "PowerAction", "9"); }, false), kDenied);
+    EXPECT_EQ(run->diary().find("123="), std::string::npos);
+    ASSERT_EQ(polkit.questions.size(), 5U);
+    EXPECT_THAT(polkit.questions[0], testing::StartsWith("com.vantrel.corvista1.plan system-bus-name name="));
+    EXPECT_THAT(polkit.questions[0], testing::EndsWith(" 0"));
+    EXPECT_THAT(polkit.questions[1], testing::StartsWith("com.vantrel.corvista1.write "));
+    EXPECT_THAT(polkit.questions[1], testing::EndsWith(" 1"));
+    EXPECT_THAT(polkit.questions[4], testing::StartsWith("com.vantrel.corvista1.power "));
 }
 
 /// Polkit may take its time, as a user does: meanwhile everybody else is answered, and nothing is done.

@@ -3,6 +3,7 @@ if(CORVISTA_SERVICE)
   corvista_test(service LIBRARIES agent_service agent_core agent_bus test_support LABELS threads SOURCES
     service/attack_test.cpp
     service/bus_test.cpp
+    service/change_calls_test.cpp
     service/config_test.cpp
     service/consent_test.cpp
     service/host_links_test.cpp
@@ -17,7 +18,7 @@ if(CORVISTA_SERVICE)
   target_compile_definitions(service_test PRIVATE ${agent_test_programs} CVAGENTD_PROGRAM="$<TARGET_FILE:cvagentd>"
     HARDWARE_FILE="$<TARGET_FILE:corvistahardware>" INTERFACE_FILE="${CMAKE_SOURCE_DIR}/packaging/com.vantrel.Corvista1.xml"
     PACKAGING_DIR="${CMAKE_SOURCE_DIR}/packaging")
-  add_dependencies(service_test cvagent cvagentd fake_plugin corvistahardware tiny_front_end)
+  add_dependencies(service_test cvagent cvagentd corvista-hosttools corvista-rehearsal fake_plugin corvistahardware tiny_front_end vantrelcvicoshwmi)
 
   # With polkit itself, and with one that asks.
   foreach(kind polkitd dbusmock)
@@ -48,5 +49,5 @@ if(CORVISTA_SERVICE)
     service/service_run.cpp)
   target_compile_definitions(service_client_test PRIVATE ${agent_test_programs} CVAGENTD_PROGRAM="$<TARGET_FILE:cvagentd>"
     HARDWARE_FILE="$<TARGET_FILE:corvistahardware>")
-  add_dependencies(service_client_test cvagent cvagentd fake_plugin corvistahardware vantrelcvicoshwmi)
+  add_dependencies(service_client_test cvagent cvagentd corvista-rehearsal fake_plugin corvistahardware vantrelcvicoshwmi)
 endif()

@@ -69,14 +69,14 @@ std::string joined(const std::vector<std::string>& words) {
     return text.empty() ? "(empty)" : text;
 }
 
-std::string driftText(const MeantChange& change, const Found& found) {
+std::string driftText(const change::MeantChange& change, const change::Found& found) {
     return printable(change.target()) + "\n    file  " + joined(change.words) + "\n    host  " +
            (found.reading.failed() ? printable(found.reading.complaint())
                                    : valueText(change.row, found.reading.value)) +
            "\n          " + printable(found.standing.reason) + "\n";
 }
 
-Json driftJson(const MeantChange& change, const Found& found) {
+Json driftJson(const change::MeantChange& change, const change::Found& found) {
     return {{"path", change.node->getPath()},
             {"property", {{"id", change.row->id}, {"name", change.row->name}}},
             {"file", static_cast<std::string>(change.value)},
@@ -111,9 +111,9 @@ ExitStatus diff(Session& session, const Options& options) {
     const Request request = ownRequest();
     std::string text;
     Json list = Json::array();
-    const std::vector<MeantChange> changes = meantChanges(session, options);
-    for (const MeantChange& change : changes) {
-        const Found found = findNow(session, change, request);
+    const std::vector<change::MeantChange> changes = meantChanges(session, options);
+    for (const change::MeantChange& change : changes) {
+        const change::Found found = change::findNow(session, change, request);
         if (change::isDeed(*change.row)) {
             complain(printable(change.target()) + " is done, not kept: it is not compared");
         } else if (found.standing.outcome != WriteResult::applied) {

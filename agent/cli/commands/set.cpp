@@ -4,14 +4,14 @@
 #include "agent/cli/changes.h"
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/json.h"
-#include "agent/cli/outcomes.h"
 #include "agent/cli/print.h"
-#include "agent/cli/prompt.h"
-#include "agent/core/property_words.h"
 
 namespace cvagent::commands {
 
 namespace {
+
+using change::MeantChange;
+using change::Outcome;
 
 std::string shown(const Reading& reading) {
     return reading.failed() ? printable(reading.complaint()) : valueText(reading.row, reading.value);
@@ -35,45 +35,84 @@ bool isDone(const WriteResult& result, const Property& row) {
     return result.lacking.empty() && !result.complained && !result.after.timedOut;
 }
 
-}  // namespace
+/// Whether it is so as long as was asked for.
+bool isKept(const MeantChange& change, const Outcome& outcome) {
+    if (outcome.kind == Outcome::differs) {
+        complain(printable(change.target()) + " differs: " + outcome.reason);
+    }
+    return outcome.kind != Outcome::differs;
+}
 
-namespace {
-
-/// Whether it stays so as long as was asked for.
-bool isKept(Session& session, const std::vector<MeantChange>& change, double seconds,
+bool isKept(Session& session, const std::vector<MeantChange>& changes, double seconds,
             const Request& request) {
     std::vector<Outcome> outcomes(1);
     outcomes.front().kind = Outcome::differs;
-    verifyWithin(session, change, outcomes, seconds, request);
-    if (outcomes.front().kind == Outcome::differs) {
-        complain(printable(change.front().target()) + " differs: " + outcomes.front().reason);
-    }
-    return outcomes.front().kind != Outcome::differs;
+    change::verifyWithin(session, changes, outcomes, seconds, request);
+    return isKept(changes.front(), outcomes.front());
 }
 
-}  // namespace
-
-ExitStatus set(Session& session, const Options& options) {
-    const NodeRef node = session.find(options.node);
-    const Property& row = writableRow(*node, options.property);
-    const IC::PropertyValue value = acceptedValue(row, options.values);
-    if (const Label* drastic = drasticLabel(row, value); drastic != nullptr && !options.yes) {
-        confirm(drastic->text);
-    }
-    const std::vector<MeantChange> change{{node, &row, options.values, value, ""}};
-    refuseUnlessForced(change, objectionsTo(change), options.force);
-    const Request request(callerName());
-    const WriteResult result = session.write(node, row, options.values, request);
-    session.showErrors(request);
+void tell(Session& session, const MeantChange& change, const WriteResult& result, bool json) {
     std::ranges::for_each(result.notes, [](const std::string& note) { complain(printable(note)); });
     session.tellMissingTools({result.after});
     if (result.problem) {
         throw Problem(*result.problem);
     }
-    print(options.json ? json::change(*node, row.readable ? result.before : result.after, result.after)
-                       : report(*node, result, row.readable, Style::detect()));
-    const bool isSo = !options.verifySeconds || isKept(session, change, *options.verifySeconds, request);
-    return isSo && isDone(result, row) ? ExitStatus::done : ExitStatus::failed;
+    const bool isReadable = change.row->readable;
+    print(json ? json::change(*change.node, isReadable ? result.before : result.after, result.after)
+               : report(*change.node, result, isReadable, Style::detect()));
+}
+
+/// What the write itself came to; a look since then has the last word.
+WriteResult resultOf(const Outcome& outcome) {
+    WriteResult result;
+    result.before = outcome.before;
+    result.after = outcome.after;
+    result.outcome = outcome.kind == Outcome::applied   ? WriteResult::applied
+                     : outcome.kind == Outcome::differs ? WriteResult::differs
+                                                        : WriteResult::notKnown;
+    result.complained = outcome.complained;
+    result.lacking = outcome.lacking;
+    result.notes = outcome.notes;
+    result.problem = outcome.problem;
+    return result;
+}
+
+void refuseUnlessForced(const std::vector<MeantChange>& changes, bool force) {
+    change::Proposal proposal;
+    proposal.changes = changes;
+    proposal.objections = change::objectionsTo(changes);
+    if (!force) {
+        change::refuse(proposal);
+    } else if (!proposal.objections.empty()) {
+        complain("done all the same: " + change::objectionsText(proposal));
+    }
+}
+
+ExitStatus setHere(Session& session, const std::vector<MeantChange>& changes, const Options& options) {
+    const MeantChange& change = changes.front();
+    refuseUnlessForced(changes, options.force);
+    const Request request(callerName());
+    const WriteResult result = session.write(change.node, *change.row, change.words, request);
+    session.showErrors(request);
+    tell(session, change, result, options.json);
+    const bool isSo = !options.verifySeconds || isKept(session, changes, *options.verifySeconds, request);
+    return isSo && isDone(result, *change.row) ? ExitStatus::done : ExitStatus::failed;
+}
+
+}  // namespace
+
+ExitStatus set(Session& session, const Options& options) {
+    const std::vector<MeantChange> changes = meantChanges(session, options);
+    confirmDrastic(changes, options);
+    const auto outcomes =
+        options.byService ? session.apply(changes, {options.force, true, options.verifySeconds}) : nullptr;
+    if (!outcomes) {
+        return setHere(session, changes, options);
+    }
+    const WriteResult result = resultOf(outcomes->front());
+    tell(session, changes.front(), result, options.json);
+    const bool isSo = !options.verifySeconds || isKept(changes.front(), outcomes->front());
+    return isSo && isDone(result, *changes.front().row) ? ExitStatus::done : ExitStatus::failed;
 }
 
 }  // namespace cvagent::commands

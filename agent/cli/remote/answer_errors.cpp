@@ -28,8 +28,22 @@ constexpr std::array kGone = {"org.freedesktop.DBus.Error.NoReply", bus::kServic
                               bus::kNameHasNoOwner, "org.freedesktop.DBus.Error.Disconnected"};
 
 Problem::Subject subjectOf(const std::string& name) {
-    return name == "node" ? Problem::node : name == "property" ? Problem::property : Problem::none;
+    return name == "node"       ? Problem::node
+           : name == "property" ? Problem::property
+           : name == "plan"     ? Problem::plan
+           : name == "force"    ? Problem::objection
+                                : Problem::none;
 }
+
+}  // namespace
+
+Problem::Kind kindNamed(const std::string& name) {
+    const auto row =
+        std::ranges::find_if(kKinds, [&name](const KindName& kind) { return name == kind.name; });
+    return row == std::end(kKinds) ? Problem::failed : row->kind;
+}
+
+namespace {
 
 /// What stands behind the message; a service that has nothing more to say leaves it out.
 [[noreturn]] void throwProblem(const bus::Message& answer, Problem::Kind kind) {
@@ -54,9 +68,7 @@ bool throwAnswer(const bus::Message& answer) {
     const bus::Error error = answer.error();
     const std::string prefix = service::kErrorPrefix;
     if (error.name().starts_with(prefix)) {
-        const auto row = std::ranges::find_if(
-            kKinds, [&](const KindName& kind) { return error.name() == prefix + kind.name; });
-        throwProblem(answer, row == std::end(kKinds) ? Problem::failed : row->kind);
+        throwProblem(answer, kindNamed(error.name().substr(prefix.size())));
     }
     if (isOneOf(kUnknown, error.name())) {
         return false;

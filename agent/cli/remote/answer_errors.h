@@ -21,6 +21,8 @@ private:
     std::vector<std::string> errors_;
 };
 
+/// The kind that the last part of an error's name stands for; failed for one that is not known.
+Problem::Kind kindNamed(const std::string& name);
 /// What an error in place of an answer stands for: throws ServiceProblem, Failure or ServiceGone.
 /// @return false for an error of a service that does not know the call
 bool throwAnswer(const bus::Message& answer);

@@ -133,6 +133,12 @@ bus::Message Client::ask(const bus::Message& call, Seconds longest) {
 }
 
 bus::Message Client::askForLong(const bus::Message& call) {
+    bus::Message answer = waitForLong(call);
+    checkAnswer(answer);
+    return answer;
+}
+
+bus::Message Client::waitForLong(const bus::Message& call) {
     constexpr std::chrono::hours kForEver{24 * 365};
     bus::Message answer;
     const bus::Slot waiting =
@@ -145,7 +151,6 @@ bus::Message Client::askForLong(const bus::Message& call) {
             ask(connection_.newCall({owner_, service::kRootObject, kPeer, "Ping"}), kShort);
         }
     }
-    checkAnswer(answer);
     return answer;
 }
 

@@ -55,6 +55,9 @@ public:
     bus::Message ask(const bus::Message& call, Seconds longest);
     /// The same for what may take any time, as long as the service is alive.
     bus::Message askForLong(const bus::Message& call);
+    /// The same with the error as an answer.
+    bus::Message waitForLong(const bus::Message& call);
+    void checkAnswer(const bus::Message& answer);
     // Properties of the agent's interface.
     std::string textProperty(const std::string& name);
     std::uint64_t numberProperty(const std::string& name);
@@ -82,7 +85,6 @@ private:
     bus::Message askBus(const char* member, const std::string& name);
     bus::Message propertyCall(const std::string& name) const;
     bus::Message answerTo(const bus::Message& call, Seconds longest);
-    void checkAnswer(const bus::Message& answer);
 
     bus::Connection connection_;
     int stop_;

@@ -96,17 +96,12 @@ std::vector<Reading> RemoteSession::read(const NodeRef& node, const std::vector<
     return readings;
 }
 
-/// A text goes as it was typed, for the service judges it once more.
 bus::Message RemoteSession::writeCall(const NodeRef& node, const Property& row,
                                       const std::vector<std::string>& words) {
     bus::Message call = client_->call("Write");
     bus::Writer writer(call);
     writer.put(std::uint32_t{node->getNodeId()}).put(std::uint32_t{row.id});
-    if (words.size() == 1) {
-        writer.variant("s", [&] { writer.put(words.front()); });
-    } else {
-        writer.variant("as", [&] { writer.put(words); });
-    }
+    putWords(writer, words);
     if (asksPerson_) {
         call.allowInteraction();
     }

@@ -26,6 +26,9 @@ public:
                               const Request& request) override;
     WriteResult write(const NodeRef& node, const Property& row, const std::vector<std::string>& words,
                       const Request& request) override;
+    std::unique_ptr<change::Preview> preview(const std::vector<change::MeantChange>& changes) override;
+    std::unique_ptr<std::vector<change::Outcome>> apply(const std::vector<change::MeantChange>& changes,
+                                                        const ApplyOptions& options) override;
     std::shared_ptr<Subscription> subscribe(std::optional<Event::Kind> only) override;
     /// The marks are beside the history, and only whose service it is has that before him.
     std::shared_ptr<ShownMarks> marks() override;
@@ -41,6 +44,7 @@ public:
 
 private:
     void learnClasses(const std::vector<NodeCopy>& nodes);
+    bus::Message changesCall(const char* member, const std::vector<change::MeantChange>& changes);
     bus::Message writeCall(const NodeRef& node, const Property& row, const std::vector<std::string>& words);
 
     std::unique_ptr<Client> client_;

@@ -167,6 +167,14 @@ void findRows(std::vector<Reading>& readings, unsigned int nodeType) {
     }
 }
 
+void putWords(bus::Writer& writer, const std::vector<std::string>& words) {
+    if (words.size() == 1) {
+        writer.variant("s", [&] { writer.put(words.front()); });
+    } else {
+        writer.variant("as", [&] { writer.put(words); });
+    }
+}
+
 NumberedEvent takeEvent(bus::Reader& reader) {
     constexpr std::uint64_t kMicroseconds = 1000000;
     NumberedEvent taken;

@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "agent/bus/reader.h"
+#include "agent/bus/writer.h"
 #include "agent/core/event.h"
 #include "agent/core/node_copy.h"
 #include "agent/core/reading.h"
@@ -21,6 +22,9 @@ NodeCopy takeNode(bus::Reader& reader);
 std::vector<Reading> takeReadings(bus::Reader& reader);
 Reading takeReading(bus::Reader& reader);
 void findRows(std::vector<Reading>& readings, unsigned int nodeType);
+
+/// A value, as a person has typed it: the service judges it once more.
+void putWords(bus::Writer& writer, const std::vector<std::string>& words);
 
 /// An event of a kind that this program does not know has its number alone.
 struct NumberedEvent {
