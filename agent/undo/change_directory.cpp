@@ -2,7 +2,6 @@
 
 #include <dirent.h>
 #include <fcntl.h>
-#include <sys/file.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -61,6 +60,13 @@ Descriptor openChange(int place, unsigned number) {
     tried(opened.get(), "the change " + name);
     judge(opened.get(), "the change " + name);
     return opened;
+}
+
+struct flock wholeFile() {
+    struct flock all {};
+    all.l_type = F_WRLCK;
+    all.l_whence = SEEK_SET;
+    return all;
 }
 
 void removeChange(int place, unsigned number) {
@@ -137,7 +143,7 @@ std::optional<Journal> ChangeDirectory::journal() const {
 }
 
 Journal ChangeDirectory::update(const std::function<bool(Journal&)>& change) const {
-    const Descriptor alone = lock(kJournalLock, LOCK_EX);
+    const Descriptor alone = lock(kJournalLock, F_OFD_SETLKW);
     Journal now = journal().value_or(Journal{});
     if (change(now)) {
         write(kJournal, textOf(now));
@@ -159,15 +165,19 @@ void ChangeDirectory::save(const char* name, const SavedState& state) const {
 }
 
 Descriptor ChangeDirectory::take(const char* name) const {
-    return lock(name, LOCK_EX | LOCK_NB);
+    return lock(name, F_OFD_SETLK);
 }
 
 Descriptor ChangeDirectory::waitFor(const char* name) const {
-    return lock(name, LOCK_EX);
+    return lock(name, F_OFD_SETLKW);
 }
 
+/// Without taking it for a moment, which would turn away who comes then.
 bool ChangeDirectory::isTaken(const char* name) const {
-    return !take(name).isOpen();
+    const Descriptor file = openLock(name);
+    struct flock wanted = wholeFile();
+    tried(fcntl(file.get(), F_OFD_GETLK, &wanted), name);
+    return wanted.l_type != F_UNLCK;
 }
 
 std::optional<std::string> ChangeDirectory::read(const char* name) const {
@@ -206,11 +216,17 @@ void ChangeDirectory::write(const char* name, std::string_view text) const {
     tried(fsync(directory_.get()), name);
 }
 
-Descriptor ChangeDirectory::lock(const char* name, int how) const {
+Descriptor ChangeDirectory::openLock(const char* name) const {
     Descriptor file(openat(directory_.get(), name, O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600));
     tried(file.get(), name);
-    while (flock(file.get(), how) != 0) {
-        if (errno == EWOULDBLOCK) {
+    return file;
+}
+
+Descriptor ChangeDirectory::lock(const char* name, int how) const {
+    Descriptor file = openLock(name);
+    struct flock wanted = wholeFile();
+    while (fcntl(file.get(), how, &wanted) != 0) {
+        if (errno == EAGAIN || errno == EACCES) {
             return {};
         }
         if (errno != EINTR) {

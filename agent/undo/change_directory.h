@@ -61,6 +61,7 @@ private:
 
     std::optional<std::string> read(const char* name) const;
     void write(const char* name, std::string_view text) const;
+    hosttools::Descriptor openLock(const char* name) const;
     hosttools::Descriptor lock(const char* name, int how) const;
 
     hosttools::Descriptor directory_;

@@ -19,6 +19,7 @@ struct NumberPart {
 constexpr std::array kNumbers{
     NumberPart{"window", &Journal::window, kLongestWindow},
     NumberPart{"deadline", &Journal::deadline, UINT64_MAX},
+    NumberPart{"settling", &Journal::settling, kLongestWindow},
     NumberPart{"step", &Journal::step, UINT32_MAX},
     NumberPart{"steps", &Journal::steps, UINT32_MAX},
     NumberPart{"began", &Journal::began, UINT64_MAX},

@@ -27,7 +27,9 @@ struct Journal {
     std::string boot;            ///< which start of the host the deadline is of
     std::uint64_t window = 0;    ///< milliseconds for the confirmation; 0: nobody waits for one
     std::uint64_t deadline = 0;  ///< by the boot clock, in milliseconds
-    std::uint64_t step = 0;      ///< that has begun, from 1
+    /// Milliseconds for which a step may go on when who makes the change has died, for others do the work.
+    std::uint64_t settling = 0;
+    std::uint64_t step = 0;  ///< that has begun, from 1
     std::uint64_t steps = 0;
     std::uint64_t began = 0;  ///< seconds since 1970, for people
     std::string caller;

@@ -70,6 +70,7 @@ ChangeInMaking::ChangeInMaking(const MakingSettings& settings)
         journal.boot = before_.boot;
         journal.window = window_;
         journal.deadline = bootMilliseconds() + window_;
+        journal.settling = settings.settling;
         journal.steps = settings.steps;
         journal.began = static_cast<std::uint64_t>(std::time(nullptr));
         journal.caller = settings.caller;

@@ -10,7 +10,8 @@ struct MakingSettings {
     std::string summary;             ///< what is changed, in a line
     std::vector<std::string> paths;  ///< whole ones of all files that it may touch
     std::uint64_t steps = 0;
-    std::uint64_t window = 0;  ///< milliseconds for the confirmation; 0: nobody waits for one
+    std::uint64_t settling = 0;  ///< see Journal
+    std::uint64_t window = 0;    ///< milliseconds for the confirmation; 0: nobody waits for one
 };
 
 /// A change while it is made: everything that it touches is saved before its first step, and each step is

@@ -40,6 +40,15 @@ TakenBack takeSavedBack(const ChangeDirectory& change) {
     }
 }
 
+/// For now; what cannot be read is told in the end.
+void takeSavedBackAtOnce(const ChangeDirectory& change) {
+    try {
+        takeSavedBack(change);
+    } catch (const ChangeError&) {
+        return;
+    }
+}
+
 /// Marks it as to be taken back, unless it has come to its end meanwhile.
 Journal beginToTakeBack(const ChangeDirectory& change) {
     return change.update([](Journal& journal) {
@@ -60,16 +69,18 @@ Journal endWith(const ChangeDirectory& change, Stage stage, std::vector<std::str
 /// Who makes the change may be at a step still, which writes after all was put back. So that the host is back
 /// in time it is put back at once, and when he has ended once more.
 void takeBackFromMaker(const ChangeDirectory& change) {
-    if (change.isTaken(kStepLock) && !change.load("left")) {
+    const std::uint64_t settling = change.journal().value_or(Journal{}).settling;
+    if ((change.isTaken(kStepLock) || settling != 0) && !change.load("left")) {
         {
             const Descriptor alone = change.waitFor(kTakingLock);
             if (beginToTakeBack(change).stage != Stage::takingBack) {
                 return;
             }
-            takeSavedBack(change);
+            takeSavedBackAtOnce(change);
         }
-        const std::uint64_t end = bootMilliseconds() + kLongestStep;
-        while (change.isTaken(kStepLock) && bootMilliseconds() < end) {
+        const std::uint64_t begin = bootMilliseconds();
+        const auto isOver = [begin](std::uint64_t time) { return bootMilliseconds() - begin >= time; };
+        while (!isOver(settling) || (change.isTaken(kStepLock) && !isOver(kLongestStep))) {
             std::this_thread::sleep_for(kLook);
         }
     }

@@ -37,7 +37,7 @@ const std::map<std::string, std::set<std::string>> kMayInclude = {
      {"agent/service", "agent/bus", "agent/change", "agent/core", "agent/history", "agent/verify",
       "agent/shell", "framework"}},
     {"agent/cli",
-     {"agent/cli", "agent/core", "agent/bus", "agent/change", "agent/service", "agent/history",
+     {"agent/cli", "agent/core", "agent/bus", "agent/change", "agent/service", "agent/history", "agent/undo",
       "agent/verify", "agent/shell", "framework"}},
     {"hosttools", {"hosttools"}},
     {"plugins/hardware", {"plugins/hardware", "framework"}},

@@ -51,10 +51,13 @@ bool wasKilled(int status) {
 template <class Condition>
 bool comesTrue(Condition condition) {
     const std::uint64_t end = bootMilliseconds() + 60'000;
-    while (!condition() && bootMilliseconds() < end) {
+    while (bootMilliseconds() < end) {
+        if (condition()) {
+            return true;
+        }
         usleep(10'000);
     }
-    return condition();
+    return false;
 }
 
 class Guard : public HostFixture {
@@ -337,6 +340,30 @@ HOST_TEST_F(Guard, WaitsForACommandThatIsLeftBehind) {
     EXPECT_TRUE(comesTrue([&host] { return host.read("/etc/one") == "old one\n"; }));
     host.remove("/run/wait");
     waitpid(guard, nullptr, 0);
+    EXPECT_EQ(look(host), old_);
+    EXPECT_EQ(stage(), Stage::takenBack);
+}
+
+/// Who makes the change is killed, and the service that does its steps goes on.
+HOST_TEST_F(Guard, WaitsForAServiceThatGoesOn) {
+    MakingSettings ofService = settings();
+    ofService.settling = 1000;
+    const pid_t maker = fork();
+    if (maker == 0) {
+        ChangeInMaking making(ofService);
+        making.beginStep();
+        host.file("/etc/one", "new one\n");
+        _exit(0);
+    }
+    waitpid(maker, nullptr, 0);
+    const pid_t service = fork();
+    if (service == 0) {
+        comesTrue([&host] { return host.read("/etc/one") == "old one\n"; });
+        host.file("/etc/two", "late\n");
+        _exit(0);
+    }
+    guardChange(*newest());
+    waitpid(service, nullptr, 0);
     EXPECT_EQ(look(host), old_);
     EXPECT_EQ(stage(), Stage::takenBack);
 }
