@@ -8,6 +8,7 @@
 #include "agent/change/guarding.h"
 #include "agent/cli/caller.h"
 #include "agent/cli/print.h"
+#include "agent/core/host_file.h"
 
 namespace cvagent {
 
@@ -33,6 +34,14 @@ bool canCutOff(const MeantChange& change) {
            std::ranges::find(kCutOff, change.row->id) != std::end(kCutOff);
 }
 
+/// A shell gives each command that is typed a process group of its own, and none to those of a script.
+bool isTyped() {
+    const pid_t group = getpgrp();
+    const std::string leader = contentOf("/proc/" + std::to_string(group) + "/comm").value_or("");
+    const bool isLed = group == getppid() && (leader == "sudo\n" || leader == "doas\n");
+    return isatty(STDIN_FILENO) == 1 && (group == getpid() || isLed);
+}
+
 std::string summaryOf(const std::vector<MeantChange>& changes) {
     const std::string more =
         changes.size() == 1 ? "" : " and " + std::to_string(changes.size() - 1) + " more";
@@ -50,7 +59,7 @@ std::optional<double> confirmSeconds(const Options& options, const std::vector<M
     if (options.confirmSeconds) {
         return *options.confirmSeconds > 0 ? options.confirmSeconds : std::nullopt;
     }
-    const bool isPerson = isatty(STDIN_FILENO) == 1 && isatty(STDERR_FILENO) == 1 && geteuid() == 0;
+    const bool isPerson = geteuid() == 0 && isTyped();
     const bool isRisky = std::ranges::any_of(changes, canCutOff) && std::ranges::none_of(changes, stopsHost);
     return isPerson && isRisky ? std::optional(kUsualSeconds) : std::nullopt;
 }
