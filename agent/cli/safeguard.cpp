@@ -37,7 +37,7 @@ bool canCutOff(const MeantChange& change) {
 /// A shell gives each command that is typed a process group of its own, and none to those of a script.
 bool isTyped() {
     const pid_t group = getpgrp();
-    const std::string leader = contentOf("/proc/" + std::to_string(group) + "/comm").value_or("");
+    const std::string leader = cvagent::contentOf("/proc/" + std::to_string(group) + "/comm").value_or("");
     const bool isLed = group == getppid() && (leader == "sudo\n" || leader == "doas\n");
     return isatty(STDIN_FILENO) == 1 && (group == getpid() || isLed);
 }
