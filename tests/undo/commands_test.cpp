@@ -212,7 +212,7 @@ HOST_TEST_F(Confirmed, APersonAtATerminalIsGuardedUnasked) {
     EXPECT_EQ(cvagent(host, {"set", "ip-config:eth0", "IPv4Address", "203.0.113.9"}).status, 0);
     host.file("/root/script", "cvagent=$1; shift; \"$cvagent\" \"$@\"\n");
     const OnTerminal script =
-        runOnTerminal({"sh", "/root/script", CVAGENT_PROGRAM, "--plugin", CORVISTA_PLUGIN_FILE, "set",
+        runOnTerminal({"/bin/sh", "/root/script", CVAGENT_PROGRAM, "--plugin", CORVISTA_PLUGIN_FILE, "set",
                        "ip-config:eth0", "IPv4Address", "203.0.113.10"},
                       "");
     EXPECT_EQ(script.status, 0) << script.output;

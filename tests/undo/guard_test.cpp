@@ -30,6 +30,12 @@ using testing::IsEmpty;
 
 constexpr std::uint64_t kLong = 600'000;
 
+/// Before the fake host takes the environment away.
+const int kKills = [] {
+    const char* wanted = getenv("CORVISTA_UNDO_KILLS");
+    return wanted != nullptr ? std::atoi(wanted) : 20;
+}();
+
 /// Runs it in a process of its own. @return the status of waitpid
 template <class Body>
 int inChild(Body body) {
@@ -260,12 +266,11 @@ HOST_TEST_F(Guard, PutsFilesBackAfterTheNextStart) {
     EXPECT_GT(steps, 20);
 }
 
-/// Maker and guard are two programs here, and each is killed when it happens. CORVISTA_KILLS says how often.
+/// Maker and guard are two programs here, and each is killed when it happens. CORVISTA_UNDO_KILLS says how
+/// often.
 HOST_TEST_F(Guard, LeavesNothingHalfWhoeverIsKilled) {
-    const char* wanted = getenv("CORVISTA_KILLS");
-    const int kills = wanted != nullptr ? std::atoi(wanted) : 20;
     std::mt19937 random(std::random_device{}());
-    for (int i = 0; i < kills; ++i) {
+    for (int i = 0; i < kKills; ++i) {
         const pid_t maker = fork();
         if (maker == 0) {
             make(host, settings());
