@@ -29,22 +29,22 @@ namespace fs = std::filesystem;
 using undo::ChangeError;
 using Words = std::vector<std::string>;
 
-constexpr const char* kProgram = "corvista-guard";
-constexpr const char* kSettings = "/etc/sysconfig/network";
+constexpr const char* kGuardProgram = "corvista-guard";
+constexpr const char* kNetworkSettings = "/etc/sysconfig/network";
 constexpr std::chrono::seconds kLongestStart{10};
-constexpr std::chrono::milliseconds kLook{5};
+constexpr std::chrono::milliseconds kGuardLook{5};
 
 std::string findGuard() {
-    auto built = besideProgram({".", "../agent"}, kProgram);
-    auto found = built ? built : besideProgram({"../lib/corvista"}, kProgram);
+    auto built = besideProgram({".", "../agent"}, kGuardProgram);
+    auto found = built ? built : besideProgram({"../lib/corvista"}, kGuardProgram);
     if (!found) {
-        throw ChangeError(std::string("the program ") + kProgram + " is not installed");
+        throw ChangeError(std::string("the program ") + kGuardProgram + " is not installed");
     }
     return *std::move(found);
 }
 
 /// Nothing of this process is handed down: no signal that it holds back, no variable, no open file.
-pid_t spawn(Words& words) {
+pid_t spawnGuard(Words& words) {
     std::vector<char*> given;
     std::ranges::transform(words, std::back_inserter(given), [](std::string& word) { return word.data(); });
     given.push_back(nullptr);
@@ -72,7 +72,7 @@ pid_t spawn(Words& words) {
 
 /// @return whether it has ended well in time
 bool runs(Words words) {
-    const pid_t process = spawn(words);
+    const pid_t process = spawnGuard(words);
     const auto end = std::chrono::steady_clock::now() + kLongestStart;
     int status = 0;
     while (process > 0) {
@@ -88,7 +88,7 @@ bool runs(Words words) {
             waitpid(process, nullptr, 0);
             return false;
         }
-        std::this_thread::sleep_for(kLook);
+        std::this_thread::sleep_for(kGuardLook);
     }
     return false;
 }
@@ -99,7 +99,7 @@ bool isAtWork(const undo::ChangeDirectory& change) {
         if (std::chrono::steady_clock::now() >= end) {
             return false;
         }
-        std::this_thread::sleep_for(kLook);
+        std::this_thread::sleep_for(kGuardLook);
     }
     return true;
 }
@@ -122,13 +122,13 @@ void addUsual(std::set<std::string>& paths) {
         paths.insert(each);
     }
     std::error_code none;
-    for (const auto& entry : fs::directory_iterator(kSettings, none)) {
+    for (const auto& entry : fs::directory_iterator(kNetworkSettings, none)) {
         if (entry.is_regular_file(none)) {
             paths.insert(entry.path());
         }
     }
     for (const auto& link : fs::directory_iterator("/sys/class/net", none)) {
-        const std::string settings = kSettings;
+        const std::string settings = kNetworkSettings;
         paths.insert(settings + "/ifroute-" + link.path().filename().string());
         paths.insert(settings + "/ifcfg-" + link.path().filename().string());
     }
@@ -173,7 +173,7 @@ void startGuard(const undo::ChangeDirectory& change) {
     const bool isStarted = (isStartedBySystemd(guard, number) && isAtWork(change)) ||
                            (runs({guard, "--detach", number}) && isAtWork(change));
     if (!isStarted) {
-        throw ChangeError(std::string(kProgram) + " does not start");
+        throw ChangeError(std::string(kGuardProgram) + " does not start");
     }
 }
 
