@@ -21,7 +21,7 @@ constexpr unsigned kFirstOfOthers = 3;
 
 void leaveSession() {
     for (const int each : {SIGHUP, SIGINT, SIGQUIT, SIGTERM, SIGTSTP, SIGTTIN, SIGTTOU, SIGPIPE}) {
-        std::signal(each, SIG_IGN);
+        static_cast<void>(std::signal(each, SIG_IGN));
     }
     const int nowhere = open("/dev/null", O_RDWR);
     for (const int each : {STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO}) {

@@ -16,7 +16,6 @@
 namespace {
 
 using cvagent::undo::ChangeDirectory;
-using cvagent::undo::ChangeError;
 using cvagent::undo::kChangesPlace;
 
 constexpr int kUsage = 2;

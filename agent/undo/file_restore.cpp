@@ -207,6 +207,7 @@ std::vector<std::size_t> filesToPutBack(const std::vector<FileState>& before,
 void putBackFiles(const std::vector<FileState>& before, const std::vector<std::size_t>& indices,
                   std::vector<std::string>& notes) {
     std::vector<const FileState*> states;
+    states.reserve(indices.size());
     for (const std::size_t i : indices) {
         states.push_back(&before[i]);
     }

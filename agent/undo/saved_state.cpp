@@ -161,7 +161,7 @@ SavedState savedStateFrom(std::string_view text) {
         }
         takeRecord(*record, state);
     }
-    if (state.hostName.size() > kLongestHostName || state.domainName.size() > kLongestName) {
+    if (state.hostName.size() > kLongestHostName || state.domainName.size() > kLongestHostName) {
         throw BadRecord("a saved name is too long");
     }
     return state;

@@ -116,7 +116,7 @@ std::string sentence(unsigned number, const Journal& journal) {
 
 Journal takeChangeBack(const ChangeDirectory& change) {
     const Descriptor alone = change.waitFor(kTakingLock);
-    const Journal journal = beginToTakeBack(change);
+    Journal journal = beginToTakeBack(change);
     if (journal.stage != Stage::takingBack) {
         return journal;
     }

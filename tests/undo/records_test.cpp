@@ -53,7 +53,7 @@ SavedState someState() {
     state.network.network.links = {{0, "link"}};
     state.network.network.rules = {{0, "rule"}, {0, ""}};
     state.network.neighbours = {{0, "neighbour"}};
-    state.hostName = "db1";
+    state.hostName = std::string(64, 'h');
     state.boot = "one";
     state.milliseconds = 77;
     return state;
@@ -68,7 +68,7 @@ TEST(SavedStates, ComeBackAsTheyWere) {
     EXPECT_EQ(state.files[0].modified.tv_nsec, 6);
     EXPECT_TRUE(state.files[0].isAs(someState().files[0]));
     EXPECT_EQ(state.network.network.rules.size(), 2U);
-    EXPECT_EQ(state.hostName, "db1");
+    EXPECT_EQ(state.hostName, std::string(64, 'h'));
 }
 
 TEST(SavedStates, ThatAreDamagedAreRefused) {
