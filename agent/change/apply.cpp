@@ -22,19 +22,43 @@ std::string failureIn(const Plan& plan) {
 }
 
 /// Tries the changes out where that can be done.
-/// @return the plan for the record; "" where there is none
-std::string triedOut(const Proposal& proposal, const ApplySettings& settings) {
+std::optional<Plan> triedOut(const Proposal& proposal, const ApplySettings& settings) {
     try {
         Plan plan = rehearse(settings.rehearsal, proposal);
         const std::string failure = settings.force ? "" : failureIn(plan);
         if (!failure.empty()) {
             throw Problem(Problem::failed, "tried out, it fails: " + printable(failure), Problem::objection);
         }
-        return toJson(withoutSecrets(std::move(plan)));
+        return plan;
     } catch (const CannotRehearse& cannot) {
         settings.tell(std::string("the changes are not tried out first: ") + printable(cannot.what()));
-        return {};
+        return std::nullopt;
     }
+}
+
+void beginGuarded(const Proposal& proposal, const std::optional<Plan>& plan, const ApplySettings& settings) {
+    if (settings.safeguard == nullptr) {
+        return;
+    }
+    std::vector<MeantChange> changes;
+    for (const std::size_t i : proposal.order) {
+        changes.push_back(proposal.changes[i]);
+    }
+    settings.safeguard->begin(changes, plan ? plan->files : std::vector<FileChange>());
+}
+
+/// @return whether all of it is taken back
+bool endGuarded(const ApplySettings& settings, std::vector<Outcome>& outcomes) {
+    const bool hasFailed = std::ranges::find(outcomes, Outcome::failed, &Outcome::kind) != outcomes.end();
+    if (settings.safeguard == nullptr || !settings.safeguard->end(hasFailed)) {
+        return false;
+    }
+    for (Outcome& outcome : outcomes) {
+        const bool isMade = outcome.kind != Outcome::failed && outcome.kind != Outcome::unchanged;
+        outcome.reason = isMade && outcome.kind != Outcome::notMade ? "taken back" : outcome.reason;
+        outcome.kind = isMade ? Outcome::notMade : outcome.kind;
+    }
+    return true;
 }
 
 /// What a write came to, before anybody has looked at it once more.
@@ -87,6 +111,9 @@ void make(ChangedHost& host, const Proposal& proposal, const ApplySettings& sett
             continue;
         }
         const bool isLookedAt = settings.verifySeconds.has_value();
+        if (settings.safeguard != nullptr) {
+            settings.safeguard->beginStep();
+        }
         take(host.write(change.node, *change.row, change.words, request), isLookedAt, outcomes[i]);
         host.showErrors(request);
         request = settings.request("");
@@ -115,12 +142,13 @@ std::vector<Outcome> apply(ChangedHost& host, const Proposal& proposal, const Ap
     } else if (!proposal.objections.empty()) {
         settings.tell("done all the same: " + objectionsText(proposal));
     }
-    const std::string plan = settings.triesOut ? triedOut(proposal, settings) : "";
+    std::optional<Plan> plan = settings.triesOut ? triedOut(proposal, settings) : std::nullopt;
     if (settings.goesOn && !settings.goesOn()) {
         throw Problem(Problem::busy, "the agent ends; nothing was done");
     }
-    make(host, proposal, settings, plan, outcomes);
-    if (settings.verifySeconds) {
+    beginGuarded(proposal, plan, settings);
+    make(host, proposal, settings, plan ? toJson(withoutSecrets(*std::move(plan))) : "", outcomes);
+    if (!endGuarded(settings, outcomes) && settings.verifySeconds) {
         verifyWithin(host, proposal.changes, outcomes, *settings.verifySeconds, settings.request(""),
                      settings.goesOn);
     }

@@ -20,6 +20,10 @@ namespace cvagent::change {
 namespace {
 
 using hosttools::readPlain;
+using undo::attributeOf;
+using undo::NetworkMessage;
+using undo::NetworkMessages;
+using undo::readNetwork;
 using Names = std::map<unsigned, std::string>;
 
 constexpr std::size_t kIpv4Bits = 32;

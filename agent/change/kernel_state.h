@@ -1,7 +1,7 @@
 #pragma once
 
-#include "agent/change/network_messages.h"
 #include "agent/change/plan.h"
+#include "agent/undo/network_messages.h"
 
 namespace cvagent::change {
 
@@ -9,7 +9,7 @@ namespace cvagent::change {
 KernelState readKernelState();
 
 /// The lines of a network alone, sorted.
-KernelState linesOf(const NetworkMessages& network);
+KernelState linesOf(const undo::NetworkMessages& network);
 
 /// The lines of one state that another one has not.
 KernelState missingFrom(const KernelState& other, const KernelState& state);

@@ -4,17 +4,17 @@
 #include <linux/if_addr.h>
 #include <linux/if_link.h>
 #include <linux/netlink.h>
-#include <linux/nexthop.h>
 #include <linux/rtnetlink.h>
 #include <linux/veth.h>
 #include <net/if.h>
 
 #include <algorithm>
 #include <cerrno>
-#include <cstring>
 #include <set>
 #include <string>
 #include <vector>
+
+#include "agent/undo/network_requests.h"
 
 namespace cvagent::change {
 
@@ -25,6 +25,14 @@ using hosttools::makeAttribute;
 using hosttools::makeRequest;
 using hosttools::NetlinkSocket;
 using hosttools::readPlain;
+using undo::addressRequest;
+using undo::attributeOf;
+using undo::attributesOf;
+using undo::NetworkMessage;
+using undo::NetworkMessages;
+using undo::nextHopRequest;
+using undo::readNetwork;
+using undo::routeRequest;
 
 constexpr unsigned kNew = NLM_F_CREATE | NLM_F_EXCL | NLM_F_ACK;
 constexpr std::size_t kMostRoutes = 10'000;  // a router's table would take seconds
@@ -205,33 +213,12 @@ void raiseAll(NetlinkSocket& socket) {
     }
 }
 
-/// @param flags on top of those that the address has
-std::string addressRequest(const NetworkMessage& message, unsigned how, unsigned more) {
-    constexpr std::size_t kFixed = NLMSG_ALIGN(sizeof(ifaddrmsg));
-    constexpr unsigned kKeptFlags =
-        IFA_F_NOPREFIXROUTE | IFA_F_HOMEADDRESS | IFA_F_NODAD | IFA_F_MANAGETEMPADDR;
-    auto fixed = readPlain<ifaddrmsg>(message.body).value_or(ifaddrmsg{});
-    unsigned flags = fixed.ifa_flags;
-    const std::string attributes =
-        attributesOf(message.body, kFixed, [&flags](unsigned type, const std::string& data) {
-            if (type == IFA_FLAGS) {
-                flags = readPlain<std::uint32_t>(data).value_or(0);
-            }
-            static const std::set<unsigned> kTaken{IFA_ADDRESS, IFA_LOCAL,     IFA_BROADCAST,
-                                                   IFA_LABEL,   IFA_CACHEINFO, IFA_RT_PRIORITY};
-            return kTaken.contains(type);
-        });
-    flags = (flags & kKeptFlags) | more;
-    fixed.ifa_flags = static_cast<std::uint8_t>(flags);
-    return makeRequest(RTM_NEWADDR, how, bytesOf(fixed), attributes + attribute(IFA_FLAGS, flags));
-}
-
 template <class Request>
 std::vector<std::string> requests(const std::vector<NetworkMessage>& messages, Request make) {
     std::vector<std::string> all;
     all.reserve(messages.size());
     for (const NetworkMessage& message : messages) {
-        all.push_back(make(message));
+        all.push_back(make(message, kNew));
     }
     return all;
 }
@@ -239,8 +226,8 @@ std::vector<std::string> requests(const std::vector<NetworkMessage>& messages, R
 /// An IPv6 address is there at once when nobody is asked whether he has it; afterwards it is one like any
 /// other.
 void copyAddresses(NetlinkSocket& socket, const std::vector<NetworkMessage>& addresses) {
-    tellAll(socket, requests(addresses, [](const NetworkMessage& message) {
-                return addressRequest(message, kNew, IFA_F_NODAD);
+    tellAll(socket, requests(addresses, [](const NetworkMessage& message, unsigned how) {
+                return addressRequest(message, how, IFA_F_NODAD);
             }));
     for (const NetworkMessage& message : addresses) {
         const auto fixed = readPlain<ifaddrmsg>(message.body).value_or(ifaddrmsg{});
@@ -248,47 +235,6 @@ void copyAddresses(NetlinkSocket& socket, const std::vector<NetworkMessage>& add
             tell(socket, addressRequest(message, NLM_F_REPLACE | NLM_F_ACK, 0));
         }
     }
-}
-
-/// What the kernel tells of a way's state cannot be asked for.
-void forgetStates(std::string& ways) {
-    for (std::size_t at = 0; at + sizeof(rtnexthop) <= ways.size();) {
-        rtnexthop way{};
-        std::memcpy(&way, ways.data() + at, sizeof way);
-        way.rtnh_flags &= RTNH_F_ONLINK;
-        std::memcpy(ways.data() + at, &way, sizeof way);
-        if (way.rtnh_len < sizeof way) {
-            return;
-        }
-        at += RTNH_ALIGN(way.rtnh_len);
-    }
-}
-
-std::string routeRequest(const NetworkMessage& message) {
-    constexpr std::size_t kFixed = NLMSG_ALIGN(sizeof(rtmsg));
-    auto fixed = readPlain<rtmsg>(message.body).value_or(rtmsg{});
-    fixed.rtm_flags &= RTNH_F_ONLINK;
-    const bool byNumber = !attributeOf(message.body, kFixed, RTA_NH_ID).empty();
-    const std::string attributes =
-        attributesOf(message.body, kFixed, [byNumber](unsigned type, std::string& data) {
-            if (type == RTA_MULTIPATH) {
-                forgetStates(data);
-            }
-            static const std::set<unsigned> kStates{RTA_CACHEINFO, RTA_UID, RTA_EXPIRES, RTA_MARK};
-            static const std::set<unsigned> kWays{RTA_OIF, RTA_GATEWAY, RTA_MULTIPATH, RTA_VIA};
-            return !kStates.contains(type) && !(byNumber && kWays.contains(type));
-        });
-    // One IPv6 route more to the same place is another way of it.
-    const unsigned how = fixed.rtm_family == AF_INET6 ? NLM_F_CREATE | NLM_F_ACK | NLM_F_EXCL : kNew;
-    return makeRequest(RTM_NEWROUTE, how, bytesOf(fixed), attributes);
-}
-
-std::string nextHopRequest(const NetworkMessage& message) {
-    auto fixed = readPlain<nhmsg>(message.body).value_or(nhmsg{});
-    fixed.nh_flags &= RTNH_F_ONLINK;
-    return makeRequest(RTM_NEWNEXTHOP, kNew, bytesOf(fixed),
-                       attributesOf(message.body, NLMSG_ALIGN(sizeof(nhmsg)),
-                                    [](unsigned, const std::string&) { return true; }));
 }
 
 /// The rules that every new network has are taken away where the other one has not.

@@ -1,6 +1,6 @@
 #pragma once
 
-#include "agent/change/network_messages.h"
+#include "agent/undo/network_messages.h"
 
 namespace cvagent::change {
 
@@ -13,6 +13,6 @@ struct Peers {
 /// kernel refuses is left out.
 /// @param peers an empty network for the other ends of cables, which stand for links that cannot be of their
 ///              kind
-void buildNetwork(const NetworkMessages& like, const Peers& peers);
+void buildNetwork(const undo::NetworkMessages& like, const Peers& peers);
 
 }  // namespace cvagent::change

@@ -22,6 +22,8 @@ namespace cvagent::change {
 namespace {
 
 using hosttools::Descriptor;
+using undo::NetworkMessages;
+using undo::readNetwork;
 
 /// In a process of its own, for there is no way back from another network. The socket stays in the first one.
 /// @param peers gets the network of the cables' other ends

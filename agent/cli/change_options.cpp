@@ -10,6 +10,8 @@ namespace {
 constexpr const char* kFileHelp =
     "A file of changes as cvagent export writes it; - reads it from standard input";
 
+constexpr double kLongestConfirmation = 86400;
+
 /// One word is a file, more are a change.
 void takePlanWords(Options& options) {
     if (options.words.size() == 1) {
@@ -48,6 +50,28 @@ void addFile(CLI::App& command, Options& options) {
         ->type_name("")
         ->check(CLI::Validator(
             [](const std::string& name) { return name.empty() ? "no file is named" : std::string(); }, ""));
+}
+
+void addMadeChanges(CLI::App& app, Options& options) {
+    CLI::App* confirm = app.add_subcommand("confirm", "Keep a change that is taken back otherwise");
+    confirm->add_option("NUMBER", options.change, "Of the change, as apply or set has told it")
+        ->required()
+        ->type_name("")
+        ->check(wholeDecimal());
+    confirm
+        ->add_option("--lengthen", options.confirmSeconds,
+                     "Do not keep it yet, but let it wait for so long from now on")
+        ->type_name("SECONDS")
+        ->check(secondsUpTo(kLongestConfirmation));
+    confirm->callback([&options] { options.command = Command::confirm; });
+
+    CLI::App* rollback =
+        app.add_subcommand("rollback", "Take a change back, as long as no newer one stands on it");
+    rollback->add_option("NUMBER", options.change, "Of the change; the last one when none is named")
+        ->type_name("")
+        ->check(wholeDecimal());
+    rollback->footer("The changes are listed by: cvagent history --changes.");
+    rollback->callback([&options] { options.command = Command::rollback; });
 }
 
 }  // namespace
@@ -95,6 +119,16 @@ void addVerifyWithin(CLI::App& command, Options& options, const std::string& usu
         ->check(secondsUpTo(3600));
 }
 
+void addConfirmWithin(CLI::App& command, Options& options) {
+    command
+        .add_option(
+            "--confirm-within", options.confirmSeconds,
+            "Take all of it back unless somebody types cvagent confirm within this time, and when a step "
+            "fails. 0: do not. Default: 60 where root at a terminal could cut himself off, else 0")
+        ->type_name("SECONDS")
+        ->check(secondsUpTo(kLongestConfirmation));
+}
+
 void addChanges(CLI::App& app, Options& options) {
     addPlan(app, options);
     CLI::App* apply =
@@ -103,6 +137,7 @@ void addChanges(CLI::App& app, Options& options) {
     addYes(*apply, options);
     addForce(*apply, options);
     addVerifyWithin(*apply, options, "3");
+    addConfirmWithin(*apply, options);
     apply->add_flag("-n,--dry-run", options.dryRun, "Only tell the plan");
     addJson(*apply, options);
     apply->callback([&options] { options.command = Command::apply; });
@@ -117,6 +152,7 @@ void addChanges(CLI::App& app, Options& options) {
     addFile(*diff, options);
     addJson(*diff, options);
     diff->callback([&options] { options.command = Command::diff; });
+    addMadeChanges(app, options);
 }
 
 }  // namespace cvagent

@@ -204,6 +204,7 @@ void addSet(CLI::App& app, Options& options) {
     addYes(*set, options);
     addForce(*set, options);
     addVerifyWithin(*set, options, "0");
+    addConfirmWithin(*set, options);
     addJson(*set, options);
     set->footer(
         "What a property accepts is told by: cvagent properties CLASS.\n"
@@ -260,6 +261,9 @@ void addHistory(CLI::App& app, Options& options) {
                      "Let the file grow up to this size from now on; prints nothing")
         ->type_name("MB")
         ->check(secondsUpTo(100000));
+    history->add_flag(
+        "--changes", options.listsChanges,
+        "The changes that were made by apply, or wait for their confirmation, with their numbers");
     addJson(*history, options);
     history->footer(
         "TIME is 2026-11-20, 2026-11-20T21:03:00Z, or how long ago: 90s, 30m, 2h, 7d.\n"
@@ -277,8 +281,8 @@ std::string whyNoCommand(const CLI::App& app) {
     }
     unmark(*word);
     return "there is no command " + inQuotes(*word) +
-           "; the commands are: tree, get, set, plan, apply, export, diff, watch, history, properties, "
-           "doctor";
+           "; the commands are: tree, get, set, plan, apply, export, diff, confirm, rollback, watch, "
+           "history, properties, doctor";
 }
 
 /// The subcommand that was being read, for the hint.

@@ -24,7 +24,7 @@ using cvagent::Options;
 using Question = ExitStatus (*)(cvagent::Session& session, const Options& options);
 
 /// What needs an agent, in the order of Command; null for what does not.
-constexpr std::array<Question, 11> kQuestions = {cvagent::commands::tree,          cvagent::commands::get,
+constexpr std::array<Question, 13> kQuestions = {cvagent::commands::tree,          cvagent::commands::get,
                                                  cvagent::commands::set,           cvagent::commands::watch,
                                                  cvagent::commands::plan,          cvagent::commands::apply,
                                                  cvagent::commands::exportChanges, cvagent::commands::diff};
@@ -74,6 +74,20 @@ std::optional<ExitStatus> askService(Question ask, Options& options) {
     return std::nullopt;
 }
 
+ExitStatus runWithoutAgent(const Options& options) {
+    switch (options.command) {
+        case Command::history:
+            return options.listsChanges ? cvagent::commands::listChanges(options)
+                                        : cvagent::commands::history(options);
+        case Command::confirm:
+            return cvagent::commands::confirmChange(options);
+        case Command::rollback:
+            return cvagent::commands::rollback(options);
+        default:
+            return cvagent::commands::properties(options);
+    }
+}
+
 ExitStatus run(Options& options, cvagent::WantMessages& wants) {
     const Question ask = options.verify ? cvagent::commands::verifyTree
                                         : kQuestions.at(static_cast<std::size_t>(options.command));
@@ -96,9 +110,7 @@ ExitStatus run(Options& options, cvagent::WantMessages& wants) {
     const auto service = isDoctor ? cvagent::remote::describeService(options)  // before the environment goes
                                   : cvagent::remote::ServiceReport();
     cvagent::prepareSurroundings(files);
-    return isDoctor                              ? cvagent::commands::doctor(options, service)
-           : options.command == Command::history ? cvagent::commands::history(options)
-                                                 : cvagent::commands::properties(options);
+    return isDoctor ? cvagent::commands::doctor(options, service) : runWithoutAgent(options);
 }
 
 ExitStatus endWith(const cvagent::Failure& failure) {
@@ -130,7 +142,7 @@ ExitStatus runGuarded(Options& options, cvagent::WantMessages& wants) {
 ExitStatus runAndJudge(Options& options) {
     cvagent::WantMessages wants;
     const ExitStatus status = runGuarded(options, wants);
-    const bool ofHost = options.command != Command::properties && options.command != Command::history;
+    const bool ofHost = options.command < Command::properties || options.command == Command::doctor;
     const bool wanting = ofHost && !options.byService && wants.tell();
     const bool good = status == ExitStatus::done || status == ExitStatus::notFound;
     return wanting && good ? ExitStatus::failed : status;

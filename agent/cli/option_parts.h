@@ -17,7 +17,10 @@ void addForce(CLI::App& command, Options& options);
 /// @param usual the default, in words
 void addVerifyWithin(CLI::App& command, Options& options, const std::string& usual);
 
-/// The commands about files of changes.
+/// How long a change waits for its confirmation.
+void addConfirmWithin(CLI::App& command, Options& options);
+
+/// The commands about files of changes, and those about changes that were made.
 void addChanges(CLI::App& app, Options& options);
 
 }  // namespace cvagent

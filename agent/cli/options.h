@@ -8,7 +8,21 @@
 
 namespace cvagent {
 
-enum class Command { tree, get, set, watch, plan, apply, exportChanges, diff, properties, doctor, history };
+enum class Command {
+    tree,
+    get,
+    set,
+    watch,
+    plan,
+    apply,
+    exportChanges,
+    diff,
+    properties,
+    doctor,
+    history,
+    confirm,
+    rollback
+};
 
 /// How long apply looks whether a change comes about and stays.
 inline constexpr double kVerifySeconds = 3;
@@ -49,6 +63,10 @@ struct Options {
     bool force = false;              ///< although something speaks against it
     bool dryRun = false;             ///< apply tells the plan only
     std::optional<double> verifySeconds;
+    /// How long a change waits for its confirmation, or how much more time it gets; nothing: as it comes.
+    std::optional<double> confirmSeconds;
+    std::string change;         ///< its number; "" for the last one
+    bool listsChanges = false;  ///< in place of the history
     // of the history
     std::string since;  ///< as moment.h reads it; "" for the beginning
     std::string until;  ///< the same; "" for the end

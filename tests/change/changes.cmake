@@ -8,4 +8,4 @@ corvista_test(change_apply PARTS 2 LIBRARIES agent_change agent_core test_suppor
   change/apply_command_test.cpp
   change/in_force_test.cpp)
 target_compile_definitions(change_apply_test PRIVATE ${agent_test_programs})
-add_dependencies(change_apply_test cvagent corvista-hosttools corvista-rehearsal fake_plugin vantrelcvicoshwmi)
+add_dependencies(change_apply_test cvagent corvista-guard corvista-hosttools corvista-rehearsal fake_plugin vantrelcvicoshwmi)

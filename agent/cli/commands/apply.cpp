@@ -1,39 +1,11 @@
-#include <unistd.h>
-
-#include "agent/cli/caller.h"
+#include "agent/cli/applied_here.h"
 #include "agent/cli/changes.h"
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/outcomes.h"
 #include "agent/cli/print.h"
+#include "agent/cli/safeguard.h"
 
 namespace cvagent::commands {
-
-namespace {
-
-/// The changes made by this process, one after the other, through the service or not.
-std::vector<change::Outcome> applied(Session& session, const std::vector<change::MeantChange>& changes,
-                                     const Options& options) {
-    const change::Proposal proposal = change::propose(session, changes, Request(callerName()));
-    if (!options.force) {
-        change::refuse(proposal);
-    }
-    confirmDrastic(changes, options);
-    change::ApplySettings settings;
-    settings.rehearsal = rehearsalSettings(options);
-    settings.force = options.force;
-    settings.verifySeconds = options.verifySeconds.value_or(change::kVerifySeconds);
-    settings.request = [](const std::string& plan) {
-        return Request(callerName(), Request::Clock::time_point::max(), plan);
-    };
-    settings.tell = complain;
-    if (options.byService && geteuid() != 0) {
-        settings.triesOut = false;
-        complain("the changes are not tried out first: only root can do that where the service makes them");
-    }
-    return change::apply(session, proposal, settings);
-}
-
-}  // namespace
 
 ExitStatus apply(Session& session, const Options& options) {
     if (options.dryRun) {
@@ -41,13 +13,15 @@ ExitStatus apply(Session& session, const Options& options) {
     }
     const std::vector<change::MeantChange> changes = meantChanges(session, options);
     std::unique_ptr<std::vector<change::Outcome>> outcomes;
-    if (options.byService) {
+    if (options.byService && !confirmSeconds(options, changes)) {
         confirmDrastic(changes, options);
         outcomes = session.apply(
             changes, {options.force, false, options.verifySeconds.value_or(change::kVerifySeconds)});
     }
     if (!outcomes) {
-        outcomes = std::make_unique<std::vector<change::Outcome>>(applied(session, changes, options));
+        outcomes = std::make_unique<std::vector<change::Outcome>>(
+            appliedHere(session, changes, options, change::Already::leftOut,
+                        options.verifySeconds.value_or(change::kVerifySeconds)));
     }
     print(options.json ? outcomesJson(changes, *outcomes) : outcomesText(changes, *outcomes));
     return statusOf(*outcomes);

@@ -24,5 +24,9 @@ ExitStatus properties(const Options& options);
 /// @param service as it was found with the caller's environment
 ExitStatus doctor(const Options& options, const remote::ServiceReport& service);
 ExitStatus history(const Options& options);
+ExitStatus confirmChange(const Options& options);
+ExitStatus rollback(const Options& options);
+/// history --changes
+ExitStatus listChanges(const Options& options);
 
 }  // namespace cvagent::commands

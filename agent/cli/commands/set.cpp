@@ -1,10 +1,12 @@
 #include <algorithm>
 
+#include "agent/cli/applied_here.h"
 #include "agent/cli/caller.h"
 #include "agent/cli/changes.h"
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/json.h"
 #include "agent/cli/print.h"
+#include "agent/cli/safeguard.h"
 
 namespace cvagent::commands {
 
@@ -103,9 +105,17 @@ ExitStatus setHere(Session& session, const std::vector<MeantChange>& changes, co
 
 ExitStatus set(Session& session, const Options& options) {
     const std::vector<MeantChange> changes = meantChanges(session, options);
-    confirmDrastic(changes, options);
-    const auto outcomes =
-        options.byService ? session.apply(changes, {options.force, true, options.verifySeconds}) : nullptr;
+    std::unique_ptr<std::vector<Outcome>> outcomes;
+    const bool isGuarded = confirmSeconds(options, changes).has_value();
+    if (!isGuarded) {
+        confirmDrastic(changes, options);
+    }
+    if (isGuarded) {
+        outcomes = std::make_unique<std::vector<Outcome>>(
+            appliedHere(session, changes, options, change::Already::made, options.verifySeconds));
+    } else if (options.byService) {
+        outcomes = session.apply(changes, {options.force, true, options.verifySeconds});
+    }
     if (!outcomes) {
         return setHere(session, changes, options);
     }

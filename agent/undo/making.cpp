@@ -1,0 +1,170 @@
+#include "agent/undo/making.h"
+
+#include <fcntl.h>
+
+#include <algorithm>
+#include <ctime>
+#include <set>
+
+#include "agent/undo/boot_clock.h"
+#include "agent/undo/taking_back.h"
+
+namespace cvagent::undo {
+
+namespace {
+
+std::string named(unsigned number) {
+    return "change " + std::to_string(number);
+}
+
+std::optional<Journal> readableJournal(const std::string& place, unsigned number) {
+    try {
+        return ChangeDirectory(place, number).journal();
+    } catch (const ChangeError&) {
+        return std::nullopt;
+    }
+}
+
+/// Two that could be taken back at once would meet.
+void refuseBesideOthers(const std::string& place) {
+    for (const unsigned number : changesIn(place)) {
+        const auto journal = readableJournal(place, number);
+        const bool isOpen = journal && !journal->isEnded() && journal->stage != Stage::saved;
+        if (isOpen && (journal->window != 0 || ChangeDirectory(place, number).isTaken(kAgentLock))) {
+            throw ChangeError(named(number) + " " + stageText(journal->stage));
+        }
+    }
+}
+
+SavedState savedBefore(const std::vector<std::string>& paths) {
+    std::set<std::string> each;
+    for (const std::string& path : paths) {
+        each.insert(withoutLinks(path));
+    }
+    SavedState before = SavedState::of({each.begin(), each.end()});
+    if (const std::string obstacle = before.obstacle(); !obstacle.empty()) {
+        throw ChangeError("it could not be taken back: " + obstacle);
+    }
+    return before;
+}
+
+bool stands(const Journal& journal) {
+    return journal.stage != Stage::saved && journal.stage != Stage::takenBack &&
+           journal.stage != Stage::failed;
+}
+
+}  // namespace
+
+ChangeInMaking::ChangeInMaking(const MakingSettings& settings)
+    : directory_([&settings] {
+          refuseBesideOthers(settings.place);
+          return ChangeDirectory::make(settings.place);
+      }()),
+      alive_(directory_.take(kAgentLock)),
+      inSteps_(directory_.take(kStepLock)),
+      before_(savedBefore(settings.paths)),
+      window_(std::min(settings.window, kLongestWindow)) {
+    fcntl(inSteps_.get(), F_SETFD, 0);  // what a step starts inherits it
+    directory_.save("before", before_);
+    directory_.update([&](Journal& journal) {
+        journal.boot = before_.boot;
+        journal.window = window_;
+        journal.deadline = bootMilliseconds() + window_;
+        journal.settling = settings.settling;
+        journal.steps = settings.steps;
+        journal.began = static_cast<std::uint64_t>(std::time(nullptr));
+        journal.caller = settings.caller;
+        journal.summary = settings.summary;
+        return true;
+    });
+}
+
+void ChangeInMaking::beginStep() {
+    const Journal now = directory_.update([this](Journal& journal) {
+        const bool isFirst = journal.stage == Stage::saved;
+        if (!isFirst && journal.stage != Stage::changing) {
+            return false;
+        }
+        journal.stage = Stage::changing;
+        journal.deadline = isFirst ? bootMilliseconds() + window_ : journal.deadline;
+        ++journal.step;
+        return true;
+    });
+    if (now.stage != Stage::changing) {
+        throw ChangeError(named(number()) + ": its time is over, and it " + stageText(now.stage));
+    }
+}
+
+Journal ChangeInMaking::end() {
+    directory_.save("left", before_.again());
+    return directory_.update([this](Journal& journal) {
+        if (journal.stage != Stage::saved && journal.stage != Stage::changing) {
+            return false;
+        }
+        journal.stage = window_ == 0 ? Stage::kept : Stage::made;
+        journal.deadline = bootMilliseconds() + window_;
+        return true;
+    });
+}
+
+Journal ChangeInMaking::takeBack() {
+    return takeChangeBack(directory_);
+}
+
+void confirmChange(const ChangeDirectory& change) {
+    bool isConfirmed = false;
+    const Journal now = change.update([&isConfirmed](Journal& journal) {
+        isConfirmed = journal.stage == Stage::made;
+        journal.stage = isConfirmed ? Stage::kept : journal.stage;
+        return isConfirmed;
+    });
+    if (!isConfirmed) {
+        throw ChangeError(named(change.number()) + " cannot be confirmed: it " + stageText(now.stage));
+    }
+}
+
+void lengthenChange(const ChangeDirectory& change, std::uint64_t milliseconds) {
+    bool isLonger = false;
+    change.update([&](Journal& journal) {
+        isLonger = journal.window != 0 && (journal.stage == Stage::made || journal.stage == Stage::changing);
+        journal.deadline = isLonger ? bootMilliseconds() + milliseconds : journal.deadline;
+        return isLonger;
+    });
+    if (!isLonger) {
+        throw ChangeError(named(change.number()) + " waits for no confirmation");
+    }
+}
+
+Journal rollBack(const std::string& place, const ChangeDirectory& change) {
+    for (const unsigned number : changesIn(place)) {
+        const auto journal = readableJournal(place, number);
+        if (number > change.number() && journal && stands(*journal)) {
+            throw ChangeError(named(number) + " stands on it");
+        }
+    }
+    const auto journal = change.journal();
+    if (!journal || !stands(*journal)) {
+        throw ChangeError(named(change.number()) + " does not stand: it " +
+                          stageText(journal ? journal->stage : Stage::saved));
+    }
+    if (journal->stage == Stage::changing && change.isTaken(kAgentLock)) {
+        throw ChangeError(named(change.number()) + " is under way");
+    }
+    change.update([](Journal& now) {
+        const bool isKept = now.stage == Stage::kept;
+        now.stage = isKept ? Stage::takingBack : now.stage;
+        return isKept;
+    });
+    return takeChangeBack(change);
+}
+
+std::optional<unsigned> lastStanding(const std::string& place) {
+    std::vector<unsigned> numbers = changesIn(place);
+    const auto last = std::find_if(numbers.rbegin(), numbers.rend(), [&place](unsigned number) {
+        const auto journal = readableJournal(place, number);
+        return journal && stands(*journal);
+    });
+    return last == numbers.rend() ? std::nullopt : std::optional(*last);
+}
+
+}  // namespace cvagent::undo

@@ -1,0 +1,192 @@
+#include "agent/undo/saved_state.h"
+
+#include <linux/rtnetlink.h>
+#include <sys/utsname.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+
+#include "agent/undo/boot_clock.h"
+#include "agent/undo/file_restore.h"
+#include "agent/undo/network_entries.h"
+
+namespace cvagent::undo {
+
+namespace {
+
+constexpr std::uint64_t kVersion = 1;
+constexpr std::size_t kLongestHostName = 64;  // the kernel's own bound of a host name
+
+/// The lists of a network under their names in a text.
+struct List {
+    const char* name;
+    std::vector<NetworkMessage>& (*of)(NetworkState& state);
+};
+const List kLists[] = {{"link", [](NetworkState& state) -> auto& {return state.network.links;
+}  // namespace
+}  // namespace cvagent::undo
+, {"address", [](NetworkState& state) -> auto& {return state.network.addresses;
+}
+}
+, {"nexthop", [](NetworkState& state) -> auto& {return state.network.nextHops;
+}
+}
+, {"route", [](NetworkState& state) -> auto& {return state.network.routes;
+}
+}
+, {"rule", [](NetworkState& state) -> auto& {return state.network.rules;
+}
+}
+, {"neighbour", [](NetworkState& state) -> auto& {return state.neighbours;
+}
+}
+,
+}
+;
+
+void takeRecord(const Record& record, SavedState& state) {
+    const auto* list =
+        std::ranges::find_if(kLists, [&](const List& each) { return record.name == each.name; });
+    if (list != std::end(kLists)) {
+        list->of(state.network).push_back({0, std::string(record.bytes)});
+    } else if (record.name == "file") {
+        state.files.push_back(fileStateFrom(record.bytes));
+    } else if (record.name == "host") {
+        state.hostName = record.bytes;
+    } else if (record.name == "domain") {
+        state.domainName = record.bytes;
+    } else if (record.name == "boot") {
+        state.boot = record.bytes;
+    } else if (record.name == "milliseconds") {
+        state.milliseconds = record.number();
+    } else if (record.name == "problem") {
+        state.network.network.problem = static_cast<int>(record.number(INT16_MAX));
+    } else {
+        throw BadRecord("a saved state has a part that is not known");
+    }
+}
+
+/// The old value where the change has touched it and nobody else since.
+bool isToPutBack(const std::string& before, const std::string* left, const std::string& now) {
+    return before != now && (left == nullptr || (*left != before && *left == now));
+}
+
+void putBackNames(const SavedState& before, const SavedState* left, const SavedState& began,
+                  std::vector<std::string>& notes) {
+    const auto note = [&notes](const char* what, int result) {
+        if (result != 0) {
+            notes.push_back(std::string(what) + " is not put back: " + std::strerror(errno));
+        }
+    };
+    if (isToPutBack(before.hostName, left != nullptr ? &left->hostName : nullptr, began.hostName)) {
+        note("the host name", sethostname(before.hostName.data(), before.hostName.size()));
+    }
+    if (isToPutBack(before.domainName, left != nullptr ? &left->domainName : nullptr, began.domainName)) {
+        note("the domain name", setdomainname(before.domainName.data(), before.domainName.size()));
+    }
+}
+
+}  // namespace
+
+SavedState SavedState::of(const std::vector<std::string>& paths) {
+    SavedState state;
+    for (const std::string& path : paths) {
+        state.files.push_back(fileStateOf(path));
+    }
+    state.network = NetworkState::read();
+    std::erase_if(state.network.network.routes, isOfRoutingProgram);
+    utsname names{};
+    if (uname(&names) == 0) {
+        state.hostName = static_cast<const char*>(names.nodename);
+        state.domainName = static_cast<const char*>(names.domainname);
+    }
+    state.boot = bootId();
+    state.milliseconds = bootMilliseconds();
+    return state;
+}
+
+std::vector<std::string> SavedState::paths() const {
+    std::vector<std::string> all;
+    std::ranges::transform(files, std::back_inserter(all), &FileState::path);
+    return all;
+}
+
+SavedState SavedState::again() const {
+    return of(paths());
+}
+
+std::string SavedState::obstacle() const {
+    for (const FileState& file : files) {
+        if (file.type == FileState::Type::other) {
+            return file.path + ": " + file.content;
+        }
+    }
+    const int problem = network.network.problem;
+    return problem == 0 ? "" : std::string("the network cannot be read: ") + std::strerror(problem);
+}
+
+std::string textOf(const SavedState& state) {
+    RecordWriter text;
+    text.add("corvista-saved", kVersion).add("boot", state.boot).add("milliseconds", state.milliseconds);
+    text.add("host", state.hostName).add("domain", state.domainName);
+    for (const FileState& file : state.files) {
+        text.add("file", recordOf(file));
+    }
+    text.add("problem", static_cast<std::uint64_t>(state.network.network.problem));
+    NetworkState network = state.network;
+    for (const List& list : kLists) {
+        for (const NetworkMessage& message : list.of(network)) {
+            text.add(list.name, message.body);
+        }
+    }
+    return text.add("end", "").text();
+}
+
+SavedState savedStateFrom(std::string_view text) {
+    RecordReader reader(text);
+    const auto head = reader.next();
+    if (!head || head->name != "corvista-saved" || head->number() != kVersion) {
+        throw BadRecord("this is no saved state of this version");
+    }
+    SavedState state;
+    for (;;) {
+        const auto record = reader.next();
+        if (!record) {
+            throw BadRecord("a saved state is cut off");
+        }
+        if (record->name == "end") {
+            break;
+        }
+        takeRecord(*record, state);
+    }
+    if (state.hostName.size() > kLongestHostName || state.domainName.size() > kLongestHostName) {
+        throw BadRecord("a saved name is too long");
+    }
+    return state;
+}
+
+TakenBack takeBack(const SavedState& before, const SavedState* left, const SavedState& began) {
+    TakenBack taken;
+    const bool isSameSet =
+        before.paths() == began.paths() && (left == nullptr || left->paths() == before.paths());
+    if (!isSameSet) {
+        throw BadRecord("the saved states are of other files");
+    }
+    const auto indices = filesToPutBack(
+        before.files, left != nullptr ? left->files : std::vector<FileState>(), began.files, taken.notes);
+    putBackFiles(before.files, indices, taken.notes);
+    if (before.boot != bootId() || before.boot != began.boot) {
+        return taken;  // the kernel has begun anew, with what the files say
+    }
+    putBackNames(before, left, began, taken.notes);
+    constexpr std::uint64_t kThousand = 1000;
+    const std::uint64_t now = bootMilliseconds();
+    const std::uint64_t seconds = now < before.milliseconds ? 0 : (now - before.milliseconds) / kThousand;
+    putBackNetwork({before.network, left != nullptr ? &left->network : nullptr, began.network, seconds},
+                   taken.notes);
+    return taken;
+}
+
+}  // namespace cvagent::undo

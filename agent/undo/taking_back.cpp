@@ -1,0 +1,161 @@
+#include "agent/undo/taking_back.h"
+
+#include <chrono>
+#include <thread>
+
+#include "agent/undo/boot_clock.h"
+
+namespace cvagent::undo {
+
+namespace {
+
+using hosttools::Descriptor;
+
+constexpr std::chrono::milliseconds kLook{100};
+/// Commands that hang are ended before; a daemon that a step has started is not waited for.
+constexpr std::uint64_t kLongestStep = 60'000;
+
+/// What was so when the taking back of a whole change began; kept, so that who goes on with it takes nothing
+/// for somebody else's work that was half put back.
+SavedState beganOf(const ChangeDirectory& change, const SavedState& before) {
+    auto began = change.load("began");
+    if (!began) {
+        began = before.again();
+        change.save("began", *began);
+    }
+    return *std::move(began);
+}
+
+TakenBack takeSavedBack(const ChangeDirectory& change) {
+    const auto before = change.load("before");
+    if (!before) {
+        throw ChangeError("nothing was saved");
+    }
+    const auto left = change.load("left");
+    try {
+        return left ? takeBack(*before, &*left, beganOf(change, *before))
+                    : takeBack(*before, nullptr, before->again());
+    } catch (const BadRecord& bad) {
+        throw ChangeError(bad.what());
+    }
+}
+
+/// For now; what cannot be read is told in the end.
+void takeSavedBackAtOnce(const ChangeDirectory& change) {
+    try {
+        takeSavedBack(change);
+    } catch (const ChangeError&) {
+        return;
+    }
+}
+
+/// Marks it as to be taken back, unless it has come to its end meanwhile.
+Journal beginToTakeBack(const ChangeDirectory& change) {
+    return change.update([](Journal& journal) {
+        const bool goesOn = !journal.isEnded() && journal.stage != Stage::takingBack;
+        journal.stage = goesOn ? Stage::takingBack : journal.stage;
+        return goesOn;
+    });
+}
+
+Journal endWith(const ChangeDirectory& change, Stage stage, std::vector<std::string> notes) {
+    return change.update([&](Journal& journal) {
+        journal.stage = stage;
+        journal.notes = std::move(notes);
+        return true;
+    });
+}
+
+/// Who makes the change may be at a step still, which writes after all was put back. So that the host is back
+/// in time it is put back at once, and when he has ended once more.
+void takeBackFromMaker(const ChangeDirectory& change) {
+    const std::uint64_t settling = change.journal().value_or(Journal{}).settling;
+    if ((change.isTaken(kStepLock) || settling != 0) && !change.load("left")) {
+        {
+            const Descriptor alone = change.waitFor(kTakingLock);
+            if (beginToTakeBack(change).stage != Stage::takingBack) {
+                return;
+            }
+            takeSavedBackAtOnce(change);
+        }
+        const std::uint64_t begin = bootMilliseconds();
+        const auto isOver = [begin](std::uint64_t time) { return bootMilliseconds() - begin >= time; };
+        while (!isOver(settling) || (change.isTaken(kStepLock) && !isOver(kLongestStep))) {
+            std::this_thread::sleep_for(kLook);
+        }
+    }
+    takeChangeBack(change);
+}
+
+/// One look of the guard. @return whether it has ended
+bool lookOnce(const ChangeDirectory& change) {
+    const Journal journal = change.journal().value_or(Journal{});
+    const bool isMaker = change.isTaken(kAgentLock);
+    const bool isLeft = !isMaker && journal.stage == Stage::changing;
+    if (journal.stage == Stage::saved && !isMaker) {
+        endWith(change, Stage::takenBack, {});
+    } else if (journal.stage == Stage::takingBack) {
+        if (!change.isTaken(kTakingLock)) {
+            takeBackFromMaker(change);
+        }
+    } else if (journal.stage != Stage::saved && !journal.isEnded() && (journal.isDue() || isLeft)) {
+        takeBackFromMaker(change);
+    }
+    return journal.isEnded();
+}
+
+std::string sentence(unsigned number, const Journal& journal) {
+    std::string text = "change " + std::to_string(number) + ": " + stageText(journal.stage);
+    for (const std::string& note : journal.notes) {
+        text += "; " + note;
+    }
+    return text;
+}
+
+}  // namespace
+
+Journal takeChangeBack(const ChangeDirectory& change) {
+    const Descriptor alone = change.waitFor(kTakingLock);
+    Journal journal = beginToTakeBack(change);
+    if (journal.stage != Stage::takingBack) {
+        return journal;
+    }
+    try {
+        return endWith(change, Stage::takenBack, takeSavedBack(change).notes);
+    } catch (const ChangeError& error) {
+        return endWith(change, Stage::failed, {error.what()});
+    }
+}
+
+std::vector<std::string> takeBackAfterStart(const std::string& place) {
+    std::vector<std::string> told;
+    for (const unsigned number : changesIn(place)) {
+        try {
+            const ChangeDirectory change(place, number);
+            const auto journal = change.journal();
+            const bool isOpen = journal && !journal->isEnded() && journal->stage != Stage::saved;
+            const bool isAsked = journal && (journal->window != 0 || journal->stage == Stage::takingBack);
+            if (isOpen && isAsked && journal->boot != bootId()) {
+                told.push_back(sentence(number, takeChangeBack(change)));
+            }
+        } catch (const ChangeError& error) {
+            told.push_back("change " + std::to_string(number) + ": " + error.what());
+        }
+    }
+    return told;
+}
+
+std::vector<std::string> guardChange(const ChangeDirectory& change) {
+    const Descriptor alone = change.take(kGuardLock);
+    if (!alone.isOpen()) {
+        return {};
+    }
+    while (!lookOnce(change)) {
+        std::this_thread::sleep_for(kLook);
+    }
+    const Journal journal = change.journal().value_or(Journal{});
+    return journal.stage == Stage::kept ? std::vector<std::string>()
+                                        : std::vector{sentence(change.number(), journal)};
+}
+
+}  // namespace cvagent::undo

@@ -1,0 +1,270 @@
+// Changes that wait for their confirmation, by running the program on links of a real kernel.
+#include <arpa/inet.h>
+#include <gmock/gmock.h>
+#include <sched.h>
+#include <sys/socket.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <csignal>
+#include <nlohmann/json.hpp>
+
+#include "tests/agent/terminal.h"
+#include "tests/support/fake_host.h"
+
+namespace {
+
+using testing::HasSubstr;
+using testing::Not;
+using Json = nlohmann::ordered_json;
+
+constexpr const char* kNewAddress = "203.0.113.7";
+
+class Confirmed : public HostFixture {
+protected:
+    void setUpHost(FakeHost& host) override {
+        for (const char* tool : {"ip", "hostname"}) {
+            host.realTool(tool);
+        }
+        host.useKernelNetwork();
+        host.setHostName("linux");
+        host.file("/etc/HOSTNAME", "linux.example.com");
+        host.file("/etc/hosts", "127.0.0.1\tlocalhost\n192.0.2.10\tlinux.example.com linux\n");
+        host.file("/etc/resolv.conf", "nameserver 192.0.2.53\n");
+        host.file("/etc/sysconfig/network/routes", "default\t192.0.2.1\t-\n");
+        host.file("/etc/sysconfig/network/config", "NETCONFIG_DNS_POLICY=\"\"\n");
+        for (const std::string words :
+             {"link add eth0 type veth peer name sw0", "link set eth0 addrgenmode none", "link set eth0 up",
+              "link set sw0 up", "address add 192.0.2.10/24 broadcast + dev eth0",
+              "route add default via 192.0.2.1"}) {
+            ip(host, words);
+        }
+        std::string hardware = host.run({"cat", "/sys/class/net/eth0/address"}).out;
+        hardware.pop_back();
+        file_ = "/etc/sysconfig/network/ifcfg-eth-id-" + hardware;
+        host.file(file_, "BOOTPROTO=static\nIPADDR=192.0.2.10\nNETMASK=255.255.255.0\n", 0640);
+        old_ = look(host);
+    }
+
+    static std::string ip(FakeHost& host, const std::string& words) {
+        const Finished done = host.run({"sh", "-c", "ip " + words});
+        EXPECT_EQ(done.status, 0) << words << ": " << done.err;
+        return done.out;
+    }
+    static Finished cvagent(FakeHost& host, std::vector<std::string> words) {
+        words.insert(words.begin(), {CVAGENT_PROGRAM, "--plugin", CORVISTA_PLUGIN_FILE});
+        return host.run(words);
+    }
+    static Finished set(FakeHost& host, const std::string& seconds) {
+        return cvagent(host,
+                       {"set", "ip-config:eth0", "IPv4Address", kNewAddress, "--confirm-within", seconds});
+    }
+    std::string look(FakeHost& host) const {
+        return ip(host, "-4 address show dev eth0") + ip(host, "-4 route show table main") +
+               host.read(file_).value_or("-") + host.run({"stat", "-c", "%a %y", file_}).out +
+               host.read("/etc/sysconfig/network/routes").value_or("-");
+    }
+    bool comesBack(FakeHost& host) const {
+        for (int i = 0; i < 6000 && look(host) != old_; ++i) {
+            usleep(10'000);
+        }
+        EXPECT_EQ(look(host), old_);
+        return look(host) == old_;
+    }
+    static std::string stages(FakeHost& host) {
+        std::string all;
+        std::istringstream lines(cvagent(host, {"history", "--changes", "--json"}).out);
+        for (std::string line; std::getline(lines, line);) {
+            const Json change = Json::parse(line);
+            all += (all.empty() ? "" : ", ") + change["change"].dump() + " " +
+                   change["stage"].get<std::string>();
+        }
+        return all;
+    }
+
+    std::string file_;
+    std::string old_;
+};
+
+HOST_TEST_F(Confirmed, AChangeThatNobodyConfirmsIsTakenBack) {
+    const Finished run = set(host, "0.5");
+    EXPECT_EQ(run.status, 0) << run.err;
+    EXPECT_THAT(run.out, HasSubstr("new  203.0.113.7"));
+    EXPECT_THAT(run.err,
+                HasSubstr("change 1 is taken back in 1 second unless somebody types: cvagent confirm 1"));
+    EXPECT_TRUE(comesBack(host));
+    EXPECT_EQ(stages(host), "1 is taken back");
+    const Finished late = cvagent(host, {"confirm", "1"});
+    EXPECT_EQ(late.status, 1);
+    EXPECT_THAT(late.err, HasSubstr("change 1 cannot be confirmed: it is taken back"));
+}
+
+HOST_TEST_F(Confirmed, AChangeThatIsConfirmedStaysUntilItIsRolledBack) {
+    ASSERT_EQ(set(host, "600").status, 0);
+    const std::string changed = look(host);
+    EXPECT_THAT(changed, HasSubstr("IPADDR=203.0.113.7"));
+    EXPECT_EQ(stages(host), "1 waits for its confirmation");
+    const Finished second = set(host, "600");
+    EXPECT_EQ(second.status, 1);
+    EXPECT_THAT(second.err, HasSubstr("the change cannot be guarded: change 1 waits for its confirmation"));
+    EXPECT_THAT(cvagent(host, {"confirm", "1", "--lengthen", "300"}).out,
+                HasSubstr("change 1 has 300 seconds"));
+    EXPECT_EQ(cvagent(host, {"confirm", "1"}).out, "change 1 is kept\n");
+    EXPECT_EQ(look(host), changed);
+    const Finished back = cvagent(host, {"rollback"});
+    EXPECT_EQ(back.status, 0) << back.err;
+    EXPECT_EQ(back.out, "change 1 is taken back\n");
+    EXPECT_EQ(look(host), old_);
+    EXPECT_EQ(cvagent(host, {"rollback"}).status, 3);
+}
+
+/// What apply has made without a confirmation can be taken back, too.
+HOST_TEST_F(Confirmed, AnAppliedFileIsRolledBack) {
+    host.file("/root/changes",
+              R"([{"node": "ip-config:eth0", "property": "IPv4Gateway", "value": "203.0.113.1"},
+                  {"node": "ip-config:eth0", "property": "SubnetMask", "value": "255.255.255.128"},
+                  {"node": "computer", "property": "OwnerName", "value": "x"},
+                  {"node": "ip-config:eth0", "property": "IPv4Address", "value": "203.0.113.7"}])");
+    const Finished run = cvagent(host, {"apply", "/root/changes", "--verify-within", "0.1"});
+    ASSERT_EQ(run.status, 0) << run.out << run.err;
+    EXPECT_EQ(stages(host), "1 is kept");
+    EXPECT_THAT(look(host), HasSubstr("203.0.113.7/25"));
+    const Finished listed = cvagent(host, {"history", "--changes"});
+    EXPECT_THAT(listed.out, HasSubstr("is kept"));
+    EXPECT_THAT(listed.out, HasSubstr("and 3 more"));
+    EXPECT_EQ(cvagent(host, {"rollback", "1"}).status, 0);
+    EXPECT_EQ(look(host), old_);
+    EXPECT_THAT(cvagent(host, {"get", "computer", "OwnerName"}).out, Not(HasSubstr("OwnerName  x")));
+}
+
+/// A step in the middle fails: all is back at once.
+HOST_TEST_F(Confirmed, AStepThatFailsTakesAllBack) {
+    host.file("/root/changes",
+              R"([{"node": "ip-config:eth0", "property": "IPv4Address", "value": "203.0.113.7"},
+                  {"node": "computer", "property": "OwnerName", "value": "x"}])");
+    host.directory("/opt/vantrel/corvista/data", 0700);
+    host.readOnly("/opt/vantrel/corvista/data");
+    const Finished run = cvagent(host, {"apply", "/root/changes", "--force", "--confirm-within", "600"});
+    EXPECT_EQ(run.status, 1);
+    EXPECT_THAT(run.err, HasSubstr("change 1 is taken back"));
+    EXPECT_THAT(run.out, HasSubstr("not made"));
+    EXPECT_EQ(look(host), old_);
+    EXPECT_EQ(stages(host), "1 is taken back");
+}
+
+/// A caller whose connection goes with his own change has the host back.
+HOST_TEST_F(Confirmed, WhoCutsHimselfOffHasTheHostBack) {
+    int ready[2];
+    int moved[2];
+    ASSERT_EQ(pipe(ready) | pipe(moved), 0);
+    const pid_t caller = fork();
+    char mark = 0;
+    if (caller == 0) {
+        if (unshare(CLONE_NEWNET) != 0) {
+            _exit(2);
+        }
+        static_cast<void>(!write(ready[1], "x", 1));
+        static_cast<void>(!read(moved[0], &mark, 1));
+        host.run({"sh", "-c", "ip address add 192.0.2.50/24 dev sw0; ip link set sw0 up"});
+        sockaddr_in there{AF_INET, htons(7), {inet_addr("192.0.2.10")}, {}};
+        const int line = socket(AF_INET, SOCK_STREAM, 0);
+        if (connect(line, reinterpret_cast<const sockaddr*>(&there), sizeof there) != 0 ||
+            write(line, "1", 1) != 1 || read(line, &mark, 1) != 1) {
+            _exit(3);
+        }
+        // The host has its new address now, and this waits for its old one.
+        const bool isThrough = write(line, "2", 1) == 1 && read(line, &mark, 1) == 1 && mark == '2';
+        _exit(isThrough ? 0 : 4);
+    }
+    ASSERT_EQ(read(ready[0], &mark, 1), 1);
+    const int door = socket(AF_INET, SOCK_STREAM, 0);
+    sockaddr_in here{AF_INET, htons(7), {inet_addr("192.0.2.10")}, {}};
+    ASSERT_EQ(bind(door, reinterpret_cast<const sockaddr*>(&here), sizeof here), 0);
+    ASSERT_EQ(listen(door, 1), 0);
+    ip(host, "link set sw0 netns " + std::to_string(caller));
+    ASSERT_EQ(write(moved[1], "x", 1), 1);
+    const int line = accept(door, nullptr, nullptr);
+    ASSERT_EQ(read(line, &mark, 1), 1);
+    ASSERT_EQ(set(host, "0.5").status, 0);
+    ASSERT_EQ(write(line, &mark, 1), 1);  // goes through when the address is back
+    ASSERT_EQ(read(line, &mark, 1), 1);
+    EXPECT_EQ(mark, '2');
+    ASSERT_EQ(write(line, &mark, 1), 1);
+    int status = 0;
+    waitpid(caller, &status, 0);
+    EXPECT_TRUE(WIFEXITED(status));
+    EXPECT_EQ(WEXITSTATUS(status), 0);
+}
+
+/// A terminal's person who could cut himself off is asked for a confirmation, a script is not.
+HOST_TEST_F(Confirmed, APersonAtATerminalIsGuardedUnasked) {
+    const auto typed = [](std::vector<std::string> words) {
+        words.insert(words.begin(), {CVAGENT_PROGRAM, "--plugin", CORVISTA_PLUGIN_FILE, "set"});
+        return runOnTerminal(words, "").output;
+    };
+    EXPECT_THAT(typed({"computer", "OwnerName", "x"}), Not(HasSubstr("cvagent confirm")));
+    EXPECT_THAT(typed({"ip-config:eth0", "IPv4Address", "203.0.113.8", "--confirm-within", "0"}),
+                Not(HasSubstr("cvagent confirm")));
+    EXPECT_EQ(stages(host), "");
+    EXPECT_THAT(typed({"ip-config:eth0", "IPv4Address", "203.0.113.7"}),
+                HasSubstr("in 60 seconds unless somebody types: cvagent confirm 1"));
+    EXPECT_EQ(cvagent(host, {"confirm", "1"}).status, 0);
+    EXPECT_EQ(cvagent(host, {"set", "ip-config:eth0", "IPv4Address", "203.0.113.9"}).status, 0);
+    host.file("/root/script", "cvagent=$1; shift; \"$cvagent\" \"$@\"\n");
+    const OnTerminal script =
+        runOnTerminal({"/bin/sh", "/root/script", CVAGENT_PROGRAM, "--plugin", CORVISTA_PLUGIN_FILE, "set",
+                       "ip-config:eth0", "IPv4Address", "203.0.113.10"},
+                      "");
+    EXPECT_EQ(script.status, 0) << script.output;
+    EXPECT_THAT(script.output, Not(HasSubstr("cvagent confirm")));
+    EXPECT_EQ(stages(host), "1 is kept");
+}
+
+/// Under systemd the guard is a unit, which outlives the session of who has started it.
+HOST_TEST_F(Confirmed, TheGuardIsAUnitWhereSystemdRuns) {
+    host.directory("/run/systemd/system");
+    host.tool("/usr/bin/systemd-run %any",
+              ToolAnswer{"", 0, "", 0, "while [ \"$1\" != -- ]; do shift; done; shift; \"$1\" \"$2\" &"});
+    ASSERT_EQ(set(host, "600").status, 0);
+    const auto calls = host.callsOf("/usr/bin/systemd-run");
+    ASSERT_EQ(calls.size(), 1U);
+    EXPECT_THAT(calls.front(), HasSubstr("--unit=corvista-guard-1 "));
+    EXPECT_THAT(calls.front(), HasSubstr("--property=Restart=on-failure"));
+    EXPECT_EQ(cvagent(host, {"rollback", "1"}).status, 0);
+    EXPECT_EQ(look(host), old_);
+}
+
+HOST_TEST_F(Confirmed, WhatIsNoChangeIsRefused) {
+    for (const auto& [words, status] : std::vector<std::pair<std::vector<std::string>, int>>{
+             {{"confirm"}, 2},
+             {{"confirm", "x"}, 2},
+             {{"confirm", "0"}, 2},
+             {{"confirm", "7"}, 3},
+             {{"confirm", "../1"}, 2},
+             {{"rollback", "7"}, 3},
+             {{"rollback"}, 3},
+             {{"rollback", "1", "2"}, 2},
+             {{"confirm", "1", "--lengthen", "86401"}, 2}}) {
+        EXPECT_EQ(cvagent(host, words).status, status) << words.back();
+    }
+    EXPECT_EQ(set(host, "86401").status, 2);
+    EXPECT_EQ(set(host, "-1").status, 2);
+    EXPECT_EQ(look(host), old_);
+}
+
+/// Where nothing can be kept the change is not begun.
+HOST_TEST_F(Confirmed, AChangeThatCannotBeGuardedIsNotMade) {
+    host.directory("/var/lib/corvista/changes", 0777);
+    ASSERT_EQ(chmod("/var/lib/corvista/changes", 0777), 0);
+    const Finished unsafe = set(host, "60");
+    EXPECT_EQ(unsafe.status, 1);
+    EXPECT_THAT(unsafe.err, HasSubstr("the change cannot be guarded: "));
+    EXPECT_THAT(unsafe.err, HasSubstr("Nothing was done"));
+    EXPECT_EQ(look(host), old_);
+    ASSERT_EQ(chmod("/var/lib/corvista/changes", 0700), 0);
+    host.fullDisk("/var/lib/corvista/changes");
+    EXPECT_EQ(set(host, "60").status, 1);
+    EXPECT_EQ(look(host), old_);
+}
+
+}  // namespace

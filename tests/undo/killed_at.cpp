@@ -1,0 +1,48 @@
+#include "tests/undo/killed_at.h"
+
+#include <fcntl.h>
+#include <sys/syscall.h>
+#include <unistd.h>
+
+#include <csignal>
+
+namespace {
+
+int done = 0;
+int last = 0;
+
+void step() {
+    if (++done == last) {
+        raise(SIGKILL);
+    }
+}
+
+}  // namespace
+
+void dieAtStep(int number) {
+    done = 0;
+    last = number;
+}
+
+int stepsDone() {
+    return done;
+}
+
+// In place of the C library's, for the code under test that is linked into this program.
+extern "C" {
+
+int fsync(int file) {
+    step();
+    return static_cast<int>(syscall(SYS_fsync, file));
+}
+
+int renameat(int oldDirectory, const char* oldName, int newDirectory, const char* newName) noexcept {
+    step();
+    return static_cast<int>(syscall(SYS_renameat, oldDirectory, oldName, newDirectory, newName));
+}
+
+int unlinkat(int directory, const char* name, int flags) noexcept {
+    step();
+    return static_cast<int>(syscall(SYS_unlinkat, directory, name, flags));
+}
+}

@@ -1,0 +1,7 @@
+#pragma once
+
+/// This process kills itself when it is about to do something for the n-th time that lasts: to have a file
+/// written out, renamed or removed. 0: it does not.
+void dieAtStep(int number);
+/// How many of them this process has done so far.
+int stepsDone();
