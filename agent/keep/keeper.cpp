@@ -36,6 +36,11 @@ Keeper keeperOf(const Link& link, Daemons& daemons) {
     return keeper;
 }
 
+Keeper keeperOf(const Link& link) {
+    Daemons daemons;
+    return keeperOf(link, daemons);
+}
+
 std::vector<Keeper> keepers() {
     hosttools::Interfaces interfaces;
     std::vector<Keeper> found;

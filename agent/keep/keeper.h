@@ -29,6 +29,9 @@ struct Keeper {
     std::string system() const { return claims.size() == 1 && unknown.empty() ? claims[0].system : ""; }
 };
 
+/// Of one link; see keepers().
+Keeper keeperOf(const Link& link);
+
 /// Asks what runs on this host, in this order: NetworkManager, systemd-networkd (netplan where that has made
 /// what they keep), wicked, ifupdown. Nothing is changed and no daemon is started by the question; a daemon
 /// that does not answer is waited for two seconds, all in all. Any user.

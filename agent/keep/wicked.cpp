@@ -1,11 +1,15 @@
+#include "agent/core/text.h"
 #include "agent/keep/daemons.h"
 #include "agent/keep/host_files.h"
+#include "agent/keep/ifcfg_editor.h"
 #include "agent/keep/systems.h"
+#include "agent/keep/way.h"
 
 namespace cvagent::keep {
 
 namespace {
 
+constexpr const char* kDirectory = "/etc/sysconfig/network/";
 constexpr std::string_view kBegin = "<origin>";
 constexpr std::string_view kEnd = "</origin>";
 
@@ -28,6 +32,28 @@ std::optional<Claim> claimOfWicked(const Link& link, Daemons& daemons) {
     const std::size_t path = origin.find('/');
     return Claim{"wicked", "wicked has set it up from " + origin,
                  path == std::string::npos ? "" : origin.substr(path)};
+}
+
+Way wayOfWicked(const Link& link, const Claim& claim, const Wish& wish) {
+    const std::string own = kDirectory + std::string("ifcfg-") + link.name;
+    if (claim.source != own) {
+        throw CannotKeep("wicked has it from " + inQuotes(claim.source) + ", not from a file of its own");
+    }
+    if (wish.nameServers || wish.searchDomains) {
+        throw CannotKeep("wicked keeps name servers and domains elsewhere");
+    }
+    const auto settings = smallFile(own);
+    if (!settings) {
+        throw CannotKeep("cannot read " + own);
+    }
+    const std::string routesPath = kDirectory + std::string("ifroute-") + link.name;
+    const auto routes = smallFile(routesPath);
+    const std::string edited = editedIfroute(routes.value_or(""), wish);
+    return {claim.system,
+            {},
+            {{own, settings, editedIfcfg(*settings, wish)},
+             {routesPath, routes, edited == routes.value_or("") ? routes : std::optional(edited)}},
+            {"wicked ifreload " + link.name}};
 }
 
 }  // namespace cvagent::keep

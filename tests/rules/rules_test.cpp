@@ -27,7 +27,7 @@ const std::map<std::string, std::set<std::string>> kMayInclude = {
     {"agent/shell", {"agent/shell", "hosttools"}},
     {"agent/core", {"agent/core", "agent/shell", "framework"}},
     {"agent/verify", {"agent/verify", "agent/core", "hosttools", "framework"}},
-    {"agent/change", {"agent/change", "agent/core", "agent/shell", "hosttools", "framework"}},
+    {"agent/change", {"agent/change", "agent/core", "agent/keep", "agent/shell", "hosttools", "framework"}},
     {"agent/bus", {"agent/bus"}},
     {"agent/keep", {"agent/keep", "agent/bus", "agent/core", "agent/shell", "hosttools", "framework"}},
     {"agent/history", {"agent/history", "agent/core"}},
