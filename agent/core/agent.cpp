@@ -69,7 +69,7 @@ Agent::Engine::Engine(const AgentSettings& settings)
       log(settings.log ? settings.log
                        : std::make_shared<LogOutput>(LogSettings(), std::make_shared<ErrorLines>())),
       deadline(settings.commandTime, settings.tell),
-      events(EventLog::kMost, settings.lastEvent),
+      events(EventLog::kMostPast, settings.lastEvent),
       announcer(listenerOf(settings.keeper), facts, settings.alertTold),
       writer(pool, facts, announcer,
              {[this] { refresh(); }, [this](const Handle& node) { return lists(node); }},

@@ -76,11 +76,13 @@ private:
 /// an event that is told once more. Any thread.
 class EventLog : public Listener {
 public:
-    static constexpr std::size_t kMost = 4096;  ///< a thousand nodes that come, go and change
+    static constexpr std::size_t kMost = 4096;  ///< for a subscriber: a thousand nodes come, go and change
+    /// Past ones: they stay for days in an agent that has little memory, and the history has more.
+    static constexpr std::size_t kMostPast = 1024;
 
     /// @param most how many past events are kept
     /// @param last number of the last event that was told before; it and those before are kept no more
-    explicit EventLog(std::size_t most = kMost, std::uint64_t last = 0)
+    explicit EventLog(std::size_t most = kMostPast, std::uint64_t last = 0)
         : last_(last), kept_(most), allGone_{last, last} {}
 
     void hear(const Event& event) override;

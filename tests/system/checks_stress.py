@@ -6,7 +6,7 @@ from tap import check, expect, expect_equal
 ONLINE, OFFLINE = "NIC is Online ", "NIC is Offline "
 
 FLAPS, DISK_CHANGES, WARM_UP = 200, 50, 24
-FLAT_MEMORY = 512  # KiB: the last events and the database's pages, of which no more than so many are kept
+FLAT_MEMORY = 256  # KiB
 
 
 def flap(context, number):
