@@ -18,9 +18,9 @@ namespace {
 namespace fs = std::filesystem;
 
 constexpr const char* kDirectory = "/tmp/.corvista-rehearsal";
-constexpr std::array kNames = {"shutdown", "reboot", "halt",    "poweroff",  "service",
-                               "rpm",      "init",   "telinit", "hwclock",   "systemctl",
-                               "ifdown",   "ifup",   "wicked",  "networkctl"};
+constexpr std::array kNames = {"shutdown", "reboot",  "halt",    "poweroff",  "service", "rpm",
+                               "init",     "telinit", "hwclock", "systemctl", "ifdown",  "ifup",
+                               "wicked",   "netplan", "nmcli",   "networkctl"};
 /// Only asks the clock, mostly.
 constexpr const char* kDate = "date";
 constexpr int kCannotRun = 127;  // as a shell ends

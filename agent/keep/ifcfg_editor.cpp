@@ -49,6 +49,13 @@ public:
         write("BOOTPROTO", dhcp ? "dhcp" : "static");
     }
 
+    bool hasIpv4Address() const {
+        return std::ranges::any_of(lines_, [](const std::string& line) {
+            const auto found = assignmentIn(line);
+            return found && found->key.starts_with(kAddressKey) && addressIn(found->value, false);
+        });
+    }
+
     void setAddress(const FamilyWish& wish, bool isIpv6) {
         if (!wish.address && !wish.prefix) {
             return;
@@ -185,6 +192,9 @@ std::string editedIfcfg(const std::string& text, const Wish& wish) {
     }
     editor.setAddress(wish.ipv4, false);
     editor.setAddress(wish.ipv6, true);
+    if (wish.dhcp && !*wish.dhcp && !editor.hasIpv4Address()) {
+        throw CannotKeep("no address would be left");
+    }
     return joined(lines, text);
 }
 

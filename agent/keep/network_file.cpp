@@ -109,6 +109,8 @@ public:
         }
     }
 
+    bool hasIpv4Address() { return findAddress(false) != entries_.end(); }
+
     void setNameServers(const std::vector<std::string>& servers) {
         drop("Network", "DNS");
         if (!servers.empty()) {
@@ -269,6 +271,9 @@ std::string ownNetworkFile(const std::string& text, const std::string& link, con
     }
     file.setFamily(wish.ipv4, false);
     file.setFamily(wish.ipv6, true);
+    if (wish.dhcp && !*wish.dhcp && !file.hasIpv4Address()) {
+        throw CannotKeep("no address would be left");
+    }
     if (wish.nameServers) {
         file.setNameServers(*wish.nameServers);
     }

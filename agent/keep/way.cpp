@@ -22,7 +22,8 @@ struct SystemsWay {
     const char* system;
     Way (*way)(const Link&, const Claim&, const Wish&);
 };
-constexpr std::array kWays = {SystemsWay{"systemd-networkd", wayOfNetworkd},
+constexpr std::array kWays = {SystemsWay{"netplan", wayOfNetplan},
+                              SystemsWay{"systemd-networkd", wayOfNetworkd},
                               SystemsWay{"wicked", wayOfWicked}, SystemsWay{"ifupdown", wayOfIfupdown}};
 
 std::string lastLineOf(const std::string& text) {

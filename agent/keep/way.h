@@ -31,6 +31,7 @@ struct Way {
 };
 
 // One function a system: how it would keep the wish. Throws CannotKeep.
+Way wayOfNetplan(const Link& link, const Claim& claim, const Wish& wish);
 Way wayOfNetworkd(const Link& link, const Claim& claim, const Wish& wish);
 Way wayOfWicked(const Link& link, const Claim& claim, const Wish& wish);
 Way wayOfIfupdown(const Link& link, const Claim& claim, const Wish& wish);

@@ -91,7 +91,7 @@ std::optional<unsigned> prefixOf(const std::string& text, unsigned most) {
         return *bits <= most ? bits : std::nullopt;
     }
     for (unsigned bits = 0; bits <= kIpv4Bits; ++bits) {
-        if (text == maskOf(bits)) {
+        if (most == kIpv4Bits && text == maskOf(bits)) {
             return bits;
         }
     }

@@ -46,7 +46,8 @@ bool isIpv4(const std::string& text);
 bool isIpv6(const std::string& text);
 /// "255.255.255.0"
 std::string maskOf(unsigned prefix);
-/// Of a contiguous mask in dotted form, or a number of bits up to `most`; nothing for any other text.
+/// A number of bits up to `most`, or where that is IPv4's a contiguous mask in dotted form; nothing for any
+/// other text.
 std::optional<unsigned> prefixOf(const std::string& text, unsigned most);
 
 /// "192.0.2.10/24" in its parts.

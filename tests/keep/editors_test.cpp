@@ -3,6 +3,7 @@
 
 #include "agent/keep/ifcfg_editor.h"
 #include "agent/keep/interfaces_file.h"
+#include "agent/keep/netplan_file.h"
 #include "agent/keep/network_file.h"
 #include "agent/keep/stanza_editor.h"
 
@@ -11,6 +12,7 @@ namespace {
 using cvagent::keep::CannotKeep;
 using cvagent::keep::editedIfcfg;
 using cvagent::keep::editedIfroute;
+using cvagent::keep::editedNetplan;
 using cvagent::keep::editedStanza;
 using cvagent::keep::ownNetworkFile;
 using cvagent::keep::ownNetworkPath;
@@ -159,6 +161,7 @@ TEST(StanzaEditor, RefusesWhatItDoesNotUnderstand) {
     EXPECT_THAT(refused("iface eth0 inet dhcp\n", origin(false)), HasSubstr("no address"));
     EXPECT_THAT(refused(head, wish), HasSubstr("no mask"));
     EXPECT_THAT(refused(head + " address 192.0.2.1\n netmask 255.0.255.0\n", wish), HasSubstr("no mask"));
+    EXPECT_THAT(refused("iface eth0 inet6 static\n address ::1\n netmask 255.0.0.0\n", ipv6("::2", 64)), "");
     EXPECT_THAT(refused(head + " address one.example/24\n", wish), HasSubstr("not understood"));
     EXPECT_THAT(refused(head + " address 192.0.2.1/24\n address 192.0.2.3/24\n", wish),
                 HasSubstr("not one line"));
@@ -225,7 +228,8 @@ TEST(NetworkFile, HasTheGatewayWhereItStands) {
 }
 
 TEST(NetworkFile, ChangesTheOriginOfIpv4Alone) {
-    EXPECT_EQ(network("[Network]\nDHCP=yes\n", origin(false)), "[Network]\nDHCP=ipv6\n");
+    EXPECT_EQ(network("[Network]\nDHCP=yes\nAddress=192.0.2.10/24\n", origin(false)),
+              "[Network]\nAddress=192.0.2.10/24\nDHCP=ipv6\n");
     EXPECT_EQ(network("[Network]\nDHCP=true\n", origin(true)), "[Network]\nDHCP=true\n");
     EXPECT_EQ(network("[Network]\nAddress=192.0.2.10/24\nAddress=2001:db8::1/64\nGateway=192.0.2.1\n"
                       "[Address]\nAddress=192.0.2.11/24\nLabel=b\n",
@@ -255,6 +259,7 @@ TEST(NetworkFile, IsNotMadeOfWhatIsNotUnderstood) {
     EXPECT_THAT(refused("[Network]\nDHCP=yes\n", address("192.0.2.2")), HasSubstr("comes by DHCP"));
     EXPECT_THAT(refused("[Network]\n", address("192.0.2.2")), HasSubstr("no mask"));
     EXPECT_THAT(refused("[Network]\n", prefix(24)), HasSubstr("no address"));
+    EXPECT_THAT(refused("[Network]\nDHCP=yes\n", origin(false)), HasSubstr("no address would be left"));
     EXPECT_THAT(refusal([] { ownNetworkFile("", "e*", Wish{}); }), HasSubstr("written to no file"));
 }
 
@@ -281,7 +286,8 @@ TEST(IfcfgEditor, ChangesTheLineThatItIsAbout) {
     EXPECT_EQ(editedIfcfg("IPADDR=\"192.0.2.10\"\nPREFIXLEN=\"24\"\n", prefix(25)),
               "IPADDR=\"192.0.2.10\"\nPREFIXLEN='25'\n");
     EXPECT_EQ(editedIfcfg("BOOTPROTO='dhcp'\n", origin(true)), "BOOTPROTO='dhcp'\n");
-    EXPECT_EQ(editedIfcfg("BOOTPROTO=dhcp\n", origin(false)), "BOOTPROTO='static'\n");
+    EXPECT_EQ(editedIfcfg("BOOTPROTO=dhcp\nIPADDR=192.0.2.1/24\n", origin(false)),
+              "BOOTPROTO='static'\nIPADDR=192.0.2.1/24\n");
     EXPECT_EQ(editedIfcfg("", whole("192.0.2.7", 24)), "IPADDR='192.0.2.7/24'\n");
 }
 
@@ -304,6 +310,7 @@ TEST(IfcfgEditor, RefusesWhatItDoesNotUnderstand) {
     EXPECT_THAT(refusal([] { editedIfcfg("IPADDR=$(x)\n", address("192.0.2.2")); }),
                 HasSubstr("not understood"));
     EXPECT_THAT(refusal([] { editedIfcfg("", address("192.0.2.2")); }), HasSubstr("no mask"));
+    EXPECT_THAT(refusal([] { editedIfcfg("BOOTPROTO=dhcp\n", origin(false)); }), HasSubstr("no address"));
     EXPECT_THAT(refusal([] { editedIfcfg("BOOTPROTO=dhcp4+static\n", origin(true)); }),
                 HasSubstr("not understood"));
 }
@@ -316,6 +323,101 @@ TEST(IfrouteEditor, HasOneDefaultRouteOfAFamily) {
     EXPECT_EQ(editedIfroute("default 192.0.2.1 - eth0\nx\n", gateway("192.0.2.2")),
               "default 192.0.2.2 - -\nx\n");
     EXPECT_EQ(editedIfroute("default 192.0.2.1 - eth0\nx\n", gateway("")), "x\n");
+}
+
+constexpr const char* kNetplan =
+    "# the host\nnetwork:\n  version: 2\n  renderer: networkd\n  ethernets:\n    eth1:\n      dhcp4: true\n"
+    "    \"eth0\":\n      match: {macaddress: \"02:00:00:aa:bb:01\"}\n";
+constexpr const char* kNetplanEnd =
+    "    eth2: {dhcp4: true}  # another\n  bridges:\n    br0:\n      dhcp4: no\n";
+
+/// The lines of eth0 behind the change.
+std::string netplan(const std::string& text, const Wish& wish) {
+    const std::string edited = editedNetplan(kNetplan + text + kNetplanEnd, "eth0", wish);
+    EXPECT_TRUE(edited.starts_with(kNetplan) && edited.ends_with(kNetplanEnd)) << edited;
+    EXPECT_EQ(editedNetplan(edited, "eth0", wish), edited);
+    const std::size_t begin = std::string(kNetplan).size();
+    return edited.substr(begin, edited.size() - begin - std::string(kNetplanEnd).size());
+}
+
+TEST(NetplanFile, ChangesTheValueThatItIsAbout) {
+    EXPECT_EQ(
+        netplan("      addresses: [192.0.2.10/24, \"2001:db8::1/64\"]  # ours\n", address("192.0.2.77")),
+        "      addresses: [192.0.2.77/24, \"2001:db8::1/64\"]  # ours\n");
+    EXPECT_EQ(netplan("      addresses:\n      - 198.51.100.1/24\n      - '2001:db8::1/64'\n",
+                      ipv6("2001:db8::2", 48)),
+              "      addresses:\n      - 198.51.100.1/24\n      - '2001:db8::2/48'\n");
+    EXPECT_EQ(netplan("      addresses:\n        - \"192.0.2.10/24\":\n            label: a\n\n        # x\n",
+                      prefix(25)),
+              "      addresses:\n        - \"192.0.2.10/25\":\n            label: a\n\n        # x\n");
+    EXPECT_EQ(netplan("      addresses: [192.0.2.10/24]\n      gateway4: 192.0.2.1\n", gateway("192.0.2.2")),
+              "      addresses: [192.0.2.10/24]\n      gateway4: 192.0.2.2\n");
+}
+
+TEST(NetplanFile, HasAPlaceForWhatIsNew) {
+    EXPECT_EQ(netplan("      mtu: 1400\n", whole("192.0.2.7", 24)),
+              "      mtu: 1400\n      addresses: [\"192.0.2.7/24\"]\n");
+    EXPECT_EQ(netplan("      addresses: [192.0.2.7/24]\n", ipv6("2001:db8::2", 48)),
+              "      addresses: [192.0.2.7/24, \"2001:db8::2/48\"]\n");
+    EXPECT_EQ(netplan("      addresses: []\n", whole("192.0.2.7", 24)),
+              "      addresses: [\"192.0.2.7/24\"]\n");
+    EXPECT_EQ(netplan("      addresses:\n      - 192.0.2.7/24\n      mtu: 1400\n", ipv6("2001:db8::2", 48)),
+              "      addresses:\n      - 192.0.2.7/24\n      - \"2001:db8::2/48\"\n      mtu: 1400\n");
+    EXPECT_EQ(netplan("      mtu: 1400\n", gateway("192.0.2.1")),
+              "      mtu: 1400\n      routes:\n        - to: default\n          via: \"192.0.2.1\"\n");
+}
+
+TEST(NetplanFile, HasTheDefaultRouteAmongOthers) {
+    const std::string other = "      routes:\n        - to: 10.0.0.0/8\n          via: 192.0.2.9\n";
+    EXPECT_EQ(netplan(other + "        - via: 192.0.2.1\n          to: 0.0.0.0/0\n", gateway("192.0.2.2")),
+              other + "        - via: 192.0.2.2\n          to: 0.0.0.0/0\n");
+    EXPECT_EQ(netplan(other, gateway("192.0.2.2")),
+              other + "        - to: default\n          via: \"192.0.2.2\"\n");
+    EXPECT_EQ(
+        netplan("      routes:\n      - {to: default, via: 192.0.2.1, metric: 5}\n", gateway("192.0.2.2")),
+        "      routes:\n      - {to: default, via: 192.0.2.2, metric: 5}\n");
+    EXPECT_EQ(netplan("      routes:\n      - to: default\n        via: \"fe80::1\"\n", gateway("192.0.2.2")),
+              "      routes:\n      - to: default\n        via: \"fe80::1\"\n"
+              "      - to: default\n        via: \"192.0.2.2\"\n");
+}
+
+TEST(NetplanFile, ChangesTheOrigin) {
+    EXPECT_EQ(netplan("      dhcp4: no\n", origin(true)), "      dhcp4: true\n");
+    EXPECT_EQ(netplan("      dhcp4: yes  # lab\n", origin(true)), "      dhcp4: yes  # lab\n");
+    Wish wish = whole("192.0.2.7", 24);
+    wish.dhcp = false;
+    EXPECT_EQ(netplan("      dhcp4: true\n", wish),
+              "      dhcp4: false\n      addresses: [\"192.0.2.7/24\"]\n");
+}
+
+TEST(NetplanFile, IsRefusedWhereItIsNotUnderstood) {
+    const auto refused = [](const std::string& text, const Wish& wish) {
+        return refusal([&] { editedNetplan(text, "eth0", wish); });
+    };
+    const Wish wish = whole("192.0.2.7", 24);
+    const std::string head = "network:\n  ethernets:\n    eth0:\n";
+    EXPECT_EQ(refused(head + "      mtu: 1400\n", wish), "");
+    for (const char* line :
+         {"      addresses: &a [192.0.2.1/24]\n", "      addresses: *a\n", "      <<: *base\n", "\tmtu: 1\n",
+          "      mtu:\t1\n", "      addresses: [192.0.2.1/24,\n        192.0.2.2/24]\n",
+          "      a: |\n        b\n", "      a: !!int 3\n", "      a: \"b\n", "      a: \"\\x31\"\n",
+          "      what\n", "  - x\n    y: z\n  q\n", "---\nnetwork:\n"}) {
+        EXPECT_THAT(refused(head + line, wish), HasSubstr("not understood")) << line;
+    }
+    EXPECT_THAT(refused("", wish), HasSubstr("no interface"));
+    EXPECT_THAT(refused("network:\n  ethernets:\n    eth00:\n      mtu: 1\n", wish),
+                HasSubstr("no interface"));
+    EXPECT_THAT(refused("network:\n  ethernets: {eth0: {}}\n", wish), HasSubstr("not understood"));
+    EXPECT_THAT(refused("network:\n  ethernets:\n    eth0: {mtu: 1400}\n", wish),
+                HasSubstr("not understood"));
+    EXPECT_THAT(refused(head + "      mtu: 1\n    eth0:\n      mtu: 2\n", wish), HasSubstr("more than once"));
+    EXPECT_THAT(refused(head + "      dhcp4: true\n", wish), HasSubstr("comes by DHCP"));
+    EXPECT_THAT(refused(head + "      dhcp4: true\n", origin(false)), HasSubstr("no address would be left"));
+    EXPECT_THAT(refused(head + "      addresses: [192.0.2.1/24]\n", origin(true)),
+                HasSubstr("fixed address"));
+    EXPECT_THAT(refused(head + "      mtu: 1\n", gateway("")), HasSubstr("not taken out"));
+    EXPECT_THAT(refused(head + "      mtu: 1\n", prefix(24)), HasSubstr("no address"));
+    EXPECT_THAT(refused(head + "      addresses: 192.0.2.1\n", wish), HasSubstr("not understood"));
 }
 
 }  // namespace

@@ -196,6 +196,61 @@ HOST_TEST(KeptByWicked, HasTheInterfacesOwnFiles) {
                 HasSubstr("not from a file of its own"));
 }
 
+class KeptByNetplan : public HostFixture {
+protected:
+    void setUpHost(FakeHost& host) override {
+        host.file("/etc/netplan/10-other.yaml", "network:\n  ethernets:\n    eth1:\n      dhcp4: true\n");
+        host.file("/etc/netplan/50-host.yaml", kText, 0600);
+        for (const char* call : {"netplan generate", "networkctl reload", "nmcli connection reload",
+                                 "nmcli device reapply eth0"}) {
+            host.tool(call, "");
+        }
+    }
+    static constexpr const char* kText =
+        "network:\n  ethernets:\n    lan:\n      match: {name: eth0}\n      addresses: [192.0.2.10/24]\n";
+    static constexpr const char* kForNetworkd = "/run/systemd/network/10-netplan-lan.network";
+    static Way way(const std::string& source) {
+        return wayToKeep(kLink, keptBy("netplan", source), newAddress());
+    }
+};
+
+HOST_TEST_F(KeptByNetplan, HasItInTheFileThatDefinesIt) {
+    const Way way = KeptByNetplan::way(kForNetworkd);
+    go(way);
+    EXPECT_EQ(
+        host.read("/etc/netplan/50-host.yaml"),
+        "network:\n  ethernets:\n    lan:\n      match: {name: eth0}\n      addresses: [192.0.2.77/24]\n");
+    struct stat found {};
+    ASSERT_EQ(lstat("/etc/netplan/50-host.yaml", &found), 0);
+    EXPECT_EQ(found.st_mode & 07777U, 0600U);  // there can be passwords in it
+    EXPECT_THAT(host.calls(), TextsAre("netplan generate", "networkctl reload"));
+    go(way.back());
+    EXPECT_EQ(host.read("/etc/netplan/50-host.yaml"), kText);
+}
+
+HOST_TEST_F(KeptByNetplan, TellsTheRendererThatHasIt) {
+    go(way("/run/NetworkManager/system-connections/netplan-lan.nmconnection"));
+    EXPECT_THAT(host.calls(),
+                TextsAre("netplan generate", "nmcli connection reload", "nmcli device reapply eth0"));
+}
+
+HOST_TEST_F(KeptByNetplan, IsAsBeforeWhenItsFileIsNotTaken) {
+    host.toolInTurn("netplan generate", {{"", 78, "Error in network definition\n"}, {}});
+    EXPECT_THAT(refusalOf([] { go(way(kForNetworkd)); }), HasSubstr("Error in network definition"));
+    EXPECT_EQ(host.read("/etc/netplan/50-host.yaml"), kText);
+    EXPECT_THAT(host.calls(), TextsAre("netplan generate", "netplan generate", "networkctl reload"));
+}
+
+HOST_TEST_F(KeptByNetplan, IsRefusedWhereNotOneFileDefinesIt) {
+    host.file("/run/netplan/60-more.yaml", "network:\n  ethernets:\n    lan:\n      mtu: 1400\n");
+    EXPECT_THAT(refusalOf([] { way(kForNetworkd); }), HasSubstr("both define 'lan'"));
+    host.remove("/etc/netplan/50-host.yaml");
+    EXPECT_THAT(refusalOf([] { way(kForNetworkd); }), HasSubstr("no file in /etc/netplan defines 'lan'"));
+    for (const char* source : {"", "/run/systemd/network/10-netplan-.network", "/etc/x"}) {
+        EXPECT_THAT(refusalOf([source] { way(source); }), HasSubstr("netplan's name")) << source;
+    }
+}
+
 HOST_TEST(Keeping, IsRefusedWhereItIsNotKnownWhoKeeps) {
     const auto refused = [](const Keeper& keeper) {
         return refusalOf([&keeper] { wayToKeep(kLink, keeper, newAddress()); });
