@@ -3,6 +3,7 @@
 import argparse
 import json
 import os
+import re
 import shutil
 import sys
 
@@ -12,11 +13,11 @@ sys.path.insert(1, os.path.join(HERE, "..", "system"))
 
 import root  # noqa: E402
 from host import Host  # noqa: E402
-from run import CLOCK, bounding_set  # noqa: E402
 from tap import CHECKS, Report, check, expect, expect_equal  # noqa: E402
 
 PACKAGES = ["dbus", "ifupdown", "iproute2", "libblkid1", "libsqlite3-0", "libstdc++6", "libsystemd0", "netplan.io", "systemd",
             "systemd-resolved", "systemd-sysv"]
+CLOCK = 25  # CAP_SYS_TIME
 AGENT = "/opt/cv/agent/cvagent"
 NODE = "ip-config:eth0"
 STANZA = "# the wire\nauto eth0\niface eth0 inet static\n\taddress 192.0.2.10/24\n\tgateway 192.0.2.1\n"
@@ -139,7 +140,9 @@ def main():
     parser.add_argument("build", help="directory of a build of this architecture")
     parser.add_argument("--only", default="", help="run only the checks that begin so")
     options = parser.parse_args()
-    if bounding_set() >> CLOCK & 1:
+    with open("/proc/self/status", encoding="ascii") as status:
+        rights = int(re.search(r"^CapBnd:\s*(\w+)", status.read(), re.MULTILINE).group(1), 16)
+    if rights >> CLOCK & 1:
         raise SystemExit("with CAP_SYS_TIME this could set the machine's clock: start it as scripts/keep-test does")
     system = root.make("keep", os.popen("dpkg --print-architecture").read().strip(), PACKAGES)
     checks = [row for row in CHECKS["main"] if row[1].__module__ == __name__ and row[0].startswith(options.only)]
