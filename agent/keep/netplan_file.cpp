@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <array>
+#include <cctype>
 
 #include "agent/core/text.h"
 #include "agent/keep/interfaces_file.h"
@@ -15,6 +16,22 @@ constexpr std::array kKinds = {"ethernets", "bonds", "bridges", "vlans", "tunnel
 
 [[noreturn]] void refuseLine(const std::string& line) {
     throw CannotKeep("a line of the file is not understood: " + inQuotes(line));
+}
+
+/// Where a value stands in a line: by itself, not as a part of another one. The comment stands behind it.
+std::size_t placeOf(const std::string& value, const std::string& line) {
+    const auto isPart = [](char letter, bool isInFront) {
+        const auto plain = static_cast<unsigned char>(letter);
+        return std::isalnum(plain) != 0 || letter == '.' || letter == '/' || (isInFront && letter == ':');
+    };
+    for (std::size_t at = line.find(value); at != std::string::npos; at = line.find(value, at + 1)) {
+        const std::size_t end = at + value.size();
+        const bool isBegun = at > 0 && isPart(line[at - 1], true);
+        if (!isBegun && (end == line.size() || !isPart(line[end], false))) {
+            return at;
+        }
+    }
+    refuseLine(line);
 }
 
 /// Where something stands: from its first line to behind its last one.
@@ -249,7 +266,7 @@ private:
     }
 
     void replace(std::size_t line, const std::string& old, const std::string& value) {
-        const std::size_t place = lines_[line].rfind(old);
+        const std::size_t place = placeOf(old, lines_[line]);
         lines_[line].replace(place, old.size(), value);
         parsed_[line] = parsed(lines_[line]);
     }

@@ -354,6 +354,21 @@ TEST(NetplanFile, ChangesTheValueThatItIsAbout) {
               "      addresses: [192.0.2.10/24]\n      gateway4: 192.0.2.2\n");
 }
 
+/// A value can stand in a comment, too, and be a part of another one.
+TEST(NetplanFile, ChangesTheValueWhereItStands) {
+    EXPECT_EQ(
+        netplan("      addresses:\n      - 192.0.2.10/24  # not 192.0.2.10/24\n", address("192.0.2.77")),
+        "      addresses:\n      - 192.0.2.77/24  # not 192.0.2.10/24\n");
+    EXPECT_EQ(netplan("      addresses: [\"2001:1.1.1.1/8\", 1.1.1.1/8]\n", prefix(9)),
+              "      addresses: [\"2001:1.1.1.1/8\", 1.1.1.1/9]\n");
+    EXPECT_EQ(
+        netplan("      nameservers:\n        addresses: [192.0.2.53]\n      addresses: [192.0.2.10/24]\n",
+                address("192.0.2.77")),
+        "      nameservers:\n        addresses: [192.0.2.53]\n      addresses: [192.0.2.77/24]\n");
+    EXPECT_EQ(netplan("      gateway4: 192.0.2.1  # 192.0.2.1\n", gateway("192.0.2.2")),
+              "      gateway4: 192.0.2.2  # 192.0.2.1\n");
+}
+
 TEST(NetplanFile, HasAPlaceForWhatIsNew) {
     EXPECT_EQ(netplan("      mtu: 1400\n", whole("192.0.2.7", 24)),
               "      mtu: 1400\n      addresses: [\"192.0.2.7/24\"]\n");
