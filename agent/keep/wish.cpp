@@ -31,8 +31,13 @@ bool isPlain(const std::string& text, const char* marks) {
     });
 }
 
+/// "0.0.0.0" and "::", however they are written: no address to some, any one to others.
+bool isUnspecified(const std::string& text) {
+    return text.find_first_not_of("0:.") == std::string::npos;
+}
+
 void checkAddress(const std::string& text, bool isFitting) {
-    if (!isFitting) {
+    if (!isFitting || isUnspecified(text)) {
         throw CannotKeep(inQuotes(text) + " is no address that could be kept");
     }
 }

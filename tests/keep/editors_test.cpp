@@ -175,9 +175,10 @@ TEST(Wishes, AreAddressesAndDomainsAndNothingElse) {
         return refusal([&] { editedStanza(text, "eth0", wish); });
     };
     for (const char* hostile : {"", "192.0.2", "192.0.2.1/24", "192.0.2.1\n up touch /tmp/x", "::1",
-                                "192.0.2.1 ", "$(x)", "0x7f.1"}) {
+                                "0.0.0.0", "192.0.2.1 ", "$(x)", "0x7f.1"}) {
         EXPECT_THAT(refused(address(hostile)), HasSubstr("no address")) << hostile;
     }
+    EXPECT_THAT(refused(ipv6("0::0", 64)), HasSubstr("no address"));
     EXPECT_THAT(refused(gateway("192.0.2.1\n\tup x")), HasSubstr("no address"));
     EXPECT_THAT(refused(prefix(0)), HasSubstr("no prefix length"));
     EXPECT_THAT(refused(prefix(33)), HasSubstr("no prefix length"));
