@@ -86,12 +86,22 @@ Wish wishOfPrefixLength(const Written& written) {
     return wish;
 }
 
+/// The plug-in writes it while the address is static, to a file that tells nothing else of it.
+Wish wishOfIpv6Gateway(const Written& written) {
+    Wish wish;
+    if (written.file.origin.empty() || written.file.origin.starts_with(kStatic)) {
+        wish.ipv6.gateway = written.value;
+    }
+    return wish;
+}
+
 struct KeptProperty {
     unsigned int property;
     Wish (*wish)(const Written& written);
 };
-constexpr KeptProperty kKept[] = {{24, wishOfOrigin},      {25, wishOfAddress},  {26, wishOfMask},
-                                  {27, wishOfIpv6Address}, {100, wishOfGateway}, {102, wishOfPrefixLength}};
+constexpr KeptProperty kKept[] = {{24, wishOfOrigin},       {25, wishOfAddress},  {26, wishOfMask},
+                                  {27, wishOfIpv6Address},  {100, wishOfGateway}, {101, wishOfIpv6Gateway},
+                                  {102, wishOfPrefixLength}};
 
 std::optional<unsigned> prefixOn(const KernelNetwork& network, unsigned link, bool isIpv6) {
     const KernelAddress* address = network.mainAddress(link, isIpv6);

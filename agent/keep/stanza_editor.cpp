@@ -148,7 +148,7 @@ private:
             ++stanza_.end;
         } else {
             const std::size_t word = lines_[line].find(option);
-            const std::size_t blank = lines_[line].find_first_not_of(" \t", word + option.size());
+            const std::size_t blank = lines_[line].find_first_not_of(" \t\v\f\r", word + option.size());
             lines_[line] = lines_[line].substr(0, std::min(blank, lines_[line].size()));
             lines_[line] += (blank == std::string::npos ? " " : "") + value;
         }

@@ -136,6 +136,14 @@ TEST(StanzaEditor, WritesNameServersForResolvconf) {
               "iface eth0 inet dhcp\n");
 }
 
+/// Whatever counts as a blank to who reads the file.
+TEST(StanzaEditor, FindsAValueBehindAnyBlank) {
+    EXPECT_EQ(stanza("iface eth0 inet static\n address\v 192.0.2.1/24\n gateway\n", gateway("192.0.2.1")),
+              "iface eth0 inet static\n address\v 192.0.2.1/24\n gateway 192.0.2.1\n");
+    EXPECT_EQ(stanza("iface eth0 inet static\n address\v 192.0.2.1/24\n", address("192.0.2.2")),
+              "iface eth0 inet static\n address\v 192.0.2.2/24\n");
+}
+
 TEST(StanzaEditor, KeepsTheEndOfAFileWithoutALineBreak) {
     EXPECT_EQ(editedStanza("iface eth0 inet static\n address 192.0.2.1/24", "eth0", address("192.0.2.2")),
               "iface eth0 inet static\n address 192.0.2.2/24");

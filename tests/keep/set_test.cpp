@@ -64,6 +64,15 @@ HOST_TEST_F(SetAndKeptByIfupdown, AnAddressOfAnotherHandIsPutBack) {
     EXPECT_THAT(addresses, testing::HasSubstr("inet 198.51.100.1/24"));
 }
 
+HOST_TEST_F(SetAndKeptByIfupdown, AGatewayOfIpv6IsInTheStanzaOfItsFamily) {
+    const std::string six = "iface eth0 inet6 static\n  address 2001:db8::10/64\n";
+    host.file("/etc/network/interfaces", kStanza + six);
+    ip(host, "address add 2001:db8::10/64 dev eth0 nodad");
+    const Finished run = cvagent(host, {"set", "ip-config:eth0", "IPv6Gateway", "2001:db8::1"});
+    EXPECT_THAT(run.err, testing::HasSubstr("kept over a restart by ifupdown"));
+    EXPECT_EQ(host.read("/etc/network/interfaces"), kStanza + six + "  gateway 2001:db8::1\n");
+}
+
 HOST_TEST_F(SetAndKeptByIfupdown, APlanShowsIt) {
     const Finished run = cvagent(host, {"plan", "ip-config:eth0", "IPv4Address", "192.0.2.77"});
     EXPECT_THAT(run.out, testing::HasSubstr("--- /etc/network/interfaces\n"));
