@@ -9,6 +9,7 @@
 #include <thread>
 
 #include "agent/change/interface_settings.h"
+#include "agent/change/kept.h"
 #include "agent/change/kernel_network.h"
 
 namespace cvagent::change {
@@ -20,7 +21,10 @@ struct Scene {
     KernelNetwork before;
     KernelLink link;
     std::string value;  ///< that is written
+    bool isKept;        ///< by the system that keeps the interface, whatever the plug-in's file has
     Neighbours neighbours = Neighbours::awaited;
+
+    bool isWritten(const std::string& inFile) const { return isKept || inFile == value; }
 };
 
 std::string reason(int problem) {
@@ -202,7 +206,7 @@ std::optional<unsigned> runningPrefix(const Scene& scene, bool isIpv6) {
 
 EffectInForce ipv4Address(const Scene& scene) {
     const InterfaceSettings file = settingsOf(scene.link.name);
-    if (file.ipv4Address != scene.value) {
+    if (!scene.isWritten(file.ipv4Address)) {
         return {};
     }
     const auto running = runningPrefix(scene, false);
@@ -212,7 +216,7 @@ EffectInForce ipv4Address(const Scene& scene) {
 EffectInForce subnetMask(const Scene& scene) {
     const InterfaceSettings file = settingsOf(scene.link.name);
     const auto ip = Ip::parse(file.ipv4Address);
-    if (file.mask != scene.value) {
+    if (!scene.isWritten(file.mask)) {
         return {};
     }
     // The plug-in itself gives the running address its mask, and routes go with that.
@@ -223,7 +227,7 @@ EffectInForce subnetMask(const Scene& scene) {
 
 EffectInForce ipv6Address(const Scene& scene) {
     const InterfaceSettings file = settingsOf(scene.link.name);
-    if (file.ipv6Address != scene.value) {
+    if (!scene.isWritten(file.ipv6Address)) {
         return {};
     }
     const auto inFile = prefixIn(file);
@@ -232,11 +236,13 @@ EffectInForce ipv6Address(const Scene& scene) {
 
 EffectInForce prefixLength(const Scene& scene) {
     const InterfaceSettings file = settingsOf(scene.link.name);
-    const auto ip = Ip::parse(file.ipv6Address);
-    if (file.prefixLength != scene.value || isForeign(scene, ip)) {
+    const auto inFile = Ip::parse(file.ipv6Address);
+    if (!scene.isWritten(file.prefixLength) || isForeign(scene, inFile)) {
         return {};
     }
-    return moveAddress(scene, ip, prefixIn(file));
+    const KernelAddress* running = scene.before.mainAddress(scene.link.index, true);
+    const bool isRunning = scene.isKept && running != nullptr;
+    return moveAddress(scene, isRunning ? std::optional(running->ip) : inFile, prefixLengthIn(scene.value));
 }
 
 /// An address in whose subnet the gateway is, of the given link when it has one; null for none.
@@ -266,7 +272,8 @@ EffectInForce ipv4Gateway(const Scene& scene) {
     const std::vector<KernelRoute> routes = defaultRoutes(now);
     const bool isThere =
         std::ranges::any_of(routes, [&gateway](const KernelRoute& each) { return each.gateway == gateway; });
-    if (!gateway || isThere || !isDefaultInRoutesFile(scene.value)) {
+    const bool isWritten = scene.isKept || isDefaultInRoutesFile(scene.value);
+    if (!gateway || isThere || !isWritten) {
         return {};
     }
     const KernelAddress* way = wayTo(now, *gateway, scene.link.index);
@@ -292,22 +299,47 @@ struct Effector {
 constexpr Effector kEffectors[] = {
     {25, ipv4Address}, {26, subnetMask}, {27, ipv6Address}, {100, ipv4Gateway}, {102, prefixLength}};
 
+/// @return given whether the value is kept; none for what is not about a link of the kernel's
+std::function<EffectInForce(bool)> throughNetlink(const IC::MutableNode& node, const Property& row,
+                                                  const IC::PropertyValue& value) {
+    const auto* effector = std::ranges::find(kEffectors, row.id, &Effector::property);
+    if (row.type != NodeType::ipConfig || effector == std::end(kEffectors)) {
+        return nullptr;
+    }
+    Scene scene{KernelNetwork::read(), {}, static_cast<std::string>(value), false, neighbours};
+    const KernelLink* link = scene.before.link(interfaceNameOf(node));
+    if (link == nullptr) {
+        return nullptr;
+    }
+    scene.link = *link;
+    return [scene = std::move(scene), act = effector->act](bool isKept) {
+        Scene now = scene;
+        now.isKept = isKept;
+        return act(now);
+    };
+}
+
 }  // namespace
 
+/// The system that keeps the interface may set it up anew, and knows nothing of what others have added: what
+/// is missing then is put back behind it.
 BringIntoForce bringingIntoForce(Neighbours neighbours) {
     return [neighbours](const IC::MutableNode& node, const Property& row,
                         const IC::PropertyValue& value) -> std::function<EffectInForce()> {
-        const auto* effector = std::ranges::find(kEffectors, row.id, &Effector::property);
-        if (row.type != NodeType::ipConfig || effector == std::end(kEffectors)) {
+        auto keep = keepingOverRestart(node, row, value);
+        auto act = throughNetlink(node, row, value, neighbours);
+        if (!keep && !act) {
             return nullptr;
         }
-        Scene scene{KernelNetwork::read(), {}, static_cast<std::string>(value), neighbours};
-        const KernelLink* link = scene.before.link(interfaceNameOf(node));
-        if (link == nullptr) {
-            return nullptr;
-        }
-        scene.link = *link;
-        return [scene = std::move(scene), act = effector->act] { return act(scene); };
+        return [keep = std::move(keep), act = std::move(act)] {
+            const Kept kept = keep ? keep() : Kept();
+            EffectInForce effect = act ? act(kept.isKept) : EffectInForce();
+            effect.isKept = kept.isKept;
+            if (!kept.note.empty()) {
+                effect.notes.push_back(kept.note);
+            }
+            return effect;
+        };
     };
 }
 

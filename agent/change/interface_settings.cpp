@@ -61,9 +61,13 @@ InterfaceSettings settingsOf(const std::string& interface) {
     return settings;
 }
 
-std::optional<unsigned> prefixIn(const InterfaceSettings& settings) {
-    const auto length = QX::wholeNumber<unsigned>(settings.prefixLength);
+std::optional<unsigned> prefixLengthIn(const std::string& text) {
+    const auto length = QX::wholeNumber<unsigned>(text);
     return length && *length >= 1 && *length <= kMostBits ? length : std::nullopt;
+}
+
+std::optional<unsigned> prefixIn(const InterfaceSettings& settings) {
+    return prefixLengthIn(settings.prefixLength);
 }
 
 bool isDefaultInRoutesFile(const std::string& gateway) {

@@ -22,7 +22,9 @@ struct InterfaceSettings {
 };
 /// All empty where there is no such interface or no file of it.
 InterfaceSettings settingsOf(const std::string& interface);
-/// The IPv6 prefix length of a file; nothing where it has none.
+/// The IPv6 prefix length that a text tells; nothing for one that tells none.
+std::optional<unsigned> prefixLengthIn(const std::string& text);
+/// That of a file.
 std::optional<unsigned> prefixIn(const InterfaceSettings& settings);
 
 /// Whether the routes file has this IPv4 gateway as the default one.

@@ -256,14 +256,31 @@ Json toolList(const std::vector<ToolReport>& reports) {
     return list;
 }
 
+Json keeperList(const std::vector<keep::Keeper>& keepers) {
+    Json list = Json::array();
+    for (const keep::Keeper& keeper : keepers) {
+        Json claims = Json::array();
+        for (const keep::Claim& claim : keeper.claims) {
+            claims.push_back(
+                {{"system", claim.system}, {"evidence", claim.evidence}, {"source", orNull(claim.source)}});
+        }
+        list.push_back({{"interface", keeper.interface},
+                        {"keeper", orNull(keeper.system())},
+                        {"claims", std::move(claims)},
+                        {"unknown", keeper.unknown}});
+    }
+    return list;
+}
+
 }  // namespace
 
 std::string doctor(const remote::ServiceReport& service, const PluginReport& plugins,
-                   const std::vector<ToolReport>& tools) {
+                   const std::vector<ToolReport>& tools, const std::vector<keep::Keeper>& keepers) {
     return document({{"service", serviceObject(service)},
                      {"plugins", plugins.files},
                      {"leftOut", plugins.leftOut},
-                     {"tools", toolList(tools)}},
+                     {"tools", toolList(tools)},
+                     {"keepers", keeperList(keepers)}},
                     2);
 }
 

@@ -8,6 +8,7 @@
 #include "agent/core/host_tools.h"
 #include "agent/core/node_ref.h"
 #include "agent/core/reading.h"
+#include "agent/keep/keeper.h"
 #include "agent/verify/verify.h"
 
 /// The program's JSON. Text that is no UTF-8 has its damaged bytes replaced. Each function returns a whole
@@ -42,9 +43,10 @@ struct PluginReport {
     std::vector<std::string> leftOut;
 };
 /// {"service": {"running", "problem", "version", "since", "looked", "consent"}, "plugins": [FILE...],
-/// "leftOut": [TEXT...], "tools": [{"tool", "host", "classic", "adapter", "used", "package", "purpose"}]}
+/// "leftOut": [TEXT...], "tools": [{"tool", "host", "classic", "adapter", "used", "package", "purpose"}],
+/// "keepers": [{"interface", "keeper", "claims": [{"system", "evidence", "source"}], "unknown": [TEXT...]}]}
 std::string doctor(const remote::ServiceReport& service, const PluginReport& plugins,
-                   const std::vector<ToolReport>& tools);
+                   const std::vector<ToolReport>& tools, const std::vector<keep::Keeper>& keepers);
 /// {"compared", "differences": [{"path", "property", "shown", "kernel", "why"}]}
 std::string verdict(const verify::Result& result);
 

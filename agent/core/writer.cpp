@@ -217,7 +217,11 @@ WriteResult Writer::perform(const Job& job, const Request& request) {
     if (!result.problem && row.readable) {
         result.after = facts_.ask(*job.node, row.id);
         result.outcome = compare(row, job.value, result.after);
-        result.lacking = joined(lackingEffect(*job.node, row, job.value, result.after), effect.lacking);
+        result.lacking = joined(effect.isKept ? "" : lackingEffect(*job.node, row, job.value, result.after),
+                                effect.lacking);
+        if (effect.isKept && result.outcome == WriteResult::differs) {
+            result.outcome = WriteResult::notKnown;  // the plug-in reads its files, or what takes a moment
+        }
         result.notes = std::move(effect.notes);
     }
     announcer_.announceWrite(

@@ -107,6 +107,33 @@ std::string pluginLines(const json::PluginReport& report, const Style& style) {
     return text + "\n";
 }
 
+std::string keeperOf(const keep::Keeper& keeper, const Style& style) {
+    if (keeper.claims.empty() && keeper.unknown.empty()) {
+        return "nobody: what is changed holds until restart";
+    }
+    const std::string system = keeper.system();
+    return system.empty() ? style.bad(keeper.claims.size() > 1 ? "more than one" : "not known")
+                          : style.good(system);
+}
+
+std::string keeperLines(const std::vector<keep::Keeper>& keepers, const Style& style) {
+    std::string text = style.strong("KEPT OVER A RESTART BY") + "\n";
+    std::size_t width = 0;
+    for (const keep::Keeper& keeper : keepers) {
+        width = std::max(width, printable(keeper.interface).size());
+    }
+    for (const keep::Keeper& keeper : keepers) {
+        text += "  " + padded(printable(keeper.interface), width + 2) + keeperOf(keeper, style) + "\n";
+        for (const keep::Claim& claim : keeper.claims) {
+            text += "    " + printable(claim.evidence) + "\n";
+        }
+        for (const std::string& why : keeper.unknown) {
+            text += "    " + style.bad(printable(why)) + "\n";
+        }
+    }
+    return keepers.empty() ? "" : text + "\n";
+}
+
 const char* consentText(const std::string& consent) {
     return consent == "polkit" ? "whom polkit lets" : "root and the group corvista";
 }
@@ -129,8 +156,10 @@ ExitStatus doctor(const Options& options, const remote::ServiceReport& service) 
     const std::vector<ToolReport> reports =
         inspectHostTools(options.hostTools, Look::everything, adapterDirectory());
     const json::PluginReport plugins = findPlugins(options);
-    print(options.json ? json::doctor(service, plugins, reports)
-                       : serviceLines(service, style) + pluginLines(plugins, style) + table(reports, style));
+    const std::vector<keep::Keeper> keepers = keep::keepers();
+    print(options.json ? json::doctor(service, plugins, reports, keepers)
+                       : serviceLines(service, style) + pluginLines(plugins, style) +
+                             keeperLines(keepers, style) + table(reports, style));
     return ExitStatus::done;
 }
 

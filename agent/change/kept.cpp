@@ -1,0 +1,162 @@
+#include "agent/change/kept.h"
+
+#include <algorithm>
+#include <iterator>
+
+#include "agent/change/interface_settings.h"
+#include "agent/change/kernel_network.h"
+#include "agent/core/command_deadline.h"
+#include "agent/keep/way.h"
+#include "framework/qx/whole_number.h"
+
+namespace cvagent::change {
+
+namespace {
+
+using keep::Wish;
+
+constexpr const char* kDhcp = "1";
+constexpr const char* kStatic = "static";
+
+/// What the plug-in has written, with what is known of the interface.
+struct Written {
+    std::string value;
+    InterfaceSettings file;
+    std::optional<unsigned> runningPrefix;  ///< of IPv4
+    std::optional<unsigned> runningPrefix6;
+
+    /// The plug-in passes a write over while its file says that the address comes by DHCP. Where there is no
+    /// file it has none to pass over.
+    bool is(const std::string& inFile) const { return file.origin.empty() || inFile == value; }
+};
+
+// One function a property: what is to be kept. An empty wish when the plug-in has not written it.
+
+Wish wishOfOrigin(const Written& written) {
+    Wish wish;
+    const bool isDhcp = written.value == kDhcp;
+    if (written.file.origin.empty() || written.file.origin.starts_with(isDhcp ? "dhcp" : kStatic)) {
+        wish.dhcp = isDhcp;
+    }
+    return wish;
+}
+
+Wish wishOfAddress(const Written& written) {
+    Wish wish;
+    if (written.is(written.file.ipv4Address)) {
+        wish.dhcp = false;
+        wish.ipv4.address = written.value;
+        const auto inFile = prefixOfMask(written.file.mask);
+        wish.ipv4.likelyPrefix = written.runningPrefix ? written.runningPrefix : inFile;
+    }
+    return wish;
+}
+
+Wish wishOfMask(const Written& written) {
+    Wish wish;
+    if (written.is(written.file.mask)) {
+        wish.ipv4.prefix = prefixOfMask(written.value);
+    }
+    return wish;
+}
+
+Wish wishOfGateway(const Written& written) {
+    Wish wish;
+    if (written.file.origin.empty() || isDefaultInRoutesFile(written.value)) {
+        wish.ipv4.gateway = written.value;
+    }
+    return wish;
+}
+
+Wish wishOfIpv6Address(const Written& written) {
+    Wish wish;
+    if (written.is(written.file.ipv6Address)) {
+        wish.ipv6.address = written.value;
+        const auto inFile = prefixIn(written.file);
+        wish.ipv6.likelyPrefix = inFile ? inFile : written.runningPrefix6;
+    }
+    return wish;
+}
+
+Wish wishOfPrefixLength(const Written& written) {
+    Wish wish;
+    if (written.is(written.file.prefixLength)) {
+        wish.ipv6.prefix = prefixLengthIn(written.value);
+    }
+    return wish;
+}
+
+/// The plug-in writes it while the address is static, to a file that tells nothing else of it.
+Wish wishOfIpv6Gateway(const Written& written) {
+    Wish wish;
+    if (written.file.origin.empty() || written.file.origin.starts_with(kStatic)) {
+        wish.ipv6.gateway = written.value;
+    }
+    return wish;
+}
+
+struct KeptProperty {
+    unsigned int property;
+    Wish (*wish)(const Written& written);
+};
+constexpr KeptProperty kKept[] = {{24, wishOfOrigin},       {25, wishOfAddress},  {26, wishOfMask},
+                                  {27, wishOfIpv6Address},  {100, wishOfGateway}, {101, wishOfIpv6Gateway},
+                                  {102, wishOfPrefixLength}};
+
+std::optional<unsigned> prefixOn(const KernelNetwork& network, unsigned link, bool isIpv6) {
+    const KernelAddress* address = network.mainAddress(link, isIpv6);
+    return address == nullptr ? std::nullopt : std::optional(address->prefix);
+}
+
+std::string placesOf(const keep::Way& way) {
+    std::string places;
+    for (const keep::FileEdit& each : way.files) {
+        if (each.after) {
+            places += (places.empty() ? "" : " and ") + each.path;
+        }
+    }
+    return places.empty() ? "" : ", in " + places;
+}
+
+Kept keepWith(const keep::Link& link, const Wish& wish) {
+    const keep::Keeper keeper = keep::keeperOf(link);
+    if (keeper.claims.empty() && keeper.unknown.empty()) {
+        return {};
+    }
+    try {
+        const keep::Way way = keep::wayToKeep(link, keeper, wish);
+        const CommandScope scope(
+            CommandScope::write);  // its commands have a write's time, and are told as its
+        keep::go(way);
+        return {true, "kept over a restart by " + way.system + placesOf(way)};
+    } catch (const keep::CannotKeep& cannot) {
+        return {false, "not kept over a restart: " + std::string(cannot.what())};
+    }
+}
+
+}  // namespace
+
+std::function<Kept()> keepingOverRestart(const IC::MutableNode& node, const Property& row,
+                                         const IC::PropertyValue& value) {
+    const auto* kept = std::ranges::find(kKept, row.id, &KeptProperty::property);
+    if (row.type != NodeType::ipConfig || kept == std::end(kKept)) {
+        return nullptr;
+    }
+    const KernelNetwork network = KernelNetwork::read();
+    const KernelLink* link = network.link(interfaceNameOf(node));
+    if (link == nullptr) {
+        return nullptr;
+    }
+    Written before{static_cast<std::string>(value),
+                   {},
+                   prefixOn(network, link->index, false),
+                   prefixOn(network, link->index, true)};
+    return [link = keep::Link{link->name, link->index}, written = std::move(before), act = kept->wish] {
+        Written now = written;
+        now.file = settingsOf(link.name);
+        const Wish wish = act(now);
+        return wish.isEmpty() ? Kept() : keepWith(link, wish);
+    };
+}
+
+}  // namespace cvagent::change

@@ -1,0 +1,22 @@
+#pragma once
+
+#include <functional>
+#include <string>
+
+#include "agent/core/writer.h"
+
+namespace cvagent::change {
+
+struct Kept {
+    bool isKept = false;
+    std::string note;  ///< where it is kept, or why it is not; "" where nobody is known who could
+};
+
+/// Has the system that keeps an interface over a restart keep what is written of it. To be called before the
+/// write; what it gives is called behind one that the plug-in took. Where the interface has a file of the
+/// plug-in's, nothing is kept that was not written there.
+/// @return none for what is not about an interface of the kernel's, or kept by no such system
+std::function<Kept()> keepingOverRestart(const IC::MutableNode& node, const Property& row,
+                                         const IC::PropertyValue& value);
+
+}  // namespace cvagent::change

@@ -1,0 +1,16 @@
+#pragma once
+
+#include <string>
+
+#include "agent/keep/wish.h"
+
+namespace cvagent::keep {
+
+/// The file of an interface on current SUSE ("ifcfg-eth0") with as few lines changed as the wish takes.
+/// Gateways and name servers stand in other files. Throws CannotKeep.
+std::string editedIfcfg(const std::string& text, const Wish& wish);
+
+/// The file of an interface's own routes ("ifroute-eth0") with the default routes of the wish in it.
+std::string editedIfroute(const std::string& text, const Wish& wish);
+
+}  // namespace cvagent::keep

@@ -1,0 +1,9 @@
+// The files of current SUSE.
+#include "agent/keep/ifcfg_editor.h"
+#include "tests/fuzz/kept.h"
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+    return kept::edited(data, size, [](const std::string& text, const cvagent::keep::Wish& wish) {
+        return cvagent::keep::editedIfroute(cvagent::keep::editedIfcfg(text, wish), wish);
+    });
+}

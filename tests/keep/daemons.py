@@ -1,0 +1,159 @@
+"""Changes an interface that a real daemon keeps, on a host with the real systemd, and restarts that. Reports as TAP."""
+
+import argparse
+import json
+import os
+import re
+import shutil
+import sys
+
+HERE = os.path.dirname(os.path.abspath(__file__))
+sys.path.insert(1, os.path.join(HERE, "..", "package"))
+sys.path.insert(1, os.path.join(HERE, "..", "system"))
+
+import root  # noqa: E402
+from host import Host  # noqa: E402
+from tap import CHECKS, Report, check, expect, expect_equal  # noqa: E402
+
+PACKAGES = ["dbus", "ifupdown", "iproute2", "libblkid1", "libsqlite3-0", "libstdc++6", "libsystemd0", "netplan.io", "systemd",
+            "systemd-resolved", "systemd-sysv"]
+CLOCK = 25  # CAP_SYS_TIME
+AGENT = "/opt/cv/agent/cvagent"
+NODE = "ip-config:eth0"
+STANZA = "# the wire\nauto eth0\niface eth0 inet static\n\taddress 192.0.2.10/24\n\tgateway 192.0.2.1\n"
+NETWORK = "[Match]\nName=eth*\n[Network]\nAddress=192.0.2.10/24\nGateway=192.0.2.1\n"
+NETPLAN = ("network:\n  version: 2\n  ethernets:\n    eth0:\n      addresses: [192.0.2.10/24]  # ours\n"
+           "      routes:\n        - to: default\n          via: 192.0.2.1\n")
+
+
+class Context:
+    """A host of each check's own: a cable whose end eth0 some daemon keeps, and the programs of a build."""
+
+    def __init__(self, system, build):
+        self.host = Host(system)
+        place = f"/proc/{self.host.init}/root/opt/cv"
+        os.makedirs(f"{place}/agent")
+        for program in ("cvagent", "corvista-rehearsal"):
+            shutil.copy(f"{build}/agent/{program}", f"{place}/agent")
+        shutil.copytree(f"{build}/lib", f"{place}/lib", symlinks=True, ignore=shutil.ignore_patterns("*.a"))
+        shutil.copytree(f"{build}/hosttools", f"{place}/hosttools", symlinks=True, ignore=shutil.ignore_patterns("*.a", "CMake*"))
+        self.host.sh("systemctl stop systemd-networkd networking 2>/dev/null; "
+                     "ip link add eth0 type veth peer name cable; ip link set cable up")
+
+    def write(self, path, text):
+        self.host.sh(f"mkdir -p {os.path.dirname(path)}")
+        with open(f"/proc/{self.host.init}/root{path}", "w", encoding="utf-8") as file:
+            file.write(text)
+        os.chmod(f"/proc/{self.host.init}/root{path}", 0o644)
+
+    def read(self, path):
+        with open(f"/proc/{self.host.init}/root{path}", encoding="utf-8") as file:
+            return file.read()
+
+    def keeper(self):
+        keepers = json.loads(self.host.sh(f"{AGENT} doctor --json"))["keepers"]
+        return next(each for each in keepers if each["interface"] == "eth0")
+
+    def set(self, name, value, kept_in):
+        result = self.host.run(f"{AGENT} set {NODE} {name} {value}")
+        expect_equal(f"the status of {name} {value} ({result.stdout}{result.stderr})", result.returncode, 0)
+        expect(f"kept over a restart by {kept_in}" in result.stderr, f"not told where it is kept: {result.stderr}")
+
+    def wait_for_address(self, address):
+        """The one and no other, with the default route."""
+        self.host.wait_for("ip -4 -o address show dev eth0 scope global | awk '{print $4}' | xargs | "
+                           f"grep -qx '{address}' && ip route | grep -q 'default via 192.0.2.1 dev eth0'")
+
+
+def change_and_restart(context, kept_in, restart):
+    context.wait_for_address("192.0.2.10/24")
+    plan = context.host.sh(f"{AGENT} plan {NODE} IPv4Address 192.0.2.77")
+    expect("192.0.2.77/24" in plan, f"the plan does not show it: {plan}")
+    context.set("IPv4Address", "192.0.2.77", kept_in)
+    context.wait_for_address("192.0.2.77/24")
+    context.host.sh(restart)
+    context.wait_for_address("192.0.2.77/24")
+    context.set("SubnetMask", "255.255.255.128", kept_in)
+    context.host.sh(restart)
+    context.wait_for_address("192.0.2.77/25")
+
+
+@check("ifupdown: a change is in the stanza and in force; set back, the file is as it was, byte for byte")
+def ifupdown(context):
+    context.write("/etc/network/interfaces", STANZA)
+    context.host.sh("ifup eth0")
+    expect_equal("who keeps it", context.keeper()["keeper"], "ifupdown")
+    change_and_restart(context, "ifupdown, in /etc/network/interfaces", "ifdown eth0; ifup eth0")
+    context.set("SubnetMask", "255.255.255.0", "ifupdown")
+    context.set("IPv4Address", "192.0.2.10", "ifupdown")
+    context.wait_for_address("192.0.2.10/24")
+    expect_equal("the file", context.read("/etc/network/interfaces"), STANZA)
+
+
+@check("systemd-networkd: a change is in a file of ours, in front of the other one; without it, the host is as it was")
+def networkd(context):
+    context.write("/etc/systemd/network/20-lan.network", NETWORK)
+    context.host.sh("systemctl start systemd-networkd")
+    context.host.wait_for("networkctl status eth0 | grep -q configured")
+    expect_equal("who keeps it", context.keeper()["keeper"], "systemd-networkd")
+    change_and_restart(context, "systemd-networkd, in /etc/systemd/network/0-cvagent-eth0.network", "systemctl restart systemd-networkd")
+    expect_equal("the file", context.read("/etc/systemd/network/20-lan.network"), NETWORK)
+    context.host.sh("rm /etc/systemd/network/0-cvagent-eth0.network; networkctl reload")
+    context.wait_for_address("192.0.2.10/24")
+
+
+@check("netplan: a change is in its file, and what it makes for networkd is made anew; set back, the file is as it was")
+def netplan(context):
+    context.write("/etc/netplan/50-host.yaml", NETPLAN)
+    context.host.sh("netplan generate; systemctl start systemd-networkd")
+    context.host.wait_for("networkctl status eth0 | grep -q configured")
+    expect_equal("who keeps it", context.keeper()["keeper"], "netplan")
+    change_and_restart(context, "netplan, in /etc/netplan/50-host.yaml", "netplan generate; systemctl restart systemd-networkd")
+    context.set("SubnetMask", "255.255.255.0", "netplan")
+    context.set("IPv4Address", "192.0.2.10", "netplan")
+    context.wait_for_address("192.0.2.10/24")
+    expect_equal("the file", context.read("/etc/netplan/50-host.yaml"), NETPLAN)
+
+
+@check("two at once: an interface that ifupdown and networkd both have is left alone")
+def two(context):
+    context.write("/etc/network/interfaces", STANZA)
+    context.write("/etc/systemd/network/20-lan.network", NETWORK)
+    context.host.sh("ifup eth0; systemctl start systemd-networkd")
+    context.host.wait_for("networkctl status eth0 | grep -q configured")
+    expect_equal("who claims it", [claim["system"] for claim in context.keeper()["claims"]], ["systemd-networkd", "ifupdown"])
+    result = context.host.run(f"{AGENT} set {NODE} IPv4Address 192.0.2.77")
+    expect("systemd-networkd and ifupdown both have 'eth0'" in result.stderr, result.stderr)
+    expect_equal("the stanza", context.read("/etc/network/interfaces"), STANZA)
+
+
+def evidence_of(host):
+    def collect():
+        for command in ("ip address show dev eth0; ip route", "networkctl --no-pager status eth0 | head -30",
+                        "journalctl --no-pager -n 20 -o short-monotonic -u systemd-networkd"):
+            yield command, (host.run(command).stdout).splitlines()
+    return collect
+
+
+def main():
+    parser = argparse.ArgumentParser(description=__doc__)
+    parser.add_argument("build", help="directory of a build of this architecture")
+    parser.add_argument("--only", default="", help="run only the checks that begin so")
+    options = parser.parse_args()
+    with open("/proc/self/status", encoding="ascii") as status:
+        rights = int(re.search(r"^CapBnd:\s*(\w+)", status.read(), re.MULTILINE).group(1), 16)
+    if rights >> CLOCK & 1:
+        raise SystemExit("with CAP_SYS_TIME this could set the machine's clock: start it as scripts/keep-test does")
+    system = root.make("keep", os.popen("dpkg --print-architecture").read().strip(), PACKAGES)
+    checks = [row for row in CHECKS["main"] if row[1].__module__ == __name__ and row[0].startswith(options.only)]
+    report = Report()
+    for name, function in checks:
+        context = Context(system, options.build)
+        try:
+            report.run(name, function, context, evidence_of(context.host))
+        finally:
+            context.host.stop()
+    return report.finish(len(checks))
+
+
+sys.exit(main())

@@ -1,0 +1,117 @@
+// A change that is kept by the system that keeps the interface: with the program, on links of a real kernel.
+#include <gmock/gmock.h>
+#include <sys/mount.h>
+
+#include "tests/support/fake_host.h"
+
+namespace {
+
+class SetAndKept : public HostFixture {
+protected:
+    void setUpHost(FakeHost& host) override {
+        for (const char* tool : {"ip", "ifconfig", "hostname"}) {
+            host.realTool(tool);
+        }
+        host.useKernelNetwork();
+        ip(host, "link add eth0 type veth peer name sw0");
+        ip(host, "address add 192.0.2.10/24 dev eth0");
+        ip(host, "link set eth0 up");
+        ip(host, "link set sw0 up");
+    }
+    static std::string ip(FakeHost& host, const std::string& words) {
+        const Finished done = host.run({"sh", "-c", "ip " + words});
+        EXPECT_EQ(done.status, 0) << words << ": " << done.err;
+        return done.out;
+    }
+    static Finished cvagent(FakeHost& host, std::vector<std::string> words) {
+        words.insert(words.begin(), CVAGENT_PROGRAM);
+        return host.run(words);
+    }
+};
+
+/// ifupdown, as far as a test needs it: it sets the interface up from the one stanza.
+class SetAndKeptByIfupdown : public SetAndKept {
+protected:
+    void setUpHost(FakeHost& host) override {
+        SetAndKept::setUpHost(host);
+        host.file("/run/network/ifstate", "lo=lo\neth0=eth0\n");
+        host.file("/etc/network/interfaces", kStanza);
+        host.tool("ifdown eth0", {"", 0, "", 0, "ip address flush dev eth0"});
+        host.tool("ifup eth0", {"", 0, "", 0,
+                                "set -- $(grep address /etc/network/interfaces); "
+                                "ip address add $2 dev eth0; ip link set eth0 up"});
+    }
+    static constexpr const char* kStanza = "iface eth0 inet static\n  address 192.0.2.10/24\n";
+};
+
+HOST_TEST_F(SetAndKeptByIfupdown, AnAddressIsInItsFileAndInForce) {
+    const Finished run = cvagent(host, {"set", "ip-config:eth0", "IPv4Address", "192.0.2.77"});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_THAT(run.err, testing::HasSubstr("kept over a restart by ifupdown, in /etc/network/interfaces"));
+    EXPECT_EQ(host.read("/etc/network/interfaces"), "iface eth0 inet static\n  address 192.0.2.77/24\n");
+    EXPECT_THAT(host.callsOf("ifdown"), TextsAre("ifdown eth0"));
+    EXPECT_THAT(host.callsOf("ifup"), TextsAre("ifup eth0"));
+    const std::string addresses = ip(host, "-4 -o address show dev eth0");
+    EXPECT_THAT(addresses, testing::HasSubstr("inet 192.0.2.77/24"));
+    EXPECT_THAT(addresses, testing::Not(testing::HasSubstr("192.0.2.10/24")));
+}
+
+HOST_TEST_F(SetAndKeptByIfupdown, AnAddressOfAnotherHandIsPutBack) {
+    ip(host, "address add 198.51.100.1/24 dev eth0");
+    EXPECT_EQ(cvagent(host, {"set", "ip-config:eth0", "SubnetMask", "255.255.255.128"}).status, 0);
+    const std::string addresses = ip(host, "-4 -o address show dev eth0");
+    EXPECT_THAT(addresses, testing::HasSubstr("inet 192.0.2.10/25"));
+    EXPECT_THAT(addresses, testing::HasSubstr("inet 198.51.100.1/24"));
+}
+
+HOST_TEST_F(SetAndKeptByIfupdown, AGatewayOfIpv6IsInTheStanzaOfItsFamily) {
+    const std::string six = "iface eth0 inet6 static\n  address 2001:db8::10/64\n";
+    host.file("/etc/network/interfaces", kStanza + six);
+    ip(host, "address add 2001:db8::10/64 dev eth0 nodad");
+    const Finished run = cvagent(host, {"set", "ip-config:eth0", "IPv6Gateway", "2001:db8::1"});
+    EXPECT_THAT(run.err, testing::HasSubstr("kept over a restart by ifupdown"));
+    EXPECT_EQ(host.read("/etc/network/interfaces"), kStanza + six + "  gateway 2001:db8::1\n");
+}
+
+HOST_TEST_F(SetAndKeptByIfupdown, APlanShowsIt) {
+    const Finished run = cvagent(host, {"plan", "ip-config:eth0", "IPv4Address", "192.0.2.77"});
+    EXPECT_THAT(run.out, testing::HasSubstr("--- /etc/network/interfaces\n"));
+    EXPECT_THAT(run.out, testing::HasSubstr("+  address 192.0.2.77/24\n"));
+    EXPECT_THAT(run.out, testing::HasSubstr("ifdown eth0"));
+    EXPECT_THAT(run.out, testing::HasSubstr("+ address eth0 192.0.2.77/24\n"));
+    EXPECT_EQ(host.read("/etc/network/interfaces"), kStanza);
+    EXPECT_THAT(host.callsOf("ifdown"), testing::IsEmpty());
+}
+
+HOST_TEST_F(SetAndKeptByIfupdown, WhatIsNotKeptIsTold) {
+    host.file("/etc/network/interfaces", "iface eth0 inet manual\n");
+    const Finished run = cvagent(host, {"set", "ip-config:eth0", "IPv4Address", "192.0.2.77"});
+    EXPECT_EQ(run.status, 1);
+    EXPECT_THAT(run.err, testing::HasSubstr("not kept over a restart: the stanza's method is 'manual'"));
+    EXPECT_THAT(host.callsOf("ifdown"), testing::IsEmpty());
+}
+
+HOST_TEST_F(SetAndKeptByIfupdown, AnInterfaceThatDoesNotComeUpHasItsOldFile) {
+    host.tool("ifup eth0", "", 1);
+    const Finished run = cvagent(host, {"set", "ip-config:eth0", "IPv4Address", "192.0.2.77"});
+    EXPECT_EQ(run.status, 1);
+    EXPECT_THAT(run.err, testing::HasSubstr("not kept over a restart: ifup eth0 has failed"));
+    EXPECT_EQ(host.read("/etc/network/interfaces"), kStanza);
+}
+
+HOST_TEST_F(SetAndKept, NothingIsKeptWhereTwoClaimTheInterface) {
+    const std::string index = host.run({"cat", "/sys/class/net/eth0/ifindex"}).out;
+    host.file("/run/network/ifstate", "eth0=eth0\n");
+    host.file("/etc/network/interfaces", "iface eth0 inet static\n  address 192.0.2.10/24\n");
+    host.file("/run/wicked/state-" + index.substr(0, index.find('\n')) + ".xml",
+              "<origin>compat:suse:/etc/sysconfig/network/ifcfg-eth0</origin>");
+    host.mountOver("/sys/fs/cgroup",
+                   [] { ASSERT_EQ(mount("groups", "/sys/fs/cgroup", "tmpfs", 0, nullptr), 0); });
+    host.file("/sys/fs/cgroup/system.slice/wickedd.service/cgroup.procs", "812\n");
+    const Finished run = cvagent(host, {"set", "ip-config:eth0", "IPv4Address", "192.0.2.77"});
+    EXPECT_EQ(run.status, 1);
+    EXPECT_THAT(run.err, testing::HasSubstr("not kept over a restart: wicked and ifupdown both have 'eth0'"));
+    EXPECT_EQ(host.callsOf("ifdown"), std::vector<std::string>());
+}
+
+}  // namespace
