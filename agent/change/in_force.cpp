@@ -301,7 +301,7 @@ constexpr Effector kEffectors[] = {
 
 /// @return given whether the value is kept; none for what is not about a link of the kernel's
 std::function<EffectInForce(bool)> throughNetlink(const IC::MutableNode& node, const Property& row,
-                                                  const IC::PropertyValue& value) {
+                                                  const IC::PropertyValue& value, Neighbours neighbours) {
     const auto* effector = std::ranges::find(kEffectors, row.id, &Effector::property);
     if (row.type != NodeType::ipConfig || effector == std::end(kEffectors)) {
         return nullptr;
