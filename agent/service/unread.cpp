@@ -1,6 +1,7 @@
 #include "agent/service/unread.h"
 
 #include <algorithm>
+#include <array>
 #include <chrono>
 #include <iterator>
 
@@ -23,6 +24,13 @@ struct UnreadLimit {
     std::uint64_t ofOne;  ///< so many at most may wait for one
 };
 constexpr UnreadLimit kUnreadLimits[] = {{64U << 20U, 0}, {32U << 20U, 64U << 10U}, {8U << 20U, 1U << 20U}};
+
+/// Whether an answer means that the bus never tells.
+bool isRefusal(const bus::Message& answer) {
+    constexpr std::array kNames = {bus::kUnknownMethod, bus::kUnknownInterface, bus::kUnknownObject,
+                                   bus::kAccessDenied};
+    return answer.isError() && std::ranges::find(kNames, answer.error().name()) != std::ranges::end(kNames);
+}
 
 /// A figure of the bus about a connection.
 std::optional<std::uint64_t> figureIn(const bus::Message& answer, const std::string& name) {
@@ -80,7 +88,9 @@ void Unread::ask(const std::string& name, const std::string& figure, const Told&
     slots_.push_back(
         connection_.askLater(call, kFiguresPatience, [this, figure, told](const bus::Message& answer) {
             --questions_;
-            told(figureIn(answer, figure));
+            const auto found = figureIn(answer, figure);
+            untold_ = untold_ || isRefusal(answer) || (!answer.isError() && !found);
+            told(found);
         }));
 }
 
@@ -88,11 +98,14 @@ void Unread::takeOwn(std::optional<std::uint64_t> bytes) {
     nextLook_.reset();
     const auto* const limit =
         std::ranges::find_if(kUnreadLimits, [bytes](const UnreadLimit& each) { return bytes >= each.ofAll; });
-    untold_ = !bytes;
-    if (untold_ || limit == std::end(kUnreadLimits)) {
+    if (untold_ || (bytes && limit == std::end(kUnreadLimits))) {
         recent_.clear();
         silent_.clear();
         return;
+    }
+    nextLook_ = loop_.after(kNextUnreadLook, [this] { look(); });
+    if (!bytes) {
+        return;  // it was not told in time
     }
     for (const auto& [name, refusals] : silent_) {
         recent_.insert(name);
@@ -101,7 +114,6 @@ void Unread::takeOwn(std::optional<std::uint64_t> bytes) {
         ask(name, "OutgoingBytes",
             [this, name, most = limit->ofOne](auto unread) { judge(name, unread > most); });
     }
-    nextLook_ = loop_.after(kNextUnreadLook, [this] { look(); });
 }
 
 void Unread::judge(const std::string& name, bool readsNothing) {

@@ -13,6 +13,7 @@ if(CORVISTA_SERVICE)
     service/private_bus_test.cpp
     service/service_test.cpp
     service/service_run.cpp
+    service/unread_test.cpp
     service/workers_test.cpp
     service/write_test.cpp)
   target_compile_definitions(service_test PRIVATE ${agent_test_programs} CVAGENTD_PROGRAM="$<TARGET_FILE:cvagentd>"
