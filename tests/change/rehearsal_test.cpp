@@ -16,6 +16,7 @@
 
 #include "agent/change/name_service.h"
 #include "agent/change/recorders.h"
+#include "agent/core/data_directory.h"
 #include "tests/change/rehearsed.h"
 
 namespace {
