@@ -6,11 +6,10 @@
 #include <linux/netlink.h>
 #include <linux/nexthop.h>
 #include <linux/rtnetlink.h>
+#include <linux/veth.h>
 #include <net/if.h>
-#include <unistd.h>
 
 #include <algorithm>
-#include <array>
 #include <cerrno>
 #include <cstring>
 #include <set>
@@ -28,8 +27,6 @@ using hosttools::NetlinkSocket;
 using hosttools::readPlain;
 
 constexpr unsigned kNew = NLM_F_CREATE | NLM_F_EXCL | NLM_F_ACK;
-/// What stands for a link that cannot be one of its kind, the likest first.
-constexpr std::array kSubstitutes = {"dummy", "ifb", "bridge"};
 constexpr std::size_t kMostRoutes = 10'000;  // a router's table would take seconds
 
 bool isThere(int error) {
@@ -127,28 +124,27 @@ bool makeAlike(NetlinkSocket& socket, const Model& link) {
     return isThere(tell(socket, requestFor(link, more)));
 }
 
-/// The kernel would load a driver that it lacks, and that of dummy or ifb makes links in the host's network
-/// at once. A bridge's makes none.
-bool canBeAskedFor(const std::string& kind) {
-    return kind == "bridge" || access(("/sys/module/" + kind).c_str(), F_OK) == 0;
+/// The other end of a cable, in another network. Its driver makes no links by itself when the kernel has to
+/// load it, as that of dummies would in the host's network.
+std::string cable(int peers) {
+    return linkInfo("veth", makeAttribute(VETH_INFO_PEER, std::string(bytesOf(ifinfomsg{})) +
+                                                              attribute(IFLA_NET_NS_FD, peers)));
 }
 
-void makeSubstitute(NetlinkSocket& socket, const Model& link) {
-    for (const char* kind : kSubstitutes) {
-        if (canBeAskedFor(kind) && isThere(tell(socket, requestFor(link, linkInfo(kind, {}))))) {
-            return;
-        }
+void makeSubstitute(NetlinkSocket& socket, const Model& link, int peers) {
+    if (!isThere(tell(socket, requestFor(link, cable(peers))))) {
+        tell(socket, requestFor(link, linkInfo("bridge", {})));
     }
 }
 
 /// One VLAN may lie on another one.
-void makeLinks(NetlinkSocket& socket, const std::vector<Model>& links) {
+void makeLinks(NetlinkSocket& socket, const std::vector<Model>& links, int peers) {
     std::vector<const Model*> later;
     for (const Model& link : links) {
         if (!link.isLoopback() && link.kind() == "vlan") {
             later.push_back(&link);
         } else if (!link.isLoopback() && !makeAlike(socket, link)) {
-            makeSubstitute(socket, link);
+            makeSubstitute(socket, link, peers);
         }
     }
     for (std::size_t left = later.size() + 1; !later.empty() && later.size() < left;) {
@@ -156,7 +152,7 @@ void makeLinks(NetlinkSocket& socket, const std::vector<Model>& links) {
         std::erase_if(later, [&socket](const Model* link) { return makeAlike(socket, *link); });
     }
     for (const Model* link : later) {
-        makeSubstitute(socket, *link);
+        makeSubstitute(socket, *link, peers);
     }
 }
 
@@ -197,6 +193,15 @@ void joinAndRaise(NetlinkSocket& socket, const std::vector<Model>& links) {
         if (link.isUp()) {
             set(socket, link, "", true);
         }
+    }
+}
+
+/// A link whose other end is up is in use as soon as it is raised itself.
+void raiseAll(NetlinkSocket& socket) {
+    for (const NetworkMessage& message : readNetwork(socket).links) {
+        const Model link(message);
+        makeNoAddresses(socket, link);
+        set(socket, link, "", true);
     }
 }
 
@@ -304,13 +309,14 @@ void copyRules(NetlinkSocket& socket, const std::vector<NetworkMessage>& wanted)
 
 }  // namespace
 
-void buildNetwork(const NetworkMessages& like) {
+void buildNetwork(const NetworkMessages& like, const Peers& peers) {
     NetlinkSocket socket(NETLINK_ROUTE);
     std::vector<Model> links;
     for (const NetworkMessage& message : like.links) {
         links.emplace_back(message);
     }
-    makeLinks(socket, links);
+    makeLinks(socket, links, peers.network);
+    raiseAll(peers.socket);
     joinAndRaise(socket, links);
     copyAddresses(socket, like.addresses);
     for (const Model& link : links) {

@@ -24,19 +24,31 @@ namespace {
 using hosttools::Descriptor;
 
 /// In a process of its own, for there is no way back from another network. The socket stays in the first one.
-std::string buildElsewhere() {
+/// @param peers gets the network of the cables' other ends
+std::string buildElsewhere(Descriptor& peers) {
     hosttools::NetlinkSocket host(NETLINK_ROUTE);
     const NetworkMessages network = readNetwork(host);
-    if (unshare(CLONE_NEWNET) != 0) {
+    const auto cannot = [] {
         return Json{
             {"cannot", std::string("the host allows no network of its own here: ") + std::strerror(errno)}}
             .dump();
+    };
+    if (unshare(CLONE_NEWNET) != 0) {
+        return cannot();
     }
-    buildNetwork(network);
+    hosttools::NetlinkSocket others(NETLINK_ROUTE);
+    peers = Descriptor(open("/proc/self/ns/net", O_RDONLY | O_CLOEXEC));
+    if (unshare(CLONE_NEWNET) != 0) {
+        return cannot();
+    }
+    buildNetwork(network, {others, peers.get()});
     hosttools::NetlinkSocket copy(NETLINK_ROUTE);
     const KernelState is = linesOf(readNetwork(copy));
     const KernelState was = linesOf(network);
-    return Json{{"missing", texts(missingFrom(is, was))}, {"added", texts(missingFrom(was, is))}}.dump();
+    return Json{{"missing", texts(missingFrom(is, was))},
+                {"added", texts(missingFrom(was, is))},
+                {"peers", peers.get()}}
+        .dump();
 }
 
 std::string readAll(int pipe) {
@@ -53,7 +65,8 @@ std::string readAll(int pipe) {
 
 /// Tells what it did and waits for its end, so that its network can be found.
 [[noreturn]] void runBuilder(Descriptor& pipe) {
-    const std::string told = buildElsewhere() + '\n';
+    Descriptor peers;
+    const std::string told = buildElsewhere(peers) + '\n';
     [[maybe_unused]] const bool sent = hosttools::writeAll(pipe.get(), told);
     pipe.reset();
     for (;;) {
@@ -82,10 +95,14 @@ NetworkCopy copyNetwork() {
     writer.reset();
     const std::string told = readAll(reader.get());
     NetworkCopy copy;
-    copy.handle =
-        Descriptor(open(("/proc/" + std::to_string(builder) + "/ns/net").c_str(), O_RDONLY | O_CLOEXEC));
-    end(builder);
+    const std::string place = "/proc/" + std::to_string(builder);
     const Json json = Json::parse(told, nullptr, false);
+    copy.handle = Descriptor(open((place + "/ns/net").c_str(), O_RDONLY | O_CLOEXEC));
+    if (json.contains("peers")) {
+        const std::string number = std::to_string(json.at("peers").get<int>());
+        copy.peers = Descriptor(open((place + "/fd/" + number).c_str(), O_RDONLY | O_CLOEXEC));
+    }
+    end(builder);
     if (!json.is_object()) {
         throw Cannot("the network could not be copied");
     }

@@ -11,6 +11,7 @@ namespace cvagent::change {
 /// the same names, indices, hardware addresses, sizes and states, addresses, routes, rules.
 struct NetworkCopy {
     hosttools::Descriptor handle;      ///< for setns
+    hosttools::Descriptor peers;       ///< the network of the cables' other ends; with it they go
     std::vector<std::string> missing;  ///< lines of the kernel's state that the copy has not
     std::vector<std::string> added;    ///< and those that only it has
 };

@@ -8,6 +8,7 @@
 #include <sched.h>
 #include <sys/ioctl.h>
 #include <sys/mount.h>
+#include <sys/prctl.h>
 #include <sys/ptrace.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
@@ -169,9 +170,10 @@ public:
             return MutableNode::setProperty(id, value);
         }
         if (value == PropertyValue("hang", true)) {
-            const int child = fork();
+            if (fork() == 0) {
+                prctl(PR_SET_NAME, "hanging");
+            }
             for (;;) {
-                static_cast<void>(child);
                 pause();
             }
         }
