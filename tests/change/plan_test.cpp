@@ -89,7 +89,7 @@ TEST(Preview, TravelsAsItIs) {
 }
 
 TEST(Preview, IsNotReadFromWhatIsNone) {
-    for (const std::string text :
+    for (const std::string& text :
          {std::string(), std::string("{}"), std::string("[]"), std::string("{\"objections\": []"),
           std::string(R"({"objections": {}, "unchanged": [], "plan": {}})"),
           std::string(R"({"objections": [{"path": 1}], "unchanged": [], "plan": {}})"),
