@@ -104,6 +104,16 @@ TEST(EventLog, NumbersEventsAndKeepsTheLastOnes) {
     EXPECT_THAT(pastOf(log, 99).events, IsEmpty());
 }
 
+TEST(EventLog, KeepsAThousandPastEventsInMemory) {
+    EventLog log;
+    for (int i = 0; i < 1030; ++i) {
+        log.hear(eventOf(Event::Kind::alert));
+    }
+    const auto past = pastOf(log);
+    EXPECT_EQ(past.events.size(), 1024U);
+    EXPECT_EQ(past.dropped, 6U);
+}
+
 TEST(EventLog, MissesNothingAfterANumberThatIsStillToCome) {
     EventLog log(3);
     log.hear(eventOf(Event::Kind::alert));
@@ -461,7 +471,7 @@ protected:
 
     Ports ports;
     const IC::MutableNode* const port = ports.addPort("eth0");
-    EventLog log;
+    EventLog log{EventLog::kMost};
     Facts facts;
     cvagent::Announcer announcer{log, facts};
 };

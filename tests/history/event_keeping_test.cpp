@@ -76,7 +76,7 @@ TEST(EventKeeping, TellsEverythingThatManyThreadsBring) {
         void settle() noexcept override {}
         std::uint64_t number = 0;
     };
-    EventLog log;
+    EventLog log(EventLog::kMost);
     {
         EventKeeping keeping(log, std::make_shared<Counter>());
         std::vector<std::jthread> plugins;
