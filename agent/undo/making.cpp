@@ -64,7 +64,6 @@ ChangeInMaking::ChangeInMaking(const MakingSettings& settings)
       inSteps_(directory_.take(kStepLock)),
       before_(savedBefore(settings.paths)),
       window_(std::min(settings.window, kLongestWindow)) {
-    fcntl(inSteps_.get(), F_SETFD, 0);  // what a step starts inherits it
     directory_.save("before", before_);
     directory_.update([&](Journal& journal) {
         journal.boot = before_.boot;
@@ -80,6 +79,7 @@ ChangeInMaking::ChangeInMaking(const MakingSettings& settings)
 }
 
 void ChangeInMaking::beginStep() {
+    fcntl(inSteps_.get(), F_SETFD, 0);  // what a step starts inherits it; the guard was started before
     const Journal now = directory_.update([this](Journal& journal) {
         const bool isFirst = journal.stage == Stage::saved;
         if (!isFirst && journal.stage != Stage::changing) {

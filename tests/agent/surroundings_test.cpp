@@ -85,9 +85,8 @@ HOST_TEST(CommandLine, NamesTheWordThatIsWrong) {
     for (const auto& [words, complaint] : std::vector<std::pair<std::vector<std::string>, std::string>>{
              {{"foo"},
               "there is no command 'foo'; the commands are: tree, get, set, plan, apply, export, diff, "
-              "watch, "
-              "history, properties, "
-              "doctor"},
+              "confirm, "
+              "rollback, watch, history, properties, doctor"},
              {{"--json", "foo", "eth0"}, "there is no command 'foo'"},
              {{"--host-tools", "some", "tree"}, "'some' is none of: auto, classic, native"},
              {{"--host-tools", "0", "tree"}, "'0' is none of: auto, classic, native"},

@@ -5,6 +5,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <chrono>
 #include <csignal>
 #include <random>
 
@@ -187,6 +188,22 @@ HOST_TEST_F(Guard, GivesMoreTime) {
     EXPECT_FALSE(newest()->journal()->isDue());
     lengthenChange(*newest(), 0);
     EXPECT_TRUE(newest()->journal()->isDue());
+}
+
+/// A change may set the clock itself; and whoever steers it may do so meanwhile.
+HOST_TEST_F(Guard, DoesNotCareForTheTimeOfDay) {
+    constexpr long kYear = 31'536'000;
+    make(host, settings(300));
+    const std::uint64_t begin = bootMilliseconds();
+    const auto today = std::chrono::system_clock::now();
+    moveTimeOfDay(-kYear);
+    EXPECT_LT(std::chrono::system_clock::now(), today) << "it is moved for this program";
+    guardChange(*newest());
+    EXPECT_EQ(look(host), old_);
+    make(host, settings());
+    moveTimeOfDay(kYear);
+    EXPECT_FALSE(newest()->journal()->isDue());
+    EXPECT_LT(bootMilliseconds() - begin, kLong);
 }
 
 /// The maker, at each thing that lasts, from the saving to the confirmation.

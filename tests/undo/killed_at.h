@@ -5,3 +5,5 @@
 void dieAtStep(int number);
 /// How many of them this process has done so far.
 int stepsDone();
+/// From now on the time of day is so much later for this process, or earlier.
+void moveTimeOfDay(long seconds);

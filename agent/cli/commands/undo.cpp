@@ -47,7 +47,7 @@ std::string timeText(std::uint64_t seconds) {
     std::tm parts{};
     char text[32] = "";
     gmtime_r(&time, &parts);
-    std::strftime(text, sizeof text, "%Y-%m-%dT%H:%M:%SZ", &parts);
+    static_cast<void>(std::strftime(text, sizeof text, "%Y-%m-%dT%H:%M:%SZ", &parts));
     return text;
 }
 
