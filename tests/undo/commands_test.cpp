@@ -258,7 +258,7 @@ HOST_TEST_F(Confirmed, AChangeWhoseFirstStepCannotBeWrittenDownIsNotMade) {
 }
 
 HOST_TEST_F(Confirmed, AChangeWhoseEndCannotBeWrittenDownIsTakenBack) {
-    fillWhenGuarded(host, 8192);
+    fillWhenGuarded(host, 4096);
     const Finished run = set(host, "600");
     EXPECT_EQ(run.status, 1) << run.out << run.err;
     EXPECT_THAT(run.err,
