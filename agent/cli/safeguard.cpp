@@ -124,11 +124,23 @@ bool ChangeSafeguard::end(bool hasFailed) {
         }
         tellMade();
     } catch (const undo::ChangeError& error) {
-        complain(std::string(hasFailed ? "the change is not taken back: "
-                                       : "the change cannot be taken back later: ") +
-                 printable(error.what()));
+        tellUnwritten(hasFailed, printable(error.what()));
     }
     return false;
+}
+
+/// The guard takes for left what has no end in its journal.
+void ChangeSafeguard::tellUnwritten(bool hasFailed, const std::string& reason) const {
+    if (!seconds_) {
+        complain("the change cannot be taken back later: " + reason);
+        return;
+    }
+    const std::string text =
+        "change " + std::to_string(making_->number()) + " is taken back by its guard: " + reason;
+    if (!hasFailed) {
+        throw Failure(ExitStatus::failed, text);
+    }
+    complain(text);
 }
 
 void ChangeSafeguard::tellMade() {

@@ -28,6 +28,7 @@ private:
     void open(const std::vector<change::MeantChange>& changes,
               const std::vector<change::FileChange>& planned);
     void tellMade();
+    void tellUnwritten(bool hasFailed, const std::string& reason) const;
     bool isTakenBack();
 
     const Options& options_;

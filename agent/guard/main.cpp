@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <csignal>
 #include <exception>
 #include <string>
 #include <string_view>
@@ -50,7 +51,17 @@ int told(bool isDetached, Find find) {
     }
 }
 
+/// For systemd an end by such a signal is a good one, behind which it starts nothing again.
+void failWhenAskedToEnd() {
+    for (const int each : {SIGHUP, SIGINT, SIGTERM, SIGPIPE}) {
+        static_cast<void>(std::signal(each, [](int) { _exit(1); }));
+    }
+}
+
 int guard(unsigned number, bool isDetached) {
+    if (!isDetached) {
+        failWhenAskedToEnd();
+    }
     cvagent::guard::stayWhenMemoryIsShort();
     return told(isDetached,
                 [number] { return cvagent::undo::guardChange(ChangeDirectory(kChangesPlace, number)); });

@@ -2,6 +2,7 @@
 
 #include <dirent.h>
 #include <fcntl.h>
+#include <sys/file.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -80,14 +81,23 @@ void removeChange(int place, unsigned number) {
     unlinkat(place, name.c_str(), AT_REMOVEDIR);
 }
 
-/// The journals of old changes are for people; of those that are under way nothing goes.
-void makeRoom(const std::string& place, int opened) {
-    std::vector<unsigned> numbers = changesIn(place);
-    for (std::size_t i = 0; numbers.size() - i > kMostChanges; ++i) {
-        const ChangeDirectory change(place, numbers[i]);
+/// Who cannot be read stays, for nobody knows whether something waits for it.
+bool hasEnded(const std::string& place, unsigned number) {
+    try {
+        const ChangeDirectory change(place, number);
         const auto journal = change.journal();
         const bool isOpen = journal && !journal->isEnded() && journal->window != 0;
-        if (!isOpen && !change.isTaken(kAgentLock)) {
+        return !isOpen && !change.isTaken(kAgentLock);
+    } catch (const ChangeError&) {
+        return false;
+    }
+}
+
+/// The journals of old changes are for people; of those that are under way nothing goes.
+void makeRoom(const std::string& place, int opened) {
+    const std::vector<unsigned> numbers = changesIn(place);
+    for (std::size_t i = 0; numbers.size() - i > kMostChanges; ++i) {
+        if (hasEnded(place, numbers[i])) {
             removeChange(opened, numbers[i]);
         }
     }
@@ -117,17 +127,30 @@ ChangeDirectory::ChangeDirectory(const std::string& place, unsigned number) : nu
     directory_ = openChange(openPlace(place).get(), number);
 }
 
+Descriptor ChangeDirectory::lockPlace(const std::string& place) {
+    Descriptor opened = openPlace(place);
+    while (flock(opened.get(), LOCK_EX) != 0) {
+        if (errno != EINTR) {
+            failWith(place);
+        }
+    }
+    return opened;
+}
+
 ChangeDirectory ChangeDirectory::make(const std::string& place) {
     const Descriptor opened = openPlace(place);
     makeRoom(place, opened.get());
     for (;;) {
         const std::vector<unsigned> numbers = changesIn(place);
         const unsigned next = numbers.empty() ? 1 : numbers.back() + 1;
+        if (next > kLargestNumber) {
+            throw ChangeError(place + " has no number left");
+        }
         if (mkdirat(opened.get(), std::to_string(next).c_str(), 0700) == 0) {
             tried(fsync(opened.get()), place);
             return {openChange(opened.get(), next), next};
         }
-        if (errno != EEXIST || next >= kLargestNumber) {
+        if (errno != EEXIST) {
             failWith(place);
         }
     }
@@ -208,11 +231,14 @@ void ChangeDirectory::write(const char* name, std::string_view text) const {
     const Descriptor file(
         openat(directory_.get(), next.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
     tried(file.get(), next);
-    if (!hosttools::writeAll(file.get(), text)) {
-        failWith(next);
+    const bool isThere = hosttools::writeAll(file.get(), text) && fsync(file.get()) == 0 &&
+                         renameat(directory_.get(), next.c_str(), directory_.get(), name) == 0;
+    if (!isThere) {
+        const int problem = errno;
+        unlinkat(directory_.get(), next.c_str(), 0);  // what there was no room for takes none away
+        errno = problem;
+        failWith("the change cannot be written down: " + std::string(name));
     }
-    tried(fsync(file.get()), next);
-    tried(renameat(directory_.get(), next.c_str(), directory_.get(), name), name);
     tried(fsync(directory_.get()), name);
 }
 

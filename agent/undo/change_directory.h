@@ -32,6 +32,8 @@ std::optional<unsigned> changeNumber(std::string_view word);
 class ChangeDirectory {
 public:
     ChangeDirectory(const std::string& place, unsigned number);
+    /// While the descriptor is open nobody else who asks for this begins a change.
+    static hosttools::Descriptor lockPlace(const std::string& place);
     /// A new one, behind all that are there. The oldest ones that have ended make room.
     static ChangeDirectory make(const std::string& place);
 

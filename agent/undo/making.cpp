@@ -25,13 +25,24 @@ std::optional<Journal> readableJournal(const std::string& place, unsigned number
     }
 }
 
+bool isBeingMade(const std::string& place, unsigned number) {
+    try {
+        return ChangeDirectory(place, number).isTaken(kAgentLock);
+    } catch (const ChangeError&) {
+        return false;
+    }
+}
+
 /// Two that could be taken back at once would meet.
 void refuseBesideOthers(const std::string& place) {
     for (const unsigned number : changesIn(place)) {
         const auto journal = readableJournal(place, number);
         const bool isOpen = journal && !journal->isEnded() && journal->stage != Stage::saved;
-        if (isOpen && (journal->window != 0 || ChangeDirectory(place, number).isTaken(kAgentLock))) {
+        if (isOpen && journal->window != 0) {
             throw ChangeError(named(number) + " " + stageText(journal->stage));
+        }
+        if (isBeingMade(place, number)) {
+            throw ChangeError(named(number) + " " + stageText(Stage::changing));
         }
     }
 }
@@ -56,7 +67,8 @@ bool stands(const Journal& journal) {
 }  // namespace
 
 ChangeInMaking::ChangeInMaking(const MakingSettings& settings)
-    : directory_([&settings] {
+    : place_(ChangeDirectory::lockPlace(settings.place)),
+      directory_([&settings] {
           refuseBesideOthers(settings.place);
           return ChangeDirectory::make(settings.place);
       }()),
@@ -64,7 +76,9 @@ ChangeInMaking::ChangeInMaking(const MakingSettings& settings)
       inSteps_(directory_.take(kStepLock)),
       before_(savedBefore(settings.paths)),
       window_(std::min(settings.window, kLongestWindow)) {
+    place_ = {};
     directory_.save("before", before_);
+    directory_.isTaken(kTakingLock);  // makes its file, for which there may be no room later
     directory_.update([&](Journal& journal) {
         journal.boot = before_.boot;
         journal.window = window_;
@@ -114,19 +128,23 @@ Journal ChangeInMaking::takeBack() {
 void confirmChange(const ChangeDirectory& change) {
     bool isConfirmed = false;
     const Journal now = change.update([&isConfirmed](Journal& journal) {
-        isConfirmed = journal.stage == Stage::made;
+        isConfirmed = journal.stage == Stage::made && !journal.isDue();
         journal.stage = isConfirmed ? Stage::kept : journal.stage;
         return isConfirmed;
     });
     if (!isConfirmed) {
-        throw ChangeError(named(change.number()) + " cannot be confirmed: it " + stageText(now.stage));
+        const bool isLate = now.stage == Stage::made;
+        throw ChangeError(named(change.number()) +
+                          " cannot be confirmed: " + (isLate ? "its time is over, and it " : "it ") +
+                          stageText(isLate ? Stage::takingBack : now.stage));
     }
 }
 
 void lengthenChange(const ChangeDirectory& change, std::uint64_t milliseconds) {
     bool isLonger = false;
     change.update([&](Journal& journal) {
-        isLonger = journal.window != 0 && (journal.stage == Stage::made || journal.stage == Stage::changing);
+        isLonger = journal.window != 0 && !journal.isDue() &&
+                   (journal.stage == Stage::made || journal.stage == Stage::changing);
         journal.deadline = isLonger ? bootMilliseconds() + milliseconds : journal.deadline;
         return isLonger;
     });

@@ -33,6 +33,7 @@ public:
     Journal takeBack();
 
 private:
+    hosttools::Descriptor place_;  ///< locked until the others can see that this one has begun
     ChangeDirectory directory_;
     hosttools::Descriptor alive_;
     hosttools::Descriptor inSteps_;
@@ -42,7 +43,7 @@ private:
 
 // What people ask for, from whatever connection. Each throws ChangeError when it cannot be.
 
-/// Keeps what waits for its confirmation.
+/// Keeps what waits for its confirmation. Neither this nor more time helps when the time is over.
 void confirmChange(const ChangeDirectory& change);
 /// Gives it so much time from now on.
 void lengthenChange(const ChangeDirectory& change, std::uint64_t milliseconds);

@@ -92,7 +92,8 @@ Entries wantedOf(const EntryKind& kind, const Looks& looks, Tell tell) {
     }
     Entries wanted;
     for (const std::string& name : names) {
-        const bool isOthers = kind.isOneValue && !isSame(left[name], now[name]);
+        const bool isOthers =
+            kind.isOneValue && !isSame(left[name], now[name]) && !isSame(before[name], now[name]);
         if (isOthers && !isSame(before[name], left[name])) {
             tell(before[name].empty() ? left[name].front() : before[name].front());
         }

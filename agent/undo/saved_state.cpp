@@ -22,35 +22,23 @@ constexpr std::size_t kLongestHostName = 64;  // the kernel's own bound of a hos
 /// The lists of a network under their names in a text.
 struct List {
     const char* name;
-    std::vector<NetworkMessage>& (*of)(NetworkState& state);
+    std::vector<NetworkMessage> NetworkMessages::*part;  ///< null: the neighbours
 };
-const List kLists[] = {{"link", [](NetworkState& state) -> auto& {return state.network.links;
-}  // namespace
-}  // namespace cvagent::undo
-, {"address", [](NetworkState& state) -> auto& {return state.network.addresses;
+constexpr List kLists[] = {{"link", &NetworkMessages::links},       {"address", &NetworkMessages::addresses},
+                           {"nexthop", &NetworkMessages::nextHops}, {"route", &NetworkMessages::routes},
+                           {"rule", &NetworkMessages::rules},       {"neighbour", nullptr}};
+
+/// @param state a NetworkState, constant or not
+template <class State>
+auto& listOf(State& state, const List& list) {
+    return list.part != nullptr ? state.network.*list.part : state.neighbours;
 }
-}
-, {"nexthop", [](NetworkState& state) -> auto& {return state.network.nextHops;
-}
-}
-, {"route", [](NetworkState& state) -> auto& {return state.network.routes;
-}
-}
-, {"rule", [](NetworkState& state) -> auto& {return state.network.rules;
-}
-}
-, {"neighbour", [](NetworkState& state) -> auto& {return state.neighbours;
-}
-}
-,
-}
-;
 
 void takeRecord(const Record& record, SavedState& state) {
     const auto* list =
         std::ranges::find_if(kLists, [&](const List& each) { return record.name == each.name; });
     if (list != std::end(kLists)) {
-        list->of(state.network).push_back({0, std::string(record.bytes)});
+        listOf(state.network, *list).push_back({0, std::string(record.bytes)});
     } else if (record.name == "file") {
         state.files.push_back(fileStateFrom(record.bytes));
     } else if (record.name == "host") {
@@ -135,9 +123,8 @@ std::string textOf(const SavedState& state) {
         text.add("file", recordOf(file));
     }
     text.add("problem", static_cast<std::uint64_t>(state.network.network.problem));
-    NetworkState network = state.network;
     for (const List& list : kLists) {
-        for (const NetworkMessage& message : list.of(network)) {
+        for (const NetworkMessage& message : listOf(state.network, list)) {
             text.add(list.name, message.body);
         }
     }

@@ -2,6 +2,7 @@
 
 #include <chrono>
 #include <thread>
+#include <utility>
 
 #include "agent/undo/boot_clock.h"
 
@@ -12,18 +13,24 @@ namespace {
 using hosttools::Descriptor;
 
 constexpr std::chrono::milliseconds kLook{100};
+constexpr std::chrono::milliseconds kNextTry{1000};  // to write on a full disk
 /// Commands that hang are ended before; a daemon that a step has started is not waited for.
 constexpr std::uint64_t kLongestStep = 60'000;
 
 /// What was so when the taking back of a whole change began; kept, so that who goes on with it takes nothing
-/// for somebody else's work that was half put back.
+/// for somebody else's work that was half put back. On a full disk the host comes first.
 SavedState beganOf(const ChangeDirectory& change, const SavedState& before) {
-    auto began = change.load("began");
-    if (!began) {
-        began = before.again();
-        change.save("began", *began);
+    auto kept = change.load("began");
+    if (kept) {
+        return *std::move(kept);
     }
-    return *std::move(began);
+    SavedState began = before.again();
+    try {
+        change.save("began", began);
+    } catch (const ChangeError&) {
+        return began;
+    }
+    return began;
 }
 
 TakenBack takeSavedBack(const ChangeDirectory& change) {
@@ -87,21 +94,53 @@ void takeBackFromMaker(const ChangeDirectory& change) {
     takeChangeBack(change);
 }
 
-/// One look of the guard. @return whether it has ended
-bool lookOnce(const ChangeDirectory& change) {
-    const Journal journal = change.journal().value_or(Journal{});
-    const bool isMaker = change.isTaken(kAgentLock);
-    const bool isLeft = !isMaker && journal.stage == Stage::changing;
+/// What was not begun has ended; what is over is to be taken back.
+/// @param isMaker whether who makes it is alive, looked up before the journal: without him it is his last
+/// word
+Stage stageByNow(const Journal& journal, bool isMaker) {
+    const bool isMade = journal.stage == Stage::changing || journal.stage == Stage::made;
     if (journal.stage == Stage::saved && !isMaker) {
-        endWith(change, Stage::takenBack, {});
-    } else if (journal.stage == Stage::takingBack) {
-        if (!change.isTaken(kTakingLock)) {
-            takeBackFromMaker(change);
-        }
-    } else if (journal.stage != Stage::saved && !journal.isEnded() && (journal.isDue() || isLeft)) {
+        return Stage::takenBack;
+    }
+    const bool isLeft = journal.stage == Stage::changing && !isMaker;
+    return isLeft || (isMade && journal.isDue()) ? Stage::takingBack : journal.stage;
+}
+
+/// One look of the guard. It judges with the journal locked: whoever confirms the change or gives it more
+/// time is before that or too late. @return whether it has ended
+bool lookOnce(const ChangeDirectory& change) {
+    const bool isMaker = change.isTaken(kAgentLock);
+    const Journal now = change.update([isMaker](Journal& journal) {
+        const Stage was = std::exchange(journal.stage, stageByNow(journal, isMaker));
+        return journal.stage != was;
+    });
+    if (now.stage == Stage::takingBack && !change.isTaken(kTakingLock)) {
         takeBackFromMaker(change);
     }
-    return journal.isEnded();
+    return now.isEnded();
+}
+
+/// Where nothing can be written down, as on a full disk, the host comes back in time all the same; the
+/// journal follows when there is room again. Throws ChangeError when the change cannot be read either.
+void putBackUnwritten(const ChangeDirectory& change, bool& isBack) {
+    const bool isMaker = change.isTaken(kAgentLock);
+    const Journal journal = change.journal().value_or(Journal{});
+    if (!isBack && stageByNow(journal, isMaker) == Stage::takingBack) {
+        const Descriptor alone = change.waitFor(kTakingLock);
+        takeSavedBackAtOnce(change);
+        isBack = true;
+    }
+}
+
+/// @param isBack whether the host is, and only the journal does not say so
+bool hasEnded(const ChangeDirectory& change, bool& isBack) {
+    try {
+        return lookOnce(change);
+    } catch (const ChangeError&) {
+        putBackUnwritten(change, isBack);
+        std::this_thread::sleep_for(kNextTry);
+        return false;
+    }
 }
 
 std::string sentence(unsigned number, const Journal& journal) {
@@ -150,7 +189,7 @@ std::vector<std::string> guardChange(const ChangeDirectory& change) {
     if (!alone.isOpen()) {
         return {};
     }
-    while (!lookOnce(change)) {
+    for (bool isBack = false; !hasEnded(change, isBack);) {
         std::this_thread::sleep_for(kLook);
     }
     const Journal journal = change.journal().value_or(Journal{});

@@ -2,6 +2,7 @@
 #include <arpa/inet.h>
 #include <gmock/gmock.h>
 #include <sched.h>
+#include <sys/mount.h>
 #include <sys/socket.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -232,6 +233,37 @@ HOST_TEST_F(Confirmed, TheGuardIsAUnitWhereSystemdRuns) {
     EXPECT_THAT(calls.front(), HasSubstr("--property=Restart=on-failure"));
     EXPECT_EQ(cvagent(host, {"rollback", "1"}).status, 0);
     EXPECT_EQ(look(host), old_);
+}
+
+/// The disk becomes full when the guard is at work.
+/// @param room that is left, in bytes
+void fillWhenGuarded(FakeHost& host, std::size_t room) {
+    const std::string place = "/var/lib/corvista/changes";
+    host.directory(place, 0700);
+    ASSERT_EQ(mount("small", place.c_str(), "tmpfs", 0, "size=512k,mode=0700"), 0);
+    host.file(place + "/spare", std::string(room, 'x'));
+    host.file("/root/fill", "while [ \"$1\" != -- ]; do shift; done\n\"$2\" \"$3\" &\ncd " + place +
+                                "\nwhile [ ! -e 1/guard.lock ]; do :; done\n"
+                                "cat /dev/zero > fill 2>/dev/null\n: > spare\n");
+    host.directory("/run/systemd/system");
+    host.tool("/usr/bin/systemd-run %any", ToolAnswer{"", 0, "", 0, "sh /root/fill \"$@\""});
+}
+
+HOST_TEST_F(Confirmed, AChangeWhoseFirstStepCannotBeWrittenDownIsNotMade) {
+    fillWhenGuarded(host, 0);
+    const Finished run = set(host, "600");
+    EXPECT_EQ(run.status, 1);
+    EXPECT_THAT(run.err, HasSubstr("cannot be written down: journal: No space left on device"));
+    EXPECT_EQ(look(host), old_);
+}
+
+HOST_TEST_F(Confirmed, AChangeWhoseEndCannotBeWrittenDownIsTakenBack) {
+    fillWhenGuarded(host, 4096);
+    const Finished run = set(host, "600");
+    EXPECT_EQ(run.status, 1) << run.out << run.err;
+    EXPECT_THAT(run.err,
+                HasSubstr("change 1 is taken back by its guard: the change cannot be written down: left: "));
+    EXPECT_TRUE(comesBack(host));
 }
 
 HOST_TEST_F(Confirmed, WhatIsNoChangeIsRefused) {

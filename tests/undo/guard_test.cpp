@@ -1,5 +1,6 @@
 // Whoever is killed, and whenever: the host is as before the change, or as after it, never in between.
 #include <gmock/gmock.h>
+#include <sys/mount.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
@@ -7,7 +8,9 @@
 
 #include <chrono>
 #include <csignal>
+#include <fstream>
 #include <random>
+#include <sstream>
 
 #include "agent/undo/boot_clock.h"
 #include "agent/undo/making.h"
@@ -453,6 +456,128 @@ HOST_TEST_F(Guard, KeepsTwoApart) {
     EXPECT_EQ(cvagent::undo::lastStanding(kChangesPlace), std::nullopt);
 }
 
+/// One that has not come to its first step yet counts, too.
+HOST_TEST_F(Guard, KeepsApartWhatIsAboutToBegin) {
+    ChangeInMaking first(settings(0));
+    EXPECT_THROW(ChangeInMaking{settings()}, ChangeError);
+    first.beginStep();
+    EXPECT_THROW(ChangeInMaking{settings(0)}, ChangeError);
+    first.end();
+}
+
+HOST_TEST_F(Guard, GivesNoTimeWhenItIsOver) {
+    make(host, settings(1));
+    EXPECT_TRUE(comesTrue([] { return newest()->journal()->isDue(); }));
+    EXPECT_THROW(confirmChange(*newest()), ChangeError);
+    EXPECT_THROW(lengthenChange(*newest(), kLong), ChangeError);
+    guardChange(*newest());
+    EXPECT_EQ(look(host), old_);
+}
+
+/// Whether somebody waits for the lock.
+bool isWaitedFor(const FakeHost& host, const std::string& lock) {
+    struct stat found {};
+    EXPECT_EQ(stat(lock.c_str(), &found), 0);
+    std::istringstream lines(host.read("/.proc/locks").value_or(""));
+    const std::string place = ":" + std::to_string(found.st_ino) + " ";
+    for (std::string line; std::getline(lines, line);) {
+        if (line.find("-> ") != line.npos && line.find(place) != line.npos) {
+            return true;
+        }
+    }
+    return false;
+}
+
+/// How often a process has waited for something.
+long waitsOf(const FakeHost& host, pid_t process) {
+    const std::string status = host.read("/.proc/" + std::to_string(process) + "/status").value_or("");
+    const std::string name = "\nvoluntary_ctxt_switches:";
+    const std::size_t at = status.find(name);
+    return at == status.npos ? 0 : std::stol(status.substr(at + name.size()));
+}
+
+/// It is the last moment: what the guard has seen is not so any more when it marks the change.
+HOST_TEST_F(Guard, JudgesByWhatIsWrittenThen) {
+    make(host, settings());
+    Journal journal = newest()->journal().value_or(Journal{});
+    const std::string longer = textOf(journal);
+    journal.stage = Stage::changing;
+    journal.deadline = 0;
+    const std::string place = std::string(kChangesPlace) + "/1/journal";
+    host.file(place, textOf(journal), 0600);
+    auto locked = std::optional(newest()->take("journal.lock"));
+    const pid_t guard = fork();
+    if (guard == 0) {
+        locked.reset();
+        execl(GUARD_PROGRAM, GUARD_PROGRAM, "1", nullptr);
+    }
+    EXPECT_TRUE(comesTrue([&] { return isWaitedFor(host, place + ".lock"); }));
+    host.file(place, longer, 0600);
+    const long waits = waitsOf(host, guard);
+    locked.reset();
+    EXPECT_TRUE(comesTrue([&] { return waitsOf(host, guard) > waits + 2 || stage() == Stage::takenBack; }));
+    confirmChange(*newest());
+    int status = 0;
+    waitpid(guard, &status, 0);
+    EXPECT_EQ(status, 0);
+    EXPECT_EQ(look(host), new_);
+    EXPECT_EQ(stage(), Stage::kept);
+}
+
+/// What nobody can write down is done all the same.
+HOST_TEST_F(Guard, PutsBackInTimeOnAFullDisk) {
+    ASSERT_EQ(mount("small", kChangesPlace, "tmpfs", 0, "size=256k,mode=0700"), 0) << errno;
+    make(host, settings(1));
+    const std::string ballast = std::string(kChangesPlace) + "/ballast";
+    std::ofstream(ballast) << std::string(300'000, 'x') << std::flush;
+    EXPECT_THROW(newest()->save("left", {}), ChangeError);
+    const pid_t guard = fork();
+    if (guard == 0) {
+        guardChange(*newest());
+        _exit(0);
+    }
+    EXPECT_TRUE(comesTrue([&] { return look(host) == old_; }));
+    EXPECT_EQ(stage(), Stage::made);
+    host.remove(ballast);
+    int status = 0;
+    waitpid(guard, &status, 0);
+    EXPECT_EQ(status, 0);
+    EXPECT_EQ(stage(), Stage::takenBack);
+    EXPECT_THAT(newest()->journal()->notes, IsEmpty());
+    EXPECT_EQ(look(host), old_);
+}
+
+/// What has no room leaves nothing that takes away room.
+HOST_TEST_F(Guard, RefusesAChangeThatHasNoRoom) {
+    ASSERT_EQ(mount("small", kChangesPlace, "tmpfs", 0, "size=256k,mode=0700"), 0) << errno;
+    std::ofstream(std::string(kChangesPlace) + "/ballast") << std::string(300'000, 'x') << std::flush;
+    EXPECT_THROW(make(host, settings()), ChangeError);
+    EXPECT_EQ(look(host), old_);
+    for (const std::string& name : host.listDirectory(std::string(kChangesPlace) + "/1")) {
+        EXPECT_THAT(name, testing::EndsWith(".lock"));
+    }
+}
+
+HOST_TEST_F(Guard, CountsNoFurtherThanPeopleCanName) {
+    host.directory(std::string(kChangesPlace) + "/999999999", 0700);
+    EXPECT_THROW(make(host, settings()), ChangeError);
+    EXPECT_EQ(look(host), old_);
+}
+
+/// One that cannot be read keeps nobody from a new change.
+HOST_TEST_F(Guard, ForgetsOldChangesBehindOneThatIsDamaged) {
+    host.directory(std::string(kChangesPlace) + "/1", 0700);
+    host.file(std::string(kChangesPlace) + "/1/journal", "garbage");
+    host.file(std::string(kChangesPlace) + "/2", "no directory");
+    for (int i = 3; i < 60; ++i) {
+        host.directory(std::string(kChangesPlace) + "/" + std::to_string(i), 0700);
+    }
+    EXPECT_EQ(ChangeInMaking(settings(0)).number(), 60U);
+    const auto numbers = cvagent::undo::changesIn(kChangesPlace);
+    EXPECT_EQ(numbers.size(), 53U) << "fifty, the new one, and the two";
+    EXPECT_EQ(numbers.front(), 1U);
+}
+
 HOST_TEST_F(Guard, ForgetsOldChanges) {
     for (int i = 0; i < 60; ++i) {
         ChangeInMaking making(settings(0));
@@ -511,6 +636,21 @@ HOST_TEST_F(Guard, ProgramComesBackWhenItIsKilled) {
     EXPECT_TRUE(comesTrue([] { return stage() == Stage::takenBack; }));
     EXPECT_EQ(look(host), old_);
     EXPECT_TRUE(comesTrue([&] { return guards(host).empty(); }));
+}
+
+/// A unit is started again only behind an end that is none of its own.
+HOST_TEST_F(Guard, ProgramThatIsAskedToEndFails) {
+    make(host, settings());
+    const pid_t guard = fork();
+    if (guard == 0) {
+        execl(GUARD_PROGRAM, GUARD_PROGRAM, "1", nullptr);
+    }
+    ASSERT_TRUE(comesTrue([] { return newest()->isTaken(cvagent::undo::kGuardLock); }));
+    kill(guard, SIGTERM);
+    int status = 0;
+    waitpid(guard, &status, 0);
+    EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 1) << status;
+    EXPECT_EQ(stage(), Stage::made);
 }
 
 HOST_TEST_F(Guard, ProgramRefusesWhatIsNoNumber) {
