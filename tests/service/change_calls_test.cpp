@@ -231,6 +231,12 @@ HOST_TEST_F(ServiceChanges, OfACallerWhoGoesAreMadeToTheEnd) {
     EXPECT_TRUE(eventually([&] { return isInDiary("127=-60"); }));
 }
 
+bool isTriedOut(const FakeHost& host) {
+    return std::ranges::any_of(host.listDirectory("/.proc"), [&host](const std::string& process) {
+        return host.read("/.proc/" + process + "/comm").value_or("").starts_with("corvista-rehear");
+    });
+}
+
 /// While they are tried out, a stop keeps them from being made, and waits for nothing.
 HOST_TEST_F(ServiceChanges, ThatAreTriedOutAtAStopAreNotMade) {
     host.file("/var/hold", "");
@@ -238,6 +244,7 @@ HOST_TEST_F(ServiceChanges, ThatAreTriedOutAtAStopAreNotMade) {
     std::optional<bus::Message> planned;
     const auto nothing = [](bus::Writer&) {};
     const bus::Slot slot = begin(applyCall(run->bus(), {{"computer", "115", {"hold"}}}, nothing), answer);
+    ASSERT_TRUE(call::until(run->bus(), [&] { return isTriedOut(host); }));
     const bus::Slot other = begin(planCall(run->bus(), {{"computer", "115", {"hold"}}}), planned);
     EXPECT_EQ(call::get(run->bus(), ServiceRun::kRoot, call::kAgent, "LastEvent"), "0");
     run->program().signal(SIGTERM);
