@@ -43,10 +43,11 @@ Proposal propose(ChangedHost& host, std::vector<MeantChange> changes, const Requ
 }
 
 std::string objectionsText(const Proposal& proposal) {
+    const bool isOne = proposal.changes.size() == 1;  // which one is meant is no question
     std::string text;
     for (const Objection& each : proposal.objections) {
         const MeantChange& change = proposal.changes.at(each.change);
-        text += (text.empty() ? "" : "\n") + (change.place.empty() ? "" : change.place + ": ") +
+        text += (text.empty() ? "" : "\n") + (isOne || change.place.empty() ? "" : change.place + ": ") +
                 printable(change.target()) + ": " + printable(each.reason);
     }
     return text;

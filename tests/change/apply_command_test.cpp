@@ -9,10 +9,12 @@
 
 namespace {
 
+using testing::AllOf;
 using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::IsEmpty;
 using testing::Not;
+using testing::StartsWith;
 using Json = nlohmann::ordered_json;
 
 const std::string kUntouched = "initialize 1 1 2\nunload\n";
@@ -262,10 +264,16 @@ HOST_TEST_F(ChangesInForce, WhatSpeaksAgainstAChangeIsSaidBeforeAnythingIsDone) 
     refuse("IPv4Address", "198.51.100.1", "198.51.100.1 is the address of eth1");
     refuse("IPv4Address", "192.0.2.255", "broadcast address");
     refuse("IPv4Gateway", "203.0.113.1", "in no subnet of this host");
-    host.file("/root/changes", "[" + changeOf("ip-config:eth0", "IPv4Gateway", "203.0.113.1") + "]");
-    const Finished apply = cvagent(host, {"apply", "/root/changes"});
-    EXPECT_EQ(apply.status, 4);
-    EXPECT_THAT(apply.err, HasSubstr("changes[0]: "));
+    const std::string gateway = changeOf("ip-config:eth0", "IPv4Gateway", "203.0.113.1");
+    for (const auto& [file, start] :
+         {std::pair("[" + gateway + "]", "cvagent: /oshw/"),
+          std::pair("[" + changeOf("computer", "115", "room 6") + "," + gateway + "]",
+                    "cvagent: changes[1]: /oshw/")}) {
+        host.file("/root/changes", file);
+        const Finished apply = cvagent(host, {"apply", "/root/changes"});
+        EXPECT_EQ(apply.status, 4);
+        EXPECT_THAT(apply.err, AllOf(StartsWith(start), HasSubstr("203.0.113.1 is in no subnet")));
+    }
     EXPECT_EQ(state(host), before);
     const Finished forced = cvagent(host, {"set", "ip-config:eth0", "IPv4Address", "192.0.2.255", "--force"});
     EXPECT_THAT(forced.err, HasSubstr("done all the same: "));

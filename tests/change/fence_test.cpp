@@ -104,9 +104,7 @@ HOST_TEST(Fence, HoldsAgainstCodeThatReachesForTheHost) {
 
 /// Where root gets no user namespace, the rights that it gives up have to do.
 HOST_TEST(Fence, HoldsWithoutAUserNamespace) {
-    host.directory("/jail");
-    ASSERT_EQ(mount("/", "/jail", nullptr, MS_BIND | MS_REC, nullptr), 0);
-    ASSERT_EQ(chroot("/jail"), 0);
+    enterJail(host);
     const Plan plan = reachForTheHost(host);
     EXPECT_THAT(plan.unforeseen, Contains(HasSubstr("no user namespace")));
     EXPECT_EQ(plan.files.size(), 2U);

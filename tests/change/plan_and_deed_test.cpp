@@ -243,6 +243,15 @@ HOST_TEST(PlanAndDeed, HoldsOnLinksOfARealKernel) {
     compareAll(host, HostTools::automatic);
 }
 
+/// Where root gets no user namespace, the copy of the network is all that the plug-in sees of it.
+HOST_TEST(PlanAndDeed, HoldsOnLinksOfARealKernelWithoutAUserNamespace) {
+    bringUpRealLinks(host);
+    moveRecords(host);
+    enterJail(host);
+    Deed deed(HostTools::automatic);
+    comparePlanAndDeed(host, deed, HostTools::automatic, {{"ip-config:eth0", 25, {"192.0.2.99"}}});
+}
+
 /// What reaches the kernel, each on a fresh host: the last of them leaves nothing of the others' doing.
 class RealLinks : public testing::TestWithParam<std::size_t> {};
 

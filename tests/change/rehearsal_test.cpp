@@ -223,13 +223,6 @@ HOST_TEST(Rehearsal, TriesAsAUserWhoseDataLieInTmp) {
     EXPECT_EQ(host.listDirectory("/tmp/of a user"), files);
 }
 
-/// The kernel gives no user namespace there.
-void enterJail(FakeHost& host) {
-    host.directory("/jail");
-    ASSERT_EQ(mount("/", "/jail", nullptr, MS_BIND | MS_REC, nullptr), 0);
-    ASSERT_EQ(chroot("/jail"), 0);
-}
-
 HOST_TEST(Rehearsal, SaysWhyThereIsNoUserNamespace) {
     addLink(host);
     enterJail(host);

@@ -1,5 +1,9 @@
 #include "tests/change/rehearsed.h"
 
+#include <gtest/gtest.h>
+#include <sys/mount.h>
+#include <unistd.h>
+
 #include <filesystem>
 #include <fstream>
 #include <sstream>
@@ -52,6 +56,12 @@ void moveRecords(FakeHost& host) {
     host.directory(fs::path(kRecords).parent_path());
     fs::rename("/record", kRecords);
     host.symlink("/record", kRecords);
+}
+
+void enterJail(FakeHost& host) {
+    host.directory("/jail");
+    ASSERT_EQ(mount("/", "/jail", nullptr, MS_BIND | MS_REC, nullptr), 0);
+    ASSERT_EQ(chroot("/jail"), 0);
 }
 
 std::map<std::string, std::string> writtenPart(const FakeHost& /*host*/) {

@@ -19,6 +19,9 @@ std::string whyNotRehearsed(const std::vector<cvagent::change::Change>& changes,
 /// Where the scripted tools keep what they saw becomes a place that a rehearsal can write to.
 void moveRecords(FakeHost& host);
 
+/// Below another root, where the kernel gives nobody a user namespace.
+void enterJail(FakeHost& host);
+
 /// Content of every file, and "-> TARGET" of every link, of the places that the plug-in writes to.
 std::map<std::string, std::string> writtenPart(const FakeHost& host);
 /// The same of the files that a plan changes; what is gone has none.

@@ -1,9 +1,11 @@
 // The kernel's network is put back as it was, and what others have done since stays.
 #include <gmock/gmock.h>
+#include <linux/rtnetlink.h>
 
 #include <sstream>
 
 #include "agent/undo/saved_state.h"
+#include "hosttools/netlink.h"
 #include "tests/support/fake_host.h"
 
 namespace {
@@ -173,6 +175,30 @@ HOST_TEST_F(Network, KeepsWhatOthersHaveDoneSince) {
     }
     EXPECT_THAT(now, testing::Not(HasSubstr("192.0.2.77")));
     EXPECT_THAT(now, testing::Not(HasSubstr("192.168.0.0/16"))) << "he has taken it away";
+}
+
+HOST_TEST_F(Network, KeepsWhatOthersDoWhileItIsPutBack) {
+    const SavedState before = SavedState::of({});
+    ip(host, "route replace default via 192.0.2.254 metric 100");
+    const SavedState left = before.again();
+    ip(host, "address add 192.0.2.88/24 dev eth0");
+    ip(host, "route add 198.18.0.0/15 via 192.0.2.5");
+    for (const bool wasCutOff : {false, true}) {
+        EXPECT_THAT(takeBack(before, wasCutOff ? nullptr : &left, left).notes, IsEmpty());
+        EXPECT_THAT(all(host), testing::AllOf(HasSubstr("192.0.2.88/24"), HasSubstr("198.18.0.0/15 via"),
+                                              HasSubstr("default via 192.0.2.1 ")));
+    }
+}
+
+/// They come and go with the addresses.
+HOST_TEST_F(Network, IsReadWithoutTheRoutesThatTheKernelKeepsItself) {
+    EXPECT_THAT(ip(host, "route show table local"), HasSubstr("local 192.0.2.10"));
+    const auto routes = SavedState::of({}).network.network.routes;
+    EXPECT_THAT(routes, testing::Not(IsEmpty()));
+    for (const auto& route : routes) {
+        const auto head = hosttools::readPlain<rtmsg>(route.body);
+        EXPECT_TRUE(head && head->rtm_table != RT_TABLE_LOCAL);
+    }
 }
 
 HOST_TEST_F(Network, LeavesAloneWhatTheChangeHasNotTouched) {
