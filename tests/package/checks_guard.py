@@ -75,7 +75,7 @@ def outlives(context):
     with open(f"/proc/{host.init}/root/root/changes.json", "w", encoding="utf-8") as file:
         json.dump(CHANGES, file)
     before = host.sh(STATE)
-    for mode in ("control-group", "mixed", "process"):
+    for mode in ("control-group", "process"):
         host.sh(f"mkdir -p /run/systemd/system/{UNIT}.d; printf '[Service]\\nKillMode={mode}\\n' "
                 f"> /run/systemd/system/{UNIT}.d/test.conf; systemctl daemon-reload")
         for hurt in HURT:

@@ -52,7 +52,7 @@ def bounding_set():
 
 def evidence_of(host):
     def collect():
-        journal = host.run("journalctl --no-pager -n 12 -o short-monotonic -u corvista-agent -u dbus -u polkit")
+        journal = host.run("journalctl --no-pager -n 12 -o short-monotonic -u 'corvista-*' -u dbus -u polkit")
         yield "the journal", journal.stdout.splitlines()
     return collect
 
