@@ -111,7 +111,8 @@ bool isStartedBySystemd(const std::string& guard, const std::string& number) {
     return fs::exists("/run/systemd/system") && fs::exists(program) &&
            runs({program, "--quiet", "--collect", "--unit=corvista-guard-" + number,
                  "--description=Takes change " + number + " of this host back unless it is confirmed",
-                 "--property=Restart=on-failure", "--property=RestartSec=100ms", "--", guard, number});
+                 "--property=Restart=on-failure", "--property=RestartSec=100ms",
+                 "--property=StartLimitIntervalSec=0", "--", guard, number});
 }
 
 void addUsual(std::set<std::string>& paths) {
