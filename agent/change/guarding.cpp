@@ -31,8 +31,6 @@ using Words = std::vector<std::string>;
 
 constexpr const char* kGuardProgram = "corvista-guard";
 constexpr const char* kNetworkSettings = "/etc/sysconfig/network";
-/// More than five starts in ten seconds are too many for systemd, however often somebody kills the guard.
-constexpr const char* kSecondsToRestart = "--property=RestartSec=2500ms";
 constexpr std::chrono::seconds kLongestStart{10};
 constexpr std::chrono::milliseconds kGuardLook{5};
 
@@ -113,7 +111,8 @@ bool isStartedBySystemd(const std::string& guard, const std::string& number) {
     return fs::exists("/run/systemd/system") && fs::exists(program) &&
            runs({program, "--quiet", "--collect", "--unit=corvista-guard-" + number,
                  "--description=Takes change " + number + " of this host back unless it is confirmed",
-                 "--property=Restart=on-failure", kSecondsToRestart, "--", guard, number});
+                 "--property=Restart=on-failure", "--property=RestartSec=100ms",
+                 "--property=StartLimitIntervalSec=0", "--", guard, number});
 }
 
 void addUsual(std::set<std::string>& paths) {

@@ -3,6 +3,7 @@
 import contextlib
 import os
 import shutil
+import signal
 import subprocess
 import tempfile
 import time
@@ -21,13 +22,27 @@ class Host:
     def __init__(self, root):
         self.name = f"corvista-test-{os.getpid()}"
         self.work = tempfile.mkdtemp(prefix="corvista-package-test.")
-        self._outer = subprocess.Popen(["setpriv", "--pdeathsig=KILL", os.path.join(HERE, "boot"), root, self.work, self.name])
+        self._boot = [os.path.join(HERE, "boot"), root, self.work, self.name]
+        self._outer = subprocess.Popen(["setpriv", "--pdeathsig=KILL", *self._boot])
         try:
-            self.init = self._first_process()
-            self.wait_for("systemctl is-system-running | grep -q -e running -e degraded")
+            self._wait_up()
         except BaseException:
             self.stop()
             raise
+
+    def _wait_up(self):
+        self.init = self._first_process()
+        self.wait_for("systemctl is-system-running | grep -q -e running -e degraded")
+
+    def cut_power(self):
+        """All its processes are gone at once; then it boots again, with its files as they were."""
+        with open(f"/proc/{self._outer.pid}/ns/mnt", "rb") as disk:  # it lasts as long as somebody has it open
+            os.kill(self.init, signal.SIGKILL)
+            self._outer.wait()  # which waits for the first process, and that for all others
+            enter = ["nsenter", f"--mount=/proc/self/fd/{disk.fileno()}"]
+            self._outer = subprocess.Popen(["setpriv", "--pdeathsig=KILL", *enter, *self._boot, "again"],
+                                           pass_fds=[disk.fileno()])
+            self._wait_up()
 
     def _first_process(self):
         """Its number as it is seen from outside."""

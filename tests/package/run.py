@@ -16,6 +16,7 @@ from tap import CHECKS, Report  # noqa: E402
 
 import checks_build  # noqa: F401,E402  each registers its checks, in this order
 import checks_service  # noqa: F401,E402
+import checks_guard  # noqa: F401,E402
 import checks_packages  # noqa: F401,E402
 
 # What the packages need, and what the checks ask with. Without these the host could not install them without a network.
@@ -51,7 +52,7 @@ def bounding_set():
 
 def evidence_of(host):
     def collect():
-        journal = host.run("journalctl --no-pager -n 12 -o short-monotonic -u corvista-agent -u dbus -u polkit")
+        journal = host.run("journalctl --no-pager -n 12 -o short-monotonic -u 'corvista-*' -u dbus -u polkit")
         yield "the journal", journal.stdout.splitlines()
     return collect
 

@@ -231,6 +231,7 @@ HOST_TEST_F(Confirmed, TheGuardIsAUnitWhereSystemdRuns) {
     ASSERT_EQ(calls.size(), 1U);
     EXPECT_THAT(calls.front(), HasSubstr("--unit=corvista-guard-1 "));
     EXPECT_THAT(calls.front(), HasSubstr("--property=Restart=on-failure"));
+    EXPECT_THAT(calls.front(), HasSubstr("--property=StartLimitIntervalSec=0")) << "however often";
     EXPECT_EQ(cvagent(host, {"rollback", "1"}).status, 0);
     EXPECT_EQ(look(host), old_);
 }
