@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <iterator>
+#include <set>
 
 #include "agent/change/interface_settings.h"
 #include "agent/change/kernel_network.h"
@@ -134,12 +135,54 @@ Kept keepWith(const keep::Link& link, const Wish& wish) {
     }
 }
 
+const KeptProperty* keptProperty(const Property& row) {
+    const auto* found = std::ranges::find(kKept, row.id, &KeptProperty::property);
+    return row.type == NodeType::ipConfig && found != std::end(kKept) ? found : nullptr;
+}
+
+void addOnce(const std::vector<std::string>& some, std::vector<std::string>& all) {
+    std::ranges::copy_if(some, std::back_inserter(all), [&all](const std::string& each) {
+        return std::ranges::find(all, each) == all.end();
+    });
+}
+
+/// None where the system could not be asked to keep anything of the link.
+void addCallsOf(const keep::Link& link, undo::KeeperCalls& calls) {
+    try {
+        const keep::Way way = keep::wayToKeep(link, keep::keeperOf(link), {});
+        std::vector<std::string> files;
+        std::ranges::transform(way.files, std::back_inserter(files), &keep::FileEdit::path);
+        addOnce(files, calls.files);
+        addOnce(way.callsBefore, calls.before);
+        addOnce(way.callsAfter, calls.after);
+    } catch (const keep::CannotKeep&) {
+        return;
+    }
+}
+
 }  // namespace
+
+undo::KeeperCalls keeperCallsFor(const std::vector<MeantChange>& changes) {
+    std::set<std::string> interfaces;
+    for (const MeantChange& change : changes) {
+        if (keptProperty(*change.row) != nullptr) {
+            interfaces.insert(interfaceNameOf(*change.node));
+        }
+    }
+    const KernelNetwork network = interfaces.empty() ? KernelNetwork() : KernelNetwork::read();
+    undo::KeeperCalls calls;
+    for (const std::string& interface : interfaces) {
+        if (const KernelLink* link = network.link(interface); link != nullptr) {
+            addCallsOf({link->name, link->index}, calls);
+        }
+    }
+    return calls;
+}
 
 std::function<Kept()> keepingOverRestart(const IC::MutableNode& node, const Property& row,
                                          const IC::PropertyValue& value) {
-    const auto* kept = std::ranges::find(kKept, row.id, &KeptProperty::property);
-    if (row.type != NodeType::ipConfig || kept == std::end(kKept)) {
+    const KeptProperty* kept = keptProperty(row);
+    if (kept == nullptr) {
         return nullptr;
     }
     const KernelNetwork network = KernelNetwork::read();
