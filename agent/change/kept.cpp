@@ -1,5 +1,7 @@
 #include "agent/change/kept.h"
 
+#include <linux/rtnetlink.h>
+
 #include <algorithm>
 #include <iterator>
 #include <set>
@@ -25,6 +27,7 @@ struct Written {
     InterfaceSettings file;
     std::optional<unsigned> runningPrefix;  ///< of IPv4
     std::optional<unsigned> runningPrefix6;
+    std::optional<Ip> runningGateway;  ///< of IPv4, on this link
 
     /// The plug-in passes a write over while its file says that the address comes by DHCP. Where there is no
     /// file it has none to pass over.
@@ -42,6 +45,15 @@ Wish wishOfOrigin(const Written& written) {
     return wish;
 }
 
+/// The running one where the new address can reach it: a lease takes its gateway along.
+std::optional<std::string> likelyGateway(const Written& written, std::optional<unsigned> prefix) {
+    const auto address = Ip::parse(written.value);
+    const auto& gateway = written.runningGateway;
+    const bool isNear =
+        address && gateway && prefix && *address != *gateway && address->sharesPrefix(*gateway, *prefix);
+    return isNear ? std::optional(gateway->text()) : std::nullopt;
+}
+
 Wish wishOfAddress(const Written& written) {
     Wish wish;
     if (written.is(written.file.ipv4Address)) {
@@ -49,6 +61,7 @@ Wish wishOfAddress(const Written& written) {
         wish.ipv4.address = written.value;
         const auto inFile = prefixOfMask(written.file.mask);
         wish.ipv4.likelyPrefix = written.runningPrefix ? written.runningPrefix : inFile;
+        wish.ipv4.likelyGateway = likelyGateway(written, wish.ipv4.likelyPrefix);
     }
     return wish;
 }
@@ -107,6 +120,16 @@ constexpr KeptProperty kKept[] = {{24, wishOfOrigin},       {25, wishOfAddress},
 std::optional<unsigned> prefixOn(const KernelNetwork& network, unsigned link, bool isIpv6) {
     const KernelAddress* address = network.mainAddress(link, isIpv6);
     return address == nullptr ? std::nullopt : std::optional(address->prefix);
+}
+
+std::optional<Ip> gatewayOn(const KernelNetwork& network, unsigned link) {
+    const KernelRoute* best = nullptr;
+    for (const KernelRoute& each : network.routes) {
+        const bool isOne = each.link == link && !each.destination.isIpv6 && each.isDefault() &&
+                           each.gateway && each.table == RT_TABLE_MAIN && each.type == RTN_UNICAST;
+        best = isOne && (best == nullptr || each.metric < best->metric) ? &each : best;
+    }
+    return best == nullptr ? std::nullopt : best->gateway;
 }
 
 std::string placesOf(const keep::Way& way) {
@@ -193,7 +216,8 @@ std::function<Kept()> keepingOverRestart(const IC::MutableNode& node, const Prop
     Written before{static_cast<std::string>(value),
                    {},
                    prefixOn(network, link->index, false),
-                   prefixOn(network, link->index, true)};
+                   prefixOn(network, link->index, true),
+                   gatewayOn(network, link->index)};
     return [link = keep::Link{link->name, link->index}, written = std::move(before), act = kept->wish] {
         Written now = written;
         now.file = settingsOf(link.name);

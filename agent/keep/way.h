@@ -13,6 +13,7 @@ struct FileEdit {
     std::string path;
     std::optional<std::string> before;  ///< nothing: there is none
     std::optional<std::string> after;   ///< the same
+    std::string like{};                 ///< a file whose owner and mode one gets that is not there yet
 
     bool isChange() const { return before != after; }
 };

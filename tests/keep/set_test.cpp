@@ -99,6 +99,21 @@ HOST_TEST_F(SetAndKeptByIfupdown, AnInterfaceThatDoesNotComeUpHasItsOldFile) {
     EXPECT_EQ(host.read("/etc/network/interfaces"), kStanza);
 }
 
+HOST_TEST_F(SetAndKeptByIfupdown, AnAddressInsteadOfALeaseHasItsGateway) {
+    host.file("/etc/network/interfaces", "iface eth0 inet dhcp\n");
+    ip(host, "route add default via 192.0.2.1 dev eth0");
+    ASSERT_EQ(cvagent(host, {"set", "ip-config:eth0", "IPv4Address", "192.0.2.77"}).status, 0);
+    EXPECT_EQ(host.read("/etc/network/interfaces"),
+              "iface eth0 inet static\n    address 192.0.2.77/24\n    gateway 192.0.2.1\n");
+}
+
+HOST_TEST_F(SetAndKeptByIfupdown, AGatewayThatIsOutOfReachIsNotWritten) {
+    host.file("/etc/network/interfaces", "iface eth0 inet dhcp\n");
+    ip(host, "route add default via 192.0.2.1 dev eth0");
+    cvagent(host, {"set", "ip-config:eth0", "IPv4Address", "198.51.100.7"});
+    EXPECT_EQ(host.read("/etc/network/interfaces"), "iface eth0 inet static\n    address 198.51.100.7/24\n");
+}
+
 /// Its stanza comes back with the change, also where nothing has told beforehand that it would be written.
 HOST_TEST_F(SetAndKeptByIfupdown, WhatIsTakenBackIsItsStanzaToo) {
     host.remove("/tools/ifdown");
