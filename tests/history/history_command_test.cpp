@@ -67,6 +67,7 @@ HOST_TEST(HistoryCommand, ShowsTheAlertThatACommandWasTold) {
     EXPECT_TRUE(all[0].contains("boot"));
 }
 
+#if !defined(__SANITIZE_ADDRESS__)  // that build finds its libraries by a run path, whatever is set
 /// It is loaded when a history is opened, and nothing else needs it.
 HOST_TEST(HistoryCommand, TellsThatSqliteIsMissing) {
     host.file("/odd/libsqlite3.so.0", "");
@@ -82,6 +83,7 @@ HOST_TEST(HistoryCommand, TellsThatSqliteIsMissing) {
     EXPECT_EQ(shown.status, 1);
     EXPECT_THAT(shown.err, HasSubstr("SQLite cannot be loaded"));
 }
+#endif
 
 HOST_TEST(HistoryCommand, ShowsAPartOfIt) {
     CvagentRun run(host);
