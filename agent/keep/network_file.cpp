@@ -212,16 +212,22 @@ private:
 
     void setGateway(const std::string& gateway, bool isIpv6) {
         const auto found = findGateway(isIpv6);
-        if (found == entries_.end()) {
-            if (!gateway.empty()) {
-                add("Gateway", gateway);
-            }
-        } else if (!gateway.empty()) {
-            set(*found, gateway);
-        } else if (found->section == "Network") {
-            entries_.erase(found);
+        if (gateway.empty()) {
+            dropGateways(isIpv6);
+        } else if (found == entries_.end()) {
+            add("Gateway", gateway);
         } else {
-            dropBlock(found->block);
+            set(*found, gateway);
+        }
+    }
+
+    void dropGateways(bool isIpv6) {
+        for (auto found = findGateway(isIpv6); found != entries_.end(); found = findGateway(isIpv6)) {
+            if (found->section == "Network") {
+                entries_.erase(found);
+            } else {
+                dropBlock(found->block);
+            }
         }
     }
 

@@ -296,6 +296,13 @@ TEST(NetworkFile, IsForTheSameLinkOnly) {
                   "[Network]\nAddress=192.0.2.77/24\n");
 }
 
+TEST(NetworkFile, HasNoGatewayLeftWhereNoneIsWanted) {
+    EXPECT_EQ(
+        network("[Network]\nAddress=192.0.2.10/24\nGateway=192.0.2.1\n[Route]\nGateway=192.0.2.9\nMetric=7\n",
+                gateway("")),
+        "[Network]\nAddress=192.0.2.10/24\n");
+}
+
 TEST(NetworkFile, LeavesGatewaysOfOtherTablesAlone) {
     const std::string other = "[Route]\nGateway=192.0.2.9\nTable=100\n";
     EXPECT_EQ(network("[Network]\nAddress=192.0.2.10/24\n" + other, gateway("192.0.2.2")),
