@@ -104,7 +104,8 @@ bool isAtWork(const undo::ChangeDirectory& change) {
     return true;
 }
 
-/// What lives in the session of who logged in ends with it on some hosts, a unit does not.
+/// What lives in the session of who logged in ends with it on some hosts, a unit does not. A DHCP client that
+/// comes back with the change outlives the guard.
 bool isStartedBySystemd(const std::string& guard, const std::string& number) {
     const auto* const program =
         fs::exists("/usr/bin/systemd-run") ? "/usr/bin/systemd-run" : "/bin/systemd-run";
@@ -112,7 +113,7 @@ bool isStartedBySystemd(const std::string& guard, const std::string& number) {
            runs({program, "--quiet", "--collect", "--unit=corvista-guard-" + number,
                  "--description=Takes change " + number + " of this host back unless it is confirmed",
                  "--property=Restart=on-failure", "--property=RestartSec=100ms",
-                 "--property=StartLimitIntervalSec=0", "--", guard, number});
+                 "--property=StartLimitIntervalSec=0", "--property=KillMode=process", "--", guard, number});
 }
 
 void addUsual(std::set<std::string>& paths) {

@@ -1,7 +1,10 @@
 #include "agent/change/kept.h"
 
+#include <linux/rtnetlink.h>
+
 #include <algorithm>
 #include <iterator>
+#include <set>
 
 #include "agent/change/interface_settings.h"
 #include "agent/change/kernel_network.h"
@@ -24,6 +27,7 @@ struct Written {
     InterfaceSettings file;
     std::optional<unsigned> runningPrefix;  ///< of IPv4
     std::optional<unsigned> runningPrefix6;
+    std::optional<Ip> runningGateway;  ///< of IPv4, on this link
 
     /// The plug-in passes a write over while its file says that the address comes by DHCP. Where there is no
     /// file it has none to pass over.
@@ -41,6 +45,15 @@ Wish wishOfOrigin(const Written& written) {
     return wish;
 }
 
+/// The running one where the new address can reach it: a lease takes its gateway along.
+std::optional<std::string> likelyGateway(const Written& written, std::optional<unsigned> prefix) {
+    const auto address = Ip::parse(written.value);
+    const auto& gateway = written.runningGateway;
+    const bool isNear =
+        address && gateway && prefix && *address != *gateway && address->sharesPrefix(*gateway, *prefix);
+    return isNear ? std::optional(gateway->text()) : std::nullopt;
+}
+
 Wish wishOfAddress(const Written& written) {
     Wish wish;
     if (written.is(written.file.ipv4Address)) {
@@ -48,6 +61,7 @@ Wish wishOfAddress(const Written& written) {
         wish.ipv4.address = written.value;
         const auto inFile = prefixOfMask(written.file.mask);
         wish.ipv4.likelyPrefix = written.runningPrefix ? written.runningPrefix : inFile;
+        wish.ipv4.likelyGateway = likelyGateway(written, wish.ipv4.likelyPrefix);
     }
     return wish;
 }
@@ -108,6 +122,16 @@ std::optional<unsigned> prefixOn(const KernelNetwork& network, unsigned link, bo
     return address == nullptr ? std::nullopt : std::optional(address->prefix);
 }
 
+std::optional<Ip> gatewayOn(const KernelNetwork& network, unsigned link) {
+    const KernelRoute* best = nullptr;
+    for (const KernelRoute& each : network.routes) {
+        const bool isOne = each.link == link && !each.destination.isIpv6 && each.isDefault() &&
+                           each.gateway && each.table == RT_TABLE_MAIN && each.type == RTN_UNICAST;
+        best = isOne && (best == nullptr || each.metric < best->metric) ? &each : best;
+    }
+    return best == nullptr ? std::nullopt : best->gateway;
+}
+
 std::string placesOf(const keep::Way& way) {
     std::string places;
     for (const keep::FileEdit& each : way.files) {
@@ -134,12 +158,54 @@ Kept keepWith(const keep::Link& link, const Wish& wish) {
     }
 }
 
+const KeptProperty* keptProperty(const Property& row) {
+    const auto* found = std::ranges::find(kKept, row.id, &KeptProperty::property);
+    return row.type == NodeType::ipConfig && found != std::end(kKept) ? found : nullptr;
+}
+
+void addOnce(const std::vector<std::string>& some, std::vector<std::string>& all) {
+    std::ranges::copy_if(some, std::back_inserter(all), [&all](const std::string& each) {
+        return std::ranges::find(all, each) == all.end();
+    });
+}
+
+/// None where the system could not be asked to keep anything of the link.
+void addCallsOf(const keep::Link& link, undo::KeeperCalls& calls) {
+    try {
+        const keep::Way way = keep::wayToKeep(link, keep::keeperOf(link), {});
+        std::vector<std::string> files;
+        std::ranges::transform(way.files, std::back_inserter(files), &keep::FileEdit::path);
+        addOnce(files, calls.files);
+        addOnce(way.callsBefore, calls.before);
+        addOnce(way.callsAfter, calls.after);
+    } catch (const keep::CannotKeep&) {
+        return;
+    }
+}
+
 }  // namespace
+
+undo::KeeperCalls keeperCallsFor(const std::vector<MeantChange>& changes) {
+    std::set<std::string> interfaces;
+    for (const MeantChange& change : changes) {
+        if (keptProperty(*change.row) != nullptr) {
+            interfaces.insert(interfaceNameOf(*change.node));
+        }
+    }
+    const KernelNetwork network = interfaces.empty() ? KernelNetwork() : KernelNetwork::read();
+    undo::KeeperCalls calls;
+    for (const std::string& interface : interfaces) {
+        if (const KernelLink* link = network.link(interface); link != nullptr) {
+            addCallsOf({link->name, link->index}, calls);
+        }
+    }
+    return calls;
+}
 
 std::function<Kept()> keepingOverRestart(const IC::MutableNode& node, const Property& row,
                                          const IC::PropertyValue& value) {
-    const auto* kept = std::ranges::find(kKept, row.id, &KeptProperty::property);
-    if (row.type != NodeType::ipConfig || kept == std::end(kKept)) {
+    const KeptProperty* kept = keptProperty(row);
+    if (kept == nullptr) {
         return nullptr;
     }
     const KernelNetwork network = KernelNetwork::read();
@@ -150,7 +216,8 @@ std::function<Kept()> keepingOverRestart(const IC::MutableNode& node, const Prop
     Written before{static_cast<std::string>(value),
                    {},
                    prefixOn(network, link->index, false),
-                   prefixOn(network, link->index, true)};
+                   prefixOn(network, link->index, true),
+                   gatewayOn(network, link->index)};
     return [link = keep::Link{link->name, link->index}, written = std::move(before), act = kept->wish] {
         Written now = written;
         now.file = settingsOf(link.name);

@@ -3,7 +3,9 @@
 #include <functional>
 #include <string>
 
+#include "agent/change/meant_change.h"
 #include "agent/core/writer.h"
+#include "agent/undo/keeper_calls.h"
 
 namespace cvagent::change {
 
@@ -18,5 +20,8 @@ struct Kept {
 /// @return none for what is not about an interface of the kernel's, or kept by no such system
 std::function<Kept()> keepingOverRestart(const IC::MutableNode& node, const Property& row,
                                          const IC::PropertyValue& value);
+
+/// What that may write for these changes, and has to be told when it is taken back. Asks what runs.
+undo::KeeperCalls keeperCallsFor(const std::vector<MeantChange>& changes);
 
 }  // namespace cvagent::change

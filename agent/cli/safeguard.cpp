@@ -6,6 +6,7 @@
 #include <cmath>
 
 #include "agent/change/guarding.h"
+#include "agent/change/kept.h"
 #include "agent/cli/caller.h"
 #include "agent/cli/print.h"
 #include "agent/core/host_file.h"
@@ -94,6 +95,8 @@ void ChangeSafeguard::open(const std::vector<MeantChange>& changes,
     settings.caller = callerName();
     settings.summary = summaryOf(changes);
     settings.paths = change::touchedPaths(planned);
+    settings.calls = change::keeperCallsFor(changes);
+    settings.paths.insert(settings.paths.end(), settings.calls.files.begin(), settings.calls.files.end());
     settings.steps = changes.size();
     settings.window = seconds_ ? static_cast<std::uint64_t>(std::ceil(*seconds_ * kThousand)) : 0;
     settings.settling = options_.byService ? kServiceSettles : 0;

@@ -49,6 +49,11 @@ public:
         write("BOOTPROTO", dhcp ? "dhcp" : "static");
     }
 
+    bool isByDhcp() const {
+        const std::string origin = valueOf("BOOTPROTO").value_or("");
+        return origin.starts_with("dhcp") && origin != "dhcp6";
+    }
+
     bool hasIpv4Address() const {
         return std::ranges::any_of(lines_, [](const std::string& line) {
             const auto found = assignmentIn(line);
@@ -196,6 +201,11 @@ std::string editedIfcfg(const std::string& text, const Wish& wish) {
         throw CannotKeep("no address would be left");
     }
     return joined(lines, text);
+}
+
+bool isIfcfgByDhcp(const std::string& text) {
+    std::vector<std::string> lines = splitLines(text);
+    return IfcfgEditor(lines).isByDhcp();
 }
 
 std::string editedIfroute(const std::string& text, const Wish& wish) {

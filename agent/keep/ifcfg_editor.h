@@ -10,6 +10,9 @@ namespace cvagent::keep {
 /// Gateways and name servers stand in other files. Throws CannotKeep.
 std::string editedIfcfg(const std::string& text, const Wish& wish);
 
+/// Whether such a file has the address of IPv4 come by DHCP.
+bool isIfcfgByDhcp(const std::string& text);
+
 /// The file of an interface's own routes ("ifroute-eth0") with the default routes of the wish in it.
 std::string editedIfroute(const std::string& text, const Wish& wish);
 

@@ -28,16 +28,25 @@ bool hasStanza(const std::string& file, const std::string& name, const std::stri
     });
 }
 
-/// The one file that has the stanza, without links on the way, so that a link stays one.
-std::string fileOfStanza(const std::string& name, const std::string& family) {
+/// The files that have one, without links on the way, so that a link stays one.
+/// @param family "" for any
+std::vector<std::string> filesOfStanzas(const std::string& name, const std::string& family = {}) {
     std::vector<std::string> files = interfacesFiles();
     std::erase_if(files, [&](const std::string& file) { return !hasStanza(file, name, family); });
+    std::error_code unknown;
+    for (std::string& file : files) {
+        file = std::filesystem::canonical(file, unknown).string();
+    }
+    return files;
+}
+
+std::string fileOfStanza(const std::string& name, const std::string& family) {
+    const std::vector<std::string> files = filesOfStanzas(name, family);
     if (files.size() != 1) {
         throw CannotKeep((files.empty() ? "no file has a" : "more than one file has a") +
                          std::string(" stanza of ") + inQuotes(name) + " for " + family);
     }
-    std::error_code unknown;
-    return std::filesystem::canonical(files[0], unknown).string();
+    return files[0];
 }
 
 /// The part of a wish that stands in the stanza of one family.
@@ -83,6 +92,9 @@ Way wayOfIfupdown(const Link& link, const Claim& claim, const Wish& wish) {
     checkName(name);
     Way way{claim.system, {"ifdown " + link.name}, {}, {}};
     way.callsAfter = {"ifup " + link.name + (name == link.name ? "" : "=" + name)};
+    for (const std::string& file : wish.isEmpty() ? filesOfStanzas(name) : std::vector<std::string>()) {
+        editOf(file, way.files);
+    }
     for (const bool isIpv6 : {false, true}) {
         const Wish part = partOf(wish, isIpv6);
         if (!part.isEmpty()) {

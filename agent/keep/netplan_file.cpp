@@ -14,10 +14,6 @@ namespace {
 
 constexpr std::array kKinds = {"ethernets", "bonds", "bridges", "vlans", "tunnels", "dummy-devices"};
 
-[[noreturn]] void refuseLine(const std::string& line) {
-    throw CannotKeep("a line of the file is not understood: " + inQuotes(line));
-}
-
 /// Where a value stands in a line: by itself, not as a part of another one. The comment stands behind it.
 std::size_t placeOf(const std::string& value, const std::string& line) {
     const auto isPart = [](char letter, bool isInFront) {
@@ -31,7 +27,7 @@ std::size_t placeOf(const std::string& value, const std::string& line) {
             return at;
         }
     }
-    refuseLine(line);
+    refuseYaml(line);
 }
 
 /// Where something stands: from its first line to behind its last one.
@@ -47,7 +43,7 @@ public:
         for (const std::string& line : lines_) {
             parsed_.push_back(parsed(line));
             if (isBegun && line.starts_with("---")) {
-                refuseLine(line);
+                refuseYaml(line);
             }
             isBegun = isBegun || !parsed_.back().text.empty();
         }
@@ -76,7 +72,7 @@ public:
         if (!line) {
             add(id, {key + ": " + value});
         } else if (parsed_[line->first].value.empty()) {
-            refuseLine(lines_[line->first]);
+            refuseYaml(lines_[line->first]);
         } else {
             replace(line->first, parsed_[line->first].value, value);
         }
@@ -85,8 +81,10 @@ public:
     bool isByDhcp(const std::string& id) const {
         const Span place = *find(id);
         const auto line = childOf(place, place.first, "dhcp4");
-        const std::string value = line ? unquoted(parsed_[line->first].value) : "";
-        return value == "true" || value == "yes" || value == "on";
+        std::string value = line ? unquoted(parsed_[line->first].value) : "";
+        std::ranges::transform(value, value.begin(),
+                               [](unsigned char letter) { return static_cast<char>(std::tolower(letter)); });
+        return value == "true" || value == "yes" || value == "on" || value == "y";
     }
 
     /// A fixed one of IPv4.
@@ -133,7 +131,7 @@ public:
             return;
         }
         if (routes && !parsed_[routes->first].value.empty()) {
-            refuseLine(lines_[routes->first]);
+            refuseYaml(lines_[routes->first]);
         }
         const std::string indent(routes ? itemIndent(*routes) : 2, ' ');
         std::vector<std::string> item = {indent + "- to: default", indent + "  via: \"" + gateway + "\""};
@@ -174,7 +172,7 @@ private:
     std::optional<Span> childOf(const Span& within, std::optional<std::size_t> parent,
                                 const std::string& key) const {
         if (parent && !parsed_[*parent].value.empty()) {
-            refuseLine(lines_[*parent]);
+            refuseYaml(lines_[*parent]);
         }
         std::optional<Span> found;
         std::optional<std::size_t> indent;
@@ -185,7 +183,7 @@ private:
             }
             indent = indent.value_or(line.indent);
             if (line.indent < *indent) {
-                refuseLine(lines_[at]);
+                refuseYaml(lines_[at]);
             }
             if (line.indent == *indent && line.key == key) {
                 if (found) {
@@ -244,13 +242,16 @@ private:
         const auto look = [&] {
             std::optional<Word> via;
             bool isDefault = false;
+            bool isInOtherTable = false;
             for (std::size_t at = 0; at + 1 < item.size(); ++at) {
                 const std::string& value = item[at + 1].text;
                 isDefault = isDefault || (item[at].text == "to" &&
                                           (value == "default" || value == (isIpv6 ? "::/0" : "0.0.0.0/0")));
+                isInOtherTable = isInOtherTable || item[at].text == "table";
                 via = item[at].text == "via" ? std::optional(item[at + 1]) : via;
             }
-            if (isDefault && via && (isIpv6 ? keep::isIpv6 : isIpv4)(via->text) && !found) {
+            if (isDefault && !isInOtherTable && via && (isIpv6 ? keep::isIpv6 : isIpv4)(via->text) &&
+                !found) {
                 found = via;
             }
             item.clear();
@@ -290,7 +291,7 @@ private:
             const bool isEmpty = wordsIn(*list).empty();
             replace(list->first, told, told.substr(0, told.size() - 1) + (isEmpty ? "" : ", ") + value + "]");
         } else {
-            refuseLine(lines_[list->first]);
+            refuseYaml(lines_[list->first]);
         }
     }
 
@@ -343,10 +344,11 @@ std::string editedNetplan(const std::string& text, const std::string& id, const 
     if (wish.nameServers || wish.searchDomains) {
         throw CannotKeep("name servers and domains are not written there");
     }
-    if (wish.dhcp && file.isByDhcp(id) != *wish.dhcp) {
+    const bool wasByDhcp = file.isByDhcp(id);
+    if (wish.dhcp && wasByDhcp != *wish.dhcp) {
         file.setScalar(id, "dhcp4", *wish.dhcp ? "true" : "false");
     }
-    setFamily(file, id, wish.ipv4, false);
+    setFamily(file, id, wasByDhcp && !file.isByDhcp(id) ? wish.ipv4.behindDhcp() : wish.ipv4, false);
     setFamily(file, id, wish.ipv6, true);
     if (wish.dhcp && *wish.dhcp == file.hasAddress(id)) {
         throw CannotKeep(*wish.dhcp ? "the file has a fixed address" : "no address would be left");

@@ -74,11 +74,18 @@ public:
             entry.section = section;
             entry.block = block;
             // What stands in front of all sections means nothing.
-            if (section != "Match" && !section.empty()) {
+            if (section == "Match") {
+                addCondition(entry);
+            } else if (!section.empty()) {
                 entries_.push_back(std::move(entry));
             }
         }
     }
+
+    /// What else the link has to be, a line each: a name can be another link's after a restart.
+    const std::string& conditions() const { return conditions_; }
+
+    bool isByDhcp() const { return currentDhcp().ipv4; }
 
     void setOrigin(bool dhcp) {
         const Dhcp old = currentDhcp();
@@ -186,11 +193,12 @@ private:
         }
     }
 
-    /// Whether a section of a route is about all destinations.
+    /// Whether a section of a route is about all destinations, for everybody.
     bool isDefaultRoute(unsigned block, bool isIpv6) const {
         return std::ranges::none_of(entries_, [&](const Entry& each) {
-            return each.block == block && each.key == "Destination" && !each.value.empty() &&
-                   each.value != (isIpv6 ? "::/0" : "0.0.0.0/0");
+            const bool isElsewhere = each.key == "Destination" && !each.value.empty() &&
+                                     each.value != (isIpv6 ? "::/0" : "0.0.0.0/0");
+            return each.block == block && (isElsewhere || each.key == "Table");
         });
     }
 
@@ -204,16 +212,22 @@ private:
 
     void setGateway(const std::string& gateway, bool isIpv6) {
         const auto found = findGateway(isIpv6);
-        if (found == entries_.end()) {
-            if (!gateway.empty()) {
-                add("Gateway", gateway);
-            }
-        } else if (!gateway.empty()) {
-            set(*found, gateway);
-        } else if (found->section == "Network") {
-            entries_.erase(found);
+        if (gateway.empty()) {
+            dropGateways(isIpv6);
+        } else if (found == entries_.end()) {
+            add("Gateway", gateway);
         } else {
-            dropBlock(found->block);
+            set(*found, gateway);
+        }
+    }
+
+    void dropGateways(bool isIpv6) {
+        for (auto found = findGateway(isIpv6); found != entries_.end(); found = findGateway(isIpv6)) {
+            if (found->section == "Network") {
+                entries_.erase(found);
+            } else {
+                dropBlock(found->block);
+            }
         }
     }
 
@@ -257,6 +271,13 @@ private:
         entries_.insert(end + 1, {key + "=" + value, "Network", key, value, block});
     }
 
+    void addCondition(const Entry& entry) {
+        if (!entry.key.empty() && entry.key != "Name") {
+            conditions_ += entry.key + "=" + entry.value + "\n";
+        }
+    }
+
+    std::string conditions_;
     std::vector<Entry> entries_;
 };
 
@@ -266,10 +287,11 @@ std::string ownNetworkFile(const std::string& text, const std::string& link, con
     check(wish);
     checkName(link);
     NetworkFile file(text);
+    const bool wasByDhcp = file.isByDhcp();
     if (wish.dhcp) {
         file.setOrigin(*wish.dhcp);
     }
-    file.setFamily(wish.ipv4, false);
+    file.setFamily(wasByDhcp && !file.isByDhcp() ? wish.ipv4.behindDhcp() : wish.ipv4, false);
     file.setFamily(wish.ipv6, true);
     if (wish.dhcp && !*wish.dhcp && !file.hasIpv4Address()) {
         throw CannotKeep("no address would be left");
@@ -280,7 +302,7 @@ std::string ownNetworkFile(const std::string& text, const std::string& link, con
     if (wish.searchDomains) {
         file.setDomains(*wish.searchDomains);
     }
-    return kOurMark + ("[Match]\nName=" + link + "\n\n") + file.text();
+    return kOurMark + ("[Match]\nName=" + link + "\n" + file.conditions() + "\n") + file.text();
 }
 
 std::string ownNetworkPath(const std::string& source, const std::string& link) {

@@ -1,3 +1,4 @@
+#include <algorithm>
 #include <array>
 
 #include "agent/core/text.h"
@@ -15,10 +16,21 @@ namespace {
 /// What it says of links that it leaves alone, or has not looked at.
 constexpr std::array kNotKept = {"", "unmanaged", "pending", "initialized"};
 
+constexpr std::array kPlaces = {"/etc/systemd/network/", "/run/systemd/network/",
+                                "/usr/local/lib/systemd/network/", "/usr/lib/systemd/network/",
+                                "/lib/systemd/network/"};
+
+/// Its word is that of a user with few rights, and what it names is copied.
+bool isInItsPlaces(const std::string& file) {
+    return std::ranges::any_of(kPlaces, [&file](const std::string& place) {
+        return file == place + lastPart(file) && file.ends_with(".network");
+    });
+}
+
 /// What is added to a file by others, and would not be to one of another name.
 std::string dropInOf(const std::string& source) {
-    for (const char* place : {"/etc", "/run", "/usr/local/lib", "/usr/lib", "/lib"}) {
-        const std::string directory = place + std::string("/systemd/network/") + lastPart(source) + ".d";
+    for (const char* place : kPlaces) {
+        const std::string directory = place + lastPart(source) + ".d";
         for (const std::string& name : hosttools::listDirectory(directory)) {
             if (name.ends_with(".conf")) {
                 return directory + "/" + name;
@@ -56,6 +68,9 @@ std::optional<Claim> claimOfNetworkd(const Link& link, Daemons& daemons) {
 
 /// A reload has it look at its files again, and set up anew the links whose file is another one now.
 Way wayOfNetworkd(const Link& link, const Claim& claim, const Wish& wish) {
+    if (!isInItsPlaces(claim.source)) {
+        throw CannotKeep(inQuotes(claim.source) + " is no file of systemd-networkd's");
+    }
     const auto source = smallFile(claim.source);
     if (!source) {
         throw CannotKeep("cannot read " + inQuotes(claim.source));
@@ -69,7 +84,7 @@ Way wayOfNetworkd(const Link& link, const Claim& claim, const Wish& wish) {
     const auto before = smallFile(path);
     return {claim.system,
             {},
-            {{path, before, isKeptAlready ? before : std::optional(std::move(content))}},
+            {{path, before, isKeptAlready ? before : std::optional(std::move(content)), claim.source}},
             {"networkctl reload"}};
 }
 

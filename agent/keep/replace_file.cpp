@@ -51,15 +51,12 @@ public:
         }
     }
 
-    void becomeLike(const hosttools::Descriptor& old) const {
+    void becomeReadable() const { must(fchmod(file_.get(), kReadable) == 0, path_); }
+
+    void becomeLike(const hosttools::Descriptor& other) const {
         struct stat found {};
-        if (!old.isOpen()) {
-            must(fchmod(file_.get(), kReadable) == 0, path_);
-            return;
-        }
-        must(fstat(old.get(), &found) == 0 && fchown(file_.get(), found.st_uid, found.st_gid) == 0, path_);
+        must(fstat(other.get(), &found) == 0 && fchown(file_.get(), found.st_uid, found.st_gid) == 0, path_);
         must(fchmod(file_.get(), found.st_mode & 07777U) == 0, path_);
-        copyAttributes(old.get());
     }
 
     void takeThePlace() {
@@ -70,7 +67,6 @@ public:
         must(directory.isOpen() && (fsync(directory.get()) == 0 || errno == EINVAL), path_);
     }
 
-private:
     /// Access lists and labels. What cannot be given on was given by the system, which gives it again.
     void copyAttributes(int old) const {
         constexpr std::size_t kMostNames = 65536;
@@ -88,6 +84,7 @@ private:
         }
     }
 
+private:
     std::string path_;
     std::string directory_;
     std::string name_;
@@ -96,12 +93,21 @@ private:
 
 }  // namespace
 
-void replaceFile(const std::string& path, const std::string& content) {
+void replaceFile(const std::string& path, const std::string& content, const std::string& like) {
     const hosttools::Descriptor old(open(path.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
     must(old.isOpen() || errno == ENOENT, path);
+    const hosttools::Descriptor model(open(like.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC));
+    must(model.isOpen() || like.empty(), like);
     FileBeside file(path);
     file.write(content);
-    file.becomeLike(old);
+    if (old.isOpen()) {
+        file.becomeLike(old);
+        file.copyAttributes(old.get());
+    } else if (model.isOpen()) {
+        file.becomeLike(model);
+    } else {
+        file.becomeReadable();
+    }
     file.takeThePlace();
 }
 

@@ -8,6 +8,7 @@ namespace cvagent::keep {
 /// directories pass over, reaches the disk before it takes the name. Owner, mode and extended attributes are
 /// those of the file that was there; one that was not there can be read by everybody. Throws
 /// std::system_error.
-void replaceFile(const std::string& path, const std::string& content);
+/// @param like a file whose owner and mode one gets that was not there; "" for none
+void replaceFile(const std::string& path, const std::string& content, const std::string& like);
 
 }  // namespace cvagent::keep

@@ -28,6 +28,8 @@ public:
         }
     }
 
+    bool isByDhcp() const { return stanza_.method == "dhcp"; }
+
     void setOrigin(bool dhcp) {
         const std::string method = dhcp ? "dhcp" : "static";
         if (stanza_.method == method) {
@@ -180,10 +182,11 @@ private:
 
 void setIpv4(std::vector<std::string>& lines, const std::string& name, const Wish& wish) {
     StanzaEditor editor(lines, name, false);
+    const bool wasByDhcp = editor.isByDhcp();
     if (wish.dhcp) {
         editor.setOrigin(*wish.dhcp);
     }
-    editor.setAddress(wish.ipv4);
+    editor.setAddress(wasByDhcp && !editor.isByDhcp() ? wish.ipv4.behindDhcp() : wish.ipv4);
     if (wish.nameServers) {
         editor.writeList("dns-nameservers", *wish.nameServers);
     }

@@ -61,7 +61,7 @@ void put(const FileEdit& edit) {
         fs::remove(edit.path);
     } else {
         fs::create_directories(fs::path(edit.path).parent_path());
-        replaceFile(edit.path, *edit.after);
+        replaceFile(edit.path, *edit.after, edit.like);
     }
     if (smallFile(edit.path) != edit.after) {
         throw CannotKeep(edit.path + " is not what was written to it");

@@ -13,6 +13,7 @@ struct FileEdit {
     std::string path;
     std::optional<std::string> before;  ///< nothing: there is none
     std::optional<std::string> after;   ///< the same
+    std::string like{};                 ///< a file whose owner and mode one gets that is not there yet
 
     bool isChange() const { return before != after; }
 };
@@ -36,7 +37,8 @@ Way wayOfNetworkd(const Link& link, const Claim& claim, const Wish& wish);
 Way wayOfWicked(const Link& link, const Claim& claim, const Wish& wish);
 Way wayOfIfupdown(const Link& link, const Claim& claim, const Wish& wish);
 
-/// The same of the system that keeps the link. Throws CannotKeep, also when nobody keeps it, when it is not
+/// The same of the system that keeps the link. For an empty wish: the files that any other could change, as
+/// they are, and the calls. Throws CannotKeep, also when nobody keeps it, when it is not
 /// known who does, and for a system that is not asked to keep anything.
 Way wayToKeep(const Link& link, const Keeper& keeper, const Wish& wish);
 

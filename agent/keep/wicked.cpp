@@ -48,7 +48,11 @@ Way wayOfWicked(const Link& link, const Claim& claim, const Wish& wish) {
     }
     const std::string routesPath = kDirectory + std::string("ifroute-") + link.name;
     const auto routes = smallFile(routesPath);
-    const std::string edited = editedIfroute(routes.value_or(""), wish);
+    Wish routing = wish;
+    if (wish.dhcp && !*wish.dhcp && isIfcfgByDhcp(*settings)) {
+        routing.ipv4 = wish.ipv4.behindDhcp();
+    }
+    const std::string edited = editedIfroute(routes.value_or(""), routing);
     return {claim.system,
             {},
             {{own, settings, editedIfcfg(*settings, wish)},

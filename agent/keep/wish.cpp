@@ -46,8 +46,10 @@ void checkFamily(const FamilyWish& wish, bool (*isFitting)(const std::string&), 
     if (wish.address) {
         checkAddress(*wish.address, isFitting(*wish.address));
     }
-    if (wish.gateway && !wish.gateway->empty()) {
-        checkAddress(*wish.gateway, isFitting(*wish.gateway));
+    for (const auto& gateway : {wish.gateway, wish.likelyGateway}) {
+        if (gateway && !gateway->empty()) {
+            checkAddress(*gateway, isFitting(*gateway));
+        }
     }
     for (const auto& prefix : {wish.prefix, wish.likelyPrefix}) {
         if (prefix && (*prefix < 1 || *prefix > most)) {
@@ -57,6 +59,12 @@ void checkFamily(const FamilyWish& wish, bool (*isFitting)(const std::string&), 
 }
 
 }  // namespace
+
+FamilyWish FamilyWish::behindDhcp() const {
+    FamilyWish wish = *this;
+    wish.gateway = gateway ? gateway : likelyGateway;
+    return wish;
+}
 
 bool isIpv4(const std::string& text) {
     return isFamily(AF_INET, text);

@@ -19,7 +19,11 @@ struct FamilyWish {
     std::optional<unsigned> prefix{};
     std::optional<std::string> gateway{};    ///< of the default route; "" for none
     std::optional<unsigned> likelyPrefix{};  ///< for an address where nothing else tells one
+    /// For an address in whose subnet it is, when the one before came by DHCP and brought its gateway.
+    std::optional<std::string> likelyGateway{};
 
+    /// The same for a file that has said DHCP until now.
+    FamilyWish behindDhcp() const;
     bool isEmpty() const { return !address && !prefix && !gateway; }
 };
 

@@ -10,10 +10,6 @@ namespace cvagent::keep {
 
 namespace {
 
-[[noreturn]] void refuse(const std::string& line) {
-    throw CannotKeep("a line of the file is not understood: " + inQuotes(line));
-}
-
 /// Up to a comment: "#" at the beginning or behind a blank, outside of quotes. Counts brackets on the way.
 std::string meaningOf(const std::string& line) {
     char quote = '\0';
@@ -30,7 +26,7 @@ std::string meaningOf(const std::string& line) {
         } else if (letter == '#' && isFirst) {
             end = at;
         } else if (isFirst && std::string_view("&*!|>%@`").find(letter) != std::string_view::npos) {
-            refuse(line);
+            refuseYaml(line);
         } else {
             depth += letter == '[' || letter == '{' ? 1 : 0;
             depth -= letter == ']' || letter == '}' ? 1 : 0;
@@ -38,12 +34,18 @@ std::string meaningOf(const std::string& line) {
     }
     if (quote != '\0' || depth != 0 || line.find('\t') != std::string::npos ||
         line.find('\\') != std::string::npos) {
-        refuse(line);
+        refuseYaml(line);
     }
     return line.substr(0, line.find_last_not_of(" \r", end == 0 ? 0 : end - 1) + 1).substr(0, end);
 }
 
 }  // namespace
+
+void refuseYaml(const std::string& line) {
+    const std::size_t colon = line.find(':');
+    throw CannotKeep("a line of the file is not understood" +
+                     (colon == std::string::npos ? "" : ": " + inQuotes(line.substr(0, colon))));
+}
 
 std::string unquoted(const std::string& text) {
     const bool isQuoted = text.size() >= 2 && (text[0] == '"' || text[0] == '\'') && text.back() == text[0];
@@ -66,7 +68,7 @@ YamlLine parsed(const std::string& line) {
     if (colon == std::string::npos || last != std::string::npos || found.text[0] == '[' ||
         found.text[0] == '{') {
         if (!found.text.empty()) {
-            refuse(line);
+            refuseYaml(line);
         }
         return found;
     }

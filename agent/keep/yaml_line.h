@@ -13,6 +13,9 @@ struct YamlLine {
     std::string value;
 };
 
+/// Throws CannotKeep, with the key of the line at most: such a file may hold passwords of networks.
+[[noreturn]] void refuseYaml(const std::string& line);
+
 /// Throws CannotKeep for what is not of the part of YAML that is understood; see editedNetplan().
 YamlLine parsed(const std::string& line);
 

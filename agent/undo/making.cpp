@@ -47,12 +47,14 @@ void refuseBesideOthers(const std::string& place) {
     }
 }
 
-SavedState savedBefore(const std::vector<std::string>& paths) {
+SavedState savedBefore(const MakingSettings& settings) {
     std::set<std::string> each;
-    for (const std::string& path : paths) {
+    for (const std::string& path : settings.paths) {
         each.insert(withoutLinks(path));
     }
     SavedState before = SavedState::of({each.begin(), each.end()});
+    before.calls = settings.calls;
+    std::ranges::transform(before.calls.files, before.calls.files.begin(), withoutLinks);
     if (const std::string obstacle = before.obstacle(); !obstacle.empty()) {
         throw ChangeError("it could not be taken back: " + obstacle);
     }
@@ -74,7 +76,7 @@ ChangeInMaking::ChangeInMaking(const MakingSettings& settings)
       }()),
       alive_(directory_.take(kAgentLock)),
       inSteps_(directory_.take(kStepLock)),
-      before_(savedBefore(settings.paths)),
+      before_(savedBefore(settings)),
       window_(std::min(settings.window, kLongestWindow)) {
     place_ = {};
     directory_.save("before", before_);

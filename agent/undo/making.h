@@ -9,6 +9,7 @@ struct MakingSettings {
     std::string caller;
     std::string summary;             ///< what is changed, in a line
     std::vector<std::string> paths;  ///< whole ones of all files that it may touch
+    KeeperCalls calls;               ///< see there; its files are among the paths
     std::uint64_t steps = 0;
     std::uint64_t settling = 0;  ///< see Journal
     std::uint64_t window = 0;    ///< milliseconds for the confirmation; 0: nobody waits for one

@@ -34,11 +34,22 @@ auto& listOf(State& state, const List& list) {
     return list.part != nullptr ? state.network.*list.part : state.neighbours;
 }
 
+struct CallList {
+    std::string_view name;
+    std::vector<std::string> KeeperCalls::*list;
+};
+constexpr CallList kCallLists[] = {{"keeper-file", &KeeperCalls::files},
+                                   {"keeper-before", &KeeperCalls::before},
+                                   {"keeper-after", &KeeperCalls::after}};
+
 void takeRecord(const Record& record, SavedState& state) {
     const auto* list =
         std::ranges::find_if(kLists, [&](const List& each) { return record.name == each.name; });
     if (list != std::end(kLists)) {
         listOf(state.network, *list).push_back({0, std::string(record.bytes)});
+    } else if (const auto* calls = std::ranges::find(kCallLists, record.name, &CallList::name);
+               calls != std::end(kCallLists)) {
+        (state.calls.*calls->list).emplace_back(record.bytes);
     } else if (record.name == "file") {
         state.files.push_back(fileStateFrom(record.bytes));
     } else if (record.name == "host") {
@@ -122,6 +133,11 @@ std::string textOf(const SavedState& state) {
     for (const FileState& file : state.files) {
         text.add("file", recordOf(file));
     }
+    for (const CallList& list : kCallLists) {
+        for (const std::string& each : state.calls.*list.list) {
+            text.add(list.name, each);
+        }
+    }
     text.add("problem", static_cast<std::uint64_t>(state.network.network.problem));
     for (const List& list : kLists) {
         for (const NetworkMessage& message : listOf(state.network, list)) {
@@ -163,7 +179,15 @@ TakenBack takeBack(const SavedState& before, const SavedState* left, const Saved
     }
     const auto indices = filesToPutBack(
         before.files, left != nullptr ? left->files : std::vector<FileState>(), began.files, taken.notes);
+    // One that did not come to its end may have been put back in part already, by who was killed at it.
+    const bool isOfKeeper =
+        left == nullptr || std::ranges::any_of(indices, [&before](std::size_t i) {
+            return std::ranges::find(before.calls.files, before.files[i].path) != before.calls.files.end();
+        });
+    const KeeperCalls calls = isOfKeeper ? before.calls : KeeperCalls();
+    runCalls(calls.before, taken.notes);
     putBackFiles(before.files, indices, taken.notes);
+    runCalls(calls.after, taken.notes);
     if (before.boot != bootId() || before.boot != began.boot) {
         return taken;  // the kernel has begun anew, with what the files say
     }

@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "agent/undo/file_state.h"
+#include "agent/undo/keeper_calls.h"
 #include "agent/undo/network_restore.h"
 
 namespace cvagent::undo {
@@ -14,6 +15,7 @@ namespace cvagent::undo {
 struct SavedState {
     std::vector<FileState> files;
     NetworkState network;
+    KeeperCalls calls;  ///< to be run when its files come back
     std::string hostName;
     std::string domainName;
     std::string boot;                ///< which start of the host it is of; "" where nobody knows

@@ -33,11 +33,13 @@ SavedState beganOf(const ChangeDirectory& change, const SavedState& before) {
     return began;
 }
 
-TakenBack takeSavedBack(const ChangeDirectory& change) {
-    const auto before = change.load("before");
+/// @param calls of those that were saved, the ones to be run
+TakenBack takeSavedBack(const ChangeDirectory& change, KeeperCalls (*calls)(const KeeperCalls&)) {
+    auto before = change.load("before");
     if (!before) {
         throw ChangeError("nothing was saved");
     }
+    before->calls = calls(before->calls);
     const auto left = change.load("left");
     try {
         return left ? takeBack(*before, &*left, beganOf(change, *before))
@@ -47,10 +49,10 @@ TakenBack takeSavedBack(const ChangeDirectory& change) {
     }
 }
 
-/// For now; what cannot be read is told in the end.
+/// For now, and so without asking others; what cannot be read is told in the end.
 void takeSavedBackAtOnce(const ChangeDirectory& change) {
     try {
-        takeSavedBack(change);
+        takeSavedBack(change, [](const KeeperCalls&) { return KeeperCalls(); });
     } catch (const ChangeError&) {
         return;
     }
@@ -151,19 +153,23 @@ std::string sentence(unsigned number, const Journal& journal) {
     return text;
 }
 
-}  // namespace
-
-Journal takeChangeBack(const ChangeDirectory& change) {
+Journal takeBackWith(const ChangeDirectory& change, KeeperCalls (*calls)(const KeeperCalls&)) {
     const Descriptor alone = change.waitFor(kTakingLock);
     Journal journal = beginToTakeBack(change);
     if (journal.stage != Stage::takingBack) {
         return journal;
     }
     try {
-        return endWith(change, Stage::takenBack, takeSavedBack(change).notes);
+        return endWith(change, Stage::takenBack, takeSavedBack(change, calls).notes);
     } catch (const ChangeError& error) {
         return endWith(change, Stage::failed, {error.what()});
     }
+}
+
+}  // namespace
+
+Journal takeChangeBack(const ChangeDirectory& change) {
+    return takeBackWith(change, [](const KeeperCalls& all) { return all; });
 }
 
 std::vector<std::string> takeBackAfterStart(const std::string& place) {
@@ -175,7 +181,8 @@ std::vector<std::string> takeBackAfterStart(const std::string& place) {
             const bool isOpen = journal && !journal->isEnded() && journal->stage != Stage::saved;
             const bool isAsked = journal && (journal->window != 0 || journal->stage == Stage::takingBack);
             if (isOpen && isAsked && journal->boot != bootId()) {
-                told.push_back(sentence(number, takeChangeBack(change)));
+                const auto starting = [](const KeeperCalls& all) { return all.whileStarting(); };
+                told.push_back(sentence(number, takeBackWith(change, starting)));
             }
         } catch (const ChangeError& error) {
             told.push_back("change " + std::to_string(number) + ": " + error.what());

@@ -33,7 +33,7 @@ class Context:
         self.host = Host(system)
         place = f"/proc/{self.host.init}/root/opt/cv"
         os.makedirs(f"{place}/agent")
-        for program in ("cvagent", "corvista-rehearsal"):
+        for program in ("cvagent", "corvista-guard", "corvista-rehearsal"):
             shutil.copy(f"{build}/agent/{program}", f"{place}/agent")
         shutil.copytree(f"{build}/lib", f"{place}/lib", symlinks=True, ignore=shutil.ignore_patterns("*.a"))
         shutil.copytree(f"{build}/hosttools", f"{place}/hosttools", symlinks=True, ignore=shutil.ignore_patterns("*.a", "CMake*"))
@@ -78,11 +78,24 @@ def change_and_restart(context, kept_in, restart):
     context.wait_for_address("192.0.2.77/25")
 
 
+def change_and_take_back(context, path):
+    """As many files and settings as before; the daemon, asked once more, has it so, too."""
+    before = context.host.run(f"cat {path}").stdout
+    result = context.host.run(f"{AGENT} set {NODE} IPv4Address 192.0.2.99 --confirm-within 600")
+    expect_equal(f"the status of the change ({result.stdout}{result.stderr})", result.returncode, 0)
+    context.host.wait_for("ip -4 -o address show dev eth0 | grep -q 192.0.2.99/")
+    result = context.host.run(f"{AGENT} rollback")
+    expect_equal("what the taking back tells", (result.stdout, result.stderr), ("change 1 is taken back\n", ""))
+    context.wait_for_address("192.0.2.10/24")
+    expect_equal(f"the file {path}", context.host.run(f"cat {path}").stdout, before)
+
+
 @check("ifupdown: a change is in the stanza and in force; set back, the file is as it was, byte for byte")
 def ifupdown(context):
     context.write("/etc/network/interfaces", STANZA)
     context.host.sh("ifup eth0")
     expect_equal("who keeps it", context.keeper()["keeper"], "ifupdown")
+    change_and_take_back(context, "/etc/network/interfaces")
     change_and_restart(context, "ifupdown, in /etc/network/interfaces", "ifdown eth0; ifup eth0")
     context.set("SubnetMask", "255.255.255.0", "ifupdown")
     context.set("IPv4Address", "192.0.2.10", "ifupdown")
@@ -96,6 +109,8 @@ def networkd(context):
     context.host.sh("systemctl start systemd-networkd")
     context.host.wait_for("networkctl status eth0 | grep -q configured")
     expect_equal("who keeps it", context.keeper()["keeper"], "systemd-networkd")
+    change_and_take_back(context, "/etc/systemd/network/0-cvagent-eth0.network")
+    context.host.wait_for("networkctl status eth0 | grep -q 20-lan.network")
     change_and_restart(context, "systemd-networkd, in /etc/systemd/network/0-cvagent-eth0.network", "systemctl restart systemd-networkd")
     expect_equal("the file", context.read("/etc/systemd/network/20-lan.network"), NETWORK)
     context.host.sh("rm /etc/systemd/network/0-cvagent-eth0.network; networkctl reload")
@@ -108,6 +123,8 @@ def netplan(context):
     context.host.sh("netplan generate; systemctl start systemd-networkd")
     context.host.wait_for("networkctl status eth0 | grep -q configured")
     expect_equal("who keeps it", context.keeper()["keeper"], "netplan")
+    change_and_take_back(context, "/etc/netplan/50-host.yaml")
+    context.host.wait_for("grep -q 192.0.2.10/24 /run/systemd/network/10-netplan-eth0.network")
     change_and_restart(context, "netplan, in /etc/netplan/50-host.yaml", "netplan generate; systemctl restart systemd-networkd")
     context.set("SubnetMask", "255.255.255.0", "netplan")
     context.set("IPv4Address", "192.0.2.10", "netplan")

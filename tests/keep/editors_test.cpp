@@ -249,6 +249,66 @@ TEST(NetworkFile, ChangesTheOriginOfIpv4Alone) {
     EXPECT_EQ(network("[Network]\nDHCP=ipv4\n", wish), "[Network]\nDHCP=no\nAddress=192.0.2.7/24\n");
 }
 
+/// A lease takes its gateway along; without one the host would be in its subnet alone after a restart.
+Wish insteadOfLease() {
+    Wish wish = whole("192.0.2.7", 24);
+    wish.dhcp = false;
+    wish.ipv4.likelyGateway = "192.0.2.1";
+    return wish;
+}
+
+TEST(NetworkFile, HasTheGatewayThatCameByDhcp) {
+    EXPECT_EQ(network("[Network]\nDHCP=ipv4\n", insteadOfLease()),
+              "[Network]\nDHCP=no\nAddress=192.0.2.7/24\nGateway=192.0.2.1\n");
+    EXPECT_EQ(network("[Network]\nAddress=192.0.2.10/24\n", insteadOfLease()),
+              "[Network]\nAddress=192.0.2.7/24\n");
+    Wish wish = insteadOfLease();
+    wish.ipv4.gateway = "192.0.2.2";
+    EXPECT_EQ(network("[Network]\nDHCP=ipv4\n", wish),
+              "[Network]\nDHCP=no\nAddress=192.0.2.7/24\nGateway=192.0.2.2\n");
+}
+
+TEST(StanzaEditor, HasTheGatewayThatCameByDhcp) {
+    EXPECT_EQ(editedStanza("iface eth0 inet dhcp\n", "eth0", insteadOfLease()),
+              "iface eth0 inet static\n    address 192.0.2.7/24\n    gateway 192.0.2.1\n");
+    EXPECT_EQ(editedStanza("iface eth0 inet static\n address 192.0.2.9/24\n", "eth0", insteadOfLease()),
+              "iface eth0 inet static\n address 192.0.2.7/24\n");
+}
+
+TEST(IfcfgEditor, KnowsWhetherTheAddressComesByDhcp) {
+    using cvagent::keep::isIfcfgByDhcp;
+    for (const char* text :
+         {"BOOTPROTO='dhcp'\n", "BOOTPROTO=dhcp4\n", "BOOTPROTO=static\nBOOTPROTO=dhcp\n"}) {
+        EXPECT_TRUE(isIfcfgByDhcp(text)) << text;
+    }
+    for (const char* text : {"", "BOOTPROTO=static\n", "BOOTPROTO=dhcp6\n", "#BOOTPROTO=dhcp\n"}) {
+        EXPECT_FALSE(isIfcfgByDhcp(text)) << text;
+    }
+}
+
+/// Names of links can change places at a restart, and a file can be about one of several networks.
+TEST(NetworkFile, IsForTheSameLinkOnly) {
+    EXPECT_EQ(ownNetworkFile("[Match]\nMACAddress = 02:00:00:aa:bb:01\nName=e*\n# x\nSSID=a b\n"
+                             "[Network]\nAddress=192.0.2.10/24\n",
+                             "eth0", address("192.0.2.77")),
+              std::string(cvagent::keep::kOurMark) +
+                  "[Match]\nName=eth0\nMACAddress=02:00:00:aa:bb:01\nSSID=a b\n\n"
+                  "[Network]\nAddress=192.0.2.77/24\n");
+}
+
+TEST(NetworkFile, HasNoGatewayLeftWhereNoneIsWanted) {
+    EXPECT_EQ(
+        network("[Network]\nAddress=192.0.2.10/24\nGateway=192.0.2.1\n[Route]\nGateway=192.0.2.9\nMetric=7\n",
+                gateway("")),
+        "[Network]\nAddress=192.0.2.10/24\n");
+}
+
+TEST(NetworkFile, LeavesGatewaysOfOtherTablesAlone) {
+    const std::string other = "[Route]\nGateway=192.0.2.9\nTable=100\n";
+    EXPECT_EQ(network("[Network]\nAddress=192.0.2.10/24\n" + other, gateway("192.0.2.2")),
+              "[Network]\nAddress=192.0.2.10/24\nGateway=192.0.2.2\n" + other);
+}
+
 TEST(NetworkFile, HasNameServersAndDomains) {
     EXPECT_EQ(network("[Network]\nDNS=192.0.2.53\nDNS=192.0.2.54\nDomains=old ~corp.example\n",
                       names({"2001:db8::53"}, {"new.example"})),
@@ -405,9 +465,34 @@ TEST(NetplanFile, HasTheDefaultRouteAmongOthers) {
               "      - to: default\n        via: \"192.0.2.2\"\n");
 }
 
+TEST(NetplanFile, LeavesGatewaysOfOtherTablesAlone) {
+    const std::string other =
+        "      routes:\n        - to: default\n          via: 192.0.2.9\n          table: 100\n";
+    EXPECT_EQ(netplan(other, gateway("192.0.2.2")),
+              other + "        - to: default\n          via: \"192.0.2.2\"\n");
+}
+
+/// What is told goes to the history and to who asks on the bus.
+TEST(NetplanFile, TellsNoPasswords) {
+    for (const char* line :
+         {"          password: \"se\\cret\"\n", "          - \"secret\n", "          secret\n",
+          "          password: [secret\n", "          \"password\": *secret\n"}) {
+        const std::string told = refusal([&] {
+            editedNetplan(std::string("network:\n  wifis:\n    w:\n      auth:\n") + line, "eth0", Wish{});
+        });
+        EXPECT_THAT(told, HasSubstr("not understood")) << line;
+        EXPECT_THAT(told, testing::Not(HasSubstr("ret"))) << line;
+    }
+}
+
 TEST(NetplanFile, ChangesTheOrigin) {
     EXPECT_EQ(netplan("      dhcp4: no\n", origin(true)), "      dhcp4: true\n");
     EXPECT_EQ(netplan("      dhcp4: yes  # lab\n", origin(true)), "      dhcp4: yes  # lab\n");
+    EXPECT_EQ(
+        netplan("      dhcp4: True\n", insteadOfLease()),
+        "      dhcp4: false\n      addresses: [\"192.0.2.7/24\"]\n      routes:\n        - to: default\n"
+        "          via: \"192.0.2.1\"\n");
+    EXPECT_EQ(netplan("      dhcp4: \"Y\"\n", origin(true)), "      dhcp4: \"Y\"\n");
     Wish wish = whole("192.0.2.7", 24);
     wish.dhcp = false;
     EXPECT_EQ(netplan("      dhcp4: true\n", wish),

@@ -99,6 +99,43 @@ HOST_TEST_F(SetAndKeptByIfupdown, AnInterfaceThatDoesNotComeUpHasItsOldFile) {
     EXPECT_EQ(host.read("/etc/network/interfaces"), kStanza);
 }
 
+HOST_TEST_F(SetAndKeptByIfupdown, AnAddressInsteadOfALeaseHasItsGateway) {
+    host.file("/etc/network/interfaces", "iface eth0 inet dhcp\n");
+    ip(host, "route add default via 192.0.2.1 dev eth0");
+    ASSERT_EQ(cvagent(host, {"set", "ip-config:eth0", "IPv4Address", "192.0.2.77"}).status, 0);
+    EXPECT_EQ(host.read("/etc/network/interfaces"),
+              "iface eth0 inet static\n    address 192.0.2.77/24\n    gateway 192.0.2.1\n");
+}
+
+HOST_TEST_F(SetAndKeptByIfupdown, AGatewayThatIsOutOfReachIsNotWritten) {
+    host.file("/etc/network/interfaces", "iface eth0 inet dhcp\n");
+    ip(host, "route add default via 192.0.2.1 dev eth0");
+    cvagent(host, {"set", "ip-config:eth0", "IPv4Address", "198.51.100.7"});
+    EXPECT_EQ(host.read("/etc/network/interfaces"), "iface eth0 inet static\n    address 198.51.100.7/24\n");
+}
+
+/// Its stanza comes back with the change, also where nothing has told beforehand that it would be written.
+HOST_TEST_F(SetAndKeptByIfupdown, WhatIsTakenBackIsItsStanzaToo) {
+    host.remove("/tools/ifdown");
+    host.remove("/tools/ifup");
+    host.tool("/usr/sbin/ifdown eth0", {"", 0, "", 0, "/tools/ip address flush dev eth0"});
+    host.tool("/usr/sbin/ifup eth0", {"", 0, "", 0,
+                                      "set -- $(grep address /etc/network/interfaces); "
+                                      "/tools/ip address add $2 dev eth0"});
+    ASSERT_EQ(mount("/dev/null", REHEARSAL_PROGRAM, nullptr, MS_BIND, nullptr), 0);
+    const Finished run = cvagent(
+        host, {"set", "ip-config:eth0", "IPv4Address", "192.0.2.77", "--force", "--confirm-within", "600"});
+    EXPECT_THAT(run.err, testing::HasSubstr("the changes are not tried out first"));
+    EXPECT_THAT(run.err, testing::HasSubstr("kept over a restart by ifupdown"));
+    host.clearCalls();
+    EXPECT_EQ(cvagent(host, {"rollback"}).out, "change 1 is taken back\n");
+    EXPECT_EQ(host.read("/etc/network/interfaces"), kStanza);
+    EXPECT_THAT(host.calls(), testing::ElementsAre("/usr/sbin/ifdown eth0", "/usr/sbin/ifup eth0"));
+    const std::string addresses = ip(host, "-4 -o address show dev eth0");
+    EXPECT_THAT(addresses, testing::HasSubstr("inet 192.0.2.10/24"));
+    EXPECT_THAT(addresses, testing::Not(testing::HasSubstr("192.0.2.77")));
+}
+
 HOST_TEST_F(SetAndKept, NothingIsKeptWhereTwoClaimTheInterface) {
     const std::string index = host.run({"cat", "/sys/class/net/eth0/ifindex"}).out;
     host.file("/run/network/ifstate", "eth0=eth0\n");

@@ -7,6 +7,6 @@ if(CORVISTA_SERVICE)
     keep/mock_manager.cpp
     keep/set_test.cpp
     keep/way_test.cpp)
-  target_compile_definitions(keep_test PRIVATE ${agent_test_programs})
-  add_dependencies(keep_test cvagent corvista-hosttools vantrelcvicoshwmi)
+  target_compile_definitions(keep_test PRIVATE ${agent_test_programs} REHEARSAL_PROGRAM="$<TARGET_FILE:corvista-rehearsal>")
+  add_dependencies(keep_test cvagent corvista-guard corvista-rehearsal corvista-hosttools vantrelcvicoshwmi)
 endif()

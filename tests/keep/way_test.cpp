@@ -145,7 +145,7 @@ HOST_TEST(KeptByNetworkd, HasAFileOfOursInFront) {
     go(way);
     EXPECT_EQ(host.read(kOurs),
               "# Written by cvagent; taken back with the change that made it.\n"
-              "[Match]\nName=eth0\n\n[Network]\nAddress=192.0.2.77/24\n");
+              "[Match]\nName=eth0\nMACAddress=02:00:00:aa:bb:01\n\n[Network]\nAddress=192.0.2.77/24\n");
     struct stat found {};
     ASSERT_EQ(lstat(kOurs, &found), 0);
     EXPECT_EQ(found.st_mode & 07777U, 0644U);  // networkd is another user
@@ -158,6 +158,26 @@ HOST_TEST(KeptByNetworkd, HasAFileOfOursInFront) {
 HOST_TEST(KeptByNetworkd, NeedsNoFileForWhatIsSo) {
     host.file(kNetwork, "[Match]\nName=eth0\n[Network]\nAddress=192.0.2.77/24\n");
     EXPECT_TRUE(wayToKeep(kLink, keptBy("systemd-networkd", kNetwork), newAddress()).isEmpty());
+}
+
+/// It says so itself, in a file of a user with few rights.
+HOST_TEST(KeptByNetworkd, IsNotMadeOfAnythingButItsFiles) {
+    for (const char* each : {"/etc/secrets/x.network", "/etc/systemd/network/../secret.network",
+                             "/etc/systemd/network/x.conf", "/root/x", ""}) {
+        host.file("/etc/secrets/x.network", "[wifi]\npsk=secret\n", 0600);
+        EXPECT_THAT(refusalOf([&] { wayToKeep(kLink, keptBy("systemd-networkd", each), newAddress()); }),
+                    HasSubstr("no file of systemd-networkd's"))
+            << each;
+    }
+}
+
+HOST_TEST(KeptByNetworkd, IsNotReadByWhoCouldNotReadItBefore) {
+    host.tool("networkctl reload", "");
+    host.file(kNetwork, "[Match]\nName=eth0\n[Network]\nAddress=192.0.2.10/24\n", 0640);
+    go(wayToKeep(kLink, keptBy("systemd-networkd", kNetwork), newAddress()));
+    struct stat found {};
+    ASSERT_EQ(stat(kOurs, &found), 0);
+    EXPECT_EQ(found.st_mode & 07777U, 0640U);
 }
 
 HOST_TEST(KeptByNetworkd, IsRefusedWhereOthersAddToTheFile) {

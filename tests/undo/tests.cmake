@@ -2,6 +2,7 @@
 corvista_test(undo PARTS 2 LIBRARIES agent_undo hosttools_library test_support SOURCES
   undo/files_test.cpp
   undo/guard_test.cpp
+  undo/keeper_calls_test.cpp
   undo/killed_at.cpp
   undo/network_test.cpp
   undo/records_test.cpp)

@@ -1,0 +1,141 @@
+// What a system that keeps interfaces is told when its files come back.
+#include "agent/undo/keeper_calls.h"
+
+#include <fcntl.h>
+#include <gmock/gmock.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <csignal>
+
+#include "agent/undo/making.h"
+#include "agent/undo/taking_back.h"
+#include "tests/support/fake_host.h"
+
+namespace {
+
+using cvagent::undo::ChangeDirectory;
+using cvagent::undo::ChangeInMaking;
+using cvagent::undo::Journal;
+using cvagent::undo::kChangesPlace;
+using cvagent::undo::KeeperCalls;
+using cvagent::undo::MakingSettings;
+using cvagent::undo::runCalls;
+using cvagent::undo::savedStateFrom;
+using cvagent::undo::takeBackAfterStart;
+using cvagent::undo::takeChangeBack;
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+constexpr const char* kStanzas = "/etc/network/interfaces";
+
+class KeeperIsTold : public HostFixture {
+protected:
+    void setUpHost(FakeHost& host) override {
+        host.directory(kChangesPlace, 0700);
+        host.file(kStanzas, "old\n");
+        host.file("/etc/other", "old\n");
+        host.tool("/usr/sbin/ifdown eth0",
+                  {"", 0, "", 0, "read text < /etc/network/interfaces; [ $text = new ]"});
+        host.tool("/usr/sbin/ifup eth0",
+                  {"", 0, "", 0, "read text < /etc/network/interfaces; [ $text = old ]"});
+        host.tool("/usr/sbin/netplan generate", "");
+    }
+    static MakingSettings settings() {
+        MakingSettings settings;
+        settings.paths = {kStanzas, "/etc/other"};
+        settings.calls = {{kStanzas}, {"ifdown eth0"}, {"ifup eth0", "netplan generate"}};
+        settings.steps = 1;
+        settings.window = 600'000;
+        return settings;
+    }
+    static ChangeDirectory made(FakeHost& host, const std::string& file) {
+        ChangeInMaking making(settings());
+        making.beginStep();
+        host.file(file, "new\n");
+        making.end();
+        return {kChangesPlace, making.number()};
+    }
+};
+
+HOST_TEST_F(KeeperIsTold, BeforeAndAfterItsFileIsBack) {
+    EXPECT_THAT(takeChangeBack(made(host, kStanzas)).notes, IsEmpty());
+    EXPECT_EQ(host.read(kStanzas), "old\n");
+    EXPECT_THAT(host.calls(),
+                ElementsAre("/usr/sbin/ifdown eth0", "/usr/sbin/ifup eth0", "/usr/sbin/netplan generate"));
+}
+
+HOST_TEST_F(KeeperIsTold, NothingWhereItsFileHasNotChanged) {
+    takeChangeBack(made(host, "/etc/other"));
+    EXPECT_EQ(host.read("/etc/other"), "old\n");
+    EXPECT_THAT(host.calls(), IsEmpty());
+}
+
+/// Somebody may have been killed between the file and the call.
+HOST_TEST_F(KeeperIsTold, AgainWhenTheChangeDidNotComeToItsEnd) {
+    host.tool("/usr/sbin/ifdown eth0", "");
+    ChangeInMaking making(settings());
+    making.beginStep();
+    making.takeBack();
+    EXPECT_THAT(host.callsOf("/usr/sbin/ifup"), ElementsAre("/usr/sbin/ifup eth0"));
+}
+
+/// Nothing runs yet that could be told; what netplan makes was made of the files that the change has left.
+HOST_TEST_F(KeeperIsTold, WhileTheHostStartsOnlyWhatMakesFiles) {
+    made(host, kStanzas).update([](Journal& journal) {
+        journal.boot = "another";
+        return true;
+    });
+    EXPECT_THAT(takeBackAfterStart(kChangesPlace), ElementsAre("change 1: is taken back"));
+    EXPECT_EQ(host.read(kStanzas), "old\n");
+    EXPECT_THAT(host.calls(), ElementsAre("/usr/sbin/netplan generate"));
+}
+
+HOST_TEST_F(KeeperIsTold, AndWhatFailsIsNoted) {
+    host.tool("/usr/sbin/ifup eth0", "", 1);
+    EXPECT_THAT(takeChangeBack(made(host, kStanzas)).notes, ElementsAre("'ifup eth0' has failed"));
+    EXPECT_EQ(host.read(kStanzas), "old\n");
+}
+
+HOST_TEST_F(KeeperIsTold, ByNothingButWhatIsKnown) {
+    host.tool("/usr/sbin/reboot %any", "");
+    for (const char* each : {"reboot", "ifup", "ifup ", "ifup -a", "ifup eth0 eth1", "ifup $(reboot)",
+                             "ifupx eth0", "netplan generate now", "", "/usr/sbin/ifup eth0"}) {
+        std::vector<std::string> notes;
+        runCalls({each}, notes);
+        EXPECT_THAT(notes, ElementsAre("'" + std::string(each) + "' is not a command of this program's"));
+    }
+    std::vector<std::string> notes;
+    runCalls({"wicked ifreload eth0"}, notes);
+    EXPECT_THAT(notes, ElementsAre("'wicked ifreload eth0' is not installed"));
+    EXPECT_THAT(host.calls(), IsEmpty());
+}
+
+/// A DHCP client that ignores signals and holds the locks of this process would be there for ever.
+HOST_TEST_F(KeeperIsTold, ByWhatGetsNothingOfThisProcess) {
+    static_cast<void>(signal(SIGTERM, SIG_IGN));
+    umask(077);
+    host.tool("/usr/sbin/ifup eth0",
+              {"", 0, "", 0, "grep SigIgn /proc/self/status > /etc/seen; ls /proc/self/fd > /etc/open"});
+    const int handed = open("/etc/other", O_RDONLY);  // NOLINT: not closed on exec, that is the test
+    ASSERT_GE(dup2(handed, 77), 0);
+    std::vector<std::string> notes;
+    runCalls({"ifup eth0"}, notes);
+    EXPECT_THAT(notes, IsEmpty());
+    EXPECT_EQ(host.read("/etc/seen"), "SigIgn:\t0000000000000000\n");
+    EXPECT_THAT(host.read("/etc/open").value_or(""), testing::Not(testing::HasSubstr("77")));
+    struct stat found {};
+    ASSERT_EQ(stat("/etc/seen", &found), 0);
+    EXPECT_EQ(found.st_mode & 0777U, 0644U);
+}
+
+HOST_TEST_F(KeeperIsTold, AsWasSaved) {
+    cvagent::undo::SavedState state;
+    state.calls = settings().calls;
+    const KeeperCalls back = savedStateFrom(textOf(state)).calls;
+    EXPECT_EQ(back.files, state.calls.files);
+    EXPECT_EQ(back.before, state.calls.before);
+    EXPECT_EQ(back.after, state.calls.after);
+}
+
+}  // namespace
