@@ -509,8 +509,9 @@ TEST(NetplanFile, IsRefusedWhereItIsNotUnderstood) {
     for (const char* line :
          {"      addresses: &a [192.0.2.1/24]\n", "      addresses: *a\n", "      <<: *base\n", "\tmtu: 1\n",
           "      mtu:\t1\n", "      addresses: [192.0.2.1/24,\n        192.0.2.2/24]\n",
-          "      a: |\n        b\n", "      a: !!int 3\n", "      a: \"b\n", "      a: \"\\x31\"\n",
-          "      what\n", "  - x\n    y: z\n  q\n", "---\nnetwork:\n"}) {
+          "      nameservers: {addresses: [192.0.2.3],\n        search: [a]}\n", "      a: |\n        b\n",
+          "      a: !!int 3\n", "      a: \"b\n", "      a: \"\\x31\"\n", "      what\n",
+          "  - x\n    y: z\n  q\n", "---\nnetwork:\n"}) {
         EXPECT_THAT(refused(head + line, wish), HasSubstr("not understood")) << line;
     }
     EXPECT_THAT(refused("", wish), HasSubstr("no interface"));
