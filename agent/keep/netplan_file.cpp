@@ -181,8 +181,9 @@ private:
             if (line.text.empty()) {
                 continue;
             }
+            const bool isListInstead = parent && !indent && line.text.starts_with('-');
             indent = indent.value_or(line.indent);
-            if (line.indent < *indent) {
+            if (line.indent < *indent || isListInstead) {
                 refuseYaml(lines_[at]);
             }
             if (line.indent == *indent && line.key == key) {

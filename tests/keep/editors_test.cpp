@@ -511,7 +511,7 @@ TEST(NetplanFile, IsRefusedWhereItIsNotUnderstood) {
           "      mtu:\t1\n", "      addresses: [192.0.2.1/24,\n        192.0.2.2/24]\n",
           "      nameservers: {addresses: [192.0.2.3],\n        search: [a]}\n", "      a: |\n        b\n",
           "      a: !!int 3\n", "      a: \"b\n", "      a: \"\\x31\"\n", "      what\n",
-          "  - x\n    y: z\n  q\n", "---\nnetwork:\n"}) {
+          "  - x\n    y: z\n  q\n", "    - mtu: 1\n", "      - x\n", "---\nnetwork:\n"}) {
         EXPECT_THAT(refused(head + line, wish), HasSubstr("not understood")) << line;
     }
     EXPECT_THAT(refused("", wish), HasSubstr("no interface"));
