@@ -272,8 +272,8 @@ void Looker::keepTree(const Wanted& wanted, const Request& request) {
 
 Look Looker::look(const Wanted& wanted) {
     Look look{++begun_, wanted.all, {}, {}};
-    const Request request = lookRequest();
-    keepTree(wanted, request);
+    keepTree(wanted, lookRequest());
+    const Request request = lookRequest();  // of its own: on a slow host new links take longer to be found
     late_.beginLook(Clock::now());
     std::vector<NodeRef> fresh;
     std::vector<Agent::Asked> asked;
