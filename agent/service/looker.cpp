@@ -1,6 +1,7 @@
 #include "agent/service/looker.h"
 
 #include <algorithm>
+#include <iterator>
 #include <set>
 #include <utility>
 
@@ -14,7 +15,7 @@ namespace cvagent::service {
 
 namespace {
 
-/// What hangs is stale after this; the next look finds it again.
+/// What hangs is stale after this; a later look asks for it again.
 constexpr std::chrono::seconds kLongestLook{15};
 
 /// When a plug-in that hears the kernel itself has looked.
@@ -67,6 +68,7 @@ Look Looker::firstLook(const LinkIndices& linksBefore) {
         look.order.push_back(node->getNodeId());
         met_.insert(node->getNodeId());
     }
+    late_.endLook(look, Clock::now());
     return look;
 }
 
@@ -141,8 +143,11 @@ Looker::Wanted Looker::waitForWanted() {
 
 /// When to look though nothing is told.
 std::optional<Looker::Clock::time_point> Looker::due() const {
-    const auto tree = keeper_.due();
-    return tree && laterAt_ ? std::min(*tree, *laterAt_) : tree ? tree : laterAt_;
+    std::optional<Clock::time_point> first = keeper_.due();
+    for (const auto& other : {laterAt_, late_.due()}) {
+        first = first && other ? std::min(*first, *other) : first ? first : other;
+    }
+    return first;
 }
 
 /// Adds what was put off until now, and puts off what was heard.
@@ -229,8 +234,10 @@ std::optional<Agent::Asked> Looker::askedOf(const NodeRef& node, const Wanted& w
     const std::string name = nameOf(*node);
     // A list of routes that is read while others come and go may lack some: once more when they have settled.
     const unsigned int ofRoutes = wanted.later.concernOf(name) & concernsRoute;
-    std::vector<unsigned int> ids =
+    const std::vector<unsigned int> concerned =
         concernedProperties(node->nodeType(), wanted.host.concernOf(name) | ofHost | ofRoutes);
+    std::vector<unsigned int> ids;
+    std::ranges::set_union(concerned, late_.of(node->getNodeId()), std::back_inserter(ids));
     if (wanted.host.any() && setStatus(node) && ids.empty()) {
         ids.push_back(kLinkState);
     }
@@ -265,8 +272,9 @@ void Looker::keepTree(const Wanted& wanted, const Request& request) {
 
 Look Looker::look(const Wanted& wanted) {
     Look look{++begun_, wanted.all, {}, {}};
-    const Request request = lookRequest();
-    keepTree(wanted, request);
+    keepTree(wanted, lookRequest());
+    const Request request = lookRequest();  // of its own: on a slow host new links take longer to be found
+    late_.beginLook(Clock::now());
     std::vector<NodeRef> fresh;
     std::vector<Agent::Asked> asked;
     const std::set<std::uint32_t> met = std::exchange(met_, {});
@@ -286,6 +294,7 @@ Look Looker::look(const Wanted& wanted) {
     for (NodeView& view : readAgain(asked, request)) {
         look.nodes.push_back(std::move(view));
     }
+    late_.endLook(look, Clock::now());
     return look;
 }
 

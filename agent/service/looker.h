@@ -14,6 +14,7 @@
 #include "agent/core/agent.h"
 #include "agent/service/host_files.h"
 #include "agent/service/host_links.h"
+#include "agent/service/late_readings.h"
 #include "agent/service/model.h"
 #include "agent/service/tree_keeper.h"
 
@@ -106,6 +107,7 @@ private:
     std::set<std::uint32_t> met_;             // nodes that were looked at
     HostChange later_;                        // what others hear of, too, and look at by themselves
     std::optional<Clock::time_point> laterAt_;
+    LateReadings late_;
     Clock::time_point restUntil_;
     std::thread thread_;
 };

@@ -104,6 +104,33 @@ HOST_TEST_F(FreshFacts, OfAPortFollowItsLink) {
     }
 }
 
+/// Nothing more is heard of what came too late.
+HOST_TEST_F(FreshFacts, ThatCameTooLateAreAskedForAgain) {
+    host.tool("hostname %any", "linux-k.example.com\n");
+    host.tool("hostname -s", {"", 0, "", 0, "[ ! -e /is-slow ] || exec sleep 60; cat /name"});
+    host.file("/name", "linux-k\n");
+    ServiceRun run(host);
+    run.config("look-every = 0\ncommand-timeout = 1\n");
+    start(host, run);
+    const auto becomes = [&run](const std::string& name) {
+        return eventually([&] {
+            return fact(run, "/chassis/network-controller/network-port:eth0/ip-config:eth0", "97") == name;
+        });
+    };
+    const auto change = [&host](const std::string& name) {
+        host.file("/name", name + "\n");
+        host.file("/etc/hosts", "127.0.0.1 " + name + "\n");
+        ip(host, {"link set sw1 down", "link set sw1 up"});
+    };
+    change("linux-m");
+    ASSERT_TRUE(becomes("linux-m"));
+    host.file("/is-slow", "");
+    change("linux-n");
+    ASSERT_TRUE(becomes("failed"));
+    host.remove("/is-slow");
+    EXPECT_TRUE(becomes("linux-n"));
+}
+
 class FreshRoutes : public FreshFacts {
 protected:
     void setUpHost(FakeHost& host) override { Freshness::setUpHost(host); }

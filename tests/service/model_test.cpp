@@ -1,6 +1,7 @@
 // What the service knows, and what it tells of changes.
 #include <gmock/gmock.h>
 
+#include "agent/service/late_readings.h"
 #include "agent/service/model.h"
 #include "tests/agent/node_list.h"
 
@@ -9,6 +10,7 @@ namespace {
 using cvagent::NodeRef;
 using cvagent::NodeRefOfTest;
 using cvagent::Reading;
+using cvagent::service::LateReadings;
 using cvagent::service::Look;
 using cvagent::service::Model;
 using cvagent::service::ModelListener;
@@ -164,6 +166,68 @@ TEST_F(ModelTest, ALookThatIsOlderThanAReadTakesNothingBack) {
     look({view(1, "/a", {first, known(6, 2)})}, false);
     EXPECT_EQ(model.byId(1)->find(5)->value, written.value);
     EXPECT_THAT(notes.taken(), ElementsAre("1.Property6"));
+}
+
+class LateReadingsTest : public testing::Test {
+protected:
+    /// A look, some seconds from the start, at the properties of node 1 that are named, of which these are
+    /// late.
+    void lookAt(int seconds, const std::vector<unsigned int>& asked, const std::vector<unsigned int>& late) {
+        const auto now = start + std::chrono::seconds(seconds);
+        Look look{1, false, {1, 2}, {view(1, "/a", {known(5, 1)})}};
+        look.nodes.front().asked = asked;
+        for (const unsigned int id : late) {
+            Reading reading = known(id, 1);
+            reading.timedOut = true;
+            look.nodes.front().readings.push_back(reading);
+        }
+        readings.beginLook(now);
+        again = readings.of(1);
+        readings.endLook(look, now);
+    }
+    /// In seconds from the start; 0 for never.
+    long due() const {
+        return readings.due()
+                   ? std::chrono::duration_cast<std::chrono::seconds>(*readings.due() - start).count()
+                   : 0;
+    }
+
+    const LateReadings::Clock::time_point start = LateReadings::Clock::now();
+    LateReadings readings;
+    LateReadings::Properties again;
+};
+
+TEST_F(LateReadingsTest, AreAskedForAgainUntilTheyCome) {
+    lookAt(0, {}, {7, 9});
+    EXPECT_EQ(due(), 2);
+    lookAt(1, {8}, {8});
+    EXPECT_THAT(again, IsEmpty()) << "before it is due";
+    EXPECT_EQ(due(), 2);
+    lookAt(2, {7, 8, 9}, {9});
+    EXPECT_THAT(again, ElementsAre(7, 8, 9));
+    EXPECT_EQ(due(), 6) << "a pause twice as long";
+    lookAt(6, {9}, {});
+    EXPECT_THAT(again, ElementsAre(9));
+    EXPECT_EQ(due(), 0);
+    lookAt(7, {9}, {9});
+    EXPECT_EQ(due(), 9) << "the first pause again";
+}
+
+TEST_F(LateReadingsTest, AreAskedForSeldomWhereTheyNeverCome) {
+    lookAt(0, {9}, {9});
+    long pause = 0;
+    for (int looks = 0; looks < 12; ++looks) {
+        const long before = due();
+        lookAt(static_cast<int>(before), {9}, {9});
+        pause = due() - before;
+    }
+    EXPECT_EQ(pause, 600);
+}
+
+TEST_F(LateReadingsTest, OfANodeThatIsGoneAreForgotten) {
+    lookAt(0, {9}, {9});
+    readings.endLook({1, false, {2}, {}}, start);
+    EXPECT_EQ(due(), 0);
 }
 
 }  // namespace
