@@ -153,6 +153,23 @@ HOST_TEST_F(Confirmed, AStepThatFailsTakesAllBack) {
     EXPECT_EQ(stages(host), "1 is taken back");
 }
 
+/// Unasked, too; who insists goes as far as he comes.
+HOST_TEST_F(Confirmed, AnAppliedFileOfWhichAStepFailsIsTakenBack) {
+    host.file("/root/changes",
+              R"([{"node": "ip-config:eth0", "property": "IPv4Address", "value": "203.0.113.7"},
+                  {"node": "computer", "property": "OwnerName", "value": "x"}])");
+    host.directory("/opt/vantrel/corvista/data", 0700);
+    host.readOnly("/opt/vantrel/corvista/data");
+    const Finished run = cvagent(host, {"apply", "/root/changes"});
+    EXPECT_EQ(run.status, 1);
+    EXPECT_THAT(run.err, HasSubstr("change 1 is taken back"));
+    EXPECT_THAT(run.out, Not(HasSubstr("applied")));
+    EXPECT_EQ(look(host), old_);
+    EXPECT_THAT(cvagent(host, {"apply", "/root/changes", "--force", "--verify-within", "0"}).out,
+                HasSubstr("applied    "));
+    EXPECT_EQ(stages(host), "1 is taken back, 2 is kept");
+}
+
 /// A caller whose connection goes with his own change has the host back.
 HOST_TEST_F(Confirmed, WhoCutsHimselfOffHasTheHostBack) {
     int ready[2];
