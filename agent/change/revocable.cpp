@@ -63,7 +63,12 @@ void Revocable::beginStep() {
     try {
         making_->beginStep();
     } catch (const undo::ChangeError& error) {
-        throw Problem(Problem::failed, printable(error.what()));
+        const std::string reason = printable(error.what());
+        if (seconds_) {
+            throw Problem(Problem::failed, reason);
+        }
+        making_.reset();  // half of it would be worse
+        settings_.tell("the change cannot be taken back later: " + reason);
     }
 }
 
