@@ -86,8 +86,7 @@ bool hasEnded(const std::string& place, unsigned number) {
     try {
         const ChangeDirectory change(place, number);
         const auto journal = change.journal();
-        const bool isOpen = journal && !journal->isEnded() && journal->window != 0;
-        return !isOpen && !change.isTaken(kAgentLock);
+        return !(journal && journal->isOpen()) && !change.isTaken(kAgentLock);
     } catch (const ChangeError&) {
         return false;
     }
