@@ -1,5 +1,6 @@
 // Changes that wait for their confirmation, by running the program on links of a real kernel.
 #include <arpa/inet.h>
+#include <fcntl.h>
 #include <gmock/gmock.h>
 #include <sched.h>
 #include <sys/mount.h>
@@ -12,6 +13,7 @@
 
 #include "tests/agent/linked_host.h"
 #include "tests/agent/terminal.h"
+#include "tests/undo/waited_for.h"
 
 namespace {
 
@@ -88,6 +90,33 @@ HOST_TEST_F(Confirmed, AChangeThatIsConfirmedStaysUntilItIsRolledBack) {
     EXPECT_EQ(back.out, "change 1 is taken back\n");
     EXPECT_EQ(look(host), old_);
     EXPECT_EQ(cvagent(host, {"rollback"}).status, 3);
+}
+
+/// Broken off in its middle it would leave a host that nobody reaches.
+HOST_TEST_F(Confirmed, NeitherAKeyNorAHangUpBreaksARollbackOff) {
+    ASSERT_EQ(set(host, "600").status, 0);
+    ASSERT_EQ(cvagent(host, {"confirm", "1"}).status, 0);
+    const std::string lock = "/var/lib/corvista/changes/1/taking.lock";
+    int held = open(lock.c_str(), O_RDWR | O_CLOEXEC);
+    struct flock whole {};
+    whole.l_type = F_WRLCK;
+    ASSERT_EQ(fcntl(held, F_OFD_SETLK, &whole), 0);
+    const pid_t rollback = fork();
+    if (rollback == 0) {
+        execl(CVAGENT_PROGRAM, CVAGENT_PROGRAM, "rollback", nullptr);
+    }
+    for (int i = 0; i < 6000 && !isWaitedFor(host, lock); ++i) {
+        usleep(10'000);
+    }
+    for (const int each : {SIGINT, SIGHUP, SIGTERM, SIGQUIT, SIGTSTP}) {
+        kill(rollback, each);
+    }
+    close(held);
+    int status = 0;
+    waitpid(rollback, &status, 0);
+    EXPECT_EQ(status, 0);
+    EXPECT_EQ(look(host), old_);
+    EXPECT_EQ(stages(host), "1 is taken back");
 }
 
 /// What apply has made without a confirmation can be taken back, too.

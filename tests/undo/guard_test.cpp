@@ -10,13 +10,13 @@
 #include <csignal>
 #include <fstream>
 #include <random>
-#include <sstream>
 
 #include "agent/undo/boot_clock.h"
 #include "agent/undo/making.h"
 #include "agent/undo/taking_back.h"
 #include "tests/support/fake_host.h"
 #include "tests/undo/killed_at.h"
+#include "tests/undo/waited_for.h"
 
 namespace {
 
@@ -66,20 +66,6 @@ bool comesTrue(Condition condition) {
             return true;
         }
         usleep(10'000);
-    }
-    return false;
-}
-
-/// Whether somebody waits for the lock.
-bool isWaitedFor(const FakeHost& host, const std::string& lock) {
-    struct stat found {};
-    EXPECT_EQ(stat(lock.c_str(), &found), 0);
-    std::istringstream lines(host.read("/.proc/locks").value_or(""));
-    const std::string place = ":" + std::to_string(found.st_ino) + " ";
-    for (std::string line; std::getline(lines, line);) {
-        if (line.find("-> ") != line.npos && line.find(place) != line.npos) {
-            return true;
-        }
     }
     return false;
 }

@@ -8,6 +8,7 @@
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/print.h"
 #include "agent/cli/safeguard.h"
+#include "agent/core/signals.h"
 #include "agent/undo/making.h"
 
 namespace cvagent::commands {
@@ -99,6 +100,7 @@ ExitStatus rollback(const Options& options) {
         word = std::to_string(*last);
     }
     const ChangeDirectory change = named(word);
+    StopSignals::ignore();  // broken off in its middle it would leave a host that nobody reaches
     try {
         const Journal journal = undo::rollBack(kChangesPlace, change);
         print("change " + std::to_string(change.number()) + " " + undo::stageText(journal.stage) + "\n");
