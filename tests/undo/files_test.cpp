@@ -176,6 +176,26 @@ HOST_TEST_F(Files, OfAFullDiskAreTold) {
     EXPECT_EQ(host.read("/etc/hosts"), "127.0.0.1 localhost\n");
 }
 
+/// What a file system or a container does not let one set is no reason to keep the rest away.
+HOST_TEST_F(Files, ComeBackWithoutAnAttributeThatTheyCannotHave) {
+    SavedState before = SavedState::of({"/etc/hosts", "/etc/resolv.conf", "/etc/d"});
+    for (FileState& each : before.files) {
+        each.attributes["nobody.knows"] = "this";
+    }
+    host.file("/etc/hosts", "changed\n");
+    host.remove("/etc/resolv.conf");
+    host.remove("/etc/d");
+    std::vector<std::string> notes = takeBack(before, nullptr, before.again()).notes;
+    EXPECT_THAT(notes, testing::UnorderedElementsAre(
+                           HasSubstr("/etc/hosts is put back without all its attributes: "),
+                           HasSubstr("/etc/resolv.conf is put back without all its attributes: "),
+                           HasSubstr("/etc/d is put back without all its attributes: ")));
+    EXPECT_EQ(host.read("/etc/hosts"), "127.0.0.1 localhost\n");
+    EXPECT_EQ(fs::read_symlink("/etc/resolv.conf"), "../run/resolv.conf");
+    EXPECT_EQ(fs::status("/etc/d").permissions(), fs::perms(0750));
+    expectTimes("/etc/hosts");
+}
+
 HOST_TEST_F(Files, BringTheHostsNameBack) {
     host.setHostName("db1");
     const SavedState before = SavedState::of({});
