@@ -221,6 +221,25 @@ HOST_TEST_F(Confirmed, APersonAtATerminalIsGuardedUnasked) {
     EXPECT_EQ(stages(host), "1 is kept");
 }
 
+/// sudo gives what it runs a process group of its own, also in a script.
+HOST_TEST_F(Confirmed, BehindSudoItCountsWhoHasTypedThat) {
+    host.realTool("setsid");
+    host.file("/root/sudo", "#!/bin/sh\nsetsid \"$@\"\nexit $?\n", 0755);
+    host.file("/root/script", "/root/sudo \"$@\"\nexit $?\n");
+    const auto run = [](std::vector<std::string> words, const std::string& address) {
+        words.insert(words.end(), {CVAGENT_PROGRAM, "--plugin", CORVISTA_PLUGIN_FILE, "set", "ip-config:eth0",
+                                   "IPv4Address", address});
+        const OnTerminal done = runOnTerminal(words, "");
+        EXPECT_EQ(done.status, 0) << done.output;
+        return done.output;
+    };
+    EXPECT_THAT(run({"/bin/sh", "/root/script"}, "203.0.113.7"), Not(HasSubstr("cvagent confirm")));
+    EXPECT_EQ(stages(host), "");
+    EXPECT_THAT(run({"/root/sudo"}, "203.0.113.8"), HasSubstr("cvagent confirm 1"));
+    const Finished back = cvagent(host, {"rollback", "1"});
+    EXPECT_EQ(back.status, 0) << back.err;
+}
+
 /// Under systemd the guard is a unit, which outlives the session of who has started it.
 HOST_TEST_F(Confirmed, TheGuardIsAUnitWhereSystemdRuns) {
     host.directory("/run/systemd/system");
