@@ -304,6 +304,26 @@ HOST_TEST_F(Confirmed, WhatIsNoChangeIsRefused) {
     EXPECT_EQ(look(host), old_);
 }
 
+HOST_TEST_F(Confirmed, TheListTellsWhatIsNotBackAndWhatCannotBeRead) {
+    EXPECT_EQ(cvagent(host, {"confirm", "7"}).err,
+              "cvagent: there is no change 7\nThe changes are listed by: cvagent history --changes\n");
+    const Finished none = cvagent(host, {"history", "--changes"});
+    EXPECT_EQ(none.status, 0);
+    EXPECT_EQ(none.err, "cvagent: no change has been made so far that could be taken back\n");
+    ASSERT_EQ(set(host, "600").status, 0);
+    host.file(file_, "somebody's\n", 0640);
+    const Finished back = cvagent(host, {"rollback"});
+    EXPECT_EQ(back.status, 1);
+    const std::string note = file_ + " has been changed by somebody else since and stays as it is\n";
+    EXPECT_EQ(back.err, "cvagent: not all of it:\n" + note);
+    EXPECT_THAT(cvagent(host, {"history", "--changes"}).out, testing::EndsWith(")\n      " + note));
+    host.file("/var/lib/corvista/changes/1/journal", "corvista-change 1\n1\nstage \x1b[2J");
+    const Finished damaged = cvagent(host, {"history", "--changes"});
+    EXPECT_EQ(damaged.status, 1);
+    EXPECT_THAT(damaged.err, HasSubstr("cvagent: change 1: the journal cannot be read: "));
+    EXPECT_THAT(damaged.err, Not(HasSubstr("\x1b")));
+}
+
 /// Where nothing can be kept the change is not begun.
 HOST_TEST_F(Confirmed, AChangeThatCannotBeGuardedIsNotMade) {
     host.directory("/var/lib/corvista/changes", 0777);
