@@ -208,4 +208,18 @@ HOST_TEST_F(Files, BringTheHostsNameBack) {
     EXPECT_EQ(SavedState::of({}).hostName, "his");
 }
 
+/// That is before anything can be put back.
+HOST_TEST_F(Files, BringTheNameBackThatTheHostHasStartedWith) {
+    host.setHostName("db1");
+    host.file("/etc/hostname", "db1\n");
+    SavedState before = SavedState::of({"/etc/hostname"});
+    before.boot = "another one";
+    host.setHostName("new");
+    EXPECT_THAT(takeBack(before, nullptr, before.again()).notes, IsEmpty());
+    EXPECT_EQ(SavedState::of({}).hostName, "new") << "the file has not been touched";
+    host.file("/etc/hostname", "new\n");
+    EXPECT_THAT(takeBack(before, nullptr, before.again()).notes, IsEmpty());
+    EXPECT_EQ(SavedState::of({}).hostName, "db1");
+}
+
 }  // namespace
