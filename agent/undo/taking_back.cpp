@@ -172,7 +172,7 @@ Journal takeChangeBack(const ChangeDirectory& change) {
     return takeBackWith(change, [](const KeeperCalls& all) { return all; });
 }
 
-std::vector<std::string> takeBackAfterStart(const std::string& place) {
+std::vector<std::string> takeBackAfterStart(const std::string& place, bool& isWhole) {
     std::vector<std::string> told;
     for (const unsigned number : changesIn(place)) {
         try {
@@ -180,9 +180,12 @@ std::vector<std::string> takeBackAfterStart(const std::string& place) {
             const auto journal = change.journal();
             if (journal && journal->isOpen() && journal->boot != bootId()) {
                 const auto starting = [](const KeeperCalls& all) { return all.whileStarting(); };
-                told.push_back(sentence(number, takeBackWith(change, starting)));
+                const Journal now = takeBackWith(change, starting);
+                isWhole = isWhole && now.stage == Stage::takenBack && now.notes.empty();
+                told.push_back(sentence(number, now));
             }
         } catch (const ChangeError& error) {
+            isWhole = false;
             told.push_back("change " + std::to_string(number) + ": " + error.what());
         }
     }
