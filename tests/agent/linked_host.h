@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "tests/support/fake_host.h"
+#include "tests/support/waiting.h"
 
 /// A SUSE host whose port is a link of a real kernel, eth0 at the switch's sw0, and cvagent with the real
 /// plug-in on it.
@@ -23,11 +24,12 @@ protected:
         host.file("/etc/sysconfig/network/routes", "default\t192.0.2.1\t-\n");
         host.file("/etc/sysconfig/network/config", "NETCONFIG_DNS_POLICY=\"\"\n");
         for (const std::string words :
-             {"link add eth0 type veth peer name sw0", "link set eth0 addrgenmode none", "link set eth0 up",
-              "link set sw0 up", "address add 192.0.2.10/24 broadcast + dev eth0",
-              "route add default via 192.0.2.1"}) {
+             {"link add eth0 type veth peer name sw0", "link set eth0 addrgenmode none",
+              "link set sw0 addrgenmode none", "link set eth0 up", "link set sw0 up",
+              "address add 192.0.2.10/24 broadcast + dev eth0", "route add default via 192.0.2.1"}) {
             ip(host, words);
         }
+        ASSERT_TRUE(carrierComes("eth0") && carrierComes("sw0"));
         std::string hardware = host.run({"cat", "/sys/class/net/eth0/address"}).out;
         hardware.pop_back();
         file_ = "/etc/sysconfig/network/ifcfg-eth-id-" + hardware;

@@ -200,10 +200,13 @@ class ChangesInForce : public LinkedHost {
 protected:
     void setUpHost(FakeHost& host) override {
         LinkedHost::setUpHost(host);
-        for (const std::string words : {"link add eth1 type veth peer name sw1", "link set eth1 up",
-                                        "link set sw1 up", "address add 198.51.100.1/24 dev eth1"}) {
+        for (const std::string words :
+             {"link add eth1 type veth peer name sw1", "link set eth1 addrgenmode none",
+              "link set sw1 addrgenmode none", "link set eth1 up", "link set sw1 up",
+              "address add 198.51.100.1/24 dev eth1"}) {
             ip(host, words);
         }
+        ASSERT_TRUE(carrierComes("eth1") && carrierComes("sw1"));
     }
     static std::string moveFile() {
         return "[" + changeOf("ip-config:eth0", "IPv4Gateway", "203.0.113.1") + "," +

@@ -13,6 +13,7 @@
 
 #include "tests/agent/linked_host.h"
 #include "tests/agent/terminal.h"
+#include "tests/support/waiting.h"
 #include "tests/undo/waited_for.h"
 
 namespace {
@@ -61,13 +62,14 @@ protected:
 };
 
 HOST_TEST_F(Confirmed, AChangeThatNobodyConfirmsIsTakenBack) {
-    const Finished run = set(host, "0.5");
+    const Finished run = set(host, "600");
     EXPECT_EQ(run.status, 0) << run.err;
     EXPECT_THAT(run.out, HasSubstr("new  203.0.113.7"));
     EXPECT_THAT(run.err,
-                HasSubstr("change 1 is taken back in 1 second unless somebody types: cvagent confirm 1"));
+                HasSubstr("change 1 is taken back in 600 seconds unless somebody types: cvagent confirm 1"));
+    EXPECT_EQ(cvagent(host, {"confirm", "1", "--lengthen", "0.1"}).status, 0);
     EXPECT_TRUE(comesBack(host));
-    EXPECT_EQ(stages(host), "1 is taken back");
+    EXPECT_TRUE(eventually([&host] { return stages(host) == "1 is taken back"; })) << stages(host);
     const Finished late = cvagent(host, {"confirm", "1"});
     EXPECT_EQ(late.status, 1);
     EXPECT_THAT(late.err, HasSubstr("change 1 cannot be confirmed: it is taken back"));
@@ -153,6 +155,22 @@ HOST_TEST_F(Confirmed, AStepThatFailsTakesAllBack) {
     EXPECT_EQ(stages(host), "1 is taken back");
 }
 
+/// However slow the host is: the guard is at work, but stands still until it is let go.
+void holdGuard(FakeHost& host) {
+    host.directory("/run/systemd/system");
+    host.file(
+        "/root/hold",
+        "while [ \"$1\" != -- ]; do shift; done\n\"$2\" \"$3\" &\n"
+        "until grep -q \"OFDLCK .*:$(stat -c %i /var/lib/corvista/changes/1/guard.lock) \" /.proc/locks\n"
+        "do sleep 0.01; done\n"
+        "kill -STOP $!\necho $! > /root/held\n");
+    host.tool("/usr/bin/systemd-run %any", ToolAnswer{"", 0, "", 0, "sh /root/hold \"$@\""});
+}
+
+void letGuardGo(FakeHost& host) {
+    kill(std::stoi(host.read("/root/held").value_or("0")), SIGCONT);
+}
+
 /// A caller whose connection goes with his own change has the host back.
 HOST_TEST_F(Confirmed, WhoCutsHimselfOffHasTheHostBack) {
     int ready[2];
@@ -186,7 +204,12 @@ HOST_TEST_F(Confirmed, WhoCutsHimselfOffHasTheHostBack) {
     ASSERT_EQ(write(moved[1], "x", 1), 1);
     const int line = accept(door, nullptr, nullptr);
     ASSERT_EQ(read(line, &mark, 1), 1);
-    ASSERT_EQ(set(host, "0.5").status, 0);
+    holdGuard(host);
+    const Finished run = set(host, "0.5");
+    ASSERT_EQ(run.status, 0) << run.err;
+    EXPECT_THAT(run.err,
+                HasSubstr("change 1 is taken back in 1 second unless somebody types: cvagent confirm 1"));
+    letGuardGo(host);
     ASSERT_EQ(write(line, &mark, 1), 1);  // goes through when the address is back
     ASSERT_EQ(read(line, &mark, 1), 1);
     EXPECT_EQ(mark, '2');

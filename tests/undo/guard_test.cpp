@@ -6,15 +6,18 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <chrono>
 #include <csignal>
 #include <fstream>
 #include <random>
+#include <thread>
 
 #include "agent/undo/boot_clock.h"
 #include "agent/undo/making.h"
 #include "agent/undo/taking_back.h"
 #include "tests/support/fake_host.h"
+#include "tests/support/waiting.h"
 #include "tests/undo/killed_at.h"
 #include "tests/undo/waited_for.h"
 
@@ -81,6 +84,7 @@ protected:
               "link set sw0 up", "address add 192.0.2.10/24 dev eth0", "route add default via 192.0.2.1"}) {
             ip(host, each);
         }
+        ASSERT_TRUE(carrierComes("eth0") && carrierComes("sw0"));
         host.file("/etc/one", "old one\n", 0640);
         host.file("/etc/two", "old two\n");
         host.directory(kChangesPlace, 0700);
@@ -346,7 +350,7 @@ HOST_TEST_F(Guard, DoesNotWaitForAStepThatHangs) {
         }
         _exit(1);
     }
-    EXPECT_TRUE(comesTrue([] { return newest() && newest()->journal() && stage() == Stage::changing; }));
+    EXPECT_TRUE(comesTrue([&host] { return host.read("/etc/one") == "new one\n"; }));
     guardChange(*newest());
     int status = 0;
     waitpid(maker, &status, 0);
@@ -357,6 +361,7 @@ HOST_TEST_F(Guard, DoesNotWaitForAStepThatHangs) {
 
 /// Who makes the change is killed, and a command that he has started goes on.
 HOST_TEST_F(Guard, WaitsForACommandThatIsLeftBehind) {
+    host.file("/run/wait", "");
     const pid_t maker = fork();
     if (maker == 0) {
         ChangeInMaking making(settings());
@@ -365,7 +370,6 @@ HOST_TEST_F(Guard, WaitsForACommandThatIsLeftBehind) {
         execlp("sh", "sh", "-c",
                "(while [ -e /run/wait ]; do sleep 0.01; done; echo late > /etc/two) & kill -9 $$", nullptr);
     }
-    host.file("/run/wait", "");
     waitpid(maker, nullptr, 0);
     const pid_t guard = fork();
     if (guard == 0) {
@@ -379,10 +383,11 @@ HOST_TEST_F(Guard, WaitsForACommandThatIsLeftBehind) {
     EXPECT_EQ(stage(), Stage::takenBack);
 }
 
-/// Who makes the change is killed, and the service that does its steps goes on.
+/// Who makes the change is killed, and the service that does its steps goes on. Its time passes when it has
+/// written.
 HOST_TEST_F(Guard, WaitsForAServiceThatGoesOn) {
     MakingSettings ofService = settings();
-    ofService.settling = 1000;
+    ofService.settling = kLong;
     const pid_t maker = fork();
     if (maker == 0) {
         ChangeInMaking making(ofService);
@@ -391,14 +396,18 @@ HOST_TEST_F(Guard, WaitsForAServiceThatGoesOn) {
         _exit(0);
     }
     waitpid(maker, nullptr, 0);
-    const pid_t service = fork();
-    if (service == 0) {
-        comesTrue([&host] { return host.read("/etc/one") == "old one\n"; });
+    std::atomic<bool> hasWritten = false;
+    std::jthread service([&](const std::stop_token& over) {
+        hasWritten = comesTrue([&host] { return host.read("/etc/one") == "old one\n"; });
         host.file("/etc/two", "late\n");
-        _exit(0);
-    }
+        while (!over.stop_requested()) {
+            passTime(std::chrono::milliseconds(kLong));
+            usleep(1000);
+        }
+    });
     guardChange(*newest());
-    waitpid(service, nullptr, 0);
+    service = {};
+    EXPECT_TRUE(hasWritten);
     EXPECT_EQ(look(host), old_);
     EXPECT_EQ(stage(), Stage::takenBack);
 }
