@@ -139,6 +139,9 @@ bool hasEnded(const ChangeDirectory& change, bool& isBack) {
     try {
         return lookOnce(change);
     } catch (const ChangeError&) {
+        if (change.isGone()) {
+            return true;
+        }
         putBackUnwritten(change, isBack);
         std::this_thread::sleep_for(kNextTry);
         return false;
@@ -199,6 +202,10 @@ std::vector<std::string> guardChange(const ChangeDirectory& change) {
     }
     for (bool isBack = false; !hasEnded(change, isBack);) {
         std::this_thread::sleep_for(kLook);
+    }
+    if (change.isGone()) {
+        return {"change " + std::to_string(change.number()) +
+                ": somebody has removed what was saved; it stays as it is"};
     }
     const Journal journal = change.journal().value_or(Journal{});
     return journal.stage == Stage::kept ? std::vector<std::string>()

@@ -709,6 +709,25 @@ HOST_TEST_F(Guard, ProgramThatIsAskedToEndFails) {
     EXPECT_EQ(stage(), Stage::made);
 }
 
+/// Another guard would find no more than this one.
+HOST_TEST_F(Guard, ProgramEndsWellWhenSomebodyRemovesTheChange) {
+    make(host, settings());
+    const pid_t guard = fork();
+    if (guard == 0) {
+        execl(GUARD_PROGRAM, GUARD_PROGRAM, "1", nullptr);
+    }
+    ASSERT_TRUE(comesTrue([] { return newest()->isTaken(cvagent::undo::kGuardLock); }));
+    int status = 0;
+    kill(guard, SIGSTOP);  // it could make a file while this removes them
+    waitpid(guard, &status, WUNTRACED);
+    EXPECT_TRUE(WIFSTOPPED(status));
+    host.remove(std::string(kChangesPlace) + "/1");
+    kill(guard, SIGCONT);
+    waitpid(guard, &status, 0);
+    EXPECT_EQ(status, 0);
+    EXPECT_EQ(look(host), new_);
+}
+
 /// The unit that does it fails, for somebody has to look.
 HOST_TEST_F(Guard, ProgramFailsWhenNotAllIsBackAfterAStart) {
     make(host, settings());
