@@ -40,7 +40,7 @@ constexpr std::uint64_t kLong = 600'000;
 /// Before the fake host takes the environment away.
 const int kKills = [] {
     const char* wanted = getenv("CORVISTA_UNDO_KILLS");
-    return wanted != nullptr ? std::atoi(wanted) : 20;
+    return wanted != nullptr ? std::atoi(wanted) : 100;
 }();
 
 /// Runs it in a process of its own. @return the status of waitpid
