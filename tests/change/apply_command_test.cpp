@@ -6,6 +6,7 @@
 
 #include "tests/agent/cvagent_run.h"
 #include "tests/agent/suse_host.h"
+#include "tests/support/waiting.h"
 
 namespace {
 
@@ -209,11 +210,16 @@ protected:
         host.file("/etc/sysconfig/network/routes", "default\t192.0.2.1\t-\n");
         host.file("/etc/sysconfig/network/config", "NETCONFIG_DNS_POLICY=\"\"\n");
         for (const std::string words :
-             {"link add eth0 type veth peer name sw0", "link set eth0 up", "link set sw0 up",
-              "link add eth1 type veth peer name sw1", "link set eth1 up", "link set sw1 up",
+             {"link add eth0 type veth peer name sw0", "link add eth1 type veth peer name sw1",
+              "link set eth0 addrgenmode none", "link set sw0 addrgenmode none",
+              "link set eth1 addrgenmode none", "link set sw1 addrgenmode none", "link set eth0 up",
+              "link set sw0 up", "link set eth1 up", "link set sw1 up",
               "address add 192.0.2.10/24 broadcast + dev eth0", "address add 198.51.100.1/24 dev eth1",
               "route add default via 192.0.2.1"}) {
             ip(host, words);
+        }
+        for (const char* link : {"eth0", "sw0", "eth1", "sw1"}) {
+            ASSERT_TRUE(carrierComes(link));
         }
         std::string hardware = host.run({"cat", "/sys/class/net/eth0/address"}).out;
         hardware.pop_back();
