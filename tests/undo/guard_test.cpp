@@ -11,7 +11,6 @@
 #include <csignal>
 #include <fstream>
 #include <random>
-#include <sstream>
 #include <thread>
 
 #include "agent/undo/boot_clock.h"
@@ -20,6 +19,7 @@
 #include "tests/support/fake_host.h"
 #include "tests/support/waiting.h"
 #include "tests/undo/killed_at.h"
+#include "tests/undo/waited_for.h"
 
 namespace {
 
@@ -195,6 +195,14 @@ HOST_TEST_F(Guard, GivesMoreTime) {
     EXPECT_FALSE(newest()->journal()->isDue());
     lengthenChange(*newest(), 0);
     EXPECT_TRUE(newest()->journal()->isDue());
+}
+
+HOST_TEST_F(Guard, LeavesTheTimeThatWasGivenWhileTheChangeWasMade) {
+    ChangeInMaking making(settings(kLong));
+    making.beginStep();
+    lengthenChange(making.directory(), 2 * kLong);
+    const std::uint64_t deadline = newest()->journal()->deadline;
+    EXPECT_EQ(making.end().deadline, deadline);
 }
 
 /// A change may set the clock itself; and whoever steers it may do so meanwhile.
@@ -474,6 +482,57 @@ HOST_TEST_F(Guard, KeepsApartWhatIsAboutToBegin) {
     first.end();
 }
 
+/// Also one that nobody was to confirm: who has begun to take it back may have been killed at it.
+HOST_TEST_F(Guard, BeginsNothingBesideWhatIsBeingTakenBack) {
+    make(host, settings(0));
+    newest()->update([](Journal& journal) {
+        journal.stage = Stage::takingBack;
+        return true;
+    });
+    EXPECT_THAT([] { ChangeInMaking{settings(0)}; },
+                testing::ThrowsMessage<ChangeError>("change 1 is being taken back; when nobody is at it: "
+                                                    "cvagent rollback 1"));
+    rollBack(kChangesPlace, *newest());
+    EXPECT_EQ(look(host), old_);
+    EXPECT_EQ(ChangeInMaking(settings(0)).number(), 2U);
+}
+
+HOST_TEST_F(Guard, TakesNothingBackBelowWhatIsAboutToBegin) {
+    make(host, settings(0));
+    {
+        ChangeInMaking second(settings(0));
+        EXPECT_THROW(rollBack(kChangesPlace, ChangeDirectory(kChangesPlace, 1)), ChangeError);
+    }
+    rollBack(kChangesPlace, ChangeDirectory(kChangesPlace, 1));
+    EXPECT_EQ(look(host), old_);
+}
+
+/// Whoever begins one at the same time comes first or finds it marked.
+HOST_TEST_F(Guard, LetsNobodyBeginWhileItLooks) {
+    make(host, settings(0));
+    auto beginning = std::optional(ChangeDirectory::lockPlace(kChangesPlace));
+    const pid_t other = fork();
+    if (other == 0) {
+        beginning.reset();
+        try {
+            rollBack(kChangesPlace, ChangeDirectory(kChangesPlace, 1));
+        } catch (const ChangeError&) {
+            _exit(7);
+        }
+        _exit(0);
+    }
+    EXPECT_TRUE(comesTrue([&] { return isWaitedFor(host, kChangesPlace) || stage() != Stage::kept; }));
+    ChangeDirectory::make(kChangesPlace).update([](Journal& journal) {
+        journal.stage = Stage::changing;
+        return true;
+    });
+    beginning.reset();
+    int status = 0;
+    waitpid(other, &status, 0);
+    EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 7) << status;
+    EXPECT_EQ(look(host), new_);
+}
+
 HOST_TEST_F(Guard, GivesNoTimeWhenItIsOver) {
     make(host, settings(1));
     EXPECT_TRUE(comesTrue([] { return newest()->journal()->isDue(); }));
@@ -481,20 +540,6 @@ HOST_TEST_F(Guard, GivesNoTimeWhenItIsOver) {
     EXPECT_THROW(lengthenChange(*newest(), kLong), ChangeError);
     guardChange(*newest());
     EXPECT_EQ(look(host), old_);
-}
-
-/// Whether somebody waits for the lock.
-bool isWaitedFor(const FakeHost& host, const std::string& lock) {
-    struct stat found {};
-    EXPECT_EQ(stat(lock.c_str(), &found), 0);
-    std::istringstream lines(host.read("/.proc/locks").value_or(""));
-    const std::string place = ":" + std::to_string(found.st_ino) + " ";
-    for (std::string line; std::getline(lines, line);) {
-        if (line.find("-> ") != line.npos && line.find(place) != line.npos) {
-            return true;
-        }
-    }
-    return false;
 }
 
 /// How often a process has waited for something.
