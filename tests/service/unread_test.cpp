@@ -177,7 +177,7 @@ HOST_TEST(ServiceAttack, ManyConnectionsOfAUserAreOneReader) {
     bus::Connection sender(UnlimitedBus::kAddress);
     cvagent::service::Loop loop;
     sd_bus_attach_event(sender.get(), loop.get(), SD_EVENT_PRIORITY_NORMAL);
-    constexpr std::uint64_t kMebi = std::uint64_t{1} << 20U;
+    constexpr std::size_t kMebi = std::size_t{1} << 20U;
     Unread unread(sender, loop, {{{kMebi, 2 * kMebi, kMebi}}, 4 * kMebi});
     int full = 0;
     unread.whenFull([&full] { ++full; });
