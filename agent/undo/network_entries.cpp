@@ -177,10 +177,39 @@ unsigned tableOf(const Parts<rtmsg>& parts) {
     return parts.has(RTA_TABLE) ? parts.number(RTA_TABLE) : parts.fixed().rtm_table;
 }
 
-bool isOfOthers(const NetworkMessage& route) {
-    static const std::set<unsigned> kOthers{RTPROT_KERNEL, RTPROT_REDIRECT, RTPROT_RA};
-    return kOthers.contains(Parts<rtmsg>(route).fixed().rtm_protocol) || isOfRoutingProgram(route);
+/// The addresses to whose subnet the kernel makes no route: who has set them makes it in the kernel's name.
+std::set<std::string> withoutSubnetRoute(const NetworkMessages& network) {
+    std::set<std::string> found;
+    for (const NetworkMessage& message : network.addresses) {
+        const Parts<ifaddrmsg> parts(message);
+        if ((flagsOf(parts) & IFA_F_NOPREFIXROUTE) != 0 && parts.fixed().ifa_family == AF_INET) {
+            found.insert(std::to_string(parts.fixed().ifa_index) + " " + std::string(parts[IFA_LOCAL]));
+        }
+    }
+    return found;
 }
+
+class Others {
+public:
+    explicit Others(const NetworkMessages& network) : withoutRoute_(withoutSubnetRoute(network)) {}
+
+    bool make(const NetworkMessage& route) const {
+        static const std::set<unsigned> kOthers{RTPROT_KERNEL, RTPROT_REDIRECT, RTPROT_RA};
+        const Parts<rtmsg> parts(route);
+        const unsigned protocol = parts.fixed().rtm_protocol;
+        return (kOthers.contains(protocol) && !(protocol == RTPROT_KERNEL && isOfSomebody(parts))) ||
+               isOfRoutingProgram(route);
+    }
+
+private:
+    bool isOfSomebody(const Parts<rtmsg>& parts) const {
+        return tableOf(parts) != RT_TABLE_LOCAL && parts.has(RTA_PREFSRC) &&
+               withoutRoute_.contains(std::to_string(parts.number(RTA_OIF)) + " " +
+                                      std::string(parts[RTA_PREFSRC]));
+    }
+
+    std::set<std::string> withoutRoute_;
+};
 
 std::string destinationOf(const Parts<rtmsg>& parts) {
     const rtmsg fixed = parts.fixed();
@@ -191,9 +220,10 @@ std::string destinationOf(const Parts<rtmsg>& parts) {
 
 std::vector<Entry> routeEntries(const NetworkState& state, const std::vector<unsigned>& links) {
     std::vector<Entry> entries;
+    const Others others(state.network);
     for (const NetworkMessage& message : state.network.routes) {
         const Parts<rtmsg> parts(message);
-        if (isOfOthers(message) || !isKnown(links, parts.number(RTA_OIF))) {
+        if (others.make(message) || !isKnown(links, parts.number(RTA_OIF))) {
             continue;
         }
         const bool leadsOn =
@@ -312,8 +342,9 @@ const std::vector<EntryKind>& entryKinds() {
 
 std::vector<std::string> routesOfOthers(const NetworkMessages& network) {
     std::vector<std::string> texts;
+    const Others others(network);
     for (const NetworkMessage& route : network.routes) {
-        if (isOfOthers(route)) {
+        if (others.make(route)) {
             texts.push_back(routeText(route, network));
         }
     }
