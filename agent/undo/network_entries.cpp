@@ -177,39 +177,39 @@ unsigned tableOf(const Parts<rtmsg>& parts) {
     return parts.has(RTA_TABLE) ? parts.number(RTA_TABLE) : parts.fixed().rtm_table;
 }
 
-/// The addresses to whose subnet the kernel makes no route: who has set them makes it in the kernel's name.
-std::set<std::string> withoutSubnetRoute(const NetworkMessages& network) {
+/// What leads to a subnet at once, without a gateway: "LINK BITS NETWORK".
+std::string subnetKey(unsigned link, unsigned bits, std::string_view ip) {
+    constexpr unsigned kByte = 8;
+    std::string network(ip);
+    for (std::size_t i = 0; i < network.size(); ++i) {
+        const auto whole = static_cast<unsigned>(i) * kByte;
+        const unsigned left = bits <= whole ? 0 : std::min(bits - whole, kByte);
+        network[i] = static_cast<char>(static_cast<unsigned char>(network[i]) & (0xFF00U >> left));
+    }
+    return std::to_string(link) + " " + std::to_string(bits) + " " + network;
+}
+
+/// The subnets to which the kernel makes no route: who has set the address makes it in the kernel's name.
+std::set<std::string> subnetsOfSomebody(const NetworkMessages& network) {
     std::set<std::string> found;
     for (const NetworkMessage& message : network.addresses) {
         const Parts<ifaddrmsg> parts(message);
-        if ((flagsOf(parts) & IFA_F_NOPREFIXROUTE) != 0 && parts.fixed().ifa_family == AF_INET) {
-            found.insert(std::to_string(parts.fixed().ifa_index) + " " + std::string(parts[IFA_LOCAL]));
+        if ((flagsOf(parts) & IFA_F_NOPREFIXROUTE) != 0 && !comesByItself(parts)) {
+            found.insert(subnetKey(parts.fixed().ifa_index, parts.fixed().ifa_prefixlen, parts[IFA_ADDRESS]));
         }
     }
     return found;
 }
 
-class Others {
-public:
-    explicit Others(const NetworkMessages& network) : withoutRoute_(withoutSubnetRoute(network)) {}
-
-    bool make(const NetworkMessage& route) const {
-        static const std::set<unsigned> kOthers{RTPROT_KERNEL, RTPROT_REDIRECT, RTPROT_RA};
-        const Parts<rtmsg> parts(route);
-        const unsigned protocol = parts.fixed().rtm_protocol;
-        return (kOthers.contains(protocol) && !(protocol == RTPROT_KERNEL && isOfSomebody(parts))) ||
-               isOfRoutingProgram(route);
-    }
-
-private:
-    bool isOfSomebody(const Parts<rtmsg>& parts) const {
-        return tableOf(parts) != RT_TABLE_LOCAL && parts.has(RTA_PREFSRC) &&
-               withoutRoute_.contains(std::to_string(parts.number(RTA_OIF)) + " " +
-                                      std::string(parts[RTA_PREFSRC]));
-    }
-
-    std::set<std::string> withoutRoute_;
-};
+/// Made by the kernel, a router or a routing program. @param ofSomebody see subnetsOfSomebody()
+bool isOfOthers(const NetworkMessage& route, const std::set<std::string>& ofSomebody) {
+    static const std::set<unsigned> kOthers{RTPROT_KERNEL, RTPROT_REDIRECT, RTPROT_RA};
+    const Parts<rtmsg> parts(route);
+    const unsigned protocol = parts.fixed().rtm_protocol;
+    const std::string key = subnetKey(parts.number(RTA_OIF), parts.fixed().rtm_dst_len, parts[RTA_DST]);
+    return (kOthers.contains(protocol) && !(protocol == RTPROT_KERNEL && ofSomebody.contains(key))) ||
+           isOfRoutingProgram(route);
+}
 
 std::string destinationOf(const Parts<rtmsg>& parts) {
     const rtmsg fixed = parts.fixed();
@@ -220,10 +220,10 @@ std::string destinationOf(const Parts<rtmsg>& parts) {
 
 std::vector<Entry> routeEntries(const NetworkState& state, const std::vector<unsigned>& links) {
     std::vector<Entry> entries;
-    const Others others(state.network);
+    const auto ofSomebody = subnetsOfSomebody(state.network);
     for (const NetworkMessage& message : state.network.routes) {
         const Parts<rtmsg> parts(message);
-        if (others.make(message) || !isKnown(links, parts.number(RTA_OIF))) {
+        if (isOfOthers(message, ofSomebody) || !isKnown(links, parts.number(RTA_OIF))) {
             continue;
         }
         const bool leadsOn =
@@ -342,9 +342,9 @@ const std::vector<EntryKind>& entryKinds() {
 
 std::vector<std::string> routesOfOthers(const NetworkMessages& network) {
     std::vector<std::string> texts;
-    const Others others(network);
+    const auto ofSomebody = subnetsOfSomebody(network);
     for (const NetworkMessage& route : network.routes) {
-        if (others.make(route)) {
+        if (isOfOthers(route, ofSomebody)) {
             texts.push_back(routeText(route, network));
         }
     }
