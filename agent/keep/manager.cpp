@@ -35,9 +35,11 @@ constexpr const char* kNoSecrets = "org.freedesktop.NetworkManager.AgentManager.
 constexpr std::array kWithSecrets = {
     "802-1x", "802-11-wireless-security", "adsl", "cdma", "gsm", "macsec", "pppoe", "vpn", "wireguard"};
 
+/// Its name is that of the connection, which can be anything, and is told to people.
 bool isFileOfIts(const std::string& file) {
     std::error_code unknown;
-    return file == kProfileFiles + lastPart(file) && !lastPart(file).empty() &&
+    const std::string name = lastPart(file);
+    return file == kProfileFiles + name && !name.empty() && printable(name) == name &&
            !std::filesystem::is_symlink(file, unknown);
 }
 

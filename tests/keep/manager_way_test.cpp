@@ -241,11 +241,12 @@ HOST_TEST_F(KeptByManager, IsNotChangedBehindSomebodysBack) {
 }
 
 HOST_TEST_F(KeptByManager, IsRefusedWhereItsSettingsAreNotAFiles) {
-    for (const char* file :
-         {"", "/run/NetworkManager/system-connections/x.nmconnection",
-          "/etc/NetworkManager/system-connections/../x", "/etc/NetworkManager/system-connections/",
-          "/usr/lib/NetworkManager/system-connections/x.nmconnection",
-          "/etc/sysconfig/network-scripts/ifcfg-eth0"}) {
+    for (const char* file : {"", "/run/NetworkManager/system-connections/x.nmconnection",
+                             "/etc/NetworkManager/system-connections/../x",
+                             "/etc/NetworkManager/system-connections/\033[2J.nmconnection",
+                             "/etc/NetworkManager/system-connections/",
+                             "/usr/lib/NetworkManager/system-connections/x.nmconnection",
+                             "/etc/sysconfig/network-scripts/ifcfg-eth0"}) {
         objects_[std::string(kProfile) + " Filename"] = std::string(file);
         const MockManager other(address(), {{"eth0", kDevice}}, objects_, deeds_);
         try {
