@@ -178,9 +178,7 @@ std::vector<std::string> takeBackAfterStart(const std::string& place) {
         try {
             const ChangeDirectory change(place, number);
             const auto journal = change.journal();
-            const bool isOpen = journal && !journal->isEnded() && journal->stage != Stage::saved;
-            const bool isAsked = journal && (journal->window != 0 || journal->stage == Stage::takingBack);
-            if (isOpen && isAsked && journal->boot != bootId()) {
+            if (journal && journal->isOpen() && journal->boot != bootId()) {
                 const auto starting = [](const KeeperCalls& all) { return all.whileStarting(); };
                 told.push_back(sentence(number, takeBackWith(change, starting)));
             }
