@@ -12,7 +12,9 @@
 #include <cerrno>
 #include <set>
 
+#include "agent/undo/message_parts.h"
 #include "agent/undo/network_requests.h"
+#include "agent/undo/route_makers.h"
 
 namespace cvagent::undo {
 
@@ -44,22 +46,6 @@ std::string asRemoval(std::string request, unsigned type) {
 std::string bodyOf(const std::string& request) {
     return request.substr(NLMSG_HDRLEN);
 }
-
-/// Attributes behind a fixed part of one kind.
-template <class Fixed>
-class Parts {
-public:
-    explicit Parts(const NetworkMessage& message) : body_(message.body) {}
-    Fixed fixed() const { return readPlain<Fixed>(body_).value_or(Fixed{}); }
-    std::string_view operator[](unsigned type) const {
-        return attributeOf(body_, NLMSG_ALIGN(sizeof(Fixed)), type);
-    }
-    unsigned number(unsigned type) const { return readPlain<std::uint32_t>((*this)[type]).value_or(0); }
-    bool has(unsigned type) const { return (*this)[type].data() != nullptr; }
-
-private:
-    std::string_view body_;
-};
 
 std::string ipText(int family, std::string_view data) {
     std::array<char, INET6_ADDRSTRLEN> text{};
@@ -175,40 +161,6 @@ std::string nextHopText(const NetworkMessage& message, const NetworkMessages& /*
 
 unsigned tableOf(const Parts<rtmsg>& parts) {
     return parts.has(RTA_TABLE) ? parts.number(RTA_TABLE) : parts.fixed().rtm_table;
-}
-
-/// What leads to a subnet at once, without a gateway: "LINK BITS NETWORK".
-std::string subnetKey(unsigned link, unsigned bits, std::string_view ip) {
-    constexpr unsigned kByte = 8;
-    std::string network(ip);
-    for (std::size_t i = 0; i < network.size(); ++i) {
-        const auto whole = static_cast<unsigned>(i) * kByte;
-        const unsigned left = bits <= whole ? 0 : std::min(bits - whole, kByte);
-        network[i] = static_cast<char>(static_cast<unsigned char>(network[i]) & (0xFF00U >> left));
-    }
-    return std::to_string(link) + " " + std::to_string(bits) + " " + network;
-}
-
-/// The subnets to which the kernel makes no route: who has set the address makes it in the kernel's name.
-std::set<std::string> subnetsOfSomebody(const NetworkMessages& network) {
-    std::set<std::string> found;
-    for (const NetworkMessage& message : network.addresses) {
-        const Parts<ifaddrmsg> parts(message);
-        if ((flagsOf(parts) & IFA_F_NOPREFIXROUTE) != 0 && !comesByItself(parts)) {
-            found.insert(subnetKey(parts.fixed().ifa_index, parts.fixed().ifa_prefixlen, parts[IFA_ADDRESS]));
-        }
-    }
-    return found;
-}
-
-/// Made by the kernel, a router or a routing program. @param ofSomebody see subnetsOfSomebody()
-bool isOfOthers(const NetworkMessage& route, const std::set<std::string>& ofSomebody) {
-    static const std::set<unsigned> kOthers{RTPROT_KERNEL, RTPROT_REDIRECT, RTPROT_RA};
-    const Parts<rtmsg> parts(route);
-    const unsigned protocol = parts.fixed().rtm_protocol;
-    const std::string key = subnetKey(parts.number(RTA_OIF), parts.fixed().rtm_dst_len, parts[RTA_DST]);
-    return (kOthers.contains(protocol) && !(protocol == RTPROT_KERNEL && ofSomebody.contains(key))) ||
-           isOfRoutingProgram(route);
 }
 
 std::string destinationOf(const Parts<rtmsg>& parts) {
@@ -351,13 +303,6 @@ std::string neighbourText(const NetworkMessage& message, const NetworkMessages& 
 }
 
 }  // namespace
-
-bool isOfRoutingProgram(const NetworkMessage& route) {
-    static const std::set<unsigned> kPrograms{RTPROT_GATED, RTPROT_MRT,   RTPROT_ZEBRA, RTPROT_BIRD,
-                                              RTPROT_XORP,  RTPROT_BABEL, RTPROT_BGP,   RTPROT_ISIS,
-                                              RTPROT_OSPF,  RTPROT_RIP,   RTPROT_EIGRP};
-    return kPrograms.contains(Parts<rtmsg>(route).fixed().rtm_protocol);
-}
 
 const std::vector<EntryKind>& entryKinds() {
     static const std::vector<EntryKind> kKinds{
