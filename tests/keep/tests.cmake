@@ -4,7 +4,9 @@ if(CORVISTA_SERVICE)
     keep/editors_test.cpp
     keep/keeper_test.cpp
     keep/manager_test.cpp
+    keep/manager_way_test.cpp
     keep/mock_manager.cpp
+    keep/profile_test.cpp
     keep/set_test.cpp
     keep/way_test.cpp)
   target_compile_definitions(keep_test PRIVATE ${agent_test_programs} REHEARSAL_PROGRAM="$<TARGET_FILE:corvista-rehearsal>")
