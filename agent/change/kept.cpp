@@ -7,6 +7,7 @@
 #include <set>
 
 #include "agent/change/interface_settings.h"
+#include "agent/change/kept_host.h"
 #include "agent/change/kernel_network.h"
 #include "agent/core/command_deadline.h"
 #include "agent/keep/way.h"
@@ -199,6 +200,7 @@ undo::KeeperCalls keeperCallsFor(const std::vector<MeantChange>& changes) {
             addCallsOf({link->name, link->index}, calls);
         }
     }
+    addCallsOfHost(changes, calls);
     return calls;
 }
 

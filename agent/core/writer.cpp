@@ -220,7 +220,8 @@ WriteResult Writer::perform(const Job& job, const Request& request) {
         result.lacking = joined(effect.isKept ? "" : lackingEffect(*job.node, row, job.value, result.after),
                                 effect.lacking);
         if (effect.isKept && result.outcome == WriteResult::differs) {
-            result.outcome = WriteResult::notKnown;  // the plug-in reads its files, or what takes a moment
+            // The plug-in reads its files, or what takes a moment.
+            result.outcome = effect.isInForce ? WriteResult::applied : WriteResult::notKnown;
         }
         result.notes = std::move(effect.notes);
     }
