@@ -340,7 +340,6 @@ BringIntoForce bringingIntoForce(Neighbours neighbours) {
             EffectInForce effect = act ? act(kept.isKept) : EffectInForce();
             effect.isKept = kept.isKept;
             effect.isInForce = kept.isInForce;
-            effect.lacking = effect.lacking.empty() ? kept.lacking : effect.lacking;
             if (!kept.note.empty()) {
                 effect.notes.push_back(kept.note);
             }

@@ -150,7 +150,6 @@ Kept keepLists(const HostsValue& written) {
     }
     Kept kept = keptIn(way, "");
     kept.isInForce = written.isTried || comesIntoForce(resolver, wish);
-    kept.lacking = kept.isInForce ? "" : resolver.system + " does not use it";
     return kept;
 }
 

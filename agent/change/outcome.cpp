@@ -29,7 +29,9 @@ std::string kernelSays(const MeantChange& change, const Reading& reading) {
     name.value = IC::PropertyValue(interfaceNameOf(*change.node), true);
     try {
         const verify::Result found = verify::verify({change.node}, {{name, reading}});
-        return found.differences.empty() ? "" : "; the kernel says " + found.differences.front().kernel;
+        const auto own =
+            std::ranges::find(found.differences, change.row->name, &verify::Difference::property);
+        return own == found.differences.end() ? "" : "; the kernel says " + own->kernel;
     } catch (const Problem&) {
         return {};
     }
@@ -65,9 +67,19 @@ void announceLoss(ChangedHost& host, const MeantChange& change, const Outcome& o
     host.announce(event);
 }
 
+/// Once more where it seems lost: who sets something anew takes the old away first.
+Found findSettled(ChangedHost& host, const MeantChange& change, bool wasSo, const Request& request) {
+    Found found = findNow(host, change, request);
+    if (wasSo && found.standing.outcome == WriteResult::differs) {
+        std::this_thread::sleep_for(kBetweenLooks);
+        found = findNow(host, change, request);
+    }
+    return found;
+}
+
 void look(ChangedHost& host, const MeantChange& change, Outcome& outcome, const Request& request) {
-    const Found found = findNow(host, change, request);
     const bool wasSo = outcome.kind == Outcome::applied;
+    const Found found = findSettled(host, change, wasSo, request);
     outcome.kind = kindOf(found.standing.outcome);
     outcome.after = found.reading;
     outcome.reason = printable(found.standing.reason);

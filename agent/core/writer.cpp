@@ -1,6 +1,8 @@
 #include "agent/core/writer.h"
 
 #include <array>
+#include <chrono>
+#include <thread>
 
 #include "agent/core/command_deadline.h"
 
@@ -192,6 +194,33 @@ WriteResult Writer::timedOut(const IC::MutableNode& node, const Property& row, b
     return result;
 }
 
+/// A system that keeps the interface is told to set it up, and does so a moment later.
+Reading Writer::askSettled(const Job& job) {
+    constexpr std::chrono::seconds kLongest{2};
+    constexpr std::chrono::milliseconds kBetweenLooks{50};
+    const auto end = std::chrono::steady_clock::now() + kLongest;
+    Reading after = facts_.ask(*job.node, job.row.id);
+    while (compare(job.row, job.value, after) == WriteResult::differs &&
+           std::chrono::steady_clock::now() < end) {
+        std::this_thread::sleep_for(kBetweenLooks);
+        after = facts_.ask(*job.node, job.row.id);
+    }
+    return after;
+}
+
+void Writer::lookAfter(const Job& job, const EffectInForce& effect, WriteResult& result) {
+    const bool isAwaited = effect.isKept && !effect.isInForce;
+    result.after = isAwaited ? askSettled(job) : facts_.ask(*job.node, job.row.id);
+    result.outcome = effect.isInForce ? WriteResult::applied : compare(job.row, job.value, result.after);
+    std::string lacking;
+    if (!effect.isKept) {
+        lacking = lackingEffect(*job.node, job.row, job.value, result.after);
+    } else if (result.outcome == WriteResult::differs) {
+        lacking = "it is kept for the next start, but the host has another value now";
+    }
+    result.lacking = joined(lacking, effect.lacking);
+}
+
 WriteResult Writer::perform(const Job& job, const Request& request) {
     const ErrorScope scope(request.errors());
     const Property& row = job.row;
@@ -215,14 +244,7 @@ WriteResult Writer::perform(const Job& job, const Request& request) {
     const bool refused = result.problem && result.problem->kind() == Problem::failed;
     result.after = {row.id, &row, {}, afterUnread(result, refused)};
     if (!result.problem && row.readable) {
-        result.after = facts_.ask(*job.node, row.id);
-        result.outcome = compare(row, job.value, result.after);
-        result.lacking = joined(effect.isKept ? "" : lackingEffect(*job.node, row, job.value, result.after),
-                                effect.lacking);
-        if (effect.isKept && result.outcome == WriteResult::differs) {
-            // The plug-in reads its files, or what takes a moment.
-            result.outcome = effect.isInForce ? WriteResult::applied : WriteResult::notKnown;
-        }
+        lookAfter(job, effect, result);
         result.notes = std::move(effect.notes);
     }
     announcer_.announceWrite(

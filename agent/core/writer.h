@@ -83,6 +83,8 @@ private:
     class Turn;
 
     WriteResult perform(const Job& job, const Request& request);
+    Reading askSettled(const Job& job);
+    void lookAfter(const Job& job, const EffectInForce& effect, WriteResult& result);
     void giveUp(std::uint64_t turn);
     WriteResult timedOut(const IC::MutableNode& node, const Property& row, bool begun);
 

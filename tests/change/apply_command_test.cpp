@@ -371,15 +371,16 @@ HOST_TEST_F(ChangesInForce, AreKeptWithTheirPlan) {
     EXPECT_EQ(entries[2]["verdict"], "applied");
 }
 
-/// Somebody who sets the old address again as soon as the write is in the history.
+/// Somebody who sets the old address again as soon as the write is in the history: with a subnet of its own,
+/// so that it does not go with the new one, and the interface is never without an address.
 HOST_TEST_F(ChangesInForce, WhoeverChangesItBackIsTold) {
     host.file("/root/changes", "[" + changeOf("ip-config:eth0", "IPv4Address", "192.0.2.77") + "]");
     host.realTool("sleep");
     RunningProgram daemon =
         host.start({"sh", "-c",
                     "until [ -e /var/lib/corvista/history.db ]; do sleep 0.05; done; "
-                    "ip address add 192.0.2.10/24 dev eth0; ip address del 192.0.2.77/24 dev eth0; "
-                    "ip address replace 192.0.2.10/24 dev eth0; exec ip monitor address"});
+                    "ip address add 192.0.2.10/25 dev eth0; ip address del 192.0.2.77/24 dev eth0; "
+                    "exec ip monitor address"});
     const Finished run = cvagent(host, {"apply", "/root/changes", "--verify-within", "20"});
     EXPECT_EQ(run.status, 1) << run.out;
     EXPECT_THAT(run.out, HasSubstr("differs    "));

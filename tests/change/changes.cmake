@@ -2,6 +2,7 @@ corvista_test(change_checks LIBRARIES agent_change agent_core test_support SOURC
   change/change_file_test.cpp
   change/changes_page_test.cpp
   change/checks_test.cpp
+  change/outcome_test.cpp
   change/unified_diff_test.cpp)
 target_compile_definitions(change_checks_test PRIVATE CORVISTA_CHANGES_PAGE="${CMAKE_SOURCE_DIR}/docs/changes.md")
 corvista_test(change_apply PARTS 2 LIBRARIES agent_change agent_core test_support SOURCES

@@ -64,13 +64,38 @@ HOST_TEST_F(SetAndKeptByIfupdown, AnAddressOfAnotherHandIsPutBack) {
     EXPECT_THAT(addresses, testing::HasSubstr("inet 198.51.100.1/24"));
 }
 
-HOST_TEST_F(SetAndKeptByIfupdown, AGatewayOfIpv6IsInTheStanzaOfItsFamily) {
-    const std::string six = "iface eth0 inet6 static\n  address 2001:db8::10/64\n";
-    host.file("/etc/network/interfaces", kStanza + six);
-    ip(host, "address add 2001:db8::10/64 dev eth0 nodad");
-    const Finished run = cvagent(host, {"set", "ip-config:eth0", "IPv6Gateway", "2001:db8::1"});
+/// An interface of both families, whose gateway of IPv6 comes a moment after ifup.
+class SetAndKeptOfIpv6 : public SetAndKeptByIfupdown {
+protected:
+    void setUpHost(FakeHost& host) override {
+        SetAndKeptByIfupdown::setUpHost(host);
+        host.file("/etc/network/interfaces", std::string(kStanza) + kIpv6);
+        ip(host, "address add 2001:db8::10/64 dev eth0 nodad");
+        host.realTool("sleep");
+    }
+    static void bringGateway(FakeHost& host, const std::string& gateway) {
+        host.tool("ifdown eth0", "");
+        host.tool("ifup eth0", {"", 0, "", 0,
+                                "(sleep 0.3; exec ip -6 route add default via " + gateway +
+                                    " dev eth0) >/dev/null 2>&1 &"});
+    }
+    static constexpr const char* kIpv6 = "iface eth0 inet6 static\n  address 2001:db8::10/64\n";
+};
+
+HOST_TEST_F(SetAndKeptOfIpv6, AGatewayIsInTheStanzaOfItsFamily) {
+    bringGateway(host, "2001:db8::1");
+    const Finished run = cvagent(host, {"set", "ip-config:eth0", "IPv6Gateway", "2001:DB8:0::1"});
+    EXPECT_EQ(run.status, 0) << run.err;
     EXPECT_THAT(run.err, testing::HasSubstr("kept over a restart by ifupdown"));
-    EXPECT_EQ(host.read("/etc/network/interfaces"), kStanza + six + "  gateway 2001:db8::1\n");
+    EXPECT_EQ(host.read("/etc/network/interfaces"), std::string(kStanza) + kIpv6 + "  gateway 2001:db8::1\n");
+}
+
+HOST_TEST_F(SetAndKeptOfIpv6, AGatewayThatIsKeptAndDoesNotComeIsNotDone) {
+    bringGateway(host, "2001:db8::2");
+    const Finished run = cvagent(host, {"set", "ip-config:eth0", "IPv6Gateway", "2001:db8::1"});
+    EXPECT_EQ(run.status, 1);
+    EXPECT_THAT(run.err, testing::HasSubstr("kept over a restart by ifupdown"));
+    EXPECT_THAT(run.err, testing::HasSubstr("it is kept for the next start, but the host has another value"));
 }
 
 HOST_TEST_F(SetAndKeptByIfupdown, APlanShowsIt) {
