@@ -129,8 +129,8 @@ Standing standingOf(const IC::MutableNode& node, const Property& row, const IC::
     if (effect != nullptr) {
         const NodeRef copy = named(node);
         const std::string lacking = effect->lacking({*copy, value, &reading.value});
-        const bool isElsewhere = isKeptElsewhere(row, value, reading.value) || isInForceBySystem(row, value);
-        if (!lacking.empty() && !isElsewhere) {
+        if (!lacking.empty() && !isKeptElsewhere(row, value, reading.value) &&
+            !isInForceBySystem(row, value)) {
             return {WriteResult::differs, lacking};
         }
     }

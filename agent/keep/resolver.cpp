@@ -75,13 +75,23 @@ bool isMountedOver() {
            (found.stx_attributes & STATX_ATTR_MOUNT_ROOT) != 0;
 }
 
+/// One in a container writes another file. Of who does not let us look it is taken for granted that it is
+/// here.
+bool isInOurNetwork(const fs::path& process) {
+    std::error_code unknown;
+    const fs::path other = fs::read_symlink(process / "ns/net", unknown);
+    return unknown || other == fs::read_symlink("/proc/self/ns/net", unknown);
+}
+
 std::string runningWriter() {
     std::error_code problem;
     for (fs::directory_iterator at("/proc", problem), end; !problem && at != end; at.increment(problem)) {
         const std::string name = at->path().filename();
         const bool isProcess = name.find_first_not_of("0123456789") == std::string::npos;
         const Texts words = wordsOf(isProcess ? smallFile(at->path() / "comm").value_or("") : "");
-        if (words.size() == 1 && std::ranges::find(kUnmarkedWriters, words[0]) != kUnmarkedWriters.end()) {
+        const bool isWriter =
+            words.size() == 1 && std::ranges::find(kUnmarkedWriters, words[0]) != kUnmarkedWriters.end();
+        if (isWriter && isInOurNetwork(at->path())) {
             return words[0];
         }
     }

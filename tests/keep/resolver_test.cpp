@@ -1,5 +1,6 @@
 // Who makes what the C library reads of name servers and search domains, and how he keeps them.
 #include <gmock/gmock.h>
+#include <sched.h>
 #include <sys/mount.h>
 #include <sys/prctl.h>
 #include <sys/wait.h>
@@ -159,11 +160,12 @@ HOST_TEST(ResolverOfHost, IsAnothersWhereSomethingIsMountedOverTheFile) {
 /// A process of that name, until the end.
 class NamedProcess {
 public:
-    explicit NamedProcess(const char* name) {
+    explicit NamedProcess(const char* name, int namespaces = 0) {
         std::array<int, 2> ends{};
         EXPECT_EQ(pipe(ends.data()), 0);
         id_ = fork();
         if (id_ == 0) {
+            unshare(namespaces);
             prctl(PR_SET_NAME, name);
             close(ends[1]);
             close(ends[0]);
@@ -192,6 +194,7 @@ HOST_TEST(ResolverOfHost, IsAClientOfDhcpThatLeavesNoMark) {
         EXPECT_EQ(resolverOfHost().obstacle, "dhclient writes /etc/resolv.conf with each lease");
     }
     const NamedProcess other("dhclient-like");
+    const NamedProcess contained("dhclient", CLONE_NEWNET);
     EXPECT_EQ(resolverOfHost().obstacle, "");
 }
 
