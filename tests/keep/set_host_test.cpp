@@ -160,6 +160,8 @@ HOST_TEST_F(SetByResolved, WhatItUsesAlreadyIsUnchanged) {
     EXPECT_EQ(run.status, 0) << run.err;
     EXPECT_THAT(run.out, HasSubstr("unchanged"));
     EXPECT_THAT(host.calls(), IsEmpty());
+    host.file("/run/systemd/resolve/resolv.conf", "nameserver 192.0.2.1\nnameserver 192.0.2.53\n");
+    EXPECT_THAT(cvagent(host, {"diff", "/changes"}).out, HasSubstr("127.0.0.53"));
 }
 
 HOST_TEST_F(SetByResolved, NameServersThatItDoesNotUseAreNotInForce) {
@@ -171,7 +173,9 @@ HOST_TEST_F(SetByResolved, NameServersThatItDoesNotUseAreNotInForce) {
         HasSubstr("was not changed, or only in part: it is kept for the next start, but the host has"));
 }
 
+/// Also where nothing has told beforehand what would be written.
 HOST_TEST_F(SetByResolved, TheyAreTakenBackAndItIsTold) {
+    ASSERT_EQ(mount("/dev/null", REHEARSAL_PROGRAM, nullptr, MS_BIND, nullptr), 0);
     ASSERT_EQ(cvagent(host, {"set", kNode, "DNSServers", "192.0.2.53", "--confirm-within", "600"}).status, 0);
     ASSERT_TRUE(host.exists(kDropIn));
     host.clearCalls();
