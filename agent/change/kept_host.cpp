@@ -95,10 +95,10 @@ Kept keepZone(const HostsValue& written) {
 }
 
 Wish wishOfLists(unsigned int property, const IC::PropertyValue& value) {
-    constexpr unsigned int kNameServers = 94;
+    constexpr unsigned int kListOfServers = 94;
     const auto* texts = value.asTexts();
     Wish wish;
-    (property == kNameServers ? wish.nameServers : wish.searchDomains) =
+    (property == kListOfServers ? wish.nameServers : wish.searchDomains) =
         texts != nullptr ? *texts : std::vector<std::string>();
     return wish;
 }
