@@ -9,6 +9,7 @@
 #include <thread>
 
 #include "agent/change/interface_settings.h"
+#include "agent/change/kept_host.h"
 #include "agent/change/kernel_network.h"
 #include "agent/core/command_deadline.h"
 #include "agent/keep/manager.h"
@@ -230,6 +231,7 @@ undo::KeeperCalls keeperCallsFor(const std::vector<MeantChange>& changes) {
             addCallsOf({link->name, link->index}, calls);
         }
     }
+    addCallsOfHost(changes, calls);
     return calls;
 }
 
