@@ -36,7 +36,8 @@ struct Parts {
     Workers& readers;
     Workers& writers;
     Workers& planners;
-    Workers& lookups;  ///< of what changes mean
+    Workers& lookups;     ///< of what changes mean
+    Workers& confirmers;  ///< who have no time to wait behind the others
     std::shared_ptr<Mailbox> mailbox;
     /// How changes are tried out.
     change::RehearsalSettings rehearsal;
@@ -97,5 +98,8 @@ void startRead(const CallPointer& call, std::optional<std::uint32_t> node);
 void startWrite(const CallPointer& call, std::optional<std::uint32_t> node);
 void startPlan(const CallPointer& call);
 void startApply(const CallPointer& call);
+void startConfirm(const CallPointer& call);
+void startLengthen(const CallPointer& call);
+void startRollback(const CallPointer& call);
 
 }  // namespace cvagent::service

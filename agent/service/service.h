@@ -66,6 +66,7 @@ private:
     Workers writers_;
     Workers planners_;
     Workers lookups_;
+    Workers confirmers_;
     Parts parts_;
     Objects objects_;
     std::uint64_t looks_ = 0;
