@@ -9,6 +9,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <csignal>
@@ -168,11 +169,20 @@ void watch(pid_t process, const Descriptor& socket) {
     }
 }
 
+/// Whether one of the changes can be of something that NetworkManager keeps.
+bool isOfInterface(const cvagent::change::RehearsalRequest& request) {
+    return std::ranges::any_of(request.changes, [](const cvagent::change::Change& change) {
+        return change.node.find("ip-config") != std::string::npos;
+    });
+}
+
 void rehearse(const Descriptor& socket, const std::string& text) {
     const auto request = cvagent::change::requestFromJson(text);
     cvagent::change::Isolation isolation;
     isolation.dataDirectory = dataDirectory(request);
-    cvagent::keep::loseManager([](const std::string& asked) { Record::only().command(asked, true); });
+    if (isOfInterface(request)) {
+        cvagent::keep::loseManager([](const std::string& asked) { Record::only().command(asked, true); });
+    }
     cvagent::programDirectory();  // is found now: below another root it cannot be told later
     isolation.asUser = cvagent::change::gainRightToIsolate();
     Turns turns;
