@@ -20,6 +20,7 @@
 #include "agent/core/own_directory.h"
 #include "agent/core/program_path.h"
 #include "agent/shell/starts.h"
+#include "framework/qx/corvista_utilities.h"
 
 namespace cvagent::change {
 
@@ -31,6 +32,7 @@ using Words = std::vector<std::string>;
 
 constexpr const char* kGuardProgram = "corvista-guard";
 constexpr const char* kNetworkSettings = "/etc/sysconfig/network";
+constexpr const char* kSavedSettings = "/opt/vantrel/corvista/data";  // of interfaces, wherever data are kept
 constexpr std::chrono::seconds kLongestStart{10};
 constexpr std::chrono::milliseconds kGuardLook{5};
 
@@ -136,6 +138,24 @@ void addUsual(std::set<std::string>& paths) {
     }
 }
 
+/// What stands in the data directory; other writes may go on there, so only where no plan says what it will
+/// be.
+void addData(std::set<std::string>& paths) {
+    const char* const directory = QX::CorvistaUtilities::getMoraineDataDir();
+    if (directory != nullptr) {
+        paths.insert(std::string(directory) + "asset.dat");
+    }
+    std::error_code none;
+    for (const auto& entry : fs::directory_iterator(kSavedSettings, none)) {
+        if (entry.path().filename().string().starts_with("ifcfg-") && entry.is_regular_file(none)) {
+            paths.insert(entry.path());
+        }
+    }
+    for (const auto& link : fs::directory_iterator("/sys/class/net", none)) {
+        paths.insert(std::string(kSavedSettings) + "/ifcfg-" + link.path().filename().string());
+    }
+}
+
 }  // namespace
 
 std::vector<std::string> touchedPaths(const std::vector<FileChange>& planned) {
@@ -147,6 +167,9 @@ std::vector<std::string> touchedPaths(const std::vector<FileChange>& planned) {
         }
     }
     addUsual(paths);
+    if (planned.empty()) {
+        addData(paths);
+    }
     std::error_code none;
     for (const std::string& link : std::set<std::string>(paths)) {
         const fs::path target = fs::is_symlink(link, none) ? fs::canonical(link, none) : fs::path();

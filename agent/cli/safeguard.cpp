@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <sstream>
 
 #include "agent/change/guarding.h"
 #include "agent/change/kept.h"
@@ -35,12 +36,28 @@ bool canCutOff(const MeantChange& change) {
            std::ranges::find(kCutOff, change.row->id) != std::end(kCutOff);
 }
 
-/// A shell gives each command that is typed a process group of its own, and none to those of a script.
+bool isSudo(pid_t process) {
+    const auto name = cvagent::contentOf("/proc/" + std::to_string(process) + "/comm");
+    return name == "sudo\n" || name == "doas\n";
+}
+
+/// @param process whose name has no blanks
+pid_t parentOf(pid_t process) {
+    std::istringstream words(cvagent::contentOf("/proc/" + std::to_string(process) + "/stat").value_or(""));
+    std::string skipped;
+    pid_t parent = 0;
+    words >> skipped >> skipped >> skipped >> parent;
+    return parent;
+}
+
+/// A shell gives each command that is typed a process group of its own, and none to those of a script. sudo
+/// gives what it runs one in any case, so that it is sudo that counts.
 bool isTyped() {
-    const pid_t group = getpgrp();
-    const std::string leader = cvagent::contentOf("/proc/" + std::to_string(group) + "/comm").value_or("");
-    const bool isLed = group == getppid() && (leader == "sudo\n" || leader == "doas\n");
-    return isatty(STDIN_FILENO) == 1 && (group == getpid() || isLed);
+    pid_t command = getpid();
+    for (pid_t above = getppid(); isSudo(above); above = parentOf(above)) {
+        command = above;
+    }
+    return isatty(STDIN_FILENO) == 1 && getpgid(command) == command;
 }
 
 std::string summaryOf(const std::vector<MeantChange>& changes) {

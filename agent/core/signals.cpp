@@ -116,6 +116,12 @@ void StopSignals::becomeWriteErrors() {
     handle(SIGXFSZ, passOver);
 }
 
+void StopSignals::ignore() {
+    for (const int each : {SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGTSTP, SIGTTOU}) {
+        handle(each, SIG_IGN);
+    }
+}
+
 void StopSignals::install() {
     becomeWriteErrors();
     sem_init(&arrived, 0, 0);

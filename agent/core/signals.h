@@ -14,6 +14,9 @@ class StopSignals {
 public:
     /// Makes SIGPIPE and SIGXFSZ errors of the write.
     static void becomeWriteErrors();
+    /// In place of install, for what has to come to its end: neither these nor the keys of a terminal end or
+    /// stop the process any more.
+    static void ignore();
     /// Installs the handlers, those as well, and starts the thread that ends the process. To be called once,
     /// before the first command begins and after what a process does before its first thread. Where the
     /// system gives no thread, signals keep ending the program at once.

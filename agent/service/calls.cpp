@@ -20,6 +20,7 @@ namespace {
 constexpr std::chrono::seconds kReadTime{20};  // below the 25 s after which most clients give up
 constexpr std::size_t kMostEvents = 512;
 constexpr std::size_t kMostProperties = 1024;  // of one read
+constexpr std::size_t kLongestWord = 16384;    // that may be a path; a call that waits keeps it
 constexpr unsigned int kWeightOfLarge = 8;
 
 /// In the order of Problem::Kind.
@@ -168,6 +169,9 @@ void answerTree(const CallPointer& call) {
 
 void answerFind(const CallPointer& call) {
     const std::string word = bus::Reader(call->message()).text();
+    if (word.size() > kLongestWord) {
+        throw Problem(Problem::notFound, "no node has so long a name", Problem::node);
+    }
     call->withCaller([call, word](const Caller& caller) {
         submit(call, call->parts().readers, caller, [call, word] {
             const NodeRef found = call->parts().agent.find(word);

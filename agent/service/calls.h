@@ -47,7 +47,8 @@ struct Parts {
 /// As long as a person waits for a host to change; a write that waits its turn that long is told so.
 inline constexpr std::chrono::seconds kWriteTime{150};
 
-/// A call that is answered later. What goes wrong on the way is the answer.
+/// A call that is answered later. What goes wrong on the way is the answer. Its message counts who holds it
+/// without a lock, and so does the connection behind: threads share a call by a CallPointer, never by a copy.
 class PendingCall {
 public:
     PendingCall(Parts& parts, bus::Message message) : parts_(parts), message_(std::move(message)) {}
@@ -74,6 +75,7 @@ private:
     bus::Message message_;
 };
 
+/// See heldForLoop.
 using CallPointer = std::shared_ptr<const PendingCall>;
 
 /// The last part of the name that a problem has as an error on the bus: "Busy".

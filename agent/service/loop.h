@@ -9,6 +9,8 @@
 #include <functional>
 #include <memory>
 #include <mutex>
+#include <thread>
+#include <utility>
 
 namespace cvagent::service {
 
@@ -33,6 +35,20 @@ private:
     std::deque<std::function<void()>> waiting_;  // guarded by guard_
     bool closed_ = false;                        // guarded by guard_
 };
+
+/// Holds what belongs to the loop's thread for other threads, too: whoever lets go of it last, it ends on the
+/// loop's. To be called there.
+template <class Held>
+std::shared_ptr<const Held> heldForLoop(const std::shared_ptr<Mailbox>& mailbox, Held held) {
+    const auto end = [mailbox, loop = std::this_thread::get_id()](const Held* last) {
+        if (std::this_thread::get_id() == loop) {
+            delete last;
+        } else {
+            mailbox->post([owned = std::shared_ptr<const Held>(last)] {});
+        }
+    };
+    return {new Held(std::move(held)), end};
+}
 
 /// The thread that all of the bus belongs to: it waits for descriptors, times and other threads' work.
 class Loop {

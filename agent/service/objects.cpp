@@ -89,7 +89,7 @@ void Objects::handle(const bus::Message& message) {
         return;
     }
     ++handled_;
-    const auto call = std::make_shared<const PendingCall>(parts_, message);
+    const auto call = heldForLoop(parts_.mailbox, PendingCall(parts_, message));
     if (!call->isRead()) {
         return;
     }

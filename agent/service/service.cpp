@@ -83,13 +83,14 @@ Service::Service(Loop& loop, bus::Connection& connection, Agent& agent, const Co
     configure(config);
 }
 
-/// What comes back from other threads would find nothing of this any more, and they nothing of the parts.
+/// What comes back from other threads would find nothing of this any more, and they nothing of the parts. The
+/// mailbox takes the calls that they let go of until the last has ended.
 Service::~Service() {
     windDown();
-    loop_.mailbox()->close();
     for (Workers* workers : {&lookups_, &planners_, &readers_, &writers_}) {
         workers->end();
     }
+    loop_.mailbox()->close();
 }
 
 void Service::begin(const LinkIndices& linksBefore) {

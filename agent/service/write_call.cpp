@@ -54,13 +54,11 @@ void perform(const CallPointer& call, const Wish& wish, Request::Clock::time_poi
     noteWrite(Priority::notice, wish.deed(),
               who + " wrote " + wish.target() + ": " + (result.problem ? result.problem->what() : verdict),
               verdict);
-    call->parts().mailbox->post([call, result, errors, id = wish.node->getNodeId()] {
-        call->guarded([&] {
-            if (!result.after.failed()) {
-                call->parts().model.learn(id, {result.after});
-            }
-            answerWrite(*call, result, errors);
-        });
+    comeBack(call, [call, result, errors, id = wish.node->getNodeId()] {
+        if (!result.after.failed()) {
+            call->parts().model.learn(id, {result.after});
+        }
+        answerWrite(*call, result, errors);
     });
 }
 
@@ -78,11 +76,8 @@ void decide(const CallPointer& call, const Wish& wish) {
                 throw bus::Error(bus::kAccessDenied, "you may not write this: " + reason);
             }
             const auto until = Request::Clock::now() + kWriteTime;
-            const bool taken = call->parts().writers.submit(
-                wish.caller.user, [call, wish, until] { perform(call, wish, until); });
-            if (!taken) {
-                throw bus::Error(bus::kLimitsExceeded, "too many writes wait for their turn already");
-            }
+            submit(call, call->parts().writers, wish.caller,
+                   [call, wish, until] { perform(call, wish, until); });
         });
     });
 }

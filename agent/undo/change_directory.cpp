@@ -52,11 +52,15 @@ Descriptor openPlace(const std::string& place) {
     return opened;
 }
 
+std::string missing(unsigned number) {
+    return "there is no change " + std::to_string(number);
+}
+
 Descriptor openChange(int place, unsigned number) {
     const std::string name = std::to_string(number);
     Descriptor opened(openat(place, name.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
     if (!opened.isOpen() && errno == ENOENT) {
-        throw ChangeError("there is no change " + name);
+        throw ChangeError(missing(number));
     }
     tried(opened.get(), "the change " + name);
     judge(opened.get(), "the change " + name);
@@ -86,8 +90,7 @@ bool hasEnded(const std::string& place, unsigned number) {
     try {
         const ChangeDirectory change(place, number);
         const auto journal = change.journal();
-        const bool isOpen = journal && !journal->isEnded() && journal->window != 0;
-        return !isOpen && !change.isTaken(kAgentLock);
+        return !(journal && journal->isOpen()) && !change.isTaken(kAgentLock);
     } catch (const ChangeError&) {
         return false;
     }
@@ -124,6 +127,9 @@ std::vector<unsigned> changesIn(const std::string& place) {
 }
 
 ChangeDirectory::ChangeDirectory(const std::string& place, unsigned number) : number_(number) {
+    if (access(place.c_str(), F_OK) != 0 && errno == ENOENT) {
+        throw ChangeError(missing(number));  // none was made so far
+    }
     directory_ = openChange(openPlace(place).get(), number);
 }
 
@@ -154,6 +160,11 @@ ChangeDirectory ChangeDirectory::make(const std::string& place) {
             failWith(place);
         }
     }
+}
+
+bool ChangeDirectory::isGone() const {
+    struct stat found {};
+    return fstat(directory_.get(), &found) == 0 && found.st_nlink == 0;
 }
 
 std::optional<Journal> ChangeDirectory::journal() const {

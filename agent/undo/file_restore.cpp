@@ -40,36 +40,42 @@ void giveOwner(int file, const FileState& state) {
 }
 
 /// Those that a new file gets by itself (a label, a list of the directory) and the old one had not go.
-void giveAttributes(int file, const FileState& state) {
+/// @return 0, or an errno: what one of them cannot be is no reason to keep the content away
+int giveAttributes(int file, const FileState& state) {
+    int problem = 0;
+    const auto note = [&problem](int result) { problem = result < 0 ? errno : problem; };
     std::array<char, 65536> names{};
     const ssize_t size = flistxattr(file, names.data(), names.size());
     for (ssize_t at = 0; at < size;) {
         const std::string name(names.data() + at);
         at += static_cast<ssize_t>(name.size()) + 1;
         if (!state.attributes.contains(name)) {
-            must(fremovexattr(file, name.c_str()));
+            note(fremovexattr(file, name.c_str()));
         }
     }
     for (const auto& [name, value] : state.attributes) {
-        must(fsetxattr(file, name.c_str(), value.data(), value.size(), 0));
+        note(fsetxattr(file, name.c_str(), value.data(), value.size(), 0));
     }
+    return problem;
 }
 
-void fill(int file, const FileState& state) {
+/// @return of its attributes, as giveAttributes
+int fill(int file, const FileState& state) {
     if (!hosttools::writeAll(file, state.content)) {
         throw Failed{errno};
     }
     giveOwner(file, state);
-    giveAttributes(file, state);
+    const int ofAttributes = giveAttributes(file, state);
     must(futimens(file, timesOf(state).data()));
     must(fsync(file));
+    return ofAttributes;
 }
 
 /// A file that something is mounted on cannot be replaced.
-void fillInPlace(int directory, const std::string& name, const FileState& state) {
+int fillInPlace(int directory, const std::string& name, const FileState& state) {
     const Descriptor file(openat(directory, name.c_str(), O_WRONLY | O_TRUNC | O_NOFOLLOW | O_CLOEXEC));
     must(file.get());
-    fill(file.get(), state);
+    return fill(file.get(), state);
 }
 
 /// Hidden, so that nobody takes it for settings.
@@ -77,45 +83,51 @@ std::string temporaryName(const std::string& name) {
     return "." + name + ".corvista-undo";
 }
 
-void putFile(int directory, const std::string& name, const FileState& state) {
+// Each gives what fill does.
+
+int putFile(int directory, const std::string& name, const FileState& state) {
     const std::string temporary = temporaryName(name);
     unlinkat(directory, temporary.c_str(), 0);  // of one who did not come to his end
     const Descriptor file(
         openat(directory, temporary.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
     must(file.get());
     try {
-        fill(file.get(), state);
+        const int ofAttributes = fill(file.get(), state);
         must(renameat(directory, temporary.c_str(), directory, name.c_str()));
+        return ofAttributes;
     } catch (const Failed& failed) {
         unlinkat(directory, temporary.c_str(), 0);
         if (failed.problem != EBUSY) {
             throw;
         }
-        fillInPlace(directory, name, state);
+        return fillInPlace(directory, name, state);
     }
 }
 
-void putLink(int directory, const std::string& name, const FileState& state) {
+int putLink(int directory, const std::string& name, const FileState& state) {
     const std::string temporary = temporaryName(name);
     unlinkat(directory, temporary.c_str(), 0);
     must(symlinkat(state.content.c_str(), directory, temporary.c_str()));
     must(fchownat(directory, temporary.c_str(), state.owner, state.group, AT_SYMLINK_NOFOLLOW));
     const std::string path = state.path.substr(0, state.path.rfind('/') + 1) + temporary;
+    int ofAttributes = 0;
     for (const auto& [attribute, value] : state.attributes) {
-        must(lsetxattr(path.c_str(), attribute.c_str(), value.data(), value.size(), 0));
+        const int result = lsetxattr(path.c_str(), attribute.c_str(), value.data(), value.size(), 0);
+        ofAttributes = result < 0 ? errno : ofAttributes;
     }
     must(utimensat(directory, temporary.c_str(), timesOf(state).data(), AT_SYMLINK_NOFOLLOW));
     must(renameat(directory, temporary.c_str(), directory, name.c_str()));
+    return ofAttributes;
 }
 
-void putDirectory(int directory, const std::string& name, const FileState& state) {
+int putDirectory(int directory, const std::string& name, const FileState& state) {
     if (mkdirat(directory, name.c_str(), 0700) != 0 && errno != EEXIST) {
         throw Failed{errno};
     }
     const Descriptor made(openat(directory, name.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
     must(made.get());
     giveOwner(made.get(), state);
-    giveAttributes(made.get(), state);
+    return giveAttributes(made.get(), state);
 }
 
 void takeAway(int directory, const std::string& name) {
@@ -136,30 +148,33 @@ void syncDirectory(int directory) {
     must(fsync(readable.get()));
 }
 
-void put(const FileState& state) {
+/// @return what of its attributes is not back, as an errno
+int put(const FileState& state) {
     const Descriptor directory = openDirectoryOf(state.path);
     const std::string name = nameIn(state.path);
     if (!directory.isOpen() && state.type == Type::absent) {
-        return;  // nor is the way to it
+        return 0;  // nor is the way to it
     }
     must(directory.get());
+    int ofAttributes = 0;
     switch (state.type) {
         case Type::absent:
             takeAway(directory.get(), name);
             break;
         case Type::file:
-            putFile(directory.get(), name, state);
+            ofAttributes = putFile(directory.get(), name, state);
             break;
         case Type::link:
-            putLink(directory.get(), name, state);
+            ofAttributes = putLink(directory.get(), name, state);
             break;
         case Type::directory:
-            putDirectory(directory.get(), name, state);
+            ofAttributes = putDirectory(directory.get(), name, state);
             break;
         case Type::other:
             throw Failed{ENOTSUP};
     }
     syncDirectory(directory.get());
+    return ofAttributes;
 }
 
 /// Directories have the time of what was last put into them.
@@ -176,7 +191,10 @@ void tryToPut(const FileState& state, std::vector<std::string>& notes) {
         return;
     }
     try {
-        put(state);
+        if (const int ofAttributes = put(state); ofAttributes != 0) {
+            notes.push_back(state.path +
+                            " is put back without all its attributes: " + std::strerror(ofAttributes));
+        }
     } catch (const Failed& failed) {
         notes.push_back(state.path + " is not put back: " + std::strerror(failed.problem));
     }

@@ -39,6 +39,11 @@ struct Journal {
     bool isEnded() const {
         return stage == Stage::kept || stage == Stage::takenBack || stage == Stage::failed;
     }
+    /// Whether it waits for a confirmation, or will, or is not back yet: until then none begins beside it.
+    bool isOpen() const {
+        const bool isMade = stage == Stage::changing || stage == Stage::made;
+        return stage == Stage::takingBack || (isMade && window != 0);
+    }
     /// Whether its time is over, by a clock that nobody can set. A new start of the host ends all time.
     bool isDue() const;
 };

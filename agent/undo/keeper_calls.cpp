@@ -19,6 +19,7 @@
 
 #include "agent/undo/boot_clock.h"
 #include "hosttools/files.h"
+#include "hosttools/text.h"
 
 namespace cvagent::undo {
 
@@ -75,8 +76,11 @@ std::string programOf(const std::string& name) {
     return "";
 }
 
-/// In the child: it gets nothing of this process, which ignores signals and holds locks.
+/// In the child: it gets nothing of this process, which ignores signals, holds locks, is spared when memory
+/// is short, and may be in the session of somebody who is cut off by this.
 [[noreturn]] void become(char* const* words) {
+    setsid();
+    hosttools::writeAll(open("/proc/self/oom_score_adj", O_WRONLY | O_CLOEXEC), "0");
     for (int signal = 1; signal < NSIG; ++signal) {
         static_cast<void>(std::signal(signal, SIG_DFL));
     }

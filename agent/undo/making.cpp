@@ -33,13 +33,21 @@ bool isBeingMade(const std::string& place, unsigned number) {
     }
 }
 
+/// What to do when a change is in the way.
+std::string wayOut(unsigned number, Stage stage) {
+    const std::string rollback = "cvagent rollback " + std::to_string(number);
+    return stage == Stage::made ? "; first: cvagent confirm " + std::to_string(number) + ", or " + rollback
+           : stage == Stage::takingBack ? "; when nobody is at it: " + rollback
+                                        : "";
+}
+
 /// Two that could be taken back at once would meet.
 void refuseBesideOthers(const std::string& place) {
     for (const unsigned number : changesIn(place)) {
         const auto journal = readableJournal(place, number);
-        const bool isOpen = journal && !journal->isEnded() && journal->stage != Stage::saved;
-        if (isOpen && journal->window != 0) {
-            throw ChangeError(named(number) + " " + stageText(journal->stage));
+        if (journal && journal->isOpen()) {
+            throw ChangeError(named(number) + " " + stageText(journal->stage) +
+                              wayOut(number, journal->stage));
         }
         if (isBeingMade(place, number)) {
             throw ChangeError(named(number) + " " + stageText(Stage::changing));
@@ -64,6 +72,33 @@ SavedState savedBefore(const MakingSettings& settings) {
 bool stands(const Journal& journal) {
     return journal.stage != Stage::saved && journal.stage != Stage::takenBack &&
            journal.stage != Stage::failed;
+}
+
+/// Nobody begins another change meanwhile, nor before this one is back.
+void markForRollBack(const std::string& place, const ChangeDirectory& change) {
+    const hosttools::Descriptor alone = ChangeDirectory::lockPlace(place);
+    for (const unsigned number : changesIn(place)) {
+        const auto journal = readableJournal(place, number);
+        if (number > change.number() && journal && stands(*journal)) {
+            throw ChangeError(named(number) + " stands on it");
+        }
+        if (number > change.number() && isBeingMade(place, number)) {
+            throw ChangeError(named(number) + " is about to begin");
+        }
+    }
+    const auto journal = change.journal();
+    if (!journal || !stands(*journal)) {
+        throw ChangeError(named(change.number()) + " does not stand: it " +
+                          stageText(journal ? journal->stage : Stage::saved));
+    }
+    if (journal->stage == Stage::changing && change.isTaken(kAgentLock)) {
+        throw ChangeError(named(change.number()) + " is under way");
+    }
+    change.update([](Journal& now) {
+        const bool goesOn = stands(now) && now.stage != Stage::takingBack;
+        now.stage = goesOn ? Stage::takingBack : now.stage;
+        return goesOn;
+    });
 }
 
 }  // namespace
@@ -118,7 +153,7 @@ Journal ChangeInMaking::end() {
             return false;
         }
         journal.stage = window_ == 0 ? Stage::kept : Stage::made;
-        journal.deadline = bootMilliseconds() + window_;
+        journal.deadline = std::max(journal.deadline, bootMilliseconds() + window_);  // it may be lengthened
         return true;
     });
 }
@@ -156,25 +191,7 @@ void lengthenChange(const ChangeDirectory& change, std::uint64_t milliseconds) {
 }
 
 Journal rollBack(const std::string& place, const ChangeDirectory& change) {
-    for (const unsigned number : changesIn(place)) {
-        const auto journal = readableJournal(place, number);
-        if (number > change.number() && journal && stands(*journal)) {
-            throw ChangeError(named(number) + " stands on it");
-        }
-    }
-    const auto journal = change.journal();
-    if (!journal || !stands(*journal)) {
-        throw ChangeError(named(change.number()) + " does not stand: it " +
-                          stageText(journal ? journal->stage : Stage::saved));
-    }
-    if (journal->stage == Stage::changing && change.isTaken(kAgentLock)) {
-        throw ChangeError(named(change.number()) + " is under way");
-    }
-    change.update([](Journal& now) {
-        const bool isKept = now.stage == Stage::kept;
-        now.stage = isKept ? Stage::takingBack : now.stage;
-        return isKept;
-    });
+    markForRollBack(place, change);
     return takeChangeBack(change);
 }
 

@@ -207,9 +207,39 @@ std::vector<Entry> routeEntries(const NetworkState& state, const std::vector<uns
     return entries;
 }
 
+/// The gateway itself, as near by its link.
+std::string wayToGateway(const Parts<rtmsg>& route) {
+    rtmsg near{};
+    near.rtm_family = route.fixed().rtm_family;
+    near.rtm_dst_len = static_cast<unsigned char>(8 * route[RTA_GATEWAY].size());
+    near.rtm_table = RT_TABLE_MAIN;
+    near.rtm_protocol = RTPROT_STATIC;
+    near.rtm_scope = RT_SCOPE_LINK;
+    near.rtm_type = RTN_UNICAST;
+    return makeRequest(RTM_NEWROUTE, kAdd, bytesOf(near),
+                       makeAttribute(RTA_DST, route[RTA_GATEWAY]) + makeAttribute(RTA_OIF, route[RTA_OIF]));
+}
+
+/// A route whose gateway is nowhere near any more stays in the kernel, but is taken only while it is near.
+int addFarRoute(NetlinkSocket& socket, const NetworkMessage& message, int problem) {
+    const Parts<rtmsg> parts(message);
+    const bool isFar = problem == ENETUNREACH || problem == EHOSTUNREACH;
+    if (!isFar || !parts.has(RTA_GATEWAY) || !parts.has(RTA_OIF)) {
+        return problem;
+    }
+    const std::string way = wayToGateway(parts);
+    const int added = tell(socket, way);
+    if (added != 0 && added != EEXIST) {  // of one who was killed at it
+        return problem;
+    }
+    const int again = tell(socket, routeRequest(message, kAdd));
+    tell(socket, asRemoval(way, RTM_DELROUTE));
+    return again;
+}
+
 /// Several to the same place stand one behind the other.
 int addRoute(NetlinkSocket& socket, const NetworkMessage& message) {
-    const int problem = tell(socket, routeRequest(message, kAdd));
+    const int problem = addFarRoute(socket, message, tell(socket, routeRequest(message, kAdd)));
     return problem != EEXIST ? problem
                              : tell(socket, routeRequest(message, NLM_F_CREATE | NLM_F_APPEND | NLM_F_ACK));
 }

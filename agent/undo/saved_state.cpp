@@ -72,18 +72,36 @@ bool isToPutBack(const std::string& before, const std::string* left, const std::
     return before != now && (left == nullptr || (*left != before && *left == now));
 }
 
+void noteProblem(const char* what, int result, std::vector<std::string>& notes) {
+    if (result != 0) {
+        notes.push_back(std::string(what) + " is not put back: " + std::strerror(errno));
+    }
+}
+
+void putBackHostName(const SavedState& before, std::vector<std::string>& notes) {
+    noteProblem("the host name", sethostname(before.hostName.data(), before.hostName.size()), notes);
+}
+
+/// The first process has taken its name from the file before anything could be put back. To be called before
+/// the file comes back, so that who was killed in between finds it to do.
+void putBackNameOfStart(const SavedState& before, const std::vector<std::size_t>& indices,
+                        const SavedState& began, std::vector<std::string>& notes) {
+    const bool isNamed = std::ranges::any_of(indices, [&before](std::size_t i) {
+        return before.files[i].path == "/etc/hostname" || before.files[i].path == "/etc/HOSTNAME";
+    });
+    if (isNamed && before.hostName != began.hostName) {
+        putBackHostName(before, notes);
+    }
+}
+
 void putBackNames(const SavedState& before, const SavedState* left, const SavedState& began,
                   std::vector<std::string>& notes) {
-    const auto note = [&notes](const char* what, int result) {
-        if (result != 0) {
-            notes.push_back(std::string(what) + " is not put back: " + std::strerror(errno));
-        }
-    };
     if (isToPutBack(before.hostName, left != nullptr ? &left->hostName : nullptr, began.hostName)) {
-        note("the host name", sethostname(before.hostName.data(), before.hostName.size()));
+        putBackHostName(before, notes);
     }
     if (isToPutBack(before.domainName, left != nullptr ? &left->domainName : nullptr, began.domainName)) {
-        note("the domain name", setdomainname(before.domainName.data(), before.domainName.size()));
+        noteProblem("the domain name", setdomainname(before.domainName.data(), before.domainName.size()),
+                    notes);
     }
 }
 
@@ -184,12 +202,16 @@ TakenBack takeBack(const SavedState& before, const SavedState* left, const Saved
         left == nullptr || std::ranges::any_of(indices, [&before](std::size_t i) {
             return std::ranges::find(before.calls.files, before.files[i].path) != before.calls.files.end();
         });
+    const bool isOtherStart = before.boot != bootId() || before.boot != began.boot;
+    if (isOtherStart) {
+        putBackNameOfStart(before, indices, began, taken.notes);
+    }
     const KeeperCalls calls = isOfKeeper ? before.calls : KeeperCalls();
     runCalls(calls.before, taken.notes);
     putBackFiles(before.files, indices, taken.notes);
     runCalls(calls.after, taken.notes);
-    if (before.boot != bootId() || before.boot != began.boot) {
-        return taken;  // the kernel has begun anew, with what the files say
+    if (isOtherStart) {
+        return taken;  // the rest of the kernel has begun anew, or does with what the files say
     }
     putBackNames(before, left, began, taken.notes);
     constexpr std::uint64_t kThousand = 1000;

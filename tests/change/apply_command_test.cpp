@@ -5,6 +5,7 @@
 #include <nlohmann/json.hpp>
 
 #include "tests/agent/cvagent_run.h"
+#include "tests/agent/linked_host.h"
 #include "tests/agent/suse_host.h"
 
 namespace {
@@ -195,39 +196,17 @@ HOST_TEST(TwoChanges, OneOfThemWaits) {
 }
 
 /// cvagent with the real plug-in and our adapters on a kernel's links, each interface with its file.
-class ChangesInForce : public HostFixture {
+class ChangesInForce : public LinkedHost {
 protected:
     void setUpHost(FakeHost& host) override {
-        for (const char* tool : {"ip", "hostname"}) {
-            host.realTool(tool);
-        }
-        host.useKernelNetwork();
-        host.setHostName("linux");
-        host.file("/etc/HOSTNAME", "linux.example.com");
-        host.file("/etc/hosts", "127.0.0.1\tlocalhost\n192.0.2.10\tlinux.example.com linux\n");
-        host.file("/etc/resolv.conf", "nameserver 192.0.2.53\n");
-        host.file("/etc/sysconfig/network/routes", "default\t192.0.2.1\t-\n");
-        host.file("/etc/sysconfig/network/config", "NETCONFIG_DNS_POLICY=\"\"\n");
+        LinkedHost::setUpHost(host);
         for (const std::string words :
-             {"link add eth0 type veth peer name sw0", "link set eth0 up", "link set sw0 up",
-              "link add eth1 type veth peer name sw1", "link set eth1 up", "link set sw1 up",
-              "address add 192.0.2.10/24 broadcast + dev eth0", "address add 198.51.100.1/24 dev eth1",
-              "route add default via 192.0.2.1"}) {
+             {"link add eth1 type veth peer name sw1", "link set eth1 addrgenmode none",
+              "link set sw1 addrgenmode none", "link set eth1 up", "link set sw1 up",
+              "address add 198.51.100.1/24 dev eth1"}) {
             ip(host, words);
         }
-        std::string hardware = host.run({"cat", "/sys/class/net/eth0/address"}).out;
-        hardware.pop_back();
-        host.file("/etc/sysconfig/network/ifcfg-eth-id-" + hardware,
-                  "BOOTPROTO=static\nIPADDR=192.0.2.10\nNETMASK=255.255.255.0\n");
-    }
-    static std::string ip(FakeHost& host, const std::string& words) {
-        const Finished done = host.run({"sh", "-c", "ip " + words});
-        EXPECT_EQ(done.status, 0) << words << ": " << done.err;
-        return done.out;
-    }
-    static Finished cvagent(FakeHost& host, std::vector<std::string> words) {
-        words.insert(words.begin(), {CVAGENT_PROGRAM, "--plugin", CORVISTA_PLUGIN_FILE});
-        return host.run(words);
+        ASSERT_TRUE(carrierComes("eth1") && carrierComes("sw1"));
     }
     static std::string moveFile() {
         return "[" + changeOf("ip-config:eth0", "IPv4Gateway", "203.0.113.1") + "," +

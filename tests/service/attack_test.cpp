@@ -115,6 +115,26 @@ MATCHER(IsShort, "") {
     return arg.size() < 70000;
 }
 
+/// Calls that wait for their turn keep what came with them.
+HOST_TEST(ServiceAttack, LongWordsAreNotKept) {
+    ServiceRun run(host);
+    run.start();
+    host.file("/var/hold", "");
+    std::vector<bus::Slot> pending;
+    const auto ignore = [](const bus::Message&) {};
+    for (int reader = 0; reader < 8; ++reader) {  // all that the service has
+        pending.push_back(run.bus().askLater(
+            call::make(run.bus(), ServiceRun::kComputer, call::kNode, "Read",
+                       [](bus::Writer& writer) { writer.put(std::vector<std::uint32_t>{904}); }),
+            std::chrono::seconds(60), ignore));
+    }
+    const std::string longWord(std::size_t{1} << 20U, 'x');
+    EXPECT_EQ(call::errorOf(run.bus(), ServiceRun::kRoot, call::kAgent, "Find",
+                            [&](bus::Writer& writer) { writer.put(longWord); }),
+              "com.vantrel.Corvista1.Error.NotFound");
+    host.remove("/var/hold");
+}
+
 /// An answer larger than the bus takes would end the service's connection.
 HOST_TEST(ServiceAttack, LongTextsAreNotRepeated) {
     ServiceRun run(host);

@@ -2,12 +2,16 @@
 
 #include <atomic>
 #include <mutex>
+#include <optional>
+#include <thread>
 
+#include "agent/service/loop.h"
 #include "agent/service/workers.h"
 #include "tests/support/waiting.h"
 
 namespace {
 
+using cvagent::service::Loop;
 using cvagent::service::Workers;
 using testing::ElementsAre;
 
@@ -86,6 +90,26 @@ TEST(ServiceWorkers, DropAtTheirEndWhatHasNotBegun) {
         hold.unlock();
     }
     EXPECT_EQ(done, 1);
+}
+
+/// What the library of the bus counts without a lock ends where it is used.
+TEST(ServiceLoop, WhatIsHeldForItEndsOnItsThread) {
+    Loop loop;
+    std::optional<std::thread::id> ended;
+    const auto made = [&] {
+        return heldForLoop(loop.mailbox(), std::shared_ptr<int>(new int(7), [&ended](const int* last) {
+                               delete last;
+                               ended = std::this_thread::get_id();
+                           }));
+    };
+    made().reset();
+    EXPECT_EQ(ended, std::this_thread::get_id());
+    ended.reset();
+    std::thread([held = made()]() mutable { held.reset(); }).join();
+    EXPECT_FALSE(ended);
+    loop.mailbox()->post([&loop] { loop.stop(); });
+    loop.run();
+    EXPECT_EQ(ended, std::this_thread::get_id());
 }
 
 }  // namespace

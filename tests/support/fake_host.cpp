@@ -178,5 +178,6 @@ Finished FakeHost::run(const std::vector<std::string>& words, std::chrono::secon
 }
 
 RunningProgram FakeHost::start(const std::vector<std::string>& words) {
+    keepProcessNumbersLow();
     return RunningProgram(words, "/record/program" + std::to_string(++programs_));
 }

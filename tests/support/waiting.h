@@ -3,7 +3,9 @@
 #include <chrono>
 #include <cstddef>
 #include <filesystem>
+#include <fstream>
 #include <iterator>
+#include <string>
 #include <thread>
 
 /// The action of a tool that hangs until the test says host.file("/go-on", "").
@@ -19,6 +21,15 @@ bool eventually(const Condition& condition) {
         holds = condition();
     }
     return holds;
+}
+
+/// Whether a link's carrier comes: the kernel takes note of it some time after both ends of a cable are up.
+inline bool carrierComes(const std::string& link) {
+    return eventually([&link] {
+        std::string state;
+        std::ifstream("/sys/class/net/" + link + "/operstate") >> state;
+        return state == "up";
+    });
 }
 
 /// The threads of this process: one that was joined is counted a moment longer.

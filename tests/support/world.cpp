@@ -96,26 +96,14 @@ void dropDangerousCapabilities() {
     must(syscall(SYS_capset, &header, sets), "drop the capabilities");
 }
 
-/// Keeps the numbers of new processes within what /proc shows. Without the kernel's help they just grow.
-class ProcessNumbers {
-public:
-    ProcessNumbers() : last_(open("/proc/sys/kernel/ns_last_pid", O_RDWR | O_CLOEXEC)) {}
-    void keepLow() const {
-        char digits[16] = {};
-        if (last_ < 0 || pread(last_, digits, sizeof digits - 1, 0) <= 0) return;
-        if (std::atoi(digits) < highestProcess / 4) return;
-        [[maybe_unused]] ssize_t put = pwrite(last_, "2", 1, 0);
-    }
-
-private:
-    int last_;  // opened before the kernel's settings become read-only
-};
+// Opened before the kernel's settings become read-only; none without the kernel's help: then they just grow.
+int lastProcess = -1;
 
 // Takes in the processes that lose their parent, as the first process of a host must.
-int waitForBody(pid_t body, const ProcessNumbers& numbers) {
+int waitForBody(pid_t body) {
     pollfd ended{static_cast<int>(must(syscall(SYS_pidfd_open, body, 0), "watch the body")), POLLIN, 0};
     while (poll(&ended, 1, 20) <= 0) {
-        numbers.keepLow();
+        keepProcessNumbersLow();
         siginfo_t next{};
         while (waitid(P_ALL, 0, &next, WEXITED | WNOHANG | WNOWAIT) == 0 && next.si_pid > 0 &&
                next.si_pid != body) {
@@ -133,7 +121,7 @@ int waitForBody(pid_t body, const ProcessNumbers& numbers) {
     try {
         prctl(PR_SET_PDEATHSIG, SIGKILL);
         if (mapping) mapping->mapFromInside(owner);
-        ProcessNumbers numbers;
+        lastProcess = open("/proc/sys/kernel/ns_last_pid", O_RDWR | O_CLOEXEC);
         buildRoot();
         if (!mapping) dropDangerousCapabilities();
         must(sethostname("localhost", 9), "set the host name");
@@ -142,7 +130,7 @@ int waitForBody(pid_t body, const ProcessNumbers& numbers) {
             body();
             std::exit(0);
         }
-        send(report, {Report::ended, waitForBody(child, numbers), 0, "", ""});
+        send(report, {Report::ended, waitForBody(child), 0, "", ""});
     } catch (const std::exception& error) {
         send(report, {Report::problem, 0, 0, "", error.what()});
     }
@@ -162,6 +150,13 @@ bool userNamespaceWanted() {
 }
 
 }  // namespace
+
+void keepProcessNumbersLow() {
+    char digits[16] = {};
+    if (lastProcess < 0 || pread(lastProcess, digits, sizeof digits - 1, 0) <= 0) return;
+    if (std::atoi(digits) < highestProcess / 4) return;
+    [[maybe_unused]] ssize_t put = pwrite(lastProcess, "2", 1, 0);
+}
 
 pid_t startWorld(int report, const std::function<void()>& body) {
     Owner owner{geteuid(), getegid()};

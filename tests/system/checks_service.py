@@ -38,6 +38,15 @@ def same_tree(context):
     expect_equal("facts that differ", [(key, one.get(key), other[key]) for key in other if one.get(key) != other[key]], [])
 
 
+def unlike(context):
+    """Where what the service tells and what the command line finds by itself are not the same."""
+    served = json.loads(client(context, "tree", "--json"))["nodes"]
+    alone = context.guest.cvagent("--bus", "none", "tree")["nodes"]
+    paths = {node["path"] for node in served} ^ {node["path"] for node in alone}
+    one, other = facts(served), facts(alone)
+    return sorted(paths) or [(key, one.get(key), other[key]) for key in other if one.get(key) != other[key]]
+
+
 @check("service: a value that is set through it is in the guest's files, and in what it tells", MACHINE)
 def set_through(context):
     client(context, "set", "ip-config:eth0", "DNSServers", "192.0.2.53", "2001:db8::53")
@@ -58,6 +67,26 @@ def watched(context):
     context.machine.cable(1, True)
     context.guest.wait_for_text(EVENTS, '"NIC is Online "')
     context.guest.sh("kill $(cat /run/watch.pid)")
+
+
+@check("service: a VLAN and a bond that come, and go, come and go in what it tells", MACHINE)
+def links_come_and_go(context):
+    member = context.guest.read("/sys/class/net/bond0/bonding/slaves").split()[-1]
+    for change, node, comes in [
+            ("ip link add link eth0 name eth0.30 type vlan id 30; ip link set eth0.30 up", "ip-config:eth0.30", True),
+            ("ip link add bond7 type bond; "
+             f"ip link set {member} down; ip link set {member} master bond7; ip link set bond7 up", "/team:bond7", True),
+            ("ip link delete bond7", "/team:bond7", False),
+            ("ip link delete eth0.30", "ip-config:eth0.30", False)]:
+        context.guest.sh(change)
+        different = None
+        for _ in range(30):
+            different = unlike(context)
+            if not different:
+                break
+            context.guest.sleep(1)
+        expect_equal(f"differences after: {change}", different, [])
+        expect_equal(f"{node} is there after: {change}", node in client(context, "tree", "--json"), comes)
 
 
 @check("service: it ends at SIGTERM, and the command line works by itself", MACHINE)

@@ -1,5 +1,6 @@
 // Changes that wait for their confirmation, by running the program on links of a real kernel.
 #include <arpa/inet.h>
+#include <fcntl.h>
 #include <gmock/gmock.h>
 #include <sched.h>
 #include <sys/mount.h>
@@ -10,8 +11,10 @@
 #include <csignal>
 #include <nlohmann/json.hpp>
 
+#include "tests/agent/linked_host.h"
 #include "tests/agent/terminal.h"
-#include "tests/support/fake_host.h"
+#include "tests/support/waiting.h"
+#include "tests/undo/waited_for.h"
 
 namespace {
 
@@ -21,41 +24,13 @@ using Json = nlohmann::ordered_json;
 
 constexpr const char* kNewAddress = "203.0.113.7";
 
-class Confirmed : public HostFixture {
+class Confirmed : public LinkedHost {
 protected:
     void setUpHost(FakeHost& host) override {
-        for (const char* tool : {"ip", "hostname"}) {
-            host.realTool(tool);
-        }
-        host.useKernelNetwork();
-        host.setHostName("linux");
-        host.file("/etc/HOSTNAME", "linux.example.com");
-        host.file("/etc/hosts", "127.0.0.1\tlocalhost\n192.0.2.10\tlinux.example.com linux\n");
-        host.file("/etc/resolv.conf", "nameserver 192.0.2.53\n");
-        host.file("/etc/sysconfig/network/routes", "default\t192.0.2.1\t-\n");
-        host.file("/etc/sysconfig/network/config", "NETCONFIG_DNS_POLICY=\"\"\n");
-        for (const std::string words :
-             {"link add eth0 type veth peer name sw0", "link set eth0 addrgenmode none", "link set eth0 up",
-              "link set sw0 up", "address add 192.0.2.10/24 broadcast + dev eth0",
-              "route add default via 192.0.2.1"}) {
-            ip(host, words);
-        }
-        std::string hardware = host.run({"cat", "/sys/class/net/eth0/address"}).out;
-        hardware.pop_back();
-        file_ = "/etc/sysconfig/network/ifcfg-eth-id-" + hardware;
-        host.file(file_, "BOOTPROTO=static\nIPADDR=192.0.2.10\nNETMASK=255.255.255.0\n", 0640);
+        LinkedHost::setUpHost(host);
         old_ = look(host);
     }
 
-    static std::string ip(FakeHost& host, const std::string& words) {
-        const Finished done = host.run({"sh", "-c", "ip " + words});
-        EXPECT_EQ(done.status, 0) << words << ": " << done.err;
-        return done.out;
-    }
-    static Finished cvagent(FakeHost& host, std::vector<std::string> words) {
-        words.insert(words.begin(), {CVAGENT_PROGRAM, "--plugin", CORVISTA_PLUGIN_FILE});
-        return host.run(words);
-    }
     static Finished set(FakeHost& host, const std::string& seconds) {
         return cvagent(host,
                        {"set", "ip-config:eth0", "IPv4Address", kNewAddress, "--confirm-within", seconds});
@@ -83,18 +58,18 @@ protected:
         return all;
     }
 
-    std::string file_;
     std::string old_;
 };
 
 HOST_TEST_F(Confirmed, AChangeThatNobodyConfirmsIsTakenBack) {
-    const Finished run = set(host, "0.5");
+    const Finished run = set(host, "600");
     EXPECT_EQ(run.status, 0) << run.err;
     EXPECT_THAT(run.out, HasSubstr("new  203.0.113.7"));
     EXPECT_THAT(run.err,
-                HasSubstr("change 1 is taken back in 1 second unless somebody types: cvagent confirm 1"));
+                HasSubstr("change 1 is taken back in 600 seconds unless somebody types: cvagent confirm 1"));
+    EXPECT_EQ(cvagent(host, {"confirm", "1", "--lengthen", "0.1"}).status, 0);
     EXPECT_TRUE(comesBack(host));
-    EXPECT_EQ(stages(host), "1 is taken back");
+    EXPECT_TRUE(eventually([&host] { return stages(host) == "1 is taken back"; })) << stages(host);
     const Finished late = cvagent(host, {"confirm", "1"});
     EXPECT_EQ(late.status, 1);
     EXPECT_THAT(late.err, HasSubstr("change 1 cannot be confirmed: it is taken back"));
@@ -117,6 +92,34 @@ HOST_TEST_F(Confirmed, AChangeThatIsConfirmedStaysUntilItIsRolledBack) {
     EXPECT_EQ(back.out, "change 1 is taken back\n");
     EXPECT_EQ(look(host), old_);
     EXPECT_EQ(cvagent(host, {"rollback"}).status, 3);
+}
+
+/// Broken off in its middle it would leave a host that nobody reaches.
+HOST_TEST_F(Confirmed, NeitherAKeyNorAHangUpBreaksARollbackOff) {
+    ASSERT_EQ(set(host, "600").status, 0);
+    ASSERT_EQ(cvagent(host, {"confirm", "1"}).status, 0);
+    const std::string lock = "/var/lib/corvista/changes/1/taking.lock";
+    int held = open(lock.c_str(), O_RDWR | O_CLOEXEC);
+    struct flock whole {};
+    whole.l_type = F_WRLCK;
+    ASSERT_EQ(fcntl(held, F_OFD_SETLK, &whole), 0);
+    const pid_t rollback = fork();
+    if (rollback == 0) {
+        dup2(open("/dev/null", O_WRONLY), STDOUT_FILENO);
+        execl(CVAGENT_PROGRAM, CVAGENT_PROGRAM, "rollback", nullptr);
+    }
+    for (int i = 0; i < 6000 && !isWaitedFor(host, lock); ++i) {
+        usleep(10'000);
+    }
+    for (const int each : {SIGINT, SIGHUP, SIGTERM, SIGQUIT, SIGTSTP}) {
+        kill(rollback, each);
+    }
+    close(held);
+    int status = 0;
+    waitpid(rollback, &status, 0);
+    EXPECT_EQ(status, 0);
+    EXPECT_EQ(look(host), old_);
+    EXPECT_EQ(stages(host), "1 is taken back");
 }
 
 /// What apply has made without a confirmation can be taken back, too.
@@ -153,6 +156,22 @@ HOST_TEST_F(Confirmed, AStepThatFailsTakesAllBack) {
     EXPECT_EQ(stages(host), "1 is taken back");
 }
 
+/// However slow the host is: the guard is at work, but stands still until it is let go.
+void holdGuard(FakeHost& host) {
+    host.directory("/run/systemd/system");
+    host.file(
+        "/root/hold",
+        "while [ \"$1\" != -- ]; do shift; done\n\"$2\" \"$3\" &\n"
+        "until grep -q \"OFDLCK .*:$(stat -c %i /var/lib/corvista/changes/1/guard.lock) \" /.proc/locks\n"
+        "do sleep 0.01; done\n"
+        "kill -STOP $!\necho $! > /root/held\n");
+    host.tool("/usr/bin/systemd-run %any", ToolAnswer{"", 0, "", 0, "sh /root/hold \"$@\""});
+}
+
+void letGuardGo(FakeHost& host) {
+    kill(std::stoi(host.read("/root/held").value_or("0")), SIGCONT);
+}
+
 /// A caller whose connection goes with his own change has the host back.
 HOST_TEST_F(Confirmed, WhoCutsHimselfOffHasTheHostBack) {
     int ready[2];
@@ -186,7 +205,12 @@ HOST_TEST_F(Confirmed, WhoCutsHimselfOffHasTheHostBack) {
     ASSERT_EQ(write(moved[1], "x", 1), 1);
     const int line = accept(door, nullptr, nullptr);
     ASSERT_EQ(read(line, &mark, 1), 1);
-    ASSERT_EQ(set(host, "0.5").status, 0);
+    holdGuard(host);
+    const Finished run = set(host, "0.5");
+    ASSERT_EQ(run.status, 0) << run.err;
+    EXPECT_THAT(run.err,
+                HasSubstr("change 1 is taken back in 1 second unless somebody types: cvagent confirm 1"));
+    letGuardGo(host);
     ASSERT_EQ(write(line, &mark, 1), 1);  // goes through when the address is back
     ASSERT_EQ(read(line, &mark, 1), 1);
     EXPECT_EQ(mark, '2');
@@ -219,6 +243,25 @@ HOST_TEST_F(Confirmed, APersonAtATerminalIsGuardedUnasked) {
     EXPECT_EQ(script.status, 0) << script.output;
     EXPECT_THAT(script.output, Not(HasSubstr("cvagent confirm")));
     EXPECT_EQ(stages(host), "1 is kept");
+}
+
+/// sudo gives what it runs a process group of its own, also in a script.
+HOST_TEST_F(Confirmed, BehindSudoItCountsWhoHasTypedThat) {
+    host.realTool("setsid");
+    host.file("/root/sudo", "#!/bin/sh\nsetsid \"$@\"\nexit $?\n", 0755);
+    host.file("/root/script", "/root/sudo \"$@\"\nexit $?\n");
+    const auto run = [](std::vector<std::string> words, const std::string& address) {
+        words.insert(words.end(), {CVAGENT_PROGRAM, "--plugin", CORVISTA_PLUGIN_FILE, "set", "ip-config:eth0",
+                                   "IPv4Address", address});
+        const OnTerminal done = runOnTerminal(words, "");
+        EXPECT_EQ(done.status, 0) << done.output;
+        return done.output;
+    };
+    EXPECT_THAT(run({"/bin/sh", "/root/script"}, "203.0.113.7"), Not(HasSubstr("cvagent confirm")));
+    EXPECT_EQ(stages(host), "");
+    EXPECT_THAT(run({"/root/sudo"}, "203.0.113.8"), HasSubstr("cvagent confirm 1"));
+    const Finished back = cvagent(host, {"rollback", "1"});
+    EXPECT_EQ(back.status, 0) << back.err;
 }
 
 /// Under systemd the guard is a unit, which outlives the session of who has started it.
@@ -283,6 +326,26 @@ HOST_TEST_F(Confirmed, WhatIsNoChangeIsRefused) {
     EXPECT_EQ(set(host, "86401").status, 2);
     EXPECT_EQ(set(host, "-1").status, 2);
     EXPECT_EQ(look(host), old_);
+}
+
+HOST_TEST_F(Confirmed, TheListTellsWhatIsNotBackAndWhatCannotBeRead) {
+    EXPECT_EQ(cvagent(host, {"confirm", "7"}).err,
+              "cvagent: there is no change 7\nThe changes are listed by: cvagent history --changes\n");
+    const Finished none = cvagent(host, {"history", "--changes"});
+    EXPECT_EQ(none.status, 0);
+    EXPECT_EQ(none.err, "cvagent: no change has been made so far that could be taken back\n");
+    ASSERT_EQ(set(host, "600").status, 0);
+    host.file(file_, "somebody's\n", 0640);
+    const Finished back = cvagent(host, {"rollback"});
+    EXPECT_EQ(back.status, 1);
+    const std::string note = file_ + " has been changed by somebody else since and stays as it is\n";
+    EXPECT_EQ(back.err, "cvagent: not all of it:\n" + note);
+    EXPECT_THAT(cvagent(host, {"history", "--changes"}).out, testing::EndsWith(")\n      " + note));
+    host.file("/var/lib/corvista/changes/1/journal", "corvista-change 1\n1\nstage \x1b[2J");
+    const Finished damaged = cvagent(host, {"history", "--changes"});
+    EXPECT_EQ(damaged.status, 1);
+    EXPECT_THAT(damaged.err, HasSubstr("cvagent: change 1: the journal cannot be read: "));
+    EXPECT_THAT(damaged.err, Not(HasSubstr("\x1b")));
 }
 
 /// Where nothing can be kept the change is not begun.

@@ -176,6 +176,26 @@ HOST_TEST_F(Files, OfAFullDiskAreTold) {
     EXPECT_EQ(host.read("/etc/hosts"), "127.0.0.1 localhost\n");
 }
 
+/// What a file system or a container does not let one set is no reason to keep the rest away.
+HOST_TEST_F(Files, ComeBackWithoutAnAttributeThatTheyCannotHave) {
+    SavedState before = SavedState::of({"/etc/hosts", "/etc/resolv.conf", "/etc/d"});
+    for (FileState& each : before.files) {
+        each.attributes["nobody.knows"] = "this";
+    }
+    host.file("/etc/hosts", "changed\n");
+    host.remove("/etc/resolv.conf");
+    host.remove("/etc/d");
+    std::vector<std::string> notes = takeBack(before, nullptr, before.again()).notes;
+    EXPECT_THAT(notes, testing::UnorderedElementsAre(
+                           HasSubstr("/etc/hosts is put back without all its attributes: "),
+                           HasSubstr("/etc/resolv.conf is put back without all its attributes: "),
+                           HasSubstr("/etc/d is put back without all its attributes: ")));
+    EXPECT_EQ(host.read("/etc/hosts"), "127.0.0.1 localhost\n");
+    EXPECT_EQ(fs::read_symlink("/etc/resolv.conf"), "../run/resolv.conf");
+    EXPECT_EQ(fs::status("/etc/d").permissions(), fs::perms(0750));
+    expectTimes("/etc/hosts");
+}
+
 HOST_TEST_F(Files, BringTheHostsNameBack) {
     host.setHostName("db1");
     const SavedState before = SavedState::of({});
@@ -186,6 +206,20 @@ HOST_TEST_F(Files, BringTheHostsNameBack) {
     host.setHostName("his");
     EXPECT_THAT(takeBack(before, &left, before.again()).notes, IsEmpty());
     EXPECT_EQ(SavedState::of({}).hostName, "his");
+}
+
+/// That is before anything can be put back.
+HOST_TEST_F(Files, BringTheNameBackThatTheHostHasStartedWith) {
+    host.setHostName("db1");
+    host.file("/etc/hostname", "db1\n");
+    SavedState before = SavedState::of({"/etc/hostname"});
+    before.boot = "another one";
+    host.setHostName("new");
+    EXPECT_THAT(takeBack(before, nullptr, before.again()).notes, IsEmpty());
+    EXPECT_EQ(SavedState::of({}).hostName, "new") << "the file has not been touched";
+    host.file("/etc/hostname", "new\n");
+    EXPECT_THAT(takeBack(before, nullptr, before.again()).notes, IsEmpty());
+    EXPECT_EQ(SavedState::of({}).hostName, "db1");
 }
 
 }  // namespace

@@ -6,17 +6,20 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <chrono>
 #include <csignal>
 #include <fstream>
 #include <random>
-#include <sstream>
+#include <thread>
 
 #include "agent/undo/boot_clock.h"
 #include "agent/undo/making.h"
 #include "agent/undo/taking_back.h"
 #include "tests/support/fake_host.h"
+#include "tests/support/waiting.h"
 #include "tests/undo/killed_at.h"
+#include "tests/undo/waited_for.h"
 
 namespace {
 
@@ -81,6 +84,7 @@ protected:
               "link set sw0 up", "address add 192.0.2.10/24 dev eth0", "route add default via 192.0.2.1"}) {
             ip(host, each);
         }
+        ASSERT_TRUE(carrierComes("eth0") && carrierComes("sw0"));
         host.file("/etc/one", "old one\n", 0640);
         host.file("/etc/two", "old two\n");
         host.directory(kChangesPlace, 0700);
@@ -193,6 +197,14 @@ HOST_TEST_F(Guard, GivesMoreTime) {
     EXPECT_TRUE(newest()->journal()->isDue());
 }
 
+HOST_TEST_F(Guard, LeavesTheTimeThatWasGivenWhileTheChangeWasMade) {
+    ChangeInMaking making(settings(kLong));
+    making.beginStep();
+    lengthenChange(making.directory(), 2 * kLong);
+    const std::uint64_t deadline = newest()->journal()->deadline;
+    EXPECT_EQ(making.end().deadline, deadline);
+}
+
 /// A change may set the clock itself; and whoever steers it may do so meanwhile.
 HOST_TEST_F(Guard, DoesNotCareForTheTimeOfDay) {
     constexpr long kYear = 31'536'000;
@@ -272,7 +284,9 @@ HOST_TEST_F(Guard, PutsFilesBackAfterTheNextStart) {
                 return true;
             });
         }
-        cvagent::undo::takeBackAfterStart(kChangesPlace);
+        bool isWhole = true;
+        cvagent::undo::takeBackAfterStart(kChangesPlace, isWhole);
+        EXPECT_TRUE(isWhole) << steps;
         if (newest() && newest()->journal() && stage() == Stage::kept) {
             EXPECT_FALSE(killed && steps < 10);
             EXPECT_NE(files(host), oldFiles);
@@ -336,7 +350,7 @@ HOST_TEST_F(Guard, DoesNotWaitForAStepThatHangs) {
         }
         _exit(1);
     }
-    EXPECT_TRUE(comesTrue([] { return newest() && newest()->journal() && stage() == Stage::changing; }));
+    EXPECT_TRUE(comesTrue([&host] { return host.read("/etc/one") == "new one\n"; }));
     guardChange(*newest());
     int status = 0;
     waitpid(maker, &status, 0);
@@ -347,6 +361,7 @@ HOST_TEST_F(Guard, DoesNotWaitForAStepThatHangs) {
 
 /// Who makes the change is killed, and a command that he has started goes on.
 HOST_TEST_F(Guard, WaitsForACommandThatIsLeftBehind) {
+    host.file("/run/wait", "");
     const pid_t maker = fork();
     if (maker == 0) {
         ChangeInMaking making(settings());
@@ -355,7 +370,6 @@ HOST_TEST_F(Guard, WaitsForACommandThatIsLeftBehind) {
         execlp("sh", "sh", "-c",
                "(while [ -e /run/wait ]; do sleep 0.01; done; echo late > /etc/two) & kill -9 $$", nullptr);
     }
-    host.file("/run/wait", "");
     waitpid(maker, nullptr, 0);
     const pid_t guard = fork();
     if (guard == 0) {
@@ -369,10 +383,11 @@ HOST_TEST_F(Guard, WaitsForACommandThatIsLeftBehind) {
     EXPECT_EQ(stage(), Stage::takenBack);
 }
 
-/// Who makes the change is killed, and the service that does its steps goes on.
+/// Who makes the change is killed, and the service that does its steps goes on. Its time passes when it has
+/// written.
 HOST_TEST_F(Guard, WaitsForAServiceThatGoesOn) {
     MakingSettings ofService = settings();
-    ofService.settling = 1000;
+    ofService.settling = kLong;
     const pid_t maker = fork();
     if (maker == 0) {
         ChangeInMaking making(ofService);
@@ -381,14 +396,18 @@ HOST_TEST_F(Guard, WaitsForAServiceThatGoesOn) {
         _exit(0);
     }
     waitpid(maker, nullptr, 0);
-    const pid_t service = fork();
-    if (service == 0) {
-        comesTrue([&host] { return host.read("/etc/one") == "old one\n"; });
+    std::atomic<bool> hasWritten = false;
+    std::jthread service([&](const std::stop_token& over) {
+        hasWritten = comesTrue([&host] { return host.read("/etc/one") == "old one\n"; });
         host.file("/etc/two", "late\n");
-        _exit(0);
-    }
+        while (!over.stop_requested()) {
+            passTime(std::chrono::milliseconds(kLong));
+            usleep(1000);
+        }
+    });
     guardChange(*newest());
-    waitpid(service, nullptr, 0);
+    service = {};
+    EXPECT_TRUE(hasWritten);
     EXPECT_EQ(look(host), old_);
     EXPECT_EQ(stage(), Stage::takenBack);
 }
@@ -465,6 +484,57 @@ HOST_TEST_F(Guard, KeepsApartWhatIsAboutToBegin) {
     first.end();
 }
 
+/// Also one that nobody was to confirm: who has begun to take it back may have been killed at it.
+HOST_TEST_F(Guard, BeginsNothingBesideWhatIsBeingTakenBack) {
+    make(host, settings(0));
+    newest()->update([](Journal& journal) {
+        journal.stage = Stage::takingBack;
+        return true;
+    });
+    EXPECT_THAT([] { ChangeInMaking{settings(0)}; },
+                testing::ThrowsMessage<ChangeError>("change 1 is being taken back; when nobody is at it: "
+                                                    "cvagent rollback 1"));
+    rollBack(kChangesPlace, *newest());
+    EXPECT_EQ(look(host), old_);
+    EXPECT_EQ(ChangeInMaking(settings(0)).number(), 2U);
+}
+
+HOST_TEST_F(Guard, TakesNothingBackBelowWhatIsAboutToBegin) {
+    make(host, settings(0));
+    {
+        ChangeInMaking second(settings(0));
+        EXPECT_THROW(rollBack(kChangesPlace, ChangeDirectory(kChangesPlace, 1)), ChangeError);
+    }
+    rollBack(kChangesPlace, ChangeDirectory(kChangesPlace, 1));
+    EXPECT_EQ(look(host), old_);
+}
+
+/// Whoever begins one at the same time comes first or finds it marked.
+HOST_TEST_F(Guard, LetsNobodyBeginWhileItLooks) {
+    make(host, settings(0));
+    auto beginning = std::optional(ChangeDirectory::lockPlace(kChangesPlace));
+    const pid_t other = fork();
+    if (other == 0) {
+        beginning.reset();
+        try {
+            rollBack(kChangesPlace, ChangeDirectory(kChangesPlace, 1));
+        } catch (const ChangeError&) {
+            _exit(7);
+        }
+        _exit(0);
+    }
+    EXPECT_TRUE(comesTrue([&] { return isWaitedFor(host, kChangesPlace) || stage() != Stage::kept; }));
+    ChangeDirectory::make(kChangesPlace).update([](Journal& journal) {
+        journal.stage = Stage::changing;
+        return true;
+    });
+    beginning.reset();
+    int status = 0;
+    waitpid(other, &status, 0);
+    EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 7) << status;
+    EXPECT_EQ(look(host), new_);
+}
+
 HOST_TEST_F(Guard, GivesNoTimeWhenItIsOver) {
     make(host, settings(1));
     EXPECT_TRUE(comesTrue([] { return newest()->journal()->isDue(); }));
@@ -472,20 +542,6 @@ HOST_TEST_F(Guard, GivesNoTimeWhenItIsOver) {
     EXPECT_THROW(lengthenChange(*newest(), kLong), ChangeError);
     guardChange(*newest());
     EXPECT_EQ(look(host), old_);
-}
-
-/// Whether somebody waits for the lock.
-bool isWaitedFor(const FakeHost& host, const std::string& lock) {
-    struct stat found {};
-    EXPECT_EQ(stat(lock.c_str(), &found), 0);
-    std::istringstream lines(host.read("/.proc/locks").value_or(""));
-    const std::string place = ":" + std::to_string(found.st_ino) + " ";
-    for (std::string line; std::getline(lines, line);) {
-        if (line.find("-> ") != line.npos && line.find(place) != line.npos) {
-            return true;
-        }
-    }
-    return false;
 }
 
 /// How often a process has waited for something.
@@ -651,6 +707,41 @@ HOST_TEST_F(Guard, ProgramThatIsAskedToEndFails) {
     waitpid(guard, &status, 0);
     EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 1) << status;
     EXPECT_EQ(stage(), Stage::made);
+}
+
+/// Another guard would find no more than this one.
+HOST_TEST_F(Guard, ProgramEndsWellWhenSomebodyRemovesTheChange) {
+    make(host, settings());
+    const pid_t guard = fork();
+    if (guard == 0) {
+        execl(GUARD_PROGRAM, GUARD_PROGRAM, "1", nullptr);
+    }
+    ASSERT_TRUE(comesTrue([] { return newest()->isTaken(cvagent::undo::kGuardLock); }));
+    int status = 0;
+    kill(guard, SIGSTOP);  // it could make a file while this removes them
+    waitpid(guard, &status, WUNTRACED);
+    EXPECT_TRUE(WIFSTOPPED(status));
+    host.remove(std::string(kChangesPlace) + "/1");
+    kill(guard, SIGCONT);
+    waitpid(guard, &status, 0);
+    EXPECT_EQ(status, 0);
+    EXPECT_EQ(look(host), new_);
+}
+
+/// The unit that does it fails, for somebody has to look.
+HOST_TEST_F(Guard, ProgramFailsWhenNotAllIsBackAfterAStart) {
+    make(host, settings());
+    newest()->update([](Journal& journal) {
+        journal.boot = "before";
+        return true;
+    });
+    host.file(std::string(kChangesPlace) + "/1/before", "garbage");
+    const Finished first = host.run({GUARD_PROGRAM, "--after-start"});
+    EXPECT_EQ(first.status, 1);
+    EXPECT_THAT(first.err, HasSubstr("change 1: cannot be taken back; what was saved cannot be read"));
+    EXPECT_EQ(host.run({GUARD_PROGRAM, "--after-start"}).status, 0) << "it is told once";
+    host.file(std::string(kChangesPlace) + "/1/journal", "garbage");
+    EXPECT_EQ(host.run({GUARD_PROGRAM, "--after-start"}).status, 1);
 }
 
 HOST_TEST_F(Guard, ProgramRefusesWhatIsNoNumber) {

@@ -7,6 +7,7 @@
 #include <unistd.h>
 
 #include <csignal>
+#include <fstream>
 
 #include "agent/undo/making.h"
 #include "agent/undo/taking_back.h"
@@ -86,7 +87,9 @@ HOST_TEST_F(KeeperIsTold, WhileTheHostStartsOnlyWhatMakesFiles) {
         journal.boot = "another";
         return true;
     });
-    EXPECT_THAT(takeBackAfterStart(kChangesPlace), ElementsAre("change 1: is taken back"));
+    bool isWhole = true;
+    EXPECT_THAT(takeBackAfterStart(kChangesPlace, isWhole), ElementsAre("change 1: is taken back"));
+    EXPECT_TRUE(isWhole);
     EXPECT_EQ(host.read(kStanzas), "old\n");
     EXPECT_THAT(host.calls(), ElementsAre("/usr/sbin/netplan generate"));
 }
@@ -113,12 +116,20 @@ HOST_TEST_F(KeeperIsTold, ByNothingButWhatIsKnown) {
     EXPECT_THAT(host.calls(), IsEmpty());
 }
 
+/// @return whether the kernel takes that for this process when memory is short
+bool spare(const char* score) {
+    return static_cast<bool>(std::ofstream("/proc/self/oom_score_adj") << score << std::flush);
+}
+
 /// A DHCP client that ignores signals and holds the locks of this process would be there for ever.
 HOST_TEST_F(KeeperIsTold, ByWhatGetsNothingOfThisProcess) {
     static_cast<void>(signal(SIGTERM, SIG_IGN));
     umask(077);
+    const bool isSpared = spare("500") && spare("0") && spare("500");  // not where that is for root alone
     host.tool("/usr/sbin/ifup eth0",
-              {"", 0, "", 0, "grep SigIgn /proc/self/status > /etc/seen; ls /proc/self/fd > /etc/open"});
+              {"", 0, "", 0,
+               "grep SigIgn /proc/self/status > /etc/seen; ls /proc/self/fd > /etc/open;"
+               "cat /proc/self/oom_score_adj > /etc/score; cut -d' ' -f6 /proc/self/stat > /etc/session"});
     const int handed = open("/etc/other", O_RDONLY);  // NOLINT: not closed on exec, that is the test
     ASSERT_GE(dup2(handed, 77), 0);
     std::vector<std::string> notes;
@@ -126,6 +137,8 @@ HOST_TEST_F(KeeperIsTold, ByWhatGetsNothingOfThisProcess) {
     EXPECT_THAT(notes, IsEmpty());
     EXPECT_EQ(host.read("/etc/seen"), "SigIgn:\t0000000000000000\n");
     EXPECT_THAT(host.read("/etc/open").value_or(""), testing::Not(testing::HasSubstr("77")));
+    EXPECT_TRUE(!isSpared || host.read("/etc/score") == "0\n");
+    EXPECT_NE(host.read("/etc/session"), std::to_string(getsid(0)) + "\n");
     struct stat found {};
     ASSERT_EQ(stat("/etc/seen", &found), 0);
     EXPECT_EQ(found.st_mode & 0777U, 0644U);

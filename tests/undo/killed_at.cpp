@@ -4,12 +4,14 @@
 #include <sys/syscall.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <csignal>
 #include <ctime>
 
 namespace {
 
 long moved = 0;
+std::atomic<long> passed = 0;
 int done = 0;
 int last = 0;
 
@@ -30,6 +32,10 @@ void moveTimeOfDay(long seconds) {
     moved = seconds;
 }
 
+void passTime(std::chrono::milliseconds time) {
+    passed += std::chrono::ceil<std::chrono::seconds>(time).count();
+}
+
 int stepsDone() {
     return done;
 }
@@ -39,7 +45,7 @@ extern "C" {
 
 int clock_gettime(clockid_t clock, timespec* now) noexcept {
     const int result = static_cast<int>(syscall(SYS_clock_gettime, clock, now));
-    now->tv_sec += clock == CLOCK_REALTIME ? moved : 0;
+    now->tv_sec += clock == CLOCK_REALTIME ? moved : clock == CLOCK_BOOTTIME ? passed.load() : 0;
     return result;
 }
 

@@ -8,6 +8,7 @@
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/print.h"
 #include "agent/cli/safeguard.h"
+#include "agent/core/signals.h"
 #include "agent/undo/making.h"
 
 namespace cvagent::commands {
@@ -51,10 +52,15 @@ std::string timeText(std::uint64_t seconds) {
     return text;
 }
 
-std::string lineOf(unsigned number, const Journal& journal) {
-    return padded(std::to_string(number), 6) + timeText(journal.began) + "  " +
-           padded(undo::stageText(journal.stage), 28) + printable(journal.summary) + "  (by " +
-           printable(journal.caller) + ")\n";
+/// @return a line, and one for each thing that is not back
+std::string linesOf(unsigned number, const Journal& journal) {
+    std::string text = padded(std::to_string(number), 6) + timeText(journal.began) + "  " +
+                       padded(undo::stageText(journal.stage), 28) + printable(journal.summary) + "  (by " +
+                       printable(journal.caller) + ")\n";
+    for (const std::string& note : journal.notes) {
+        text += "      " + printable(note) + "\n";
+    }
+    return text;
 }
 
 Json objectOf(unsigned number, const Journal& journal) {
@@ -99,6 +105,7 @@ ExitStatus rollback(const Options& options) {
         word = std::to_string(*last);
     }
     const ChangeDirectory change = named(word);
+    StopSignals::ignore();  // broken off in its middle it would leave a host that nobody reaches
     try {
         const Journal journal = undo::rollBack(kChangesPlace, change);
         print("change " + std::to_string(change.number()) + " " + undo::stageText(journal.stage) + "\n");
@@ -115,21 +122,27 @@ ExitStatus rollback(const Options& options) {
 ExitStatus listChanges(const Options& options) {
     mustBeRoot();
     std::string text;
-    for (const unsigned number : undo::changesIn(kChangesPlace)) {
+    ExitStatus status = ExitStatus::done;
+    const std::vector<unsigned> numbers = undo::changesIn(kChangesPlace);
+    for (const unsigned number : numbers) {
         try {
             if (const auto journal = ChangeDirectory(kChangesPlace, number).journal()) {
                 text +=
                     options.json
                         ? objectOf(number, *journal).dump(-1, ' ', false, Json::error_handler_t::replace) +
                               "\n"
-                        : lineOf(number, *journal);
+                        : linesOf(number, *journal);
             }
         } catch (const ChangeError& error) {
             complain("change " + std::to_string(number) + ": " + printable(error.what()));
+            status = ExitStatus::failed;
         }
     }
     print(text);
-    return ExitStatus::done;
+    if (numbers.empty()) {
+        complain("no change has been made so far that could be taken back");
+    }
+    return status;
 }
 
 }  // namespace cvagent::commands
