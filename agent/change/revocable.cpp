@@ -114,6 +114,9 @@ void Revocable::tellMade() {
 }
 
 bool Revocable::isTakenBack() {
+    if (settings_.beforeTakingBack) {
+        settings_.beforeTakingBack();
+    }
     const undo::Journal journal = making_->takeBack();
     settings_.tell("change " + std::to_string(making_->number()) + " " + undo::stageText(journal.stage) +
                    notesOf(journal.notes));

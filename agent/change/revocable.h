@@ -21,6 +21,8 @@ struct RevocableSettings {
     std::uint64_t settling = 0;  ///< see undo::Journal
     /// What a person should know. Printable.
     std::function<void(const std::string& text)> tell;
+    /// Called before this process takes it back itself; null: nothing is to be done then.
+    std::function<void()> beforeTakingBack = nullptr;
 };
 
 /// Saves what a change touches and, where a confirmation is waited for, has the guard take it back. Only in

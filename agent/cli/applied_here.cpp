@@ -6,6 +6,7 @@
 #include "agent/cli/caller.h"
 #include "agent/cli/print.h"
 #include "agent/cli/safeguard.h"
+#include "agent/core/signals.h"
 
 namespace cvagent {
 
@@ -23,6 +24,7 @@ change::RevocableSettings revocableSettings(const Options& options, const change
     settings.keepsHalf = options.force;
     settings.settling = options.byService ? kServiceSettles : 0;
     settings.tell = complain;
+    settings.beforeTakingBack = [] { StopSignals::ignore(); };  // broken off it would leave half of it
     if (settings.seconds && geteuid() != 0 && options.confirmSeconds) {
         throw Failure(ExitStatus::failed,
                       "only root can have a change taken back; nothing was done\nRun: sudo cvagent");

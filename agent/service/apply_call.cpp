@@ -63,8 +63,8 @@ std::unique_ptr<change::Revocable> revocable(const Application& application, con
     if (geteuid() != 0 || (wishes.plain && !wishes.confirmSeconds)) {
         return nullptr;
     }
-    return std::make_unique<change::Revocable>(
-        change::RevocableSettings{who, wishes.confirmSeconds, wishes.unguarded, wishes.force, 0, tell});
+    return std::make_unique<change::Revocable>(change::RevocableSettings{
+        who, wishes.confirmSeconds, wishes.unguarded, wishes.force, 0, tell, nullptr});
 }
 
 Applied applied(const PendingCall& call, const Application& application) {

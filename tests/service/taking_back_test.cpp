@@ -171,9 +171,11 @@ HOST_TEST_F(ServiceTakesBack, WhatSomebodyElseMayConfirm) {
         cvagent(host, {"apply", "/root/changes", "--verify-within", "0", "--confirm-within", "600"}).status,
         0);
     const std::string made = look(host);
-    for (const auto& [member, arguments] : std::vector<std::pair<const char*, call::Arguments>>{
-             {"Confirm", ofChange(1)}, {"Lengthen", ofChange(1, 300)}, {"Rollback", ofChange(1)}}) {
-        EXPECT_EQ(call::asUser(kUser, {}, [&] { return asked(member, arguments); }), kDenied) << member;
+    using Call = std::pair<const char*, call::Arguments>;
+    for (const Call& each :
+         {Call("Confirm", ofChange(1)), Call("Lengthen", ofChange(1, 300)), Call("Rollback", ofChange(1))}) {
+        EXPECT_EQ(call::asUser(kUser, {}, [&each] { return asked(each.first, each.second); }), kDenied)
+            << each.first;
     }
     EXPECT_TRUE(isLogged("uid 12345 may not confirm change 1: without polkit this is for root"));
     EXPECT_EQ(call::asUser(kUser, kGroup, [] { return asked("Lengthen", ofChange(1, 300)); }), "done");

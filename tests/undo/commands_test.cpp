@@ -173,7 +173,8 @@ HOST_TEST_F(Confirmed, AnAppliedFileOfWhichAStepFailsIsTakenBack) {
     EXPECT_EQ(stages(host), "1 is taken back, 2 is kept");
 }
 
-/// However slow the host is: the guard is at work, but stands still until it is let go.
+/// However slow the host is: the guard is at work, but stands still until it is let go. Stopped with the
+/// journal in its hands it would keep everybody waiting.
 void holdGuard(FakeHost& host) {
     host.directory("/run/systemd/system");
     host.file(
@@ -181,7 +182,10 @@ void holdGuard(FakeHost& host) {
         "while [ \"$1\" != -- ]; do shift; done\n\"$2\" \"$3\" &\n"
         "until grep -q \"OFDLCK .*:$(stat -c %i /var/lib/corvista/changes/1/guard.lock) \" /.proc/locks\n"
         "do sleep 0.01; done\n"
-        "kill -STOP $!\necho $! > /root/held\n");
+        "stop() { kill -STOP $1; until grep -q '^State:.T' /.proc/$1/status; do :; done; }\n"
+        "locked() { grep -q \"OFDLCK .*:$(stat -c %i /var/lib/corvista/changes/1/journal.lock) \" "
+        "/.proc/locks; }\n"
+        "stop $!\nwhile locked; do kill -CONT $!; sleep 0.01; stop $!; done\necho $! > /root/held\n");
     host.tool("/usr/bin/systemd-run %any", ToolAnswer{"", 0, "", 0, "sh /root/hold \"$@\""});
 }
 
