@@ -57,8 +57,8 @@ Service::Service(Loop& loop, bus::Connection& connection, Agent& agent, const Co
                   mailbox->post(
                       [this, held = std::make_shared<Look>(std::move(look))] { take(std::move(*held)); });
               }),
-      turns_(connection, loop),
       unread_(connection, loop),
+      turns_(connection, loop, unread_),
       readers_(kReaders),
       writers_(kWriters),
       planners_(kPlanners),
@@ -68,6 +68,7 @@ Service::Service(Loop& loop, bus::Connection& connection, Agent& agent, const Co
              readers_,       writers_, planners_, lookups_, confirmers_, loop.mailbox(), std::move(rehearsal),
              std::move(past)},
       objects_(parts_, standing_) {
+    changes_.whenSent([this] { unread_.signalled(); });
     parts_.rehearsal.goesOn = [this] { return !ends_; };
     standing_.version = CORVISTA_VERSION;
     standing_.lastEvent = lastEvent;
