@@ -151,12 +151,19 @@ private:
         }
     }
 
-    /// Those that the kernel makes of an address come and go with it.
+    /// Those that the kernel makes of an address come and go with it, and so does the old one's own.
+    bool isMadeOfAddress(const KernelRoute& route, bool isOfOld) const {
+        return route.protocol == RTPROT_KERNEL &&
+               (isOfOld || std::ranges::none_of(scene_.before.addresses, [&route](const KernelAddress& each) {
+                    return each.link == route.link && each.ip == route.source && !each.hasSubnetRoute;
+                }));
+    }
+
     void putBackRoutes() {
         for (const KernelRoute& each : scene_.before.routes) {
             const bool preferred = old_ != nullptr && each.source == old_->ip;
             const bool isOurs = each.destination.isIpv6 == ip_.isIpv6 && each.table != RT_TABLE_LOCAL &&
-                                each.protocol != RTPROT_KERNEL &&
+                                !isMadeOfAddress(each, preferred) &&
                                 (each.link == scene_.link.index || preferred);
             if (isOurs && !KernelNetwork::read().has(each)) {
                 noteIf(addAgain(each, preferred ? std::optional(ip_) : std::nullopt),

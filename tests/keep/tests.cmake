@@ -5,7 +5,9 @@ if(CORVISTA_SERVICE)
     keep/host_settings_test.cpp
     keep/keeper_test.cpp
     keep/manager_test.cpp
+    keep/manager_way_test.cpp
     keep/mock_manager.cpp
+    keep/profile_test.cpp
     keep/resolver_test.cpp
     keep/set_host_test.cpp
     keep/set_test.cpp
