@@ -229,7 +229,7 @@ void addCallsOf(const keep::Link& link, undo::KeeperCalls& calls) {
 undo::KeeperCalls keeperCallsFor(const std::vector<MeantChange>& changes) {
     std::set<std::string> interfaces;
     for (const MeantChange& change : changes) {
-        if (keptProperty(*change.row) != nullptr) {
+        if (keptProperty(*change.row) != nullptr || isKeptWithInterface(*change.row)) {
             interfaces.insert(interfaceNameOf(*change.node));
         }
     }

@@ -103,16 +103,21 @@ Wish wishOfLists(unsigned int property, const IC::PropertyValue& value) {
     return wish;
 }
 
-/// A system that has no way of its own may keep them with the interface.
+bool isWithInterface(const keep::Resolver& resolver) {
+    return resolver.system == "NetworkManager";
+}
+
+/// It has them with the interfaces that it keeps, or netplan for it.
 Kept keepWithInterface(const std::string& obstacle, const std::string& interface, const Wish& wish) {
     const KernelNetwork network = KernelNetwork::read();
     const KernelLink* link = network.link(interface);
-    if (link == nullptr) {
-        throw CannotKeep(obstacle);
+    const keep::Link kernels = link == nullptr ? keep::Link() : keep::Link{link->name, link->index};
+    const keep::Keeper keeper = link == nullptr ? keep::Keeper() : keep::keeperOf(kernels);
+    if (keeper.system() != "NetworkManager" && keeper.system() != "netplan") {
+        throw CannotKeep(obstacle + ", and does not keep '" + interface + "'");
     }
-    const keep::Link kernels{link->name, link->index};
     try {
-        const Way way = keep::wayToKeep(kernels, keep::keeperOf(kernels), wish);
+        const Way way = keep::wayToKeep(kernels, keeper, wish);
         keep::go(way);
         return {true, keptIn(way, "").note};
     } catch (const CannotKeep& cannot) {
@@ -137,7 +142,7 @@ template <unsigned int property>
 Kept keepLists(const HostsValue& written) {
     const Wish wish = wishOfLists(property, written.value);
     const keep::Resolver resolver = keep::resolverOfHost();
-    if (resolver.system == "NetworkManager") {
+    if (isWithInterface(resolver)) {
         return keepWithInterface(resolver.obstacle, written.interface, wish);
     }
     const Way way = keep::wayOfResolver(resolver, wish);
@@ -150,6 +155,9 @@ Kept keepLists(const HostsValue& written) {
     }
     Kept kept = keptIn(way, "");
     kept.isInForce = written.isTried || comesIntoForce(resolver, wish);
+    if (kept.isInForce && !keep::hasInForce(keep::Resolver(), wish)) {
+        kept.note += "; it uses them now, and /etc/resolv.conf goes on naming only systemd-resolved";
+    }
     return kept;
 }
 
@@ -210,6 +218,10 @@ void addCallsOfHost(const std::vector<MeantChange>& changes, undo::KeeperCalls& 
         calls.files.push_back(each.path);
     }
     calls.after.insert(calls.after.end(), way.callsAfter.begin(), way.callsAfter.end());
+}
+
+bool isKeptWithInterface(const Property& row) {
+    return isOfResolver(row) && isWithInterface(keep::resolverOfHost());
 }
 
 bool isInForceBySystem(const Property& row, const IC::PropertyValue& value) {

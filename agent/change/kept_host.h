@@ -15,6 +15,9 @@ std::function<Kept()> keepingOfHost(const IC::MutableNode& node, const Property&
 /// Adds them to those of the interfaces.
 void addCallsOfHost(const std::vector<MeantChange>& changes, undo::KeeperCalls& calls);
 
+/// Whether it is kept by the system that keeps the interface.
+bool isKeptWithInterface(const Property& row);
+
 /// Whether the host uses these name servers or search domains by a system whose own address alone stands in
 /// /etc/resolv.conf, or which adds others to them there. False for any other property.
 bool isInForceBySystem(const Property& row, const IC::PropertyValue& value);
