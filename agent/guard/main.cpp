@@ -67,6 +67,13 @@ int guard(unsigned number, bool isDetached) {
                 [number] { return cvagent::undo::guardChange(ChangeDirectory(kChangesPlace, number)); });
 }
 
+int afterStart() {
+    bool isWhole = true;
+    const int status =
+        told(false, [&isWhole] { return cvagent::undo::takeBackAfterStart(kChangesPlace, isWhole); });
+    return isWhole ? status : 1;
+}
+
 int run(const std::vector<std::string_view>& words) {
     const bool isAlone = words.size() == 1;
     if (isAlone && words.front() == "--help") {
@@ -78,7 +85,7 @@ int run(const std::vector<std::string_view>& words) {
         return 0;
     }
     if (isAlone && words.front() == "--after-start") {
-        return told(false, [] { return cvagent::undo::takeBackAfterStart(kChangesPlace); });
+        return afterStart();
     }
     const bool detached = words.size() == 2 && words.front() == "--detach";
     const auto number = isAlone || detached ? cvagent::undo::changeNumber(words.back()) : std::nullopt;

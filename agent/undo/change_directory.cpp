@@ -162,6 +162,11 @@ ChangeDirectory ChangeDirectory::make(const std::string& place) {
     }
 }
 
+bool ChangeDirectory::isGone() const {
+    struct stat found {};
+    return fstat(directory_.get(), &found) == 0 && found.st_nlink == 0;
+}
+
 std::optional<Journal> ChangeDirectory::journal() const {
     const auto text = read(kJournal);
     try {

@@ -38,6 +38,8 @@ public:
     static ChangeDirectory make(const std::string& place);
 
     unsigned number() const { return number_; }
+    /// Whether somebody has removed it since it was opened.
+    bool isGone() const;
 
     /// Of a change that did not get so far: nothing.
     std::optional<Journal> journal() const;

@@ -139,6 +139,9 @@ bool hasEnded(const ChangeDirectory& change, bool& isBack) {
     try {
         return lookOnce(change);
     } catch (const ChangeError&) {
+        if (change.isGone()) {
+            return true;
+        }
         putBackUnwritten(change, isBack);
         std::this_thread::sleep_for(kNextTry);
         return false;
@@ -172,7 +175,7 @@ Journal takeChangeBack(const ChangeDirectory& change) {
     return takeBackWith(change, [](const KeeperCalls& all) { return all; });
 }
 
-std::vector<std::string> takeBackAfterStart(const std::string& place) {
+std::vector<std::string> takeBackAfterStart(const std::string& place, bool& isWhole) {
     std::vector<std::string> told;
     for (const unsigned number : changesIn(place)) {
         try {
@@ -180,9 +183,12 @@ std::vector<std::string> takeBackAfterStart(const std::string& place) {
             const auto journal = change.journal();
             if (journal && journal->isOpen() && journal->boot != bootId()) {
                 const auto starting = [](const KeeperCalls& all) { return all.whileStarting(); };
-                told.push_back(sentence(number, takeBackWith(change, starting)));
+                const Journal now = takeBackWith(change, starting);
+                isWhole = isWhole && now.stage == Stage::takenBack && now.notes.empty();
+                told.push_back(sentence(number, now));
             }
         } catch (const ChangeError& error) {
+            isWhole = false;
             told.push_back("change " + std::to_string(number) + ": " + error.what());
         }
     }
@@ -196,6 +202,10 @@ std::vector<std::string> guardChange(const ChangeDirectory& change) {
     }
     for (bool isBack = false; !hasEnded(change, isBack);) {
         std::this_thread::sleep_for(kLook);
+    }
+    if (change.isGone()) {
+        return {"change " + std::to_string(change.number()) +
+                ": somebody has removed what was saved; it stays as it is"};
     }
     const Journal journal = change.journal().value_or(Journal{});
     return journal.stage == Stage::kept ? std::vector<std::string>()

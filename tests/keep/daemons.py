@@ -95,6 +95,16 @@ def change_and_take_back(context, path):
     expect_equal(f"the file {path}", context.host.run(f"cat {path}").stdout, before)
 
 
+def take_gateway_back(context, default):
+    """The daemon makes the route its own, before and after."""
+    result = context.host.run(f"{AGENT} set {NODE} IPv4Gateway 192.0.2.254 --confirm-within 600")
+    expect_equal(f"the status of the change ({result.stdout}{result.stderr})", result.returncode, 0)
+    context.host.wait_for(f"ip route show default | xargs | grep -qxF '{default.replace('192.0.2.1', '192.0.2.254')}'")
+    result = context.host.run(f"{AGENT} rollback")
+    expect_equal("what the taking back tells", (result.stdout, result.stderr), ("change 2 is taken back\n", ""))
+    context.host.wait_for(f"ip route show default | xargs | grep -qxF '{default}'")
+
+
 @check("ifupdown: a change is in the stanza and in force; set back, the file is as it was, byte for byte")
 def ifupdown(context):
     context.write("/etc/network/interfaces", STANZA)
@@ -114,8 +124,10 @@ def networkd(context):
     context.host.sh("systemctl start systemd-networkd")
     context.host.wait_for("networkctl status eth0 | grep -q configured")
     expect_equal("who keeps it", context.keeper()["keeper"], "systemd-networkd")
+    default = context.host.sh("ip route show default").strip()
     change_and_take_back(context, "/etc/systemd/network/0-cvagent-eth0.network")
     context.host.wait_for("networkctl status eth0 | grep -q 20-lan.network")
+    take_gateway_back(context, default)
     change_and_restart(context, "systemd-networkd, in /etc/systemd/network/0-cvagent-eth0.network", "systemctl restart systemd-networkd")
     expect_equal("the file", context.read("/etc/systemd/network/20-lan.network"), NETWORK)
     context.host.sh("rm /etc/systemd/network/0-cvagent-eth0.network; networkctl reload")

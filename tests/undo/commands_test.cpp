@@ -105,6 +105,7 @@ HOST_TEST_F(Confirmed, NeitherAKeyNorAHangUpBreaksARollbackOff) {
     ASSERT_EQ(fcntl(held, F_OFD_SETLK, &whole), 0);
     const pid_t rollback = fork();
     if (rollback == 0) {
+        dup2(open("/dev/null", O_WRONLY), STDOUT_FILENO);
         execl(CVAGENT_PROGRAM, CVAGENT_PROGRAM, "rollback", nullptr);
     }
     for (int i = 0; i < 6000 && !isWaitedFor(host, lock); ++i) {

@@ -284,7 +284,9 @@ HOST_TEST_F(Guard, PutsFilesBackAfterTheNextStart) {
                 return true;
             });
         }
-        cvagent::undo::takeBackAfterStart(kChangesPlace);
+        bool isWhole = true;
+        cvagent::undo::takeBackAfterStart(kChangesPlace, isWhole);
+        EXPECT_TRUE(isWhole) << steps;
         if (newest() && newest()->journal() && stage() == Stage::kept) {
             EXPECT_FALSE(killed && steps < 10);
             EXPECT_NE(files(host), oldFiles);
@@ -705,6 +707,41 @@ HOST_TEST_F(Guard, ProgramThatIsAskedToEndFails) {
     waitpid(guard, &status, 0);
     EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 1) << status;
     EXPECT_EQ(stage(), Stage::made);
+}
+
+/// Another guard would find no more than this one.
+HOST_TEST_F(Guard, ProgramEndsWellWhenSomebodyRemovesTheChange) {
+    make(host, settings());
+    const pid_t guard = fork();
+    if (guard == 0) {
+        execl(GUARD_PROGRAM, GUARD_PROGRAM, "1", nullptr);
+    }
+    ASSERT_TRUE(comesTrue([] { return newest()->isTaken(cvagent::undo::kGuardLock); }));
+    int status = 0;
+    kill(guard, SIGSTOP);  // it could make a file while this removes them
+    waitpid(guard, &status, WUNTRACED);
+    EXPECT_TRUE(WIFSTOPPED(status));
+    host.remove(std::string(kChangesPlace) + "/1");
+    kill(guard, SIGCONT);
+    waitpid(guard, &status, 0);
+    EXPECT_EQ(status, 0);
+    EXPECT_EQ(look(host), new_);
+}
+
+/// The unit that does it fails, for somebody has to look.
+HOST_TEST_F(Guard, ProgramFailsWhenNotAllIsBackAfterAStart) {
+    make(host, settings());
+    newest()->update([](Journal& journal) {
+        journal.boot = "before";
+        return true;
+    });
+    host.file(std::string(kChangesPlace) + "/1/before", "garbage");
+    const Finished first = host.run({GUARD_PROGRAM, "--after-start"});
+    EXPECT_EQ(first.status, 1);
+    EXPECT_THAT(first.err, HasSubstr("change 1: cannot be taken back; what was saved cannot be read"));
+    EXPECT_EQ(host.run({GUARD_PROGRAM, "--after-start"}).status, 0) << "it is told once";
+    host.file(std::string(kChangesPlace) + "/1/journal", "garbage");
+    EXPECT_EQ(host.run({GUARD_PROGRAM, "--after-start"}).status, 1);
 }
 
 HOST_TEST_F(Guard, ProgramRefusesWhatIsNoNumber) {

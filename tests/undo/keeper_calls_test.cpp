@@ -87,7 +87,9 @@ HOST_TEST_F(KeeperIsTold, WhileTheHostStartsOnlyWhatMakesFiles) {
         journal.boot = "another";
         return true;
     });
-    EXPECT_THAT(takeBackAfterStart(kChangesPlace), ElementsAre("change 1: is taken back"));
+    bool isWhole = true;
+    EXPECT_THAT(takeBackAfterStart(kChangesPlace, isWhole), ElementsAre("change 1: is taken back"));
+    EXPECT_TRUE(isWhole);
     EXPECT_EQ(host.read(kStanzas), "old\n");
     EXPECT_THAT(host.calls(), ElementsAre("/usr/sbin/netplan generate"));
 }
