@@ -10,6 +10,7 @@
 
 #include "agent/change/interface_settings.h"
 #include "agent/change/kept.h"
+#include "agent/change/kept_host.h"
 #include "agent/change/kernel_network.h"
 
 namespace cvagent::change {
@@ -333,7 +334,10 @@ std::function<EffectInForce(bool)> throughNetlink(const IC::MutableNode& node, c
 BringIntoForce bringingIntoForce(Neighbours neighbours) {
     return [neighbours](const IC::MutableNode& node, const Property& row,
                         const IC::PropertyValue& value) -> std::function<EffectInForce()> {
-        auto keep = keepingOverRestart(node, row, value);
+        auto keep = keepingOfHost(node, row, value, neighbours == Neighbours::notAsked);
+        if (!keep) {
+            keep = keepingOverRestart(node, row, value);
+        }
         auto act = throughNetlink(node, row, value, neighbours);
         if (!keep && !act) {
             return nullptr;
@@ -342,6 +346,7 @@ BringIntoForce bringingIntoForce(Neighbours neighbours) {
             const Kept kept = keep ? keep() : Kept();
             EffectInForce effect = act ? act(kept.isKept) : EffectInForce();
             effect.isKept = kept.isKept;
+            effect.isInForce = kept.isInForce;
             if (!kept.note.empty()) {
                 effect.notes.push_back(kept.note);
             }

@@ -33,6 +33,8 @@ struct Way {
     std::vector<FileEdit> files;
     std::vector<std::string> callsAfter;
     std::optional<Request> request{};  ///< instead of the calls behind; those are for who cannot ask
+    /// The calls are for more than these files: they are made even when no file has to be changed.
+    bool isAlwaysTold = false;
 
     /// Nothing has to be changed: it is kept already.
     bool isEmpty() const;
@@ -52,8 +54,9 @@ Way wayOfIfupdown(const Link& link, const Claim& claim, const Wish& wish);
 /// known who does.
 Way wayToKeep(const Link& link, const Keeper& keeper, const Wish& wish);
 
-/// Goes the way: each file is compared with what it was, replaced whole and read again. Where a step fails,
-/// all that was done is taken back. Throws CannotKeep, which tells of both.
+/// Goes the way: each file is compared with what it was, replaced whole and read again; one that the calls
+/// before have changed as wanted is left. Where a step fails, all that was done is taken back. Throws
+/// CannotKeep, which tells of both.
 void go(const Way& way);
 
 }  // namespace cvagent::keep

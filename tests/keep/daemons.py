@@ -207,15 +207,19 @@ def evidence_of(host):
     return collect
 
 
+def refuse_with_clock():
+    with open("/proc/self/status", encoding="ascii") as status:
+        rights = int(re.search(r"^CapBnd:\s*(\w+)", status.read(), re.MULTILINE).group(1), 16)
+    if rights >> CLOCK & 1:
+        raise SystemExit("with CAP_SYS_TIME this could set the machine's clock: start it as scripts/keep-test does")
+
+
 def main():
     parser = argparse.ArgumentParser(description=__doc__)
     parser.add_argument("build", help="directory of a build of this architecture")
     parser.add_argument("--only", default="", help="run only the checks that begin so")
     options = parser.parse_args()
-    with open("/proc/self/status", encoding="ascii") as status:
-        rights = int(re.search(r"^CapBnd:\s*(\w+)", status.read(), re.MULTILINE).group(1), 16)
-    if rights >> CLOCK & 1:
-        raise SystemExit("with CAP_SYS_TIME this could set the machine's clock: start it as scripts/keep-test does")
+    refuse_with_clock()
     system = root.make("keep", os.popen("dpkg --print-architecture").read().strip(), PACKAGES)
     checks = [row for row in CHECKS["main"] if row[1].__module__ == __name__ and row[0].startswith(options.only)]
     report = Report()
@@ -228,4 +232,5 @@ def main():
     return report.finish(len(checks))
 
 
-sys.exit(main())
+if __name__ == "__main__":
+    sys.exit(main())
