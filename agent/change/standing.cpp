@@ -8,6 +8,7 @@
 
 #include "agent/change/interface_settings.h"
 #include "agent/change/ip.h"
+#include "agent/change/kept_host.h"
 #include "agent/change/kernel_network.h"
 #include "agent/core/catalogue.h"
 #include "agent/core/node_copy.h"
@@ -128,7 +129,8 @@ Standing standingOf(const IC::MutableNode& node, const Property& row, const IC::
     if (effect != nullptr) {
         const NodeRef copy = named(node);
         const std::string lacking = effect->lacking({*copy, value, &reading.value});
-        if (!lacking.empty() && !isKeptElsewhere(row, value, reading.value)) {
+        if (!lacking.empty() && !isKeptElsewhere(row, value, reading.value) &&
+            !isInForceBySystem(row, value)) {
             return {WriteResult::differs, lacking};
         }
     }

@@ -68,7 +68,7 @@ def around(context):
     expect(host.sh("getent group corvista").startswith("corvista:"), "no group")
     expect_equal("directory", host.sh("stat -c '%a %U %G' /var/lib/corvista").strip(), "750 root corvista")
     actions = host.sh("pkaction | grep corvista").split()
-    expect_equal("actions", actions, [f"com.vantrel.corvista1.{name}" for name in ("plan", "power", "write")])
+    expect_equal("actions", actions, [f"com.vantrel.corvista1.{name}" for name in ("confirm", "plan", "power", "write")])
     for action in actions:
         details = host.sh(f"pkaction --verbose --action-id {action}")
         asked = 2 if action.endswith("plan") else 3  # a plan is for who sits at the host
