@@ -106,7 +106,10 @@ TEST_F(Watched, AFloodIsToldWhileItLasts) {
         tell(deviceNews("net"));
         std::this_thread::sleep_for(milliseconds(1));
     }
-    EXPECT_EQ(heard(), (Heard{"net", "net"}));
+    Heard first = heard();
+    ASSERT_GE(first.size(), 2U);
+    first.resize(2);
+    EXPECT_EQ(first, (Heard{"net", "net"}));
 }
 
 TEST_F(Watched, WithoutNewsEverythingIsToldNowAndThen) {
@@ -117,13 +120,11 @@ TEST_F(Watched, WithoutNewsEverythingIsToldNowAndThen) {
 
 TEST_F(Watched, NewsDoNotPutOffEverything) {
     watch({milliseconds(1), milliseconds(2), milliseconds(60)});
-    const auto toldEverything = [this] {
+    const auto toldBoth = [this] {
         tell(deviceNews("net"));
-        const Heard all = heard();
-        return std::find(all.begin(), all.end(), "") != all.end();
+        return testing::Value(heard(), testing::IsSupersetOf({"", "net"}));
     };
-    EXPECT_TRUE(eventually(toldEverything));
-    EXPECT_GT(heard().size(), 1U);
+    EXPECT_TRUE(eventually(toldBoth));
 }
 
 TEST_F(Watched, WhatIsNoNewsIsNotTold) {
