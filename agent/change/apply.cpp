@@ -40,11 +40,7 @@ void beginGuarded(const Proposal& proposal, const std::optional<Plan>& plan, con
     if (settings.safeguard == nullptr) {
         return;
     }
-    std::vector<MeantChange> changes;
-    for (const std::size_t i : proposal.order) {
-        changes.push_back(proposal.changes[i]);
-    }
-    settings.safeguard->begin(changes, plan ? plan->files : std::vector<FileChange>());
+    settings.safeguard->begin(toBeMade(proposal), plan ? plan->files : std::vector<FileChange>());
 }
 
 /// @return whether all of it is taken back

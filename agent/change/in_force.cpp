@@ -10,6 +10,7 @@
 
 #include "agent/change/interface_settings.h"
 #include "agent/change/kept.h"
+#include "agent/change/kept_host.h"
 #include "agent/change/kernel_network.h"
 
 namespace cvagent::change {
@@ -150,12 +151,19 @@ private:
         }
     }
 
-    /// Those that the kernel makes of an address come and go with it.
+    /// Those that the kernel makes of an address come and go with it, and so does the old one's own.
+    bool isMadeOfAddress(const KernelRoute& route, bool isOfOld) const {
+        return route.protocol == RTPROT_KERNEL &&
+               (isOfOld || std::ranges::none_of(scene_.before.addresses, [&route](const KernelAddress& each) {
+                    return each.link == route.link && each.ip == route.source && !each.hasSubnetRoute;
+                }));
+    }
+
     void putBackRoutes() {
         for (const KernelRoute& each : scene_.before.routes) {
             const bool preferred = old_ != nullptr && each.source == old_->ip;
             const bool isOurs = each.destination.isIpv6 == ip_.isIpv6 && each.table != RT_TABLE_LOCAL &&
-                                each.protocol != RTPROT_KERNEL &&
+                                !isMadeOfAddress(each, preferred) &&
                                 (each.link == scene_.link.index || preferred);
             if (isOurs && !KernelNetwork::read().has(each)) {
                 noteIf(addAgain(each, preferred ? std::optional(ip_) : std::nullopt),
@@ -326,7 +334,10 @@ std::function<EffectInForce(bool)> throughNetlink(const IC::MutableNode& node, c
 BringIntoForce bringingIntoForce(Neighbours neighbours) {
     return [neighbours](const IC::MutableNode& node, const Property& row,
                         const IC::PropertyValue& value) -> std::function<EffectInForce()> {
-        auto keep = keepingOverRestart(node, row, value);
+        auto keep = keepingOfHost(node, row, value, neighbours == Neighbours::notAsked);
+        if (!keep) {
+            keep = keepingOverRestart(node, row, value);
+        }
         auto act = throughNetlink(node, row, value, neighbours);
         if (!keep && !act) {
             return nullptr;
@@ -335,6 +346,7 @@ BringIntoForce bringingIntoForce(Neighbours neighbours) {
             const Kept kept = keep ? keep() : Kept();
             EffectInForce effect = act ? act(kept.isKept) : EffectInForce();
             effect.isKept = kept.isKept;
+            effect.isInForce = kept.isInForce;
             if (!kept.note.empty()) {
                 effect.notes.push_back(kept.note);
             }

@@ -3,12 +3,16 @@
 #include <linux/rtnetlink.h>
 
 #include <algorithm>
+#include <chrono>
 #include <iterator>
 #include <set>
+#include <thread>
 
 #include "agent/change/interface_settings.h"
+#include "agent/change/kept_host.h"
 #include "agent/change/kernel_network.h"
 #include "agent/core/command_deadline.h"
+#include "agent/keep/manager.h"
 #include "agent/keep/way.h"
 #include "framework/qx/whole_number.h"
 
@@ -25,8 +29,8 @@ constexpr const char* kStatic = "static";
 struct Written {
     std::string value;
     InterfaceSettings file;
-    std::optional<unsigned> runningPrefix;  ///< of IPv4
-    std::optional<unsigned> runningPrefix6;
+    keep::AddressText running;  ///< of IPv4; "" for none
+    keep::AddressText running6;
     std::optional<Ip> runningGateway;  ///< of IPv4, on this link
 
     /// The plug-in passes a write over while its file says that the address comes by DHCP. Where there is no
@@ -60,7 +64,8 @@ Wish wishOfAddress(const Written& written) {
         wish.dhcp = false;
         wish.ipv4.address = written.value;
         const auto inFile = prefixOfMask(written.file.mask);
-        wish.ipv4.likelyPrefix = written.runningPrefix ? written.runningPrefix : inFile;
+        wish.ipv4.likelyPrefix = written.running.prefix ? written.running.prefix : inFile;
+        wish.ipv4.likelyOld = written.running.address;
         wish.ipv4.likelyGateway = likelyGateway(written, wish.ipv4.likelyPrefix);
     }
     return wish;
@@ -70,6 +75,7 @@ Wish wishOfMask(const Written& written) {
     Wish wish;
     if (written.is(written.file.mask)) {
         wish.ipv4.prefix = prefixOfMask(written.value);
+        wish.ipv4.likelyOld = written.running.address;
     }
     return wish;
 }
@@ -87,7 +93,8 @@ Wish wishOfIpv6Address(const Written& written) {
     if (written.is(written.file.ipv6Address)) {
         wish.ipv6.address = written.value;
         const auto inFile = prefixIn(written.file);
-        wish.ipv6.likelyPrefix = inFile ? inFile : written.runningPrefix6;
+        wish.ipv6.likelyPrefix = inFile ? inFile : written.running6.prefix;
+        wish.ipv6.likelyOld = written.running6.address;
     }
     return wish;
 }
@@ -96,6 +103,7 @@ Wish wishOfPrefixLength(const Written& written) {
     Wish wish;
     if (written.is(written.file.prefixLength)) {
         wish.ipv6.prefix = prefixLengthIn(written.value);
+        wish.ipv6.likelyOld = written.running6.address;
     }
     return wish;
 }
@@ -117,9 +125,10 @@ constexpr KeptProperty kKept[] = {{24, wishOfOrigin},       {25, wishOfAddress},
                                   {27, wishOfIpv6Address},  {100, wishOfGateway}, {101, wishOfIpv6Gateway},
                                   {102, wishOfPrefixLength}};
 
-std::optional<unsigned> prefixOn(const KernelNetwork& network, unsigned link, bool isIpv6) {
+keep::AddressText runningOn(const KernelNetwork& network, unsigned link, bool isIpv6) {
     const KernelAddress* address = network.mainAddress(link, isIpv6);
-    return address == nullptr ? std::nullopt : std::optional(address->prefix);
+    return address == nullptr ? keep::AddressText{"", std::nullopt}
+                              : keep::AddressText{address->ip.text(), address->prefix};
 }
 
 std::optional<Ip> gatewayOn(const KernelNetwork& network, unsigned link) {
@@ -142,6 +151,26 @@ std::string placesOf(const keep::Way& way) {
     return places.empty() ? "" : ", in " + places;
 }
 
+bool isOn(const KernelNetwork& network, unsigned link, const keep::FamilyWish& wish) {
+    const auto ip = wish.address ? Ip::parse(*wish.address) : std::nullopt;
+    return !ip || std::ranges::any_of(network.addresses, [&](const KernelAddress& each) {
+        return each.link == link && each.ip == *ip && (!wish.prefix || each.prefix == *wish.prefix);
+    });
+}
+
+/// A daemon asks the network first whether somebody else has an address. One that does not come is set by
+/// the agent.
+void waitUntilSet(unsigned link, const Wish& wish) {
+    constexpr std::chrono::milliseconds kBetweenLooks{20};
+    const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(3);
+    const auto isSet = [&](const KernelNetwork& network) {
+        return isOn(network, link, wish.ipv4) && isOn(network, link, wish.ipv6);
+    };
+    while (!isSet(KernelNetwork::read()) && std::chrono::steady_clock::now() < end) {
+        std::this_thread::sleep_for(kBetweenLooks);
+    }
+}
+
 Kept keepWith(const keep::Link& link, const Wish& wish) {
     const keep::Keeper keeper = keep::keeperOf(link);
     if (keeper.claims.empty() && keeper.unknown.empty()) {
@@ -152,6 +181,9 @@ Kept keepWith(const keep::Link& link, const Wish& wish) {
         const CommandScope scope(
             CommandScope::write);  // its commands have a write's time, and are told as its
         keep::go(way);
+        if (way.request && keep::toldInstead() == nullptr) {
+            waitUntilSet(link.index, wish);
+        }
         return {true, "kept over a restart by " + way.system + placesOf(way)};
     } catch (const keep::CannotKeep& cannot) {
         return {false, "not kept over a restart: " + std::string(cannot.what())};
@@ -208,6 +240,7 @@ undo::KeeperCalls keeperCallsFor(const std::vector<MeantChange>& changes) {
             addCallsOf({link->name, link->index}, calls);
         }
     }
+    addCallsOfHost(changes, calls);
     return calls;
 }
 
@@ -228,8 +261,8 @@ std::function<Kept()> withWish(const IC::MutableNode& node, const Property& row,
     }
     Written before{static_cast<std::string>(value),
                    {},
-                   prefixOn(network, link->index, false),
-                   prefixOn(network, link->index, true),
+                   runningOn(network, link->index, false),
+                   runningOn(network, link->index, true),
                    gatewayOn(network, link->index)};
     return [link = keep::Link{link->name, link->index}, written = std::move(before), of = kept->wish, act] {
         Written now = written;

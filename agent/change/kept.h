@@ -10,8 +10,9 @@
 namespace cvagent::change {
 
 struct Kept {
-    bool isKept = false;
-    std::string note;  ///< where it is kept, or why it is not; "" where nobody is known who could
+    bool isKept = false;     ///< by a system of the host: the plug-in's files do not count
+    std::string note{};      ///< where it is kept, or why it is not; "" where nobody is known who could
+    bool isInForce = false;  ///< that system has been found to use the value
 };
 
 /// Has the system that keeps an interface over a restart keep what is written of it. To be called before the

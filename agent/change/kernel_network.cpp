@@ -69,6 +69,7 @@ void takeAddressAttribute(KernelAddress& address, bool isIpv6, unsigned type, st
     } else if (type == IFA_FLAGS) {
         const unsigned flags = numberIn(data);
         address.isPermanent = (flags & IFA_F_PERMANENT) != 0;
+        address.hasSubnetRoute = (flags & IFA_F_NOPREFIXROUTE) == 0;
         address.duplicate = (flags & IFA_F_DADFAILED) != 0   ? Duplicate::yes
                             : (flags & IFA_F_TENTATIVE) != 0 ? Duplicate::beingAsked
                                                              : Duplicate::no;

@@ -26,6 +26,7 @@ struct KernelAddress {
     std::string label;         ///< of IPv4: the link's name, or an alias such as "eth0:1"
     bool isPermanent = false;  ///< no lease and no advertisement limits its life
     bool isGlobal = false;
+    bool hasSubnetRoute = true;  ///< that the kernel makes; else who has set it makes it in the kernel's name
     Duplicate duplicate = Duplicate::no;
     unsigned protocol = 0;  ///< IFAPROT_...; 0 where the kernel tells none
     std::string message;    ///< all of it, as the kernel told it

@@ -9,6 +9,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <csignal>
@@ -21,11 +22,13 @@
 #include "agent/change/name_keeper.h"
 #include "agent/change/name_service.h"
 #include "agent/change/namespaces.h"
+#include "agent/change/record.h"
 #include "agent/change/recorders.h"
 #include "agent/change/request_json.h"
 #include "agent/core/data_directory.h"
 #include "agent/core/program_path.h"
 #include "agent/core/surroundings.h"
+#include "agent/keep/manager.h"
 #include "hosttools/text.h"
 
 namespace {
@@ -33,6 +36,7 @@ namespace {
 using cvagent::change::Cannot;
 using cvagent::change::Fence;
 using cvagent::change::must;
+using cvagent::change::Record;
 using hosttools::Descriptor;
 
 constexpr std::size_t kMostRequest = 16U << 20U;
@@ -165,10 +169,20 @@ void watch(pid_t process, const Descriptor& socket) {
     }
 }
 
+/// Whether one of the changes can be of something that NetworkManager keeps.
+bool isOfInterface(const cvagent::change::RehearsalRequest& request) {
+    return std::ranges::any_of(request.changes, [](const cvagent::change::Change& change) {
+        return change.node.find("ip-config") != std::string::npos;
+    });
+}
+
 void rehearse(const Descriptor& socket, const std::string& text) {
     const auto request = cvagent::change::requestFromJson(text);
     cvagent::change::Isolation isolation;
     isolation.dataDirectory = dataDirectory(request);
+    if (isOfInterface(request)) {
+        cvagent::keep::loseManager([](const std::string& asked) { Record::only().command(asked, true); });
+    }
     cvagent::programDirectory();  // is found now: below another root it cannot be told later
     isolation.asUser = cvagent::change::gainRightToIsolate();
     Turns turns;

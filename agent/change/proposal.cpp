@@ -53,6 +53,14 @@ std::string objectionsText(const Proposal& proposal) {
     return text;
 }
 
+std::vector<MeantChange> toBeMade(const Proposal& proposal) {
+    std::vector<MeantChange> changes;
+    for (const std::size_t i : proposal.order) {
+        changes.push_back(proposal.changes[i]);
+    }
+    return changes;
+}
+
 void refuse(const Proposal& proposal) {
     if (!proposal.objections.empty()) {
         throw Problem(Problem::refused, objectionsText(proposal), Problem::objection);

@@ -28,6 +28,9 @@ struct Proposal {
 Proposal propose(ChangedHost& host, std::vector<MeantChange> changes, const Request& request,
                  Already already = Already::leftOut);
 
+/// In their order.
+std::vector<MeantChange> toBeMade(const Proposal& proposal);
+
 /// Why the changes should not be made, one reason a line, printable; "" when nothing speaks against them.
 std::string objectionsText(const Proposal& proposal);
 /// Throws Problem (refused, Problem::objection) with that text.

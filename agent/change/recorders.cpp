@@ -20,9 +20,9 @@ namespace {
 namespace fs = std::filesystem;
 
 constexpr const char* kDirectories = "/tmp/.corvista-rehearsal-";  // one of ours begins so
-constexpr std::array kNames = {"shutdown", "reboot",  "halt",    "poweroff",  "service", "rpm",
-                               "init",     "telinit", "hwclock", "systemctl", "ifdown",  "ifup",
-                               "wicked",   "netplan", "nmcli",   "networkctl"};
+constexpr std::array kNames = {"shutdown", "reboot",  "halt",    "poweroff",   "service",     "rpm",
+                               "init",     "telinit", "hwclock", "systemctl",  "ifdown",      "ifup",
+                               "wicked",   "netplan", "nmcli",   "networkctl", "hostnamectl", "resolvconf"};
 // Only ask, mostly.
 constexpr const char* kDate = "date";
 constexpr const char* kHostName = "hostname";

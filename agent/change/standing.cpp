@@ -9,6 +9,7 @@
 #include "agent/change/interface_settings.h"
 #include "agent/change/ip.h"
 #include "agent/change/kept.h"
+#include "agent/change/kept_host.h"
 #include "agent/change/kernel_network.h"
 #include "agent/core/catalogue.h"
 #include "agent/core/node_copy.h"
@@ -129,7 +130,7 @@ Standing standingOf(const IC::MutableNode& node, const Property& row, const IC::
         const NodeRef copy = named(node);
         const std::string lacking = effect->lacking({*copy, value, &reading.value});
         if (!lacking.empty() && !isKeptElsewhere(row, value, reading.value) &&
-            !isKeptAlready(node, row, value)) {
+            !isInForceBySystem(row, value) && !isKeptAlready(node, row, value)) {
             return {WriteResult::differs, lacking};
         }
     }

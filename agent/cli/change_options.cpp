@@ -124,7 +124,8 @@ void addConfirmWithin(CLI::App& command, Options& options) {
         .add_option(
             "--confirm-within", options.confirmSeconds,
             "Take all of it back unless somebody types cvagent confirm within this time, and when a step "
-            "fails. 0: do not. Default: 60 where root at a terminal could cut himself off, else 0")
+            "fails. 0: do not. Default: 60 where root, or who asks the service, could cut himself off at a "
+            "terminal, else 0")
         ->type_name("SECONDS")
         ->check(secondsUpTo(kLongestConfirmation));
 }

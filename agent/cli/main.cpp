@@ -1,3 +1,5 @@
+#include <unistd.h>
+
 #include <array>
 #include <chrono>
 #include <exception>
@@ -88,6 +90,11 @@ ExitStatus runWithoutAgent(const Options& options) {
     }
 }
 
+/// Who is not root has his changes kept and taken back by the service, which is found by the environment.
+bool isForService(const Options& options) {
+    return geteuid() != 0 && (options.command == Command::confirm || options.command == Command::rollback);
+}
+
 ExitStatus run(Options& options, cvagent::WantMessages& wants) {
     const Question ask = options.verify ? cvagent::commands::verifyTree
                                         : kQuestions.at(static_cast<std::size_t>(options.command));
@@ -109,7 +116,9 @@ ExitStatus run(Options& options, cvagent::WantMessages& wants) {
     const bool isDoctor = options.command == Command::doctor;
     const auto service = isDoctor ? cvagent::remote::describeService(options)  // before the environment goes
                                   : cvagent::remote::ServiceReport();
-    cvagent::prepareSurroundings(files);
+    if (!isForService(options)) {
+        cvagent::prepareSurroundings(files);
+    }
     return isDoctor ? cvagent::commands::doctor(options, service) : runWithoutAgent(options);
 }
 

@@ -22,6 +22,8 @@ struct ApplyOptions {
     bool plain = false;  ///< neither tried out nor left out where it is so already
     /// How long to look at what was written; nothing: not at all.
     std::optional<double> verifySeconds;
+    std::optional<double> confirmSeconds;  ///< to wait for the confirmation; nothing: not at all
+    bool unguarded = false;                ///< made although it cannot be taken back
 };
 
 /// What the commands ask of an agent: one of this process (LocalSession) or the service

@@ -209,8 +209,9 @@ Reading Writer::askSettled(const Job& job) {
 }
 
 void Writer::lookAfter(const Job& job, const EffectInForce& effect, WriteResult& result) {
-    result.after = effect.isKept ? askSettled(job) : facts_.ask(*job.node, job.row.id);
-    result.outcome = compare(job.row, job.value, result.after);
+    const bool isAwaited = effect.isKept && !effect.isInForce;
+    result.after = isAwaited ? askSettled(job) : facts_.ask(*job.node, job.row.id);
+    result.outcome = effect.isInForce ? WriteResult::applied : compare(job.row, job.value, result.after);
     std::string lacking;
     if (!effect.isKept) {
         lacking = lackingEffect(*job.node, job.row, job.value, result.after);

@@ -37,7 +37,8 @@ struct WriteResult {
 struct EffectInForce {
     std::string lacking;
     std::vector<std::string> notes;
-    bool isKept = false;  ///< by the system that keeps the interface: the plug-in's files do not count
+    bool isKept = false;     ///< by a system of the host: the plug-in's files do not count
+    bool isInForce = false;  ///< that system has been found to use the value, whatever the plug-in reads
 };
 /// Brings into the running host what a plug-in only writes to files. Called before a write; what it gives is
 /// called behind one that the plug-in took. May give none.

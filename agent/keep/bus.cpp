@@ -25,12 +25,13 @@ int millisecondsUntil(Clock::time_point end) {
 }  // namespace
 
 /// The library's own blocking call waits a minute and a half for a bus that does not greet.
-bus::Message PatientBus::ask(const bus::Message& call, const std::string& service) {
+bus::Message PatientBus::ask(const bus::Message& call, const std::string& service,
+                             std::chrono::seconds longest) {
     bus::Message answer;
     if (!silent_.contains(service)) {
-        const auto end = Clock::now() + kLongest;
+        const auto end = Clock::now() + longest;
         const bus::Slot waiting = connection_.askLater(
-            call, kLongest + std::chrono::seconds(1), [&answer](const bus::Message& come) { answer = come; });
+            call, longest + std::chrono::seconds(1), [&answer](const bus::Message& come) { answer = come; });
         connection_.process();
         while (!answer && Clock::now() < end) {
             const auto due = std::min(end, connection_.deadline().value_or(end));
@@ -41,7 +42,7 @@ bus::Message PatientBus::ask(const bus::Message& call, const std::string& servic
     }
     if (!answer) {
         silent_.insert(service);
-        throw NoAnswer(service + " has not answered for " + std::to_string(kLongest.count()) + " s");
+        throw NoAnswer(service + " has not answered for " + std::to_string(longest.count()) + " s");
     }
     if (answer.isError()) {
         throw answer.error();

@@ -21,7 +21,8 @@ public:
     /// A call that starts no daemon.
     bus::Message call(const bus::Target& target) const;
     /// @return the answer; throws bus::Error for one that is an error, NoAnswer when there is none in time
-    bus::Message ask(const bus::Message& call, const std::string& service);
+    bus::Message ask(const bus::Message& call, const std::string& service,
+                     std::chrono::seconds longest = kLongest);
 
     // A property of an object. Each throws as ask() does, and bus::Error when it is of another type.
     bool flag(const bus::Target& property);

@@ -4,6 +4,7 @@
 #include "agent/bus/writer.h"
 #include "agent/keep/bus.h"
 #include "agent/keep/host_files.h"
+#include "agent/keep/lost_manager.h"
 
 namespace cvagent::keep {
 
@@ -29,13 +30,15 @@ std::string fileOf(PatientBus& bus, const std::string& connection) {
 
 ManagedLink described(PatientBus& bus, const std::string& device) {
     ManagedLink link;
+    link.device = device;
     link.isManaged = bus.flag({kService, device, interfaceOf(".Device"), "Managed"});
     const std::string active = bus.path({kService, device, interfaceOf(".Device"), "ActiveConnection"});
     if (link.isManaged && active != kNoObject) {
         const std::string interface = interfaceOf(".Connection.Active");
         link.isExternal = (bus.number({kService, active, interface, "StateFlags"}) & kExternal) != 0;
         link.connection = bus.text({kService, active, interface, "Id"});
-        link.file = fileOf(bus, bus.path({kService, active, interface, "Connection"}));
+        link.profile = bus.path({kService, active, interface, "Connection"});
+        link.file = fileOf(bus, link.profile);
     }
     return link;
 }
@@ -72,6 +75,9 @@ bool Daemons::runs(const std::string& busName, const std::string& unit) {
 
 /// A link that it does not know is an error to it, and so is one that has gone meanwhile.
 std::optional<ManagedLink> Daemons::networkManagerOn(const std::string& link) {
+    if (const LostManager* lost = lostManager()) {
+        return lost->on(link);
+    }
     if (!runs(kService, "NetworkManager")) {
         return std::nullopt;
     }

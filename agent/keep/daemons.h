@@ -21,6 +21,10 @@ struct ManagedLink {
     bool isExternal = false;  ///< it only shows what others have configured
     std::string connection;   ///< the name of what is active on it; "" for nothing
     std::string file;         ///< where that is kept; "" where it is not told
+
+    // Its objects on the bus; the second is "" with nothing active.
+    std::string device;
+    std::string profile;
 };
 
 /// The daemons of this host: which of them run, and what they say on the system's bus. No daemon is started

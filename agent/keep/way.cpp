@@ -10,6 +10,7 @@
 
 #include "agent/core/text.h"
 #include "agent/keep/host_files.h"
+#include "agent/keep/manager.h"
 #include "agent/keep/replace_file.h"
 
 namespace cvagent::keep {
@@ -22,7 +23,8 @@ struct SystemsWay {
     const char* system;
     Way (*way)(const Link&, const Claim&, const Wish&);
 };
-constexpr std::array kWays = {SystemsWay{"netplan", wayOfNetplan},
+constexpr std::array kWays = {SystemsWay{"NetworkManager", wayOfNetworkManager},
+                              SystemsWay{"netplan", wayOfNetplan},
                               SystemsWay{"systemd-networkd", wayOfNetworkd},
                               SystemsWay{"wicked", wayOfWicked}, SystemsWay{"ifupdown", wayOfIfupdown}};
 
@@ -54,7 +56,11 @@ void call(const std::string& command) {
 }
 
 void put(const FileEdit& edit) {
-    if (smallFile(edit.path) != edit.before) {
+    const auto now = smallFile(edit.path);
+    if (now == edit.after) {
+        return;
+    }
+    if (now != edit.before) {
         throw CannotKeep(edit.path + " has been changed meanwhile");
     }
     if (!edit.after) {
@@ -90,10 +96,15 @@ std::string takeBack(const Way& way) {
             problems += std::string("; and taking it back: ") + cannot.what();
         }
     };
-    for (const FileEdit& each : way.back().files) {
+    for (FileEdit each : way.back().files) {
+        each.before = way.request ? smallFile(each.path) : each.before;  // whatever the daemon has written
         if (smallFile(each.path) != each.after) {
             trying([&each] { putAll({each}); });
         }
+    }
+    if (way.request) {
+        trying(way.request->readAgain);
+        return problems;
     }
     for (const std::string& each : way.callsAfter) {
         trying([&each] { call(each); });
@@ -101,10 +112,18 @@ std::string takeBack(const Way& way) {
     return problems;
 }
 
+void ask(const Request& request) {
+    if (const auto* tell = toldInstead()) {
+        std::ranges::for_each(request.words, *tell);
+    } else {
+        request.make();
+    }
+}
+
 }  // namespace
 
 bool Way::isEmpty() const {
-    return std::ranges::none_of(files, &FileEdit::isChange);
+    return !request && std::ranges::none_of(files, &FileEdit::isChange);
 }
 
 Way Way::back() const {
@@ -131,7 +150,7 @@ Way wayToKeep(const Link& link, const Keeper& keeper, const Wish& wish) {
     const auto* found =
         std::ranges::find_if(kWays, [&system](const SystemsWay& each) { return system == each.system; });
     if (found == kWays.end()) {
-        throw CannotKeep(system + " keeps " + inQuotes(link.name) + " and is not asked to keep it otherwise");
+        throw CannotKeep(system + " is not known");
     }
     checkName(link.name);
     check(wish);
@@ -139,13 +158,19 @@ Way wayToKeep(const Link& link, const Keeper& keeper, const Wish& wish) {
 }
 
 void go(const Way& way) {
-    if (way.isEmpty()) {
+    if (way.isEmpty() && !way.isAlwaysTold) {
         return;
     }
     try {
         std::ranges::for_each(way.callsBefore, call);
         putAll(way.files);
-        std::ranges::for_each(way.callsAfter, call);
+        if (way.request) {
+            ask(*way.request);
+        } else {
+            std::ranges::for_each(way.callsAfter, call);
+        }
+    } catch (const NotBegun&) {
+        throw;
     } catch (const CannotKeep& cannot) {
         throw CannotKeep(cannot.what() + takeBack(way));
     }

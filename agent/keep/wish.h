@@ -13,12 +13,20 @@ public:
     using std::runtime_error::runtime_error;
 };
 
+/// The same, where nothing has been done that had to be taken back.
+class NotBegun : public CannotKeep {
+public:
+    using CannotKeep::CannotKeep;
+};
+
 /// What shall be kept of one family of addresses; what is not set stays as it is.
 struct FamilyWish {
     std::optional<std::string> address{};  ///< without its prefix length
     std::optional<unsigned> prefix{};
     std::optional<std::string> gateway{};    ///< of the default route; "" for none
     std::optional<unsigned> likelyPrefix{};  ///< for an address where nothing else tells one
+    /// The address that it is about, where several are kept in no order; else the first.
+    std::optional<std::string> likelyOld{};
     /// For an address in whose subnet it is, when the one before came by DHCP and brought its gateway.
     std::optional<std::string> likelyGateway{};
 

@@ -1,8 +1,10 @@
 // The method Apply: judged, consented to, checked, tried out, made, looked at, told.
 #include <malloc.h>
+#include <unistd.h>
 
 #include <algorithm>
 
+#include "agent/change/revocable.h"
 #include "agent/service/change_request.h"
 #include "agent/service/log.h"
 #include "agent/service/users.h"
@@ -50,6 +52,21 @@ void noteOutcomes(const Application& application, const std::vector<change::Outc
     }
 }
 
+/// Nobody stands by a change that is to be quick, and none where the service has not root's rights.
+std::unique_ptr<change::Revocable> revocable(const Application& application, const std::string& who,
+                                             const std::function<void(const std::string& text)>& tell) {
+    const ApplyWishes& wishes = application.wishes;
+    if (geteuid() != 0 && wishes.confirmSeconds && !wishes.unguarded) {
+        throw Problem(Problem::refused,
+                      "the service is not root's and takes no change back; nothing was done");
+    }
+    if (geteuid() != 0 || (wishes.plain && !wishes.confirmSeconds)) {
+        return nullptr;
+    }
+    return std::make_unique<change::Revocable>(change::RevocableSettings{
+        who, wishes.confirmSeconds, wishes.unguarded, wishes.force, 0, tell, nullptr});
+}
+
 Applied applied(const PendingCall& call, const Application& application) {
     const std::string who = userText(application.caller.user);
     const auto request = [&who](const std::string& plan) {
@@ -60,11 +77,13 @@ Applied applied(const PendingCall& call, const Application& application) {
     change::ApplySettings settings;
     settings.rehearsal = call.parts().rehearsal;
     settings.goesOn = settings.rehearsal.goesOn;
-    settings.triesOut = !application.wishes.plain;
+    settings.triesOut = !application.wishes.plain || application.wishes.confirmSeconds;
     settings.force = application.wishes.force;
     settings.verifySeconds = application.wishes.verifySeconds;
     settings.request = request;
     settings.tell = [&done](const std::string& text) { done.told.push_back(text); };
+    const auto safeguard = revocable(application, who, settings.tell);
+    settings.safeguard = safeguard.get();
     const auto already = application.wishes.plain ? change::Already::made : change::Already::leftOut;
     done.outcomes =
         change::apply(host, change::propose(host, application.changes, request(""), already), settings);

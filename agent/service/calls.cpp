@@ -21,7 +21,6 @@ constexpr std::chrono::seconds kReadTime{20};  // below the 25 s after which mos
 constexpr std::size_t kMostEvents = 512;
 constexpr std::size_t kMostProperties = 1024;  // of one read
 constexpr std::size_t kLongestWord = 16384;    // that may be a path; a call that waits keeps it
-constexpr unsigned int kWeightOfLarge = 8;
 
 /// In the order of Problem::Kind.
 constexpr std::array kKindNames = {"NotFound", "Ambiguous", "Refused", "Busy", "TimedOut", "Failed"};
@@ -99,8 +98,7 @@ void PendingCall::fail(const Problem& problem, const std::vector<std::string>& e
     parts_.connection.send(reply);
 }
 
-bool PendingCall::isRead(unsigned int weight) const {
-    const Unread::Answer answer = parts_.unread.answerFor(message_.sender(), weight);
+bool PendingCall::goesAs(Unread::Answer answer) const {
     if (answer == Unread::Answer::refusal) {
         fail(bus::kLimitsExceeded, "too much of what was sent to you is not read yet");
     }
@@ -140,7 +138,7 @@ void PendingCall::inTurn(const std::function<void(const Caller& caller)>& next) 
     const PendingCall held = *this;
     withCaller([held, next](const Caller& caller) {
         const auto work = [held, next, caller] {
-            if (held.isRead(kWeightOfLarge)) {
+            if (held.goesAs(held.parts_.unread.largeAnswerFor(caller))) {
                 held.guarded([&] { next(caller); });
             }
         };

@@ -36,7 +36,8 @@ struct Parts {
     Workers& readers;
     Workers& writers;
     Workers& planners;
-    Workers& lookups;  ///< of what changes mean
+    Workers& lookups;     ///< of what changes mean
+    Workers& confirmers;  ///< who have no time to wait behind the others
     std::shared_ptr<Mailbox> mailbox;
     /// How changes are tried out.
     change::RehearsalSettings rehearsal;
@@ -62,7 +63,7 @@ public:
     /// @param errors what the plug-in reported on the way
     void fail(const Problem& problem, const std::vector<std::string>& errors = {}) const;
     /// Whether the caller reads what he gets; one who does not is refused, or gets nothing at all.
-    bool isRead(unsigned int weight = 1) const;
+    bool isRead() const { return goesAs(parts_.unread.answerFor(message_.sender())); }
     /// Runs something for the call on the loop's thread; what it throws is the answer.
     void guarded(const std::function<void()>& work) const;
     /// Goes on when it is known who calls.
@@ -71,6 +72,8 @@ public:
     void inTurn(const std::function<void(const Caller& caller)>& next) const;
 
 private:
+    bool goesAs(Unread::Answer answer) const;
+
     Parts& parts_;
     bus::Message message_;
 };
@@ -95,5 +98,8 @@ void startRead(const CallPointer& call, std::optional<std::uint32_t> node);
 void startWrite(const CallPointer& call, std::optional<std::uint32_t> node);
 void startPlan(const CallPointer& call);
 void startApply(const CallPointer& call);
+void startConfirm(const CallPointer& call);
+void startLengthen(const CallPointer& call);
+void startRollback(const CallPointer& call);
 
 }  // namespace cvagent::service

@@ -50,13 +50,27 @@ bool takeFlag(bus::Reader& reader, const std::string& type, const std::string& n
     return reader.flag();
 }
 
-double takeSeconds(bus::Reader& reader, const std::string& type, const std::string& name) {
+double takeSeconds(bus::Reader& reader, const std::string& type, const std::string& name, double longest) {
     const double seconds = type == "d" ? reader.real() : -1;
-    if (!std::isfinite(seconds) || seconds < 0 || seconds > kLongestVerify) {
-        throw bus::Error(bus::kInvalidArgs, name + " is a number of seconds (d) from 0 to " +
-                                                std::to_string(std::lround(kLongestVerify)));
-    }
+    judgeSeconds(seconds, name, longest);
     return seconds;
+}
+
+void takeWish(bus::Reader& reader, const std::string& type, const std::string& name, ApplyWishes& wishes) {
+    if (name == "force") {
+        wishes.force = takeFlag(reader, type, name);
+    } else if (name == "plain") {
+        wishes.plain = takeFlag(reader, type, name);
+    } else if (name == "unguarded") {
+        wishes.unguarded = takeFlag(reader, type, name);
+    } else if (name == "verify-within") {
+        wishes.verifySeconds = takeSeconds(reader, type, name, kLongestVerify);
+    } else if (name == "confirm-within") {
+        const double seconds = takeSeconds(reader, type, name, kLongestConfirmation);
+        wishes.confirmSeconds = seconds > 0 ? std::optional(seconds) : std::nullopt;
+    } else {
+        throw bus::Error(bus::kInvalidArgs, "there is no option " + inQuotes(name));
+    }
 }
 
 void noteDenied(const Caller& caller, const ChangeQuestion& question,
@@ -96,6 +110,13 @@ void askWhetherAllowed(const CallPointer& call, const Caller& caller, const Chan
 
 }  // namespace
 
+void judgeSeconds(double seconds, const std::string& name, double longest) {
+    if (!std::isfinite(seconds) || seconds < 0 || seconds > longest) {
+        throw bus::Error(bus::kInvalidArgs, name + " is a number of seconds (d) from 0 to " +
+                                                std::to_string(std::lround(longest)));
+    }
+}
+
 std::vector<change::NamedChange> takeChanges(bus::Reader& reader) {
     std::vector<change::NamedChange> changes;
     std::size_t size = 0;
@@ -121,17 +142,7 @@ ApplyWishes takeWishes(bus::Reader& reader) {
     reader.array("{sv}", [&] {
         reader.entry("sv", [&] {
             const std::string name = reader.text();
-            reader.variant([&](const std::string& type) {
-                if (name == "force") {
-                    wishes.force = takeFlag(reader, type, name);
-                } else if (name == "plain") {
-                    wishes.plain = takeFlag(reader, type, name);
-                } else if (name == "verify-within") {
-                    wishes.verifySeconds = takeSeconds(reader, type, name);
-                } else {
-                    throw bus::Error(bus::kInvalidArgs, "there is no option " + inQuotes(name));
-                }
-            });
+            reader.variant([&](const std::string& type) { takeWish(reader, type, name, wishes); });
         });
     });
     return wishes;

@@ -9,6 +9,12 @@
 
 namespace cvagent::service {
 
+/// A day; see undo::kLongestWindow.
+inline constexpr double kLongestConfirmation = 86'400;
+
+/// Throws bus::Error for what is no number of seconds from 0 to that.
+void judgeSeconds(double seconds, const std::string& name, double longest);
+
 /// The argument a(ssv): node, property and value as in a file of changes, and within the same bounds. Throws
 /// bus::Error.
 std::vector<change::NamedChange> takeChanges(bus::Reader& reader);
@@ -17,6 +23,8 @@ struct ApplyWishes {
     bool force = false;
     bool plain = false;
     std::optional<double> verifySeconds;
+    std::optional<double> confirmSeconds;  ///< nothing: nobody waits for a confirmation
+    bool unguarded = false;                ///< made although it cannot be taken back
 };
 /// The argument a{sv}. Throws bus::Error for one that nobody knows.
 ApplyWishes takeWishes(bus::Reader& reader);

@@ -92,12 +92,19 @@ void Changes::flush() {
     tellEvents();
 }
 
+void Changes::send(const bus::Message& signal) const {
+    connection_.send(signal);
+    if (sent_) {
+        sent_();
+    }
+}
+
 void Changes::tellEvents() {
     for (const Event& event : std::exchange(events_, {})) {
         const bus::Message signal = connection_.newSignal(kRootObject, kAgentInterface, "Event");
         bus::Writer writer(signal);
         putEvent(writer, event);
-        connection_.send(signal);
+        send(signal);
     }
 }
 
@@ -107,7 +114,7 @@ void Changes::tellAdded(const NodeView& node) const {
     bus::Writer writer(signal);
     writer.putPath(node.object);
     putInterfaces(writer, *model_, node, false);
-    connection_.send(signal);
+    send(signal);
 }
 
 void Changes::tellRemoved(const Gone& gone) const {
@@ -115,7 +122,7 @@ void Changes::tellRemoved(const Gone& gone) const {
         connection_.newSignal(kRootObject, "org.freedesktop.DBus.ObjectManager", "InterfacesRemoved");
     bus::Writer writer(signal);
     writer.putPath(gone.object).put(std::vector<std::string>{kNodeInterface, gone.interface});
-    connection_.send(signal);
+    send(signal);
 }
 
 void Changes::tellChanged(const NodeView& node, const Changed& changed) const {
@@ -140,7 +147,7 @@ void Changes::tellNodeProperties(const NodeView& node, const std::set<std::strin
         }
     });
     writer.put(std::vector<std::string>());
-    connection_.send(signal);
+    send(signal);
 }
 
 void Changes::tellOwnProperties(const NodeView& node, const std::set<std::string>& names) const {
@@ -162,7 +169,7 @@ void Changes::tellOwnProperties(const NodeView& node, const std::set<std::string
         }
     });
     writer.put(untold);
-    connection_.send(signal);
+    send(signal);
 }
 
 }  // namespace cvagent::service

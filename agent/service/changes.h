@@ -2,9 +2,11 @@
 
 #include <cstdint>
 #include <deque>
+#include <functional>
 #include <map>
 #include <set>
 #include <string>
+#include <utility>
 
 #include "agent/bus/connection.h"
 #include "agent/core/event.h"
@@ -21,6 +23,8 @@ public:
     /// Both outlive it.
     Changes(bus::Connection& connection, Loop& loop) : connection_(connection), loop_(loop) {}
 
+    /// @param sent called for each signal
+    void whenSent(std::function<void()> sent) { sent_ = std::move(sent); }
     /// @param model outlives it; it is the one that tells the changes
     void begin(const Model& model) { model_ = &model; }
 
@@ -44,6 +48,7 @@ private:
     };
 
     void arm();
+    void send(const bus::Message& signal) const;
     void tellEvents();
     void tellAdded(const NodeView& node) const;
     void tellRemoved(const Gone& gone) const;
@@ -53,6 +58,7 @@ private:
 
     bus::Connection& connection_;
     Loop& loop_;
+    std::function<void()> sent_;
     const Model* model_ = nullptr;  // null until the service is ready: nobody knows anything yet
     std::set<std::uint32_t> added_;
     std::map<std::string, std::string> gone_;  // objects that were told, and the interfaces of their classes

@@ -23,12 +23,13 @@ struct Rule {
     bool everybody;
     const char* action;  ///< what polkit is asked; null: it is not
 };
-constexpr std::array<Rule, 5> kRules = {{
+constexpr std::array<Rule, 6> kRules = {{
     {true, nullptr},
     {false, nullptr},
     {false, "com.vantrel.corvista1.write"},
     {false, "com.vantrel.corvista1.power"},
     {false, "com.vantrel.corvista1.plan"},
+    {false, "com.vantrel.corvista1.confirm"},
 }};
 
 constexpr const char* kPolkit = "org.freedesktop.PolicyKit1";

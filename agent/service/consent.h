@@ -17,6 +17,7 @@ enum class Audience {
     writers,    ///< whom polkit lets change the host; without polkit root and the trusted group
     stoppers,   ///< the same for what stops the host
     planners,   ///< the same for who lets the host try a change out
+    keepers,    ///< the same for who keeps changes that were made, or takes them back
 };
 
 /// The one place where is judged who may. Root may everything, and so may the user the service runs as. The

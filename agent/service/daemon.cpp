@@ -115,6 +115,7 @@ public:
         Service service(loop_, connection_, agent, config, rehearsalSettings(agent, options_, manager_),
                         Past::read, past.last());
         service_ = &service;
+        service.whenBusIsFull([this] { leaveFullBus(); });
         sd_bus_attach_event(connection_.get(), loop_.get(), SD_EVENT_PRIORITY_NORMAL);
         signals_ = loop_.whenReadable(stop_.descriptor(), [this] { takeSignals(); });
         service.begin(linksBefore);
@@ -132,6 +133,7 @@ public:
         leaveBus();
     }
     bool busLost() const { return busLost_; }
+    bool busFull() const { return busFull_; }
     int endedBy() const { return signal_; }
     void giveSignalsBack() { stop_.release(); }
 
@@ -152,11 +154,22 @@ private:
                 reload();
             } else if (signal_ == 0) {
                 signal_ = signal;
-                manager_.stopping();
-                service_->windDown();
-                endWhenWritten(std::chrono::steady_clock::now() + kWriteAtStop);
+                stop();
             }
         }
+    }
+
+    void stop() {
+        manager_.stopping();
+        service_->windDown();
+        endWhenWritten(std::chrono::steady_clock::now() + kWriteAtStop);
+    }
+
+    /// Somebody hears the signals and does not read them. Who connects anew may leave as much again, and by
+    /// then the bus itself gives such a reader no more.
+    void leaveFullBus() {
+        busFull_ = true;
+        stop();
     }
 
     void endWhenWritten(std::chrono::steady_clock::time_point latest) {
@@ -221,6 +234,7 @@ private:
     bus::Slot lost_;
     int signal_ = 0;
     bool busLost_ = false;
+    bool busFull_ = false;
 };
 
 void refuseASecond(const bus::Connection& connection) {
@@ -254,6 +268,11 @@ ExitStatus serve(Options& options, const Manager& manager, bus::Connection& conn
     showErrors(process.errors());
     if (daemon.busLost()) {
         throw Problem(Problem::failed, "the bus is gone");
+    }
+    if (daemon.busFull()) {
+        throw Problem(Problem::failed,
+                      "somebody does not read what the bus keeps for him, and it would soon listen no more: "
+                      "start the service again");
     }
     return ExitStatus::done;
 }

@@ -4,6 +4,7 @@
 #include <sys/eventfd.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <ctime>
 #include <system_error>
@@ -92,11 +93,15 @@ Loop::Source Loop::made(sd_event_source* source, const std::shared_ptr<Registere
 }
 
 Loop::Source Loop::after(Duration time, Work work) {
+    constexpr Duration kLeast{1};  // of none the library makes a quarter of a second
+    constexpr Duration kMost = std::chrono::milliseconds(250);
+    constexpr int kPart = 8;
     const auto registered = std::make_shared<Registered>(Registered{this, std::move(work)});
+    const Duration late = std::clamp(time / kPart, kLeast, kMost);
     sd_event_source* source = nullptr;
-    checkLoop(sd_event_add_time_relative(get(), &source, CLOCK_MONOTONIC,
-                                         static_cast<std::uint64_t>(time.count()), 0, Registered::due,
-                                         registered.get()));
+    checkLoop(sd_event_add_time_relative(
+        get(), &source, CLOCK_MONOTONIC, static_cast<std::uint64_t>(time.count()),
+        static_cast<std::uint64_t>(late.count()), Registered::due, registered.get()));
     return made(source, registered);
 }
 

@@ -82,7 +82,7 @@ public:
     /// What other threads hand their work to.
     const std::shared_ptr<Mailbox>& mailbox() const { return mailbox_; }
 
-    /// Once, after that time.
+    /// Once, after that time; it may be an eighth of it late, a quarter of a second at most.
     [[nodiscard]] Source after(Duration time, Work work);
     /// Whenever the descriptor can be read.
     [[nodiscard]] Source whenReadable(int descriptor, Work work);

@@ -24,6 +24,13 @@ bool isOlder(const Reading& one, const Reading& other) {
     return one.asOf && other.asOf && *one.asOf < *other.asOf;
 }
 
+/// What is known, in place of an older reading. That the host has told nothing in time holds for it, too.
+Reading keptBeside(const Reading& known, const Reading& older) {
+    Reading kept = known;
+    kept.stale = kept.stale || older.stale;
+    return kept;
+}
+
 /// The readings of a look, but those that a call has brought since as they were; where it was at some
 /// properties, the others as they were, too.
 std::vector<Reading> merged(const NodeView& look, const std::vector<Reading>& before) {
@@ -31,7 +38,7 @@ std::vector<Reading> merged(const NodeView& look, const std::vector<Reading>& be
     for (Reading& reading : all) {
         if (const Reading* known = findReading(before, reading.id);
             known != nullptr && isOlder(reading, *known)) {
-            reading = *known;
+            reading = keptBeside(*known, reading);
         }
     }
     if (!look.asked.empty()) {
@@ -148,6 +155,7 @@ void Model::takeReading(NodeView& view, const Reading& reading) {
         return;  // what a look does not show is nobody's to see here
     }
     if (isOlder(reading, *place)) {
+        *place = keptBeside(*place, reading);
         return;
     }
     const bool same = tellsTheSame(*place, reading);

@@ -19,6 +19,7 @@ constexpr Workers::Limits kWriters{1, 16, 64};
 // A plan is a walk over the host; and each of these may hold a long list of changes.
 constexpr Workers::Limits kPlanners{1, 16, 64};
 constexpr Workers::Limits kLookups{1, 8, 32};
+constexpr Workers::Limits kConfirmers{1, 8, 32};
 constexpr std::chrono::seconds kBusTime{10};
 
 bus::Message busCall(const bus::Connection& connection, const std::string& member) {
@@ -56,27 +57,18 @@ Service::Service(Loop& loop, bus::Connection& connection, Agent& agent, const Co
                   mailbox->post(
                       [this, held = std::make_shared<Look>(std::move(look))] { take(std::move(*held)); });
               }),
-      turns_(connection, loop),
       unread_(connection, loop),
+      turns_(connection, loop, unread_),
       readers_(kReaders),
       writers_(kWriters),
       planners_(kPlanners),
       lookups_(kLookups),
-      parts_{connection,
-             agent,
-             model_,
-             callers_,
-             consent_,
-             turns_,
-             unread_,
-             readers_,
-             writers_,
-             planners_,
-             lookups_,
-             loop.mailbox(),
-             std::move(rehearsal),
+      confirmers_(kConfirmers),
+      parts_{connection,     agent,    model_,    callers_, consent_,    turns_,         unread_,
+             readers_,       writers_, planners_, lookups_, confirmers_, loop.mailbox(), std::move(rehearsal),
              std::move(past)},
       objects_(parts_, standing_) {
+    changes_.whenSent([this] { unread_.signalled(); });
     parts_.rehearsal.goesOn = [this] { return !ends_; };
     standing_.version = CORVISTA_VERSION;
     standing_.lastEvent = lastEvent;
@@ -87,7 +79,7 @@ Service::Service(Loop& loop, bus::Connection& connection, Agent& agent, const Co
 /// mailbox takes the calls that they let go of until the last has ended.
 Service::~Service() {
     windDown();
-    for (Workers* workers : {&lookups_, &planners_, &readers_, &writers_}) {
+    for (Workers* workers : {&lookups_, &planners_, &readers_, &confirmers_, &writers_}) {
         workers->end();
     }
     loop_.mailbox()->close();
@@ -177,6 +169,7 @@ void Service::windDown() {
     readers_.stop();
     planners_.stop();
     lookups_.stop();
+    confirmers_.stop();
 }
 
 }  // namespace cvagent::service

@@ -33,6 +33,8 @@ public:
     /// @param linksBefore those that there were ahead of the agent's start
     void begin(const LinkIndices& linksBefore);
     void configure(const Config& config);
+    /// @param end called when readers have left so much unread that the bus is about to listen no more
+    void whenBusIsFull(std::function<void()> end) { unread_.whenFull(std::move(end)); }
     /// No further call is answered but that it is over; what is under way comes to its end.
     void windDown();
     /// Whether a write waits or is at work.
@@ -57,13 +59,14 @@ private:
     Callers callers_;
     Consent consent_;
     Looker looker_;
-    Turns turns_;
     Unread unread_;
+    Turns turns_;
     Workers readers_;
     std::atomic<bool> ends_ = false;  // read by those below
     Workers writers_;
     Workers planners_;
     Workers lookups_;
+    Workers confirmers_;
     Parts parts_;
     Objects objects_;
     std::uint64_t looks_ = 0;

@@ -139,8 +139,11 @@ void getAllOfClass(const CallPointer& call, std::uint32_t id) {
 }  // namespace
 
 void introspectObject(const CallPointer& call, const Place& place) {
-    const std::string text = introspect(call->parts().model, place.object, place.node);
-    call->answer([&](bus::Writer& writer) { writer.put(text); });
+    call->inTurn([call, object = place.object](const Caller& /*caller*/) {
+        const Model& model = call->parts().model;
+        const std::string text = introspect(model, object, model.byObject(object));
+        call->answer([&](bus::Writer& writer) { writer.put(text); });
+    });
 }
 
 void managedObjects(const CallPointer& call, const Place& /*place*/) {

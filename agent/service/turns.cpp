@@ -26,7 +26,7 @@ bool Turns::submit(std::uint32_t user, Work work) {
 /// One at a time: what is asked meanwhile is read only when nothing waits to be sent.
 void Turns::proceed() {
     timer_.reset();
-    if (connection_.unsent() == 0) {
+    if (connection_.unsent() == 0 && unread_.isKnown()) {
         waiting_.takeNext()();
     }
     if (waiting_.size() > 0) {

@@ -6,6 +6,7 @@
 #include "agent/bus/connection.h"
 #include "agent/service/loop.h"
 #include "agent/service/turn_queue.h"
+#include "agent/service/unread.h"
 
 namespace cvagent::service {
 
@@ -15,7 +16,8 @@ class Turns {
 public:
     using Work = std::function<void()>;
 
-    Turns(const bus::Connection& connection, Loop& loop) : connection_(connection), loop_(loop) {}
+    Turns(const bus::Connection& connection, Loop& loop, const Unread& unread)
+        : connection_(connection), loop_(loop), unread_(unread) {}
 
     /// Does it now or later, on the loop's thread. @return whether there is room for it
     bool submit(std::uint32_t user, Work work);
@@ -25,6 +27,7 @@ private:
 
     const bus::Connection& connection_;
     Loop& loop_;
+    const Unread& unread_;
     Loop::Source timer_;
     TurnQueue<Work> waiting_;
 };

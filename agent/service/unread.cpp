@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <array>
 #include <chrono>
-#include <iterator>
+#include <limits>
 
 #include "agent/bus/reader.h"
 #include "agent/bus/writer.h"
@@ -13,17 +13,14 @@ namespace cvagent::service {
 
 namespace {
 
-constexpr unsigned int kWeightPerUnreadLook = 64;
+constexpr unsigned int kWeightPerUnreadLook = 64;     // in small answers
+constexpr unsigned int kWeightOfLarge = 16;           // it can be of some megabytes
 constexpr unsigned int kRefusalsBeforeSilence = 100;  // they are not read either
-constexpr std::size_t kMostRecentCallers = 512;
+constexpr std::size_t kMostReaders = 2048;            // as many as a system's bus has connections
+constexpr std::uint64_t kNoLimit = std::numeric_limits<std::uint64_t>::max();
+constexpr std::uint32_t kNobody = 0xFFFFFFFF;  // no user's number: who has asked for nothing large
 constexpr std::chrono::seconds kNextUnreadLook{1};
 constexpr std::chrono::seconds kFiguresPatience{10};
-
-struct UnreadLimit {
-    std::uint64_t ofAll;  ///< from so many bytes that wait for all readers on,
-    std::uint64_t ofOne;  ///< so many at most may wait for one
-};
-constexpr UnreadLimit kUnreadLimits[] = {{64U << 20U, 0}, {32U << 20U, 64U << 10U}, {8U << 20U, 1U << 20U}};
 
 /// Whether an answer means that the bus never tells.
 bool isRefusal(const bus::Message& answer) {
@@ -53,7 +50,22 @@ std::optional<std::uint64_t> figureIn(const bus::Message& answer, const std::str
 
 }  // namespace
 
-Unread::Answer Unread::answerFor(const std::string& caller, unsigned int weight) {
+Unread::Limits Unread::standardLimits() {
+    constexpr std::uint64_t kKibi = 1024;
+    constexpr std::uint64_t kMebi = kKibi * kKibi;
+    return {{{64 * kMebi, 0, kMebi}, {32 * kMebi, 64 * kKibi, 16 * kMebi}, {8 * kMebi, kMebi, kNoLimit}},
+            96 * kMebi};
+}
+
+Unread::Answer Unread::answerFor(const std::string& caller) {
+    return answer(caller, std::nullopt, 1);
+}
+
+Unread::Answer Unread::largeAnswerFor(const Caller& caller) {
+    return answer(caller.name, caller.user, kWeightOfLarge);
+}
+
+Unread::Answer Unread::answer(const std::string& caller, const User& user, unsigned int weight) {
     if (untold_) {
         return Answer::whole;
     }
@@ -62,14 +74,24 @@ Unread::Answer Unread::answerFor(const std::string& caller, unsigned int weight)
         silent->second -= refused ? 1 : 0;
         return refused ? Answer::refusal : Answer::none;
     }
-    if (recent_.size() < kMostRecentCallers) {
-        recent_.insert(caller);
+    if (readers_.size() < kMostReaders || readers_.contains(caller)) {
+        User& known = readers_[caller];
+        known = user ? user : known;
     }
+    const bool isRefused = user && silentUsers_.contains(*user);
+    weigh(isRefused ? 1 : weight);
+    return isRefused ? Answer::refusal : Answer::whole;
+}
+
+bool Unread::isKnown() const {
+    return untold_ || weight_ < kWeightPerUnreadLook;
+}
+
+void Unread::weigh(unsigned int weight) {
     weight_ += weight;
-    if (weight_ >= kWeightPerUnreadLook) {
+    if (weight_ >= kWeightPerUnreadLook && !untold_) {
         look();
     }
-    return Answer::whole;
 }
 
 void Unread::look() {
@@ -91,36 +113,56 @@ void Unread::ask(const std::string& name, const std::string& figure, const Told&
             const auto found = figureIn(answer, figure);
             untold_ = untold_ || isRefusal(answer) || (!answer.isError() && !found);
             told(found);
+            weigh(0);  // what was sent meanwhile
         }));
 }
 
 void Unread::takeOwn(std::optional<std::uint64_t> bytes) {
     nextLook_.reset();
-    const auto* const limit =
-        std::ranges::find_if(kUnreadLimits, [bytes](const UnreadLimit& each) { return bytes >= each.ofAll; });
-    if (untold_ || (bytes && limit == std::end(kUnreadLimits))) {
-        recent_.clear();
+    const auto limit =
+        std::ranges::find_if(limits_.rows, [bytes](const Limit& each) { return bytes >= each.ofAll; });
+    if (untold_ || (bytes && limit == limits_.rows.end())) {
+        readers_.clear();
         silent_.clear();
+        silentUsers_.clear();
         return;
     }
     nextLook_ = loop_.after(kNextUnreadLook, [this] { look(); });
     if (!bytes) {
         return;  // it was not told in time
     }
-    for (const auto& [name, refusals] : silent_) {
-        recent_.insert(name);
+    if (*bytes >= limits_.full && full_) {
+        std::exchange(full_, nullptr)();
     }
-    for (const std::string& name : std::exchange(recent_, {})) {
-        ask(name, "OutgoingBytes",
-            [this, name, most = limit->ofOne](auto unread) { judge(name, unread > most); });
+    for (const auto& [name, refusals] : silent_) {
+        readers_.try_emplace(name);
+    }
+    unreadOf_.clear();
+    for (const auto& [name, user] : std::exchange(readers_, {})) {
+        ask(name, "OutgoingBytes", [this, reader = name, whose = user, limit](auto unread) {
+            judge(reader, whose, unread.value_or(0), *limit);
+        });
     }
 }
 
-void Unread::judge(const std::string& name, bool readsNothing) {
-    if (!readsNothing) {
+void Unread::judge(const std::string& name, const User& user, std::uint64_t unread, const Limit& limit) {
+    if (unread > 0) {
+        readers_.try_emplace(name, user);
+        unreadOf_[user.value_or(kNobody)] += unread;
+    }
+    if (unread <= limit.ofOne) {
         silent_.erase(name);
     } else if (silent_.emplace(name, kRefusalsBeforeSilence).second && silent_.size() == 1) {
         log(Priority::warning, name + " does not read what it is sent and gets no answers until it does");
+    }
+    if (questions_ == 0) {
+        std::set<std::uint32_t> users;
+        for (const auto& [whose, bytes] : unreadOf_) {
+            if (whose != kNobody && bytes > limit.ofUser) {
+                users.insert(whose);
+            }
+        }
+        silentUsers_ = std::move(users);
     }
 }
 

@@ -15,8 +15,10 @@ std::uint64_t bootMilliseconds() {
            static_cast<std::uint64_t>(now.tv_nsec) / kMillion;
 }
 
+/// In a container a file may lie over the kernel's; a service with a /proc of its own does not have that.
 std::string bootId() {
-    return hosttools::readFirstLine("/proc/sys/kernel/random/boot_id");
+    const std::string ofFirst = hosttools::readFirstLine("/proc/1/root/proc/sys/kernel/random/boot_id");
+    return ofFirst.empty() ? hosttools::readFirstLine("/proc/sys/kernel/random/boot_id") : ofFirst;
 }
 
 }  // namespace cvagent::undo

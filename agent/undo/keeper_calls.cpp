@@ -37,6 +37,9 @@ struct KnownCall {
 constexpr std::array kKnownCalls{
     KnownCall{"netplan generate", false, true},
     KnownCall{"networkctl reload", false, false},
+    KnownCall{"systemctl reset-failed systemd-resolved", false, false},
+    KnownCall{"systemctl try-reload-or-restart systemd-resolved", false, false},
+    KnownCall{"resolvconf -u", false, false},
     KnownCall{"nmcli connection reload", false, false},
     KnownCall{"nmcli device reapply", true, false},
     KnownCall{"wicked ifreload", true, false},

@@ -12,7 +12,9 @@
 #include <cerrno>
 #include <set>
 
+#include "agent/undo/message_parts.h"
 #include "agent/undo/network_requests.h"
+#include "agent/undo/route_makers.h"
 
 namespace cvagent::undo {
 
@@ -44,22 +46,6 @@ std::string asRemoval(std::string request, unsigned type) {
 std::string bodyOf(const std::string& request) {
     return request.substr(NLMSG_HDRLEN);
 }
-
-/// Attributes behind a fixed part of one kind.
-template <class Fixed>
-class Parts {
-public:
-    explicit Parts(const NetworkMessage& message) : body_(message.body) {}
-    Fixed fixed() const { return readPlain<Fixed>(body_).value_or(Fixed{}); }
-    std::string_view operator[](unsigned type) const {
-        return attributeOf(body_, NLMSG_ALIGN(sizeof(Fixed)), type);
-    }
-    unsigned number(unsigned type) const { return readPlain<std::uint32_t>((*this)[type]).value_or(0); }
-    bool has(unsigned type) const { return (*this)[type].data() != nullptr; }
-
-private:
-    std::string_view body_;
-};
 
 std::string ipText(int family, std::string_view data) {
     std::array<char, INET6_ADDRSTRLEN> text{};
@@ -177,11 +163,6 @@ unsigned tableOf(const Parts<rtmsg>& parts) {
     return parts.has(RTA_TABLE) ? parts.number(RTA_TABLE) : parts.fixed().rtm_table;
 }
 
-bool isOfOthers(const NetworkMessage& route) {
-    static const std::set<unsigned> kOthers{RTPROT_KERNEL, RTPROT_REDIRECT, RTPROT_RA};
-    return kOthers.contains(Parts<rtmsg>(route).fixed().rtm_protocol) || isOfRoutingProgram(route);
-}
-
 std::string destinationOf(const Parts<rtmsg>& parts) {
     const rtmsg fixed = parts.fixed();
     const std::string network =
@@ -191,9 +172,10 @@ std::string destinationOf(const Parts<rtmsg>& parts) {
 
 std::vector<Entry> routeEntries(const NetworkState& state, const std::vector<unsigned>& links) {
     std::vector<Entry> entries;
+    const auto ofSomebody = subnetsOfSomebody(state.network);
     for (const NetworkMessage& message : state.network.routes) {
         const Parts<rtmsg> parts(message);
-        if (isOfOthers(message) || !isKnown(links, parts.number(RTA_OIF))) {
+        if (isOfOthers(message, ofSomebody) || !isKnown(links, parts.number(RTA_OIF))) {
             continue;
         }
         const bool leadsOn =
@@ -322,13 +304,6 @@ std::string neighbourText(const NetworkMessage& message, const NetworkMessages& 
 
 }  // namespace
 
-bool isOfRoutingProgram(const NetworkMessage& route) {
-    static const std::set<unsigned> kPrograms{RTPROT_GATED, RTPROT_MRT,   RTPROT_ZEBRA, RTPROT_BIRD,
-                                              RTPROT_XORP,  RTPROT_BABEL, RTPROT_BGP,   RTPROT_ISIS,
-                                              RTPROT_OSPF,  RTPROT_RIP,   RTPROT_EIGRP};
-    return kPrograms.contains(Parts<rtmsg>(route).fixed().rtm_protocol);
-}
-
 const std::vector<EntryKind>& entryKinds() {
     static const std::vector<EntryKind> kKinds{
         {false, addressEntries, addOneAddress, removeOneAddress, addressText},
@@ -342,8 +317,9 @@ const std::vector<EntryKind>& entryKinds() {
 
 std::vector<std::string> routesOfOthers(const NetworkMessages& network) {
     std::vector<std::string> texts;
+    const auto ofSomebody = subnetsOfSomebody(network);
     for (const NetworkMessage& route : network.routes) {
-        if (isOfOthers(route)) {
+        if (isOfOthers(route, ofSomebody)) {
             texts.push_back(routeText(route, network));
         }
     }

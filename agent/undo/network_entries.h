@@ -32,9 +32,6 @@ struct EntryKind {
 /// In the order in which they are added; they are taken away the other way round.
 const std::vector<EntryKind>& entryKinds();
 
-/// There can be a million of them, and the program has its own memory of them.
-bool isOfRoutingProgram(const NetworkMessage& route);
-
 /// The routes that the kernel, a router or a routing program makes, as texts, sorted.
 std::vector<std::string> routesOfOthers(const NetworkMessages& network);
 

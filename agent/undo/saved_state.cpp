@@ -10,7 +10,7 @@
 
 #include "agent/undo/boot_clock.h"
 #include "agent/undo/file_restore.h"
-#include "agent/undo/network_entries.h"
+#include "agent/undo/route_makers.h"
 
 namespace cvagent::undo {
 

@@ -26,9 +26,8 @@ void install(FakeHost& host, const std::string& script) {
 
 HOST_TEST(EventProgram, GetsTheEventAsJson) {
     install(host, "pwd > /var/where\ncat > /var/event\necho printed\n");
-    const Finished run =
-        CvagentRun(host).telling("alert churn")({"watch", "--for", "0.5", "--exec", kProgram});
-    EXPECT_EQ(run.status, 0);
+    const RunningProgram watch = CvagentRun(host).telling("alert churn").start({"watch", "--exec", kProgram});
+    EXPECT_TRUE(eventually([&] { return watch.err().find("printed\n") != std::string::npos; }));
     EXPECT_EQ(host.read("/var/where"), "/\n");
     const Json event = Json::parse(*host.read("/var/event"));
     EXPECT_EQ(event["event"], "alert");
@@ -36,8 +35,7 @@ HOST_TEST(EventProgram, GetsTheEventAsJson) {
     EXPECT_EQ(event["class"], "network-port");
     EXPECT_EQ(event["property"].dump(), R"({"id":123,"name":"LinkState","before":"12","after":"12"})");
     EXPECT_GT(event["number"], 0);
-    EXPECT_THAT(run.err, HasSubstr("printed\n"));
-    EXPECT_THAT(run.out, Not(HasSubstr("printed")));
+    EXPECT_THAT(watch.out(), Not(HasSubstr("printed")));
 }
 
 HOST_TEST(EventProgram, HasDefaultSignalsAndOnlyTheStandardDescriptors) {

@@ -5,6 +5,7 @@
 
 #include "agent/change/standing.h"
 #include "tests/support/fake_host.h"
+#include "tests/support/waiting.h"
 
 namespace {
 
@@ -31,6 +32,9 @@ protected:
         ip(host, "link add eth1 type veth peer name sw1");
         for (const char* link : {"eth0", "sw0", "eth1", "sw1"}) {
             ip(host, std::string("link set ") + link + " up");
+        }
+        for (const char* link : {"eth0", "sw0", "eth1", "sw1"}) {
+            ASSERT_TRUE(carrierComes(link));
         }
         host.run({"sh", "-c", "echo 0 > /proc/sys/net/ipv6/conf/eth0/dad_transmits"});
         hardware_ = host.run({"cat", "/sys/class/net/eth0/address"}).out;

@@ -131,7 +131,7 @@ protected:
     }
 
     const std::shared_ptr<hardware::Asking> asking_ =
-        std::make_shared<hardware::Asking>(hardware::Host("/nowhere"), std::chrono::milliseconds(30));
+        std::make_shared<hardware::Asking>(hardware::Host("/nowhere"), std::chrono::milliseconds(250));
     HardwareNode node_{{5, 1, {1}, 1}, Device::kSource, "eth0", asking_};
 };
 

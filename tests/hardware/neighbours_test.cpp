@@ -3,6 +3,7 @@
 #include <gmock/gmock.h>
 
 #include "tests/hardware/storage_host.h"
+#include "tests/support/waiting.h"
 
 namespace {
 
@@ -71,6 +72,7 @@ TEST(LinkNeighbours, ALldpdThatHangsCostsNothingElse) {
     sourceOf(Class::link).describe(patient, found);
     EXPECT_TRUE(found.facts.isUnanswered(31024));
     EXPECT_EQ(factsOf(patient, Class::link, "eth0").at("MTU"), "1500");
+    ASSERT_TRUE(eventually([&host] { return !host.devices->asked().empty(); }));
     EXPECT_EQ(host.devices->asked().size(), 1U);
     gate->open();
 }

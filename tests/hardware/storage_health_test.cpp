@@ -3,6 +3,7 @@
 
 #include "plugins/hardware/storage/health.h"
 #include "tests/hardware/storage_host.h"
+#include "tests/support/waiting.h"
 
 namespace {
 
@@ -375,6 +376,7 @@ TEST(DriveHealth, ADriveThatHangsCostsOnlyItsHealthAndIsAskedOnce) {
         EXPECT_EQ(facts.at("Size"), "1048576");
         EXPECT_FALSE(facts.contains("PowerState"));
     }
+    ASSERT_TRUE(eventually([&host] { return !host.devices->asked().empty(); }));
     EXPECT_EQ(host.devices->asked().size(), 1U);
     gate->open();
 }

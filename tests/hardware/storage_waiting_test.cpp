@@ -91,7 +91,7 @@ TEST_F(WaitedFor, AFileSystemOfADriveThatHangsIsNotGone) {
         }
         return hardware::DeviceAccess::Contents{{"TYPE", "xfs"}, {"USAGE", "filesystem"}};
     };
-    const hardware::Host patient = host_.asRoot(std::chrono::milliseconds(30));
+    const hardware::Host patient = host_.asRoot(std::chrono::milliseconds(500));
     EXPECT_THAT(hardware::listFileSystems(patient), ElementsAre("nvme0n1"));
     hangs = true;
     EXPECT_THAT(hardware::listFileSystems(patient), ElementsAre("nvme0n1"));

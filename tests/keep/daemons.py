@@ -15,8 +15,8 @@ import root  # noqa: E402
 from host import Host  # noqa: E402
 from tap import CHECKS, Report, check, expect, expect_equal  # noqa: E402
 
-PACKAGES = ["dbus", "ifupdown", "iproute2", "libblkid1", "libsqlite3-0", "libstdc++6", "libsystemd0", "netplan.io", "systemd",
-            "systemd-resolved", "systemd-sysv"]
+PACKAGES = ["dbus", "ifupdown", "iproute2", "libblkid1", "libpam-systemd", "libsqlite3-0", "libstdc++6", "libsystemd0", "netplan.io",
+            "network-manager", "systemd", "systemd-resolved", "systemd-sysv"]
 CLOCK = 25  # CAP_SYS_TIME
 AGENT = "/opt/cv/agent/cvagent"
 NODE = "ip-config:eth0"
@@ -24,6 +24,11 @@ STANZA = "# the wire\nauto eth0\niface eth0 inet static\n\taddress 192.0.2.10/24
 NETWORK = "[Match]\nName=eth*\n[Network]\nAddress=192.0.2.10/24\nGateway=192.0.2.1\n"
 NETPLAN = ("network:\n  version: 2\n  ethernets:\n    eth0:\n      addresses: [192.0.2.10/24]  # ours\n"
            "      routes:\n        - to: default\n          via: 192.0.2.1\n")
+PROFILE_PATH = "/etc/NetworkManager/system-connections/the lan.nmconnection"
+PROFILE = ("# by hand\n[connection]\nid=the lan\nuuid=7b3f0c2e-1111-4222-8333-000000000001\ntype=ethernet\ninterface-name=eth0\n\n"
+           "[ipv4]\nmethod=manual\naddress1=192.0.2.10/24,192.0.2.1\naddress2=198.51.100.5/24\ndns=192.0.2.53;\n"
+           "route1=203.0.113.0/24,192.0.2.9\n\n[ipv6]\nmethod=disabled\n")
+MANAGER = "[main]\nplugins=keyfile\nno-auto-default=*\n[keyfile]\nunmanaged-devices=interface-name:cable\n"
 
 
 class Context:
@@ -37,14 +42,14 @@ class Context:
             shutil.copy(f"{build}/agent/{program}", f"{place}/agent")
         shutil.copytree(f"{build}/lib", f"{place}/lib", symlinks=True, ignore=shutil.ignore_patterns("*.a"))
         shutil.copytree(f"{build}/hosttools", f"{place}/hosttools", symlinks=True, ignore=shutil.ignore_patterns("*.a", "CMake*"))
-        self.host.sh("systemctl stop systemd-networkd networking 2>/dev/null; "
+        self.host.sh("systemctl stop systemd-networkd networking NetworkManager 2>/dev/null; "
                      "ip link add eth0 type veth peer name cable; ip link set cable up")
 
-    def write(self, path, text):
+    def write(self, path, text, mode=0o644):
         self.host.sh(f"mkdir -p {os.path.dirname(path)}")
         with open(f"/proc/{self.host.init}/root{path}", "w", encoding="utf-8") as file:
             file.write(text)
-        os.chmod(f"/proc/{self.host.init}/root{path}", 0o644)
+        os.chmod(f"/proc/{self.host.init}/root{path}", mode)
 
     def read(self, path):
         with open(f"/proc/{self.host.init}/root{path}", encoding="utf-8") as file:
@@ -144,6 +149,44 @@ def netplan(context):
     expect_equal("the file", context.read("/etc/netplan/50-host.yaml"), NETPLAN)
 
 
+def network_of(context):
+    return context.host.sh("ip -4 -o address show dev eth0; ip route")
+
+
+@check("NetworkManager: a change is in its profile and in force, and nothing else is; taken back, the file is as it was, byte for byte")
+def network_manager(context):
+    context.write("/etc/NetworkManager/NetworkManager.conf", MANAGER)
+    context.write(PROFILE_PATH, PROFILE, 0o600)
+    context.host.sh("systemctl start NetworkManager")
+    context.host.wait_for("ip route | grep -q 203.0.113.0/24 && nmcli -g GENERAL.STATE device show eth0 | grep -q 100")
+    expect_equal("who keeps it", context.keeper()["keeper"], "NetworkManager")
+    before = network_of(context)
+    plan = context.host.sh(f"{AGENT} plan {NODE} IPv4Address 192.0.2.77")
+    expect("NetworkManager Update2 'the lan': ipv4.addresses '192.0.2.10/24,198.51.100.5/24' -> '192.0.2.77/24,198.51.100.5/24'" in plan,
+           f"the plan does not show it: {plan}")
+    expect_equal("the network after a plan", network_of(context), before)
+    expect_equal("the file after a plan", context.read(PROFILE_PATH), PROFILE)
+    for name, value in (("IPv4Address", "192.0.2.99"), ("IPv4Gateway", "192.0.2.3"), ("SubnetMask", "255.255.255.128")):
+        result = context.host.run(f"{AGENT} set {NODE} {name} {value} --confirm-within 600")
+        expect_equal(f"the status of {name} ({result.stdout}{result.stderr})", result.returncode, 0)
+        result = context.host.run(f"{AGENT} rollback")
+        expect_equal("what the taking back tells", (result.returncode, result.stderr), (0, ""))
+        expect_equal(f"the file after {name}", context.read(PROFILE_PATH), PROFILE)
+        expect_equal(f"the network after {name}", network_of(context), before)
+    for name, value in (("IPv4Address", "192.0.2.77"), ("IPv4Gateway", "192.0.2.3")):
+        context.set(name, value, f"NetworkManager, in {PROFILE_PATH}")
+    after = network_of(context)
+    expect_equal("the network after a change", after, before.replace("192.0.2.10", "192.0.2.77").replace("192.0.2.1 ", "192.0.2.3 "))
+    context.host.sh("systemctl stop NetworkManager; ip address flush dev eth0; systemctl start NetworkManager")
+    context.host.wait_for("ip route | grep -q 203.0.113.0/24 && nmcli -g GENERAL.STATE device show eth0 | grep -q 100")
+    expect_equal("the network after a restart", network_of(context), after)
+    context.set("IPv4Address", "192.0.2.10", "NetworkManager")
+    context.set("IPv4Gateway", "192.0.2.1", "NetworkManager")
+    expect_equal("the network when it is set back", network_of(context), before)
+    for line in PROFILE.split("\n"):
+        expect(line in context.read(PROFILE_PATH) or line.startswith("#"), f"the profile has no more: {line}")
+
+
 @check("two at once: an interface that ifupdown and networkd both have is left alone")
 def two(context):
     context.write("/etc/network/interfaces", STANZA)
@@ -159,9 +202,16 @@ def two(context):
 def evidence_of(host):
     def collect():
         for command in ("ip address show dev eth0; ip route", "networkctl --no-pager status eth0 | head -30",
-                        "journalctl --no-pager -n 20 -o short-monotonic -u systemd-networkd"):
+                        "journalctl --no-pager -n 20 -o short-monotonic -u systemd-networkd -u NetworkManager"):
             yield command, (host.run(command).stdout).splitlines()
     return collect
+
+
+def refuse_with_clock():
+    with open("/proc/self/status", encoding="ascii") as status:
+        rights = int(re.search(r"^CapBnd:\s*(\w+)", status.read(), re.MULTILINE).group(1), 16)
+    if rights >> CLOCK & 1:
+        raise SystemExit("with CAP_SYS_TIME this could set the machine's clock: start it as scripts/keep-test does")
 
 
 def main():
@@ -169,10 +219,7 @@ def main():
     parser.add_argument("build", help="directory of a build of this architecture")
     parser.add_argument("--only", default="", help="run only the checks that begin so")
     options = parser.parse_args()
-    with open("/proc/self/status", encoding="ascii") as status:
-        rights = int(re.search(r"^CapBnd:\s*(\w+)", status.read(), re.MULTILINE).group(1), 16)
-    if rights >> CLOCK & 1:
-        raise SystemExit("with CAP_SYS_TIME this could set the machine's clock: start it as scripts/keep-test does")
+    refuse_with_clock()
     system = root.make("keep", os.popen("dpkg --print-architecture").read().strip(), PACKAGES)
     checks = [row for row in CHECKS["main"] if row[1].__module__ == __name__ and row[0].startswith(options.only)]
     report = Report()
@@ -185,4 +232,5 @@ def main():
     return report.finish(len(checks))
 
 
-sys.exit(main())
+if __name__ == "__main__":
+    sys.exit(main())

@@ -3,7 +3,7 @@
 import json
 import time
 
-from checks_service import UNIT, wait_up
+from checks_service import NAME, UNIT, wait_up
 from tap import check, expect, expect_equal
 
 # Everything that the changes of these checks touch.
@@ -75,7 +75,7 @@ def outlives(context):
     with open(f"/proc/{host.init}/root/root/changes.json", "w", encoding="utf-8") as file:
         json.dump(CHANGES, file)
     before = host.sh(STATE)
-    for mode in ("control-group", "process"):
+    for mode in ("control-group", "process", "mixed"):
         host.sh(f"mkdir -p /run/systemd/system/{UNIT}.d; printf '[Service]\\nKillMode={mode}\\n' "
                 f"> /run/systemd/system/{UNIT}.d/test.conf; systemctl daemon-reload")
         for hurt in HURT:
@@ -97,8 +97,9 @@ def in_time(context):
     host = context.host
     before = host.sh(STATE)
     host.sh(f"systemctl stop {UNIT}")
+    number = make(context, 300)
     begin = time.monotonic()
-    number = make(context, 3)
+    host.sh(f"cvagent confirm {number} --lengthen 3")
     wait_taken_back(context, number, before)
     expect(time.monotonic() - begin >= 3, "it was taken back too early")
     host.sh(f"systemctl start {UNIT}")
@@ -120,6 +121,39 @@ def killed(context):
     expect_equal("what becomes of it", stages(context)[number], "waits for its confirmation")
     host.sh(f"cvagent confirm {number} --lengthen 1")
     wait_taken_back(context, number, before)
+
+
+@check("guard: stopped by a signal beyond the change's time, it takes it back when it goes on")
+def stopped(context):
+    host = context.host
+    before = host.sh(STATE)
+    number = make(context, 300)
+    guard = guard_of(context, number)
+    # Stopped in the middle of a look it has the journal in its hands.
+    host.wait_for(f"kill -STOP {guard}; cvagent confirm {number} --lengthen 0 || {{ kill -CONT {guard}; false; }}")
+    late = host.run(f"cvagent confirm {number}")
+    expect(late.returncode == 1 and "its time is over" in late.stderr, late.stderr)
+    expect("192.0.2.99" in host.sh(STATE), "somebody else has taken it back")
+    host.sh(f"kill -CONT {guard}")
+    wait_taken_back(context, number, before)
+
+
+@check("guard: the service keeps and takes back a change in its sandbox")
+def by_service(context):
+    host = context.host
+    ask = f"busctl --timeout=60 call {NAME} /com/vantrel/Corvista1 {NAME}.Agent"
+    before = host.sh(STATE)
+    number = make(context, 300)
+    changed = host.sh(STATE)
+    host.sh(f"{ask} Lengthen ud {number} 200; {ask} Confirm u {number}")
+    expect_equal("what becomes of it", stages(context)[number], "is kept")
+    expect_equal("the host", host.sh(STATE), changed)
+    expect_equal("the answer", host.sh(f"{ask} Rollback u 0").strip(), f'usas {number} "is taken back" 0')
+    wait_taken_back(context, number, before)
+    host.sh("cvagent apply /root/changes.json --verify-within 0")  # which nobody has to confirm
+    expect_equal("what becomes of it", stages(context)[number + 1], "is kept")
+    host.sh("cvagent rollback")
+    wait_taken_back(context, number + 1, before)
 
 
 @check("guard: what somebody confirms stays, and can be taken back later")
@@ -163,4 +197,4 @@ def plan_after_start(context):
     host = context.host
     plan = json.loads(host.sh("cvagent plan computer OwnerName planned --json"))["plan"]
     expect("planned" in plan["files"][0]["after"]["content"], plan)
-    expect("plan@" in host.sh("journalctl --no-pager -b -o cat _PID=1 | grep 'A change tried out'"), "no unit was started")
+    host.wait_for("journalctl --no-pager -b -o cat _PID=1 | grep 'plan@.*A change tried out'")

@@ -269,11 +269,13 @@ protected:
         host.file("/etc/sysconfig/network/routes", "default\t192.0.2.1\t-\n");
         host.file("/etc/sysconfig/network/config", "NETCONFIG_DNS_POLICY=\"\"\n");
         for (const std::string words :
-             {"link add eth0 type veth peer name sw0", "link set eth0 up", "link set sw0 up",
+             {"link add eth0 type veth peer name sw0", "link set eth0 addrgenmode none",
+              "link set sw0 addrgenmode none", "link set eth0 up", "link set sw0 up",
               "address add 192.0.2.10/24 broadcast + dev eth0", "route add default via 192.0.2.1"}) {
             const Finished done = host.run({"sh", "-c", "ip " + words});
             EXPECT_EQ(done.status, 0) << words << ": " << done.err;
         }
+        ASSERT_TRUE(carrierComes("eth0") && carrierComes("sw0"));
         std::string hardware = host.run({"cat", "/sys/class/net/eth0/address"}).out;
         hardware.pop_back();
         file = "/etc/sysconfig/network/ifcfg-eth-id-" + hardware;

@@ -203,6 +203,32 @@ HOST_TEST_F(ServiceConsent, ToPlansAndChangesIsPolkitsWhereThereIsOne) {
     EXPECT_THAT(polkit.questions[4], testing::StartsWith("com.vantrel.corvista1.power "));
 }
 
+HOST_TEST_F(ServiceConsent, ToKeepingAndTakingBackChangesIsAQuestionOfItsOwn) {
+    Polkit polkit;
+    polkit.yes = true;
+    for (const char* member : {"Confirm", "Rollback"}) {
+        const auto question = [member] {
+            const bus::Connection own(ServiceRun::address());
+            return call::errorOf(own, ServiceRun::kRoot, call::kAgent, member,
+                                 [](bus::Writer& writer) { writer.put(std::uint32_t{7}); });
+        };
+        EXPECT_EQ(call::asUserBeside(kUser, question, [&] { polkit.process(); }),
+                  "com.vantrel.Corvista1.Error.NotFound");
+        EXPECT_THAT(polkit.questions.back(), testing::StartsWith("com.vantrel.corvista1.confirm "));
+    }
+    polkit.yes = false;
+    EXPECT_EQ(call::asUserBeside(
+                  kUser,
+                  [] {
+                      const bus::Connection own(ServiceRun::address());
+                      return call::errorOf(
+                          own, ServiceRun::kRoot, call::kAgent, "Lengthen",
+                          [](bus::Writer& writer) { writer.put(std::uint32_t{7}).put(1.5); });
+                  },
+                  [&] { polkit.process(); }),
+              kDenied);
+}
+
 /// Polkit may take its time, as a user does: meanwhile everybody else is answered, and nothing is done.
 HOST_TEST_F(ServiceConsent, ThatIsSlowHoldsNobodyUp) {
     Polkit polkit;

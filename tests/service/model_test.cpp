@@ -168,6 +168,26 @@ TEST_F(ModelTest, ALookThatIsOlderThanAReadTakesNothingBack) {
     EXPECT_THAT(notes.taken(), ElementsAre("1.Property6"));
 }
 
+/// What a plug-in stored at its start is as old as its node to the agent, and as the first look here.
+TEST_F(ModelTest, WhatTheHostDoesNotTellInTimeIsStaleThoughItIsNewer) {
+    const auto now = std::chrono::steady_clock::now();
+    Reading first = known(5, 1);
+    first.asOf = now;
+    look({view(1, "/a", {first})});
+    notes.taken();
+    Reading late = known(5, 1);
+    late.asOf = now - std::chrono::seconds(1);
+    late.stale = true;
+    look({view(1, "/a", {late})}, false);
+    EXPECT_TRUE(model.byId(1)->find(5)->stale);
+    EXPECT_EQ(model.byId(1)->find(5)->asOf, now);
+    look({view(1, "/a", {first})}, false);
+    EXPECT_FALSE(model.byId(1)->find(5)->stale);
+    model.learn(1, {late});
+    EXPECT_TRUE(model.byId(1)->find(5)->stale);
+    EXPECT_THAT(notes.taken(), IsEmpty());
+}
+
 class LateReadingsTest : public testing::Test {
 protected:
     /// A look, some seconds from the start, at the properties of node 1 that are named, of which these are

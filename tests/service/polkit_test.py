@@ -122,7 +122,7 @@ def main():
     if "--inside" not in sys.argv:
         os.execvp("unshare", ["unshare", "-mn", "--propagation", "private", "capsh", "--drop=cap_sys_time", "--", "-c",
                               'exec "$@"', "-", *sys.argv, "--inside"])
-    for place in ("/usr/share/polkit-1/actions", "/usr/share/polkit-1/rules.d", "/etc/polkit-1", "/opt", "/run", "/tmp"):
+    for place in ("/usr/share/polkit-1/actions", "/usr/share/polkit-1/rules.d", "/etc/polkit-1", "/opt", "/run", "/tmp", "/var/lib"):
         if os.path.isdir(place) and not program.startswith(place + "/"):
             subprocess.run(["mount", "-t", "tmpfs", "-o", "mode=755", "none", place], check=True)
     write(f"<policyconfig>{''.join(map(ACTION.format, ('write', 'power', 'plan')))}</policyconfig>",

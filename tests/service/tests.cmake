@@ -44,6 +44,14 @@ if(CORVISTA_SERVICE)
     HARDWARE_FILE="$<TARGET_FILE:corvistahardware>")
   add_dependencies(service_endurance_test cvagent cvagentd fake_plugin vantrelcvicoshwmi corvista-hosttools)
 
+  # Changes that are taken back, on links of a real kernel.
+  corvista_test(service_taking_back PARTS 2 LIBRARIES agent_service agent_core agent_bus test_support SOURCES
+    service/service_run.cpp
+    service/taking_back_test.cpp)
+  target_compile_definitions(service_taking_back_test PRIVATE ${agent_test_programs} CVAGENTD_PROGRAM="$<TARGET_FILE:cvagentd>"
+    HARDWARE_FILE="$<TARGET_FILE:corvistahardware>")
+  add_dependencies(service_taking_back_test cvagent cvagentd corvista-guard corvista-hosttools corvista-rehearsal vantrelcvicoshwmi)
+
   # The command line as its client.
   corvista_test(service_client LIBRARIES agent_cli agent_service agent_core agent_bus test_support SOURCES
     service/command_line_test.cpp

@@ -1,6 +1,9 @@
 #include <gmock/gmock.h>
 
+#include <algorithm>
 #include <atomic>
+#include <chrono>
+#include <limits>
 #include <mutex>
 #include <optional>
 #include <thread>
@@ -110,6 +113,20 @@ TEST(ServiceLoop, WhatIsHeldForItEndsOnItsThread) {
     loop.mailbox()->post([&loop] { loop.stop(); });
     loop.run();
     EXPECT_EQ(ended, std::this_thread::get_id());
+}
+
+/// The library's own idea of a time is the next quarter of a second; the first one may be near.
+TEST(ServiceLoop, IsHardlyLate) {
+    Loop loop;
+    std::chrono::nanoseconds shortest = std::chrono::hours(1);
+    for (int round = 0; round < 20; ++round) {
+        const auto begun = std::chrono::steady_clock::now();
+        const auto stop = loop.after(std::chrono::milliseconds(8), [] {});
+        sd_event_run(loop.get(), std::numeric_limits<std::uint64_t>::max());
+        const auto taken = std::chrono::steady_clock::now() - begun;
+        shortest = round == 0 ? shortest : std::min<std::chrono::nanoseconds>(shortest, taken);
+    }
+    EXPECT_LT(shortest, std::chrono::milliseconds(60));
 }
 
 }  // namespace

@@ -156,7 +156,25 @@ HOST_TEST_F(Confirmed, AStepThatFailsTakesAllBack) {
     EXPECT_EQ(stages(host), "1 is taken back");
 }
 
-/// However slow the host is: the guard is at work, but stands still until it is let go.
+/// Unasked, too; who insists goes as far as he comes.
+HOST_TEST_F(Confirmed, AnAppliedFileOfWhichAStepFailsIsTakenBack) {
+    host.file("/root/changes",
+              R"([{"node": "ip-config:eth0", "property": "IPv4Address", "value": "203.0.113.7"},
+                  {"node": "computer", "property": "OwnerName", "value": "x"}])");
+    host.directory("/opt/vantrel/corvista/data", 0700);
+    host.readOnly("/opt/vantrel/corvista/data");
+    const Finished run = cvagent(host, {"apply", "/root/changes"});
+    EXPECT_EQ(run.status, 1);
+    EXPECT_THAT(run.err, HasSubstr("change 1 is taken back"));
+    EXPECT_THAT(run.out, Not(HasSubstr("applied")));
+    EXPECT_EQ(look(host), old_);
+    EXPECT_THAT(cvagent(host, {"apply", "/root/changes", "--force", "--verify-within", "0"}).out,
+                HasSubstr("applied    "));
+    EXPECT_EQ(stages(host), "1 is taken back, 2 is kept");
+}
+
+/// However slow the host is: the guard is at work, but stands still until it is let go. Stopped with the
+/// journal in its hands it would keep everybody waiting.
 void holdGuard(FakeHost& host) {
     host.directory("/run/systemd/system");
     host.file(
@@ -164,7 +182,10 @@ void holdGuard(FakeHost& host) {
         "while [ \"$1\" != -- ]; do shift; done\n\"$2\" \"$3\" &\n"
         "until grep -q \"OFDLCK .*:$(stat -c %i /var/lib/corvista/changes/1/guard.lock) \" /.proc/locks\n"
         "do sleep 0.01; done\n"
-        "kill -STOP $!\necho $! > /root/held\n");
+        "stop() { kill -STOP $1; until grep -q '^State:.T' /.proc/$1/status; do :; done; }\n"
+        "locked() { grep -q \"OFDLCK .*:$(stat -c %i /var/lib/corvista/changes/1/journal.lock) \" "
+        "/.proc/locks; }\n"
+        "stop $!\nwhile locked; do kill -CONT $!; sleep 0.01; stop $!; done\necho $! > /root/held\n");
     host.tool("/usr/bin/systemd-run %any", ToolAnswer{"", 0, "", 0, "sh /root/hold \"$@\""});
 }
 
@@ -301,6 +322,24 @@ HOST_TEST_F(Confirmed, AChangeWhoseFirstStepCannotBeWrittenDownIsNotMade) {
     EXPECT_EQ(look(host), old_);
 }
 
+/// Where nobody is to confirm it, and so no guard puts it back, half of a change is the worst.
+HOST_TEST_F(Confirmed, AnAppliedFileWhoseStepsCannotBeWrittenDownIsMade) {
+    const std::string place = "/var/lib/corvista/changes";
+    host.directory(place, 0700);
+    ASSERT_EQ(mount("small", place.c_str(), "tmpfs", 0, "size=512k,mode=0700"), 0);
+    host.tool("hostname %any", "linux\n");
+    host.tool("hostname earth.linux",
+              ToolAnswer{"", 0, "", 0, "head -c 600000 /dev/zero 2>/dev/null >" + place + "/fill || :"});
+    host.file("/root/changes",
+              R"([{"node": "ip-config:eth0", "property": "HostName", "value": "earth"},
+                  {"node": "computer", "property": "OwnerName", "value": "x"}])");
+    const Finished run = cvagent(host, {"apply", "/root/changes", "--force", "--verify-within", "0"});
+    EXPECT_THAT(run.err,
+                HasSubstr("the change cannot be taken back later: the change cannot be written down: "
+                          "journal: No space left on device"));
+    EXPECT_THAT(run.out, HasSubstr("applied    /oshw/root/computer OwnerName  x\n"));
+}
+
 HOST_TEST_F(Confirmed, AChangeWhoseEndCannotBeWrittenDownIsTakenBack) {
     fillWhenGuarded(host, 4096);
     const Finished run = set(host, "600");
@@ -360,6 +399,14 @@ HOST_TEST_F(Confirmed, AChangeThatCannotBeGuardedIsNotMade) {
     ASSERT_EQ(chmod("/var/lib/corvista/changes", 0700), 0);
     host.fullDisk("/var/lib/corvista/changes");
     EXPECT_EQ(set(host, "60").status, 1);
+    EXPECT_EQ(look(host), old_);
+    host.restore("/var/lib/corvista/changes");
+    host.readOnly("/var/lib/corvista");
+    const Finished readOnly = set(host, "60");
+    EXPECT_EQ(readOnly.status, 1);
+    EXPECT_EQ(readOnly.err,
+              "cvagent: the change cannot be guarded: /var/lib/corvista/changes: Read-only file system\n"
+              "Nothing was done\n");
     EXPECT_EQ(look(host), old_);
 }
 

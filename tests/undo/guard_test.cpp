@@ -694,6 +694,45 @@ HOST_TEST_F(Guard, ProgramComesBackWhenItIsKilled) {
     EXPECT_TRUE(comesTrue([&] { return guards(host).empty(); }));
 }
 
+/// Stops it; where that hits it with the journal in its hands, lets it go on.
+bool isStoppedBetweenLooks(const FakeHost& host, pid_t guard) {
+    kill(guard, SIGSTOP);
+    const std::string place = "/.proc/" + std::to_string(guard) + "/stat";
+    const bool isStopped =
+        comesTrue([&] { return host.read(place).value_or("").find(") T ") != std::string::npos; });
+    if (isStopped && !ChangeDirectory(kChangesPlace, cvagent::undo::changesIn(kChangesPlace).back())
+                          .isTaken("journal.lock")) {
+        return true;
+    }
+    kill(guard, SIGCONT);
+    return false;
+}
+
+/// A guard that is stopped while the change is made, beyond its time.
+HOST_TEST_F(Guard, ProgramThatWasStoppedGoesOnWithItsWork) {
+    for (const bool byHand : {false, true}) {
+        ChangeInMaking making(settings());
+        const std::string number = std::to_string(making.number());
+        ASSERT_EQ(host.run({GUARD_PROGRAM, "--detach", number}).status, 0);
+        ASSERT_TRUE(comesTrue([] { return newest()->isTaken(cvagent::undo::kGuardLock); }));
+        const pid_t guard = guards(host).back();
+        ASSERT_TRUE(comesTrue([&] { return isStoppedBetweenLooks(host, guard); }));
+        makeSteps(host, [&making] { making.beginStep(); });
+        making.end();
+        lengthenChange(*newest(), 0);
+        EXPECT_THROW(confirmChange(*newest()), ChangeError) << "its time is over";
+        EXPECT_EQ(look(host), new_);
+        if (byHand) {
+            EXPECT_EQ(rollBack(kChangesPlace, *newest()).stage, Stage::takenBack);
+            EXPECT_EQ(look(host), old_);
+        }
+        ASSERT_EQ(kill(guard, SIGCONT), 0);
+        EXPECT_TRUE(comesTrue([] { return stage() == Stage::takenBack; }));
+        EXPECT_TRUE(comesTrue([&] { return guards(host).empty(); }));
+        EXPECT_EQ(look(host), old_);
+    }
+}
+
 /// A unit is started again only behind an end that is none of its own.
 HOST_TEST_F(Guard, ProgramThatIsAskedToEndFails) {
     make(host, settings());

@@ -102,8 +102,10 @@ HOST_TEST_F(KeeperIsTold, AndWhatFailsIsNoted) {
 
 HOST_TEST_F(KeeperIsTold, ByNothingButWhatIsKnown) {
     host.tool("/usr/sbin/reboot %any", "");
-    for (const char* each : {"reboot", "ifup", "ifup ", "ifup -a", "ifup eth0 eth1", "ifup $(reboot)",
-                             "ifupx eth0", "netplan generate now", "", "/usr/sbin/ifup eth0"}) {
+    for (const char* each :
+         {"reboot", "ifup", "ifup ", "ifup -a", "ifup eth0 eth1", "ifup $(reboot)", "ifupx eth0",
+          "netplan generate now", "", "/usr/sbin/ifup eth0", "systemctl restart systemd-resolved",
+          "systemctl reset-failed", "resolvconf -u x"}) {
         std::vector<std::string> notes;
         runCalls({each}, notes);
         EXPECT_THAT(notes, ElementsAre("'" + std::string(each) + "' is not a command of this program's"));

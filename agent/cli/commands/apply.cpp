@@ -13,10 +13,11 @@ ExitStatus apply(Session& session, const Options& options) {
     }
     const std::vector<change::MeantChange> changes = meantChanges(session, options);
     std::unique_ptr<std::vector<change::Outcome>> outcomes;
-    if (options.byService && !confirmSeconds(options, changes)) {
+    if (options.byService) {
         confirmDrastic(changes, options);
         outcomes = session.apply(
-            changes, {options.force, false, options.verifySeconds.value_or(change::kVerifySeconds)});
+            changes, {options.force, false, options.verifySeconds.value_or(change::kVerifySeconds),
+                      confirmSeconds(options, changes), !options.confirmSeconds});
     }
     if (!outcomes) {
         outcomes = std::make_unique<std::vector<change::Outcome>>(

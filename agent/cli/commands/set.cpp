@@ -106,15 +106,17 @@ ExitStatus setHere(Session& session, const std::vector<MeantChange>& changes, co
 ExitStatus set(Session& session, const Options& options) {
     const std::vector<MeantChange> changes = meantChanges(session, options);
     std::unique_ptr<std::vector<Outcome>> outcomes;
-    const bool isGuarded = confirmSeconds(options, changes).has_value();
-    if (!isGuarded) {
+    const std::optional<double> confirmed = confirmSeconds(options, changes);
+    if (options.byService || !confirmed) {
         confirmDrastic(changes, options);
     }
-    if (isGuarded) {
+    if (options.byService) {
+        outcomes = session.apply(
+            changes, {options.force, true, options.verifySeconds, confirmed, !options.confirmSeconds});
+    }
+    if (!outcomes && confirmed) {
         outcomes = std::make_unique<std::vector<Outcome>>(
             appliedHere(session, changes, options, change::Already::made, options.verifySeconds));
-    } else if (options.byService) {
-        outcomes = session.apply(changes, {options.force, true, options.verifySeconds});
     }
     if (!outcomes) {
         return setHere(session, changes, options);

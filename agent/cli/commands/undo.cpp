@@ -5,9 +5,10 @@
 #include <ctime>
 #include <nlohmann/json.hpp>
 
+#include "agent/change/revocable.h"
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/print.h"
-#include "agent/cli/safeguard.h"
+#include "agent/cli/remote/service.h"
 #include "agent/core/signals.h"
 #include "agent/undo/making.h"
 
@@ -23,20 +24,26 @@ using undo::kChangesPlace;
 
 constexpr double kThousand = 1000;
 
-void mustBeRoot() {
-    if (geteuid() != 0) {
-        throw Failure(ExitStatus::failed,
-                      "only root keeps and takes back changes of the host\nRun it with: sudo");
-    }
+bool isRoot() {
+    return geteuid() == 0;
 }
 
-ChangeDirectory named(const std::string& word) {
+[[noreturn]] void mustBeRoot() {
+    throw Failure(ExitStatus::failed,
+                  "only root keeps and takes back changes of the host\nRun it with: sudo");
+}
+
+unsigned numberIn(const std::string& word) {
     const auto number = undo::changeNumber(word);
     if (!number) {
         throw Failure(ExitStatus::usage, inQuotes(word) + " is no number of a change");
     }
+    return *number;
+}
+
+ChangeDirectory numbered(unsigned number) {
     try {
-        return {kChangesPlace, *number};
+        return {kChangesPlace, number};
     } catch (const ChangeError& error) {
         throw Failure(ExitStatus::notFound,
                       std::string(error.what()) + "\nThe changes are listed by: cvagent history --changes");
@@ -72,55 +79,71 @@ Json objectOf(unsigned number, const Journal& journal) {
             {"notes", journal.notes}};
 }
 
-}  // namespace
-
-ExitStatus confirmChange(const Options& options) {
-    mustBeRoot();
-    const ChangeDirectory change = named(options.change);
-    const std::string number = "change " + std::to_string(change.number());
+void confirmHere(const Options& options, unsigned number) {
+    const ChangeDirectory change = numbered(number);
     try {
         if (options.confirmSeconds) {
             undo::lengthenChange(change,
                                  static_cast<std::uint64_t>(std::ceil(*options.confirmSeconds * kThousand)));
-            print(number + " has " + std::to_string(std::lround(*options.confirmSeconds)) +
-                  " seconds from now on\n");
         } else {
             undo::confirmChange(change);
-            print(number + " is kept\n");
         }
     } catch (const ChangeError& error) {
         throw Failure(ExitStatus::failed, printable(error.what()));
     }
+}
+
+remote::RolledBack rolledBackHere(unsigned number) {
+    const auto last = number == 0 ? undo::lastStanding(kChangesPlace) : std::optional(number);
+    if (!last) {
+        throw Failure(ExitStatus::notFound, "there is no change that could be taken back");
+    }
+    const ChangeDirectory change = numbered(*last);
+    StopSignals::ignore();  // broken off in its middle it would leave a host that nobody reaches
+    try {
+        const Journal journal = undo::rollBack(kChangesPlace, change);
+        return {*last, undo::stageText(journal.stage), journal.notes};
+    } catch (const ChangeError& error) {
+        throw Failure(ExitStatus::failed, printable(error.what()));
+    }
+}
+
+}  // namespace
+
+ExitStatus confirmChange(const Options& options) {
+    const unsigned number = numberIn(options.change);
+    if (!isRoot() && !remote::confirmChange(options, number)) {
+        mustBeRoot();
+    }
+    if (isRoot()) {
+        confirmHere(options, number);
+    }
+    const std::string done =
+        options.confirmSeconds
+            ? " has " + std::to_string(std::lround(*options.confirmSeconds)) + " seconds from now on\n"
+            : " is kept\n";
+    print("change " + std::to_string(number) + done);
     return ExitStatus::done;
 }
 
 ExitStatus rollback(const Options& options) {
-    mustBeRoot();
-    std::string word = options.change;
-    if (word.empty()) {
-        const auto last = undo::lastStanding(kChangesPlace);
-        if (!last) {
-            throw Failure(ExitStatus::notFound, "there is no change that could be taken back");
-        }
-        word = std::to_string(*last);
+    const unsigned number = options.change.empty() ? 0 : numberIn(options.change);
+    const auto back = isRoot() ? rolledBackHere(number) : remote::rollBack(options, number);
+    if (!back) {
+        mustBeRoot();
     }
-    const ChangeDirectory change = named(word);
-    StopSignals::ignore();  // broken off in its middle it would leave a host that nobody reaches
-    try {
-        const Journal journal = undo::rollBack(kChangesPlace, change);
-        print("change " + std::to_string(change.number()) + " " + undo::stageText(journal.stage) + "\n");
-        if (!journal.notes.empty()) {
-            complain("not all of it:" + notesOf(journal));
-        }
-        const bool isDone = journal.stage == undo::Stage::takenBack && journal.notes.empty();
-        return isDone ? ExitStatus::done : ExitStatus::failed;
-    } catch (const ChangeError& error) {
-        throw Failure(ExitStatus::failed, printable(error.what()));
+    print("change " + std::to_string(back->number) + " " + printable(back->stage) + "\n");
+    if (!back->notes.empty()) {
+        complain("not all of it:" + change::notesOf(back->notes));
     }
+    const bool isDone = back->stage == undo::stageText(undo::Stage::takenBack) && back->notes.empty();
+    return isDone ? ExitStatus::done : ExitStatus::failed;
 }
 
 ExitStatus listChanges(const Options& options) {
-    mustBeRoot();
+    if (!isRoot()) {
+        mustBeRoot();
+    }
     std::string text;
     ExitStatus status = ExitStatus::done;
     const std::vector<unsigned> numbers = undo::changesIn(kChangesPlace);

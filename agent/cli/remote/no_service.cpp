@@ -23,4 +23,12 @@ ServiceReport describeService(const Options& /*options*/) {
     return report;
 }
 
+bool confirmChange(const Options& /*options*/, unsigned /*number*/) {
+    return false;
+}
+
+std::optional<RolledBack> rollBack(const Options& /*options*/, unsigned /*number*/) {
+    return std::nullopt;
+}
+
 }  // namespace cvagent::remote

@@ -44,14 +44,31 @@ void addFlag(bus::Writer& writer, const char* name, bool value) {
     writer.entry("sv", [&] { writer.put(name).variant("b", [&] { writer.put(value); }); });
 }
 
+void addSeconds(bus::Writer& writer, const char* name, double value) {
+    writer.entry("sv", [&] { writer.put(name).variant("d", [&] { writer.put(value); }); });
+}
+
+/// Who has to confirm the change is told of it at once, and it is looked at afterwards.
+double longestLook(const ApplyOptions& options) {
+    return options.confirmSeconds ? 0 : kLongestLook;
+}
+
+/// It knows no changes that wait for their confirmation.
+bool isOlderService(const bus::Message& answer, const ApplyOptions& options) {
+    return isError(answer, bus::kUnknownMethod) ||
+           (options.confirmSeconds && isError(answer, bus::kInvalidArgs));
+}
+
 void putOptions(bus::Writer& writer, const ApplyOptions& options) {
     writer.array("{sv}", [&] {
         addFlag(writer, "force", options.force);
         addFlag(writer, "plain", options.plain);
         if (options.verifySeconds) {
-            const double seconds = std::min(*options.verifySeconds, kLongestLook);
-            writer.entry("sv",
-                         [&] { writer.put("verify-within").variant("d", [&] { writer.put(seconds); }); });
+            addSeconds(writer, "verify-within", std::min(*options.verifySeconds, longestLook(options)));
+        }
+        if (options.confirmSeconds) {
+            addSeconds(writer, "confirm-within", *options.confirmSeconds);
+            addFlag(writer, "unguarded", options.unguarded);
         }
     });
 }
@@ -130,7 +147,7 @@ std::unique_ptr<std::vector<change::Outcome>> RemoteSession::apply(
     bus::Message answer;
     try {
         answer = client_->waitForLong(call);
-        if (isError(answer, bus::kUnknownMethod)) {
+        if (isOlderService(answer, options)) {
             complain("the service is older than this cvagent: the changes are made by single writes");
             return nullptr;
         }
@@ -157,7 +174,7 @@ std::unique_ptr<std::vector<change::Outcome>> RemoteSession::apply(
         std::ranges::for_each(reader.texts(), complainOfLines);
         showReported(reader.texts());
     });
-    if (const double rest = options.verifySeconds.value_or(0) - kLongestLook; rest > 0) {
+    if (const double rest = options.verifySeconds.value_or(0) - longestLook(options); rest > 0) {
         change::verifyWithin(*this, changes, *outcomes, rest, Request(""));
     }
     return outcomes;

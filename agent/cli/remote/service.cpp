@@ -8,6 +8,8 @@
 #include <utility>
 #include <vector>
 
+#include "agent/bus/reader.h"
+#include "agent/bus/writer.h"
 #include "agent/cli/print.h"
 #include "agent/cli/remote/remote_session.h"
 #include "agent/core/text.h"
@@ -84,6 +86,16 @@ std::string timeOf(std::uint64_t microseconds) {
     return timeText(static_cast<std::time_t>(microseconds / kMicroseconds));
 }
 
+/// The answer to a call about a change, for which the service may ask a person. Throws what an error stands
+/// for.
+bus::Message askAboutChange(Client& client, const bus::Message& call) {
+    bus::Message asked = call;
+    if (isatty(STDIN_FILENO) == 1) {
+        asked.allowInteraction();
+    }
+    return client.askForLong(asked);
+}
+
 }  // namespace
 
 std::unique_ptr<Session> openSession(const Options& options, bool silent) {
@@ -119,6 +131,38 @@ ServiceReport describeService(const Options& options) {
         report.problem.erase(std::min(report.problem.find('\n'), report.problem.size()));  // advice
     }
     return report;
+}
+
+bool confirmChange(const Options& options, unsigned number) {
+    const Reached reached = reach(options);
+    if (!reached.client) {
+        return false;
+    }
+    const bus::Message call = reached.client->call(options.confirmSeconds ? "Lengthen" : "Confirm");
+    bus::Writer writer(call);
+    writer.put(std::uint32_t{number});
+    if (options.confirmSeconds) {
+        writer.put(*options.confirmSeconds);
+    }
+    askAboutChange(*reached.client, call);
+    return true;
+}
+
+std::optional<RolledBack> rollBack(const Options& options, unsigned number) {
+    const Reached reached = reach(options);
+    if (!reached.client) {
+        return std::nullopt;
+    }
+    const bus::Message call = reached.client->call("Rollback");
+    bus::Writer(call).put(std::uint32_t{number});
+    const bus::Message answer = askAboutChange(*reached.client, call);
+    RolledBack back;
+    reached.client->read(answer, [&back](bus::Reader& reader) {
+        back.number = reader.number();
+        back.stage = reader.text();
+        back.notes = reader.texts();
+    });
+    return back;
 }
 
 }  // namespace cvagent::remote

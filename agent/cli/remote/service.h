@@ -4,6 +4,7 @@
 #include <optional>
 #include <stdexcept>
 #include <string>
+#include <vector>
 
 #include "agent/cli/options.h"
 #include "agent/cli/session.h"
@@ -32,5 +33,19 @@ struct ServiceReport {
 };
 /// What a service says of itself.
 ServiceReport describeService(const Options& options);
+
+struct RolledBack {
+    unsigned number = 0;
+    std::string stage;  ///< see undo::stageText
+    std::vector<std::string> notes;
+};
+// What becomes of changes that were made, for who may not do it by himself. Throw Failure, Problem and
+// ServiceGone.
+
+/// Keeps a change, or gives it the options' time. @return false: there is no service
+bool confirmChange(const Options& options, unsigned number);
+/// @param number 0: the last one
+/// @return nothing: there is no service
+std::optional<RolledBack> rollBack(const Options& options, unsigned number);
 
 }  // namespace cvagent::remote

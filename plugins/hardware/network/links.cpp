@@ -11,7 +11,7 @@ namespace hardware {
 namespace {
 
 constexpr auto kType = Class::link;
-const std::string kAll = "/sys/class/net/";
+constexpr const char* kAll = "/sys/class/net/";
 
 enum : Id {
     kSort = firstId(kType) + 1,

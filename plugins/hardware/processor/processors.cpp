@@ -4,6 +4,7 @@
 #include <array>
 #include <map>
 #include <set>
+#include <string_view>
 #include <utility>
 
 namespace hardware {
@@ -11,7 +12,8 @@ namespace hardware {
 namespace {
 
 constexpr auto kType = Class::processor;
-const std::string kAll = "/sys/devices/system/cpu/";
+// Constants of this plug-in have no end: a look that hangs may outlive the program's.
+constexpr const char* kAll = "/sys/devices/system/cpu/";
 
 enum : Id {
     kMaker = firstId(kType) + 1,
@@ -55,14 +57,14 @@ constexpr Row kRows[] = {
 
 /// Where the kernel tells of a processor, by its number.
 std::string placeOf(const std::string& processor, const char* file) {
-    return kAll + "cpu" + processor + file;
+    return kAll + ("cpu" + processor) + file;
 }
 
 /// The sections of these processors in /proc/cpuinfo, one after the other; where there are none, what stands
 /// for all.
 std::vector<TextMap> sectionsOf(const Host& host, const std::vector<std::string>& processors) {
-    static const std::set<std::string> kWanted = {"processor", "vendor_id",       "model name", "cpu MHz",
-                                                  "microcode", "CPU implementer", "CPU part",   "cpu"};
+    static constexpr std::array<std::string_view, 8> kWanted = {
+        "processor", "vendor_id", "model name", "cpu MHz", "microcode", "CPU implementer", "CPU part", "cpu"};
     const std::set<std::string> asked(processors.begin(), processors.end());
     std::vector<TextMap> sections;
     TextMap fields;
@@ -74,7 +76,7 @@ std::vector<TextMap> sectionsOf(const Host& host, const std::vector<std::string>
     for (const std::string& line : host.lines("/proc/cpuinfo")) {
         const std::size_t colon = std::min(line.find(':'), line.size());
         const std::string key = trimmed(line.substr(0, colon));
-        if (!kWanted.contains(key)) {
+        if (std::ranges::find(kWanted, key) == kWanted.end()) {
             continue;
         }
         if (key == "processor") {
@@ -132,21 +134,24 @@ std::optional<unsigned long long> cacheSize(const std::string& text) {
 
 /// Sizes by property; a cache that several cores share counts once.
 std::map<Id, unsigned long long> cachesOf(const Host& host, const std::vector<std::string>& cores) {
-    static const std::map<std::string, Id> kSorts = {{"1Data", kLevel1Data},
-                                                     {"1Instruction", kLevel1Instructions},
-                                                     {"2Unified", kLevel2},
-                                                     {"3Unified", kLevel3}};
+    using Sort = std::pair<std::string_view, Id>;
+    static constexpr std::array<Sort, 4> kSorts = {{{"1Data", kLevel1Data},
+                                                    {"1Instruction", kLevel1Instructions},
+                                                    {"2Unified", kLevel2},
+                                                    {"3Unified", kLevel3}}};
     std::map<Id, unsigned long long> sizes;
     std::set<std::string> counted;
     for (const std::string& number : cores) {
         const std::string caches = placeOf(number, "/cache/");
         for (const std::string& index : host.entries(caches)) {
             const std::string cache = caches + index + "/";
-            const auto sort =
-                kSorts.find(host.line(cache + "level").value_or("") + host.line(cache + "type").value_or(""));
+            const auto* const sort = std::ranges::find(
+                kSorts, host.line(cache + "level").value_or("") + host.line(cache + "type").value_or(""),
+                &Sort::first);
             const auto size = cacheSize(host.line(cache + "size").value_or(""));
             const std::string shared = host.line(cache + "shared_cpu_list").value_or(number);
-            if (sort != kSorts.end() && size && counted.insert(sort->first + " " + shared).second) {
+            if (sort != kSorts.end() && size &&
+                counted.insert(std::string(sort->first) + " " + shared).second) {
                 sizes[sort->second] += *size;
             }
         }
@@ -237,7 +242,7 @@ std::optional<unsigned long long> topFrequency(const Host& host, const std::vect
 }
 
 std::vector<std::string> weaknesses(const Host& host) {
-    const std::string all = kAll + "vulnerabilities/";
+    const std::string all = std::string(kAll) + "vulnerabilities/";
     std::vector<std::string> texts;
     for (const std::string& name : host.entries(all)) {
         const auto text = host.line(all + name);

@@ -1,5 +1,7 @@
-#include <map>
+#include <algorithm>
+#include <array>
 #include <optional>
+#include <utility>
 
 #include "plugins/hardware/bytes.h"
 #include "plugins/hardware/storage/health.h"
@@ -81,10 +83,17 @@ std::optional<Registers> tell(const DeviceAccess& access, const DeviceFile& driv
 
 /// What CHECK POWER MODE tells; nothing for what nobody has defined.
 std::optional<std::string> powerState(std::uint8_t count) {
-    static const std::map<std::uint8_t, const char*> kStates = {
-        {0x00, "standby"}, {0x01, "standby"}, {0x40, "standby"}, {0x41, "active"}, {0x80, "idle"},
-        {0x81, "idle"},    {0x82, "idle"},    {0x83, "idle"},    {0xff, "active"}};
-    const auto known = kStates.find(count);
+    using State = std::pair<std::uint8_t, const char*>;
+    static constexpr std::array<State, 9> kStates = {{{0x00, "standby"},
+                                                      {0x01, "standby"},
+                                                      {0x40, "standby"},
+                                                      {0x41, "active"},
+                                                      {0x80, "idle"},
+                                                      {0x81, "idle"},
+                                                      {0x82, "idle"},
+                                                      {0x83, "idle"},
+                                                      {0xff, "active"}}};
+    const auto* const known = std::ranges::find(kStates, count, &State::first);
     return known == kStates.end() ? std::nullopt : std::optional<std::string>(known->second);
 }
 
