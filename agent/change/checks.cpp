@@ -1,5 +1,7 @@
 #include "agent/change/checks.h"
 
+#include <linux/rtnetlink.h>
+
 #include <algorithm>
 #include <iterator>
 
@@ -177,8 +179,8 @@ private:
         }
         bool isReached = std::ranges::any_of(host_.network.routes, [&ip](const KernelRoute& each) {
             // one that somebody has laid to it, without a gateway
-            return each.protocol != 2 && !each.gateway && !each.isDefault() &&
-                   each.destination.sharesPrefix(*ip, each.prefix);
+            return each.protocol != RTPROT_KERNEL && each.type == RTN_UNICAST && !each.gateway &&
+                   !each.isDefault() && each.destination.sharesPrefix(*ip, each.prefix);
         });
         for (const PlannedAddress& each : addresses_) {
             if (!each.ip.sharesPrefix(*ip, each.prefix)) {

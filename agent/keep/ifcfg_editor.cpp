@@ -40,7 +40,8 @@ public:
 
     void setOrigin(bool dhcp) {
         const std::string old = valueOf("BOOTPROTO").value_or("");
-        if (old == (dhcp ? "dhcp" : "static") || (!dhcp && old.empty())) {
+        const bool isSo = dhcp ? old == "dhcp" || old == "dhcp4" : old.empty() || old == "static";
+        if (isSo) {
             return;
         }
         if (old == "dhcp4+static" || old == "dhcp6" || old == "dhcp+autoip") {
@@ -168,21 +169,27 @@ private:
     std::vector<std::string>& lines_;
 };
 
+/// The gateway of a line that is a default route of the family.
+std::optional<std::string> defaultGatewayIn(const std::string& line, bool isIpv6) {
+    const std::vector<std::string> words = wordsOf(line);
+    const bool isDefault =
+        words.size() >= 2 && (words[0] == "default" || words[0] == (isIpv6 ? "::/0" : "0.0.0.0/0"));
+    return isDefault && (isIpv6 ? keep::isIpv6 : isIpv4)(words[1]) ? std::optional(words[1]) : std::nullopt;
+}
+
+/// The first one gets the gateway and keeps what stands behind it; without a gateway all go.
 void setDefaultRoute(std::vector<std::string>& lines, const std::string& gateway, bool isIpv6) {
     const auto isOurs = [isIpv6](const std::string& line) {
-        const std::vector<std::string> words = wordsOf(line);
-        return words.size() >= 2 && words[0] == "default" && (isIpv6 ? keep::isIpv6 : isIpv4)(words[1]);
+        return defaultGatewayIn(line, isIpv6).has_value();
     };
-    const std::string line = "default " + gateway + " - -";
     const auto place = std::ranges::find_if(lines, isOurs);
-    if (place == lines.end() && !gateway.empty()) {
-        lines.push_back(line);
-    } else if (place != lines.end() && wordsOf(*place)[1] != gateway) {
-        if (gateway.empty()) {
-            std::erase_if(lines, isOurs);
-        } else {
-            *place = line;
-        }
+    if (gateway.empty()) {
+        std::erase_if(lines, isOurs);
+    } else if (place == lines.end()) {
+        lines.push_back("default " + gateway + " - -");
+    } else {
+        const std::string old = *defaultGatewayIn(*place, isIpv6);
+        place->replace(place->find(old, wordsOf(*place)[0].size()), old.size(), gateway);
     }
 }
 

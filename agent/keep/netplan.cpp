@@ -26,6 +26,20 @@ std::string idIn(const std::string& made) {
     throw CannotKeep("netplan's name of the interface is not in " + inQuotes(made));
 }
 
+/// What is done with a file; why it cannot be names the file, too.
+template <class Act>
+auto doneWith(const std::string& path, const Act& act) {
+    const auto content = smallFile(path);
+    if (!content) {
+        throw CannotKeep("cannot read " + inQuotes(path));
+    }
+    try {
+        return act(*content);
+    } catch (const CannotKeep& cannot) {
+        throw CannotKeep(inQuotes(path) + ": " + cannot.what());
+    }
+}
+
 /// The one file that defines it: of several, each may say a part of it.
 std::string fileThatDefines(const std::string& id) {
     std::string found;
@@ -34,7 +48,8 @@ std::string fileThatDefines(const std::string& id) {
         std::ranges::sort(names);
         for (const std::string& name : names) {
             const std::string path = directory + name;
-            if (!name.ends_with(".yaml") || !definesInNetplan(smallFile(path).value_or(""), id)) {
+            const auto defines = [&id](const std::string& text) { return definesInNetplan(text, id); };
+            if (!name.ends_with(".yaml") || !doneWith(path, defines)) {
                 continue;
             }
             if (!found.empty()) {
@@ -55,8 +70,10 @@ std::string fileThatDefines(const std::string& id) {
 Way wayOfNetplan(const Link& link, const Claim& claim, const Wish& wish) {
     const std::string id = idIn(claim.source);
     const std::string path = fileThatDefines(id);
-    const auto content = smallFile(path);
-    Way way{claim.system, {}, {{path, content, editedNetplan(content.value_or(""), id, wish)}}, {}};
+    const auto edit = [&](const std::string& text) {
+        return FileEdit{path, text, editedNetplan(text, id, wish)};
+    };
+    Way way{claim.system, {}, {doneWith(path, edit)}, {}};
     way.callsAfter = {"netplan generate"};
     if (claim.source.starts_with("/run/systemd/")) {
         way.callsAfter.emplace_back("networkctl reload");

@@ -12,6 +12,7 @@ namespace cvagent::keep {
 
 namespace {
 
+constexpr const char* kMainTable = "254";
 constexpr std::array kKinds = {"ethernets", "bonds", "bridges", "vlans", "tunnels", "dummy-devices"};
 
 /// Where a value stands in a line: by itself, not as a part of another one. The comment stands behind it.
@@ -248,7 +249,7 @@ private:
                 const std::string& value = item[at + 1].text;
                 isDefault = isDefault || (item[at].text == "to" &&
                                           (value == "default" || value == (isIpv6 ? "::/0" : "0.0.0.0/0")));
-                isInOtherTable = isInOtherTable || item[at].text == "table";
+                isInOtherTable = isInOtherTable || (item[at].text == "table" && value != kMainTable);
                 via = item[at].text == "via" ? std::optional(item[at + 1]) : via;
             }
             if (isDefault && !isInOtherTable && via && (isIpv6 ? keep::isIpv6 : isIpv4)(via->text) &&

@@ -188,9 +188,21 @@ private:
         const std::string value = address + "/" + std::to_string(*prefix);
         if (found == entries_.end()) {
             add("Address", value);
-        } else {
+        } else if (found->value != value) {
             set(*found, value);
+            dropWhatFollowsFrom(found->block);
         }
+    }
+
+    /// What stands beside an address in its section and would be that of the old one.
+    void dropWhatFollowsFrom(unsigned block) {
+        std::erase_if(entries_, [block](const Entry& each) {
+            const bool isBeside = each.block == block && each.section == "Address";
+            if (isBeside && each.key == "Peer") {
+                throw CannotKeep("the address has a Peer");
+            }
+            return isBeside && each.key == "Broadcast" && isIpv4(each.value);
+        });
     }
 
     /// Whether a section of a route is about all destinations, for everybody.

@@ -76,11 +76,15 @@ private:
     /// The line of an option; the stanza's end for none.
     std::size_t lineOf(const std::string& option) const {
         std::size_t found = stanza_.end;
+        bool isRest = false;
         for (std::size_t number = stanza_.first + 1; number < stanza_.end; ++number) {
-            if (keywordOf(lines_[number]) != option) {
+            const std::string keyword = isRest ? "" : keywordOf(lines_[number]);
+            const bool goesOn = lines_[number].ends_with('\\');
+            isRest = goesOn && (isRest || !keyword.empty());
+            if (keyword != option) {
                 continue;
             }
-            if (found != stanza_.end || lines_[number].ends_with('\\')) {
+            if (found != stanza_.end || goesOn) {
                 throw CannotKeep("the stanza's option " + option + " is not one line");
             }
             found = number;
@@ -114,7 +118,7 @@ private:
                                              : "no mask or prefix length of the address is known");
         }
         const bool isApart = apart && !(old && old->prefix);
-        if (isApart) {
+        if (apart) {
             const bool isDotted = mask.find('.') != std::string::npos;
             write("netmask", isDotted ? maskOf(*prefix) : std::to_string(*prefix));
         }

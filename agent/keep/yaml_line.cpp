@@ -32,11 +32,11 @@ std::string meaningOf(const std::string& line) {
             depth -= letter == ']' || letter == '}' ? 1 : 0;
         }
     }
-    if (quote != '\0' || depth != 0 || line.find('\t') != std::string::npos ||
-        line.find('\\') != std::string::npos) {
+    const std::string meaning = line.substr(0, end);
+    if (quote != '\0' || depth != 0 || meaning.find_first_of("\t\\") != std::string::npos) {
         refuseYaml(line);
     }
-    return line.substr(0, line.find_last_not_of(" \r", end == 0 ? 0 : end - 1) + 1).substr(0, end);
+    return meaning.substr(0, meaning.find_last_not_of(" \r") + 1);
 }
 
 }  // namespace

@@ -2,6 +2,7 @@
 #include "agent/change/checks.h"
 
 #include <gmock/gmock.h>
+#include <linux/rtnetlink.h>
 #include <sys/timex.h>
 
 #include "agent/change/clock_source.h"
@@ -39,7 +40,7 @@ KernelAddress address(unsigned link, const std::string& text, unsigned prefix,
 }
 
 /// eth0 with 192.0.2.10/24 and 2001:db8::10/64, eth1 with 198.51.100.1/24, eth2 without any; a way to
-/// 203.0.113.0/24 by eth1.
+/// 203.0.113.0/24 by eth1, and none to 10.1.0.0/24.
 HostFacts host() {
     HostFacts facts;
     facts.network.links = {{1, "lo", true}, {2, "eth0", true}, {3, "eth1", true}, {4, "eth2", true}};
@@ -50,7 +51,11 @@ HostFacts host() {
     way.prefix = 24;
     way.link = 3;
     way.protocol = 4;
-    facts.network.routes = {way};
+    way.type = RTN_UNICAST;
+    KernelRoute nowhere = way;
+    nowhere.destination = *Ip::parse("10.1.0.0");
+    nowhere.type = RTN_BLACKHOLE;
+    facts.network.routes = {way, nowhere};
     return facts;
 }
 
@@ -95,6 +100,7 @@ TEST(Checks, LookAtEachChangeBesideTheOthers) {
         {{ofLink(kGateway, "198.51.100.254")}, ""},
         {{ofLink(kGateway, "203.0.113.9")}, ""},
         {{ofLink(kGateway, "10.9.9.9")}, "0: 10.9.9.9 is in no subnet of this host"},
+        {{ofLink(kGateway, "10.1.0.9")}, "0: 10.1.0.9 is in no subnet of this host"},
         {{ofLink(kGateway, "10.9.9.9"), ofLink(kAddress, "10.9.9.1")}, ""},
         {{ofLink(kGateway, "192.0.2.1"), ofLink(kAddress, "10.9.9.1")},
          "0: 192.0.2.1 is in no subnet of this host"},

@@ -144,6 +144,21 @@ TEST(StanzaEditor, FindsAValueBehindAnyBlank) {
               "iface eth0 inet static\n address\v 192.0.2.2/24\n");
 }
 
+/// What a command goes on with in the next line is no option of the stanza.
+TEST(StanzaEditor, LeavesTheRestOfALongLineAlone) {
+    const std::string command = " up logger \\\n gateway 192.0.2.9\n";
+    EXPECT_EQ(stanza("iface eth0 inet static\n address 192.0.2.1/24\n" + command, gateway("192.0.2.1")),
+              "iface eth0 inet static\n address 192.0.2.1/24\n" + command + " gateway 192.0.2.1\n");
+    EXPECT_EQ(stanza("iface eth0 inet static\n address 192.0.2.1/24\n" + command, gateway("")),
+              "iface eth0 inet static\n address 192.0.2.1/24\n" + command);
+}
+
+/// A mask that stands beside a prefix length counts.
+TEST(StanzaEditor, HasTheMaskAsLongAsThePrefix) {
+    EXPECT_EQ(stanza("iface eth0 inet static\n address 192.0.2.1/24\n netmask 255.255.255.0\n", prefix(25)),
+              "iface eth0 inet static\n address 192.0.2.1/25\n netmask 255.255.255.128\n");
+}
+
 TEST(StanzaEditor, KeepsTheEndOfAFileWithoutALineBreak) {
     EXPECT_EQ(editedStanza("iface eth0 inet static\n address 192.0.2.1/24", "eth0", address("192.0.2.2")),
               "iface eth0 inet static\n address 192.0.2.2/24");
@@ -296,6 +311,25 @@ TEST(NetworkFile, IsForTheSameLinkOnly) {
                   "[Network]\nAddress=192.0.2.77/24\n");
 }
 
+/// It follows from the address, and would be that of the old one.
+TEST(NetworkFile, HasNoBroadcastAddressOfAnotherSubnet) {
+    EXPECT_EQ(network("[Address]\nAddress=192.0.2.10/24\nBroadcast=192.0.2.255\nLabel=a\n"
+                      "[Address]\nAddress=192.0.2.11/24\nBroadcast=192.0.2.255\n",
+                      whole("198.51.100.7", 25)),
+              "[Address]\nAddress=198.51.100.7/25\nLabel=a\n"
+              "[Address]\nAddress=192.0.2.11/24\nBroadcast=192.0.2.255\n");
+    EXPECT_EQ(network("[Address]\nAddress=192.0.2.10/24\nBroadcast=no\n", address("192.0.2.11")),
+              "[Address]\nAddress=192.0.2.11/24\nBroadcast=no\n");
+}
+
+TEST(NetworkFile, LeavesTheWayToAPeerAlone) {
+    EXPECT_THAT(refusal([] {
+                    ownNetworkFile("[Address]\nAddress=192.0.2.10/32\nPeer=192.0.2.1/32\n", "eth0",
+                                   address("192.0.2.11"));
+                }),
+                HasSubstr("Peer"));
+}
+
 TEST(NetworkFile, HasNoGatewayLeftWhereNoneIsWanted) {
     EXPECT_EQ(
         network("[Network]\nAddress=192.0.2.10/24\nGateway=192.0.2.1\n[Route]\nGateway=192.0.2.9\nMetric=7\n",
@@ -354,7 +388,9 @@ TEST(IfcfgEditor, ChangesTheLineThatItIsAbout) {
               "IPADDR='192.0.2.7'\nNETMASK='255.255.255.128'\n");
     EXPECT_EQ(editedIfcfg("IPADDR=\"192.0.2.10\"\nPREFIXLEN=\"24\"\n", prefix(25)),
               "IPADDR=\"192.0.2.10\"\nPREFIXLEN='25'\n");
-    EXPECT_EQ(editedIfcfg("BOOTPROTO='dhcp'\n", origin(true)), "BOOTPROTO='dhcp'\n");
+    for (const char* text : {"BOOTPROTO='dhcp'\n", "BOOTPROTO=dhcp4\n"}) {
+        EXPECT_EQ(editedIfcfg(text, origin(true)), text);
+    }
     EXPECT_EQ(editedIfcfg("BOOTPROTO=dhcp\nIPADDR=192.0.2.1/24\n", origin(false)),
               "BOOTPROTO='static'\nIPADDR=192.0.2.1/24\n");
     EXPECT_EQ(editedIfcfg("", whole("192.0.2.7", 24)), "IPADDR='192.0.2.7/24'\n");
@@ -389,8 +425,10 @@ TEST(IfrouteEditor, HasOneDefaultRouteOfAFamily) {
               "10.0.0.0/8 192.0.2.9 - -\ndefault fe80::1 - eth0\ndefault 192.0.2.1 - -\n");
     EXPECT_EQ(editedIfroute("default 192.0.2.1 - eth0\n", gateway("192.0.2.1")),
               "default 192.0.2.1 - eth0\n");
-    EXPECT_EQ(editedIfroute("default 192.0.2.1 - eth0\nx\n", gateway("192.0.2.2")),
-              "default 192.0.2.2 - -\nx\n");
+    EXPECT_EQ(editedIfroute("default 192.0.2.1 - eth0 metric 7\nx\n", gateway("192.0.2.2")),
+              "default 192.0.2.2 - eth0 metric 7\nx\n");
+    EXPECT_EQ(editedIfroute("0.0.0.0/0\t192.0.2.1 # home\n::/0 fe80::1 - -\n", gateway("192.0.2.2")),
+              "0.0.0.0/0\t192.0.2.2 # home\n::/0 fe80::1 - -\n");
     EXPECT_EQ(editedIfroute("default 192.0.2.1 - eth0\nx\n", gateway("")), "x\n");
 }
 
@@ -470,6 +508,19 @@ TEST(NetplanFile, LeavesGatewaysOfOtherTablesAlone) {
         "      routes:\n        - to: default\n          via: 192.0.2.9\n          table: 100\n";
     EXPECT_EQ(netplan(other, gateway("192.0.2.2")),
               other + "        - to: default\n          via: \"192.0.2.2\"\n");
+}
+
+TEST(NetplanFile, KnowsTheMainTableByItsNumber) {
+    EXPECT_EQ(
+        netplan("      routes:\n        - to: default\n          via: 192.0.2.9\n          table: 254\n",
+                gateway("192.0.2.2")),
+        "      routes:\n        - to: default\n          via: 192.0.2.2\n          table: 254\n");
+}
+
+TEST(NetplanFile, LeavesCommentsAsTheyAre) {
+    const std::string comment = "      # \tC:\\ \"x [ 'y\n";
+    EXPECT_EQ(netplan(comment + "      addresses: [192.0.2.10/24]  # \\\t{\n", address("192.0.2.77")),
+              comment + "      addresses: [192.0.2.77/24]  # \\\t{\n");
 }
 
 /// What is told goes to the history and to who asks on the bus.

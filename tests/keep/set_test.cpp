@@ -180,6 +180,17 @@ HOST_TEST_F(SetAndKeptByIfupdown, IsChangedOnceAndThenAsItShouldBe) {
     EXPECT_EQ(cvagent(host, {"diff", "/tmp/changes"}).status, 1);
 }
 
+HOST_TEST_F(SetAndKeptByIfupdown, WhatIsExportedIsNoDrift) {
+    const Finished exported = cvagent(host, {"export", "ip-config:eth0"});
+    EXPECT_THAT(exported.out, testing::HasSubstr("\"value\": \"192.0.2.10\""));
+    host.file("/tmp/changes", exported.out);
+    const Finished same = cvagent(host, {"diff", "/tmp/changes"});
+    EXPECT_EQ(same.status, 0) << same.out;
+    host.file("/etc/network/interfaces", "iface eth0 inet dhcp\n");
+    EXPECT_THAT(cvagent(host, {"export", "ip-config:eth0"}).out,
+                testing::Not(testing::HasSubstr("192.0.2.10")));
+}
+
 HOST_TEST_F(SetAndKept, NothingIsKeptWhereTwoClaimTheInterface) {
     const std::string index = host.run({"cat", "/sys/class/net/eth0/ifindex"}).out;
     host.file("/run/network/ifstate", "eth0=eth0\n");

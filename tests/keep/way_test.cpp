@@ -261,6 +261,20 @@ HOST_TEST_F(KeptByNetplan, IsAsBeforeWhenItsFileIsNotTaken) {
     EXPECT_THAT(host.calls(), TextsAre("netplan generate", "netplan generate", "networkctl reload"));
 }
 
+/// Of many files, most are not the host's administrator's own.
+HOST_TEST_F(KeptByNetplan, TellsWhichFileIsNotUnderstood) {
+    host.file("/etc/netplan/50-host.yaml", "network:\n  ethernets:\n    lan:\n      dhcp4: true\n");
+    Wish wish;
+    wish.ipv4.gateway = "192.0.2.1";
+    EXPECT_EQ(refusalOf([&] { wayToKeep(kLink, keptBy("netplan", kForNetworkd), wish); }),
+              "'/etc/netplan/50-host.yaml': the address comes by DHCP");
+    host.file("/etc/netplan/60-strange.yaml", "network: &all\n");
+    EXPECT_EQ(refusalOf([] { way(kForNetworkd); }),
+              "'/etc/netplan/60-strange.yaml': a line of the file is not understood: 'network'");
+    ASSERT_EQ(mkfifo("/etc/netplan/20-pipe.yaml", 0600), 0);
+    EXPECT_EQ(refusalOf([] { way(kForNetworkd); }), "cannot read '/etc/netplan/20-pipe.yaml'");
+}
+
 HOST_TEST_F(KeptByNetplan, IsRefusedWhereNotOneFileDefinesIt) {
     host.file("/run/netplan/60-more.yaml", "network:\n  ethernets:\n    lan:\n      mtu: 1400\n");
     EXPECT_THAT(refusalOf([] { way(kForNetworkd); }), HasSubstr("both define 'lan'"));

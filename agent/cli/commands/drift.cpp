@@ -3,6 +3,7 @@
 #include <nlohmann/json.hpp>
 #include <set>
 
+#include "agent/change/kept.h"
 #include "agent/cli/changes.h"
 #include "agent/cli/commands/commands.h"
 #include "agent/cli/print.h"
@@ -17,11 +18,15 @@ using Json = nlohmann::ordered_json;
 constexpr unsigned int kOrigin = 24;
 constexpr const char* kFixedOrigin = "3";
 
-/// Else its addresses are somebody else's.
-bool hasFixedOrigin(const std::vector<Reading>& readings) {
+/// Else its addresses are somebody else's. Where the plug-in knows of none, the system that keeps the
+/// interface does.
+bool hasFixedOrigin(const IC::MutableNode& node, const std::vector<Reading>& readings) {
     const auto origin = std::ranges::find(readings, kOrigin, &Reading::id);
-    return origin != readings.end() && !origin->failed() &&
-           static_cast<std::string>(origin->value) == kFixedOrigin;
+    if (origin == readings.end() || origin->failed()) {
+        return false;
+    }
+    return static_cast<std::string>(origin->value) == kFixedOrigin ||
+           change::isKeptAlready(node, *origin->row, acceptedValue(*origin->row, {kFixedOrigin}));
 }
 
 std::vector<std::string> writableIds(const IC::MutableNode& node) {
@@ -53,7 +58,7 @@ void exportNode(Session& session, const NodeRef& node, const Request& request, E
     for (const Reading& reading : readings) {
         const auto words = change::wordsToSetBack(reading);
         if (!words || !isSo(*node, reading, *words) ||
-            (change::needsFixedOrigin(*reading.row) && !hasFixedOrigin(readings)) ||
+            (change::needsFixedOrigin(*reading.row) && !hasFixedOrigin(*node, readings)) ||
             (change::isHosts(*reading.row) && !ofHost.insert({reading.row->name, *words}).second)) {
             continue;
         }
