@@ -190,6 +190,15 @@ Kept keepWith(const keep::Link& link, const Wish& wish) {
     }
 }
 
+/// Whether nothing would have to be changed for it.
+Kept keptAlready(const keep::Link& link, const Wish& wish) {
+    try {
+        return {keep::wayToKeep(link, keep::keeperOf(link), wish).isEmpty(), {}};
+    } catch (const keep::CannotKeep&) {
+        return {};
+    }
+}
+
 const KeptProperty* keptProperty(const Property& row) {
     const auto* found = std::ranges::find(kKept, row.id, &KeptProperty::property);
     return row.type == NodeType::ipConfig && found != std::end(kKept) ? found : nullptr;
@@ -235,8 +244,12 @@ undo::KeeperCalls keeperCallsFor(const std::vector<MeantChange>& changes) {
     return calls;
 }
 
-std::function<Kept()> keepingOverRestart(const IC::MutableNode& node, const Property& row,
-                                         const IC::PropertyValue& value) {
+namespace {
+
+/// @return does something with what is to be kept of the value, unless the plug-in's file says otherwise by
+/// then; none for what is not about an interface of the kernel's
+std::function<Kept()> withWish(const IC::MutableNode& node, const Property& row,
+                               const IC::PropertyValue& value, Kept (*act)(const keep::Link&, const Wish&)) {
     const KeptProperty* kept = keptProperty(row);
     if (kept == nullptr) {
         return nullptr;
@@ -251,12 +264,24 @@ std::function<Kept()> keepingOverRestart(const IC::MutableNode& node, const Prop
                    runningOn(network, link->index, false),
                    runningOn(network, link->index, true),
                    gatewayOn(network, link->index)};
-    return [link = keep::Link{link->name, link->index}, written = std::move(before), act = kept->wish] {
+    return [link = keep::Link{link->name, link->index}, written = std::move(before), of = kept->wish, act] {
         Written now = written;
         now.file = settingsOf(link.name);
-        const Wish wish = act(now);
-        return wish.isEmpty() ? Kept() : keepWith(link, wish);
+        const Wish wish = of(now);
+        return wish.isEmpty() ? Kept() : act(link, wish);
     };
+}
+
+}  // namespace
+
+std::function<Kept()> keepingOverRestart(const IC::MutableNode& node, const Property& row,
+                                         const IC::PropertyValue& value) {
+    return withWish(node, row, value, keepWith);
+}
+
+bool isKeptAlready(const IC::MutableNode& node, const Property& row, const IC::PropertyValue& value) {
+    const std::function<Kept()> look = withWish(node, row, value, keptAlready);
+    return look && look().isKept;
 }
 
 }  // namespace cvagent::change

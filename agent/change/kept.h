@@ -22,6 +22,10 @@ struct Kept {
 std::function<Kept()> keepingOverRestart(const IC::MutableNode& node, const Property& row,
                                          const IC::PropertyValue& value);
 
+/// Whether the system that keeps the interface has the value already. False where nobody is known who could,
+/// and where the interface has a file of the plug-in's that says otherwise.
+bool isKeptAlready(const IC::MutableNode& node, const Property& row, const IC::PropertyValue& value);
+
 /// What that may write for these changes, and has to be told when it is taken back. Asks what runs.
 undo::KeeperCalls keeperCallsFor(const std::vector<MeantChange>& changes);
 

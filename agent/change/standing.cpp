@@ -8,6 +8,7 @@
 
 #include "agent/change/interface_settings.h"
 #include "agent/change/ip.h"
+#include "agent/change/kept.h"
 #include "agent/change/kept_host.h"
 #include "agent/change/kernel_network.h"
 #include "agent/core/catalogue.h"
@@ -26,7 +27,6 @@ constexpr long kClockTolerance = 10;  // seconds
 constexpr int kSummerTime = 60;       // minutes
 
 // Of an ip-config.
-constexpr unsigned int kInFileOnly[] = {25, 27, 100, 102};
 constexpr unsigned int kWithFixedOrigin[] = {25, 26, 27, 100, 101, 102};
 constexpr unsigned int kOfHost[] = {94, 97, 98, 99};
 
@@ -130,14 +130,14 @@ Standing standingOf(const IC::MutableNode& node, const Property& row, const IC::
         const NodeRef copy = named(node);
         const std::string lacking = effect->lacking({*copy, value, &reading.value});
         if (!lacking.empty() && !isKeptElsewhere(row, value, reading.value) &&
-            !isInForceBySystem(row, value)) {
+            !isInForceBySystem(row, value) && !isKeptAlready(node, row, value)) {
             return {WriteResult::differs, lacking};
         }
     }
     if (isDuplicate(node, row, value)) {
         return {WriteResult::differs, "another host has it, so this one does not use it"};
     }
-    const bool isRead = effect == nullptr || isAmong(row, kInFileOnly);
+    const bool isRead = effect == nullptr || needsFixedOrigin(row);
     if (isRead && !isSameText(value, reading.value)) {
         return {WriteResult::differs, readsAs(reading)};
     }

@@ -161,6 +161,25 @@ HOST_TEST_F(SetAndKeptByIfupdown, WhatIsTakenBackIsItsStanzaToo) {
     EXPECT_THAT(addresses, testing::Not(testing::HasSubstr("192.0.2.77")));
 }
 
+/// The plug-in's own files are none that this host reads: what it runs with and what is kept counts.
+HOST_TEST_F(SetAndKeptByIfupdown, IsChangedOnceAndThenAsItShouldBe) {
+    host.file("/tmp/changes", R"([{"node": "ip-config:eth0", "property": "IPOrigin", "value": "static"},
+        {"node": "ip-config:eth0", "property": "IPv4Address", "value": "192.0.2.77"},
+        {"node": "ip-config:eth0", "property": "SubnetMask", "value": "255.255.255.128"},
+        {"node": "ip-config:eth0", "property": "IPv4Gateway", "value": "192.0.2.1"}])");
+    const Finished first = cvagent(host, {"apply", "/tmp/changes", "--verify-within", "0.3"});
+    EXPECT_EQ(first.status, 0) << first.out << first.err;
+    EXPECT_THAT(first.out, testing::Not(testing::HasSubstr("differs")));
+    host.clearCalls();
+    EXPECT_EQ(cvagent(host, {"diff", "/tmp/changes"}).status, 0);
+    const Finished second = cvagent(host, {"apply", "/tmp/changes", "--verify-within", "0.3"});
+    EXPECT_EQ(second.status, 0) << second.out << second.err;
+    EXPECT_THAT(second.out, testing::Not(testing::HasSubstr("applied")));
+    EXPECT_THAT(host.callsOf("ifup"), testing::IsEmpty());
+    host.file("/etc/network/interfaces", kStanza);
+    EXPECT_EQ(cvagent(host, {"diff", "/tmp/changes"}).status, 1);
+}
+
 HOST_TEST_F(SetAndKept, NothingIsKeptWhereTwoClaimTheInterface) {
     const std::string index = host.run({"cat", "/sys/class/net/eth0/ifindex"}).out;
     host.file("/run/network/ifstate", "eth0=eth0\n");
