@@ -7,6 +7,7 @@
 
 #include <array>
 #include <chrono>
+#include <exception>
 #include <stdexcept>
 
 using namespace std::chrono_literals;
@@ -16,6 +17,12 @@ ServiceRun::ServiceRun(FakeHost& host) : host_(host) {
     host.directory("/run", 0755);
     host.file("/etc/passwd", "root:x:0:0::/root:/bin/sh\nalice:x:12345:12345::/:/bin/sh\n");
     host.file("/etc/group", "root:x:0:\ncorvista:x:12345:\n");
+}
+
+ServiceRun::~ServiceRun() {
+    if (std::uncaught_exceptions() > 0 && program_) {
+        ADD_FAILURE() << "the service has said: " << program_->err();
+    }
 }
 
 ServiceRun& ServiceRun::telling(const std::string& words) {

@@ -43,6 +43,10 @@ namespace bus = cvagent::bus;
 class ServiceRun {
 public:
     explicit ServiceRun(FakeHost& host);
+    /// Tells what the service has said when something is thrown, as when it is gone.
+    ~ServiceRun();
+    ServiceRun(const ServiceRun&) = delete;
+    ServiceRun& operator=(const ServiceRun&) = delete;
 
     ServiceRun& telling(const std::string& words);
     ServiceRun& plugin(const std::string& file);
