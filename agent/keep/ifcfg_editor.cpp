@@ -189,7 +189,7 @@ void setDefaultRoute(std::vector<std::string>& lines, const std::string& gateway
         lines.push_back("default " + gateway + " - -");
     } else {
         const std::string old = *defaultGatewayIn(*place, isIpv6);
-        place->replace(place->find(old, wordsOf(*place)[0].size()), old.size(), gateway);
+        place->replace(place->find(old), old.size(), gateway);
     }
 }
 
