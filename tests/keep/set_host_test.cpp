@@ -123,8 +123,8 @@ HOST_TEST_F(SetOfHost, NameServersOfNetworkManagerAreAskedOfWhoKeepsTheInterface
     host.file("/sys/fs/cgroup/system.slice/systemd-networkd.service/cgroup.procs", "312\n");
     const Finished run = cvagent(host, {"set", kNode, "DNSServers", "192.0.2.53"});
     EXPECT_THAT(run.err,
-                HasSubstr("not kept over a restart: NetworkManager makes /etc/resolv.conf: name servers and "
-                          "domains are not written there\n"));
+                HasSubstr("not kept over a restart: NetworkManager makes /etc/resolv.conf: "
+                          "'/etc/netplan/50-host.yaml': name servers and domains are not written there\n"));
     EXPECT_EQ(host.read("/etc/netplan/50-host.yaml"), yaml);
 }
 
