@@ -75,6 +75,7 @@ ServiceRun& ServiceRun::start() {
         usleep(2000);
     }
     bus_.emplace(address());
+    bus_->uniqueName();  // greets the bus, which closes connections that leave it waiting for five seconds
     return *this;
 }
 
