@@ -458,6 +458,9 @@ HOST_TEST(ServiceClient, ChangesByItselfThroughAServiceThatIsOlder) {
     EXPECT_THAT(apply.out, HasSubstr("OwnerContact"));
     const Finished plan = host.run(asking({"plan", "/root/changes"}, Impostor::kAddress));
     EXPECT_THAT(plan.err, StartsWith(told + " and makes no plans\n"));
+    const Finished get = host.run(asking({"get", "computer", "OwnerContact"}, Impostor::kAddress));
+    EXPECT_EQ(get.status, 0) << get.err;
+    EXPECT_EQ(get.out, "/oshw/root/computer [3]  Computer\n    115  OwnerContact  old\n");
 }
 
 /// Who may not have the service's plan gets one of his own, as far as he can see.
