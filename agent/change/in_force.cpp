@@ -334,9 +334,10 @@ std::function<EffectInForce(bool)> throughNetlink(const IC::MutableNode& node, c
 BringIntoForce bringingIntoForce(Neighbours neighbours) {
     return [neighbours](const IC::MutableNode& node, const Property& row,
                         const IC::PropertyValue& value) -> std::function<EffectInForce()> {
-        auto keep = keepingOfHost(node, row, value, neighbours == Neighbours::notAsked);
+        const bool isTried = neighbours == Neighbours::notAsked;
+        auto keep = keepingOfHost(node, row, value, isTried);
         if (!keep) {
-            keep = keepingOverRestart(node, row, value);
+            keep = keepingOverRestart(node, row, value, isTried);
         }
         auto act = throughNetlink(node, row, value, neighbours);
         if (!keep && !act) {
