@@ -97,6 +97,7 @@ def change_and_take_back(context, path):
 
 def take_gateway_back(context):
     """The daemon takes all addresses and routes away and makes them anew, before and after; nothing is told before it has."""
+    context.host.sh("ip address add 198.51.100.5/24 dev eth0; ip route add 203.0.113.0/24 via 192.0.2.9 dev eth0")  # which it does not know
     before = network_of(context)
     result = context.host.run(f"{AGENT} set {NODE} IPv4Gateway 192.0.2.254 --confirm-within 600")
     expect_equal(f"the status of the change ({result.stdout}{result.stderr})", result.returncode, 0)
@@ -104,6 +105,7 @@ def take_gateway_back(context):
     result = context.host.run(f"{AGENT} rollback")
     expect_equal("what the taking back tells", (result.stdout, result.stderr), ("change 2 is taken back\n", ""))
     expect_equal("the network when it is taken back", network_of(context), before)
+    context.host.sh("ip address delete 198.51.100.5/24 dev eth0; ip route delete 203.0.113.0/24")
 
 
 def network_of(context):

@@ -175,6 +175,7 @@ protected:
     void setUpHost(FakeHost& host) override {
         host.realTool("ip");
         host.useKernelNetwork();
+        ASSERT_EQ(host.run({"ip", "link", "set", "lo", "up"}).status, 0);
         says(host, "ADMIN_STATE=configured\n");
         host.file(kLinks + std::string("2222"), "ADMIN_STATE=configuring\nNETWORK_FILE=/etc/dhcp.network\n");
         host.file("/etc/dhcp.network", "[Network]\nDHCP=yes\n");
@@ -190,7 +191,7 @@ protected:
 /// Without a carrier it is never ready, and without a router's word it does not say that it is.
 HOST_TEST_F(NetworkdSetsUp, WhatItCan) {
     const std::string atWork = "ADMIN_STATE=configuring\nNETWORK_FILE=/etc/lo.network\n";
-    ASSERT_EQ(host.run({"sh", "-c", "ip link set lo up; ip address add 192.0.2.10/24 dev lo"}).status, 0);
+    ASSERT_EQ(host.run({"ip", "address", "add", "192.0.2.10/24", "dev", "lo"}).status, 0);
     ASSERT_EQ(host.run({"ip", "route", "add", "default", "via", "192.0.2.1", "dev", "lo"}).status, 0);
     host.file("/etc/lo.network",
               "[Match]\nName=lo\n[Network]\nAddress=\nAddress = 192.0.2.10/24 \nAddress=0.0.0.0/24\n"
