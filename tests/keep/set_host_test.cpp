@@ -226,9 +226,12 @@ HOST_TEST_F(SetOfHost, ItsZoneIsInTheLinkAndInDebiansFile) {
     const Finished back =
         cvagent(host, {"set", "computer", "TimeZoneOffset", "540", "--confirm-within", "600"});
     EXPECT_EQ(host.read("/etc/timezone"), "Japan\n") << back.err;
-    EXPECT_EQ(cvagent(host, {"rollback"}).out, "change 1 is taken back\n");
+    EXPECT_EQ(cvagent(host, {"rollback"}).out, "change 2 is taken back\n");
     EXPECT_EQ(host.read("/etc/timezone"), "Asia/Kolkata\n");
     EXPECT_EQ(std::filesystem::read_symlink("/etc/localtime"), "/usr/share/zoneinfo/Asia/Kolkata");
+    EXPECT_EQ(cvagent(host, {"rollback"}).out, "change 1 is taken back\n") << "without a confirmation";
+    EXPECT_EQ(host.read("/etc/timezone"), "Etc/UTC\n");
+    EXPECT_EQ(std::filesystem::read_symlink("/etc/localtime"), "/usr/share/zoneinfo/Etc/UTC");
 }
 
 HOST_TEST_F(SetOfHost, AZoneThatIsNotThereIsNotKept) {
