@@ -3,6 +3,7 @@
 #include <sys/mount.h>
 
 #include "tests/support/fake_host.h"
+#include "tests/support/waiting.h"
 
 namespace {
 
@@ -241,11 +242,11 @@ HOST_TEST_F(SetAndKeptByNetworkd, AGatewayIsTakenBackWhole) {
     EXPECT_THAT(run.err, testing::HasSubstr("kept over a restart by systemd-networkd"));
     std::string wanted = before;
     EXPECT_EQ(networkOf(host), wanted.replace(wanted.find("via 192.0.2.1 "), 13, "via 192.0.2.254"));
-    EXPECT_EQ(host.read(state_), saysOf(kOurs));
+    EXPECT_TRUE(eventually([&] { return host.read(state_) == saysOf(kOurs); }));
     const Finished back = cvagent(host, {"rollback"});
     EXPECT_EQ(back.out + back.err, "change 1 is taken back\n");
     EXPECT_EQ(networkOf(host), before);
-    EXPECT_EQ(host.read(state_), saysOf(kNetwork));
+    EXPECT_TRUE(eventually([&] { return host.read(state_) == saysOf(kNetwork); }));
 }
 
 HOST_TEST_F(SetAndKept, NothingIsKeptWhereTwoClaimTheInterface) {
