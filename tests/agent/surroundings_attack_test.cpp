@@ -47,8 +47,7 @@ HOST_TEST(StrangersDirectory, ItsNamesAreNoPartOfACommand) {
     }
     host.tool("rpm -qa", ToolAnswer{.out = "", .action = "pwd > /var/told"});
     const Finished run = host.run(fromDirectory(
-        kStrangers,
-        suse.commandLine({"set", "ip-config:eth0", "IPOrigin", "3", "--command-timeout", "0.5"})));
+        kStrangers, suse.commandLine({"set", "ip-config:eth0", "IPOrigin", "3", "--command-timeout", "10"})));
     EXPECT_EQ(run.status, 0) << run.err;
     EXPECT_THAT(run.err, Not(HasSubstr("timed out")));
     EXPECT_EQ(told(host), "/\n");
