@@ -16,6 +16,7 @@
 #include "agent/undo/boot_clock.h"
 #include "agent/undo/making.h"
 #include "agent/undo/taking_back.h"
+#include "tests/support/amounts.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/waiting.h"
 #include "tests/undo/killed_at.h"
@@ -38,11 +39,8 @@ using testing::IsEmpty;
 
 constexpr std::uint64_t kLong = 600'000;
 
-/// Before the fake host takes the environment away.
-const int kKills = [] {
-    const char* wanted = getenv("CORVISTA_UNDO_KILLS");
-    return wanted != nullptr ? std::atoi(wanted) : 100;
-}();
+const auto kKills = numberFrom("CORVISTA_UNDO_KILLS", 100);
+const auto kSeed = seedOfRun();
 
 /// Runs it in a process of its own. @return the status of waitpid
 template <class Body>
@@ -304,8 +302,9 @@ HOST_TEST_F(Guard, PutsFilesBackAfterTheNextStart) {
 /// Maker and guard are two programs here, and each is killed when it happens. CORVISTA_UNDO_KILLS says how
 /// often.
 HOST_TEST_F(Guard, LeavesNothingHalfWhoeverIsKilled) {
-    std::mt19937 random(std::random_device{}());
-    for (int i = 0; i < kKills; ++i) {
+    SCOPED_TRACE("CORVISTA_SEED=" + std::to_string(kSeed));
+    std::mt19937 random(kSeed);
+    for (unsigned long i = 0; i < kKills; ++i) {
         const pid_t maker = fork();
         if (maker == 0) {
             make(host, settings());
