@@ -40,7 +40,8 @@ class Context:
         place = f"/proc/{self.host.init}/root/opt/cv"
         os.makedirs(f"{place}/agent")
         for program in ("cvagent", "corvista-guard", "corvista-rehearsal"):
-            shutil.copy(f"{build}/agent/{program}", f"{place}/agent")
+            folder = "libexec" if program == "cvagent" else "agent"  # the program that is whole without the other one
+            shutil.copy(f"{build}/{folder}/{program}", f"{place}/agent")
         shutil.copytree(f"{build}/lib", f"{place}/lib", symlinks=True, ignore=shutil.ignore_patterns("*.a"))
         shutil.copytree(f"{build}/hosttools", f"{place}/hosttools", symlinks=True, ignore=shutil.ignore_patterns("*.a", "CMake*"))
         self.host.sh("systemctl stop systemd-networkd networking NetworkManager 2>/dev/null; "
