@@ -116,6 +116,7 @@ HOST_TEST_F(ServiceTakesBack, AllWhenAStepFails) {
     EXPECT_THAT(made.out, HasSubstr("not made   /oshw/root/computer/"));
     EXPECT_THAT(made.out, Not(HasSubstr("applied")));
     EXPECT_EQ(look(host), old_);
+    EXPECT_THAT(cvagent(host, {"set", "computer", "OwnerName", "y"}).err, Not(HasSubstr("taken back")));
     const Finished forced = cvagent(host, {"apply", "/root/changes", "--force", "--verify-within", "0"});
     EXPECT_THAT(forced.out, HasSubstr("applied    ")) << "who knows better goes as far as he comes";
     EXPECT_THAT(look(host), HasSubstr("203.0.113.7/25"));
