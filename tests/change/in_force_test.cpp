@@ -211,6 +211,14 @@ HOST_TEST_F(InForce, WhereNobodyKeepsTheInterfaceTheRunningHostAloneHasIt) {
     EXPECT_FALSE(write(kIpv6Gateway, "2001:db8::2", [] {}).isForNow);
 }
 
+/// The plug-in writes an address beside an origin alone; a restart would bring back what the file says.
+HOST_TEST_F(InForce, NothingComesOfAFileThatTellsNoOrigin) {
+    ip(host, "address add 192.0.2.10/24 dev eth0");
+    host.file("/etc/sysconfig/network/ifcfg-eth-id-" + hardware_, "IPADDR=192.0.2.10\n");
+    EXPECT_FALSE(write(kAddress, "192.0.2.20", [] {}).isForNow);
+    EXPECT_THAT(addresses(host), ElementsAre("192.0.2.10/24"));
+}
+
 HOST_TEST_F(InForce, AnIpv6AddressComesAndTheOldOneGoes) {
     ip(host, "-6 address add 2001:db8::1/64 dev eth0 nodad");
     ip(host, "-6 address add 2001:db8::2/64 dev eth0 nodad");
