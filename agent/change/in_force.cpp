@@ -22,7 +22,7 @@ struct Scene {
     KernelNetwork before;
     KernelLink link;
     std::string value;  ///< that is written
-    bool isKept;        ///< by the system that keeps the interface, whatever the plug-in's file has
+    bool isKept;  ///< by the system that keeps the interface, or by nobody: no file of the plug-in's counts
     Neighbours neighbours = Neighbours::awaited;
 
     bool isWritten(const std::string& inFile) const { return isKept || inFile == value; }
@@ -378,8 +378,9 @@ BringIntoForce bringingIntoForce(Neighbours neighbours) {
         }
         return [keep = std::move(keep), act = std::move(act)] {
             const Kept kept = keep ? keep() : Kept();
-            EffectInForce effect = act ? act(kept.isKept) : EffectInForce();
+            EffectInForce effect = act ? act(kept.isKept || kept.isForNow) : EffectInForce();
             effect.isKept = kept.isKept;
+            effect.isForNow = kept.isForNow;
             effect.isInForce = kept.isInForce;
             if (!kept.note.empty()) {
                 effect.notes.push_back(kept.note);

@@ -249,6 +249,22 @@ HOST_TEST_F(SetAndKeptByNetworkd, AGatewayIsTakenBackWhole) {
     EXPECT_TRUE(eventually([&] { return host.read(state_) == saysOf(kNetwork); }));
 }
 
+/// A newcomer's machine: the value is in force, and the program says how long.
+HOST_TEST_F(SetAndKept, WhatNobodyKeepsHoldsUntilRestart) {
+    const Finished run = cvagent(host, {"set", "ip-config:eth0", "IPv4Address", "192.0.2.77"});
+    EXPECT_EQ(run.status, 0) << run.err;
+    EXPECT_THAT(run.out, testing::HasSubstr("new  192.0.2.77\n"));
+    EXPECT_THAT(run.err,
+                testing::HasSubstr("cvagent: not kept over a restart: nobody is known who keeps 'eth0'\n"));
+    EXPECT_THAT(ip(host, "-4 -o address show dev eth0"), testing::HasSubstr("inet 192.0.2.77/24"));
+    host.file("/tmp/changes",
+              R"([{"node": "ip-config:eth0", "property": "IPv4Address", "value": "192.0.2.77"}])");
+    EXPECT_THAT(cvagent(host, {"apply", "/tmp/changes"}).out, testing::HasSubstr("unchanged"));
+    EXPECT_EQ(cvagent(host, {"diff", "/tmp/changes"}).status, 0);
+    EXPECT_EQ(cvagent(host, {"rollback"}).out, "change 1 is taken back\n");
+    EXPECT_THAT(ip(host, "-4 -o address show dev eth0"), testing::HasSubstr("inet 192.0.2.10/24"));
+}
+
 HOST_TEST_F(SetAndKept, NothingIsKeptWhereTwoClaimTheInterface) {
     const std::string index = host.run({"cat", "/sys/class/net/eth0/ifindex"}).out;
     host.file("/run/network/ifstate", "eth0=eth0\n");
