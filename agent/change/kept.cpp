@@ -195,7 +195,7 @@ Kept keepWith(const keep::Link& link, const Wish& wish, bool isTried) {
         const undo::NetworkdLinks before(link.index);
         keep::go(way);
         const std::string note = isTried ? "" : waitUntilInForce(way, link, wish, before);
-        return {true, "kept over a restart by " + way.system + placesOf(way) + note};
+        return {true, "kept over a restart by " + way.system + placesOf(way) + note, isTried};
     } catch (const keep::CannotKeep& cannot) {
         return {false, "not kept over a restart: " + std::string(cannot.what())};
     }

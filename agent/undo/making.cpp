@@ -146,12 +146,13 @@ void ChangeInMaking::beginStep() {
     }
 }
 
+/// What is there while somebody takes it back is not what the change has left.
 Journal ChangeInMaking::end() {
-    directory_.save("left", before_.again());
     return directory_.update([this](Journal& journal) {
         if (journal.stage != Stage::saved && journal.stage != Stage::changing) {
             return false;
         }
+        directory_.save("left", before_.again());
         journal.stage = window_ == 0 ? Stage::kept : Stage::made;
         journal.deadline = std::max(journal.deadline, bootMilliseconds() + window_);  // it may be lengthened
         return true;
