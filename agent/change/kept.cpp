@@ -226,7 +226,7 @@ Kept keepWith(const keep::Link& link, const Wish& wish, const Terms& terms) {
         const undo::NetworkdLinks before(link.index);
         keep::go(way);
         const std::string note = terms.isTried ? "" : waitUntilInForce(way, link, wish, before);
-        return {true, "kept over a restart by " + way.system + placesOf(way) + note};
+        return {true, "kept over a restart by " + way.system + placesOf(way) + note, terms.isTried};
     } catch (const keep::CannotKeep& cannot) {
         return {false, "not kept over a restart: " + std::string(cannot.what())};
     }

@@ -12,7 +12,7 @@ namespace cvagent::change {
 struct Kept {
     bool isKept = false;     ///< by a system of the host: the plug-in's files do not count
     std::string note{};      ///< where it is kept, or why it is not; "" where nobody is known who could
-    bool isInForce = false;  ///< that system has been found to use the value
+    bool isInForce = false;  ///< that system has been found to use the value, or cannot be reached for a try
     bool isForNow = false;   ///< nobody keeps it: the running host alone is to have it, until its restart
 };
 
