@@ -103,11 +103,7 @@ Wish wishOfLists(unsigned int property, const IC::PropertyValue& value) {
     return wish;
 }
 
-bool isWithInterface(const keep::Resolver& resolver) {
-    return resolver.system == "NetworkManager";
-}
-
-/// It has them with the interfaces that it keeps, or netplan for it.
+/// Or netplan keeps the interface for it.
 Kept keepWithInterface(const std::string& obstacle, const std::string& interface, const Wish& wish) {
     const KernelNetwork network = KernelNetwork::read();
     const KernelLink* link = network.link(interface);
@@ -142,7 +138,7 @@ template <unsigned int property>
 Kept keepLists(const HostsValue& written) {
     const Wish wish = wishOfLists(property, written.value);
     const keep::Resolver resolver = keep::resolverOfHost();
-    if (isWithInterface(resolver)) {
+    if (resolver.isWithInterface()) {
         return keepWithInterface(resolver.obstacle, written.interface, wish);
     }
     const Way way = keep::wayOfResolver(resolver, wish);
@@ -221,7 +217,7 @@ void addCallsOfHost(const std::vector<MeantChange>& changes, undo::KeeperCalls& 
 }
 
 bool isKeptWithInterface(const Property& row) {
-    return isOfResolver(row) && isWithInterface(keep::resolverOfHost());
+    return isOfResolver(row) && keep::resolverOfHost().isWithInterface();
 }
 
 bool isInForceBySystem(const Property& row, const IC::PropertyValue& value) {

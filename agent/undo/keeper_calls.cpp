@@ -18,6 +18,7 @@
 #include <thread>
 
 #include "agent/undo/boot_clock.h"
+#include "agent/undo/networkd_links.h"
 #include "hosttools/files.h"
 #include "hosttools/text.h"
 
@@ -36,7 +37,7 @@ struct KnownCall {
 };
 constexpr std::array kKnownCalls{
     KnownCall{"netplan generate", false, true},
-    KnownCall{"networkctl reload", false, false},
+    KnownCall{kNetworkdReload, false, false},
     KnownCall{"systemctl reset-failed systemd-resolved", false, false},
     KnownCall{"systemctl try-reload-or-restart systemd-resolved", false, false},
     KnownCall{"resolvconf -u", false, false},
@@ -160,8 +161,11 @@ KeeperCalls KeeperCalls::whileStarting() const {
 
 void runCalls(const std::vector<std::string>& calls, std::vector<std::string>& notes) {
     for (const std::string& call : calls) {
+        const NetworkdLinks links;
         if (const std::string problem = problemOf(call); !problem.empty()) {
             notes.push_back("'" + call + "' " + problem);
+        } else if (call == kNetworkdReload) {
+            links.waitUntilSetUp();
         }
     }
 }

@@ -25,6 +25,9 @@ struct NetworkChange {
     std::uint64_t seconds;     ///< since `before`; lifetimes are shorter by so much
 };
 
+/// Whether nothing would have to be put back of what was changed between them.
+bool isSameNetwork(const NetworkState& before, const NetworkState& after);
+
 /// Deletes what the change has made and adds what it has taken away, in three rounds at most. What others
 /// have done since stays. Can be done again with the same change.
 /// @param notes gets a line for each thing that is not back, and for what only the kernel or a router makes
