@@ -39,7 +39,7 @@ HOST_TEST(HugeOutput, OfAQueryIsReadAsFarAsItsAnswer) {
                                               .action = "echo '::/0 fe80::1 UG 1024 0 0 eth0'; yes '::/0 " +
                                                         std::string(400, 'x') + " UG eth0'" + kGigabyte});
     const Finished run =
-        suse.run({"--command-timeout", "100", "get", "ip-config:eth0", "IPv6Gateway", "--json"});
+        suse.run({"--command-timeout", "500", "get", "ip-config:eth0", "IPv6Gateway", "--json"});
     EXPECT_EQ(run.status, 0);
     EXPECT_EQ(Json::parse(run.out)["properties"]["101"]["value"], "fe80::1");
 }
@@ -56,7 +56,7 @@ HOST_TEST(HugeOutput, OfAListingIsReadAsFarAsASaneOneGoes) {
     host.tool("brctl show", ToolAnswer{.out = "",
                                        .action = "yes 'br0\t8000.000000000000\tno\t\t" +
                                                  std::string(400, 'x') + "'" + kGigabyte});
-    const Finished run = suse.run({"--command-timeout", "100", "tree"});
+    const Finished run = suse.run({"--command-timeout", "500", "tree"});
     EXPECT_EQ(run.status, 0);
     EXPECT_THAT(run.out, HasSubstr("network-port:eth0"));
     EXPECT_THAT(run.out, HasSubstr("ip-config:br0"));

@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <condition_variable>
+#include <ctime>
 #include <mutex>
 #include <set>
 #include <thread>
@@ -395,14 +396,10 @@ TEST_F(Plugin, ManyThingsStartQuickly) {
     for (int number = 0; number < 1000; ++number) {
         addLink("veth" + std::to_string(number), "1500");
     }
-    const auto begin = std::chrono::steady_clock::now();
+    const std::clock_t begin = std::clock();
     start();
-    const auto end = std::chrono::steady_clock::now();
+    EXPECT_LT(std::clock() - begin, 5 * CLOCKS_PER_SEC);
     EXPECT_EQ(links().size(), 1002U);
-    EXPECT_LT(end - begin, std::chrono::seconds(5));
-    RecordProperty(
-        "milliseconds",
-        static_cast<int>(std::chrono::duration_cast<std::chrono::milliseconds>(end - begin).count()));
 }
 
 }  // namespace

@@ -2,7 +2,8 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 
-#include <chrono>
+#include <algorithm>
+#include <ctime>
 #include <filesystem>
 #include <random>
 
@@ -69,9 +70,9 @@ void expectPrintable(const std::string& text, const std::string& where) {
 }
 
 #if defined(__SANITIZE_THREAD__)  // which makes the work several times as long
-constexpr std::chrono::seconds kLongest{100};
+constexpr std::clock_t kLongest = 100 * CLOCKS_PER_SEC;
 #else
-constexpr std::chrono::seconds kLongest{20};
+constexpr std::clock_t kLongest = 20 * CLOCKS_PER_SEC;
 #endif
 
 TEST_P(RecordedHosts, ThatSomebodyHasDamagedAreReadWithoutHarm) {
@@ -80,9 +81,10 @@ TEST_P(RecordedHosts, ThatSomebodyHasDamagedAreReadWithoutHarm) {
     for (const auto& entry : fs::recursive_directory_iterator(recorded_.root())) {
         all.push_back(entry.path());
     }
+    std::sort(all.begin(), all.end());  // the same damage on each machine
     hardware::HardwareMI plugin{recorded_.host()};
     ASSERT_EQ(plugin.initialize(1, IC::Number(1U), IC::Number(2U)).getStatus(), 0);
-    const auto start = std::chrono::steady_clock::now();
+    const std::clock_t start = std::clock();
     for (int round = 0; round < 8; ++round) {
         for (int count = 0; count < 20; ++count) {
             damage(all[random() % all.size()], random);
@@ -96,7 +98,7 @@ TEST_P(RecordedHosts, ThatSomebodyHasDamagedAreReadWithoutHarm) {
             }
         }
     }
-    EXPECT_LT(std::chrono::steady_clock::now() - start, kLongest);
+    EXPECT_LT(std::clock() - start, kLongest);
 }
 
 TEST_P(RecordedHosts, WhatIsForTrustedOnesIsNotToldToOthers) {

@@ -2,8 +2,8 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <chrono>
 #include <cstdint>
+#include <ctime>
 
 #include "plugins/hardware/memory/smbios.h"
 #include "tests/hardware/recorded_host.h"
@@ -142,9 +142,9 @@ TEST_F(Modules, ATableThatLiesAboutTheirNumberCostsLittle) {
         bytes += Structure(17, 0x0e).word(0x0c, 1).bytes();
     }
     table(bytes);
-    const auto start = std::chrono::steady_clock::now();
+    const std::clock_t start = std::clock();
     EXPECT_EQ(count(), 4096U);
-    EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(2));
+    EXPECT_LT(std::clock() - start, 2 * CLOCKS_PER_SEC);
 }
 
 TEST(SmbiosTable, EndsAtItsEndMark) {

@@ -2,7 +2,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <chrono>
+#include <ctime>
 
 #include "tests/hardware/recorded_host.h"
 
@@ -142,10 +142,10 @@ TEST_F(Processors, ManyAreToldInTimeThatGrowsWithTheirNumber) {
                 "\n\n";
     }
     recorded_.file("/proc/cpuinfo", info);
-    const auto start = std::chrono::steady_clock::now();
+    const std::clock_t start = std::clock();
     EXPECT_EQ(fact("1", "Threads"), "128");
     EXPECT_EQ(fact("1", "Model"), "Many");
-    EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(2));
+    EXPECT_LT(std::clock() - start, 2 * CLOCKS_PER_SEC);
 }
 
 }  // namespace

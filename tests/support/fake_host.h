@@ -109,7 +109,7 @@ public:
 
     /// Runs a program (found on PATH, no shell) to its end; killed, and the test failed, after the limit.
     Finished run(const std::vector<std::string>& words,
-                 std::chrono::seconds limit = std::chrono::seconds(120));
+                 std::chrono::seconds limit = std::chrono::seconds(600));
     /// Starts one beside the test.
     RunningProgram start(const std::vector<std::string>& words);
 

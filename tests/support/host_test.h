@@ -7,7 +7,7 @@
 
 class FakeHost;
 
-/// How long a body may take before it is killed: CORVISTA_TEST_SECONDS, or 180.
+/// How long a body may take before it is killed: CORVISTA_TEST_SECONDS, or 900.
 std::chrono::seconds bodyLimit();
 
 /// Runs the body in a child process on a fresh host. Failed assertions, skips, exceptions, crashes, sanitizer

@@ -166,7 +166,7 @@ std::string testsDirectory() {
 
 seconds bodyLimit() {
     const char* text = std::getenv("CORVISTA_TEST_SECONDS");
-    return seconds(text ? std::atoi(text) : 180);
+    return seconds(text ? std::atoi(text) : 900);
 }
 
 void inFakeHost(const std::function<void(FakeHost&)>& body, seconds limit) {

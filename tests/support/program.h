@@ -29,9 +29,9 @@ public:
     std::string err() const;
     /// Waits until the text stands in the standard output; false when the program ended or time ran out
     /// before.
-    bool waitForOutput(const std::string& text, std::chrono::seconds limit = std::chrono::seconds(30)) const;
+    bool waitForOutput(const std::string& text, std::chrono::seconds limit = std::chrono::seconds(120)) const;
     /// Waits for its end; throws when it is still running at the limit. To be called once.
-    Finished wait(std::chrono::seconds limit = std::chrono::seconds(30));
+    Finished wait(std::chrono::seconds limit = std::chrono::seconds(120));
 
 private:
     bool endsWithin(std::chrono::milliseconds time) const;
