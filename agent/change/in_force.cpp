@@ -159,11 +159,22 @@ private:
                 }));
     }
 
+    /// What a DHCP client has laid goes with its lease when the interface becomes static for good; but the
+    /// default route only where another one has taken its place.
+    bool isOfLease(const KernelRoute& route) const {
+        const bool isLeased = scene_.isKept && old_ != nullptr && !old_->isPermanent;
+        const KernelNetwork now = KernelNetwork::read();
+        return isLeased && route.protocol == RTPROT_DHCP && route.link == scene_.link.index &&
+               (!route.isDefault() || std::ranges::any_of(now.routes, [&route](const KernelRoute& each) {
+                   return each.isDefault() && each.link == route.link && each.gateway == route.gateway;
+               }));
+    }
+
     void putBackRoutes() {
         for (const KernelRoute& each : scene_.before.routes) {
             const bool preferred = old_ != nullptr && each.source == old_->ip;
             const bool isOurs = each.destination.isIpv6 == ip_.isIpv6 && each.table != RT_TABLE_LOCAL &&
-                                !isMadeOfAddress(each, preferred) &&
+                                !isMadeOfAddress(each, preferred) && !isOfLease(each) &&
                                 (each.link == scene_.link.index || preferred);
             if (isOurs && !KernelNetwork::read().has(each)) {
                 noteIf(addAgain(each, preferred ? std::optional(ip_) : std::nullopt),

@@ -3,14 +3,13 @@
 #include <linux/rtnetlink.h>
 
 #include <algorithm>
-#include <chrono>
 #include <iterator>
 #include <set>
-#include <thread>
 
 #include "agent/change/interface_settings.h"
 #include "agent/change/kept_host.h"
 #include "agent/change/kernel_network.h"
+#include "agent/change/settled.h"
 #include "agent/core/command_deadline.h"
 #include "agent/keep/manager.h"
 #include "agent/keep/way.h"
@@ -151,26 +150,6 @@ std::string placesOf(const keep::Way& way) {
     return places.empty() ? "" : ", in " + places;
 }
 
-bool isOn(const KernelNetwork& network, unsigned link, const keep::FamilyWish& wish) {
-    const auto ip = wish.address ? Ip::parse(*wish.address) : std::nullopt;
-    return !ip || std::ranges::any_of(network.addresses, [&](const KernelAddress& each) {
-        return each.link == link && each.ip == *ip && (!wish.prefix || each.prefix == *wish.prefix);
-    });
-}
-
-/// A daemon asks the network first whether somebody else has an address. One that does not come is set by
-/// the agent.
-void waitUntilSet(unsigned link, const Wish& wish) {
-    constexpr std::chrono::milliseconds kBetweenLooks{20};
-    const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(3);
-    const auto isSet = [&](const KernelNetwork& network) {
-        return isOn(network, link, wish.ipv4) && isOn(network, link, wish.ipv6);
-    };
-    while (!isSet(KernelNetwork::read()) && std::chrono::steady_clock::now() < end) {
-        std::this_thread::sleep_for(kBetweenLooks);
-    }
-}
-
 Kept keepWith(const keep::Link& link, const Wish& wish) {
     const keep::Keeper keeper = keep::keeperOf(link);
     if (keeper.claims.empty() && keeper.unknown.empty()) {
@@ -180,11 +159,11 @@ Kept keepWith(const keep::Link& link, const Wish& wish) {
         const keep::Way way = keep::wayToKeep(link, keeper, wish);
         const CommandScope scope(
             CommandScope::write);  // its commands have a write's time, and are told as its
+        const KernelNetwork before = KernelNetwork::read();
         keep::go(way);
-        if (way.request && keep::toldInstead() == nullptr) {
-            waitUntilSet(link.index, wish);
-        }
-        return {true, "kept over a restart by " + way.system + placesOf(way)};
+        const bool isTold = !way.isEmpty() && keep::toldInstead() == nullptr;
+        const std::string lease = isTold ? settled(link, wish, before) : "";
+        return {true, "kept over a restart by " + way.system + placesOf(way) + (lease.empty() ? "" : "; ") + lease};
     } catch (const keep::CannotKeep& cannot) {
         return {false, "not kept over a restart: " + std::string(cannot.what())};
     }

@@ -23,6 +23,7 @@ struct NetworkChange {
     const NetworkState* left;  ///< what the change left; null when it did not come to its end
     const NetworkState& now;   ///< when the taking back began
     std::uint64_t seconds;     ///< since `before`; lifetimes are shorter by so much
+    bool isKeeperTold = false;  ///< since `now`: the system that keeps an interface has its files back
 };
 
 /// Deletes what the change has made and adds what it has taken away, in three rounds at most. What others

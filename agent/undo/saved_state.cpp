@@ -217,7 +217,8 @@ TakenBack takeBack(const SavedState& before, const SavedState* left, const Saved
     constexpr std::uint64_t kThousand = 1000;
     const std::uint64_t now = bootMilliseconds();
     const std::uint64_t seconds = now < before.milliseconds ? 0 : (now - before.milliseconds) / kThousand;
-    putBackNetwork({before.network, left != nullptr ? &left->network : nullptr, began.network, seconds},
+    const bool isKeeperTold = !calls.before.empty() || !calls.after.empty();
+    putBackNetwork({before.network, left != nullptr ? &left->network : nullptr, began.network, seconds, isKeeperTold},
                    taken.notes);
     return taken;
 }

@@ -1,0 +1,18 @@
+#pragma once
+
+#include <string>
+
+#include "agent/change/kernel_network.h"
+#include "agent/keep/keeper.h"
+#include "agent/keep/wish.h"
+
+namespace cvagent::change {
+
+/// Waits, some seconds at most, until the system that has been told to keep a wish has it in force: a daemon
+/// answers first and sets the link up behind that, asks the network whether somebody else has an address, and
+/// for a lease. A link without a carrier is not waited for.
+/// @param before the network before it was told
+/// @return what is to be told of a lease that is given up or has not come; "" for nothing
+std::string settled(const keep::Link& link, const keep::Wish& wish, const KernelNetwork& before);
+
+}  // namespace cvagent::change
