@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <array>
 #include <cctype>
+#include <string_view>
 
 #include "agent/core/text.h"
 #include "agent/keep/interfaces_file.h"
@@ -15,21 +16,8 @@ namespace {
 constexpr const char* kMainTable = "254";
 constexpr std::array kKinds = {"ethernets", "bonds", "bridges", "vlans", "tunnels", "dummy-devices"};
 
-/// Where a value stands in a line: by itself, not as a part of another one. The comment stands behind it.
-std::size_t placeOf(const std::string& value, const std::string& line) {
-    const auto isPart = [](char letter, bool isInFront) {
-        const auto plain = static_cast<unsigned char>(letter);
-        return std::isalnum(plain) != 0 || letter == '.' || letter == '/' || (isInFront && letter == ':');
-    };
-    for (std::size_t at = line.find(value); at != std::string::npos; at = line.find(value, at + 1)) {
-        const std::size_t end = at + value.size();
-        const bool isBegun = at > 0 && isPart(line[at - 1], true);
-        if (!isBegun && (end == line.size() || !isPart(line[end], false))) {
-            return at;
-        }
-    }
-    refuseYaml(line);
-}
+/// What separates the words of a list.
+constexpr std::string_view kBetweenWords = " []{},\"'";
 
 /// Where something stands: from its first line to behind its last one.
 struct Span {
@@ -75,7 +63,7 @@ public:
         } else if (parsed_[line->first].value.empty()) {
             refuseYaml(lines_[line->first]);
         } else {
-            replace(line->first, parsed_[line->first].value, value);
+            replace(valueOf(line->first), value);
         }
     }
 
@@ -109,7 +97,7 @@ public:
         }
         const std::string value = address + "/" + std::to_string(*prefix);
         if (old) {
-            replace(old->line, old->text, value);
+            replace(*old, value);
         } else {
             addToList(id, list, "\"" + value + "\"");
         }
@@ -128,7 +116,7 @@ public:
         const auto routes = childOf(place, place.first, "routes");
         const auto via = routes ? defaultVia(*routes, isIpv6) : std::nullopt;
         if (via) {
-            replace(via->line, via->text, gateway);
+            replace(*via, gateway);
             return;
         }
         if (routes && !parsed_[routes->first].value.empty()) {
@@ -145,11 +133,17 @@ public:
     }
 
 private:
-    /// A word of a list, where it stands.
+    /// A word of a list or a value, and where it stands.
     struct Word {
         std::size_t line = 0;
+        std::size_t column = 0;
         std::string text;
     };
+
+    Word valueOf(std::size_t line) const {
+        const YamlLine& told = parsed_[line];
+        return {line, told.indent + told.text.size() - told.value.size(), told.value};
+    }
 
     /// The lines below a key, with it: what is indented more, and items of a list that are not.
     Span blockAt(std::size_t first, std::size_t limit) const {
@@ -201,17 +195,15 @@ private:
     std::vector<Word> wordsIn(const Span& list) const {
         std::vector<Word> words;
         for (std::size_t at = list.first; at < list.end; ++at) {
-            std::string text = at == list.first ? parsed_[at].value : parsed_[at].text;
-            std::ranges::replace_if(
-                text,
-                [](char letter) {
-                    return std::string_view("[]{},\"'").find(letter) != std::string_view::npos;
-                },
-                ' ');
-            for (std::string& word : wordsOf(text)) {
-                word.erase(word.find_last_not_of(':') == std::string::npos ? 0
-                                                                           : word.find_last_not_of(':') + 1);
-                words.push_back({at, std::move(word)});
+            const Word whole =
+                at == list.first ? valueOf(at) : Word{at, parsed_[at].indent, parsed_[at].text};
+            std::size_t begin = 0;
+            while ((begin = whole.text.find_first_not_of(kBetweenWords, begin)) != std::string::npos) {
+                const std::size_t end =
+                    std::min(whole.text.find_first_of(kBetweenWords, begin), whole.text.size());
+                const std::string word = whole.text.substr(begin, end - begin);
+                words.push_back({at, whole.column + begin, word.substr(0, word.find_last_not_of(':') + 1)});
+                begin = end;
             }
         }
         return words;
@@ -268,10 +260,9 @@ private:
         return found;
     }
 
-    void replace(std::size_t line, const std::string& old, const std::string& value) {
-        const std::size_t place = placeOf(old, lines_[line]);
-        lines_[line].replace(place, old.size(), value);
-        parsed_[line] = parsed(lines_[line]);
+    void replace(const Word& old, const std::string& value) {
+        lines_[old.line].replace(old.column, old.text.size(), value);
+        parsed_[old.line] = parsed(lines_[old.line]);
     }
 
     void insert(std::size_t place, const std::vector<std::string>& lines) {
@@ -291,7 +282,8 @@ private:
             insert(list->end, {std::string(itemIndent(*list), ' ') + "- " + value});
         } else if (told.ends_with(']')) {
             const bool isEmpty = wordsIn(*list).empty();
-            replace(list->first, told, told.substr(0, told.size() - 1) + (isEmpty ? "" : ", ") + value + "]");
+            replace(valueOf(list->first),
+                    told.substr(0, told.size() - 1) + (isEmpty ? "" : ", ") + value + "]");
         } else {
             refuseYaml(lines_[list->first]);
         }

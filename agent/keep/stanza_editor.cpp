@@ -26,6 +26,9 @@ public:
         if (stanza_.inherits) {
             throw CannotKeep("parts of the stanza of " + inQuotes(name) + " stand elsewhere");
         }
+        if (lines[stanza_.end - 1].ends_with('\\')) {
+            throw CannotKeep("the file ends in the middle of a line of the stanza of " + inQuotes(name));
+        }
     }
 
     bool isByDhcp() const { return stanza_.method == "dhcp"; }

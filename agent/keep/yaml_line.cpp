@@ -1,6 +1,7 @@
 #include "agent/keep/yaml_line.h"
 
 #include <algorithm>
+#include <cctype>
 #include <string_view>
 
 #include "agent/core/text.h"
@@ -9,6 +10,11 @@
 namespace cvagent::keep {
 
 namespace {
+
+/// A tab, an escape, and what no YAML has.
+bool isNotUnderstood(char letter) {
+    return std::iscntrl(static_cast<unsigned char>(letter)) != 0 || letter == '\\';
+}
 
 /// Up to a comment: "#" at the beginning or behind a blank, outside of quotes. Counts brackets on the way.
 std::string meaningOf(const std::string& line) {
@@ -32,11 +38,12 @@ std::string meaningOf(const std::string& line) {
             depth -= letter == ']' || letter == '}' ? 1 : 0;
         }
     }
-    const std::string meaning = line.substr(0, end);
-    if (quote != '\0' || depth != 0 || meaning.find_first_of("\t\\") != std::string::npos) {
+    std::string meaning = line.substr(0, end);
+    meaning.erase(meaning.find_last_not_of(" \r") + 1);
+    if (quote != '\0' || depth != 0 || std::ranges::any_of(meaning, isNotUnderstood)) {
         refuseYaml(line);
     }
-    return meaning.substr(0, meaning.find_last_not_of(" \r") + 1);
+    return meaning;
 }
 
 }  // namespace

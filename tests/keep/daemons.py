@@ -214,23 +214,25 @@ def refuse_with_clock():
         raise SystemExit("with CAP_SYS_TIME this could set the machine's clock: start it as scripts/keep-test does")
 
 
-def main():
-    parser = argparse.ArgumentParser(description=__doc__)
+def main(module, description, system_of, evidence):
+    """The checks of one module. system_of(check) is the name and the packages of the system that it runs on."""
+    parser = argparse.ArgumentParser(description=description)
     parser.add_argument("build", help="directory of a build of this architecture")
     parser.add_argument("--only", default="", help="run only the checks that begin so")
     options = parser.parse_args()
     refuse_with_clock()
-    system = root.make("keep", os.popen("dpkg --print-architecture").read().strip(), PACKAGES)
-    checks = [row for row in CHECKS["main"] if row[1].__module__ == __name__ and row[0].startswith(options.only)]
+    architecture = os.popen("dpkg --print-architecture").read().strip()
+    checks = [row for row in CHECKS["main"] if row[1].__module__ == module and row[0].startswith(options.only)]
     report = Report()
     for name, function in checks:
-        context = Context(system, options.build)
+        system, packages = system_of(function)
+        context = Context(root.make(system, architecture, packages), options.build)
         try:
-            report.run(name, function, context, evidence_of(context.host))
+            report.run(name, function, context, evidence(context.host))
         finally:
             context.host.stop()
     return report.finish(len(checks))
 
 
 if __name__ == "__main__":
-    sys.exit(main())
+    sys.exit(main(__name__, __doc__, lambda _: ("keep", PACKAGES), evidence_of))

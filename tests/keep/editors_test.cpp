@@ -189,6 +189,11 @@ TEST(StanzaEditor, RefusesWhatItDoesNotUnderstand) {
     EXPECT_THAT(refused(head + " address 192.0.2.1/24\n address 192.0.2.3/24\n", wish),
                 HasSubstr("not one line"));
     EXPECT_THAT(refused(head + " address \\\n 192.0.2.1/24\n", wish), HasSubstr("not one line"));
+    // A line more would be the rest of the last one.
+    EXPECT_THAT(refused(head + " address 192.0.2.1/24\n up true \\", names({"192.0.2.53"}, {})),
+                HasSubstr("in the middle of a line"));
+    EXPECT_THAT(refused(head + " address 192.0.2.1/24\n up true \\\n# all\\\n", gateway("192.0.2.2")),
+                HasSubstr("in the middle of a line"));
 }
 
 /// Values are checked long before; here it is for who comes another way.
@@ -474,6 +479,8 @@ TEST(NetplanFile, ChangesTheValueWhereItStands) {
         "      nameservers:\n        addresses: [192.0.2.53]\n      addresses: [192.0.2.77/24]\n");
     EXPECT_EQ(netplan("      gateway4: 192.0.2.1  # 192.0.2.1\n", gateway("192.0.2.2")),
               "      gateway4: 192.0.2.2  # 192.0.2.1\n");
+    EXPECT_EQ(netplan("      addresses: [192.0.2.10/24\xd1, 192.0.2.10/24]\n", prefix(25)),
+              "      addresses: [192.0.2.10/24\xd1, 192.0.2.10/25]\n");
 }
 
 TEST(NetplanFile, HasAPlaceForWhatIsNew) {
@@ -561,7 +568,7 @@ TEST(NetplanFile, IsRefusedWhereItIsNotUnderstood) {
          {"      addresses: &a [192.0.2.1/24]\n", "      addresses: *a\n", "      <<: *base\n", "\tmtu: 1\n",
           "      mtu:\t1\n", "      addresses: [192.0.2.1/24,\n        192.0.2.2/24]\n",
           "      nameservers: {addresses: [192.0.2.3],\n        search: [a]}\n", "      a: |\n        b\n",
-          "      a: !!int 3\n", "      a: \"b\n", "      a: \"\\x31\"\n", "      what\n",
+          "      a: !!int 3\n", "      a: b\x01\n", "      a: \"b\n", "      a: \"\\x31\"\n", "      what\n",
           "  - x\n    y: z\n  q\n", "    - mtu: 1\n", "      - x\n", "---\nnetwork:\n"}) {
         EXPECT_THAT(refused(head + line, wish), HasSubstr("not understood")) << line;
     }

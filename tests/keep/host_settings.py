@@ -1,11 +1,9 @@
 """Changes name, zone and name servers of a host with the real systemd, and restarts that. Reports as TAP."""
 
-import argparse
-import os
 import sys
 
-from daemons import AGENT, NODE, PACKAGES, Context, refuse_with_clock, root
-from tap import CHECKS, Report, check, expect, expect_equal
+from daemons import AGENT, NODE, PACKAGES, main
+from tap import check, expect, expect_equal
 
 # Each of the two makes /etc/resolv.conf, so they are never together.
 WITH_RESOLVCONF = ["dbus", "ifupdown", "iproute2", "libblkid1", "libsqlite3-0", "libstdc++6", "libsystemd0", "resolvconf", "systemd",
@@ -109,25 +107,9 @@ def evidence_of(host):
     return collect
 
 
-def main():
-    parser = argparse.ArgumentParser(description=__doc__)
-    parser.add_argument("build", help="directory of a build of this architecture")
-    parser.add_argument("--only", default="", help="run only the checks that begin so")
-    options = parser.parse_args()
-    refuse_with_clock()
-    architecture = os.popen("dpkg --print-architecture").read().strip()
-    checks = [row for row in CHECKS["main"] if row[1].__module__ == __name__ and row[0].startswith(options.only)]
-    report = Report()
-    for name, function in checks:
-        with_resolvconf = function is resolvconf
-        system = root.make("resolvconf" if with_resolvconf else "keep", architecture, WITH_RESOLVCONF if with_resolvconf else PACKAGES)
-        context = Context(system, options.build)
-        try:
-            report.run(name, function, context, evidence_of(context.host))
-        finally:
-            context.host.stop()
-    return report.finish(len(checks))
+def system_of(function):
+    return ("resolvconf", WITH_RESOLVCONF) if function is resolvconf else ("keep", PACKAGES)
 
 
 if __name__ == "__main__":
-    sys.exit(main())
+    sys.exit(main(__name__, __doc__, system_of, evidence_of))

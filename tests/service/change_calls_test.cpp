@@ -5,6 +5,7 @@
 #include <limits>
 #include <nlohmann/json.hpp>
 
+#include "tests/agent/linked_host.h"
 #include "tests/service/service_run.h"
 #include "tests/support/waiting.h"
 
@@ -254,33 +255,14 @@ HOST_TEST_F(ServiceChanges, ThatAreTriedOutAtAStopAreNotMade) {
 }
 
 /// The service with the real plug-in on a kernel's links; one interface has a file that is root's alone.
-class ServicePlans : public HostFixture {
+class ServicePlans : public LinkedHost {
 protected:
     void setUpHost(FakeHost& host) override {
 #if defined(__SANITIZE_THREAD__)
         GTEST_SKIP() << "the sanitizer's own thread keeps the program that tries changes from its fence";
 #endif
-        for (const char* tool : {"ip", "hostname"}) {
-            host.realTool(tool);
-        }
-        host.useKernelNetwork();
-        host.file("/etc/hosts", "127.0.0.1\tlocalhost\n");
-        host.file("/etc/resolv.conf", "nameserver 192.0.2.53\n");
-        host.file("/etc/sysconfig/network/routes", "default\t192.0.2.1\t-\n");
-        host.file("/etc/sysconfig/network/config", "NETCONFIG_DNS_POLICY=\"\"\n");
-        for (const std::string words :
-             {"link add eth0 type veth peer name sw0", "link set eth0 addrgenmode none",
-              "link set sw0 addrgenmode none", "link set eth0 up", "link set sw0 up",
-              "address add 192.0.2.10/24 broadcast + dev eth0", "route add default via 192.0.2.1"}) {
-            const Finished done = host.run({"sh", "-c", "ip " + words});
-            EXPECT_EQ(done.status, 0) << words << ": " << done.err;
-        }
-        ASSERT_TRUE(carrierComes("eth0") && carrierComes("sw0"));
-        std::string hardware = host.run({"cat", "/sys/class/net/eth0/address"}).out;
-        hardware.pop_back();
-        file = "/etc/sysconfig/network/ifcfg-eth-id-" + hardware;
-        host.file(file, "BOOTPROTO=static\nIPADDR=192.0.2.10\nNETMASK=255.255.255.0\nWPA_PSK=S3CR3T\n");
-        host.run({"chmod", "600", file});
+        LinkedHost::setUpHost(host);
+        host.file(file_, host.read(file_).value_or("") + "WPA_PSK=S3CR3T\n", 0600);
     }
     void serve(FakeHost& host) {
         run.emplace(host);
@@ -300,7 +282,6 @@ protected:
         {"computer", "OwnerContact", {"room 4"}},
         {"ip-config:eth0", "InterfaceState", {"12"}}};
     std::optional<ServiceRun> run;
-    std::string file;
 };
 
 HOST_TEST_F(ServicePlans, AreThoseByHand) {
@@ -319,7 +300,7 @@ HOST_TEST_F(ServicePlans, AreThoseByHand) {
     EXPECT_EQ(asked.out, own.out);
     EXPECT_EQ(asked.err, own.err);
     EXPECT_EQ(asked.status, 0);
-    EXPECT_THAT(host.read(file).value_or(""), HasSubstr("IPADDR=192.0.2.10\n")) << "nothing was changed";
+    EXPECT_THAT(host.read(file_).value_or(""), HasSubstr("IPADDR=192.0.2.10\n")) << "nothing was changed";
     EXPECT_EQ(Json::parse(own.out)["plan"]["answers"][3]["before"], "1") << "the host's, not the copy's";
 }
 
@@ -371,7 +352,7 @@ HOST_TEST_F(ServicePlans, TellOthersNothingThatOnlyRootMayRead) {
             own = user["plan"]["files"][i];
         }
     }
-    EXPECT_THAT(withheld, ElementsAre(file, "/opt/vantrel/corvista/data/asset.dat"));
+    EXPECT_THAT(withheld, ElementsAre(file_, "/opt/vantrel/corvista/data/asset.dat"));
     EXPECT_EQ(user, root) << "all else is the same";
 }
 

@@ -3,6 +3,7 @@
 
 #include <csignal>
 
+#include "tests/agent/linked_host.h"
 #include "tests/service/service_run.h"
 
 namespace {
@@ -21,32 +22,14 @@ constexpr const char* kMove =
                                   {"node": "computer", "property": "OwnerName", "value": "x"},
                                   {"node": "ip-config:eth0", "property": "IPv4Address", "value": "203.0.113.7"}])";
 
-class ServiceTakesBack : public HostFixture {
+class ServiceTakesBack : public LinkedHost {
 protected:
     void setUpHost(FakeHost& host) override {
 #if defined(__SANITIZE_THREAD__)
         GTEST_SKIP() << "the sanitizer's own thread keeps the program that tries changes from its fence";
 #endif
-        for (const char* tool : {"ip", "hostname"}) {
-            host.realTool(tool);
-        }
-        host.useKernelNetwork();
-        host.file("/etc/hosts", "127.0.0.1\tlocalhost\n");
-        host.file("/etc/resolv.conf", "nameserver 192.0.2.53\n");
-        host.file("/etc/sysconfig/network/routes", "default\t192.0.2.1\t-\n");
-        host.file("/etc/sysconfig/network/config", "NETCONFIG_DNS_POLICY=\"\"\n");
+        LinkedHost::setUpHost(host);
         host.file("/root/changes", kMove);
-        for (const std::string words :
-             {"link add eth0 type veth peer name sw0", "link set eth0 addrgenmode none", "link set eth0 up",
-              "link set sw0 up", "address add 192.0.2.10/24 broadcast + dev eth0",
-              "route add default via 192.0.2.1"}) {
-            const Finished done = host.run({"sh", "-c", "ip " + words});
-            EXPECT_EQ(done.status, 0) << words << ": " << done.err;
-        }
-        std::string hardware = host.run({"cat", "/sys/class/net/eth0/address"}).out;
-        hardware.pop_back();
-        file_ = "/etc/sysconfig/network/ifcfg-eth-id-" + hardware;
-        host.file(file_, "BOOTPROTO=static\nIPADDR=192.0.2.10\nNETMASK=255.255.255.0\n");
         old_ = look(host);
     }
     /// It does not see what is mounted later.
@@ -84,7 +67,6 @@ protected:
     }
 
     std::optional<ServiceRun> service_;
-    std::string file_;
     std::string old_;
 };
 
