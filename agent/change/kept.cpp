@@ -163,7 +163,8 @@ Kept keepWith(const keep::Link& link, const Wish& wish) {
         keep::go(way);
         const bool isTold = !way.isEmpty() && keep::toldInstead() == nullptr;
         const std::string lease = isTold ? settled(link, wish, before) : "";
-        return {true, "kept over a restart by " + way.system + placesOf(way) + (lease.empty() ? "" : "; ") + lease};
+        return {true,
+                "kept over a restart by " + way.system + placesOf(way) + (lease.empty() ? "" : "; ") + lease};
     } catch (const keep::CannotKeep& cannot) {
         return {false, "not kept over a restart: " + std::string(cannot.what())};
     }

@@ -79,11 +79,10 @@ private:
 
 std::string settled(const keep::Link& link, const keep::Wish& wish, const KernelNetwork& before) {
     constexpr std::chrono::milliseconds kBetweenLooks{20};
-    constexpr std::chrono::seconds kLongest{3};
-    constexpr std::chrono::seconds kLongestForLease{5};
+    constexpr std::chrono::seconds kLongest{5};
+    constexpr std::chrono::seconds kLongestForLease{10};
     const Settling settling(link, wish, before);
-    const auto end =
-        std::chrono::steady_clock::now() + (settling.isByDhcp() ? kLongestForLease : kLongest);
+    const auto end = std::chrono::steady_clock::now() + (settling.isByDhcp() ? kLongestForLease : kLongest);
     const KernelLink* kernels = before.link(link.name);
     const bool isWaitedFor = kernels != nullptr && kernels->isRunning;
     while (isWaitedFor && !settling.isSet() && std::chrono::steady_clock::now() < end) {

@@ -18,7 +18,7 @@ bool isIn(const std::vector<Entry>& entries, const Entry& entry) {
 
 EndedLeases::EndedLeases(const NetworkChange& change, const std::vector<unsigned>& links)
     : change_(change), links_(links) {
-    constexpr std::uint64_t kLongest = 2000;
+    constexpr std::uint64_t kLongest = 5000;
     constexpr std::chrono::milliseconds kLook{20};
     const std::uint64_t end = bootMilliseconds() + kLongest;
     told_ = change.isKeeperTold ? NetworkState::read() : change.now;

@@ -13,7 +13,7 @@ namespace cvagent::undo {
 /// stay, and what they had taken the place of is wanted again.
 class EndedLeases {
 public:
-    /// A daemon ends them behind its answer: waits for that, two seconds at most.
+    /// A daemon ends them behind its answer: waits for that, five seconds at most.
     /// @param links that are known
     EndedLeases(const NetworkChange& change, const std::vector<unsigned>& links);
 

@@ -138,8 +138,10 @@ public:
         const NetworkState& left = change.left != nullptr ? *change.left : change.now;
         const EndedLeases leases(change, links_);
         for (const EntryKind& kind : entryKinds()) {
-            Looks looks{kind.entries(change.before, links_), kind.entries(left, links_),
-                        kind.entries(change.now, links_), {}};
+            Looks looks{kind.entries(change.before, links_),
+                        kind.entries(left, links_),
+                        kind.entries(change.now, links_),
+                        {}};
             looks.freed = leases.takeOut(kind, looks.now);
             wanted_.push_back(wantedOf(kind, looks, [&](const Entry& each) {
                 notes_.push_back(kind.text(each.message, change.before.network) +

@@ -218,8 +218,9 @@ TakenBack takeBack(const SavedState& before, const SavedState* left, const Saved
     const std::uint64_t now = bootMilliseconds();
     const std::uint64_t seconds = now < before.milliseconds ? 0 : (now - before.milliseconds) / kThousand;
     const bool isKeeperTold = !calls.before.empty() || !calls.after.empty();
-    putBackNetwork({before.network, left != nullptr ? &left->network : nullptr, began.network, seconds, isKeeperTold},
-                   taken.notes);
+    putBackNetwork(
+        {before.network, left != nullptr ? &left->network : nullptr, began.network, seconds, isKeeperTold},
+        taken.notes);
     return taken;
 }
 
