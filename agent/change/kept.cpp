@@ -160,7 +160,7 @@ Kept keepWith(const keep::Link& link, const Wish& wish) {
         const CommandScope scope(
             CommandScope::write);  // its commands have a write's time, and are told as its
         const KernelNetwork before = KernelNetwork::read();
-        keep::go(way);
+        goWithLease(way, link);
         const bool isTold = !way.isEmpty() && keep::toldInstead() == nullptr;
         const std::string lease = isTold ? settled(link, wish, before) : "";
         return {true,

@@ -6,6 +6,9 @@
 #include <chrono>
 #include <thread>
 
+#include "agent/keep/manager.h"
+#include "agent/undo/renewed_lease.h"
+
 namespace cvagent::change {
 
 namespace {
@@ -92,6 +95,18 @@ std::string settled(const keep::Link& link, const keep::Wish& wish, const Kernel
         return "no address has come by DHCP yet";
     }
     return settling.endsLease() ? "name servers of the lease may go with it" : "";
+}
+
+void goWithLease(const keep::Way& way, const keep::Link& link) {
+    const bool isReapplied =
+        std::ranges::find(way.callsAfter, undo::kReapply + (" " + link.name)) != way.callsAfter.end();
+    if (!isReapplied || way.isEmpty() || keep::toldInstead() != nullptr) {
+        keep::go(way);
+        return;
+    }
+    const undo::RenewedLease lease(link.name);
+    keep::go(way);
+    lease.wait();
 }
 
 }  // namespace cvagent::change

@@ -4,6 +4,7 @@
 
 #include "agent/change/kernel_network.h"
 #include "agent/keep/keeper.h"
+#include "agent/keep/way.h"
 #include "agent/keep/wish.h"
 
 namespace cvagent::change {
@@ -14,5 +15,8 @@ namespace cvagent::change {
 /// @param before the network before it was told
 /// @return what is to be told of a lease that is given up or has not come; "" for nothing
 std::string settled(const keep::Link& link, const keep::Wish& wish, const KernelNetwork& before);
+
+/// Goes the way, with what NetworkManager needs for a lease.
+void goWithLease(const keep::Way& way, const keep::Link& link);
 
 }  // namespace cvagent::change

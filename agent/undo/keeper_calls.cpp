@@ -18,6 +18,7 @@
 #include <thread>
 
 #include "agent/undo/boot_clock.h"
+#include "agent/undo/renewed_lease.h"
 #include "hosttools/files.h"
 #include "hosttools/text.h"
 
@@ -41,7 +42,7 @@ constexpr std::array kKnownCalls{
     KnownCall{"systemctl try-reload-or-restart systemd-resolved", false, false},
     KnownCall{"resolvconf -u", false, false},
     KnownCall{"nmcli connection reload", false, false},
-    KnownCall{"nmcli device reapply", true, false},
+    KnownCall{kReapply, true, false},
     KnownCall{"wicked ifreload", true, false},
     KnownCall{"ifdown", true, false},
     KnownCall{"ifup", true, false},
@@ -159,9 +160,13 @@ KeeperCalls KeeperCalls::whileStarting() const {
 }
 
 void runCalls(const std::vector<std::string>& calls, std::vector<std::string>& notes) {
+    const std::string reapply = std::string(kReapply) + " ";
     for (const std::string& call : calls) {
+        const RenewedLease lease(call.starts_with(reapply) ? call.substr(reapply.size()) : "");
         if (const std::string problem = problemOf(call); !problem.empty()) {
             notes.push_back("'" + call + "' " + problem);
+        } else {
+            lease.wait();
         }
     }
 }

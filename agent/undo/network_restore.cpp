@@ -11,9 +11,9 @@
 #include <set>
 #include <thread>
 
-#include "agent/undo/ended_leases.h"
 #include "agent/undo/link_restore.h"
 #include "agent/undo/network_entries.h"
+#include "agent/undo/settled_leases.h"
 
 namespace cvagent::undo {
 
@@ -136,7 +136,7 @@ public:
     Restore(const NetworkChange& change, std::vector<std::string>& notes)
         : change_(change), notes_(notes), links_(linksOf(change.before)) {
         const NetworkState& left = change.left != nullptr ? *change.left : change.now;
-        const EndedLeases leases(change, links_);
+        const SettledLeases leases(change, links_);
         for (const EntryKind& kind : entryKinds()) {
             Looks looks{kind.entries(change.before, links_),
                         kind.entries(left, links_),

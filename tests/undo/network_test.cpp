@@ -2,8 +2,10 @@
 #include <gmock/gmock.h>
 #include <linux/rtnetlink.h>
 
+#include <chrono>
 #include <sstream>
 
+#include "agent/undo/keeper_calls.h"
 #include "agent/undo/saved_state.h"
 #include "hosttools/netlink.h"
 #include "tests/support/fake_host.h"
@@ -241,6 +243,23 @@ HOST_TEST_F(LateLease, OfAnotherHandStays) {
     EXPECT_THAT(now, HasSubstr("192.0.2.100/24"));
     EXPECT_THAT(now, HasSubstr("default via 192.0.2.200"));
     EXPECT_THAT(now, testing::Not(HasSubstr("192.0.2.77")));
+}
+
+/// It asks for the lease anew, and would take one of the same second for no news.
+HOST_TEST_F(Network, ALeaseIsAsOldAsNetworkManagerWantsIt) {
+    host.realTool("sleep");
+    host.tool("/usr/bin/nmcli device reapply eth1",
+              {"", 0, "", 0,
+               "(sleep 0.3; ip address change 198.51.100.3/24 dev eth1 valid_lft 2500 preferred_lft 2500) "
+               ">/dev/null 2>&1 &"});
+    ip(host, "address change 198.51.100.3/24 dev eth1 valid_lft 3000 preferred_lft 3000");
+    const auto begin = std::chrono::steady_clock::now();
+    std::vector<std::string> notes;
+    cvagent::undo::runCalls({"nmcli device reapply eth1"}, notes);
+    EXPECT_THAT(notes, IsEmpty());
+    EXPECT_GE(std::chrono::steady_clock::now() - begin, std::chrono::milliseconds(1000));
+    const std::string addresses = ip(host, "-4 -o address show dev eth1");
+    EXPECT_THAT(addresses, testing::Not(HasSubstr("valid_lft 30"))) << "it was not waited for";
 }
 
 HOST_TEST_F(Network, KeepsWhatOthersHaveDoneSince) {
