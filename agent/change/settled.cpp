@@ -81,7 +81,7 @@ private:
 }  // namespace
 
 std::string settled(const keep::Link& link, const keep::Wish& wish, const KernelNetwork& before) {
-    constexpr std::chrono::milliseconds kBetweenLooks{20};
+    constexpr std::chrono::milliseconds kBetweenSettledLooks{20};
     constexpr std::chrono::seconds kLongest{5};
     constexpr std::chrono::seconds kLongestForLease{10};
     const Settling settling(link, wish, before);
@@ -89,7 +89,7 @@ std::string settled(const keep::Link& link, const keep::Wish& wish, const Kernel
     const KernelLink* kernels = before.link(link.name);
     const bool isWaitedFor = kernels != nullptr && kernels->isRunning;
     while (isWaitedFor && !settling.isSet() && std::chrono::steady_clock::now() < end) {
-        std::this_thread::sleep_for(kBetweenLooks);
+        std::this_thread::sleep_for(kBetweenSettledLooks);
     }
     if (settling.isByDhcp() && !settling.hasAnyAddress()) {
         return "no address has come by DHCP yet";

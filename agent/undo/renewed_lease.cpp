@@ -22,11 +22,11 @@ constexpr std::chrono::milliseconds kBetweenRenewalLooks{20};
 /// As the kernel stamps addresses, in hundredths of a second.
 std::uint32_t kernelsNow() {
     constexpr std::uint64_t kHundred = 100;
-    constexpr std::uint64_t kNanoseconds = 10'000'000;
+    constexpr std::uint64_t kTenMilliseconds = 10'000'000;
     timespec now{};
     clock_gettime(CLOCK_MONOTONIC, &now);
     return static_cast<std::uint32_t>(static_cast<std::uint64_t>(now.tv_sec) * kHundred +
-                                      static_cast<std::uint64_t>(now.tv_nsec) / kNanoseconds);
+                                      static_cast<std::uint64_t>(now.tv_nsec) / kTenMilliseconds);
 }
 
 }  // namespace
