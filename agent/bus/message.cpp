@@ -80,6 +80,10 @@ void Message::allowInteraction() {
     check(sd_bus_message_set_allow_interactive_authorization(get(), 1), "cannot let the user be asked");
 }
 
+void Message::startNobody() {
+    check(sd_bus_message_set_auto_start(get(), 0), "cannot leave the service as it is");
+}
+
 Message Message::reply() const {
     sd_bus_message* made = nullptr;
     check(sd_bus_message_new_method_return(get(), &made), "cannot make an answer");

@@ -37,6 +37,8 @@ public:
     /// Whether its sender lets the user be asked meanwhile.
     bool allowsInteraction() const;
     void allowInteraction();
+    /// A call that starts nobody who would have the name.
+    void startNobody();
 
     /// The answer to this call, to be filled. Throws Error.
     Message reply() const;

@@ -118,13 +118,19 @@ bool isStartedBySystemd(const std::string& guard, const std::string& number) {
                  "--property=StartLimitIntervalSec=0", "--property=KillMode=process", "--", guard, number});
 }
 
-void addUsual(std::set<std::string>& paths) {
-    for (const char* each :
-         {"/etc/hosts", "/etc/HOSTNAME", "/etc/hostname", "/etc/resolv.conf", "/etc/localtime",
-          "/etc/localtime.bak", "/etc/timezone", "/etc/sysconfig/clock", "/etc/sysconfig/clock.bak",
-          "/etc/sysconfig/network/config", "/etc/sysconfig/network/routes"}) {
+void addZone(std::set<std::string>& paths) {
+    for (const char* each : {"/etc/localtime", "/etc/localtime.bak", "/etc/timezone", "/etc/sysconfig/clock",
+                             "/etc/sysconfig/clock.bak"}) {
         paths.insert(each);
     }
+}
+
+void addNetwork(std::set<std::string>& paths) {
+    for (const char* each : {"/etc/hosts", "/etc/HOSTNAME", "/etc/hostname", "/etc/resolv.conf",
+                             "/etc/sysconfig/network/config", "/etc/sysconfig/network/routes"}) {
+        paths.insert(each);
+    }
+    const std::string settings = kNetworkSettings;
     std::error_code none;
     for (const auto& entry : fs::directory_iterator(kNetworkSettings, none)) {
         if (entry.is_regular_file(none)) {
@@ -132,19 +138,22 @@ void addUsual(std::set<std::string>& paths) {
         }
     }
     for (const auto& link : fs::directory_iterator("/sys/class/net", none)) {
-        const std::string settings = kNetworkSettings;
         paths.insert(settings + "/ifroute-" + link.path().filename().string());
         paths.insert(settings + "/ifcfg-" + link.path().filename().string());
     }
 }
 
-/// What stands in the data directory; other writes may go on there, so only where no plan says what it will
-/// be.
-void addData(std::set<std::string>& paths) {
+// What stands in the data directory; other writes may go on there, so only where no plan says what it will
+// be.
+
+void addOwners(std::set<std::string>& paths) {
     const char* const directory = QX::CorvistaUtilities::getMoraineDataDir();
     if (directory != nullptr) {
         paths.insert(std::string(directory) + "asset.dat");
     }
+}
+
+void addSavedSettings(std::set<std::string>& paths) {
     std::error_code none;
     for (const auto& entry : fs::directory_iterator(kSavedSettings, none)) {
         if (entry.path().filename().string().starts_with("ifcfg-") && entry.is_regular_file(none)) {
@@ -158,7 +167,7 @@ void addData(std::set<std::string>& paths) {
 
 }  // namespace
 
-std::vector<std::string> touchedPaths(const std::vector<FileChange>& planned) {
+std::vector<std::string> touchedPaths(const std::vector<FileChange>& planned, bool isOfNetwork) {
     std::set<std::string> paths;
     for (const FileChange& file : planned) {
         const bool isLock = file.path.ends_with("/.lock");  // of who makes the change
@@ -166,9 +175,15 @@ std::vector<std::string> touchedPaths(const std::vector<FileChange>& planned) {
             paths.insert(file.path);
         }
     }
-    addUsual(paths);
+    addZone(paths);
+    if (isOfNetwork) {
+        addNetwork(paths);
+    }
     if (planned.empty()) {
-        addData(paths);
+        addOwners(paths);
+    }
+    if (planned.empty() && isOfNetwork) {
+        addSavedSettings(paths);
     }
     std::error_code none;
     for (const std::string& link : std::set<std::string>(paths)) {

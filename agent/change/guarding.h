@@ -11,7 +11,8 @@ namespace cvagent::change {
 /// What has to be saved before a change: what its plan names, and what the plug-in writes to on any host, for
 /// where there is no plan.
 /// @param planned of the plan; empty where there is none
-std::vector<std::string> touchedPaths(const std::vector<FileChange>& planned);
+/// @param isOfNetwork false: nothing but the host's own settings is written
+std::vector<std::string> touchedPaths(const std::vector<FileChange>& planned, bool isOfNetwork = true);
 
 /// The place for the changes of this host, made where it is missing. Root's. Throws undo::ChangeError.
 std::string changesPlace();

@@ -285,7 +285,40 @@ std::vector<KernelRoute> defaultRoutes(const KernelNetwork& network) {
     return found;
 }
 
+/// What is gone though a gateway has nothing to do with it: the system that keeps the interface has set it up
+/// anew. Leases and what the kernel makes by itself come again.
+void putBackOthers(const Scene& scene, EffectInForce& effect) {
+    const auto noteIf = [&effect](int problem, const std::string& what) {
+        if (problem != 0) {
+            effect.notes.push_back(what + " is gone: " + reason(problem));
+        }
+    };
+    const KernelNetwork now = KernelNetwork::read();
+    for (const KernelAddress& each : scene.before.addresses) {
+        const bool isOurs = each.link == scene.link.index && each.isGlobal && each.isPermanent;
+        if (isOurs && now.find(each.link, each.ip, each.prefix) == nullptr) {
+            noteIf(addAgain(each), "the address " + each.ip.text());
+        }
+    }
+    for (const KernelRoute& each : scene.before.routes) {
+        const bool isMade = each.protocol == RTPROT_KERNEL || each.protocol == RTPROT_RA;
+        const bool isOurs = each.link == scene.link.index && each.table != RT_TABLE_LOCAL && !isMade;
+        if (isOurs && !each.isDefault() && !now.has(each)) {
+            noteIf(addAgain(each, std::nullopt), "the route " + textOf(each, scene.before));
+        }
+    }
+}
+
+EffectInForce ipv6Gateway(const Scene& scene) {
+    EffectInForce effect;
+    if (scene.isKept) {
+        putBackOthers(scene, effect);
+    }
+    return effect;
+}
+
 EffectInForce ipv4Gateway(const Scene& scene) {
+    EffectInForce effect = ipv6Gateway(scene);
     const auto gateway = Ip::parse(scene.value);
     const KernelNetwork now = KernelNetwork::read();
     const std::vector<KernelRoute> routes = defaultRoutes(now);
@@ -293,16 +326,16 @@ EffectInForce ipv4Gateway(const Scene& scene) {
         std::ranges::any_of(routes, [&gateway](const KernelRoute& each) { return each.gateway == gateway; });
     const bool isWritten = scene.isKept || isDefaultInRoutesFile(scene.value);
     if (!gateway || isThere || !isWritten) {
-        return {};
+        return effect;
     }
     const KernelAddress* way = wayTo(now, *gateway, scene.link.index);
     if (way == nullptr) {
-        return {"no interface has a subnet with this gateway, so the running host has not got it", {}};
+        effect.lacking = "no interface has a subnet with this gateway, so the running host has not got it";
+        return effect;
     }
     const auto own = std::ranges::find(routes, way->link, &KernelRoute::link);
     const auto replaced = own != routes.end() ? own : routes.begin();
     const unsigned metric = replaced != routes.end() ? replaced->metric : 0;
-    EffectInForce effect;
     if (const int problem = setDefaultRoute(*gateway, way->link, metric); problem != 0) {
         effect.lacking = "the running host does not take the gateway: " + reason(problem);
     } else if (replaced != routes.end()) {
@@ -315,8 +348,8 @@ struct Effector {
     unsigned int property;
     EffectInForce (*act)(const Scene& scene);
 };
-constexpr Effector kEffectors[] = {
-    {25, ipv4Address}, {26, subnetMask}, {27, ipv6Address}, {100, ipv4Gateway}, {102, prefixLength}};
+constexpr Effector kEffectors[] = {{25, ipv4Address},  {26, subnetMask},   {27, ipv6Address},
+                                   {100, ipv4Gateway}, {101, ipv6Gateway}, {102, prefixLength}};
 
 /// @return given whether the value is kept; none for what is not about a link of the kernel's
 std::function<EffectInForce(bool)> throughNetlink(const IC::MutableNode& node, const Property& row,
@@ -345,9 +378,10 @@ std::function<EffectInForce(bool)> throughNetlink(const IC::MutableNode& node, c
 BringIntoForce bringingIntoForce(Neighbours neighbours) {
     return [neighbours](const IC::MutableNode& node, const Property& row,
                         const IC::PropertyValue& value) -> std::function<EffectInForce()> {
-        auto keep = keepingOfHost(node, row, value, neighbours == Neighbours::notAsked);
+        const bool isTried = neighbours == Neighbours::notAsked;
+        auto keep = keepingOfHost(node, row, value, isTried);
         if (!keep) {
-            keep = keepingOverRestart(node, row, value);
+            keep = keepingOverRestart(node, row, value, isTried);
         }
         auto act = throughNetlink(node, row, value, neighbours);
         if (!keep && !act) {

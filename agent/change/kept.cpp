@@ -11,8 +11,8 @@
 #include "agent/change/kernel_network.h"
 #include "agent/change/settled.h"
 #include "agent/core/command_deadline.h"
-#include "agent/keep/manager.h"
 #include "agent/keep/way.h"
+#include "agent/undo/networkd_links.h"
 #include "framework/qx/whole_number.h"
 
 namespace cvagent::change {
@@ -150,7 +150,17 @@ std::string placesOf(const keep::Way& way) {
     return places.empty() ? "" : ", in " + places;
 }
 
-Kept keepWith(const keep::Link& link, const Wish& wish) {
+/// @return what a person should know of it, behind where it is kept
+std::string waitUntilInForce(const keep::Way& way, const keep::Link& link, const Wish& wish,
+                             const KernelNetwork& before, const undo::NetworkdLinks& links) {
+    const Settled now = settled(link, wish, before);
+    const bool isReload = std::ranges::find(way.callsAfter, undo::kNetworkdReload) != way.callsAfter.end();
+    const bool isLate = isReload && !now.lacksLease && !links.waitUntilSetUp();
+    return (isLate ? ", but systemd-networkd has not set the interface up within ten seconds" : "") +
+           (now.note.empty() ? "" : "; " + now.note);
+}
+
+Kept keepWith(const keep::Link& link, const Wish& wish, bool isTried) {
     const keep::Keeper keeper = keep::keeperOf(link);
     if (keeper.claims.empty() && keeper.unknown.empty()) {
         return {};
@@ -160,18 +170,18 @@ Kept keepWith(const keep::Link& link, const Wish& wish) {
         const CommandScope scope(
             CommandScope::write);  // its commands have a write's time, and are told as its
         const KernelNetwork before = KernelNetwork::read();
+        const undo::NetworkdLinks links(link.index);
         goWithLease(way, link);
-        const bool isTold = !way.isEmpty() && keep::toldInstead() == nullptr;
-        const std::string lease = isTold ? settled(link, wish, before) : "";
-        return {true,
-                "kept over a restart by " + way.system + placesOf(way) + (lease.empty() ? "" : "; ") + lease};
+        const bool isWaitedFor = !isTried && !way.isEmpty();
+        const std::string note = isWaitedFor ? waitUntilInForce(way, link, wish, before, links) : "";
+        return {true, "kept over a restart by " + way.system + placesOf(way) + note};
     } catch (const keep::CannotKeep& cannot) {
         return {false, "not kept over a restart: " + std::string(cannot.what())};
     }
 }
 
 /// Whether nothing would have to be changed for it.
-Kept keptAlready(const keep::Link& link, const Wish& wish) {
+Kept keptAlready(const keep::Link& link, const Wish& wish, bool /*isTried*/) {
     try {
         return {keep::wayToKeep(link, keep::keeperOf(link), wish).isEmpty(), {}};
     } catch (const keep::CannotKeep&) {
@@ -226,10 +236,12 @@ undo::KeeperCalls keeperCallsFor(const std::vector<MeantChange>& changes) {
 
 namespace {
 
+using Act = Kept(const keep::Link& link, const Wish& wish, bool isTried);
+
 /// @return does something with what is to be kept of the value, unless the plug-in's file says otherwise by
 /// then; none for what is not about an interface of the kernel's
 std::function<Kept()> withWish(const IC::MutableNode& node, const Property& row,
-                               const IC::PropertyValue& value, Kept (*act)(const keep::Link&, const Wish&)) {
+                               const IC::PropertyValue& value, Act* act, bool isTried) {
     const KeptProperty* kept = keptProperty(row);
     if (kept == nullptr) {
         return nullptr;
@@ -244,23 +256,24 @@ std::function<Kept()> withWish(const IC::MutableNode& node, const Property& row,
                    runningOn(network, link->index, false),
                    runningOn(network, link->index, true),
                    gatewayOn(network, link->index)};
-    return [link = keep::Link{link->name, link->index}, written = std::move(before), of = kept->wish, act] {
+    return [link = keep::Link{link->name, link->index}, written = std::move(before), of = kept->wish, act,
+            isTried] {
         Written now = written;
         now.file = settingsOf(link.name);
         const Wish wish = of(now);
-        return wish.isEmpty() ? Kept() : act(link, wish);
+        return wish.isEmpty() ? Kept() : act(link, wish, isTried);
     };
 }
 
 }  // namespace
 
 std::function<Kept()> keepingOverRestart(const IC::MutableNode& node, const Property& row,
-                                         const IC::PropertyValue& value) {
-    return withWish(node, row, value, keepWith);
+                                         const IC::PropertyValue& value, bool isTried) {
+    return withWish(node, row, value, keepWith, isTried);
 }
 
 bool isKeptAlready(const IC::MutableNode& node, const Property& row, const IC::PropertyValue& value) {
-    const std::function<Kept()> look = withWish(node, row, value, keptAlready);
+    const std::function<Kept()> look = withWish(node, row, value, keptAlready, false);
     return look && look().isKept;
 }
 

@@ -18,9 +18,10 @@ struct Kept {
 /// Has the system that keeps an interface over a restart keep what is written of it. To be called before the
 /// write; what it gives is called behind one that the plug-in took. Where the interface has a file of the
 /// plug-in's, nothing is kept that was not written there.
+/// @param isTried the change is only tried out, where that system cannot be reached: it is not waited for
 /// @return none for what is not about an interface of the kernel's, or kept by no such system
 std::function<Kept()> keepingOverRestart(const IC::MutableNode& node, const Property& row,
-                                         const IC::PropertyValue& value);
+                                         const IC::PropertyValue& value, bool isTried);
 
 /// Whether the system that keeps the interface has the value already. False where nobody is known who could,
 /// and where the interface has a file of the plug-in's that says otherwise.

@@ -104,10 +104,6 @@ Wish wishOfLists(unsigned int property, const IC::PropertyValue& value) {
     return wish;
 }
 
-bool isWithInterface(const keep::Resolver& resolver) {
-    return resolver.system == "NetworkManager";
-}
-
 /// It has been told and has answered by now; what is left to it is to write its file.
 bool comesIntoForce(const keep::Resolver& resolver, const Wish& wish) {
     constexpr std::chrono::milliseconds kLook{50};
@@ -145,7 +141,7 @@ template <unsigned int property>
 Kept keepLists(const HostsValue& written) {
     const Wish wish = wishOfLists(property, written.value);
     const keep::Resolver resolver = keep::resolverOfHost();
-    if (isWithInterface(resolver)) {
+    if (resolver.isWithInterface()) {
         return keepWithInterface(resolver, written, wish);
     }
     const Way way = keep::wayOfResolver(resolver, wish);
@@ -224,7 +220,7 @@ void addCallsOfHost(const std::vector<MeantChange>& changes, undo::KeeperCalls& 
 }
 
 bool isKeptWithInterface(const Property& row) {
-    return isOfResolver(row) && isWithInterface(keep::resolverOfHost());
+    return isOfResolver(row) && keep::resolverOfHost().isWithInterface();
 }
 
 bool isInForceBySystem(const Property& row, const IC::PropertyValue& value) {
@@ -232,7 +228,7 @@ bool isInForceBySystem(const Property& row, const IC::PropertyValue& value) {
         return false;
     }
     const keep::Resolver resolver = keep::resolverOfHost();
-    return (isWithInterface(resolver) || (!resolver.system.empty() && resolver.obstacle.empty())) &&
+    return (resolver.isWithInterface() || (!resolver.system.empty() && resolver.obstacle.empty())) &&
            keep::hasInForce(resolver, wishOfLists(row.id, value));
 }
 

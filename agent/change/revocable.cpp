@@ -1,5 +1,8 @@
 #include "agent/change/revocable.h"
 
+#include <unistd.h>
+
+#include <algorithm>
 #include <cmath>
 
 #include "agent/change/guarding.h"
@@ -23,20 +26,38 @@ std::string secondsText(double seconds) {
     return std::to_string(whole) + (whole == 1 ? " second" : " seconds");
 }
 
+bool isOfNetwork(const std::vector<MeantChange>& changes) {
+    return std::ranges::any_of(changes,
+                               [](const MeantChange& each) { return each.row->type != NodeType::computer; });
+}
+
+bool isAnyTakenBack(const std::vector<MeantChange>& changes) {
+    return std::ranges::any_of(changes, [](const MeantChange& each) { return !isDeed(*each.row); });
+}
+
 }  // namespace
 
 void Revocable::begin(const std::vector<MeantChange>& changes, const std::vector<FileChange>& planned) {
+    if (geteuid() != 0 || (!seconds_ && !isAnyTakenBack(changes))) {
+        seconds_.reset();
+        return;
+    }
     try {
         open(changes, planned);
     } catch (const undo::ChangeError& error) {
-        making_.reset();
+        const std::string reason = printable(error.what());
         if (seconds_ && !settings_.madeUnguarded) {
-            throw Problem(Problem::failed,
-                          "the change cannot be guarded: " + printable(error.what()) + "\nNothing was done");
+            throw Problem(Problem::failed, "the change cannot be guarded: " + reason + "\nNothing was done");
         }
-        seconds_.reset();
-        settings_.tell("the change cannot be taken back later: " + printable(error.what()));
+        giveUp(reason);
     }
+}
+
+/// It is made all the same.
+void Revocable::giveUp(const std::string& reason) {
+    making_.reset();  // half of it would be worse
+    seconds_.reset();
+    settings_.tell("the change cannot be taken back later: " + reason);
 }
 
 void Revocable::open(const std::vector<MeantChange>& changes, const std::vector<FileChange>& planned) {
@@ -44,7 +65,8 @@ void Revocable::open(const std::vector<MeantChange>& changes, const std::vector<
     making.place = changesPlace();
     making.caller = settings_.caller;
     making.summary = summaryOf(changes);
-    making.paths = touchedPaths(planned);
+    making.hasNetwork = isOfNetwork(changes);
+    making.paths = touchedPaths(planned, making.hasNetwork);
     making.calls = keeperCallsFor(changes);
     making.paths.insert(making.paths.end(), making.calls.files.begin(), making.calls.files.end());
     making.steps = changes.size();
@@ -67,8 +89,7 @@ void Revocable::beginStep() {
         if (seconds_) {
             throw Problem(Problem::failed, reason);
         }
-        making_.reset();  // half of it would be worse
-        settings_.tell("the change cannot be taken back later: " + reason);
+        giveUp(reason);
     }
 }
 
@@ -121,6 +142,17 @@ bool Revocable::isTakenBack() {
     settings_.tell("change " + std::to_string(making_->number()) + " " + undo::stageText(journal.stage) +
                    notesOf(journal.notes));
     return journal.stage == undo::Stage::takenBack;
+}
+
+WriteResult writeRevocably(ChangedHost& host, const MeantChange& change, const Request& request,
+                           RevocableSettings settings) {
+    settings.keepsHalf = true;
+    Revocable revocable(std::move(settings));
+    revocable.begin({change}, {});
+    revocable.beginStep();
+    WriteResult result = host.write(change.node, *change.row, change.words, request);
+    revocable.end(result.problem.has_value());
+    return result;
 }
 
 std::string notesOf(const std::vector<std::string>& notes) {

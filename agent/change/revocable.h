@@ -25,8 +25,8 @@ struct RevocableSettings {
     std::function<void()> beforeTakingBack = nullptr;
 };
 
-/// Saves what a change touches and, where a confirmation is waited for, has the guard take it back. Only in
-/// processes of root's. Its problems are printable.
+/// Saves what a change touches and, where a confirmation is waited for, has the guard take it back. Of what
+/// nothing takes back, and in a process that is not root's, nothing is saved. Its problems are printable.
 class Revocable : public Safeguard {
 public:
     explicit Revocable(RevocableSettings settings)
@@ -38,6 +38,7 @@ public:
 
 private:
     void open(const std::vector<MeantChange>& changes, const std::vector<FileChange>& planned);
+    void giveUp(const std::string& reason);
     void tellMade();
     void tellUnwritten(bool hasFailed, const std::string& reason) const;
     bool isTakenBack();
@@ -46,6 +47,11 @@ private:
     std::optional<double> seconds_;  // nothing as well once nobody guards it
     std::optional<undo::ChangeInMaking> making_;
 };
+
+/// One write by itself, which can be taken back later.
+/// @param settings nobody waits for a confirmation
+WriteResult writeRevocably(ChangedHost& host, const MeantChange& change, const Request& request,
+                           RevocableSettings settings);
 
 /// Sentences on what could not be taken back, each on a line of its own, behind a line break.
 std::string notesOf(const std::vector<std::string>& notes);

@@ -80,7 +80,7 @@ private:
 
 }  // namespace
 
-std::string settled(const keep::Link& link, const keep::Wish& wish, const KernelNetwork& before) {
+Settled settled(const keep::Link& link, const keep::Wish& wish, const KernelNetwork& before) {
     constexpr std::chrono::milliseconds kBetweenSettledLooks{20};
     constexpr std::chrono::seconds kLongest{5};
     constexpr std::chrono::seconds kLongestForLease{10};
@@ -92,9 +92,9 @@ std::string settled(const keep::Link& link, const keep::Wish& wish, const Kernel
         std::this_thread::sleep_for(kBetweenSettledLooks);
     }
     if (settling.isByDhcp() && !settling.hasAnyAddress()) {
-        return "no address has come by DHCP yet";
+        return {"no address has come by DHCP yet", true};
     }
-    return settling.endsLease() ? "name servers of the lease may go with it" : "";
+    return {settling.endsLease() ? "name servers of the lease may go with it" : "", false};
 }
 
 void goWithLease(const keep::Way& way, const keep::Link& link) {

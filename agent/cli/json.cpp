@@ -272,15 +272,25 @@ Json keeperList(const std::vector<keep::Keeper>& keepers) {
     return list;
 }
 
+Json hostKeeperList(const std::vector<keep::HostKeeper>& keepers) {
+    Json list = Json::array();
+    for (const keep::HostKeeper& each : keepers) {
+        list.push_back(
+            {{"setting", each.setting}, {"keeper", orNull(each.keeper)}, {"evidence", each.evidence}});
+    }
+    return list;
+}
+
 }  // namespace
 
 std::string doctor(const remote::ServiceReport& service, const PluginReport& plugins,
-                   const std::vector<ToolReport>& tools, const std::vector<keep::Keeper>& keepers) {
+                   const std::vector<ToolReport>& tools, const KeeperReport& keepers) {
     return document({{"service", serviceObject(service)},
                      {"plugins", plugins.files},
                      {"leftOut", plugins.leftOut},
                      {"tools", toolList(tools)},
-                     {"keepers", keeperList(keepers)}},
+                     {"keepers", keeperList(keepers.interfaces)},
+                     {"hostKeepers", hostKeeperList(keepers.host)}},
                     2);
 }
 

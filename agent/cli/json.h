@@ -8,6 +8,7 @@
 #include "agent/core/host_tools.h"
 #include "agent/core/node_ref.h"
 #include "agent/core/reading.h"
+#include "agent/keep/host_keepers.h"
 #include "agent/keep/keeper.h"
 #include "agent/verify/verify.h"
 
@@ -42,11 +43,17 @@ struct PluginReport {
     std::vector<std::string> files;
     std::vector<std::string> leftOut;
 };
+/// Who keeps what over a restart.
+struct KeeperReport {
+    std::vector<keep::Keeper> interfaces;
+    std::vector<keep::HostKeeper> host;
+};
 /// {"service": {"running", "problem", "version", "since", "looked", "consent"}, "plugins": [FILE...],
 /// "leftOut": [TEXT...], "tools": [{"tool", "host", "classic", "adapter", "used", "package", "purpose"}],
-/// "keepers": [{"interface", "keeper", "claims": [{"system", "evidence", "source"}], "unknown": [TEXT...]}]}
+/// "keepers": [{"interface", "keeper", "claims": [{"system", "evidence", "source"}], "unknown": [TEXT...]}],
+/// "hostKeepers": [{"setting", "keeper", "evidence"}]}
 std::string doctor(const remote::ServiceReport& service, const PluginReport& plugins,
-                   const std::vector<ToolReport>& tools, const std::vector<keep::Keeper>& keepers);
+                   const std::vector<ToolReport>& tools, const KeeperReport& keepers);
 /// {"compared", "differences": [{"path", "property", "shown", "kernel", "why"}]}
 std::string verdict(const verify::Result& result);
 

@@ -1,17 +1,16 @@
 #include <unistd.h>
 
 #include <array>
-#include <chrono>
-#include <exception>
 #include <optional>
 #include <string>
-#include <thread>
 #include <vector>
 
+#include "agent/cli/asking.h"
 #include "agent/cli/caller.h"
 #include "agent/cli/changes.h"
 #include "agent/cli/command_line.h"
 #include "agent/cli/commands/commands.h"
+#include "agent/cli/guarded.h"
 #include "agent/cli/local_session.h"
 #include "agent/cli/print.h"
 #include "agent/cli/remote/service.h"
@@ -23,58 +22,11 @@ using cvagent::Command;
 using cvagent::ExitStatus;
 using cvagent::Options;
 
-using Question = ExitStatus (*)(cvagent::Session& session, const Options& options);
-
 /// What needs an agent, in the order of Command; null for what does not.
-constexpr std::array<Question, 13> kQuestions = {cvagent::commands::tree,          cvagent::commands::get,
-                                                 cvagent::commands::set,           cvagent::commands::watch,
-                                                 cvagent::commands::plan,          cvagent::commands::apply,
-                                                 cvagent::commands::exportChanges, cvagent::commands::diff};
-
-constexpr int kAttempts = 10;  // to ask a service that has ended
-constexpr std::chrono::milliseconds kBetweenAttempts{100};
-
-bool onlyReads(const Options& options) {
-    return options.command != Command::watch && options.command != Command::set &&
-           options.command != Command::apply;
-}
-
-/// What a watch runs on alerts gets the surroundings that it has without a service.
-void prepareToAsk(Options& options) {
-    if (options.command == Command::watch) {
-        cvagent::prepareSurroundings({&options.program});
-    }
-    if (!onlyReads(options)) {
-        cvagent::StopSignals::install();
-    }
-}
-
-/// The service's answer; nothing where there is none. One that ends in the middle of an answer is mostly
-/// started again, and would be in the way of an agent of this process.
-std::optional<ExitStatus> askService(Question ask, Options& options) {
-    std::string gone;
-    for (int attempt = 0; attempt < kAttempts; ++attempt) {
-        try {
-            if (const auto service = cvagent::remote::openSession(options, attempt > 0)) {
-                options.byService = true;
-                prepareToAsk(options);
-                return ask(*service, options);
-            }
-        } catch (const cvagent::remote::ServiceGone& ended) {
-            gone = ended.what();
-            if (!onlyReads(options)) {
-                throw cvagent::Failure(ExitStatus::failed, gone + "; nothing was done");
-            }
-        }
-        options.byService = false;
-        if (gone.empty()) {
-            return std::nullopt;
-        }
-        std::this_thread::sleep_for(kBetweenAttempts);
-    }
-    cvagent::complain(gone + "; cvagent looks by itself");
-    return std::nullopt;
-}
+constexpr std::array<cvagent::Question, 13> kQuestions = {
+    cvagent::commands::tree,          cvagent::commands::get,  cvagent::commands::set,
+    cvagent::commands::watch,         cvagent::commands::plan, cvagent::commands::apply,
+    cvagent::commands::exportChanges, cvagent::commands::diff};
 
 ExitStatus runWithoutAgent(const Options& options) {
     switch (options.command) {
@@ -96,13 +48,13 @@ bool isForService(const Options& options) {
 }
 
 ExitStatus run(Options& options, cvagent::WantMessages& wants) {
-    const Question ask = options.verify ? cvagent::commands::verifyTree
-                                        : kQuestions.at(static_cast<std::size_t>(options.command));
+    const cvagent::Question ask = options.verify ? cvagent::commands::verifyTree
+                                                 : kQuestions.at(static_cast<std::size_t>(options.command));
     if (!options.changeFile.empty()) {
         options.changeText = cvagent::readChangeFile(options.changeFile);  // before the directory is left
     }
     if (ask != nullptr) {
-        if (const auto status = askService(ask, options)) {
+        if (const auto status = cvagent::askService(ask, options, false)) {
             return *status;
         }
         const cvagent::PreparedProcess process(cvagent::processSettings(options));
@@ -122,29 +74,12 @@ ExitStatus run(Options& options, cvagent::WantMessages& wants) {
     return isDoctor ? cvagent::commands::doctor(options, service) : runWithoutAgent(options);
 }
 
-ExitStatus endWith(const cvagent::Failure& failure) {
-    if (*failure.what() != '\0') {
-        cvagent::complain(failure.what());
-    }
-    return failure.status();
-}
-
 ExitStatus runGuarded(Options& options, cvagent::WantMessages& wants) {
-    try {
+    return cvagent::guarded([&] {
         cvagent::Style::detect();   // before the locale goes
         cvagent::rememberCaller();  // before the environment goes
         return run(options, wants);
-    } catch (const cvagent::Failure& failure) {
-        return endWith(failure);
-    } catch (const cvagent::Problem& problem) {
-        return endWith(cvagent::Failure(problem));
-    } catch (const cvagent::Interrupted&) {
-        cvagent::complain("nothing was done");
-        cvagent::StopSignals::die();
-    } catch (const std::exception& exception) {
-        cvagent::complain(std::string("unexpected failure: ") + exception.what());
-        return ExitStatus::failed;
-    }
+    });
 }
 
 /// What is not shown or not found can be what was wanting.
@@ -171,6 +106,6 @@ int main(int count, char** words) {
         auto options = cvagent::parseCommandLine(count, words);
         return static_cast<int>(options ? runAndJudge(*options) : ExitStatus::done);
     } catch (const cvagent::Failure& failure) {
-        return static_cast<int>(endWith(failure));
+        return static_cast<int>(cvagent::endWith(failure));
     }
 }

@@ -4,6 +4,14 @@
 
 namespace cvagent {
 
+Session::NodeReadings Session::findAndRead(const std::string& word,
+                                           const std::vector<std::string>& properties,
+                                           const Request& request) {
+    NodeReadings found{find(word), {}};
+    found.readings = read(found.node, properties, request);
+    return found;
+}
+
 void showLines(ErrorLines& errors) {
     const ErrorLines::Taken taken = errors.take();
     for (const std::string& text : taken.texts) {

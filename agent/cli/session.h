@@ -38,6 +38,13 @@ public:
     };
 
     virtual Tree tree(const Request& request) = 0;
+    struct NodeReadings {
+        NodeRef node;
+        std::vector<Reading> readings;
+    };
+    /// As find() and read(), which a service does at once.
+    virtual NodeReadings findAndRead(const std::string& word, const std::vector<std::string>& properties,
+                                     const Request& request);
     // A service makes plans and changes by itself, as its user, and judges, tries out, writes and looks in
     // one. Null: this process does it, since the service does not know how, or does not let this user, which
     // is told.

@@ -89,11 +89,11 @@ bool killCommands() {
     const auto end = Clock::now() + kSearch;
     try {
         bool more = true;
-        while (more && Clock::now() < end) {
+        do {  // once in any case: the time may be over for want of a processor
             const bool starting = shell::startsUnderWay() != 0;
             more = killCommands() || starting;
             std::this_thread::sleep_for(1ms);
-        }
+        } while (more && Clock::now() < end);
     } catch (const std::exception&) {
         // No memory to look for them.
     }

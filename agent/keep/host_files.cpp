@@ -61,6 +61,12 @@ std::string assigned(const std::string& text, const std::string& key) {
     return "";
 }
 
+bool isMountedOver(const std::string& path) {
+    struct statx found {};
+    return statx(AT_FDCWD, path.c_str(), AT_SYMLINK_NOFOLLOW, 0, &found) == 0 &&
+           (found.stx_attributes & STATX_ATTR_MOUNT_ROOT) != 0;
+}
+
 std::string lastPart(const std::string& path) {
     return path.substr(path.rfind('/') + 1);
 }

@@ -15,6 +15,10 @@ bool unitHasProcesses(const std::string& unit);
 /// The value of a line "KEY=VALUE"; "" when there is none.
 std::string assigned(const std::string& text, const std::string& key);
 
+/// Whether a file system begins at it, as with a file of a container's engine, so that nothing can take its
+/// place.
+bool isMountedOver(const std::string& path);
+
 /// The last part of a path.
 std::string lastPart(const std::string& path);
 

@@ -15,21 +15,11 @@ namespace {
 
 namespace fs = std::filesystem;
 
-constexpr const char* kNameFile = "/etc/hostname";
-constexpr const char* kOldNameFile = "/etc/HOSTNAME";
-constexpr const char* kZoneName = "/etc/timezone";
-constexpr const char* kZoneLink = "/etc/localtime";
 constexpr const char* kZones = "/usr/share/zoneinfo/";
 constexpr std::size_t kLongestName = 64;  // of the kernel
 
 bool isAnyThere(std::initializer_list<const char*> paths) {
     return std::ranges::any_of(paths, [](const char* path) { return access(path, F_OK) == 0; });
-}
-
-/// Systemd starts it when it is asked, and who has the one has the other. Looked up in files, which a host
-/// that changes are only tried on has, too.
-bool canAskHostnamed() {
-    return isAnyThere({"/run/systemd/system"}) && isAnyThere({"/usr/bin/hostnamectl", "/bin/hostnamectl"});
 }
 
 void checkHostName(const std::string& name) {
@@ -60,14 +50,20 @@ std::string hostNameIn(const std::string& text) {
 
 }  // namespace
 
+/// Systemd starts it when it is asked, and who has the one has the other. Looked up in files, which a host
+/// that changes are only tried on has, too.
+bool isHostnamedThere() {
+    return isAnyThere({"/run/systemd/system"}) && isAnyThere({"/usr/bin/hostnamectl", "/bin/hostnamectl"});
+}
+
 /// Where the old file of SUSE's is a link to this one, the plug-in has written it by now.
 Way wayOfHostName(const std::string& name) {
     checkHostName(name);
-    const auto before = smallFile(kNameFile);
+    const auto before = smallFile(kHostNameFile);
     const bool isKeptAlready = before && hostNameIn(*before) == name;
     Way way;
-    way.files = {{kNameFile, before, isKeptAlready ? before : std::optional(name + "\n")}};
-    if (canAskHostnamed()) {
+    way.files = {{kHostNameFile, before, isKeptAlready ? before : std::optional(name + "\n")}};
+    if (isHostnamedThere()) {
         way.system = "systemd-hostnamed";
         way.callsBefore = {"hostnamectl --no-ask-password --static set-hostname " + name};
     }
@@ -75,14 +71,14 @@ Way wayOfHostName(const std::string& name) {
 }
 
 bool isNameInOldFile() {
-    return isAnyThere({kOldNameFile}) && !isAnyThere({kNameFile, "/run/systemd/system"});
+    return isAnyThere({kOldHostNameFile}) && !isAnyThere({kHostNameFile, "/run/systemd/system"});
 }
 
 std::string oldNameFileWith(const std::string& name) {
-    if (hostNameIn(smallFile(kOldNameFile).value_or("")) != name) {
-        throw CannotKeep(std::string(kOldNameFile) + " does not have it");
+    if (hostNameIn(smallFile(kOldHostNameFile).value_or("")) != name) {
+        throw CannotKeep(std::string(kOldHostNameFile) + " does not have it");
     }
-    return kOldNameFile;
+    return kOldHostNameFile;
 }
 
 Way wayOfZone(const std::string& zone) {
@@ -92,9 +88,9 @@ Way wayOfZone(const std::string& zone) {
         throw CannotKeep(std::string(kZoneLink) + " does not lead to " + inQuotes(zone));
     }
     Way way;
-    if (const auto before = smallFile(kZoneName)) {
+    if (const auto before = smallFile(kZoneNameFile)) {
         const bool isKeptAlready = wordsOf(*before) == std::vector{zone};
-        way.files = {{kZoneName, before, isKeptAlready ? before : std::optional(zone + "\n")}};
+        way.files = {{kZoneNameFile, before, isKeptAlready ? before : std::optional(zone + "\n")}};
     }
     return way;
 }

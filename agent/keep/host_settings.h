@@ -6,6 +6,12 @@
 
 namespace cvagent::keep {
 
+inline constexpr const char* kHostNameFile = "/etc/hostname";
+inline constexpr const char* kOldHostNameFile = "/etc/HOSTNAME";  ///< of SUSE's day
+inline constexpr const char* kZoneLink = "/etc/localtime";
+inline constexpr const char* kZoneNameFile = "/etc/timezone";  ///< of Debian's
+inline constexpr const char* kResolverFile = "/etc/resolv.conf";
+
 // What is the host's and not an interface's: how it is kept over a restart. Nothing is done yet; see go().
 // Each throws CannotKeep.
 
@@ -14,6 +20,8 @@ namespace cvagent::keep {
 /// @param name may have the domain behind it
 Way wayOfHostName(const std::string& name);
 
+/// Whether systemd-hostnamed can be asked.
+bool isHostnamedThere();
 /// Whether the host has its name in the file of SUSE's day and in no other: to be asked before the plug-in
 /// writes, which makes that file anywhere.
 bool isNameInOldFile();
@@ -32,6 +40,8 @@ struct Resolver {
     std::string obstacle;  ///< why it cannot be made to keep anything; "" when it can
 
     bool isFileItself() const { return system.empty() && obstacle.empty(); }
+    /// It has them with the interfaces that it keeps.
+    bool isWithInterface() const { return system == "NetworkManager"; }
 };
 Resolver resolverOfHost();
 

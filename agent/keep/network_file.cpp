@@ -76,6 +76,8 @@ public:
             // What stands in front of all sections means nothing.
             if (section == "Match") {
                 addCondition(entry);
+            } else if (section == "Network" && takesAway(entry)) {
+                throw CannotKeep(inQuotes(entry.key + "=") + " takes away what stands before it");
             } else if (!section.empty()) {
                 entries_.push_back(std::move(entry));
             }
@@ -149,6 +151,11 @@ public:
     }
 
 private:
+    bool takesAway(const Entry& entry) const {
+        return entry.value.empty() && (entry.key == "Address" || entry.key == "Gateway") &&
+               std::ranges::find(entries_, entry.key, &Entry::key) != entries_.end();
+    }
+
     Dhcp currentDhcp() const {
         Dhcp current = kDhcp[0];
         for (const Entry& each : entries_) {

@@ -1,5 +1,10 @@
+#include <sys/stat.h>
+
 #include <algorithm>
 #include <array>
+#include <filesystem>
+#include <iterator>
+#include <map>
 
 #include "agent/core/text.h"
 #include "agent/keep/daemons.h"
@@ -27,17 +32,58 @@ bool isInItsPlaces(const std::string& file) {
     });
 }
 
-/// What is added to a file by others, and would not be to one of another name.
-std::string dropInOf(const std::string& source) {
+/// What is added to a file by others, as systemd-networkd reads it: by name, one for all of the same name.
+std::vector<std::string> dropInsOf(const std::string& source) {
+    std::map<std::string, std::string> found;
     for (const char* place : kPlaces) {
-        const std::string directory = place + lastPart(source) + ".d";
+        const std::string directory = place + lastPart(source) + ".d/";
         for (const std::string& name : hosttools::listDirectory(directory)) {
             if (name.ends_with(".conf")) {
-                return directory + "/" + name;
+                found.emplace(name, directory + name);
             }
         }
     }
-    return "";
+    std::vector<std::string> paths;
+    std::ranges::transform(found, std::back_inserter(paths), [](const auto& each) { return each.second; });
+    return paths;
+}
+
+bool isAsOpenAs(const std::string& path, const std::string& other) {
+    struct stat one {};
+    struct stat two {};
+    return stat(path.c_str(), &one) == 0 && stat(other.c_str(), &two) == 0 && one.st_mode == two.st_mode &&
+           one.st_uid == two.st_uid && one.st_gid == two.st_gid;
+}
+
+bool isMasked(const std::string& path) {
+    std::error_code unknown;
+    return std::filesystem::canonical(path, unknown) == "/dev/null";
+}
+
+/// In front of a file behind another one: none of its lines belong to the other one's last section.
+constexpr const char* kNoSection = "\n[X-Added]\n";
+
+/// The file with what is added to it, for a file of another name gets nothing of that.
+/// @param own the path of ours, to which all would be added once more
+std::string wholeOf(const std::string& source, const std::string& own) {
+    auto text = smallFile(source);
+    if (!text) {
+        throw CannotKeep("cannot read " + inQuotes(source));
+    }
+    for (const std::string& path : dropInsOf(source)) {
+        const auto added = isMasked(path) ? "" : smallFile(path);
+        if (!added) {
+            throw CannotKeep("cannot read " + inQuotes(path));
+        }
+        if (source == own) {
+            throw CannotKeep(inQuotes(path) + " adds to the file of the interface, which is ours");
+        }
+        if (!added->empty() && !isAsOpenAs(path, source)) {
+            throw CannotKeep(inQuotes(path) + " has another owner or mode than the file of the interface");
+        }
+        *text += kNoSection + *added;
+    }
+    return *text;
 }
 
 bool isGeneratedFromNetplan(const std::string& file) {
@@ -71,16 +117,10 @@ Way wayOfNetworkd(const Link& link, const Claim& claim, const Wish& wish) {
     if (!isInItsPlaces(claim.source)) {
         throw CannotKeep(inQuotes(claim.source) + " is no file of systemd-networkd's");
     }
-    const auto source = smallFile(claim.source);
-    if (!source) {
-        throw CannotKeep("cannot read " + inQuotes(claim.source));
-    }
-    if (const std::string dropIn = dropInOf(claim.source); !dropIn.empty()) {
-        throw CannotKeep(inQuotes(dropIn) + " adds to the file of the interface");
-    }
     const std::string path = ownNetworkPath(claim.source, link.name);
-    std::string content = ownNetworkFile(*source, link.name, wish);
-    const bool isKeptAlready = content == ownNetworkFile(*source, link.name, Wish{});
+    const std::string source = wholeOf(claim.source, path);
+    std::string content = ownNetworkFile(source, link.name, wish);
+    const bool isKeptAlready = content == ownNetworkFile(source, link.name, Wish{});
     const auto before = smallFile(path);
     return {claim.system,
             {},

@@ -1,6 +1,4 @@
 #include <arpa/inet.h>
-#include <fcntl.h>
-#include <sys/stat.h>
 
 #include <algorithm>
 #include <array>
@@ -19,7 +17,6 @@ namespace {
 namespace fs = std::filesystem;
 using Texts = std::vector<std::string>;
 
-constexpr const char* kFile = "/etc/resolv.conf";
 constexpr const char* kResolved = "systemd-resolved";
 constexpr const char* kResolvedLists = "/run/systemd/resolve/resolv.conf";
 /// Behind all others, so that it can take back what they say.
@@ -64,15 +61,8 @@ constexpr std::array kUnmarkedWriters = {"dhclient", "udhcpc"};
 
 std::string placeOfFile() {
     std::error_code unknown;
-    const fs::path place = fs::weakly_canonical(kFile, unknown);
+    const fs::path place = fs::weakly_canonical(kResolverFile, unknown);
     return unknown ? "" : place.string();
-}
-
-/// As a container's engine does with a file of its own.
-bool isMountedOver() {
-    struct statx found {};
-    return statx(AT_FDCWD, kFile, AT_SYMLINK_NOFOLLOW, 0, &found) == 0 &&
-           (found.stx_attributes & STATX_ATTR_MOUNT_ROOT) != 0;
 }
 
 /// One in a container writes another file. Of who does not let us look it is taken for granted that it is
@@ -104,7 +94,7 @@ Resolver byPlace(const std::string& place) {
     if (known == kKnownPlaces.end()) {
         return {};
     }
-    Resolver found{known->system, std::string(kFile) + " leads to " + place, known->obstacle};
+    Resolver found{known->system, std::string(kResolverFile) + " leads to " + place, known->obstacle};
     if (found.system == kResolved && !unitHasProcesses(kResolved)) {
         found.obstacle = found.evidence + ", but systemd-resolved does not run";
     }
@@ -117,7 +107,8 @@ Resolver byMark(const std::string& text) {
     for (std::size_t i = 0; i < std::min(kHead, lines.size()); ++i) {
         for (const KnownMark& known : kKnownMarks) {
             if (lines[i].find(known.text) != std::string::npos) {
-                return {known.system, std::string(kFile) + " says '" + known.text + "'", known.obstacle};
+                return {known.system, std::string(kResolverFile) + " says '" + known.text + "'",
+                        known.obstacle};
             }
         }
     }
@@ -191,13 +182,13 @@ bool startWith(const Texts& all, const Texts& some) {
 
 Resolver resolverOfHost() {
     const std::string place = placeOfFile();
-    if (isMountedOver()) {
+    if (isMountedOver(kResolverFile)) {
         return {"", "", "something is mounted over /etc/resolv.conf"};
     }
     if (Resolver found = byPlace(place); !found.evidence.empty()) {
         return found;
     }
-    const auto text = smallFile(kFile);
+    const auto text = smallFile(kResolverFile);
     if (!text) {
         return {"", "", "there is no /etc/resolv.conf that can be read"};
     }
@@ -236,7 +227,8 @@ Way wayOfResolver(const Resolver& resolver, const Wish& wish) {
 
 bool hasInForce(const Resolver& resolver, const Wish& wish) {
     const bool isResolved = resolver.system == kResolved;
-    const ResolverLists lists = resolverListsIn(smallFile(isResolved ? kResolvedLists : kFile).value_or(""));
+    const ResolverLists lists =
+        resolverListsIn(smallFile(isResolved ? kResolvedLists : kResolverFile).value_or(""));
     return startWith(lists.nameServers, wish.nameServers.value_or(Texts())) &&
            startWith(lists.searchDomains, wish.searchDomains.value_or(Texts()));
 }

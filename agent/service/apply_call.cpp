@@ -52,19 +52,14 @@ void noteOutcomes(const Application& application, const std::vector<change::Outc
     }
 }
 
-/// Nobody stands by a change that is to be quick, and none where the service has not root's rights.
-std::unique_ptr<change::Revocable> revocable(const Application& application, const std::string& who,
-                                             const std::function<void(const std::string& text)>& tell) {
-    const ApplyWishes& wishes = application.wishes;
+change::RevocableSettings revocableSettings(const ApplyWishes& wishes, const std::string& who,
+                                            const std::function<void(const std::string& text)>& tell) {
     if (geteuid() != 0 && wishes.confirmSeconds && !wishes.unguarded) {
         throw Problem(Problem::refused,
                       "the service is not root's and takes no change back; nothing was done");
     }
-    if (geteuid() != 0 || (wishes.plain && !wishes.confirmSeconds)) {
-        return nullptr;
-    }
-    return std::make_unique<change::Revocable>(change::RevocableSettings{
-        who, wishes.confirmSeconds, wishes.unguarded, wishes.force, 0, tell, nullptr});
+    const bool keepsHalf = wishes.force || wishes.plain;
+    return {who, wishes.confirmSeconds, wishes.unguarded, keepsHalf, 0, tell, nullptr};
 }
 
 Applied applied(const PendingCall& call, const Application& application) {
@@ -82,8 +77,8 @@ Applied applied(const PendingCall& call, const Application& application) {
     settings.verifySeconds = application.wishes.verifySeconds;
     settings.request = request;
     settings.tell = [&done](const std::string& text) { done.told.push_back(text); };
-    const auto safeguard = revocable(application, who, settings.tell);
-    settings.safeguard = safeguard.get();
+    change::Revocable revocable(revocableSettings(application.wishes, who, settings.tell));
+    settings.safeguard = &revocable;
     const auto already = application.wishes.plain ? change::Already::made : change::Already::leftOut;
     done.outcomes =
         change::apply(host, change::propose(host, application.changes, request(""), already), settings);

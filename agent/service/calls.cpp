@@ -165,19 +165,31 @@ void answerTree(const CallPointer& call) {
     });
 }
 
-void answerFind(const CallPointer& call) {
-    const std::string word = bus::Reader(call->message()).text();
+namespace {
+
+std::string takeWord(bus::Reader& arguments) {
+    std::string word = arguments.text();
     if (word.size() > kLongestWord) {
         throw Problem(Problem::notFound, "no node has so long a name", Problem::node);
     }
+    return word;
+}
+
+void putNode(bus::Writer& writer, const NodeView& node) {
+    writer.structure("uuuuosssu", [&] { putNodeHead(writer, node); });
+}
+
+}  // namespace
+
+void answerFind(const CallPointer& call) {
+    bus::Reader arguments(call->message());
+    const std::string word = takeWord(arguments);
     call->withCaller([call, word](const Caller& caller) {
         submit(call, call->parts().readers, caller, [call, word] {
             const NodeRef found = call->parts().agent.find(word);
             comeBack(call, [call, id = found->getNodeId()] {
                 const NodeView& node = nodeOf(*call, id);
-                call->answer([&](bus::Writer& writer) {
-                    writer.structure("uuuuosssu", [&] { putNodeHead(writer, node); });
-                });
+                call->answer([&](bus::Writer& writer) { putNode(writer, node); });
             });
         });
     });
@@ -226,6 +238,41 @@ void answerEventsSince(const CallPointer& call) {
     call->inTurn([call](const Caller& caller) { findEvents(call, caller); });
 }
 
+namespace {
+
+struct Told {
+    std::vector<Reading> readings;
+    std::vector<std::string> errors;  ///< what the plug-in reported on the way
+};
+
+/// What the host says; on a worker's thread.
+Told askHost(const CallPointer& call, const NodeRef& node, const std::vector<unsigned int>& ids,
+             Request::Clock::time_point until) {
+    const Request request("a reader on the bus", until);
+    Told told{call->parts().agent.read(node, ids, Freshness::anew, request), {}};
+    told.errors = request.errors().take().texts;
+    return told;
+}
+
+void putTold(bus::Writer& writer, const Told& told, Withheld withheld) {
+    putReadings(writer, told.readings, withheld);
+    writer.put(told.errors);
+}
+
+std::vector<std::string> takeNames(bus::Reader& arguments) {
+    std::vector<std::string> names = arguments.texts();
+    std::size_t size = 0;
+    for (const std::string& name : names) {
+        size += name.size();
+    }
+    if (names.size() > kMostProperties || size > kLongestWord) {
+        throw bus::Error(bus::kLimitsExceeded, "too many properties in one call");
+    }
+    return names;
+}
+
+}  // namespace
+
 void startRead(const CallPointer& call, std::optional<std::uint32_t> node) {
     bus::Reader arguments(call->message());
     const std::uint32_t id = node ? *node : arguments.number();
@@ -239,17 +286,33 @@ void startRead(const CallPointer& call, std::optional<std::uint32_t> node) {
         const Withheld withheld = withheldFrom(*call, caller, Withheld::asMissing);
         const auto until = Request::Clock::now() + kReadTime;
         submit(call, call->parts().readers, caller, [call, id, wanted, ref, withheld, until] {
-            const Request request("a reader on the bus", until);
             const std::vector<unsigned int> ids =
                 wanted.empty() ? readableIds(*ref, {})
                                : std::vector<unsigned int>(wanted.begin(), wanted.end());
-            const auto readings = call->parts().agent.read(ref, ids, Freshness::anew, request);
-            const std::vector<std::string> errors = request.errors().take().texts;
-            comeBack(call, [call, id, withheld, readings, errors] {
-                call->parts().model.learn(id, readings);
+            comeBack(call, [call, id, withheld, told = askHost(call, ref, ids, until)] {
+                call->parts().model.learn(id, told.readings);
+                call->answer([&](bus::Writer& writer) { putTold(writer, told, withheld); });
+            });
+        });
+    });
+}
+
+void startFindAndRead(const CallPointer& call) {
+    bus::Reader arguments(call->message());
+    const std::string word = takeWord(arguments);
+    const std::vector<std::string> names = takeNames(arguments);
+    call->withCaller([call, word, names](const Caller& caller) {
+        const Withheld withheld = withheldFrom(*call, caller, Withheld::asMissing);
+        const auto until = Request::Clock::now() + kReadTime;
+        submit(call, call->parts().readers, caller, [call, word, names, withheld, until] {
+            const NodeRef ref = call->parts().agent.find(word);
+            const Told told = askHost(call, ref, readableIds(*ref, names), until);
+            comeBack(call, [call, id = ref->getNodeId(), withheld, told] {
+                const NodeView& node = nodeOf(*call, id);
+                call->parts().model.learn(id, told.readings);
                 call->answer([&](bus::Writer& writer) {
-                    putReadings(writer, readings, withheld);
-                    writer.put(errors);
+                    putNode(writer, node);
+                    putTold(writer, told, withheld);
                 });
             });
         });

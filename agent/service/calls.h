@@ -92,6 +92,7 @@ void comeBack(const CallPointer& call, std::function<void()> work);
 // call; the message has the types that the interface says.
 void answerTree(const CallPointer& call);
 void answerFind(const CallPointer& call);
+void startFindAndRead(const CallPointer& call);
 void answerEventsSince(const CallPointer& call);
 /// @param node the id; nothing: it is the first argument
 void startRead(const CallPointer& call, std::optional<std::uint32_t> node);

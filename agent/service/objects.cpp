@@ -28,6 +28,8 @@ constexpr Method kMethods[] = {
     {kAgentInterface, "Tree", "", On::agent, [](const CallPointer& call, const Place&) { answerTree(call); }},
     {kAgentInterface, "Find", "s", On::agent,
      [](const CallPointer& call, const Place&) { answerFind(call); }},
+    {kAgentInterface, "FindAndRead", "sas", On::agent,
+     [](const CallPointer& call, const Place&) { startFindAndRead(call); }},
     {kAgentInterface, "Read", "uau", On::agent,
      [](const CallPointer& call, const Place&) { startRead(call, std::nullopt); }},
     {kAgentInterface, "Write", "uuv", On::agent,

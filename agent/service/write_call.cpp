@@ -2,9 +2,9 @@
 #include <array>
 #include <utility>
 
+#include "agent/change/revocable.h"
 #include "agent/core/property_words.h"
-#include "agent/core/tree.h"
-#include "agent/service/calls.h"
+#include "agent/service/change_request.h"
 #include "agent/service/log.h"
 #include "agent/service/names.h"
 #include "agent/service/users.h"
@@ -18,13 +18,10 @@ namespace {
 constexpr std::array kVerdicts = {"applied", "differs", "unknown"};
 
 struct Wish {
-    NodeRef node;
-    const Property& row;
-    IC::PropertyValue value;
+    change::MeantChange change;
     Caller caller;
 
-    std::string target() const { return node->getPath() + " " + row.name; }
-    Deed deed() const { return {node->getPath(), row.name, caller.user}; }
+    Deed deed() const { return {change.node->getPath(), change.row->name, caller.user}; }
 };
 
 void answerWrite(const PendingCall& call, const WriteResult& result, const std::vector<std::string>& errors) {
@@ -43,18 +40,21 @@ void answerWrite(const PendingCall& call, const WriteResult& result, const std::
 void perform(const CallPointer& call, const Wish& wish, Request::Clock::time_point until) {
     const std::string who = userText(wish.caller.user);
     const Request request(who, until);
-    WriteResult result;
-    try {
-        result = call->parts().agent.write(wish.node, wish.row, wish.value, request);
-    } catch (const Problem& problem) {
-        result.problem = problem;
-    }
+    AgentHost host(call->parts().agent);
+    change::RevocableSettings settings;
+    settings.caller = who;
+    settings.tell = [&wish](const std::string& text) {
+        log(Priority::warning, wish.change.target() + ": " + text,
+            {{"CORVISTA_CALLER_UID", std::to_string(wish.caller.user)}});
+    };
+    const WriteResult result = change::writeRevocably(host, wish.change, request, settings);
     const std::vector<std::string> errors = request.errors().take().texts;
     const char* verdict = result.problem ? "failed" : kVerdicts.at(result.outcome);
-    noteWrite(Priority::notice, wish.deed(),
-              who + " wrote " + wish.target() + ": " + (result.problem ? result.problem->what() : verdict),
-              verdict);
-    comeBack(call, [call, result, errors, id = wish.node->getNodeId()] {
+    noteWrite(
+        Priority::notice, wish.deed(),
+        who + " wrote " + wish.change.target() + ": " + (result.problem ? result.problem->what() : verdict),
+        verdict);
+    comeBack(call, [call, result, errors, id = wish.change.node->getNodeId()] {
         if (!result.after.failed()) {
             call->parts().model.learn(id, {result.after});
         }
@@ -63,15 +63,15 @@ void perform(const CallPointer& call, const Wish& wish, Request::Clock::time_poi
 }
 
 void decide(const CallPointer& call, const Wish& wish) {
-    const bool stops = drasticLabel(wish.row, wish.value) != nullptr;
-    const Consent::Question question{stops ? Audience::stoppers : Audience::writers, "write " + wish.target(),
-                                     call->message().allowsInteraction()};
+    const bool stops = wish.change.drastic() != nullptr;
+    const Consent::Question question{stops ? Audience::stoppers : Audience::writers,
+                                     "write " + wish.change.target(), call->message().allowsInteraction()};
     call->parts().consent.ask(wish.caller, question, [call, wish](bool allowed, const std::string& reason) {
         call->guarded([&] {
             if (!allowed) {
                 noteWrite(Priority::warning, wish.deed(),
-                          "uid " + std::to_string(wish.caller.user) + " may not write " + wish.target() +
-                              ": " + reason,
+                          "uid " + std::to_string(wish.caller.user) + " may not write " +
+                              wish.change.target() + ": " + reason,
                           "denied");
                 throw bus::Error(bus::kAccessDenied, "you may not write this: " + reason);
             }
@@ -97,10 +97,8 @@ void startWrite(const CallPointer& call, std::optional<std::uint32_t> node) {
         words.emplace_back();  // an empty list
     }
     const Property& row = writableRow(*view->node, std::to_string(property));
-    const IC::PropertyValue value = acceptedValue(row, words);
-    call->withCaller([call, ref = view->node, &row, value](const Caller& caller) {
-        decide(call, {ref, row, value, caller});
-    });
+    const change::MeantChange change{view->node, &row, words, acceptedValue(row, words), ""};
+    call->withCaller([call, change](const Caller& caller) { decide(call, {change, caller}); });
 }
 
 }  // namespace cvagent::service

@@ -20,7 +20,9 @@ namespace {
 
 using hosttools::Descriptor;
 
-constexpr unsigned kMostChanges = 50;  // that are kept for looking back
+// That are kept for looking back.
+constexpr unsigned kMostChanges = 50;
+constexpr off_t kMostBytes = off_t{64} << 20U;
 constexpr unsigned kLargestNumber = 999'999'999;
 constexpr off_t kMostSaved = off_t{256} << 20U;
 constexpr const char* kJournal = "journal";
@@ -74,15 +76,18 @@ struct flock wholeFile() {
     return all;
 }
 
-void removeChange(int place, unsigned number) {
-    const std::string name = std::to_string(number);
-    const Descriptor change = openChange(place, number);
-    for (const char* each : {"before", "left", "began", kAgentLock, kStepLock, kGuardLock, kTakingLock,
-                             kJournalLock, kJournal}) {
-        unlinkat(change.get(), each, 0);
-        unlinkat(change.get(), (std::string(each) + ".new").c_str(), 0);
+/// The journal first: without it there is no change.
+constexpr std::array kFiles = {kJournal,  "before",   "left",      "began",     kAgentLock,
+                               kStepLock, kGuardLock, kTakingLock, kJournalLock};
+
+off_t sizeOfChange(int place, unsigned number) {
+    off_t size = 0;
+    for (const char* each : kFiles) {
+        struct stat found {};
+        const std::string path = std::to_string(number) + "/" + each;
+        size += fstatat(place, path.c_str(), &found, AT_SYMLINK_NOFOLLOW) == 0 ? found.st_size : 0;
     }
-    unlinkat(place, name.c_str(), AT_REMOVEDIR);
+    return size;
 }
 
 /// Who cannot be read stays, for nobody knows whether something waits for it.
@@ -96,12 +101,18 @@ bool hasEnded(const std::string& place, unsigned number) {
     }
 }
 
-/// The journals of old changes are for people; of those that are under way nothing goes.
+/// What is saved of old changes is for people; of those that are under way nothing goes.
 void makeRoom(const std::string& place, int opened) {
     const std::vector<unsigned> numbers = changesIn(place);
-    for (std::size_t i = 0; numbers.size() - i > kMostChanges; ++i) {
+    off_t size = 0;
+    for (const unsigned number : numbers) {
+        size += sizeOfChange(opened, number);
+    }
+    for (std::size_t i = 0; i < numbers.size() && (numbers.size() - i > kMostChanges || size > kMostBytes);
+         ++i) {
         if (hasEnded(place, numbers[i])) {
-            removeChange(opened, numbers[i]);
+            size -= sizeOfChange(opened, numbers[i]);
+            ChangeDirectory(place, numbers[i]).remove();
         }
     }
 }
@@ -160,6 +171,15 @@ ChangeDirectory ChangeDirectory::make(const std::string& place) {
             failWith(place);
         }
     }
+}
+
+void ChangeDirectory::remove() const {
+    for (const char* each : kFiles) {
+        unlinkat(directory_.get(), each, 0);
+        unlinkat(directory_.get(), (std::string(each) + ".new").c_str(), 0);
+    }
+    const Descriptor place(openat(directory_.get(), "..", O_PATH | O_DIRECTORY | O_CLOEXEC));
+    unlinkat(place.get(), std::to_string(number_).c_str(), AT_REMOVEDIR);
 }
 
 bool ChangeDirectory::isGone() const {

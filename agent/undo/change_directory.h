@@ -36,6 +36,8 @@ public:
     static hosttools::Descriptor lockPlace(const std::string& place);
     /// A new one, behind all that are there. The oldest ones that have ended make room.
     static ChangeDirectory make(const std::string& place);
+    /// With all in it. As far as it goes.
+    void remove() const;
 
     unsigned number() const { return number_; }
     /// Whether somebody has removed it since it was opened.

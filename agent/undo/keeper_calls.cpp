@@ -18,6 +18,7 @@
 #include <thread>
 
 #include "agent/undo/boot_clock.h"
+#include "agent/undo/networkd_links.h"
 #include "agent/undo/renewed_lease.h"
 #include "hosttools/files.h"
 #include "hosttools/text.h"
@@ -37,7 +38,7 @@ struct KnownCall {
 };
 constexpr std::array kKnownCalls{
     KnownCall{"netplan generate", false, true},
-    KnownCall{"networkctl reload", false, false},
+    KnownCall{kNetworkdReload, false, false},
     KnownCall{"systemctl reset-failed systemd-resolved", false, false},
     KnownCall{"systemctl try-reload-or-restart systemd-resolved", false, false},
     KnownCall{"resolvconf -u", false, false},
@@ -162,9 +163,12 @@ KeeperCalls KeeperCalls::whileStarting() const {
 void runCalls(const std::vector<std::string>& calls, std::vector<std::string>& notes) {
     const std::string reapply = std::string(kReapply) + " ";
     for (const std::string& call : calls) {
+        const NetworkdLinks links;
         const RenewedLease lease(call.starts_with(reapply) ? call.substr(reapply.size()) : "");
         if (const std::string problem = problemOf(call); !problem.empty()) {
             notes.push_back("'" + call + "' " + problem);
+        } else if (call == kNetworkdReload) {
+            links.waitUntilSetUp();
         } else {
             lease.wait();
         }

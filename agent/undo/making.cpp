@@ -60,7 +60,7 @@ SavedState savedBefore(const MakingSettings& settings) {
     for (const std::string& path : settings.paths) {
         each.insert(withoutLinks(path));
     }
-    SavedState before = SavedState::of({each.begin(), each.end()});
+    SavedState before = SavedState::of({each.begin(), each.end()}, settings.hasNetwork);
     before.calls = settings.calls;
     std::ranges::transform(before.calls.files, before.calls.files.begin(), withoutLinks);
     if (const std::string obstacle = before.obstacle(); !obstacle.empty()) {
@@ -111,27 +111,44 @@ ChangeInMaking::ChangeInMaking(const MakingSettings& settings)
       }()),
       alive_(directory_.take(kAgentLock)),
       inSteps_(directory_.take(kStepLock)),
-      before_(savedBefore(settings)),
       window_(std::min(settings.window, kLongestWindow)) {
+    try {
+        save(settings);
+    } catch (const ChangeError&) {
+        directory_.remove();  // half of it would take away room, and the place of an older one
+        throw;
+    }
+}
+
+void ChangeInMaking::save(const MakingSettings& settings) {
+    before_ = savedBefore(settings);
     place_ = {};
     directory_.save("before", before_);
     directory_.isTaken(kTakingLock);  // makes its file, for which there may be no room later
-    directory_.update([&](Journal& journal) {
-        journal.boot = before_.boot;
-        journal.window = window_;
-        journal.deadline = bootMilliseconds() + window_;
-        journal.settling = settings.settling;
-        journal.steps = settings.steps;
-        journal.began = static_cast<std::uint64_t>(std::time(nullptr));
-        journal.caller = settings.caller;
-        journal.summary = settings.summary;
-        return true;
+    begun_.boot = before_.boot;
+    begun_.window = window_;
+    begun_.deadline = bootMilliseconds() + window_;
+    begun_.settling = settings.settling;
+    begun_.steps = settings.steps;
+    begun_.began = static_cast<std::uint64_t>(std::time(nullptr));
+    begun_.caller = settings.caller;
+    begun_.summary = settings.summary;
+    if (window_ != 0) {
+        update([](Journal&) { return true; });  // for the guard
+    }
+}
+
+/// Who waits for nobody has the journal begin with the first step, for each write of it is one to the disk.
+Journal ChangeInMaking::update(const std::function<bool(Journal&)>& change) {
+    return directory_.update([&](Journal& journal) {
+        journal = journal.began == 0 ? begun_ : journal;
+        return change(journal);
     });
 }
 
 void ChangeInMaking::beginStep() {
     fcntl(inSteps_.get(), F_SETFD, 0);  // what a step starts inherits it; the guard was started before
-    const Journal now = directory_.update([this](Journal& journal) {
+    const Journal now = update([this](Journal& journal) {
         const bool isFirst = journal.stage == Stage::saved;
         if (!isFirst && journal.stage != Stage::changing) {
             return false;
@@ -147,8 +164,15 @@ void ChangeInMaking::beginStep() {
 }
 
 Journal ChangeInMaking::end() {
-    directory_.save("left", before_.again());
-    return directory_.update([this](Journal& journal) {
+    const SavedState left = before_.again();
+    if (window_ == 0 && left.isAs(before_)) {
+        directory_.remove();
+        Journal nothing;
+        nothing.stage = Stage::kept;
+        return nothing;
+    }
+    directory_.save("left", left);
+    return update([this](Journal& journal) {
         if (journal.stage != Stage::saved && journal.stage != Stage::changing) {
             return false;
         }

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <functional>
+
 #include "agent/undo/change_directory.h"
 
 namespace cvagent::undo {
@@ -9,6 +11,7 @@ struct MakingSettings {
     std::string caller;
     std::string summary;             ///< what is changed, in a line
     std::vector<std::string> paths;  ///< whole ones of all files that it may touch
+    bool hasNetwork = true;          ///< whether it may touch the kernel's network
     KeeperCalls calls;               ///< see there; its files are among the paths
     std::uint64_t steps = 0;
     std::uint64_t settling = 0;  ///< see Journal
@@ -29,16 +32,21 @@ public:
     /// Throws ChangeError when the change is being taken back, for its time is over.
     void beginStep();
     /// All steps are made. From now on the time for the confirmation counts; without one the change is kept.
+    /// Then one that has left everything as it was is forgotten.
     Journal end();
     /// A step has failed.
     Journal takeBack();
 
 private:
+    void save(const MakingSettings& settings);
+    Journal update(const std::function<bool(Journal&)>& change);
+
     hosttools::Descriptor place_;  ///< locked until the others can see that this one has begun
     ChangeDirectory directory_;
     hosttools::Descriptor alive_;
     hosttools::Descriptor inSteps_;
     SavedState before_;
+    Journal begun_;  ///< as the journal begins
     std::uint64_t window_;
 };
 

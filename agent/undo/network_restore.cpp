@@ -287,6 +287,15 @@ NetworkState NetworkState::read() {
     return state;
 }
 
+bool isSameNetwork(const NetworkState& before, const NetworkState& after) {
+    const std::vector<unsigned> links = linksOf(before);
+    return before.network.problem == 0 && after.network.problem == 0 &&
+           linksToPutBack({before, &after, after, 0}, after).empty() &&
+           std::ranges::all_of(entryKinds(), [&](const EntryKind& kind) {
+               return isSame(kind.entries(before, links), kind.entries(after, links));
+           });
+}
+
 void putBackNetwork(const NetworkChange& change, std::vector<std::string>& notes) {
     for (const NetworkState* each : {&change.before, change.left, &change.now}) {
         if (each != nullptr && each->network.problem != 0) {

@@ -26,6 +26,9 @@ struct NetworkChange {
     bool isKeeperTold = false;  ///< since `now`: the system that keeps an interface has its files back
 };
 
+/// Whether nothing would have to be put back of what was changed between them.
+bool isSameNetwork(const NetworkState& before, const NetworkState& after);
+
 /// Deletes what the change has made and adds what it has taken away, in three rounds at most. What others
 /// have done since stays. Can be done again with the same change.
 /// @param notes gets a line for each thing that is not back, and for what only the kernel or a router makes

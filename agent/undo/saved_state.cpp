@@ -63,6 +63,8 @@ void takeRecord(const Record& record, SavedState& state) {
         state.boot = record.bytes;
     } else if (record.name == "milliseconds") {
         state.milliseconds = record.number();
+    } else if (record.name == "without-network") {
+        state.hasNetwork = false;
     } else if (record.name == "problem") {
         state.network.network.problem = static_cast<int>(record.number(INT16_MAX));
     } else {
@@ -130,13 +132,16 @@ void noteOthersFiles(const SavedState& before, std::vector<std::size_t> others, 
 
 }  // namespace
 
-SavedState SavedState::of(const std::vector<std::string>& paths) {
+SavedState SavedState::of(const std::vector<std::string>& paths, bool hasNetwork) {
     SavedState state;
+    state.hasNetwork = hasNetwork;
     for (const std::string& path : paths) {
         state.files.push_back(fileStateOf(path));
     }
-    state.network = NetworkState::read();
-    std::erase_if(state.network.network.routes, isOfRoutingProgram);
+    if (hasNetwork) {
+        state.network = NetworkState::read();
+        std::erase_if(state.network.network.routes, isOfRoutingProgram);
+    }
     utsname names{};
     if (uname(&names) == 0) {
         state.hostName = static_cast<const char*>(names.nodename);
@@ -154,7 +159,15 @@ std::vector<std::string> SavedState::paths() const {
 }
 
 SavedState SavedState::again() const {
-    return of(paths());
+    return of(paths(), hasNetwork);
+}
+
+bool SavedState::isAs(const SavedState& other) const {
+    const auto isSameFile = [](const FileState& one, const FileState& two) {
+        return one.path == two.path && one.isAs(two);
+    };
+    return std::ranges::equal(files, other.files, isSameFile) && hostName == other.hostName &&
+           domainName == other.domainName && isSameNetwork(network, other.network);
 }
 
 std::string SavedState::obstacle() const {
@@ -178,6 +191,9 @@ std::string textOf(const SavedState& state) {
         for (const std::string& each : state.calls.*list.list) {
             text.add(list.name, each);
         }
+    }
+    if (!state.hasNetwork) {
+        text.add("without-network", "");
     }
     text.add("problem", static_cast<std::uint64_t>(state.network.network.problem));
     for (const List& list : kLists) {
@@ -237,6 +253,8 @@ TakenBack takeBack(const SavedState& before, const SavedState* left, const Saved
     const bool isKeeperTold = !calls.before.empty() || !calls.after.empty();
     if (!isOtherStart) {  // then the rest of the kernel has begun anew, or does with what the files say
         putBackNames(before, left, began, taken.notes);
+    }
+    if (!isOtherStart && before.hasNetwork) {
         constexpr std::uint64_t kThousand = 1000;
         const std::uint64_t now = bootMilliseconds();
         const std::uint64_t seconds = now < before.milliseconds ? 0 : (now - before.milliseconds) / kThousand;

@@ -14,6 +14,7 @@ namespace cvagent::undo {
 /// A host at one moment, as far as a change touches it.
 struct SavedState {
     std::vector<FileState> files;
+    bool hasNetwork = true;  ///< false: the change does not touch it, and nothing of it is saved
     NetworkState network;
     KeeperCalls calls;  ///< to be run when its files come back
     std::string hostName;
@@ -22,9 +23,11 @@ struct SavedState {
     std::uint64_t milliseconds = 0;  ///< of the boot clock
 
     /// @param paths whole; each once
-    static SavedState of(const std::vector<std::string>& paths);
-    /// The same files, now.
+    static SavedState of(const std::vector<std::string>& paths, bool hasNetwork = true);
+    /// The same of the host, now.
     SavedState again() const;
+    /// Whether it is the same, as far as it can be put back, whenever its files were written.
+    bool isAs(const SavedState& other) const;
 
     std::vector<std::string> paths() const;
     /// Why a change of this cannot be taken back; "" when it can.

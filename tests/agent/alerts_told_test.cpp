@@ -14,18 +14,21 @@ constexpr const char* kState = "/opt/vantrel/corvista/data/oshwminetind.dat";
 const std::string kAlert =
     "cvagent: alert: /oshw/root/computer/chassis/network-controller/network-port:eth0: NIC is Online\n";
 
-/// The link of eth0 has come up while no agent ran, and the host's name takes its time, so that the plug-in's
-/// first pass ends before the command does.
+constexpr const char* kTaken =
+    "until read -r link < /opt/vantrel/corvista/data/oshwminetind.dat && [ \"$link\" = eth0=1 ]; do sleep "
+    "0.01; done";
+
+/// The link of eth0 has come up while no agent ran, and the host's name is told once the plug-in's first pass
+/// has taken that for told, so that the pass ends before the command does.
 class LinkThatCameUp : public HostFixture {
 protected:
     void setUpHost(FakeHost& host) override {
         suse.emplace(host);
-        slowName(host, 700);
+        nameAfter(host, kTaken);
         host.file(kState, "eth0=12\n");
     }
-    static void slowName(FakeHost& host, int milliseconds) {
-        host.toolInTurn("hostname -s",
-                        {{.out = "linux\n"}, {.out = "linux\n", .delayMilliseconds = milliseconds}});
+    static void nameAfter(FakeHost& host, const std::string& action) {
+        host.toolInTurn("hostname -s", {{.out = "linux\n"}, {.out = "linux\n", .action = action}});
     }
     static bool isTakenForTold(const FakeHost& host) {
         return host.read(kState).value_or("").find("eth0=1\n") != std::string::npos;
@@ -59,7 +62,7 @@ HOST_TEST_F(LinkThatCameUp, IsToldByAWrite) {
 HOST_TEST_F(LinkThatCameUp, IsToldByTheTreeThatTakesItForTold) {
     std::string told;
     for (int runs = 0; runs < 30 && !isTakenForTold(host); ++runs) {
-        slowName(host, 0);
+        nameAfter(host, "");
         told = suse->run({"tree"}).err;
     }
     EXPECT_EQ(told, isTakenForTold(host) ? kAlert : "");
@@ -70,7 +73,7 @@ HOST_TEST_F(LinkThatCameUp, IsToldWhereStandardOutputTakesNothing) {
     EXPECT_EQ(closed.status, 1);
     EXPECT_THAT(closed.err, HasSubstr(kAlert));
     host.file(kState, "eth0=12\n");
-    slowName(host, 700);
+    nameAfter(host, kTaken);
     const Finished full = inShell(host, "get ip-config:eth0 HostName > /dev/full");
     EXPECT_EQ(full.status, 1);
     EXPECT_THAT(full.err, HasSubstr(kAlert));
@@ -82,7 +85,7 @@ HOST_TEST_F(LinkThatCameUp, IsToldWhereStandardOutputTakesNothing) {
 }
 
 HOST_TEST_F(LinkThatCameUp, IsToldByACommandThatIsInterrupted) {
-    slowName(host, 60000);
+    nameAfter(host, "sleep 60");
     RunningProgram get = host.start(suse->commandLine({"get", "ip-config:eth0", "HostName"}));
     EXPECT_TRUE(eventually([&host] { return isTakenForTold(host); }));
     get.signal(SIGTERM);

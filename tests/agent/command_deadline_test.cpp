@@ -29,7 +29,7 @@ HOST_TEST(CommandDeadline, EndsAPipelineThatHangsAndTellsItsReader) {
     EXPECT_EQ(shell("sleep 1000 | cat").status, kKilled);
     EXPECT_GE(std::chrono::steady_clock::now() - start, 0.3s);
     EXPECT_EQ(scope.complaint(), "timed out after 0.3 s: sleep 1000 | cat");
-    EXPECT_TRUE(eventually([&] { return !isRunning(host, "sleep"); }));
+    EXPECT_TRUE(isGone(host, "sleep"));
 }
 
 /// What it has left behind keeps its pipe open.
@@ -67,38 +67,38 @@ HOST_TEST(CommandDeadline, LetsWhoIsToldCallThePlugin) {
 }
 
 HOST_TEST(CommandDeadline, GivesEveryCommandTheWholeTime) {
-    const CommandDeadline deadline(1s, cvagent::complain);
+    const CommandDeadline deadline(2s, cvagent::complain);
     const CommandScope scope(CommandScope::read);
     for (int i = 0; i < 3; ++i) {
-        EXPECT_EQ(shell("sleep 0.4; true").status, 0);
+        EXPECT_EQ(shell("sleep 0.7; true").status, 0);
     }
     EXPECT_THAT(scope.complaint(), IsEmpty());
 }
 
 HOST_TEST(CommandDeadline, TellsNobodyElse) {
-    const CommandDeadline deadline(0.5s, cvagent::complain);
+    const CommandDeadline deadline(2s, cvagent::complain);
     std::string other = "not asked";
     std::thread quick([&other] {
         const CommandScope scope(CommandScope::read);
         for (int i = 0; i < 7; ++i) {
-            shell("sleep 0.1; true");
+            shell("sleep 0.3; true");
         }
         other = scope.complaint();
     });
     const CommandScope scope(CommandScope::read);
     shell("sleep 1000");
     quick.join();
-    EXPECT_EQ(scope.complaint(), "timed out after 0.5 s: sleep 1000");
+    EXPECT_EQ(scope.complaint(), "timed out after 2 s: sleep 1000");
     EXPECT_THAT(other, IsEmpty());
 }
 
 HOST_TEST(CommandDeadline, AWriteMayTakeTenTimesAsLong) {
-    const CommandDeadline deadline(0.1s, cvagent::complain);
+    const CommandDeadline deadline(0.2s, cvagent::complain);
     const CommandScope scope(CommandScope::write);
     EXPECT_EQ(shell("sleep 0.4; true").status, 0);
     EXPECT_THAT(scope.complaint(), IsEmpty());
     EXPECT_EQ(shell("sleep 1000; true").status, kKilled);
-    EXPECT_EQ(scope.complaint(), "timed out after 1 s: sleep 1000; true");
+    EXPECT_EQ(scope.complaint(), "timed out after 2 s: sleep 1000; true");
 }
 
 HOST_TEST(CommandDeadline, WarnsTheUserOfWhatHasNoReader) {
@@ -141,12 +141,12 @@ HOST_TEST(CommandDeadline, TheTimeThatTheProgramWasStoppedDoesNotCount) {
     const pid_t program = fork();
     if (program == 0) {
         setpgid(0, 0);
-        const CommandDeadline deadline(1s, cvagent::complain);
+        const CommandDeadline deadline(2s, cvagent::complain);
         _exit(shell("while [ ! -e /go ]; do sleep 0.02; done").status == 0 ? 0 : 1);
     }
     std::this_thread::sleep_for(0.3s);
     kill(-program, SIGSTOP);
-    std::this_thread::sleep_for(1.5s);
+    std::this_thread::sleep_for(2.2s);
     host.file("/go", "");
     kill(-program, SIGCONT);
     int status = -1;

@@ -99,7 +99,7 @@ HOST_TEST(EventProgram, ThatHangsIsKilledWithItsDescendants) {
     EXPECT_EQ(run.status, 0);
     EXPECT_THAT(run.err, HasSubstr("for event 1 took too long and was ended\n"));
     EXPECT_THAT(run.err, HasSubstr("for event 2 took too long and was ended\n"));
-    EXPECT_TRUE(eventually([&] { return !isRunning(host, "sleep"); }));
+    EXPECT_TRUE(isGone(host, "sleep"));
 }
 
 HOST_TEST(EventProgram, ASignalEndsItAtOnce) {
@@ -174,7 +174,7 @@ HOST_TEST(EventProgram, ThatForksForEverIsEndedWithAllItHasStarted) {
         {"watch", "--for", "0.2", "--exec", kProgram, "--exec-timeout", "0.2"});
     EXPECT_EQ(run.status, 0);
     EXPECT_THAT(run.err, HasSubstr("for event 2 took too long and was ended\n"));
-    EXPECT_TRUE(eventually([&] { return !isRunning(host, "sleep"); }));
+    EXPECT_TRUE(isGone(host, "sleep"));
 }
 
 HOST_TEST(SeveralPlugins, MakeOneTreeAndOneThatFailsIsTold) {

@@ -43,3 +43,8 @@ inline bool isRunning(const FakeHost& host, const std::string& program) {
     }
     return false;
 }
+
+/// Whether none runs any more: one that was killed takes a moment to be gone.
+inline bool isGone(const FakeHost& host, const std::string& program) {
+    return eventually([&] { return !isRunning(host, program); });
+}

@@ -2,7 +2,6 @@
 #include <gmock/gmock.h>
 
 #include <nlohmann/json.hpp>
-#include <set>
 
 #include "tests/agent/cvagent_run.h"
 #include "tests/agent/hostile_host.h"
@@ -63,46 +62,62 @@ HOST_TEST(ReadOnlyData, AnOwnerIsNotWritten) {
     EXPECT_THAT(host.listDirectory(kData), IsEmpty());
 }
 
-std::vector<std::string> whileTheClockJumps(const std::string& when, const std::vector<std::string>& words) {
-    std::vector<std::string> line = {"env", "LD_PRELOAD=" CLOCK_JUMP_LIBRARY, "CLOCK_JUMP=" + when};
+constexpr long long kDay = 86400;
+
+std::vector<std::string> whileTheClockJumps(const std::string& how, const std::vector<std::string>& words) {
+    std::vector<std::string> line = {"env", "LD_PRELOAD=" CLOCK_JUMP_LIBRARY, "CLOCK_JUMP=" + how};
     line.insert(line.end(), words.begin(), words.end());
     return line;
 }
 
-// The plug-in of the tests publishes all the time, so each second's time of day is seen.
+/// Seconds of a time as events have it.
+long long secondsOf(const std::string& text) {
+    std::tm parts{};
+    EXPECT_NE(strptime(text.c_str(), "%Y-%m-%dT%H:%M:%S", &parts), nullptr) << text;
+    return timegm(&parts);
+}
+
+// The plug-in of the tests publishes all the time, so there are events before and after.
 HOST_TEST(ClockThatJumps, WatchingGoesOnAsLongAsItWasAsked) {
-    for (const std::string when : {"400 -86400", "400 86400"}) {
+    for (const long long by : {-kDay, kDay}) {
         const auto start = std::chrono::steady_clock::now();
         CvagentRun cvagent(host);
-        cvagent.telling("churn").setting("LD_PRELOAD=" CLOCK_JUMP_LIBRARY).setting("CLOCK_JUMP=" + when);
-        const Finished run = cvagent({"watch", "--json", "--for", "1"});
+        cvagent.telling("churn")
+            .setting("LD_PRELOAD=" CLOCK_JUMP_LIBRARY)
+            .setting("CLOCK_JUMP=/jump " + std::to_string(by));
+        RunningProgram watch = cvagent.start({"watch", "--json", "--for", "3"});
+        ASSERT_TRUE(watch.waitForOutput("\n"));
+        host.file("/jump", "");
+        const Finished run = watch.wait();
+        host.remove("/jump");
         EXPECT_EQ(run.status, 0) << run.err;
-        EXPECT_GE(std::chrono::steady_clock::now() - start, std::chrono::seconds(1)) << when;
+        EXPECT_GE(std::chrono::steady_clock::now() - start, std::chrono::seconds(3)) << by;
+        std::vector<long long> times;
         std::istringstream lines(run.out);
-        std::set<std::string> days;
         for (std::string line; std::getline(lines, line);) {
-            days.insert(Json::parse(line)["time"].get<std::string>().substr(0, 10));
+            times.push_back(secondsOf(Json::parse(line)["time"].get<std::string>()));
         }
-        EXPECT_EQ(days.size(), 2U) << when;
+        EXPECT_NEAR(static_cast<double>(times.back() - times.front() - by), 0, 60) << by;
     }
 }
 
 HOST_TEST(ClockThatJumps, TheDeadlineOfCommandsDoesNotMove) {
     SuseHost suse(host);
-    host.tool("fdisk -ls", hanging());
+    host.tool("fdisk -ls", ToolAnswer{.out = "", .action = "> /jump; sleep 1000"});
     const Finished run =
-        host.run(whileTheClockJumps("400 -86400", suse.commandLine({"tree", "--command-timeout", "0.8"})));
+        host.run(whileTheClockJumps("/jump -86400", suse.commandLine({"tree", "--command-timeout", "0.8"})));
     EXPECT_EQ(run.status, 0);
+    EXPECT_TRUE(host.exists("/jump"));
     EXPECT_THAT(run.err, HasSubstr("a command of the plug-in was ended after 0.8 s; "));
 }
 
 HOST_TEST(ClockThatJumps, TheTimeIsTheHosts) {
     SuseHost suse(host);
     const Finished run = host.run(
-        whileTheClockJumps("0 -86400", suse.commandLine({"get", "computer", "CurrentTime", "--json"})));
+        whileTheClockJumps("/ -86400", suse.commandLine({"get", "computer", "CurrentTime", "--json"})));
     EXPECT_EQ(run.status, 0);
     const auto told = Json::parse(run.out)["properties"]["126"]["value"].get<long long>();
-    EXPECT_NEAR(static_cast<double>(told), static_cast<double>(time(nullptr) - 86400), 30);
+    EXPECT_NEAR(static_cast<double>(told), static_cast<double>(time(nullptr) - kDay), 30);
 }
 
 }  // namespace

@@ -46,7 +46,8 @@ TEST(RunPath, OfTheInstallationFindsTheFrameworkBesideThePlugin) {
     const Shell install =
         shell("'" CMAKE_PROGRAM "' --install '" + buildDirectory() + "' --prefix '" + place + "' 2>&1");
     ASSERT_EQ(install.status, 0) << install.out;
-    std::vector<std::string> files = {place + "/bin/cvagent", place + "/lib/corvista/corvista-hosttools"};
+    std::vector<std::string> files = {place + "/libexec/cvagent", place + "/bin/cvagent",
+                                      place + "/lib/corvista/corvista-hosttools"};
     std::string libraries;
     for (const auto& entry : fs::recursive_directory_iterator(place)) {
         if (entry.path().filename().string().starts_with("libvantrel") && !entry.is_symlink()) {
@@ -54,13 +55,14 @@ TEST(RunPath, OfTheInstallationFindsTheFrameworkBesideThePlugin) {
             libraries = entry.path().parent_path();
         }
     }
-    EXPECT_EQ(files.size(), 4U);
+    EXPECT_EQ(files.size(), 5U);
     expectSoundPaths(files);
     const std::string plugin = libraries + "/libvantrelcvicoshwmi.so.1";
     const std::string framework = fs::canonical(libraries + "/libvantrelcvframework.so.1");
     EXPECT_EQ(runPath(plugin), ":$ORIGIN:");
     EXPECT_EQ(found(plugin, "libvantrelcvframework.so.1"), framework);
     EXPECT_EQ(found(files[0], "libvantrelcvframework.so.1"), framework);
+    EXPECT_EQ(shell("'" + files[1] + "' --version").out, "cvagent 1.0.0\n") << "which the other one says";
     fs::remove_all(place);
 }
 

@@ -188,9 +188,10 @@ HOST_TEST(QuietCommands, LeaveStandardErrorAloneWhereThereIsNothingToSendItTo) {
     EXPECT_EQ(open("/dev/null", O_WRONLY | O_CLOEXEC), -1);
 }
 
+const std::filesystem::path kForAll = "/tmp";  // $TMPDIR may lie below a directory that is closed to others
+
 TEST(WithoutRoot, SaysWhatWillBeMissingAndUsesTheHome) {
-    const std::filesystem::path home =
-        std::filesystem::temp_directory_path() / ("cvagent-home-" + std::to_string(getpid()));
+    const std::filesystem::path home = kForAll / ("cvagent-home-" + std::to_string(getpid()));
     makeForNobody(home);
     const OnTerminal run = runAsNobody(
         {CVAGENT_PROGRAM, "--host-tools", "native", "--plugin", FAKE_PLUGIN_FILE, "tree"}, home.string());
@@ -206,8 +207,7 @@ TEST(WithoutRoot, SaysWhatWillBeMissingAndUsesTheHome) {
 }
 
 TEST(WithoutRoot, KeepsTheDataWhereTheUserKeepsState) {
-    const std::filesystem::path state =
-        std::filesystem::temp_directory_path() / ("cvagent-state-" + std::to_string(getpid()));
+    const std::filesystem::path state = kForAll / ("cvagent-state-" + std::to_string(getpid()));
     makeForNobody(state);
     const OnTerminal run = runAsNobody({"/usr/bin/env", "XDG_STATE_HOME=" + state.string(), CVAGENT_PROGRAM,
                                         "--host-tools", "native", "--plugin", FAKE_PLUGIN_FILE, "tree"},

@@ -7,7 +7,7 @@ target_link_libraries(tiny_front_end PRIVATE agent_core corvista_framework corvi
 
 set(agent_test_programs
   TINY_FRONT_END="$<TARGET_FILE:tiny_front_end>"
-  CVAGENT_PROGRAM="$<TARGET_FILE:cvagent>"
+  CVAGENT_PROGRAM="$<TARGET_FILE:cvagent_whole>"
   CORVISTA_PLUGIN_FILE="$<TARGET_FILE:vantrelcvicoshwmi>"
   FAKE_PLUGIN_FILE="$<TARGET_FILE:fake_plugin>"
   FRAMEWORK_FILE="$<TARGET_FILE:corvista_framework>")

@@ -27,6 +27,15 @@ HOST_TEST(Touched, IsAllThatThePluginWritesToWhereThereIsNoPlan) {
     EXPECT_THAT(paths, Not(Contains("/opt/vantrel/corvista/data/mimsgsubject.dat")));
 }
 
+HOST_TEST(Touched, IsNothingOfTheNetworkForTheComputersOwnSettings) {
+    host.directory("/sys/class/net/eth0");
+    host.file("/etc/sysconfig/network/ifcfg-eth0", "BOOTPROTO=static\n");
+    host.file("/opt/vantrel/corvista/data/ifcfg-eth7", "SAVED=1\n");
+    EXPECT_THAT(touchedPaths({}, false),
+                testing::UnorderedElementsAre("/etc/localtime", "/etc/localtime.bak", "/etc/timezone",
+                                              "/etc/sysconfig/clock", "/etc/sysconfig/clock.bak", kOwner));
+}
+
 HOST_TEST(Touched, IsWhatThePlanNames) {
     host.file("/run/resolv.conf", "nameserver 192.0.2.53\n");
     host.symlink("/etc/resolv.conf", "../run/resolv.conf");

@@ -14,5 +14,5 @@ corvista_test(computer LIBRARIES plugin_code test_support SOURCES
   computer/zone_table_test.cpp
   support/failing_new.cpp)
 target_compile_definitions(computer_test PRIVATE
-  CVAGENT_PROGRAM="$<TARGET_FILE:cvagent>" CORVISTA_PLUGIN="$<TARGET_FILE:vantrelcvicoshwmi>")
+  CVAGENT_PROGRAM="$<TARGET_FILE:cvagent_whole>" CORVISTA_PLUGIN="$<TARGET_FILE:vantrelcvicoshwmi>")
 add_dependencies(computer_test cvagent vantrelcvicoshwmi)

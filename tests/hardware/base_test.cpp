@@ -116,7 +116,10 @@ struct Device {
 
 class OneNode : public testing::Test {
 protected:
-    OneNode() { Device::asked = 0; }
+    explicit OneNode(std::chrono::milliseconds limit = std::chrono::milliseconds(250))
+        : asking_(std::make_shared<hardware::Asking>(hardware::Host("/nowhere"), limit)) {
+        Device::asked = 0;
+    }
     ~OneNode() override {
         Device::hang(false);
         EXPECT_TRUE(eventually([] {
@@ -130,20 +133,37 @@ protected:
         return error.getStatus() == 0 ? golden::text(value) : "status " + std::to_string(error.getStatus());
     }
 
-    const std::shared_ptr<hardware::Asking> asking_ =
-        std::make_shared<hardware::Asking>(hardware::Host("/nowhere"), std::chrono::milliseconds(250));
+    const std::shared_ptr<hardware::Asking> asking_;
     HardwareNode node_{{5, 1, {1}, 1}, Device::kSource, "eth0", asking_};
 };
 
-TEST_F(OneNode, ALivePropertyIsAskedForAFixedOneUntilItIsKnown) {
+/// One that has time to answer on a busy machine.
+class OneNodeThatAnswers : public OneNode {
+protected:
+    OneNodeThatAnswers() : OneNode(std::chrono::seconds(30)) {}
+};
+
+TEST_F(OneNodeThatAnswers, ALivePropertyIsAskedForAFixedOneUntilItIsKnown) {
     EXPECT_EQ(get(31002), "7");
     EXPECT_EQ(get(31002), "7");
     EXPECT_EQ(get(31003), "status 1");
     EXPECT_EQ(Device::asked, 1);
     EXPECT_EQ(get(31000), "eth0");
-    EXPECT_EQ(get(31001), "1") << "what is fresh is not asked for again";
-    std::this_thread::sleep_for(std::chrono::milliseconds(520));
-    EXPECT_EQ(get(31001), "2");
+}
+
+TEST_F(OneNodeThatAnswers, ALivePropertyIsAskedForTwiceASecond) {
+    constexpr std::chrono::milliseconds kFresh{500};
+    get(31001);
+    bool isLate = true;
+    while (isLate) {  // this thread was held up between the two
+        std::this_thread::sleep_for(kFresh);
+        const std::string next = std::to_string(Device::asked + 1);
+        const auto start = std::chrono::steady_clock::now();
+        EXPECT_EQ(get(31001), next);
+        const std::string again = get(31001);
+        isLate = std::chrono::steady_clock::now() - start >= kFresh;
+        EXPECT_TRUE(isLate || again == next) << again;
+    }
 }
 
 TEST_F(OneNode, ThatHangsIsUnansweredAndKeepsWhatIsKnown) {
@@ -162,7 +182,7 @@ TEST_F(OneNode, ThatHangsIsUnansweredAndKeepsWhatIsKnown) {
 }
 
 TEST_F(OneNode, APartThatDoesNotAnswerIsUnansweredAndKeepsWhatIsKnown) {
-    const auto now = std::chrono::steady_clock::now();
+    const auto now = std::chrono::steady_clock::now() + std::chrono::hours(1);  // fresh until the end
     hardware::Found found = hardware::nameOnly(Class::link, "eth0");
     found.facts.number(31001, 99);
     found.facts.number(31002, 5);
@@ -193,7 +213,7 @@ TEST_F(OneNode, WhatWasAskedForEarlierDoesNotReplaceWhatIsKnown) {
     EXPECT_EQ(get(31002), "3");
 }
 
-TEST_F(OneNode, NothingCanBeWritten) {
+TEST_F(OneNodeThatAnswers, NothingCanBeWritten) {
     EXPECT_NE(node_.setProperty(31002, IC::PropertyValue(IC::Number(1U), true)).getStatus(), 0);
     EXPECT_EQ(get(31002), "7");
 }

@@ -21,7 +21,7 @@ using hardware::DeadlineRunner;
 using std::chrono::milliseconds;
 using std::chrono::steady_clock;
 
-constexpr milliseconds kLimit{250};  // longer than the machine keeps a thread waiting
+constexpr milliseconds kLimit{1000};  // longer than the machine keeps a thread waiting
 constexpr milliseconds kLong{10000};
 
 /// A device that does not answer before it is released.

@@ -18,6 +18,7 @@
 #include "tests/hardware/beside_ip.h"
 #include "tests/hardware/golden.h"
 #include "tests/hardware/recorded_host.h"
+#include "tests/support/amounts.h"
 #include "tests/support/waiting.h"
 
 namespace {
@@ -27,6 +28,9 @@ using hardware::Watcher;
 using Json = nlohmann::json;
 using testing::Contains;
 using testing::UnorderedElementsAre;
+
+const auto kChanges = numberFrom("CORVISTA_CHANGES", 300);
+const auto kSeed = seedOfRun();
 
 /// Moves this process, before it has threads of its own, into a network and a /sys of its own.
 bool enterOwnNetwork() {
@@ -209,13 +213,13 @@ std::string change(std::mt19937& random) {
 TEST_F(Links, TheTreeFollowsAllChanges) {
     hardware::HardwareMI plugin{hardware::Host()};
     ASSERT_EQ(plugin.initialize(1, IC::Number(1U), IC::Number(2U)).getStatus(), 0);
-    const unsigned int seed = std::random_device()();
-    SCOPED_TRACE("seed " + std::to_string(seed));
-    std::mt19937 random(seed);
+    SCOPED_TRACE("CORVISTA_SEED=" + std::to_string(kSeed));
+    std::mt19937 random(kSeed);
     const RecordedHost recorded;
-    for (int round = 0; round < 6; ++round) {
+    constexpr int kAtOnce = 50;
+    for (unsigned long done = 0; done < kChanges && !HasFailure(); done += kAtOnce) {
         std::string changes;
-        for (int count = 0; count < 50; ++count) {
+        for (int count = 0; count < kAtOnce; ++count) {
             changes += change(random) + "\n";
         }
         recorded.file("/changes", changes);

@@ -176,7 +176,8 @@ HOST_TEST(HistoryCommand, CommandsWorkWhereNothingCanBeKept) {
     EXPECT_EQ(run.status, 0);
     EXPECT_THAT(run.out, HasSubstr("new  room 4"));
     EXPECT_THAT(run.err,
-                MatchesRegex("cvagent: what happens is not kept in the history: [^\n]*Read-only file "
+                MatchesRegex("cvagent: the change cannot be taken back later: [^\n]*Read-only file system\n"
+                             "cvagent: what happens is not kept in the history: [^\n]*Read-only file "
                              "system\n"));
 }
 
@@ -194,7 +195,7 @@ HOST_TEST(HistoryCommand, GoesWithTheDataDirectoryThatIsNamed) {
     CvagentRun run(host);
     run.setting("CORVISTA_DATA_DIR=/root/scratch")({"set", "computer", "OwnerContact", "x"});
     EXPECT_TRUE(host.exists("/root/scratch/history.db"));
-    EXPECT_FALSE(host.exists("/var/lib/corvista"));
+    EXPECT_FALSE(host.exists("/var/lib/corvista/history.db"));
     EXPECT_THAT(objects(run({"history", "--json"}).out), SizeIs(1));
 }
 

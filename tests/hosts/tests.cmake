@@ -4,7 +4,7 @@ corvista_test(golden PARTS 2 SOURCES
 target_compile_definitions(golden_test PRIVATE
   CORVISTA_TESTS_DIR="${CMAKE_SOURCE_DIR}/tests"
   CORVISTA_BUILD_DIR="${CMAKE_BINARY_DIR}"
-  CVAGENT_PROGRAM="$<TARGET_FILE:cvagent>"
+  CVAGENT_PROGRAM="$<TARGET_FILE:cvagent_whole>"
   CORVISTA_PLUGIN_FILE="$<TARGET_FILE:vantrelcvicoshwmi>")
 add_dependencies(golden_test corvista-hosttools cvagent vantrelcvicoshwmi)
 

@@ -22,6 +22,7 @@ AGENT = "/opt/cv/agent/cvagent"
 NODE = "ip-config:eth0"
 STANZA = "# the wire\nauto eth0\niface eth0 inet static\n\taddress 192.0.2.10/24\n\tgateway 192.0.2.1\n"
 NETWORK = "[Match]\nName=eth*\n[Network]\nAddress=192.0.2.10/24\nGateway=192.0.2.1\n"
+ADDED = "[Route]\nDestination=203.0.113.0/24\nGateway=192.0.2.9\n"
 NETPLAN = ("network:\n  version: 2\n  ethernets:\n    eth0:\n      addresses: [192.0.2.10/24]  # ours\n"
            "      routes:\n        - to: default\n          via: 192.0.2.1\n")
 PROFILE_PATH = "/etc/NetworkManager/system-connections/the lan.nmconnection"
@@ -39,7 +40,8 @@ class Context:
         place = f"/proc/{self.host.init}/root/opt/cv"
         os.makedirs(f"{place}/agent")
         for program in ("cvagent", "corvista-guard", "corvista-rehearsal"):
-            shutil.copy(f"{build}/agent/{program}", f"{place}/agent")
+            folder = "libexec" if program == "cvagent" else "agent"  # the program that is whole without the other one
+            shutil.copy(f"{build}/{folder}/{program}", f"{place}/agent")
         shutil.copytree(f"{build}/lib", f"{place}/lib", symlinks=True, ignore=shutil.ignore_patterns("*.a"))
         shutil.copytree(f"{build}/hosttools", f"{place}/hosttools", symlinks=True, ignore=shutil.ignore_patterns("*.a", "CMake*"))
         self.host.sh("systemctl stop systemd-networkd networking NetworkManager 2>/dev/null; "
@@ -95,14 +97,21 @@ def change_and_take_back(context, path):
     expect_equal(f"the file {path}", context.host.run(f"cat {path}").stdout, before)
 
 
-def take_gateway_back(context, default):
-    """The daemon makes the route its own, before and after."""
+def take_gateway_back(context):
+    """The daemon takes all addresses and routes away and makes them anew, before and after; nothing is told before it has."""
+    context.host.sh("ip address add 198.51.100.5/24 dev eth0; ip route add 198.18.0.0/15 via 192.0.2.9 dev eth0")  # which it does not know
+    before = network_of(context)
     result = context.host.run(f"{AGENT} set {NODE} IPv4Gateway 192.0.2.254 --confirm-within 600")
     expect_equal(f"the status of the change ({result.stdout}{result.stderr})", result.returncode, 0)
-    context.host.wait_for(f"ip route show default | xargs | grep -qxF '{default.replace('192.0.2.1', '192.0.2.254')}'")
+    expect_equal("the network", network_of(context), before.replace("via 192.0.2.1 ", "via 192.0.2.254 "))
     result = context.host.run(f"{AGENT} rollback")
     expect_equal("what the taking back tells", (result.stdout, result.stderr), ("change 2 is taken back\n", ""))
-    context.host.wait_for(f"ip route show default | xargs | grep -qxF '{default}'")
+    expect_equal("the network when it is taken back", network_of(context), before)
+    context.host.sh("ip address delete 198.51.100.5/24 dev eth0; ip route delete 198.18.0.0/15")
+
+
+def network_of(context):
+    return context.host.sh("ip -4 -o address show dev eth0; ip route")
 
 
 @check("ifupdown: a change is in the stanza and in force; set back, the file is as it was, byte for byte")
@@ -121,14 +130,15 @@ def ifupdown(context):
 @check("systemd-networkd: a change is in a file of ours, in front of the other one; without it, the host is as it was")
 def networkd(context):
     context.write("/etc/systemd/network/20-lan.network", NETWORK)
+    context.write("/etc/systemd/network/20-lan.network.d/more.conf", ADDED)
     context.host.sh("systemctl start systemd-networkd")
-    context.host.wait_for("networkctl status eth0 | grep -q configured")
+    context.host.wait_for("networkctl status eth0 | grep -q configured && ip route | grep -q 203.0.113.0/24")
     expect_equal("who keeps it", context.keeper()["keeper"], "systemd-networkd")
-    default = context.host.sh("ip route show default").strip()
     change_and_take_back(context, "/etc/systemd/network/0-cvagent-eth0.network")
-    context.host.wait_for("networkctl status eth0 | grep -q 20-lan.network")
-    take_gateway_back(context, default)
+    expect("20-lan.network" in context.host.sh("networkctl status eth0"), "it does not have its own file back")
+    take_gateway_back(context)
     change_and_restart(context, "systemd-networkd, in /etc/systemd/network/0-cvagent-eth0.network", "systemctl restart systemd-networkd")
+    context.host.wait_for("ip route | grep -q 203.0.113.0/24")
     expect_equal("the file", context.read("/etc/systemd/network/20-lan.network"), NETWORK)
     context.host.sh("rm /etc/systemd/network/0-cvagent-eth0.network; networkctl reload")
     context.wait_for_address("192.0.2.10/24")
@@ -147,10 +157,6 @@ def netplan(context):
     context.set("IPv4Address", "192.0.2.10", "netplan")
     context.wait_for_address("192.0.2.10/24")
     expect_equal("the file", context.read("/etc/netplan/50-host.yaml"), NETPLAN)
-
-
-def network_of(context):
-    return context.host.sh("ip -4 -o address show dev eth0; ip route")
 
 
 @check("NetworkManager: a change is in its profile and in force, and nothing else is; taken back, the file is as it was, byte for byte")

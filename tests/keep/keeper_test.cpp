@@ -146,12 +146,13 @@ HOST_TEST(Keeper, IsToldByTheDoctorOfEachInterface) {
     host.file("/etc/network/interfaces", "iface eth0 inet dhcp\n");
     EXPECT_THAT(host.run({CVAGENT_PROGRAM, "doctor", "--host-tools", "native"}).out,
                 testing::HasSubstr("KEPT OVER A RESTART BY\n"
-                                   "  a\\x1bb  nobody: what is changed holds until restart\n"
-                                   "  eth0    ifupdown\n"
+                                   "  a\\x1bb        nobody: what is changed holds until restart\n"
+                                   "  eth0          ifupdown\n"
                                    "    ifupdown has it up as 'eth0', by the stanza in "
                                    "/etc/network/interfaces\n"
-                                   "  eth1    nobody: what is changed holds until restart\n"
-                                   "  sw      nobody: what is changed holds until restart\n\n"));
+                                   "  eth1          nobody: what is changed holds until restart\n"
+                                   "  sw            nobody: what is changed holds until restart\n"
+                                   "  host name "));
     const std::string json = host.run({CVAGENT_PROGRAM, "doctor", "--host-tools", "native", "--json"}).out;
     EXPECT_THAT(json, testing::HasSubstr("\"keeper\": \"ifupdown\""));
     EXPECT_THAT(json, testing::HasSubstr("\"interface\": \"a\\u001bb\""));

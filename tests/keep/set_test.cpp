@@ -3,6 +3,7 @@
 #include <sys/mount.h>
 
 #include "tests/support/fake_host.h"
+#include "tests/support/waiting.h"
 
 namespace {
 
@@ -250,6 +251,63 @@ HOST_TEST_F(SetAndKeptByIfupdown, WhatIsExportedIsNoDrift) {
     host.file("/etc/network/interfaces", "iface eth0 inet dhcp\n");
     EXPECT_THAT(cvagent(host, {"export", "ip-config:eth0"}).out,
                 testing::Not(testing::HasSubstr("192.0.2.10")));
+}
+
+/// systemd-networkd, as far as a test needs it: when a reload ends the link has lost its addresses and
+/// routes, and a moment later it has what the first file says.
+class SetAndKeptByNetworkd : public SetAndKept {
+protected:
+    void setUpHost(FakeHost& host) override {
+        SetAndKept::setUpHost(host);
+        for (const char* tool : {"sleep", "mv", "sed"}) {
+            host.realTool(tool);
+        }
+        ip(host, "route add default via 192.0.2.1 dev eth0 proto static");
+        const std::string index = host.run({"cat", "/sys/class/net/eth0/ifindex"}).out;
+        state_ = "/run/systemd/netif/links/" + index.substr(0, index.find('\n'));
+        host.file(state_, saysOf(kNetwork));
+        host.file(kNetwork, "[Match]\nName=eth0\n[Network]\nAddress=192.0.2.10/24\nGateway=192.0.2.1\n");
+        host.mountOver("/sys/fs/cgroup",
+                       [] { ASSERT_EQ(mount("groups", "/sys/fs/cgroup", "tmpfs", 0, nullptr), 0); });
+        host.file("/sys/fs/cgroup/system.slice/systemd-networkd.service/cgroup.procs", "812\n");
+        host.file("/networkd",
+                  "PATH=/tools:/usr/bin:/bin; set -- /etc/systemd/network/*\n"
+                  "say() { printf 'ADMIN_STATE=%s\\nNETWORK_FILE=%s\\n' $1 $2 > /run/new; mv /run/new " +
+                      state_ +
+                      "; }\n"
+                      "say configuring $1; ip -4 address flush dev eth0\n"
+                      "(sleep 0.3; ip address add $(sed -n s/^Address=//p $1) dev eth0\n"
+                      "ip route add default via $(sed -n s/^Gateway=//p $1) dev eth0 proto static\n"
+                      "say configured $1) >/dev/null 2>&1 &\n");
+        for (const char* tool : {"networkctl reload", "/usr/bin/networkctl reload"}) {
+            host.tool(tool, {"", 0, "", 0, "sh /networkd"});
+        }
+    }
+    static std::string saysOf(const std::string& file) {
+        return "ADMIN_STATE=configured\nNETWORK_FILE=" + file + "\n";
+    }
+    static std::string networkOf(FakeHost& host) {
+        return ip(host, "-4 -o address show dev eth0") + ip(host, "-4 route");
+    }
+    static constexpr const char* kNetwork = "/etc/systemd/network/20-lan.network";
+    static constexpr const char* kOurs = "/etc/systemd/network/0-cvagent-eth0.network";
+    std::string state_;
+};
+
+/// What it takes away for a moment is neither what the change has left nor somebody else's work.
+HOST_TEST_F(SetAndKeptByNetworkd, AGatewayIsTakenBackWhole) {
+    const std::string before = networkOf(host);
+    const Finished run =
+        cvagent(host, {"set", "ip-config:eth0", "IPv4Gateway", "192.0.2.254", "--confirm-within", "600"});
+    EXPECT_EQ(run.status, 0) << run.out << run.err;
+    EXPECT_THAT(run.err, testing::HasSubstr("kept over a restart by systemd-networkd"));
+    std::string wanted = before;
+    EXPECT_EQ(networkOf(host), wanted.replace(wanted.find("via 192.0.2.1 "), 13, "via 192.0.2.254"));
+    EXPECT_TRUE(eventually([&] { return host.read(state_) == saysOf(kOurs); }));
+    const Finished back = cvagent(host, {"rollback"});
+    EXPECT_EQ(back.out + back.err, "change 1 is taken back\n");
+    EXPECT_EQ(networkOf(host), before);
+    EXPECT_TRUE(eventually([&] { return host.read(state_) == saysOf(kNetwork); }));
 }
 
 HOST_TEST_F(SetAndKept, NothingIsKeptWhereTwoClaimTheInterface) {

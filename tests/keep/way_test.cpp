@@ -180,12 +180,49 @@ HOST_TEST(KeptByNetworkd, IsNotReadByWhoCouldNotReadItBefore) {
     EXPECT_EQ(found.st_mode & 07777U, 0640U);
 }
 
-HOST_TEST(KeptByNetworkd, IsRefusedWhereOthersAddToTheFile) {
+/// Of two of one name the first place counts, one that leads nowhere is none, and each begins without a
+/// section.
+HOST_TEST(KeptByNetworkd, HasWhatOthersAddToTheFile) {
     const Keeper keeper = keptBy("systemd-networkd", kNetwork);
     EXPECT_THAT(refusalOf([&] { wayToKeep(kLink, keeper, newAddress()); }), HasSubstr("cannot read"));
+    host.file(kNetwork, "[Match]\nName=e*\n[Network]\nAddress=192.0.2.10/24\n");
+    host.file("/etc/systemd/network/20-lan.network.d/b.conf", "DNS=192.0.2.1\n[Network]\nDNS=192.0.2.53\n");
+    host.file("/run/systemd/network/20-lan.network.d/b.conf", "[Network]\nDNS=192.0.2.54\n");
+    host.file("/run/systemd/network/20-lan.network.d/a.conf",
+              "[Match]\nHost=moon\n[Route]\nGateway=192.0.2.1\n");
+    host.file("/run/systemd/network/20-lan.network.d/c.conf", "[Network]\nDNS=192.0.2.55\n");
+    host.symlink("/etc/systemd/network/20-lan.network.d/c.conf", "/dev/null");
+    host.file("/etc/systemd/network/20-lan.network.d/note", "[Network]\nDNS=192.0.2.56\n");
+    const Way way = wayToKeep(kLink, keeper, newAddress());
+    ASSERT_EQ(way.files.size(), 1U);
+    EXPECT_EQ(
+        way.files[0].after,
+        "# Written by cvagent; taken back with the change that made it.\n"
+        "[Match]\nName=eth0\nHost=moon\n\n[Network]\nAddress=192.0.2.77/24\n\n[X-Added]\n"
+        "[Route]\nGateway=192.0.2.1\n\n[X-Added]\nDNS=192.0.2.1\n[Network]\nDNS=192.0.2.53\n\n[X-Added]\n");
+}
+
+HOST_TEST(KeptByNetworkd, IsRefusedWhereWhatOthersAddIsNotForEverybodyOrNotUnderstood) {
+    const Keeper keeper = keptBy("systemd-networkd", kNetwork);
+    const std::string more = "/etc/systemd/network/20-lan.network.d/more.conf";
     host.file(kNetwork, "[Match]\nName=eth0\n[Network]\nAddress=192.0.2.10/24\n");
-    host.file("/run/systemd/network/20-lan.network.d/more.conf", "[Network]\nDNS=192.0.2.53\n");
-    EXPECT_THAT(refusalOf([&] { wayToKeep(kLink, keeper, newAddress()); }), HasSubstr("more.conf' adds"));
+    host.file(more, "[Network]\nDNS=192.0.2.53\n", 0640);
+    EXPECT_THAT(refusalOf([&] { wayToKeep(kLink, keeper, newAddress()); }),
+                HasSubstr("another owner or mode"));
+    host.file(more, "[Network]\nAddress=\nAddress=192.0.2.11/24\n", 0644);
+    EXPECT_THAT(refusalOf([&] { wayToKeep(kLink, keeper, newAddress()); }),
+                HasSubstr("'Address=' takes away what stands before it"));
+    host.remove(more);
+    host.directory(more);
+    EXPECT_THAT(refusalOf([&] { wayToKeep(kLink, keeper, newAddress()); }), HasSubstr("cannot read"));
+}
+
+/// All would be added once more.
+HOST_TEST(KeptByNetworkd, IsRefusedWhereOthersAddToOurFile) {
+    host.file(kOurs, "[Match]\nName=eth0\n[Network]\nAddress=192.0.2.10/24\n");
+    host.file(std::string(kOurs) + ".d/more.conf", "[Network]\nDNS=192.0.2.53\n");
+    EXPECT_THAT(refusalOf([] { wayToKeep(kLink, keptBy("systemd-networkd", kOurs), newAddress()); }),
+                HasSubstr("more.conf' adds to the file of the interface, which is ours"));
 }
 
 /// A reload that fails leaves no file for the next one to find.

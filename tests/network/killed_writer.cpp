@@ -5,6 +5,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <csignal>
 #include <ctime>
 
@@ -25,8 +26,12 @@ public:
 
     bool taken() const { return taken_; }
     bool someoneWaitsToWrite() const {
-        const timespec limit{10, 0};
-        return sigtimedwait(&broken_, nullptr, &limit) == SIGIO;
+        const timespec limit{30, 0};
+        int got = -1;
+        do {  // one that was stopped meanwhile is interrupted
+            got = sigtimedwait(&broken_, nullptr, &limit);
+        } while (got < 0 && errno == EINTR);
+        return got == SIGIO;
     }
 
 private:

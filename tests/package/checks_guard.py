@@ -187,8 +187,7 @@ def power_cut(context):
     expect_equal("the files", host.sh(files), before)
     after = stages(context)
     expect_equal("the changes", (after[kept], after[number]), ("is kept", "is taken back"))
-    told = host.sh("journalctl --no-pager -b -o cat -u corvista-restore").splitlines()
-    expect(f"change {number}: is taken back" in told, told)
+    host.wait_for(f"journalctl --no-pager -b -o cat -u corvista-restore | grep -q -x 'change {number}: is taken back'")
     expect_equal("failed units", host.sh("systemctl --failed --plain --no-legend"), "")
 
 

@@ -9,6 +9,7 @@
 #include <unistd.h>
 
 #include <cstring>
+#include <filesystem>
 #include <nlohmann/json.hpp>
 
 #include "agent/cli/failure.h"
@@ -26,7 +27,7 @@ using Json = nlohmann::json;
 
 /// The command line of one who asks the service.
 Words asking(const Words& words, const std::string& address = ServiceRun::address()) {
-    Words line = {"env", "CORVISTA_BUS=" + address, CVAGENT_PROGRAM};
+    Words line = {"env", "CORVISTA_BUS=" + address, QUICK_PROGRAM};
     line.insert(line.end(), words.begin(), words.end());
     return line;
 }
@@ -81,6 +82,7 @@ HOST_TEST(ServiceClient, AnswersAsAnAgentOfItsOwnDoes) {
         {"get", ""},
         {"get", "sda", "NoSuch"},
         {"get", "computer", "999"},
+        {"get", "computer", "\xff"},
         {"get", "ip-config:eth0", "EnumeratePorts"},
         {"set", "computer", "HostName", "two words"},
         {"set", "computer", "CurrentTime", "yesterday"},
@@ -163,6 +165,39 @@ HOST_TEST(ServiceClient, ReadsTheNamesOfAPluginThatBringsThem) {
     ServiceRun run(host);
     run.plugin(HARDWARE_FILE).start();
     EXPECT_THAT(host.run(asking({"get", "memory"})).out, HasSubstr("TotalMemory"));
+    EXPECT_THAT(host.run(asking({"get", "memory", "\xff"})).err,
+                StartsWith("cvagent: a memory has no property '\\xff'"));
+}
+
+/// What the program that asks leaves to the whole one: other commands, and what is wrong.
+HOST_TEST(ServiceClient, IsTheWholeProgramForAllElse) {
+    ServiceRun run(host);
+    run.start();
+    const std::string bus = "CORVISTA_BUS=" + ServiceRun::address();
+    for (const std::string words :
+         {"--version", "properties computer", "get", "tree tree", "--json doctor -x",
+          "get computer HostName >&-", "tree >&- 2>/dev/full", "tree <&-"}) {
+        const Finished quick = host.run({"sh", "-c", bus + " exec " QUICK_PROGRAM " " + words});
+        const Finished whole = host.run({"sh", "-c", bus + " exec " CVAGENT_PROGRAM " " + words});
+        EXPECT_EQ(quick.out, whole.out) << words;
+        EXPECT_EQ(quick.err, whole.err) << words;
+        EXPECT_EQ(quick.status, whole.status) << words;
+    }
+    const Finished full = host.run({"sh", "-c", bus + " exec " QUICK_PROGRAM " tree >/dev/full"});
+    EXPECT_EQ(full.err, host.run({"sh", "-c", bus + " exec " CVAGENT_PROGRAM " tree >/dev/full"}).err);
+    EXPECT_EQ(full.status, 1);
+}
+
+/// The program that asks loads nothing that plug-ins are made of, and says what is missing where it is alone.
+HOST_TEST(ServiceClient, NeedsTheWholeProgramBesideIt) {
+    host.directory("/srv/bin");
+    std::filesystem::copy_file(QUICK_PROGRAM, "/srv/bin/cvagent");
+    const Finished alone = host.run({"/srv/bin/cvagent", "--version"});
+    EXPECT_EQ(alone.status, 1);
+    EXPECT_EQ(alone.err, "cvagent: cannot run '/srv/bin/../libexec/cvagent': No such file or directory\n");
+    const std::string libraries = host.run({"env", "LD_TRACE_LOADED_OBJECTS=1", QUICK_PROGRAM}).out;
+    EXPECT_THAT(libraries, HasSubstr("libsystemd.so.0"));
+    EXPECT_THAT(libraries, testing::Not(HasSubstr("libvantrelcvframework.so.1")));
 }
 
 HOST_TEST(ServiceClient, IsAnAgentOfItsOwnWhereNoServiceIs) {
@@ -458,6 +493,9 @@ HOST_TEST(ServiceClient, ChangesByItselfThroughAServiceThatIsOlder) {
     EXPECT_THAT(apply.out, HasSubstr("OwnerContact"));
     const Finished plan = host.run(asking({"plan", "/root/changes"}, Impostor::kAddress));
     EXPECT_THAT(plan.err, StartsWith(told + " and makes no plans\n"));
+    const Finished get = host.run(asking({"get", "computer", "OwnerContact"}, Impostor::kAddress));
+    EXPECT_EQ(get.status, 0) << get.err;
+    EXPECT_EQ(get.out, "/oshw/root/computer [3]  Computer\n    115  OwnerContact  old\n");
 }
 
 /// Who may not have the service's plan gets one of his own, as far as he can see.

@@ -14,6 +14,7 @@
 #include "agent/history/database.h"
 #include "agent/history/history.h"
 #include "tests/service/fresh_tree.h"
+#include "tests/support/amounts.h"
 #include "tests/support/waiting.h"
 
 namespace {
@@ -21,14 +22,9 @@ namespace {
 using Clock = std::chrono::steady_clock;
 using std::chrono::milliseconds;
 
-unsigned long amountFrom(const char* name, unsigned long otherwise) {
-    const char* const given = std::getenv(name);
-    return given != nullptr ? std::strtoul(given, nullptr, 10) : otherwise;
-}
-
-// Read before the fake host takes the environment away.
-const unsigned long kKills = amountFrom("CORVISTA_KILLS", 10);
-const unsigned long kMinutes = amountFrom("CORVISTA_MINUTES", 120);
+const auto kKills = numberFrom("CORVISTA_KILLS", 10);
+const auto kMinutes = numberFrom("CORVISTA_MINUTES", 120);
+const auto kSeed = seedOfRun();
 
 constexpr const char* kHistoryFolder = "/var/lib/corvista";
 constexpr std::uint32_t kContact = 115;
@@ -186,12 +182,13 @@ protected:
     }
 
     std::optional<ServiceRun> run;
-    std::mt19937 random{static_cast<std::mt19937::result_type>(amountFrom("CORVISTA_SEED", 22))};
+    std::mt19937 random{kSeed};
     std::vector<std::string> acknowledged;
     unsigned long busyLives = 0;
 };
 
 HOST_TEST_F(Kills, LoseNothingThatWasAcknowledged) {
+    SCOPED_TRACE("CORVISTA_SEED=" + std::to_string(kSeed));
     const std::size_t before = processes();
     for (unsigned long round = 0; round < kKills && !HasFailure(); ++round) {
         liveAndDie(host, round);

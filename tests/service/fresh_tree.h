@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <chrono>
 #include <nlohmann/json.hpp>
 #include <sstream>
 
@@ -147,20 +148,19 @@ protected:
 
     /// Waits until the service knows what a fresh agent finds; what comes of a change by itself, as a carrier
     /// does, may come between the two.
-    /// @return what still differs after ten seconds
+    /// @return what still differs after half a minute
     static std::string awaitFresh(FakeHost& host, ServiceRun& run) {
+        using Clock = std::chrono::steady_clock;
         std::string text;
-        for (int tries = 0; tries < 10; ++tries) {
+        const auto last = Clock::now() + std::chrono::seconds(30);
+        do {
             const Tree wanted = fresh(host);
-            const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(1);
+            const auto end = Clock::now() + std::chrono::seconds(1);
             do {
                 text = differences(known(run), wanted);
                 usleep(5000);
-            } while (!text.empty() && std::chrono::steady_clock::now() < end);
-            if (text.empty()) {
-                break;
-            }
-        }
+            } while (!text.empty() && Clock::now() < end);
+        } while (!text.empty() && Clock::now() < last);
         return text;
     }
 };

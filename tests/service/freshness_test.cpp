@@ -1,8 +1,8 @@
 // What the service knows of the links of a real kernel, beside what a fresh cvagent finds at the same moment.
-#include <cstdlib>
 #include <random>
 
 #include "tests/service/fresh_tree.h"
+#include "tests/support/amounts.h"
 #include "tests/support/waiting.h"
 
 namespace {
@@ -99,16 +99,9 @@ HOST_TEST_F(Freshness, ABondThatComesIsATeam) {
     EXPECT_EQ(awaitFresh(host, run), "");
 }
 
-unsigned int fromEnvironment(const char* name, unsigned int otherwise) {
-    const char* const given = std::getenv(name);
-    return given != nullptr ? static_cast<unsigned int>(std::strtoul(given, nullptr, 10)) : otherwise;
-}
-
-// Read before the fake host takes the environment away.
-const unsigned int kChanges = fromEnvironment("CORVISTA_CHANGES", 300);
-const unsigned int kSeed = fromEnvironment("CORVISTA_SEED", std::random_device()());
-
-const unsigned int kFlood = fromEnvironment("CORVISTA_FLOOD", 10000);
+const auto kChanges = numberFrom("CORVISTA_CHANGES", 300);
+const auto kSeed = seedOfRun();
+const auto kFlood = numberFrom("CORVISTA_FLOOD", 10000);
 
 /// One change of the network, at random. Some cannot be done.
 std::string change(std::mt19937& random) {
@@ -149,17 +142,15 @@ std::string change(std::mt19937& random) {
 }
 
 HOST_TEST_F(Freshness, IsTheSameAfterRandomChanges) {
-    const unsigned int all = kChanges;
-    const unsigned int seed = kSeed;
-    SCOPED_TRACE("CORVISTA_SEED=" + std::to_string(seed));
-    std::mt19937 random(seed);
+    SCOPED_TRACE("CORVISTA_SEED=" + std::to_string(kSeed));
+    std::mt19937 random(kSeed);
     host.run({"ip", "link", "add", "bond0", "type", "bond"});
     ServiceRun run(host);
     start(host, run);
     constexpr unsigned int kAtOnce = 50;
     std::string text;
     long most = 0;
-    for (unsigned int done = 0; done < all && text.empty(); done += kAtOnce) {
+    for (unsigned int done = 0; done < kChanges && text.empty(); done += kAtOnce) {
         std::string changes;
         for (unsigned int count = 0; count < kAtOnce; ++count) {
             changes += change(random) + "\n";
@@ -214,7 +205,7 @@ HOST_TEST_F(Freshness, AFloodCostsLittleAndEndsRight) {
     const std::chrono::duration<double> took = std::chrono::steady_clock::now() - begun;
     EXPECT_EQ(awaitFresh(host, run), "");
     const double cost = processorSeconds(host, service) - before;
-    std::printf("%u changes in %.2f s: %.2f s of processor time, %ld kB\n", kFlood, took.count(), cost,
+    std::printf("%lu changes in %.2f s: %.2f s of processor time, %ld kB\n", kFlood, took.count(), cost,
                 mostKilobytes(host, service) - memory);
     EXPECT_LT(cost, 0.5 * took.count() + 1) << "in " << took.count() << " s";
 #if !defined(__SANITIZE_ADDRESS__)  // which keeps what is freed for a while

@@ -154,6 +154,51 @@ HOST_TEST_F(ServiceObjects, AreFoundByWordsOfPeople) {
     EXPECT_EQ(find("eth0"), "com.vantrel.Corvista1.Error.Ambiguous");
 }
 
+/// The node's path and its readings, or the name of the error.
+std::pair<std::string, std::vector<ToldReading>> foundAndRead(bus::Connection& bus, const std::string& word,
+                                                              const std::vector<std::string>& properties) {
+    std::pair<std::string, std::vector<ToldReading>> told;
+    try {
+        const bus::Message answer = call::ask(bus, ServiceRun::kRoot, call::kAgent, "FindAndRead",
+                                              [&](bus::Writer& writer) { writer.put(word).put(properties); });
+        bus::Reader reader(answer);
+        reader.structure("uuuuosssu", [&] {
+            for (int i = 0; i < 4; ++i) {
+                reader.number();
+            }
+            told.first = reader.path();
+            for (int i = 0; i < 4; ++i) {
+                reader.skip();
+            }
+        });
+        told.second = call::readings(reader);
+        EXPECT_EQ(reader.texts(), std::vector<std::string>());
+    } catch (const bus::Error& error) {
+        told.first = error.name();
+    }
+    return told;
+}
+
+HOST_TEST_F(ServiceObjects, AreFoundAndReadByOneCall) {
+    const auto found = foundAndRead(run->bus(), "computer", {"904", "HostName", "77777"});
+    EXPECT_EQ(found.first, ServiceRun::kComputer);
+    ASSERT_EQ(found.second.size(), 3U);
+    EXPECT_EQ(found.second[0].value, "1") << "its first answer";
+    EXPECT_EQ(found.second[1].id, 108U);
+    EXPECT_EQ(found.second[1].value, "fake");
+    EXPECT_EQ(found.second[2].flags, 2U | 8U) << "the node has no such property, and no value";
+    EXPECT_EQ(foundAndRead(run->bus(), "computer", {"904"}).second.front().value, "2");
+    EXPECT_EQ(foundAndRead(run->bus(), "computer", {}).second.size(),
+              call::read(run->bus(), ServiceRun::kComputer, {}).size());
+    const std::string longText(20000, 'x');
+    EXPECT_EQ(foundAndRead(run->bus(), "computer", {"Nix"}).first, "com.vantrel.Corvista1.Error.NotFound");
+    EXPECT_EQ(foundAndRead(run->bus(), "eth0", {}).first, "com.vantrel.Corvista1.Error.Ambiguous");
+    EXPECT_EQ(foundAndRead(run->bus(), longText, {}).first, "com.vantrel.Corvista1.Error.NotFound");
+    EXPECT_EQ(foundAndRead(run->bus(), "computer", {longText}).first, bus::kLimitsExceeded);
+    EXPECT_EQ(foundAndRead(run->bus(), "computer", std::vector<std::string>(1025, "1")).first,
+              bus::kLimitsExceeded);
+}
+
 /// A getter answers while the host hangs, and for who has hung it up, too.
 HOST_TEST_F(ServiceObjects, AnswerFromMemoryWhileTheHostHangs) {
     host.file("/var/hold", "");

@@ -122,6 +122,7 @@ def main():
     if "--inside" not in sys.argv:
         os.execvp("unshare", ["unshare", "-mn", "--propagation", "private", "capsh", "--drop=cap_sys_time", "--", "-c",
                               'exec "$@"', "-", *sys.argv, "--inside"])
+    os.umask(0o022)  # polkitd reads as a user of its own
     for place in ("/usr/share/polkit-1/actions", "/usr/share/polkit-1/rules.d", "/etc/polkit-1", "/opt", "/run", "/tmp", "/var/lib"):
         if os.path.isdir(place) and not program.startswith(place + "/"):
             subprocess.run(["mount", "-t", "tmpfs", "-o", "mode=755", "none", place], check=True)

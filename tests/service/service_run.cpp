@@ -67,7 +67,7 @@ std::vector<std::string> ServiceRun::commandLine() const {
 
 ServiceRun& ServiceRun::start() {
     program_ = std::unique_ptr<RunningProgram>(new RunningProgram(host_.start(commandLine())));
-    const auto end = std::chrono::steady_clock::now() + 20s;
+    const auto end = std::chrono::steady_clock::now() + 60s;
     while (program_->err().find(" nodes on the bus as ") == std::string::npos) {
         if (std::chrono::steady_clock::now() > end) {
             throw std::runtime_error("the service does not start: " + program_->err());

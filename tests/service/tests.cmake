@@ -56,7 +56,7 @@ if(CORVISTA_SERVICE)
   corvista_test(service_client LIBRARIES agent_cli agent_service agent_core agent_bus test_support SOURCES
     service/command_line_test.cpp
     service/service_run.cpp)
-  target_compile_definitions(service_client_test PRIVATE ${agent_test_programs} CVAGENTD_PROGRAM="$<TARGET_FILE:cvagentd>"
+  target_compile_definitions(service_client_test PRIVATE ${agent_test_programs} QUICK_PROGRAM="$<TARGET_FILE:cvagent>" CVAGENTD_PROGRAM="$<TARGET_FILE:cvagentd>"
     HARDWARE_FILE="$<TARGET_FILE:corvistahardware>")
   add_dependencies(service_client_test cvagent cvagentd corvista-rehearsal fake_plugin corvistahardware vantrelcvicoshwmi)
 endif()

@@ -1,8 +1,9 @@
-// Makes the time of day jump while a program runs; loaded ahead into it. CLOCK_JUMP="MILLISECONDS SECONDS":
-// that long after the start the clock is set forward by so many seconds, back when they are negative. The
+// Makes the time of day jump while a program runs; loaded ahead into it. CLOCK_JUMP="FILE SECONDS": as soon
+// as there is such a file the clock is set forward by so many seconds, back when they are negative. The
 // machine's clock is not touched. C library only.
 #include <dlfcn.h>
 #include <sys/time.h>
+#include <unistd.h>
 
 #include <cstdio>
 #include <cstdlib>
@@ -12,21 +13,15 @@ namespace {
 
 using ClockGettime = int (*)(clockid_t, timespec*);
 
-long long jumpAt = 0;  // milliseconds of the steady clock
+char jumpFile[256];
 long long jumpBy = 0;  // seconds
 ClockGettime machine = nullptr;
-
-long long steadyMilliseconds() {
-    timespec now{};
-    machine(CLOCK_MONOTONIC, &now);
-    return now.tv_sec * 1000LL + now.tv_nsec / 1000000;
-}
 
 __attribute__((constructor)) void begin() {
     machine = reinterpret_cast<ClockGettime>(dlsym(RTLD_NEXT, "clock_gettime"));
     const char* setting = std::getenv("CLOCK_JUMP");
-    if (setting != nullptr && std::sscanf(setting, "%lld %lld", &jumpAt, &jumpBy) == 2) {
-        jumpAt += steadyMilliseconds();
+    if (setting != nullptr) {
+        std::sscanf(setting, "%255s %lld", jumpFile, &jumpBy);
     }
     unsetenv("LD_PRELOAD");  // the host's tools keep their time
 }
@@ -40,7 +35,7 @@ REPLACED int clock_gettime(clockid_t clock, timespec* now) noexcept {
         machine = reinterpret_cast<ClockGettime>(dlsym(RTLD_NEXT, "clock_gettime"));
     }
     const int result = machine(clock, now);
-    if (clock == CLOCK_REALTIME && jumpAt != 0 && steadyMilliseconds() >= jumpAt) {
+    if (clock == CLOCK_REALTIME && jumpBy != 0 && access(jumpFile, F_OK) == 0) {
         now->tv_sec += static_cast<time_t>(jumpBy);
     }
     return result;

@@ -61,7 +61,7 @@ def set_through(context):
 @check("service: a cable that is pulled is told to who watches", MACHINE)
 def watched(context):
     context.guest.sh(f"cvagent watch --json > {EVENTS} 2> /run/watch.err & echo $! > /run/watch.pid")
-    context.guest.sleep(2)
+    context.guest.wait_for_text("/run/watch.err", "watching")
     context.machine.cable(1, False)
     context.guest.wait_for_text(EVENTS, '"NIC is Offline "')
     context.machine.cable(1, True)

@@ -122,6 +122,46 @@ HOST_TEST_F(Confirmed, NeitherAKeyNorAHangUpBreaksARollbackOff) {
     EXPECT_EQ(stages(host), "1 is taken back");
 }
 
+/// Also what nobody was asked a confirmation for.
+HOST_TEST_F(Confirmed, ASetIsRolledBack) {
+    const Finished run = cvagent(host, {"set", "ip-config:eth0", "IPv4Address", kNewAddress});
+    ASSERT_EQ(run.status, 0) << run.err;
+    EXPECT_THAT(look(host), HasSubstr("203.0.113.7/24"));
+    EXPECT_THAT(cvagent(host, {"history", "--changes"}).out,
+                HasSubstr("is kept                     /oshw/root/computer/chassis/network-controller/"
+                          "network-port:eth0/ip-config:eth0 IPv4Address  (by uid 0)\n"));
+    ASSERT_EQ(cvagent(host, {"set", "computer", "OwnerName", "x"}).status, 0);
+    EXPECT_EQ(stages(host), "1 is kept, 2 is kept");
+    EXPECT_THAT(cvagent(host, {"rollback", "1"}).err, HasSubstr("change 2 stands on it"));
+    EXPECT_EQ(cvagent(host, {"rollback"}).out, "change 2 is taken back\n");
+    EXPECT_THAT(cvagent(host, {"get", "computer", "OwnerName"}).out, Not(HasSubstr("OwnerName  x")));
+    EXPECT_THAT(look(host), HasSubstr("203.0.113.7/24"));
+    EXPECT_EQ(cvagent(host, {"rollback"}).out, "change 1 is taken back\n");
+    EXPECT_EQ(look(host), old_);
+}
+
+/// A script that says again and again what is so leaves what can be taken back.
+HOST_TEST_F(Confirmed, ASetOfWhatIsSoAlreadyIsForgotten) {
+    for (int i = 0; i < 3; ++i) {
+        EXPECT_EQ(cvagent(host, {"set", "computer", "OwnerName", "x"}).status, 0);
+        EXPECT_EQ(cvagent(host, {"set", "ip-config:eth0", "IPv4Address", kNewAddress}).status, 0);
+    }
+    EXPECT_EQ(stages(host), "1 is kept, 2 is kept");
+}
+
+/// What nothing takes back is not saved, and nothing is told of it.
+HOST_TEST_F(Confirmed, ADeedIsNotSaved) {
+    host.directory("/var/lib/corvista/changes", 0700);
+    host.readOnly("/var/lib/corvista/changes");
+    const Finished value = cvagent(host, {"set", "computer", "OwnerName", "x"});
+    EXPECT_EQ(value.status, 0) << value.err;
+    EXPECT_THAT(value.err, HasSubstr("cvagent: the change cannot be taken back later: /var/lib/corvista/"
+                                     "changes: Read-only file system\n"));
+    const Finished deed = cvagent(host, {"set", "computer", "PowerAction", "9", "--yes"});
+    EXPECT_THAT(deed.out, HasSubstr("new  9 (restart)"));
+    EXPECT_THAT(deed.err, Not(HasSubstr("taken back")));
+}
+
 /// What apply has made without a confirmation can be taken back, too.
 HOST_TEST_F(Confirmed, AnAppliedFileIsRolledBack) {
     host.file("/root/changes",
@@ -251,10 +291,10 @@ HOST_TEST_F(Confirmed, APersonAtATerminalIsGuardedUnasked) {
     EXPECT_THAT(typed({"computer", "OwnerName", "x"}), Not(HasSubstr("cvagent confirm")));
     EXPECT_THAT(typed({"ip-config:eth0", "IPv4Address", "203.0.113.8", "--confirm-within", "0"}),
                 Not(HasSubstr("cvagent confirm")));
-    EXPECT_EQ(stages(host), "");
+    EXPECT_EQ(stages(host), "1 is kept, 2 is kept");
     EXPECT_THAT(typed({"ip-config:eth0", "IPv4Address", "203.0.113.7"}),
-                HasSubstr("in 60 seconds unless somebody types: cvagent confirm 1"));
-    EXPECT_EQ(cvagent(host, {"confirm", "1"}).status, 0);
+                HasSubstr("in 60 seconds unless somebody types: cvagent confirm 3"));
+    EXPECT_EQ(cvagent(host, {"confirm", "3"}).status, 0);
     EXPECT_EQ(cvagent(host, {"set", "ip-config:eth0", "IPv4Address", "203.0.113.9"}).status, 0);
     host.file("/root/script", "cvagent=$1; shift; \"$cvagent\" \"$@\"\n");
     const OnTerminal script =
@@ -263,7 +303,7 @@ HOST_TEST_F(Confirmed, APersonAtATerminalIsGuardedUnasked) {
                       "");
     EXPECT_EQ(script.status, 0) << script.output;
     EXPECT_THAT(script.output, Not(HasSubstr("cvagent confirm")));
-    EXPECT_EQ(stages(host), "1 is kept");
+    EXPECT_EQ(stages(host), "1 is kept, 2 is kept, 3 is kept, 4 is kept, 5 is kept");
 }
 
 /// sudo gives what it runs a process group of its own, also in a script.
@@ -279,9 +319,9 @@ HOST_TEST_F(Confirmed, BehindSudoItCountsWhoHasTypedThat) {
         return done.output;
     };
     EXPECT_THAT(run({"/bin/sh", "/root/script"}, "203.0.113.7"), Not(HasSubstr("cvagent confirm")));
-    EXPECT_EQ(stages(host), "");
-    EXPECT_THAT(run({"/root/sudo"}, "203.0.113.8"), HasSubstr("cvagent confirm 1"));
-    const Finished back = cvagent(host, {"rollback", "1"});
+    EXPECT_EQ(stages(host), "1 is kept");
+    EXPECT_THAT(run({"/root/sudo"}, "203.0.113.8"), HasSubstr("cvagent confirm 2"));
+    const Finished back = cvagent(host, {"rollback", "2"});
     EXPECT_EQ(back.status, 0) << back.err;
 }
 

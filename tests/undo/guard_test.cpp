@@ -16,6 +16,7 @@
 #include "agent/undo/boot_clock.h"
 #include "agent/undo/making.h"
 #include "agent/undo/taking_back.h"
+#include "tests/support/amounts.h"
 #include "tests/support/fake_host.h"
 #include "tests/support/waiting.h"
 #include "tests/undo/killed_at.h"
@@ -32,16 +33,14 @@ using cvagent::undo::Journal;
 using cvagent::undo::kChangesPlace;
 using cvagent::undo::MakingSettings;
 using cvagent::undo::Stage;
+using testing::AllOf;
 using testing::HasSubstr;
 using testing::IsEmpty;
 
 constexpr std::uint64_t kLong = 600'000;
 
-/// Before the fake host takes the environment away.
-const int kKills = [] {
-    const char* wanted = getenv("CORVISTA_UNDO_KILLS");
-    return wanted != nullptr ? std::atoi(wanted) : 100;
-}();
+const auto kKills = numberFrom("CORVISTA_UNDO_KILLS", 100);
+const auto kSeed = seedOfRun();
 
 /// Runs it in a process of its own. @return the status of waitpid
 template <class Body>
@@ -303,8 +302,9 @@ HOST_TEST_F(Guard, PutsFilesBackAfterTheNextStart) {
 /// Maker and guard are two programs here, and each is killed when it happens. CORVISTA_UNDO_KILLS says how
 /// often.
 HOST_TEST_F(Guard, LeavesNothingHalfWhoeverIsKilled) {
-    std::mt19937 random(std::random_device{}());
-    for (int i = 0; i < kKills; ++i) {
+    SCOPED_TRACE("CORVISTA_SEED=" + std::to_string(kSeed));
+    std::mt19937 random(kSeed);
+    for (unsigned long i = 0; i < kKills; ++i) {
         const pid_t maker = fork();
         if (maker == 0) {
             make(host, settings());
@@ -609,9 +609,7 @@ HOST_TEST_F(Guard, RefusesAChangeThatHasNoRoom) {
     std::ofstream(std::string(kChangesPlace) + "/ballast") << std::string(300'000, 'x') << std::flush;
     EXPECT_THROW(make(host, settings()), ChangeError);
     EXPECT_EQ(look(host), old_);
-    for (const std::string& name : host.listDirectory(std::string(kChangesPlace) + "/1")) {
-        EXPECT_THAT(name, testing::EndsWith(".lock"));
-    }
+    EXPECT_THAT(cvagent::undo::changesIn(kChangesPlace), IsEmpty()) << "the place of an older one";
 }
 
 HOST_TEST_F(Guard, CountsNoFurtherThanPeopleCanName) {
@@ -638,11 +636,64 @@ HOST_TEST_F(Guard, ForgetsOldChanges) {
     for (int i = 0; i < 60; ++i) {
         ChangeInMaking making(settings(0));
         making.beginStep();
+        host.file("/etc/one", std::to_string(i));
         making.end();
     }
     const auto numbers = cvagent::undo::changesIn(kChangesPlace);
     EXPECT_EQ(numbers.size(), 51U);
     EXPECT_EQ(numbers.back(), 60U);
+}
+
+/// A host with very many routes has much to save each time.
+HOST_TEST_F(Guard, ForgetsOldChangesThatTakeMuchRoom) {
+    for (int i = 0; i < 4; ++i) {
+        ChangeInMaking making(settings(0));
+        making.beginStep();
+        host.file("/etc/one", std::to_string(i));
+        making.end();
+        const std::string saved = std::string(kChangesPlace) + "/" + std::to_string(i + 1) + "/before";
+        ASSERT_EQ(truncate(saved.c_str(), off_t{30} << 20U), 0);
+    }
+    const ChangeInMaking next(settings(0));
+    EXPECT_THAT(cvagent::undo::changesIn(kChangesPlace), testing::ElementsAre(3, 4, 5)) << "60 MiB";
+}
+
+HOST_TEST_F(Guard, ForgetsAChangeThatHasLeftEverythingAsItWas) {
+    const auto after = [&host](const std::function<void()>& change) {
+        ChangeInMaking making(settings(0));
+        making.beginStep();
+        change();
+        EXPECT_EQ(making.end().stage, Stage::kept);
+        return cvagent::undo::changesIn(kChangesPlace).size();
+    };
+    EXPECT_EQ(after([] {}), 0U);
+    EXPECT_EQ(after([&host] { host.file("/etc/one", "old one\n", 0640); }), 0U) << "written again";
+    EXPECT_EQ(after([&host] { host.file("/etc/one", "old one\n", 0600); }), 1U);
+    EXPECT_EQ(after([&host] { host.setHostName("new"); }), 2U);
+    EXPECT_EQ(after([&host] { ip(host, "link set sw0 mtu 1400"); }), 3U);
+    EXPECT_EQ(after([&host] { ip(host, "address add 198.51.100.7/24 dev eth0"); }), 4U);
+    EXPECT_EQ(after([&host] { ip(host, "route replace default via 198.51.100.1"); }), 5U);
+}
+
+/// What others do to it meanwhile is none of its business, whether it comes to its end or not.
+HOST_TEST_F(Guard, LeavesTheNetworkOfAChangeThatDoesNotTouchIt) {
+    MakingSettings files = settings(0);
+    files.hasNetwork = false;
+    for (const bool isWhole : {true, false}) {
+        {
+            ChangeInMaking making(files);
+            making.beginStep();
+            host.file("/etc/one", "new one\n");
+            ip(host, "address add 198.51.100.7/24 dev eth0");
+            if (isWhole) {
+                making.end();
+            }
+        }
+        EXPECT_THAT(cvagent::undo::rollBack(kChangesPlace, *newest()).notes, IsEmpty());
+        EXPECT_EQ(host.read("/etc/one"), "old one\n");
+        EXPECT_THAT(look(host), AllOf(HasSubstr("192.0.2.10/24"), HasSubstr("198.51.100.7/24")));
+        ip(host, "address del 198.51.100.7/24 dev eth0");
+    }
 }
 
 // The program itself.

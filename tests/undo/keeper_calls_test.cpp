@@ -3,15 +3,19 @@
 
 #include <fcntl.h>
 #include <gmock/gmock.h>
+#include <net/if.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <csignal>
 #include <fstream>
+#include <thread>
 
 #include "agent/undo/making.h"
+#include "agent/undo/networkd_links.h"
 #include "agent/undo/taking_back.h"
 #include "tests/support/fake_host.h"
+#include "tests/undo/killed_at.h"
 
 namespace {
 
@@ -21,6 +25,7 @@ using cvagent::undo::Journal;
 using cvagent::undo::kChangesPlace;
 using cvagent::undo::KeeperCalls;
 using cvagent::undo::MakingSettings;
+using cvagent::undo::NetworkdLinks;
 using cvagent::undo::runCalls;
 using cvagent::undo::savedStateFrom;
 using cvagent::undo::takeBackAfterStart;
@@ -157,6 +162,81 @@ HOST_TEST_F(KeeperIsTold, ByWhatGetsNothingOfThisProcess) {
     struct stat found {};
     ASSERT_EQ(stat("/etc/seen", &found), 0);
     EXPECT_EQ(found.st_mode & 0777U, 0644U);
+}
+
+/// It sets links up after it has answered; what has been put back by then would be lost.
+HOST_TEST_F(KeeperIsTold, AndWhatItDoesThenIsWaitedFor) {
+    host.file("/run/systemd/netif/links/2", "ADMIN_STATE=configuring\n");  // one that waits for a lease
+    host.file("/run/systemd/netif/links/3", "ADMIN_STATE=configured\n");
+    for (const char* tool : {"sleep", "mv"}) {
+        host.realTool(tool);
+    }
+    host.tool(
+        "/usr/bin/networkctl reload",
+        {"", 0, "", 0,
+         "PATH=/tools:/usr/bin:/bin\n"
+         "say() { sleep 0.2; echo ADMIN_STATE=$1 > /run/new; mv /run/new /run/systemd/netif/links/3; }\n"
+         "(say initialized; say configuring; echo > /set-up; say configured) >/dev/null 2>&1 &"});
+    std::vector<std::string> notes;
+    runCalls({"networkctl reload"}, notes);
+    EXPECT_THAT(notes, IsEmpty());
+    EXPECT_TRUE(host.exists("/set-up"));
+    EXPECT_EQ(host.read("/run/systemd/netif/links/3"), "ADMIN_STATE=configured\n");
+}
+
+/// What systemd-networkd has noted of two links; the first waits for a lease, for ever.
+class NetworkdSetsUp : public HostFixture {
+protected:
+    void setUpHost(FakeHost& host) override {
+        host.realTool("ip");
+        host.useKernelNetwork();
+        ASSERT_EQ(host.run({"ip", "link", "set", "lo", "up"}).status, 0);
+        says(host, "ADMIN_STATE=configured\n");
+        host.file(kLinks + std::string("2222"), "ADMIN_STATE=configuring\nNETWORK_FILE=/etc/dhcp.network\n");
+        host.file("/etc/dhcp.network", "[Network]\nDHCP=yes\n");
+    }
+    static void says(FakeHost& host, const std::string& text) {
+        host.remove(kLinks + index());
+        host.file(kLinks + index(), text);
+    }
+    static std::string index() { return std::to_string(if_nametoindex("lo")); }
+    static constexpr const char* kLinks = "/run/systemd/netif/links/";
+};
+
+/// Without a carrier it is never ready, and without a router's word it does not say that it is.
+HOST_TEST_F(NetworkdSetsUp, WhatItCan) {
+    const std::string atWork = "ADMIN_STATE=configuring\nNETWORK_FILE=/etc/lo.network\n";
+    ASSERT_EQ(host.run({"ip", "address", "add", "192.0.2.10/24", "dev", "lo"}).status, 0);
+    ASSERT_EQ(host.run({"ip", "route", "add", "default", "via", "192.0.2.1", "dev", "lo"}).status, 0);
+    host.file("/etc/lo.network",
+              "[Match]\nName=lo\n[Network]\nAddress=\nAddress = 192.0.2.10/24 \nAddress=0.0.0.0/24\n"
+              "Gateway=192.0.2.1\nGateway=_ipv6ra\n");
+    for (const std::string& text :
+         {std::string("ADMIN_STATE=configured\n"), "OPER_STATE=no-carrier\n" + atWork, atWork}) {
+        const NetworkdLinks before;
+        says(host, text);
+        EXPECT_TRUE(before.waitUntilSetUp()) << text;
+    }
+    says(host, "OPER_STATE=no-carrier\n" + atWork);
+    EXPECT_TRUE(NetworkdLinks(if_nametoindex("lo")).waitUntilSetUp());
+    host.remove("/run/systemd");
+    EXPECT_TRUE(NetworkdLinks().waitUntilSetUp());
+}
+
+HOST_TEST_F(NetworkdSetsUp, NothingThatIsNotInTheKernelYet) {
+    const std::jthread clock([](const std::stop_token& over) {
+        while (!over.stop_requested()) {
+            passTime(std::chrono::seconds(1));
+            usleep(1000);
+        }
+    });
+    for (const char* file :
+         {"Address=192.0.2.10/24\n", "Address=127.0.0.1/24\n", "Gateway=192.0.2.1\n", "DHCP=ipv4\n", ""}) {
+        host.file("/etc/lo.network", file);
+        const NetworkdLinks before;
+        says(host, "ADMIN_STATE=configuring\nNETWORK_FILE=/etc/lo.network\n");
+        EXPECT_FALSE(before.waitUntilSetUp()) << file;
+    }
 }
 
 HOST_TEST_F(KeeperIsTold, AsWasSaved) {

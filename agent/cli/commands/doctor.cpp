@@ -107,31 +107,61 @@ std::string pluginLines(const json::PluginReport& report, const Style& style) {
     return text + "\n";
 }
 
+constexpr const char* kNobody = "nobody: what is changed holds until restart";
+
 std::string keeperOf(const keep::Keeper& keeper, const Style& style) {
     if (keeper.claims.empty() && keeper.unknown.empty()) {
-        return "nobody: what is changed holds until restart";
+        return kNobody;
     }
     const std::string system = keeper.system();
     return system.empty() ? style.bad(keeper.claims.size() > 1 ? "more than one" : "not known")
                           : style.good(system);
 }
 
-std::string keeperLines(const std::vector<keep::Keeper>& keepers, const Style& style) {
-    std::string text = style.strong("KEPT OVER A RESTART BY") + "\n";
+/// A line of the table, and what it is told by.
+struct KeeperRow {
+    std::string name;
+    std::string keeper;
+    std::vector<std::string> evidence;
+};
+
+KeeperRow rowOf(const keep::Keeper& keeper, const Style& style) {
+    KeeperRow row{printable(keeper.interface), keeperOf(keeper, style), {}};
+    for (const keep::Claim& claim : keeper.claims) {
+        row.evidence.push_back(printable(claim.evidence));
+    }
+    for (const std::string& why : keeper.unknown) {
+        row.evidence.push_back(style.bad(printable(why)));
+    }
+    return row;
+}
+
+KeeperRow rowOf(const keep::HostKeeper& keeper, const Style& style) {
+    return {keeper.setting,
+            keeper.keeper.empty() ? kNobody : style.good(keeper.keeper),
+            {printable(keeper.evidence)}};
+}
+
+std::string keeperLines(const json::KeeperReport& report, const Style& style) {
+    std::vector<KeeperRow> rows;
+    for (const keep::Keeper& each : report.interfaces) {
+        rows.push_back(rowOf(each, style));
+    }
+    for (const keep::HostKeeper& each : report.host) {
+        rows.push_back(rowOf(each, style));
+    }
     std::size_t width = 0;
-    for (const keep::Keeper& keeper : keepers) {
-        width = std::max(width, printable(keeper.interface).size());
+    for (const KeeperRow& row : rows) {
+        width = std::max(width, row.name.size());
     }
-    for (const keep::Keeper& keeper : keepers) {
-        text += "  " + padded(printable(keeper.interface), width + 2) + keeperOf(keeper, style) + "\n";
-        for (const keep::Claim& claim : keeper.claims) {
-            text += "    " + printable(claim.evidence) + "\n";
-        }
-        for (const std::string& why : keeper.unknown) {
-            text += "    " + style.bad(printable(why)) + "\n";
+    std::string text = style.strong("KEPT OVER A RESTART BY") + "\n";
+    for (const KeeperRow& row : rows) {
+        text += "  " + padded(row.name, width + 2) + row.keeper + "\n";
+        for (const std::string& each : row.evidence) {
+            text += "    " + each + "\n";
         }
     }
-    return keepers.empty() ? "" : text + "\n";
+    return text + "\n";
 }
 
 const char* consentText(const std::string& consent) {
@@ -156,7 +186,7 @@ ExitStatus doctor(const Options& options, const remote::ServiceReport& service) 
     const std::vector<ToolReport> reports =
         inspectHostTools(options.hostTools, Look::everything, adapterDirectory());
     const json::PluginReport plugins = findPlugins(options);
-    const std::vector<keep::Keeper> keepers = keep::keepers();
+    const json::KeeperReport keepers{keep::keepers(), keep::hostKeepers()};
     print(options.json ? json::doctor(service, plugins, reports, keepers)
                        : serviceLines(service, style) + pluginLines(plugins, style) +
                              keeperLines(keepers, style) + table(reports, style));

@@ -49,9 +49,8 @@ ExitStatus verdict(const IC::MutableNode& node, const std::vector<Reading>& read
 }  // namespace
 
 ExitStatus get(Session& session, const Options& options) {
-    const NodeRef node = session.find(options.node);
     const Request request = ownRequest();
-    const std::vector<Reading> readings = session.read(node, options.properties, request);
+    const auto [node, readings] = session.findAndRead(options.node, options.properties, request);
     session.tellMissingTools(readings);
     print(options.json ? json::node(*node, readings) : listing(*node, readings, Style::detect()));
     session.showErrors(request);

@@ -1,5 +1,6 @@
 #include <algorithm>
 
+#include "agent/change/revocable.h"
 #include "agent/cli/applied_here.h"
 #include "agent/cli/caller.h"
 #include "agent/cli/changes.h"
@@ -94,7 +95,10 @@ ExitStatus setHere(Session& session, const std::vector<MeantChange>& changes, co
     const MeantChange& change = changes.front();
     refuseUnlessForced(changes, options.force);
     const Request request(callerName());
-    const WriteResult result = session.write(change.node, *change.row, change.words, request);
+    change::RevocableSettings settings;
+    settings.caller = callerName();
+    settings.tell = complain;
+    const WriteResult result = change::writeRevocably(session, change, request, settings);
     session.showErrors(request);
     tell(session, change, result, options.json);
     const bool isSo = !options.verifySeconds || isKept(session, changes, *options.verifySeconds, request);

@@ -50,7 +50,7 @@ int millisecondsTo(std::chrono::steady_clock::time_point end) {
 /// take a name.
 Client::Client(const std::string& address, int stop, Question first)
     : connection_(opened(address)), stop_(stop), first_(std::move(first)) {
-    const bus::Message named = askBus("GetNameOwner", service::kBusName);
+    const bus::Message named = askBus("GetNameOwner", service::kBusName, [this] { askFirst(); });
     if (named.isError()) {
         throw NoService("no service is there", true);
     }
@@ -60,7 +60,7 @@ Client::Client(const std::string& address, int stop, Question first)
 
 void Client::checkUser() {
     std::uint32_t user = 0;
-    const bus::Message owned = askBus("GetConnectionUnixUser", owner_, [this] { askFirst(); });
+    const bus::Message owned = askBus("GetConnectionUnixUser", owner_);
     if (owned.isError()) {
         throw NoService("the service ended", true);
     }
@@ -89,7 +89,8 @@ bus::Message Client::askBus(const char* member, const std::string& name,
 }
 
 bus::Message Client::call(const std::string& member) const {
-    return connection_.newCall({owner_, service::kRootObject, service::kAgentInterface, member});
+    const std::string whose = owner_.empty() ? service::kBusName : owner_;
+    return connection_.newCall({whose, service::kRootObject, service::kAgentInterface, member});
 }
 
 void Client::wait(Clock::time_point deadline) {
@@ -113,15 +114,21 @@ bus::Message Client::callOf(const Question& question) const {
     if (question.word) {
         bus::Writer(made).put(*question.word);
     }
+    if (question.words) {
+        bus::Writer(made).put(*question.words);
+    }
     return made;
 }
 
+/// Of whoever has the name: his answer counts when the bus says that it is the service's.
 void Client::askFirst() {
     if (first_.member.empty()) {
         return;
     }
-    waitsForFirst_ = connection_.askLater(callOf(first_), 3 * kShort,
-                                          [this](const bus::Message& come) { firstAnswer_ = come; });
+    bus::Message call = callOf(first_);
+    call.startNobody();
+    waitsForFirst_ =
+        connection_.askLater(call, kRead + kShort, [this](const bus::Message& come) { firstAnswer_ = come; });
 }
 
 bool Client::waitFor(const bus::Message& answer, Seconds longest) {
@@ -155,16 +162,41 @@ void Client::checkAnswer(const bus::Message& answer) {
     }
 }
 
-bus::Message Client::ask(const Question& question) {
-    if (first_ != question) {
-        return ask(callOf(question), kShort);
-    }
+/// The service itself answers a ping, however long the host takes. Another one who had the name for a moment
+/// was asked in the place of one that came or went.
+bus::Message Client::takeFirst(Seconds longest) {
     first_ = {};
-    if (!waitFor(firstAnswer_, kShort)) {
-        failHanging("service", kShort);
+    if (!waitFor(firstAnswer_, std::min(longest, Seconds(kPing)))) {
+        const bus::Message ping = connection_.newCall({owner_, service::kRootObject, kPeer, "Ping"});
+        if (!answerTo(ping, kShort - kPing)) {
+            failHanging("service", kShort);
+        }
+        if (!waitFor(firstAnswer_, longest - std::min(longest, Seconds(kPing)))) {
+            failHanging("service", longest);
+        }
     }
-    checkAnswer(firstAnswer_);
+    const std::string sender = firstAnswer_.sender();
+    if (sender != owner_ && (sender != kBusDriver || !firstAnswer_.isError())) {
+        throw ServiceGone("the service has ended before it answered");
+    }
     return std::move(firstAnswer_);
+}
+
+bus::Message Client::answerTo(const Question& question, Seconds longest) {
+    if (first_ == question) {
+        return takeFirst(longest);
+    }
+    bus::Message answer = answerTo(callOf(question), longest);
+    if (!answer) {
+        failHanging("service", longest);
+    }
+    return answer;
+}
+
+bus::Message Client::ask(const Question& question) {
+    bus::Message answer = answerTo(question, kShort);
+    checkAnswer(answer);
+    return answer;
 }
 
 bus::Message Client::ask(const bus::Message& call, Seconds longest) {

@@ -6,6 +6,7 @@
 #include <optional>
 #include <stdexcept>
 #include <string>
+#include <vector>
 
 #include "agent/bus/connection.h"
 #include "agent/bus/reader.h"
@@ -27,6 +28,14 @@ private:
     bool silent_;
 };
 
+/// A call of the agent's interface with what it takes of these.
+struct Question {
+    std::string member;  ///< "" for no question
+    std::optional<std::string> word = {};
+    std::optional<std::vector<std::string>> words = {};
+    bool operator==(const Question&) const = default;
+};
+
 /// A connection to the one process that had the service's name on the bus when it was made, and to no other:
 /// whoever takes the name later is another service. One thread.
 class Client {
@@ -38,18 +47,11 @@ public:
     /// What the service gives a read, and some more.
     static constexpr Seconds kRead{30};
 
-    /// A call of the agent's interface with one text, or none.
-    struct Question {
-        std::string member;  ///< "" for no question
-        std::optional<std::string> word;
-        bool operator==(const Question&) const = default;
-    };
-
     /// Throws NoService, or Failure when the bus does not answer.
     /// @param address "system" or a bus's own
     /// @param stop    a descriptor that ends all waiting when it can be read; -1 for none
-    /// @param first   what will be asked first. It goes out while the bus is still asked whose the service
-    ///                is; of one that is not believed nobody sees the answer
+    /// @param first   what will be asked first. It goes out while the bus is still asked who the service is;
+    ///                of one that is not believed nobody sees the answer
     explicit Client(const std::string& address, int stop = -1, Question first = {});
     /// Thrown by all that waits.
     struct Stopped {};
@@ -62,7 +64,10 @@ public:
 
     /// A call of the agent's interface.
     bus::Message call(const std::string& member) const;
-    /// The same for a question, whose answer may have come already.
+    /// The answer to a question, which may have come already, be it an error. Throws Failure when none comes
+    /// in that time or the service is at a stand, ServiceGone when it has ended.
+    bus::Message answerTo(const Question& question, Seconds longest);
+    /// The same, checked as below.
     bus::Message ask(const Question& question);
     /// The answer to a call. Throws what an error in place of one stands for: Problem of the service's own,
     /// Failure, ServiceGone.
@@ -105,6 +110,7 @@ private:
     bus::Message answerTo(const bus::Message& call, Seconds longest,
                           const std::function<void()>& behind = nullptr);
     bool waitFor(const bus::Message& answer, Seconds longest);
+    bus::Message takeFirst(Seconds longest);
 
     bus::Connection connection_;
     int stop_;

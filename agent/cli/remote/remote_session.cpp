@@ -2,6 +2,7 @@
 
 #include <algorithm>
 
+#include "agent/bus/text.h"
 #include "agent/bus/writer.h"
 #include "agent/cli/print.h"
 #include "agent/cli/remote/answer_errors.h"
@@ -26,7 +27,18 @@ WriteResult::Outcome outcomeOf(const std::string& verdict) {
                                   : WriteResult::notKnown;
 }
 
+constexpr const char* kBoth = "FindAndRead";
+
 }  // namespace
+
+Question questionOf(const std::string& node, const std::vector<std::string>& properties) {
+    constexpr std::size_t kMostTogether = 4096;
+    std::size_t size = 0;
+    for (const std::string& property : properties) {
+        size += bus::isText(property) ? 1 + property.size() : kMostTogether;
+    }
+    return size < kMostTogether ? Question{kBoth, node, properties} : Question{"Find", node};
+}
 
 /// A class that the program does not know is one of a plug-in that brings its own names.
 void RemoteSession::learnClasses(const std::vector<NodeCopy>& nodes) {
@@ -47,7 +59,7 @@ void RemoteSession::learnClasses(const std::vector<NodeCopy>& nodes) {
 Session::Tree RemoteSession::tree(const Request& /*request*/) {
     std::vector<NodeCopy> nodes;
     Tree whole;
-    const bus::Message answer = client_->ask({"Tree", std::nullopt});
+    const bus::Message answer = client_->ask({"Tree"});
     client_->read(answer, [&](bus::Reader& reader) {
         whole.plugins = reader.texts();
         reader.array("(uuuuosssua(uyvtus))", [&] {
@@ -76,6 +88,30 @@ NodeRef RemoteSession::find(const std::string& word) {
     });
     learnClasses({node});
     return node.reference();
+}
+
+Session::NodeReadings RemoteSession::findAndRead(const std::string& word,
+                                                 const std::vector<std::string>& properties,
+                                                 const Request& request) {
+    const Question both = questionOf(word, properties);
+    if (both.member != kBoth) {
+        return Session::findAndRead(word, properties, request);
+    }
+    const bus::Message answer = client_->answerTo(both, Client::kRead);
+    if (answer.isError() && answer.error().name() == bus::kUnknownMethod) {  // an older service
+        return Session::findAndRead(word, properties, request);
+    }
+    client_->checkAnswer(answer);
+    NodeCopy node;
+    std::vector<Reading> readings;
+    client_->read(answer, [&](bus::Reader& reader) {
+        reader.structure(kNodeContents, [&] { node = takeNode(reader); });
+        readings = takeReadings(reader);
+        takeErrors(reader, request);
+    });
+    learnClasses({node});
+    findRows(readings, node.type);
+    return {node.reference(), std::move(readings)};
 }
 
 std::vector<Reading> RemoteSession::read(const NodeRef& node, const std::vector<std::string>& properties,

@@ -11,6 +11,10 @@
 
 namespace cvagent::remote {
 
+/// What is asked for a node and what it says of itself. The bus takes no text that is no UTF-8 as it is, and
+/// the service no more than so much at once: the node is asked for by itself then.
+Question questionOf(const std::string& node, const std::vector<std::string>& properties);
+
 /// The service's agent. No plug-in is loaded into this process, and of their catalogues only those are read
 /// that an answer needs.
 class RemoteSession : public Session {
@@ -21,6 +25,8 @@ public:
         : client_(std::move(client)), address_(std::move(address)), asksPerson_(asksPerson) {}
 
     Tree tree(const Request& request) override;
+    NodeReadings findAndRead(const std::string& word, const std::vector<std::string>& properties,
+                             const Request& request) override;
     NodeRef find(const std::string& word) override;
     std::vector<Reading> read(const NodeRef& node, const std::vector<std::string>& properties,
                               const Request& request) override;

@@ -58,14 +58,14 @@ struct Reached {
 };
 
 /// What a command begins with.
-Client::Question firstQuestion(const Options& options) {
-    const bool ofNode = options.command == Command::get || options.command == Command::set;
-    return options.command == Command::tree ? Client::Question{"Tree", std::nullopt}
-           : ofNode                         ? Client::Question{"Find", options.node}
-                                            : Client::Question();
+Question firstQuestion(const Options& options) {
+    return options.command == Command::tree  ? Question{"Tree"}
+           : options.command == Command::get ? questionOf(options.node, options.properties)
+           : options.command == Command::set ? Question{"Find", options.node}
+                                             : Question();
 }
 
-Reached reach(const Options& options, const Client::Question& first = {}) {
+Reached reach(const Options& options, const Question& first = {}) {
     Reached reached;
     bool silent = !options.bus;
     for (const std::string& address : addressesOf(options)) {
