@@ -12,6 +12,7 @@
 #include "agent/change/kept.h"
 #include "agent/change/kept_host.h"
 #include "agent/change/kernel_network.h"
+#include "agent/change/settled.h"
 
 namespace cvagent::change {
 
@@ -159,15 +160,9 @@ private:
                 }));
     }
 
-    /// What a DHCP client has laid goes with its lease when the interface becomes static for good; but the
-    /// default route only where another one has taken its place.
     bool isOfLease(const KernelRoute& route) const {
         const bool isLeased = scene_.isKept && old_ != nullptr && !old_->isPermanent;
-        const KernelNetwork now = KernelNetwork::read();
-        return isLeased && route.protocol == RTPROT_DHCP && route.link == scene_.link.index &&
-               (!route.isDefault() || std::ranges::any_of(now.routes, [&route](const KernelRoute& each) {
-                   return each.isDefault() && each.link == route.link && each.gateway == route.gateway;
-               }));
+        return isLeased && route.link == scene_.link.index && goesWithLease(route, KernelNetwork::read());
     }
 
     void putBackRoutes() {

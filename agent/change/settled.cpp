@@ -109,4 +109,11 @@ void goWithLease(const keep::Way& way, const keep::Link& link) {
     lease.wait();
 }
 
+bool goesWithLease(const KernelRoute& route, const KernelNetwork& now) {
+    return route.protocol == RTPROT_DHCP &&
+           (!route.isDefault() || std::ranges::any_of(now.routes, [&route](const KernelRoute& each) {
+               return each.isDefault() && each.link == route.link && each.gateway == route.gateway;
+           }));
+}
+
 }  // namespace cvagent::change

@@ -23,4 +23,8 @@ Settled settled(const keep::Link& link, const keep::Wish& wish, const KernelNetw
 /// Goes the way, with what NetworkManager needs for a lease.
 void goWithLease(const keep::Way& way, const keep::Link& link);
 
+/// Whether a route goes with a lease when the interface becomes static for good: a DHCP client has laid it;
+/// the default route only where another one has taken its place.
+bool goesWithLease(const KernelRoute& route, const KernelNetwork& now);
+
 }  // namespace cvagent::change
