@@ -1,7 +1,6 @@
 #include "agent/keep/yaml_file.h"
 
 #include <algorithm>
-#include <ranges>
 #include <string_view>
 
 #include "agent/core/text.h"
@@ -141,7 +140,10 @@ void YamlFile::eraseItem(const Span& list, const Word& word) {
     while (at(item.end - 1).text.empty()) {  // a comment is the next one's
         --item.end;
     }
-    const auto items = std::ranges::count_if(std::views::iota(list.first + 1, list.end), isItem);
+    unsigned items = 0;
+    for (std::size_t line = list.first + 1; line < list.end; ++line) {
+        items += isItem(line) ? 1U : 0U;
+    }
     if (item.first == list.first) {
         refuse(word.line);
     }
