@@ -13,6 +13,7 @@
 #include "agent/change/kept_host.h"
 #include "agent/change/kernel_network.h"
 #include "agent/change/settled.h"
+#include "agent/change/untouched.h"
 
 namespace cvagent::change {
 
@@ -23,7 +24,7 @@ struct Scene {
     KernelNetwork before;
     KernelLink link;
     std::string value;  ///< that is written
-    bool isKept;        ///< by the system that keeps the interface, whatever the plug-in's file has
+    bool isKept;  ///< by the system that keeps the interface, or by nobody: no file of the plug-in's counts
     Neighbours neighbours = Neighbours::awaited;
 
     bool isWritten(const std::string& inFile) const { return isKept || inFile == value; }
@@ -280,40 +281,12 @@ std::vector<KernelRoute> defaultRoutes(const KernelNetwork& network) {
     return found;
 }
 
-/// What is gone though a gateway has nothing to do with it: the system that keeps the interface has set it up
-/// anew. Leases and what the kernel makes by itself come again.
-void putBackOthers(const Scene& scene, EffectInForce& effect) {
-    const auto noteIf = [&effect](int problem, const std::string& what) {
-        if (problem != 0) {
-            effect.notes.push_back(what + " is gone: " + reason(problem));
-        }
-    };
-    const KernelNetwork now = KernelNetwork::read();
-    for (const KernelAddress& each : scene.before.addresses) {
-        const bool isOurs = each.link == scene.link.index && each.isGlobal && each.isPermanent;
-        if (isOurs && now.find(each.link, each.ip, each.prefix) == nullptr) {
-            noteIf(addAgain(each), "the address " + each.ip.text());
-        }
-    }
-    for (const KernelRoute& each : scene.before.routes) {
-        const bool isMade = each.protocol == RTPROT_KERNEL || each.protocol == RTPROT_RA;
-        const bool isOurs = each.link == scene.link.index && each.table != RT_TABLE_LOCAL && !isMade;
-        if (isOurs && !each.isDefault() && !now.has(each)) {
-            noteIf(addAgain(each, std::nullopt), "the route " + textOf(each, scene.before));
-        }
-    }
-}
-
-EffectInForce ipv6Gateway(const Scene& scene) {
-    EffectInForce effect;
-    if (scene.isKept) {
-        putBackOthers(scene, effect);
-    }
-    return effect;
+/// The plug-in itself brings it there.
+EffectInForce ipv6Gateway(const Scene& /*scene*/) {
+    return {};
 }
 
 EffectInForce ipv4Gateway(const Scene& scene) {
-    EffectInForce effect = ipv6Gateway(scene);
     const auto gateway = Ip::parse(scene.value);
     const KernelNetwork now = KernelNetwork::read();
     const std::vector<KernelRoute> routes = defaultRoutes(now);
@@ -321,16 +294,16 @@ EffectInForce ipv4Gateway(const Scene& scene) {
         std::ranges::any_of(routes, [&gateway](const KernelRoute& each) { return each.gateway == gateway; });
     const bool isWritten = scene.isKept || isDefaultInRoutesFile(scene.value);
     if (!gateway || isThere || !isWritten) {
-        return effect;
+        return {};
     }
     const KernelAddress* way = wayTo(now, *gateway, scene.link.index);
     if (way == nullptr) {
-        effect.lacking = "no interface has a subnet with this gateway, so the running host has not got it";
-        return effect;
+        return {"no interface has a subnet with this gateway, so the running host has not got it", {}};
     }
     const auto own = std::ranges::find(routes, way->link, &KernelRoute::link);
     const auto replaced = own != routes.end() ? own : routes.begin();
     const unsigned metric = replaced != routes.end() ? replaced->metric : 0;
+    EffectInForce effect;
     if (const int problem = setDefaultRoute(*gateway, way->link, metric); problem != 0) {
         effect.lacking = "the running host does not take the gateway: " + reason(problem);
     } else if (replaced != routes.end()) {
@@ -342,9 +315,14 @@ EffectInForce ipv4Gateway(const Scene& scene) {
 struct Effector {
     unsigned int property;
     EffectInForce (*act)(const Scene& scene);
+    Touched touched{};
 };
-constexpr Effector kEffectors[] = {{25, ipv4Address},  {26, subnetMask},   {27, ipv6Address},
-                                   {100, ipv4Gateway}, {101, ipv6Gateway}, {102, prefixLength}};
+constexpr Effector kEffectors[] = {{25, ipv4Address},
+                                   {26, subnetMask},
+                                   {27, ipv6Address, {true, false}},
+                                   {100, ipv4Gateway, {false, true}},
+                                   {101, ipv6Gateway, {true, true}},
+                                   {102, prefixLength, {true, false}}};
 
 /// @return given whether the value is kept; none for what is not about a link of the kernel's
 std::function<EffectInForce(bool)> throughNetlink(const IC::MutableNode& node, const Property& row,
@@ -359,10 +337,16 @@ std::function<EffectInForce(bool)> throughNetlink(const IC::MutableNode& node, c
         return nullptr;
     }
     scene.link = *link;
-    return [scene = std::move(scene), act = effector->act](bool isKept) {
+    return [scene = std::move(scene), effector](bool isKept) {
         Scene now = scene;
         now.isKept = isKept;
-        return act(now);
+        std::vector<std::string> notes;
+        if (isKept) {
+            putBackUntouched(now.before, now.link.index, effector->touched, notes);
+        }
+        EffectInForce effect = effector->act(now);
+        effect.notes.insert(effect.notes.begin(), notes.begin(), notes.end());
+        return effect;
     };
 }
 
@@ -384,8 +368,9 @@ BringIntoForce bringingIntoForce(Neighbours neighbours) {
         }
         return [keep = std::move(keep), act = std::move(act)] {
             const Kept kept = keep ? keep() : Kept();
-            EffectInForce effect = act ? act(kept.isKept) : EffectInForce();
+            EffectInForce effect = act ? act(kept.isKept || kept.isForNow) : EffectInForce();
             effect.isKept = kept.isKept;
+            effect.isForNow = kept.isForNow;
             effect.isInForce = kept.isInForce;
             if (!kept.note.empty()) {
                 effect.notes.push_back(kept.note);

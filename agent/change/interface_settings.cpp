@@ -48,9 +48,10 @@ InterfaceSettings settingsOf(const std::string& interface) {
     if (hardware.empty()) {
         return settings;
     }
-    std::istringstream lines(
-        contentOf("/etc/sysconfig/network/ifcfg-eth-id-" + hardware.substr(0, hardware.find('\n')))
-            .value_or(""));
+    const auto content =
+        contentOf("/etc/sysconfig/network/ifcfg-eth-id-" + hardware.substr(0, hardware.find('\n')));
+    settings.isThere = content.has_value();
+    std::istringstream lines(content.value_or(""));
     for (std::string line; std::getline(lines, line);) {
         const std::size_t equals = std::min(line.find('='), line.size());
         const auto* key = std::ranges::find(kKeys, line.substr(0, equals), &Key::name);

@@ -14,13 +14,14 @@ std::string interfaceNameOf(const std::string& path);
 
 /// What the interface's file has; "" for what is not in it.
 struct InterfaceSettings {
-    std::string origin;  ///< BOOTPROTO
+    bool isThere = false;  ///< the file
+    std::string origin;    ///< BOOTPROTO
     std::string ipv4Address;
     std::string mask;
     std::string ipv6Address;
     std::string prefixLength;
 };
-/// All empty where there is no such interface or no file of it.
+/// All empty where there is no such interface or no file of it that can be read.
 InterfaceSettings settingsOf(const std::string& interface);
 /// The IPv6 prefix length that a text tells; nothing for one that tells none.
 std::optional<unsigned> prefixLengthIn(const std::string& text);

@@ -116,13 +116,30 @@ Wish wishOfIpv6Gateway(const Written& written) {
     return wish;
 }
 
+// Whether the running host alone is to have it where nobody keeps the interface: what the agent brings there
+// itself, and no file of the plug-in's has.
+
+bool never(const Written& /*written*/) {
+    return false;
+}
+
+bool hasNoFile(const Written& written) {
+    return !written.file.isThere;
+}
+
+bool hasNoRoute(const Written& written) {
+    return !written.file.isThere && !isDefaultInRoutesFile(written.value);
+}
+
 struct KeptProperty {
     unsigned int property;
     Wish (*wish)(const Written& written);
+    bool (*isForNow)(const Written& written);
 };
-constexpr KeptProperty kKept[] = {{24, wishOfOrigin},       {25, wishOfAddress},  {26, wishOfMask},
-                                  {27, wishOfIpv6Address},  {100, wishOfGateway}, {101, wishOfIpv6Gateway},
-                                  {102, wishOfPrefixLength}};
+constexpr KeptProperty kKept[] = {{24, wishOfOrigin, never},           {25, wishOfAddress, hasNoFile},
+                                  {26, wishOfMask, hasNoFile},         {27, wishOfIpv6Address, hasNoFile},
+                                  {100, wishOfGateway, hasNoRoute},    {101, wishOfIpv6Gateway, never},
+                                  {102, wishOfPrefixLength, hasNoFile}};
 
 keep::AddressText runningOn(const KernelNetwork& network, unsigned link, bool isIpv6) {
     const KernelAddress* address = network.mainAddress(link, isIpv6);
@@ -160,10 +177,24 @@ std::string waitUntilInForce(const keep::Way& way, const keep::Link& link, const
            (now.note.empty() ? "" : "; " + now.note);
 }
 
-Kept keepWith(const keep::Link& link, const Wish& wish, bool isTried) {
+bool isNobody(const keep::Keeper& keeper) {
+    return keeper.claims.empty() && keeper.unknown.empty();
+}
+
+struct Terms {
+    bool isTried;   ///< nobody is reached, and waited for
+    bool isForNow;  ///< where nobody keeps the interface the running host alone is to have the value
+};
+/// What is done with what is to be kept.
+using Act = Kept (*)(const keep::Link& link, const Wish& wish, const Terms& terms);
+
+Kept keepWith(const keep::Link& link, const Wish& wish, const Terms& terms) {
     const keep::Keeper keeper = keep::keeperOf(link);
-    if (keeper.claims.empty() && keeper.unknown.empty()) {
-        return {};
+    if (isNobody(keeper)) {
+        return terms.isForNow
+                   ? Kept{false, "not kept over a restart: nobody is known who keeps '" + link.name + "'",
+                          false, true}
+                   : Kept();
     }
     try {
         const keep::Way way = keep::wayToKeep(link, keeper, wish);
@@ -172,18 +203,19 @@ Kept keepWith(const keep::Link& link, const Wish& wish, bool isTried) {
         const KernelNetwork before = KernelNetwork::read();
         const undo::NetworkdLinks links(link.index);
         goWithLease(way, link);
-        const bool isWaitedFor = !isTried && !way.isEmpty();
+        const bool isWaitedFor = !terms.isTried && !way.isEmpty();
         const std::string note = isWaitedFor ? waitUntilInForce(way, link, wish, before, links) : "";
-        return {true, "kept over a restart by " + way.system + placesOf(way) + note};
+        return {true, "kept over a restart by " + way.system + placesOf(way) + note, terms.isTried};
     } catch (const keep::CannotKeep& cannot) {
         return {false, "not kept over a restart: " + std::string(cannot.what())};
     }
 }
 
 /// Whether nothing would have to be changed for it.
-Kept keptAlready(const keep::Link& link, const Wish& wish, bool /*isTried*/) {
+Kept keptAlready(const keep::Link& link, const Wish& wish, const Terms& terms) {
     try {
-        return {keep::wayToKeep(link, keep::keeperOf(link), wish).isEmpty(), {}};
+        const keep::Keeper keeper = keep::keeperOf(link);
+        return {(isNobody(keeper) && terms.isForNow) || keep::wayToKeep(link, keeper, wish).isEmpty(), {}};
     } catch (const keep::CannotKeep&) {
         return {};
     }
@@ -236,12 +268,10 @@ undo::KeeperCalls keeperCallsFor(const std::vector<MeantChange>& changes) {
 
 namespace {
 
-using Act = Kept(const keep::Link& link, const Wish& wish, bool isTried);
-
 /// @return does something with what is to be kept of the value, unless the plug-in's file says otherwise by
 /// then; none for what is not about an interface of the kernel's
 std::function<Kept()> withWish(const IC::MutableNode& node, const Property& row,
-                               const IC::PropertyValue& value, Act* act, bool isTried) {
+                               const IC::PropertyValue& value, Act act, bool isTried) {
     const KeptProperty* kept = keptProperty(row);
     if (kept == nullptr) {
         return nullptr;
@@ -256,12 +286,11 @@ std::function<Kept()> withWish(const IC::MutableNode& node, const Property& row,
                    runningOn(network, link->index, false),
                    runningOn(network, link->index, true),
                    gatewayOn(network, link->index)};
-    return [link = keep::Link{link->name, link->index}, written = std::move(before), of = kept->wish, act,
-            isTried] {
+    return [link = keep::Link{link->name, link->index}, written = std::move(before), kept, act, isTried] {
         Written now = written;
         now.file = settingsOf(link.name);
-        const Wish wish = of(now);
-        return wish.isEmpty() ? Kept() : act(link, wish, isTried);
+        const Wish wish = kept->wish(now);
+        return wish.isEmpty() ? Kept() : act(link, wish, {isTried, kept->isForNow(now)});
     };
 }
 

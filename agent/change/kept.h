@@ -12,7 +12,8 @@ namespace cvagent::change {
 struct Kept {
     bool isKept = false;     ///< by a system of the host: the plug-in's files do not count
     std::string note{};      ///< where it is kept, or why it is not; "" where nobody is known who could
-    bool isInForce = false;  ///< that system has been found to use the value
+    bool isInForce = false;  ///< that system has been found to use the value, or cannot be reached for a try
+    bool isForNow = false;   ///< nobody keeps it: the running host alone is to have it, until its restart
 };
 
 /// Has the system that keeps an interface over a restart keep what is written of it. To be called before the
@@ -23,8 +24,8 @@ struct Kept {
 std::function<Kept()> keepingOverRestart(const IC::MutableNode& node, const Property& row,
                                          const IC::PropertyValue& value, bool isTried);
 
-/// Whether the system that keeps the interface has the value already. False where nobody is known who could,
-/// and where the interface has a file of the plug-in's that says otherwise.
+/// Whether the system that keeps the interface has the value already, or nobody is known who could keep what
+/// the running host has. False where the interface has a file of the plug-in's that says otherwise.
 bool isKeptAlready(const IC::MutableNode& node, const Property& row, const IC::PropertyValue& value);
 
 /// What that may write for these changes, and has to be told when it is taken back. Asks what runs.

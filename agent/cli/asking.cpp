@@ -7,7 +7,6 @@
 #include "agent/cli/print.h"
 #include "agent/cli/remote/service.h"
 #include "agent/core/signals.h"
-#include "agent/core/surroundings.h"
 
 namespace cvagent {
 
@@ -21,25 +20,20 @@ bool onlyReads(const Options& options) {
            options.command != Command::apply;
 }
 
-/// What a watch runs on alerts gets the surroundings that it has without a service.
-void prepareToAsk(Options& options) {
-    if (options.command == Command::watch) {
-        prepareSurroundings({&options.program});
-    }
-    if (!onlyReads(options)) {
-        StopSignals::install();
-    }
-}
-
 }  // namespace
 
-std::optional<ExitStatus> askService(Question ask, Options& options, bool silent) {
+std::optional<ExitStatus> askService(Question ask, Options& options, Preparation prepare) {
     std::string gone;
     for (int attempt = 0; attempt < kAttempts; ++attempt) {
         try {
-            if (const auto service = remote::openSession(options, silent || attempt > 0)) {
+            if (const auto service = remote::openSession(options, prepare == nullptr || attempt > 0)) {
                 options.byService = true;
-                prepareToAsk(options);
+                if (prepare != nullptr) {
+                    prepare(options);
+                }
+                if (!onlyReads(options)) {
+                    StopSignals::install();
+                }
                 return ask(*service, options);
             }
         } catch (const remote::ServiceGone& ended) {

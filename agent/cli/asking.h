@@ -11,10 +11,13 @@ namespace cvagent {
 /// A command that needs an agent.
 using Question = ExitStatus (*)(Session& session, const Options& options);
 
+/// What the process needs before it asks a service.
+using Preparation = void (*)(Options& options);
+
 /// Has the service answer. One that ends in the middle of an answer is mostly started again and is asked once
 /// more, where the command only reads: an agent of this process would be in its way.
-/// @param silent nothing is told of why there is none
+/// @param prepare null: nothing, and who asks leaves it to somebody else to tell why there is no service
 /// @return nothing: there is no service, or none any more
-std::optional<ExitStatus> askService(Question ask, Options& options, bool silent);
+std::optional<ExitStatus> askService(Question ask, Options& options, Preparation prepare);
 
 }  // namespace cvagent

@@ -28,6 +28,13 @@ constexpr std::array<cvagent::Question, 13> kQuestions = {
     cvagent::commands::watch,         cvagent::commands::plan, cvagent::commands::apply,
     cvagent::commands::exportChanges, cvagent::commands::diff};
 
+/// What a watch runs on alerts gets the surroundings that it has without a service.
+void prepareToAsk(Options& options) {
+    if (options.command == Command::watch) {
+        cvagent::prepareSurroundings({&options.program});
+    }
+}
+
 ExitStatus runWithoutAgent(const Options& options) {
     switch (options.command) {
         case Command::history:
@@ -54,7 +61,7 @@ ExitStatus run(Options& options, cvagent::WantMessages& wants) {
         options.changeText = cvagent::readChangeFile(options.changeFile);  // before the directory is left
     }
     if (ask != nullptr) {
-        if (const auto status = cvagent::askService(ask, options, false)) {
+        if (const auto status = cvagent::askService(ask, options, prepareToAsk)) {
             return *status;
         }
         const cvagent::PreparedProcess process(cvagent::processSettings(options));

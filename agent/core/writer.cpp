@@ -213,9 +213,9 @@ void Writer::lookAfter(const Job& job, const EffectInForce& effect, WriteResult&
     result.after = isAwaited ? askSettled(job) : facts_.ask(*job.node, job.row.id);
     result.outcome = effect.isInForce ? WriteResult::applied : compare(job.row, job.value, result.after);
     std::string lacking;
-    if (!effect.isKept) {
+    if (!effect.isKept && !effect.isForNow) {
         lacking = lackingEffect(*job.node, job.row, job.value, result.after);
-    } else if (result.outcome == WriteResult::differs) {
+    } else if (effect.isKept && result.outcome == WriteResult::differs) {
         lacking = "it is kept for the next start, but the host has another value now";
     }
     result.lacking = joined(lacking, effect.lacking);

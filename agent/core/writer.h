@@ -38,6 +38,7 @@ struct EffectInForce {
     std::string lacking;
     std::vector<std::string> notes;
     bool isKept = false;     ///< by a system of the host: the plug-in's files do not count
+    bool isForNow = false;   ///< nor do they here: nobody keeps it, and it holds until restart
     bool isInForce = false;  ///< that system has been found to use the value, whatever the plug-in reads
 };
 /// Brings into the running host what a plug-in only writes to files. Called before a write; what it gives is

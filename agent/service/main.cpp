@@ -31,15 +31,14 @@ ExitStatus runGuarded(cvagent::service::Options& options) {
 
 /// With a heap for each of its two dozen threads, what one of them has given back is of no use to the others,
 /// and the process grows for days.
-void shareHeaps() {
-    constexpr int kHeaps = 2;
-    mallopt(M_ARENA_MAX, kHeaps);
+void shareOneHeap() {
+    mallopt(M_ARENA_MAX, 1);
 }
 
 }  // namespace
 
 int main(int count, char** words) {
-    shareHeaps();
+    shareOneHeap();
     cvagent::openStandardDescriptors();
     cvagent::StopSignals::becomeWriteErrors();
     cvagent::service::findJournal();

@@ -163,23 +163,26 @@ void ChangeInMaking::beginStep() {
     }
 }
 
+/// What is there while somebody takes it back is not what the change has left.
 Journal ChangeInMaking::end() {
-    const SavedState left = before_.again();
-    if (window_ == 0 && left.isAs(before_)) {
-        directory_.remove();
-        Journal nothing;
-        nothing.stage = Stage::kept;
-        return nothing;
-    }
-    directory_.save("left", left);
-    return update([this](Journal& journal) {
+    bool isNothing = false;
+    const Journal ended = update([&](Journal& journal) {
         if (journal.stage != Stage::saved && journal.stage != Stage::changing) {
             return false;
         }
+        const SavedState left = before_.again();
+        isNothing = window_ == 0 && left.isAs(before_);
         journal.stage = window_ == 0 ? Stage::kept : Stage::made;
         journal.deadline = std::max(journal.deadline, bootMilliseconds() + window_);  // it may be lengthened
-        return true;
+        if (!isNothing) {
+            directory_.save("left", left);
+        }
+        return !isNothing;
     });
+    if (isNothing) {
+        directory_.remove();
+    }
+    return ended;
 }
 
 Journal ChangeInMaking::takeBack() {

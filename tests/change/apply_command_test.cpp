@@ -293,16 +293,32 @@ HOST_TEST_F(ChangesInForce, APlanTakesAnInterfaceDown) {
     EXPECT_THAT(plan.out, Not(HasSubstr("still up")));
 }
 
-HOST_TEST_F(ChangesInForce, APlanOfWhatCannotTakeFails) {
+/// No file of the plug-in's, and a system that keeps it in a way that leaves nothing to change.
+void leaveNothingToWriteTo(FakeHost& host) {
     host.run({"sh", "-c", "rm /etc/sysconfig/network/ifcfg-eth-id-*"});
+    host.file("/run/network/ifstate", "eth0=eth0\n");
+    host.file("/etc/network/interfaces", "iface eth0 inet manual\n");
+}
+
+HOST_TEST_F(ChangesInForce, APlanOfWhatCannotTakeFails) {
+    leaveNothingToWriteTo(host);
     const Finished plan = cvagent(host, {"plan", "ip-config:eth0", "IPv4Address", "192.0.2.77"});
     EXPECT_EQ(plan.status, 1);
     EXPECT_THAT(plan.out, HasSubstr("there is no file "));
 }
 
+HOST_TEST_F(ChangesInForce, APlanOfWhatNobodyKeepsShowsTheRunningHost) {
+    host.run({"sh", "-c", "rm /etc/sysconfig/network/ifcfg-eth-id-*"});
+    const Finished plan = cvagent(host, {"plan", "ip-config:eth0", "IPv4Address", "192.0.2.77"});
+    EXPECT_EQ(plan.status, 0) << plan.out;
+    EXPECT_THAT(plan.out, HasSubstr("FILES\n  as before\n"));
+    EXPECT_THAT(plan.out, HasSubstr("- address eth0 192.0.2.10/24\n"));
+    EXPECT_THAT(plan.out, HasSubstr("+ address eth0 192.0.2.77/24\n"));
+}
+
 /// None is made when one of them, tried out, does not come about.
 HOST_TEST_F(ChangesInForce, WhatCannotTakeKeepsAllOfThemBack) {
-    host.run({"sh", "-c", "rm /etc/sysconfig/network/ifcfg-eth-id-*"});
+    leaveNothingToWriteTo(host);
     host.file("/root/changes",
               R"([{"node": "ip-config:eth0", "property": "IPv4Address", "value": "192.0.2.77"},
                                    {"node": "computer", "property": "OwnerName", "value": "x"}])");

@@ -20,6 +20,7 @@ constexpr unsigned int kAddress = 25;
 constexpr unsigned int kMask = 26;
 constexpr unsigned int kIpv6Address = 27;
 constexpr unsigned int kGateway = 100;
+constexpr unsigned int kIpv6Gateway = 101;
 constexpr unsigned int kPrefixLength = 102;
 
 class InForce : public HostFixture {
@@ -185,6 +186,37 @@ HOST_TEST_F(InForce, NothingComesOfAFileThatWasNotWritten) {
     EXPECT_THAT(addresses(host), ElementsAre("192.0.2.10/24"));
     EXPECT_THAT(addresses(host, "-6"), IsEmpty());
     EXPECT_THAT(routes(host), IsEmpty());
+}
+
+/// The host has it until its restart, which is told; the plug-in's files are none of such a host's.
+HOST_TEST_F(InForce, WhereNobodyKeepsTheInterfaceTheRunningHostAloneHasIt) {
+    ip(host, "address add 192.0.2.10/24 dev eth0");
+    ip(host, "route add default via 192.0.2.1 metric 5");
+    const auto written = [](unsigned int property, const std::string& value) {
+        const EffectInForce effect = write(property, value, [] {});
+        EXPECT_EQ(effect.lacking, "") << property;
+        EXPECT_TRUE(effect.isForNow && !effect.isKept) << property;
+        ASSERT_FALSE(effect.notes.empty());
+        EXPECT_EQ(effect.notes.back(), "not kept over a restart: nobody is known who keeps 'eth0'");
+    };
+    written(kAddress, "192.0.2.20");
+    written(kMask, "255.255.255.128");
+    written(kGateway, "192.0.2.2");
+    EXPECT_THAT(addresses(host), ElementsAre("192.0.2.20/25"));
+    EXPECT_THAT(routes(host), ElementsAre("default via 192.0.2.2 dev eth0 proto static metric 5"));
+    ip(host, "address add 2001:db8::1/64 dev eth0 nodad");
+    written(kIpv6Address, "2001:db8::7");
+    written(kPrefixLength, "56");
+    EXPECT_THAT(addresses(host, "-6"), ElementsAre("2001:db8::7/56"));
+    EXPECT_FALSE(write(kIpv6Gateway, "2001:db8::2", [] {}).isForNow);
+}
+
+/// The plug-in writes an address beside an origin alone; a restart would bring back what the file says.
+HOST_TEST_F(InForce, NothingComesOfAFileThatTellsNoOrigin) {
+    ip(host, "address add 192.0.2.10/24 dev eth0");
+    host.file("/etc/sysconfig/network/ifcfg-eth-id-" + hardware_, "IPADDR=192.0.2.10\n");
+    EXPECT_FALSE(write(kAddress, "192.0.2.20", [] {}).isForNow);
+    EXPECT_THAT(addresses(host), ElementsAre("192.0.2.10/24"));
 }
 
 HOST_TEST_F(InForce, AnIpv6AddressComesAndTheOldOneGoes) {

@@ -107,7 +107,18 @@ def take_gateway_back(context):
     result = context.host.run(f"{AGENT} rollback")
     expect_equal("what the taking back tells", (result.stdout, result.stderr), ("change 2 is taken back\n", ""))
     expect_equal("the network when it is taken back", network_of(context), before)
+    take_back_in_time(context, before)
     context.host.sh("ip address delete 198.51.100.5/24 dev eth0; ip route delete 198.18.0.0/15")
+
+
+def take_back_in_time(context, before):
+    """The time is over while the host still asks whether another one has the address: the guard and who makes the change both put it back."""
+    context.host.run(f"{AGENT} set {NODE} IPv6Address 2001:db8::77 --confirm-within 1")
+    context.host.wait_for(f"{AGENT} history --changes | grep '^3 ' | grep -q 'is taken back  ' && ! pidof corvista-guard")
+    expect_equal("the network when its time is over", network_of(context), before)
+    addresses = context.host.sh("ip -6 -o address show dev eth0 scope global")
+    expect("2001:db8::10/64" in addresses and "2001:db8::77" not in addresses, f"the addresses: {addresses}")
+    expect("20-lan.network" in context.host.sh("networkctl status eth0"), "systemd-networkd goes on with the file of the change")
 
 
 def network_of(context):
@@ -129,7 +140,8 @@ def ifupdown(context):
 
 @check("systemd-networkd: a change is in a file of ours, in front of the other one; without it, the host is as it was")
 def networkd(context):
-    context.write("/etc/systemd/network/20-lan.network", NETWORK)
+    network = NETWORK + "Address=2001:db8::10/64\n"
+    context.write("/etc/systemd/network/20-lan.network", network)
     context.write("/etc/systemd/network/20-lan.network.d/more.conf", ADDED)
     context.host.sh("systemctl start systemd-networkd")
     context.host.wait_for("networkctl status eth0 | grep -q configured && ip route | grep -q 203.0.113.0/24")
@@ -139,7 +151,7 @@ def networkd(context):
     take_gateway_back(context)
     change_and_restart(context, "systemd-networkd, in /etc/systemd/network/0-cvagent-eth0.network", "systemctl restart systemd-networkd")
     context.host.wait_for("ip route | grep -q 203.0.113.0/24")
-    expect_equal("the file", context.read("/etc/systemd/network/20-lan.network"), NETWORK)
+    expect_equal("the file", context.read("/etc/systemd/network/20-lan.network"), network)
     context.host.sh("rm /etc/systemd/network/0-cvagent-eth0.network; networkctl reload")
     context.wait_for_address("192.0.2.10/24")
 

@@ -99,6 +99,14 @@ HOST_TEST_F(SetAndKeptOfIpv6, AGatewayThatIsKeptAndDoesNotComeIsNotDone) {
     EXPECT_THAT(run.err, testing::HasSubstr("it is kept for the next start, but the host has another value"));
 }
 
+/// Who brings it into the running host cannot be reached where it is tried.
+HOST_TEST_F(SetAndKeptOfIpv6, APlanOfAGatewayShowsWhereItIsKept) {
+    const Finished run = cvagent(host, {"plan", "ip-config:eth0", "IPv6Gateway", "2001:db8::1"});
+    EXPECT_EQ(run.status, 0) << run.out << run.err;
+    EXPECT_THAT(run.out, testing::HasSubstr("+  gateway 2001:db8::1\n"));
+    EXPECT_THAT(run.out, testing::HasSubstr("ifup eth0"));
+}
+
 HOST_TEST_F(SetAndKeptByIfupdown, APlanShowsIt) {
     const Finished run = cvagent(host, {"plan", "ip-config:eth0", "IPv4Address", "192.0.2.77"});
     EXPECT_THAT(run.out, testing::HasSubstr("--- /etc/network/interfaces\n"));
@@ -275,7 +283,8 @@ protected:
                   "say() { printf 'ADMIN_STATE=%s\\nNETWORK_FILE=%s\\n' $1 $2 > /run/new; mv /run/new " +
                       state_ +
                       "; }\n"
-                      "say configuring $1; ip -4 address flush dev eth0\n"
+                      "say configuring $1; ip -4 address flush dev eth0; ip -6 address flush dev eth0 scope "
+                      "global\n"
                       "(sleep 0.3; ip address add $(sed -n s/^Address=//p $1) dev eth0\n"
                       "ip route add default via $(sed -n s/^Gateway=//p $1) dev eth0 proto static\n"
                       "say configured $1) >/dev/null 2>&1 &\n");
@@ -308,6 +317,34 @@ HOST_TEST_F(SetAndKeptByNetworkd, AGatewayIsTakenBackWhole) {
     EXPECT_EQ(back.out + back.err, "change 1 is taken back\n");
     EXPECT_EQ(networkOf(host), before);
     EXPECT_TRUE(eventually([&] { return host.read(state_) == saysOf(kNetwork); }));
+}
+
+/// A newcomer's machine: the value is in force, and the program says how long.
+HOST_TEST_F(SetAndKept, WhatNobodyKeepsHoldsUntilRestart) {
+    const Finished run = cvagent(host, {"set", "ip-config:eth0", "IPv4Address", "192.0.2.77"});
+    EXPECT_EQ(run.status, 0) << run.err;
+    EXPECT_THAT(run.out, testing::HasSubstr("new  192.0.2.77\n"));
+    EXPECT_THAT(run.err,
+                testing::HasSubstr("cvagent: not kept over a restart: nobody is known who keeps 'eth0'\n"));
+    EXPECT_THAT(ip(host, "-4 -o address show dev eth0"), testing::HasSubstr("inet 192.0.2.77/24"));
+    host.file("/tmp/changes",
+              R"([{"node": "ip-config:eth0", "property": "IPv4Address", "value": "192.0.2.77"}])");
+    EXPECT_THAT(cvagent(host, {"apply", "/tmp/changes"}).out, testing::HasSubstr("unchanged"));
+    EXPECT_EQ(cvagent(host, {"diff", "/tmp/changes"}).status, 0);
+    EXPECT_EQ(cvagent(host, {"rollback"}).out, "change 1 is taken back\n");
+    EXPECT_THAT(ip(host, "-4 -o address show dev eth0"), testing::HasSubstr("inet 192.0.2.10/24"));
+}
+
+HOST_TEST_F(SetAndKeptByNetworkd, AnAddressLeavesTheOtherFamilyAsItIs) {
+    ip(host, "address add 2001:db8:5::5/64 dev eth0 nodad");
+    ip(host, "-6 route add 2001:db8:9::/48 via 2001:db8:5::9 dev eth0");
+    ip(host, "-6 route add default via 2001:db8:5::1 dev eth0");
+    const Finished run = cvagent(host, {"set", "ip-config:eth0", "IPv4Address", "192.0.2.77"});
+    EXPECT_EQ(run.status, 0) << run.err;
+    EXPECT_THAT(networkOf(host), testing::HasSubstr("192.0.2.77/24"));
+    EXPECT_THAT(ip(host, "-6 -o address show dev eth0"), testing::HasSubstr("2001:db8:5::5/64"));
+    EXPECT_THAT(ip(host, "-6 route"), testing::AllOf(testing::HasSubstr("2001:db8:9::/48 via 2001:db8:5::9"),
+                                                     testing::HasSubstr("default via 2001:db8:5::1")));
 }
 
 HOST_TEST_F(SetAndKept, NothingIsKeptWhereTwoClaimTheInterface) {

@@ -116,6 +116,7 @@ HOST_TEST_F(ServiceTakesBack, AllWhenAStepFails) {
     EXPECT_THAT(made.out, HasSubstr("not made   /oshw/root/computer/"));
     EXPECT_THAT(made.out, Not(HasSubstr("applied")));
     EXPECT_EQ(look(host), old_);
+    EXPECT_THAT(cvagent(host, {"set", "computer", "OwnerName", "y"}).err, Not(HasSubstr("taken back")));
     const Finished forced = cvagent(host, {"apply", "/root/changes", "--force", "--verify-within", "0"});
     EXPECT_THAT(forced.out, HasSubstr("applied    ")) << "who knows better goes as far as he comes";
     EXPECT_THAT(look(host), HasSubstr("203.0.113.7/25"));
@@ -221,7 +222,14 @@ HOST_TEST_F(ServiceTakesBack, WhatAUserTypes) {
     EXPECT_EQ(typed({"rollback"}), "change 1 is taken back\nstatus 0\n");
     EXPECT_EQ(look(host), old_);
     EXPECT_THAT(typed({"rollback"}), HasSubstr("there is no change that could be taken back\nstatus 3\n"));
-    EXPECT_THAT(typed({"rollback", "--bus", "none"}), HasSubstr("only root keeps and takes back"));
+    EXPECT_EQ(typed({"rollback", "--bus", "none"}),
+              "cvagent: only root keeps and takes back changes of the host\nRun: sudo cvagent rollback\n"
+              "status 1\n");
+    EXPECT_THAT(typed({"confirm", "1", "--bus", "none"}), HasSubstr("\nRun: sudo cvagent confirm 1\n"));
+    EXPECT_EQ(typed({"history", "--changes"}),
+              "cvagent: only root sees the changes that can be taken back: what they have saved is not for "
+              "everybody\nRun: sudo cvagent history --changes, or without --changes for what was written\n"
+              "status 1\n");
     EXPECT_THAT(changes(host), HasSubstr("(by alice (uid 12345))"));
 }
 

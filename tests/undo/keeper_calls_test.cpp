@@ -28,6 +28,7 @@ using cvagent::undo::MakingSettings;
 using cvagent::undo::NetworkdLinks;
 using cvagent::undo::runCalls;
 using cvagent::undo::savedStateFrom;
+using cvagent::undo::Stage;
 using cvagent::undo::takeBackAfterStart;
 using cvagent::undo::takeChangeBack;
 using testing::ElementsAre;
@@ -98,6 +99,20 @@ HOST_TEST_F(KeeperIsTold, AgainWhenTheChangeDidNotComeToItsEnd) {
     ChangeInMaking making(settings());
     making.beginStep();
     making.takeBack();
+    EXPECT_THAT(host.callsOf("/usr/sbin/ifup"), ElementsAre("/usr/sbin/ifup eth0"));
+}
+
+/// The files come back at once when the time is over in the middle of a step, and its end finds them so.
+HOST_TEST_F(KeeperIsTold, WhenTheStepOutlivesTheTimeOfTheChange) {
+    host.tool("/usr/sbin/ifdown eth0", "");
+    ChangeInMaking making(settings());
+    making.beginStep();
+    making.directory().update([](Journal& journal) {
+        journal.stage = Stage::takingBack;
+        return true;
+    });
+    EXPECT_EQ(making.end().stage, Stage::takingBack);
+    takeChangeBack(making.directory());
     EXPECT_THAT(host.callsOf("/usr/sbin/ifup"), ElementsAre("/usr/sbin/ifup eth0"));
 }
 

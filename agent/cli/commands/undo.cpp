@@ -28,9 +28,10 @@ bool isRoot() {
     return geteuid() == 0;
 }
 
-[[noreturn]] void mustBeRoot() {
+/// @param command as it was typed
+[[noreturn]] void mustBeRoot(const std::string& command) {
     throw Failure(ExitStatus::failed,
-                  "only root keeps and takes back changes of the host\nRun it with: sudo");
+                  "only root keeps and takes back changes of the host\nRun: sudo cvagent " + command);
 }
 
 unsigned numberIn(const std::string& word) {
@@ -113,7 +114,7 @@ remote::RolledBack rolledBackHere(unsigned number) {
 ExitStatus confirmChange(const Options& options) {
     const unsigned number = numberIn(options.change);
     if (!isRoot() && !remote::confirmChange(options, number)) {
-        mustBeRoot();
+        mustBeRoot("confirm " + options.change);
     }
     if (isRoot()) {
         confirmHere(options, number);
@@ -130,7 +131,7 @@ ExitStatus rollback(const Options& options) {
     const unsigned number = options.change.empty() ? 0 : numberIn(options.change);
     const auto back = isRoot() ? rolledBackHere(number) : remote::rollBack(options, number);
     if (!back) {
-        mustBeRoot();
+        mustBeRoot(options.change.empty() ? "rollback" : "rollback " + options.change);
     }
     print("change " + std::to_string(back->number) + " " + printable(back->stage) + "\n");
     if (!back->notes.empty()) {
@@ -142,7 +143,10 @@ ExitStatus rollback(const Options& options) {
 
 ExitStatus listChanges(const Options& options) {
     if (!isRoot()) {
-        mustBeRoot();
+        throw Failure(
+            ExitStatus::failed,
+            "only root sees the changes that can be taken back: what they have saved is not for "
+            "everybody\nRun: sudo cvagent history --changes, or without --changes for what was written");
     }
     std::string text;
     ExitStatus status = ExitStatus::done;

@@ -40,7 +40,7 @@ std::optional<ExitStatus> answerOfService(Options& options) {
         cvagent::Style::detect();
         const bool ofNode = options.command == cvagent::Command::get;
         answer =
-            cvagent::askService(ofNode ? cvagent::commands::get : cvagent::commands::tree, options, true);
+            cvagent::askService(ofNode ? cvagent::commands::get : cvagent::commands::tree, options, nullptr);
         return ExitStatus::done;
     });
     return status == ExitStatus::done ? answer : status;

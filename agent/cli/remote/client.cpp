@@ -20,6 +20,7 @@ namespace {
 constexpr const char* kBusObject = "/org/freedesktop/DBus";
 constexpr const char* kProperties = "org.freedesktop.DBus.Properties";
 constexpr const char* kPeer = "org.freedesktop.DBus.Peer";
+constexpr const char* kEnded = "the service has ended before it answered";
 /// Between two looks whether the service is alive.
 constexpr std::chrono::seconds kPing{5};
 
@@ -61,6 +62,9 @@ Client::Client(const std::string& address, int stop, Question first)
 void Client::checkUser() {
     std::uint32_t user = 0;
     const bus::Message owned = askBus("GetConnectionUnixUser", owner_);
+    if (owned.isError() && waitsForFirst_) {
+        throw ServiceGone(kEnded);
+    }
     if (owned.isError()) {
         throw NoService("the service ended", true);
     }
@@ -84,6 +88,9 @@ bus::Message Client::askBus(const char* member, const std::string& name,
         }
         return answer;
     } catch (const ServiceGone& gone) {
+        if (waitsForFirst_ && !owner_.empty()) {
+            throw;  // what the service was asked may be what it ended of
+        }
         throw NoService(gone.what(), true);
     }
 }
@@ -177,7 +184,7 @@ bus::Message Client::takeFirst(Seconds longest) {
     }
     const std::string sender = firstAnswer_.sender();
     if (sender != owner_ && (sender != kBusDriver || !firstAnswer_.isError())) {
-        throw ServiceGone("the service has ended before it answered");
+        throw ServiceGone(kEnded);
     }
     return std::move(firstAnswer_);
 }

@@ -47,7 +47,8 @@ public:
     /// What the service gives a read, and some more.
     static constexpr Seconds kRead{30};
 
-    /// Throws NoService, or Failure when the bus does not answer.
+    /// Throws NoService, ServiceGone of one that ends at the first question, or Failure when the bus does not
+    /// answer.
     /// @param address "system" or a bus's own
     /// @param stop    a descriptor that ends all waiting when it can be read; -1 for none
     /// @param first   what will be asked first. It goes out while the bus is still asked who the service is;
