@@ -12,6 +12,7 @@
 #include "agent/change/kept.h"
 #include "agent/change/kept_host.h"
 #include "agent/change/kernel_network.h"
+#include "agent/change/settled.h"
 #include "agent/change/untouched.h"
 
 namespace cvagent::change {
@@ -160,11 +161,16 @@ private:
                 }));
     }
 
+    bool isOfLease(const KernelRoute& route) const {
+        const bool isLeased = scene_.isKept && old_ != nullptr && !old_->isPermanent;
+        return isLeased && route.link == scene_.link.index && goesWithLease(route, KernelNetwork::read());
+    }
+
     void putBackRoutes() {
         for (const KernelRoute& each : scene_.before.routes) {
             const bool preferred = old_ != nullptr && each.source == old_->ip;
             const bool isOurs = each.destination.isIpv6 == ip_.isIpv6 && each.table != RT_TABLE_LOCAL &&
-                                !isMadeOfAddress(each, preferred) &&
+                                !isMadeOfAddress(each, preferred) && !isOfLease(each) &&
                                 (each.link == scene_.link.index || preferred);
             if (isOurs && !KernelNetwork::read().has(each)) {
                 noteIf(addAgain(each, preferred ? std::optional(ip_) : std::nullopt),

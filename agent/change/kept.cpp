@@ -3,14 +3,13 @@
 #include <linux/rtnetlink.h>
 
 #include <algorithm>
-#include <chrono>
 #include <iterator>
 #include <set>
-#include <thread>
 
 #include "agent/change/interface_settings.h"
 #include "agent/change/kept_host.h"
 #include "agent/change/kernel_network.h"
+#include "agent/change/settled.h"
 #include "agent/core/command_deadline.h"
 #include "agent/keep/way.h"
 #include "agent/undo/networkd_links.h"
@@ -168,36 +167,14 @@ std::string placesOf(const keep::Way& way) {
     return places.empty() ? "" : ", in " + places;
 }
 
-bool isOn(const KernelNetwork& network, unsigned link, const keep::FamilyWish& wish) {
-    const auto ip = wish.address ? Ip::parse(*wish.address) : std::nullopt;
-    return !ip || std::ranges::any_of(network.addresses, [&](const KernelAddress& each) {
-        return each.link == link && each.ip == *ip && (!wish.prefix || each.prefix == *wish.prefix);
-    });
-}
-
-/// A daemon asks the network first whether somebody else has an address. One that does not come is set by
-/// the agent.
-void waitUntilSet(unsigned link, const Wish& wish) {
-    constexpr std::chrono::milliseconds kBetweenLooks{20};
-    const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(3);
-    const auto isSet = [&](const KernelNetwork& network) {
-        return isOn(network, link, wish.ipv4) && isOn(network, link, wish.ipv6);
-    };
-    while (!isSet(KernelNetwork::read()) && std::chrono::steady_clock::now() < end) {
-        std::this_thread::sleep_for(kBetweenLooks);
-    }
-}
-
 /// @return what a person should know of it, behind where it is kept
 std::string waitUntilInForce(const keep::Way& way, const keep::Link& link, const Wish& wish,
-                             const undo::NetworkdLinks& before) {
-    if (way.request) {
-        waitUntilSet(link.index, wish);
-    }
+                             const KernelNetwork& before, const undo::NetworkdLinks& links) {
+    const Settled now = settled(link, wish, before);
     const bool isReload = std::ranges::find(way.callsAfter, undo::kNetworkdReload) != way.callsAfter.end();
-    return way.isEmpty() || !isReload || before.waitUntilSetUp()
-               ? ""
-               : ", but systemd-networkd has not set the interface up within ten seconds";
+    const bool isLate = isReload && !now.lacksLease && !links.waitUntilSetUp();
+    return (isLate ? ", but systemd-networkd has not set the interface up within ten seconds" : "") +
+           (now.note.empty() ? "" : "; " + now.note);
 }
 
 bool isNobody(const keep::Keeper& keeper) {
@@ -223,9 +200,11 @@ Kept keepWith(const keep::Link& link, const Wish& wish, const Terms& terms) {
         const keep::Way way = keep::wayToKeep(link, keeper, wish);
         const CommandScope scope(
             CommandScope::write);  // its commands have a write's time, and are told as its
-        const undo::NetworkdLinks before(link.index);
-        keep::go(way);
-        const std::string note = terms.isTried ? "" : waitUntilInForce(way, link, wish, before);
+        const KernelNetwork before = KernelNetwork::read();
+        const undo::NetworkdLinks links(link.index);
+        goWithLease(way, link);
+        const bool isWaitedFor = !terms.isTried && !way.isEmpty();
+        const std::string note = isWaitedFor ? waitUntilInForce(way, link, wish, before, links) : "";
         return {true, "kept over a restart by " + way.system + placesOf(way) + note, terms.isTried};
     } catch (const keep::CannotKeep& cannot) {
         return {false, "not kept over a restart: " + std::string(cannot.what())};

@@ -10,6 +10,7 @@
 
 #include "agent/change/interface_settings.h"
 #include "agent/change/kernel_network.h"
+#include "agent/change/settled.h"
 #include "agent/core/command_deadline.h"
 #include "agent/keep/host_settings.h"
 #include "framework/qx/whole_number.h"
@@ -103,24 +104,6 @@ Wish wishOfLists(unsigned int property, const IC::PropertyValue& value) {
     return wish;
 }
 
-/// Or netplan keeps the interface for it.
-Kept keepWithInterface(const std::string& obstacle, const std::string& interface, const Wish& wish) {
-    const KernelNetwork network = KernelNetwork::read();
-    const KernelLink* link = network.link(interface);
-    const keep::Link kernels = link == nullptr ? keep::Link() : keep::Link{link->name, link->index};
-    const keep::Keeper keeper = link == nullptr ? keep::Keeper() : keep::keeperOf(kernels);
-    if (keeper.system() != "NetworkManager" && keeper.system() != "netplan") {
-        throw CannotKeep(obstacle + ", and does not keep '" + interface + "'");
-    }
-    try {
-        const Way way = keep::wayToKeep(kernels, keeper, wish);
-        keep::go(way);
-        return {true, keptIn(way, "").note};
-    } catch (const CannotKeep& cannot) {
-        throw CannotKeep(obstacle + ": " + cannot.what());
-    }
-}
-
 /// It has been told and has answered by now; what is left to it is to write its file.
 bool comesIntoForce(const keep::Resolver& resolver, const Wish& wish) {
     constexpr std::chrono::milliseconds kLook{50};
@@ -134,12 +117,32 @@ bool comesIntoForce(const keep::Resolver& resolver, const Wish& wish) {
     return true;
 }
 
+/// It has them with the interfaces that it keeps, or netplan for it; those of a lease stand behind them.
+Kept keepWithInterface(const keep::Resolver& resolver, const HostsValue& written, const Wish& wish) {
+    const std::string& interface = written.interface;
+    const std::string& obstacle = resolver.obstacle;
+    const KernelNetwork network = KernelNetwork::read();
+    const KernelLink* link = network.link(interface);
+    const keep::Link kernels = link == nullptr ? keep::Link() : keep::Link{link->name, link->index};
+    const keep::Keeper keeper = link == nullptr ? keep::Keeper() : keep::keeperOf(kernels);
+    if (keeper.system() != "NetworkManager" && keeper.system() != "netplan") {
+        throw CannotKeep(obstacle + ", and does not keep '" + interface + "'");
+    }
+    try {
+        const Way way = keep::wayToKeep(kernels, keeper, wish);
+        goWithLease(way, kernels);
+        return {true, keptIn(way, "").note, written.isTried || comesIntoForce(resolver, wish)};
+    } catch (const CannotKeep& cannot) {
+        throw CannotKeep(obstacle + ": " + cannot.what());
+    }
+}
+
 template <unsigned int property>
 Kept keepLists(const HostsValue& written) {
     const Wish wish = wishOfLists(property, written.value);
     const keep::Resolver resolver = keep::resolverOfHost();
     if (resolver.isWithInterface()) {
-        return keepWithInterface(resolver.obstacle, written.interface, wish);
+        return keepWithInterface(resolver, written, wish);
     }
     const Way way = keep::wayOfResolver(resolver, wish);
     keep::go(way);
@@ -225,7 +228,7 @@ bool isInForceBySystem(const Property& row, const IC::PropertyValue& value) {
         return false;
     }
     const keep::Resolver resolver = keep::resolverOfHost();
-    return !resolver.system.empty() && resolver.obstacle.empty() &&
+    return (resolver.isWithInterface() || (!resolver.system.empty() && resolver.obstacle.empty())) &&
            keep::hasInForce(resolver, wishOfLists(row.id, value));
 }
 

@@ -3,11 +3,10 @@
 #include <algorithm>
 #include <array>
 #include <cctype>
-#include <string_view>
 
 #include "agent/core/text.h"
 #include "agent/keep/interfaces_file.h"
-#include "agent/keep/yaml_line.h"
+#include "agent/keep/yaml_file.h"
 
 namespace cvagent::keep {
 
@@ -16,34 +15,15 @@ namespace {
 constexpr const char* kMainTable = "254";
 constexpr std::array kKinds = {"ethernets", "bonds", "bridges", "vlans", "tunnels", "dummy-devices"};
 
-/// What separates the words of a list.
-constexpr std::string_view kBetweenWords = " []{},\"'";
-
-/// Where something stands: from its first line to behind its last one.
-struct Span {
-    std::size_t first = 0;
-    std::size_t end = 0;
-};
-
-class NetplanFile {
+class NetplanFile : private YamlFile {
 public:
-    explicit NetplanFile(const std::string& text) : lines_(splitLines(text)) {
-        bool isBegun = false;
-        for (const std::string& line : lines_) {
-            parsed_.push_back(parsed(line));
-            if (isBegun && line.starts_with("---")) {
-                refuseYaml(line);
-            }
-            isBegun = isBegun || !parsed_.back().text.empty();
-        }
-    }
-
-    const std::vector<std::string>& lines() const { return lines_; }
+    using YamlFile::lines;
+    using YamlFile::YamlFile;
 
     /// @return the lines of the interface; nothing when the file has none of that name
     std::optional<Span> find(const std::string& id) const {
         std::optional<Span> found;
-        const auto network = childOf({0, lines_.size()}, std::nullopt, "network");
+        const auto network = childOf({0, lines().size()}, std::nullopt, "network");
         for (const char* kind : kKinds) {
             const auto group = network ? childOf(*network, network->first, kind) : std::nullopt;
             const auto one = group ? childOf(*group, group->first, id) : std::nullopt;
@@ -60,8 +40,8 @@ public:
         const auto line = childOf(place, place.first, key);
         if (!line) {
             add(id, {key + ": " + value});
-        } else if (parsed_[line->first].value.empty()) {
-            refuseYaml(lines_[line->first]);
+        } else if (at(line->first).value.empty()) {
+            refuse(line->first);
         } else {
             replace(valueOf(line->first), value);
         }
@@ -70,10 +50,31 @@ public:
     bool isByDhcp(const std::string& id) const {
         const Span place = *find(id);
         const auto line = childOf(place, place.first, "dhcp4");
-        std::string value = line ? unquoted(parsed_[line->first].value) : "";
+        std::string value = line ? unquoted(at(line->first).value) : "";
         std::ranges::transform(value, value.begin(),
                                [](unsigned char letter) { return static_cast<char>(std::tolower(letter)); });
         return value == "true" || value == "yes" || value == "on" || value == "y";
+    }
+
+    /// What is fixed of IPv4 would stand beside the lease.
+    void dropFixed(const std::string& id) {
+        while (const auto list = childOf(*find(id), find(id)->first, "addresses")) {
+            const auto address = firstIn(*list, false);
+            if (!address) {
+                break;
+            }
+            eraseItem(*list, *address);
+        }
+        while (const auto routes = childOf(*find(id), find(id)->first, "routes")) {
+            const auto via = defaultVia(*routes, false);
+            if (!via) {
+                break;
+            }
+            eraseItem(*routes, *via);
+        }
+        if (const auto gateway = childOf(*find(id), find(id)->first, "gateway4")) {
+            erase(*gateway);
+        }
     }
 
     /// A fixed one of IPv4.
@@ -119,8 +120,8 @@ public:
             replace(*via, gateway);
             return;
         }
-        if (routes && !parsed_[routes->first].value.empty()) {
-            refuseYaml(lines_[routes->first]);
+        if (routes && !at(routes->first).value.empty()) {
+            refuse(routes->first);
         }
         const std::string indent(routes ? itemIndent(*routes) : 2, ' ');
         std::vector<std::string> item = {indent + "- to: default", indent + "  via: \"" + gateway + "\""};
@@ -133,82 +134,6 @@ public:
     }
 
 private:
-    /// A word of a list or a value, and where it stands.
-    struct Word {
-        std::size_t line = 0;
-        std::size_t column = 0;
-        std::string text;
-    };
-
-    Word valueOf(std::size_t line) const {
-        const YamlLine& told = parsed_[line];
-        return {line, told.indent + told.text.size() - told.value.size(), told.value};
-    }
-
-    /// The lines below a key, with it: what is indented more, and items of a list that are not.
-    Span blockAt(std::size_t first, std::size_t limit) const {
-        const std::size_t indent = parsed_[first].indent;
-        Span block{first, first + 1};
-        for (std::size_t at = first + 1; at < limit; ++at) {
-            const YamlLine& line = parsed_[at];
-            const bool isItem = line.text.starts_with('-');
-            if (line.text.empty()) {
-                continue;
-            }
-            if (line.indent < indent || (line.indent == indent && !isItem)) {
-                break;
-            }
-            block.end = at + 1;
-        }
-        return block;
-    }
-
-    /// @param parent the line of the mapping's key; none for the whole file
-    std::optional<Span> childOf(const Span& within, std::optional<std::size_t> parent,
-                                const std::string& key) const {
-        if (parent && !parsed_[*parent].value.empty()) {
-            refuseYaml(lines_[*parent]);
-        }
-        std::optional<Span> found;
-        std::optional<std::size_t> indent;
-        for (std::size_t at = parent ? *parent + 1 : within.first; at < within.end; ++at) {
-            const YamlLine& line = parsed_[at];
-            if (line.text.empty()) {
-                continue;
-            }
-            const bool isListInstead = parent && !indent && line.text.starts_with('-');
-            indent = indent.value_or(line.indent);
-            if (line.indent < *indent || isListInstead) {
-                refuseYaml(lines_[at]);
-            }
-            if (line.indent == *indent && line.key == key) {
-                if (found) {
-                    throw CannotKeep("the file says " + inQuotes(key) + " more than once");
-                }
-                found = blockAt(at, within.end);
-            }
-        }
-        return found;
-    }
-
-    /// The words of a list and its items, without quotes and brackets.
-    std::vector<Word> wordsIn(const Span& list) const {
-        std::vector<Word> words;
-        for (std::size_t at = list.first; at < list.end; ++at) {
-            const Word whole =
-                at == list.first ? valueOf(at) : Word{at, parsed_[at].indent, parsed_[at].text};
-            std::size_t begin = 0;
-            while ((begin = whole.text.find_first_not_of(kBetweenWords, begin)) != std::string::npos) {
-                const std::size_t end =
-                    std::min(whole.text.find_first_of(kBetweenWords, begin), whole.text.size());
-                const std::string word = whole.text.substr(begin, end - begin);
-                words.push_back({at, whole.column + begin, word.substr(0, word.find_last_not_of(':') + 1)});
-                begin = end;
-            }
-        }
-        return words;
-    }
-
     std::optional<Word> firstIn(const Span& list, bool isIpv6) const {
         for (const Word& word : wordsIn(list)) {
             const bool isLocal = word.text.starts_with("fe80:");
@@ -217,15 +142,6 @@ private:
             }
         }
         return std::nullopt;
-    }
-
-    std::size_t itemIndent(const Span& list) const {
-        for (std::size_t at = list.first + 1; at < list.end; ++at) {
-            if (parsed_[at].text.starts_with('-')) {
-                return parsed_[at].indent;
-            }
-        }
-        return parsed_[list.first].indent + 2;
     }
 
     /// Where the default route of a family goes by.
@@ -237,12 +153,12 @@ private:
             std::optional<Word> via;
             bool isDefault = false;
             bool isInOtherTable = false;
-            for (std::size_t at = 0; at + 1 < item.size(); ++at) {
-                const std::string& value = item[at + 1].text;
-                isDefault = isDefault || (item[at].text == "to" &&
+            for (std::size_t i = 0; i + 1 < item.size(); ++i) {
+                const std::string& value = item[i + 1].text;
+                isDefault = isDefault || (item[i].text == "to" &&
                                           (value == "default" || value == (isIpv6 ? "::/0" : "0.0.0.0/0")));
-                isInOtherTable = isInOtherTable || (item[at].text == "table" && value != kMainTable);
-                via = item[at].text == "via" ? std::optional(item[at + 1]) : via;
+                isInOtherTable = isInOtherTable || (item[i].text == "table" && value != kMainTable);
+                via = item[i].text == "via" ? std::optional(item[i + 1]) : via;
             }
             if (isDefault && !isInOtherTable && via && (isIpv6 ? keep::isIpv6 : isIpv4)(via->text) &&
                 !found) {
@@ -251,7 +167,7 @@ private:
             item.clear();
         };
         for (const Word& word : wordsIn(routes)) {
-            if (word.text == "-" && parsed_[word.line].indent == indent) {
+            if (word.text == "-" && at(word.line).indent == indent) {
                 look();
             }
             item.push_back(word);
@@ -260,24 +176,12 @@ private:
         return found;
     }
 
-    void replace(const Word& old, const std::string& value) {
-        lines_[old.line].replace(old.column, old.text.size(), value);
-        parsed_[old.line] = parsed(lines_[old.line]);
-    }
-
-    void insert(std::size_t place, const std::vector<std::string>& lines) {
-        for (std::size_t at = 0; at < lines.size(); ++at) {
-            lines_.insert(lines_.begin() + static_cast<std::ptrdiff_t>(place + at), lines[at]);
-            parsed_.insert(parsed_.begin() + static_cast<std::ptrdiff_t>(place + at), parsed(lines[at]));
-        }
-    }
-
     void addToList(const std::string& id, const std::optional<Span>& list, const std::string& value) {
         if (!list) {
             add(id, {"addresses: [" + value + "]"});
             return;
         }
-        const std::string& told = parsed_[list->first].value;
+        const std::string& told = at(list->first).value;
         if (told.empty()) {
             insert(list->end, {std::string(itemIndent(*list), ' ') + "- " + value});
         } else if (told.ends_with(']')) {
@@ -285,17 +189,17 @@ private:
             replace(valueOf(list->first),
                     told.substr(0, told.size() - 1) + (isEmpty ? "" : ", ") + value + "]");
         } else {
-            refuseYaml(lines_[list->first]);
+            refuse(list->first);
         }
     }
 
     /// To the end of the interface.
     void add(const std::string& id, const std::vector<std::string>& lines) {
         const Span place = *find(id);
-        std::string indent(parsed_[place.first].indent + 2, ' ');
-        for (std::size_t at = place.first + 1; at < place.end; ++at) {
-            if (!parsed_[at].text.empty()) {
-                indent = std::string(parsed_[at].indent, ' ');
+        std::string indent(at(place.first).indent + 2, ' ');
+        for (std::size_t line = place.first + 1; line < place.end; ++line) {
+            if (!at(line).text.empty()) {
+                indent = std::string(at(line).indent, ' ');
                 break;
             }
         }
@@ -303,9 +207,6 @@ private:
         std::ranges::for_each(indented, [&indent](std::string& line) { line.insert(0, indent); });
         insert(place.end, indented);
     }
-
-    std::vector<std::string> lines_;
-    std::vector<YamlLine> parsed_;
 };
 
 void setFamily(NetplanFile& file, const std::string& id, const FamilyWish& wish, bool isIpv6) {
@@ -323,14 +224,7 @@ void setFamily(NetplanFile& file, const std::string& id, const FamilyWish& wish,
     }
 }
 
-}  // namespace
-
-bool definesInNetplan(const std::string& text, const std::string& id) {
-    return NetplanFile(text).find(id).has_value();
-}
-
-std::string editedNetplan(const std::string& text, const std::string& id, const Wish& wish) {
-    check(wish);
+std::string editedOnce(const std::string& text, const std::string& id, const Wish& wish) {
     NetplanFile file(text);
     if (!file.find(id)) {
         throw CannotKeep("the file has no interface " + inQuotes(id));
@@ -341,6 +235,9 @@ std::string editedNetplan(const std::string& text, const std::string& id, const 
     const bool wasByDhcp = file.isByDhcp(id);
     if (wish.dhcp && wasByDhcp != *wish.dhcp) {
         file.setScalar(id, "dhcp4", *wish.dhcp ? "true" : "false");
+        if (*wish.dhcp) {
+            file.dropFixed(id);
+        }
     }
     setFamily(file, id, wasByDhcp && !file.isByDhcp(id) ? wish.ipv4.behindDhcp() : wish.ipv4, false);
     setFamily(file, id, wish.ipv6, true);
@@ -348,6 +245,21 @@ std::string editedNetplan(const std::string& text, const std::string& id, const 
         throw CannotKeep(*wish.dhcp ? "the file has a fixed address" : "no address would be left");
     }
     return joined(file.lines(), text);
+}
+
+}  // namespace
+
+bool definesInNetplan(const std::string& text, const std::string& id) {
+    return NetplanFile(text).find(id).has_value();
+}
+
+std::string editedNetplan(const std::string& text, const std::string& id, const Wish& wish) {
+    check(wish);
+    std::string edited = editedOnce(text, id, wish);
+    if (editedOnce(edited, id, wish) != edited) {
+        throw CannotKeep("the file means something else than it seems to");
+    }
+    return edited;
 }
 
 }  // namespace cvagent::keep

@@ -11,9 +11,10 @@ namespace cvagent::keep {
 bool definesInNetplan(const std::string& text, const std::string& id);
 
 /// Such a file with as little changed as the wish takes: values are replaced where they stand, what is
-/// missing is added to the interface. Understood is a part of YAML: mappings by indentation, lists by lines
-/// or in brackets on one line, plain and quoted values; no tabs, anchors, tags, merges, braces around what is
-/// to be changed, nor anything in brackets that goes on in another line. Throws CannotKeep.
+/// missing is added to the interface; with DHCP its addresses and default route of IPv4 go. Understood is a
+/// part of YAML: mappings by indentation, lists by lines or in brackets on one line, plain and quoted values;
+/// no tabs, anchors, tags, merges, braces around what is to be changed, nor anything in brackets that goes on
+/// in another line. Throws CannotKeep.
 std::string editedNetplan(const std::string& text, const std::string& id, const Wish& wish);
 
 }  // namespace cvagent::keep

@@ -204,7 +204,7 @@ void tryToPut(const FileState& state, std::vector<std::string>& notes) {
 
 std::vector<std::size_t> filesToPutBack(const std::vector<FileState>& before,
                                         const std::vector<FileState>& left, const std::vector<FileState>& now,
-                                        std::vector<std::string>& notes) {
+                                        std::vector<std::size_t>& others) {
     std::vector<std::size_t> indices;
     for (std::size_t i = 0; i < before.size(); ++i) {
         const bool isOld = now[i].isAs(before[i]);
@@ -216,7 +216,7 @@ std::vector<std::size_t> filesToPutBack(const std::vector<FileState>& before,
         if (left.empty() || isOld || now[i].isAs(left[i])) {
             indices.push_back(i);
         } else {
-            notes.push_back(before[i].path + " has been changed by somebody else since and stays as it is");
+            others.push_back(i);
         }
     }
     return indices;

@@ -11,11 +11,11 @@ namespace cvagent::undo {
 /// @param left what the change left, in the order of `before`; empty when it did not come to its end: then
 ///             whatever stands there is its work
 /// @param now what stands there, in the same order
-/// @param notes gets a line for each that somebody else has changed since
+/// @param others gets the index of each that somebody else has changed since
 /// @return indices
 std::vector<std::size_t> filesToPutBack(const std::vector<FileState>& before,
                                         const std::vector<FileState>& left, const std::vector<FileState>& now,
-                                        std::vector<std::string>& notes);
+                                        std::vector<std::size_t>& others);
 
 /// Puts these back: directories from the outside in, then files and links, each under its name at once, last
 /// what was not there, from the inside out. Can be done again and again.

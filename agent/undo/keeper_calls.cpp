@@ -19,6 +19,7 @@
 
 #include "agent/undo/boot_clock.h"
 #include "agent/undo/networkd_links.h"
+#include "agent/undo/renewed_lease.h"
 #include "hosttools/files.h"
 #include "hosttools/text.h"
 
@@ -42,7 +43,7 @@ constexpr std::array kKnownCalls{
     KnownCall{"systemctl try-reload-or-restart systemd-resolved", false, false},
     KnownCall{"resolvconf -u", false, false},
     KnownCall{"nmcli connection reload", false, false},
-    KnownCall{"nmcli device reapply", true, false},
+    KnownCall{kReapply, true, false},
     KnownCall{"wicked ifreload", true, false},
     KnownCall{"ifdown", true, false},
     KnownCall{"ifup", true, false},
@@ -160,12 +161,16 @@ KeeperCalls KeeperCalls::whileStarting() const {
 }
 
 void runCalls(const std::vector<std::string>& calls, std::vector<std::string>& notes) {
+    const std::string reapply = std::string(kReapply) + " ";
     for (const std::string& call : calls) {
         const NetworkdLinks links;
+        const RenewedLease lease(call.starts_with(reapply) ? call.substr(reapply.size()) : "");
         if (const std::string problem = problemOf(call); !problem.empty()) {
             notes.push_back("'" + call + "' " + problem);
         } else if (call == kNetworkdReload) {
             links.waitUntilSetUp();
+        } else {
+            lease.wait();
         }
     }
 }

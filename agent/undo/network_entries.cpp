@@ -126,6 +126,11 @@ int removeOneAddress(NetlinkSocket& socket, const NetworkMessage& message) {
     return tell(socket, asRemoval(addressRequest(message, kAdd, 0), RTM_DELADDR));
 }
 
+/// One for a time.
+bool isLeasedAddress(const NetworkMessage& message, const NetworkMessages& /*network*/) {
+    return lifetimeOf(Parts<ifaddrmsg>(message)).has_value();
+}
+
 // Next hops.
 
 std::vector<Entry> nextHopEntries(const NetworkState& state, const std::vector<unsigned>& links) {
@@ -239,6 +244,14 @@ std::string routeText(const NetworkMessage& message, const NetworkMessages& netw
     return tableOf(parts) == RT_TABLE_MAIN ? text : text + " table " + std::to_string(tableOf(parts));
 }
 
+/// NetworkManager lays the one to the subnet itself.
+bool isLeasedRoute(const NetworkMessage& message, const NetworkMessages& network) {
+    return Parts<rtmsg>(message).fixed().rtm_protocol == RTPROT_DHCP ||
+           std::ranges::any_of(network.addresses, [&](const NetworkMessage& each) {
+               return isLeasedAddress(each, network) && prefers(message, each);
+           });
+}
+
 // Rules.
 
 std::vector<Entry> ruleEntries(const NetworkState& state, const std::vector<unsigned>& /*links*/) {
@@ -306,11 +319,11 @@ std::string neighbourText(const NetworkMessage& message, const NetworkMessages& 
 
 const std::vector<EntryKind>& entryKinds() {
     static const std::vector<EntryKind> kKinds{
-        {false, addressEntries, addOneAddress, removeOneAddress, addressText},
-        {true, nextHopEntries, addNextHop, removeNextHop, nextHopText},
-        {true, routeEntries, addRoute, removeRoute, routeText},
-        {false, ruleEntries, addRule, removeRule, ruleText},
-        {true, neighbourEntries, addNeighbour, removeNeighbour, neighbourText},
+        {false, addressEntries, addOneAddress, removeOneAddress, addressText, isLeasedAddress},
+        {true, nextHopEntries, addNextHop, removeNextHop, nextHopText, nullptr},
+        {true, routeEntries, addRoute, removeRoute, routeText, isLeasedRoute},
+        {false, ruleEntries, addRule, removeRule, ruleText, nullptr},
+        {true, neighbourEntries, addNeighbour, removeNeighbour, neighbourText, nullptr},
     };
     return kKinds;
 }

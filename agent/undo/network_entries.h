@@ -27,6 +27,8 @@ struct EntryKind {
     int (*remove)(hosttools::NetlinkSocket& socket, const NetworkMessage& message);
     /// "the address 192.0.2.7/24 of eth0"
     std::string (*text)(const NetworkMessage& message, const NetworkMessages& network);
+    /// Whether a DHCP client has set it; null: it sets none of these.
+    bool (*isLeased)(const NetworkMessage& message, const NetworkMessages& network);
 };
 
 /// In the order in which they are added; they are taken away the other way round.

@@ -13,6 +13,7 @@
 
 #include "agent/undo/link_restore.h"
 #include "agent/undo/network_entries.h"
+#include "agent/undo/settled_leases.h"
 
 namespace cvagent::undo {
 
@@ -78,6 +79,7 @@ struct Looks {
     Entries before;
     Entries left;
     Entries now;
+    std::set<std::string> freed;  ///< groups in which a lease was that has ended
 };
 
 /// @param tell is called for one that somebody else has set since, and that stays
@@ -92,12 +94,14 @@ Entries wantedOf(const EntryKind& kind, const Looks& looks, Tell tell) {
     }
     Entries wanted;
     for (const std::string& name : names) {
+        const bool isFreed = looks.freed.contains(name);
         const bool isOthers =
-            kind.isOneValue && !isSame(left[name], now[name]) && !isSame(before[name], now[name]);
+            kind.isOneValue && !isFreed && !isSame(left[name], now[name]) && !isSame(before[name], now[name]);
         if (isOthers && !isSame(before[name], left[name])) {
             tell(before[name].empty() ? left[name].front() : before[name].front());
         }
-        const Entries group = isOthers ? now[name] : wantedOf(before[name], left[name], now[name]);
+        const Entries made = isFreed ? Entries() : left[name];
+        const Entries group = isOthers ? now[name] : wantedOf(before[name], made, now[name]);
         wanted.insert(wanted.end(), group.begin(), group.end());
     }
     return wanted;
@@ -132,9 +136,13 @@ public:
     Restore(const NetworkChange& change, std::vector<std::string>& notes)
         : change_(change), notes_(notes), links_(linksOf(change.before)) {
         const NetworkState& left = change.left != nullptr ? *change.left : change.now;
+        const SettledLeases leases(change, links_);
         for (const EntryKind& kind : entryKinds()) {
-            const Looks looks{kind.entries(change.before, links_), kind.entries(left, links_),
-                              kind.entries(change.now, links_)};
+            Looks looks{kind.entries(change.before, links_),
+                        kind.entries(left, links_),
+                        kind.entries(change.now, links_),
+                        {}};
+            looks.freed = leases.takeOut(kind, looks.now);
             wanted_.push_back(wantedOf(kind, looks, [&](const Entry& each) {
                 notes_.push_back(kind.text(each.message, change.before.network) +
                                  " has been changed by somebody else since and is not put back");

@@ -20,9 +20,10 @@ struct NetworkState {
 /// What a change has done to the network, as far as it is to be taken back.
 struct NetworkChange {
     const NetworkState& before;
-    const NetworkState* left;  ///< what the change left; null when it did not come to its end
-    const NetworkState& now;   ///< when the taking back began
-    std::uint64_t seconds;     ///< since `before`; lifetimes are shorter by so much
+    const NetworkState* left;   ///< what the change left; null when it did not come to its end
+    const NetworkState& now;    ///< when the taking back began
+    std::uint64_t seconds;      ///< since `before`; lifetimes are shorter by so much
+    bool isKeeperTold = false;  ///< since `now`: the system that keeps an interface has its files back
 };
 
 /// Whether nothing would have to be put back of what was changed between them.

@@ -6,7 +6,10 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <chrono>
 #include <cstring>
+#include <thread>
+#include <utility>
 
 #include "agent/undo/boot_clock.h"
 #include "agent/undo/file_restore.h"
@@ -104,6 +107,26 @@ void putBackNames(const SavedState& before, const SavedState* left, const SavedS
     if (isToPutBack(before.domainName, left != nullptr ? &left->domainName : nullptr, began.domainName)) {
         noteProblem("the domain name", setdomainname(before.domainName.data(), before.domainName.size()),
                     notes);
+    }
+}
+
+/// Whoever was told of his old files may be the one who has changed another one since: he makes it of them
+/// again, behind his answer.
+void noteOthersFiles(const SavedState& before, std::vector<std::size_t> others, bool isKeeperTold,
+                     std::vector<std::string>& notes) {
+    constexpr std::uint64_t kLongest = 5000;
+    constexpr std::chrono::milliseconds kBetweenFileLooks{20};
+    const auto isBack = [&before](std::size_t i) {
+        return fileStateOf(before.files[i].path).isAs(before.files[i]);
+    };
+    const std::uint64_t end = bootMilliseconds() + kLongest;
+    std::erase_if(others, isBack);
+    while (isKeeperTold && !others.empty() && bootMilliseconds() < end) {
+        std::this_thread::sleep_for(kBetweenFileLooks);
+        std::erase_if(others, isBack);
+    }
+    for (const std::size_t i : others) {
+        notes.push_back(before.files[i].path + " has been changed by somebody else since and stays as it is");
     }
 }
 
@@ -206,13 +229,14 @@ SavedState savedStateFrom(std::string_view text) {
 
 TakenBack takeBack(const SavedState& before, const SavedState* left, const SavedState& began) {
     TakenBack taken;
+    std::vector<std::size_t> others;
     const bool isSameSet =
         before.paths() == began.paths() && (left == nullptr || left->paths() == before.paths());
     if (!isSameSet) {
         throw BadRecord("the saved states are of other files");
     }
     const auto indices = filesToPutBack(
-        before.files, left != nullptr ? left->files : std::vector<FileState>(), began.files, taken.notes);
+        before.files, left != nullptr ? left->files : std::vector<FileState>(), began.files, others);
     // One that did not come to its end may have been put back in part already, by who was killed at it.
     const bool isOfKeeper =
         left == nullptr || std::ranges::any_of(indices, [&before](std::size_t i) {
@@ -226,18 +250,19 @@ TakenBack takeBack(const SavedState& before, const SavedState* left, const Saved
     runCalls(calls.before, taken.notes);
     putBackFiles(before.files, indices, taken.notes);
     runCalls(calls.after, taken.notes);
-    if (isOtherStart) {
-        return taken;  // the rest of the kernel has begun anew, or does with what the files say
+    const bool isKeeperTold = !calls.before.empty() || !calls.after.empty();
+    if (!isOtherStart) {  // then the rest of the kernel has begun anew, or does with what the files say
+        putBackNames(before, left, began, taken.notes);
     }
-    putBackNames(before, left, began, taken.notes);
-    if (!before.hasNetwork) {
-        return taken;
+    if (!isOtherStart && before.hasNetwork) {
+        constexpr std::uint64_t kThousand = 1000;
+        const std::uint64_t now = bootMilliseconds();
+        const std::uint64_t seconds = now < before.milliseconds ? 0 : (now - before.milliseconds) / kThousand;
+        putBackNetwork({before.network, left != nullptr ? &left->network : nullptr, began.network, seconds,
+                        isKeeperTold},
+                       taken.notes);
     }
-    constexpr std::uint64_t kThousand = 1000;
-    const std::uint64_t now = bootMilliseconds();
-    const std::uint64_t seconds = now < before.milliseconds ? 0 : (now - before.milliseconds) / kThousand;
-    putBackNetwork({before.network, left != nullptr ? &left->network : nullptr, began.network, seconds},
-                   taken.notes);
+    noteOthersFiles(before, std::move(others), isKeeperTold && !isOtherStart, taken.notes);
     return taken;
 }
 

@@ -557,6 +557,28 @@ TEST(NetplanFile, ChangesTheOrigin) {
               "      dhcp4: false\n      addresses: [\"192.0.2.7/24\"]\n");
 }
 
+TEST(NetplanFile, HasNothingFixedBesideALease) {
+    EXPECT_EQ(netplan("      dhcp4: no\n      addresses: [192.0.2.10/24]\n      gateway4: 192.0.2.1\n"
+                      "      gateway6: \"2001:db8::1\"\n",
+                      origin(true)),
+              "      dhcp4: true\n      gateway6: \"2001:db8::1\"\n");
+    EXPECT_EQ(netplan("      addresses: [192.0.2.10/24, \"2001:db8::7/64\", '192.0.2.11/24']  # ours\n"
+                      "      mtu: 1400\n",
+                      origin(true)),
+              "      addresses: [\"2001:db8::7/64\"]  # ours\n      mtu: 1400\n      dhcp4: true\n");
+    EXPECT_EQ(netplan("      addresses:\n      - \"192.0.2.10/24\":\n          label: a\n      # near\n"
+                      "      - 2001:db8::7/64\n      - 192.0.2.11/24\n      routes:\n"
+                      "      - to: default\n        via: 192.0.2.1\n        metric: 5\n"
+                      "      - to: 198.51.100.0/24\n        via: 192.0.2.9\n",
+                      origin(true)),
+              "      addresses:\n      # near\n      - 2001:db8::7/64\n      routes:\n"
+              "      - to: 198.51.100.0/24\n        via: 192.0.2.9\n      dhcp4: true\n");
+    EXPECT_EQ(netplan("      addresses:\n      - 192.0.2.10/24\n      routes:\n"
+                      "      - {to: 0.0.0.0/0, via: 192.0.2.1}\n",
+                      origin(true)),
+              "      dhcp4: true\n");
+}
+
 TEST(NetplanFile, IsRefusedWhereItIsNotUnderstood) {
     const auto refused = [](const std::string& text, const Wish& wish) {
         return refusal([&] { editedNetplan(text, "eth0", wish); });
@@ -581,8 +603,10 @@ TEST(NetplanFile, IsRefusedWhereItIsNotUnderstood) {
     EXPECT_THAT(refused(head + "      mtu: 1\n    eth0:\n      mtu: 2\n", wish), HasSubstr("more than once"));
     EXPECT_THAT(refused(head + "      dhcp4: true\n", wish), HasSubstr("comes by DHCP"));
     EXPECT_THAT(refused(head + "      dhcp4: true\n", origin(false)), HasSubstr("no address would be left"));
-    EXPECT_THAT(refused(head + "      addresses: [192.0.2.1/24]\n", origin(true)),
+    EXPECT_THAT(refused(head + "      dhcp4: true\n      addresses: [192.0.2.1/24]\n", origin(true)),
                 HasSubstr("fixed address"));
+    EXPECT_THAT(refused(head + "      routes: [{to: default, via: 192.0.2.1}]\n", origin(true)),
+                HasSubstr("not understood"));
     EXPECT_THAT(refused(head + "      mtu: 1\n", gateway("")), HasSubstr("not taken out"));
     EXPECT_THAT(refused(head + "      mtu: 1\n", prefix(24)), HasSubstr("no address"));
     EXPECT_THAT(refused(head + "      addresses: 192.0.2.1\n", wish), HasSubstr("not understood"));

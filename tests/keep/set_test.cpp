@@ -148,6 +148,67 @@ HOST_TEST_F(SetAndKeptByIfupdown, AGatewayThatIsOutOfReachIsNotWritten) {
     EXPECT_EQ(host.read("/etc/network/interfaces"), "iface eth0 inet static\n    address 198.51.100.7/24\n");
 }
 
+/// An interface with a lease, and a daemon that answers before it has set the interface up.
+class SetAndKeptInsteadOfALease : public SetAndKeptByIfupdown {
+protected:
+    void setUpHost(FakeHost& host) override {
+        SetAndKept::setUpHost(host);
+        host.realTool("sleep");
+        host.file("/run/network/ifstate", "eth0=eth0\n");
+        host.file("/etc/network/interfaces", "iface eth0 inet dhcp\n");
+        ip(host, "address flush dev eth0");
+        ip(host, kLease);
+        ip(host, "route add default via 192.0.2.1 dev eth0 proto dhcp src 192.0.2.100 metric 1024");
+        ip(host, "route add 192.0.2.53 dev eth0 proto dhcp scope link src 192.0.2.100 metric 1024");
+        host.tool("ifdown eth0", "");
+        host.tool("ifup eth0", behind("ip address flush dev eth0; "
+                                      "set -- $(grep address /etc/network/interfaces); "
+                                      "ip address add $2 dev eth0; ip route add default via 192.0.2.1"));
+    }
+    static ToolAnswer behind(const std::string& script) {
+        return {"", 0, "", 0, "(sleep 0.3; " + script + ") >/dev/null 2>&1 &"};
+    }
+    static constexpr const char* kLease =
+        "address add 192.0.2.100/24 dev eth0 valid_lft 3000 preferred_lft 3000";
+};
+
+HOST_TEST_F(SetAndKeptInsteadOfALease, NothingOfTheLeaseIsPutBack) {
+    const Finished run = cvagent(host, {"set", "ip-config:eth0", "IPv4Address", "192.0.2.77"});
+    EXPECT_EQ(run.status, 0) << run.err;
+    EXPECT_THAT(run.err,
+                testing::HasSubstr("in /etc/network/interfaces; name servers of the lease may go with it\n"));
+    const std::string routes = ip(host, "-4 route show dev eth0");
+    EXPECT_THAT(routes, testing::HasSubstr("default via 192.0.2.1"));
+    EXPECT_THAT(routes, testing::Not(testing::HasSubstr("dhcp")));
+    const std::string addresses = ip(host, "-4 -o address show dev eth0");
+    EXPECT_THAT(addresses, testing::HasSubstr("inet 192.0.2.77/24"));
+    EXPECT_THAT(addresses, testing::Not(testing::HasSubstr("192.0.2.100")));
+}
+
+HOST_TEST_F(SetAndKeptInsteadOfALease, ItsOwnAddressIsThereForEver) {
+    const Finished run = cvagent(host, {"set", "ip-config:eth0", "IPv4Address", "192.0.2.100"});
+    EXPECT_EQ(run.status, 0) << run.err;
+    EXPECT_THAT(ip(host, "-4 -o address show dev eth0"), testing::HasSubstr("valid_lft forever"));
+}
+
+HOST_TEST_F(SetAndKeptByIfupdown, ALeaseIsWaitedFor) {
+    host.realTool("sleep");
+    host.tool("ifup eth0", {"", 0, "", 0,
+                            "(sleep 0.3; ip address add 192.0.2.100/24 dev eth0 valid_lft 3000 preferred_lft "
+                            "3000) >/dev/null 2>&1 &"});
+    const Finished run = cvagent(host, {"set", "ip-config:eth0", "IPOrigin", "1"});
+    EXPECT_EQ(run.status, 0) << run.err;
+    EXPECT_THAT(ip(host, "-4 -o address show dev eth0"), testing::HasSubstr("inet 192.0.2.100/24"));
+}
+
+HOST_TEST_F(SetAndKeptByIfupdown, ThatNoLeaseHasComeIsTold) {
+    host.tool("ifup eth0", "");
+    ip(host, "link set sw0 down");  // without a carrier nobody waits for one
+    const Finished run = cvagent(host, {"set", "ip-config:eth0", "IPOrigin", "1"});
+    EXPECT_EQ(run.status, 0) << run.err;
+    EXPECT_THAT(run.err, testing::HasSubstr("in /etc/network/interfaces; no address has come by DHCP yet\n"));
+}
+
 /// Its stanza comes back with the change, also where nothing has told beforehand that it would be written.
 HOST_TEST_F(SetAndKeptByIfupdown, WhatIsTakenBackIsItsStanzaToo) {
     host.remove("/tools/ifdown");

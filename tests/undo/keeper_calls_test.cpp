@@ -72,6 +72,21 @@ HOST_TEST_F(KeeperIsTold, BeforeAndAfterItsFileIsBack) {
                 ElementsAre("/usr/sbin/ifdown eth0", "/usr/sbin/ifup eth0", "/usr/sbin/netplan generate"));
 }
 
+/// He has made a file of his own since, as of name servers, and makes it anew behind his answer.
+HOST_TEST_F(KeeperIsTold, AndItsOtherFileIsNoneOfSomebodyElse) {
+    host.realTool("sleep");
+    host.tool("/usr/sbin/ifdown eth0", "");
+    host.tool("/usr/sbin/ifup eth0", {"", 0, "", 0, "(sleep 0.3; echo old >/etc/other) >/dev/null 2>&1 &"});
+    ChangeInMaking making(settings());
+    making.beginStep();
+    host.file(kStanzas, "new\n");
+    host.file("/etc/other", "new\n");
+    making.end();
+    host.file("/etc/other", "new, and the lease's\n");
+    EXPECT_THAT(takeChangeBack({kChangesPlace, making.number()}).notes, IsEmpty());
+    EXPECT_EQ(host.read("/etc/other"), "old\n");
+}
+
 HOST_TEST_F(KeeperIsTold, NothingWhereItsFileHasNotChanged) {
     takeChangeBack(made(host, "/etc/other"));
     EXPECT_EQ(host.read("/etc/other"), "old\n");

@@ -2,8 +2,10 @@
 #include <gmock/gmock.h>
 #include <linux/rtnetlink.h>
 
+#include <chrono>
 #include <sstream>
 
+#include "agent/undo/keeper_calls.h"
 #include "agent/undo/saved_state.h"
 #include "hosttools/netlink.h"
 #include "tests/support/fake_host.h"
@@ -173,6 +175,91 @@ HOST_TEST_F(Network, ComesBackFromAllAtOnce) {
     const SavedState left = before.again();
     EXPECT_THAT(takeBack(before, &left, left).notes, IsEmpty());
     EXPECT_EQ(allAtLast(host, old), old);
+}
+
+/// A lease that comes late, and that the system which keeps the interface ends when it has its old file back.
+class LateLease : public Network {
+protected:
+    void setUpHost(FakeHost& host) override {
+        Network::setUpHost(host);
+        host.file(kFile, "static\n");
+        host.tool("/usr/sbin/ifup eth0", {"", 0, "", 0, endOf("192.0.2.100") + "; " + kStatic});
+    }
+    static std::string endOf(const std::string& lease) {
+        return "ip address del " + lease + "/24 dev eth0; ip route del default metric 100";
+    }
+    static void changeToLease(FakeHost& host) {
+        host.file(kFile, "dhcp\n");
+        ip(host, "address flush dev eth0");
+    }
+    static void lease(FakeHost& host) {
+        ip(host, "address add 192.0.2.100/24 dev eth0 valid_lft 3000 preferred_lft 3000 noprefixroute");
+        ip(host, "route replace 192.0.2.0/24 dev eth0 src 192.0.2.100 metric 100");
+        ip(host, "route replace default via 192.0.2.200 dev eth0 proto dhcp src 192.0.2.100 metric 100");
+    }
+    static SavedState before() {
+        SavedState saved = SavedState::of({kFile});
+        saved.calls = {{kFile}, {}, {"ifup eth0"}};
+        return saved;
+    }
+    static constexpr const char* kFile = "/etc/network/interfaces";
+    static constexpr const char* kStatic =
+        "ip address add 192.0.2.10/24 broadcast + dev eth0; "
+        "ip route add default via 192.0.2.1 metric 100";
+};
+
+HOST_TEST_F(LateLease, DoesNotStayBesideWhatComesBack) {
+    const std::string old = all(host);
+    const SavedState saved = before();
+    changeToLease(host);
+    const SavedState left = saved.again();
+    lease(host);
+    EXPECT_THAT(takeBack(saved, &left, saved.again()).notes, IsEmpty());
+    EXPECT_EQ(allAtLast(host, old), old);
+}
+
+/// The daemon has answered, and is at it.
+HOST_TEST_F(LateLease, IsWaitedForUntilItHasEnded) {
+    host.realTool("sleep");
+    host.tool("/usr/sbin/ifup eth0",
+              {"", 0, "", 0, "(sleep 0.3; " + endOf("192.0.2.100") + ") >/dev/null 2>&1 &"});
+    const std::string old = all(host);
+    const SavedState saved = before();
+    changeToLease(host);
+    const SavedState left = saved.again();
+    lease(host);
+    EXPECT_THAT(takeBack(saved, &left, saved.again()).notes, IsEmpty());
+    EXPECT_EQ(allAtLast(host, old), old);
+}
+
+/// Whoever has it has not been told of anything.
+HOST_TEST_F(LateLease, OfAnotherHandStays) {
+    const SavedState saved = before();
+    ip(host, "address add 192.0.2.77/24 dev eth0");
+    const SavedState left = saved.again();
+    lease(host);
+    EXPECT_THAT(takeBack(saved, &left, saved.again()).notes, IsEmpty());
+    const std::string now = all(host);
+    EXPECT_THAT(now, HasSubstr("192.0.2.100/24"));
+    EXPECT_THAT(now, HasSubstr("default via 192.0.2.200"));
+    EXPECT_THAT(now, testing::Not(HasSubstr("192.0.2.77")));
+}
+
+/// It asks for the lease anew, and would take one of the same second for no news.
+HOST_TEST_F(Network, ALeaseIsAsOldAsNetworkManagerWantsIt) {
+    host.realTool("sleep");
+    host.tool("/usr/bin/nmcli device reapply eth1",
+              {"", 0, "", 0,
+               "(sleep 0.3; ip address change 198.51.100.3/24 dev eth1 valid_lft 2500 preferred_lft 2500) "
+               ">/dev/null 2>&1 &"});
+    ip(host, "address change 198.51.100.3/24 dev eth1 valid_lft 3000 preferred_lft 3000");
+    const auto begin = std::chrono::steady_clock::now();
+    std::vector<std::string> notes;
+    cvagent::undo::runCalls({"nmcli device reapply eth1"}, notes);
+    EXPECT_THAT(notes, IsEmpty());
+    EXPECT_GE(std::chrono::steady_clock::now() - begin, std::chrono::milliseconds(1000));
+    const std::string addresses = ip(host, "-4 -o address show dev eth1");
+    EXPECT_THAT(addresses, testing::Not(HasSubstr("valid_lft 30"))) << "it was not waited for";
 }
 
 HOST_TEST_F(Network, KeepsWhatOthersHaveDoneSince) {
