@@ -166,7 +166,7 @@ void ChangeInMaking::beginStep() {
 /// What is there while somebody takes it back is not what the change has left.
 Journal ChangeInMaking::end() {
     bool isNothing = false;
-    const Journal ended = update([&](Journal& journal) {
+    Journal ended = update([&](Journal& journal) {
         if (journal.stage != Stage::saved && journal.stage != Stage::changing) {
             return false;
         }
