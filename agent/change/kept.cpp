@@ -173,7 +173,7 @@ std::string waitUntilInForce(const keep::Way& way, const keep::Link& link, const
     const Settled now = settled(link, wish, before);
     const bool isReload = std::ranges::find(way.callsAfter, undo::kNetworkdReload) != way.callsAfter.end();
     const bool isLate = isReload && !now.lacksLease && !links.waitUntilSetUp();
-    return (isLate ? ", but systemd-networkd has not set the interface up within ten seconds" : "") +
+    return (isLate ? ", but systemd-networkd has not set the interface up in time" : "") +
            (now.note.empty() ? "" : "; " + now.note);
 }
 

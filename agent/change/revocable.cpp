@@ -55,7 +55,10 @@ void Revocable::begin(const std::vector<MeantChange>& changes, const std::vector
 
 /// It is made all the same.
 void Revocable::giveUp(const std::string& reason) {
-    making_.reset();  // half of it would be worse
+    if (making_ && !seconds_) {
+        making_->forget();  // half of it would take away room, and the place of an older one
+    }
+    making_.reset();
     seconds_.reset();
     settings_.tell("the change cannot be taken back later: " + reason);
 }
@@ -109,8 +112,9 @@ bool Revocable::end(bool hasFailed) {
 }
 
 /// The guard takes for left what has no end in its journal.
-void Revocable::tellUnwritten(bool hasFailed, const std::string& reason) const {
+void Revocable::tellUnwritten(bool hasFailed, const std::string& reason) {
     if (!seconds_) {
+        making_->forget();
         settings_.tell("the change cannot be taken back later: " + reason);
         return;
     }
@@ -151,7 +155,10 @@ WriteResult writeRevocably(ChangedHost& host, const MeantChange& change, const R
     revocable.begin({change}, {});
     revocable.beginStep();
     WriteResult result = host.write(change.node, *change.row, change.words, request);
-    revocable.end(result.problem.has_value());
+    // What is made only after its time is the change's work as well: it has no end then.
+    if (!result.problem || result.problem->kind() != Problem::timedOut) {
+        revocable.end(result.problem.has_value());
+    }
     return result;
 }
 

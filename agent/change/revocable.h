@@ -40,7 +40,7 @@ private:
     void open(const std::vector<MeantChange>& changes, const std::vector<FileChange>& planned);
     void giveUp(const std::string& reason);
     void tellMade();
-    void tellUnwritten(bool hasFailed, const std::string& reason) const;
+    void tellUnwritten(bool hasFailed, const std::string& reason);
     bool isTakenBack();
 
     RevocableSettings settings_;

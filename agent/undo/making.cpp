@@ -109,13 +109,13 @@ ChangeInMaking::ChangeInMaking(const MakingSettings& settings)
           refuseBesideOthers(settings.place);
           return ChangeDirectory::make(settings.place);
       }()),
-      alive_(directory_.take(kAgentLock)),
-      inSteps_(directory_.take(kStepLock)),
       window_(std::min(settings.window, kLongestWindow)) {
     try {
+        alive_ = directory_.take(kAgentLock);
+        inSteps_ = directory_.take(kStepLock);
         save(settings);
     } catch (const ChangeError&) {
-        directory_.remove();  // half of it would take away room, and the place of an older one
+        forget();  // half of it would take away room, and the place of an older one
         throw;
     }
 }
@@ -180,13 +180,17 @@ Journal ChangeInMaking::end() {
         return !isNothing;
     });
     if (isNothing) {
-        directory_.remove();
+        forget();
     }
     return ended;
 }
 
 Journal ChangeInMaking::takeBack() {
     return takeChangeBack(directory_);
+}
+
+void ChangeInMaking::forget() {
+    directory_.remove();
 }
 
 void confirmChange(const ChangeDirectory& change) {

@@ -36,6 +36,8 @@ public:
     Journal end();
     /// A step has failed.
     Journal takeBack();
+    /// Nothing of it is known any more.
+    void forget();
 
 private:
     void save(const MakingSettings& settings);

@@ -33,7 +33,10 @@ std::uint32_t kernelsNow() {
 
 RenewedLease::RenewedLease(const std::string& link) : link_(if_nametoindex(link.c_str())), old_(stamp()) {
     constexpr std::uint32_t kOldEnough = 110;
-    while (old_ && kernelsNow() - *old_ < kOldEnough) {  // it wraps, as the stamp does
+    constexpr std::uint64_t kLongestUntilOld = 2000;  // one may be renewed every second
+    const std::uint64_t end = bootMilliseconds() + kLongestUntilOld;
+    while (old_ && kernelsNow() - *old_ < kOldEnough &&
+           bootMilliseconds() < end) {  // it wraps, as the stamp does
         std::this_thread::sleep_for(kBetweenRenewalLooks);
         old_ = stamp();
     }

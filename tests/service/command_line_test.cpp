@@ -194,7 +194,8 @@ HOST_TEST(ServiceClient, NeedsTheWholeProgramBesideIt) {
     std::filesystem::copy_file(QUICK_PROGRAM, "/srv/bin/cvagent");
     const Finished alone = host.run({"/srv/bin/cvagent", "--version"});
     EXPECT_EQ(alone.status, 1);
-    EXPECT_EQ(alone.err, "cvagent: cannot run '/srv/bin/../libexec/cvagent': No such file or directory\n");
+    EXPECT_THAT(alone.err, testing::MatchesRegex(
+                               "cvagent: cannot run '/.*/libexec/cvagent': No such file or directory\n"));
     const std::string libraries = host.run({"env", "LD_TRACE_LOADED_OBJECTS=1", QUICK_PROGRAM}).out;
     EXPECT_THAT(libraries, HasSubstr("libsystemd.so.0"));
     EXPECT_THAT(libraries, testing::Not(HasSubstr("libvantrelcvframework.so.1")));

@@ -2,6 +2,7 @@
 #include <gmock/gmock.h>
 
 #include <csignal>
+#include <filesystem>
 
 #include "tests/agent/linked_host.h"
 #include "tests/service/service_run.h"
@@ -252,6 +253,7 @@ HOST_TEST_F(ServiceTakesBack, NothingThatItCouldNotSave) {
     const bus::Connection own(ServiceRun::address());
     call::ask(own, ServiceRun::kComputer, call::kNode, "Write", call::write(kOwnerName, "z"));
     EXPECT_TRUE(isLogged("computer OwnerName: the change cannot be taken back later: "));
+    EXPECT_TRUE(std::filesystem::is_empty("/var/lib/corvista/changes")) << "half of a change";
 }
 
 HOST_TEST_F(ServiceTakesBack, ForNoTimeThatIsNone) {

@@ -9,6 +9,7 @@
 #include <unistd.h>
 
 #include <csignal>
+#include <filesystem>
 #include <nlohmann/json.hpp>
 
 #include "tests/agent/linked_host.h"
@@ -147,6 +148,22 @@ HOST_TEST_F(Confirmed, ASetOfWhatIsSoAlreadyIsForgotten) {
         EXPECT_EQ(cvagent(host, {"set", "ip-config:eth0", "IPv4Address", kNewAddress}).status, 0);
     }
     EXPECT_EQ(stages(host), "1 is kept, 2 is kept");
+}
+
+/// What comes of it after its time is its work, too, and not somebody else's.
+HOST_TEST_F(Confirmed, ASetThatTakesTooLongCanBeTakenBackWhole) {
+    std::filesystem::remove("/tools/hostname");
+    host.realTool("sleep");
+    host.file("/tools/hostname",
+              "#!/bin/sh\ncase $1 in slow*) exec sleep 1000;; esac\nexec /bin/hostname \"$@\"\n", 0755);
+    const Finished run =
+        cvagent(host, {"set", "ip-config:eth0", "HostName", "slow", "--command-timeout", "0.3"});
+    EXPECT_EQ(run.status, 1);
+    EXPECT_THAT(run.err, HasSubstr("timed out after 3 s: "));
+    EXPECT_EQ(stages(host), "1 was broken off");
+    host.file("/etc/HOSTNAME", "slow.example.com\n");
+    EXPECT_EQ(cvagent(host, {"rollback"}).out, "change 1 is taken back\n");
+    EXPECT_EQ(host.read("/etc/HOSTNAME"), "linux.example.com");
 }
 
 /// What nothing takes back is not saved, and nothing is told of it.

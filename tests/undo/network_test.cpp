@@ -3,6 +3,7 @@
 #include <linux/rtnetlink.h>
 
 #include <chrono>
+#include <filesystem>
 #include <sstream>
 
 #include "agent/undo/keeper_calls.h"
@@ -260,6 +261,23 @@ HOST_TEST_F(Network, ALeaseIsAsOldAsNetworkManagerWantsIt) {
     EXPECT_GE(std::chrono::steady_clock::now() - begin, std::chrono::milliseconds(1000));
     const std::string addresses = ip(host, "-4 -o address show dev eth1");
     EXPECT_THAT(addresses, testing::Not(HasSubstr("valid_lft 30"))) << "it was not waited for";
+}
+
+/// Some servers give one for two seconds.
+HOST_TEST_F(Network, NoLeaseIsWaitedForWithoutAnEnd) {
+    host.realTool("sleep");
+    host.tool("/usr/bin/nmcli device reapply eth1", ToolAnswer{});
+    host.file("/renew",
+              "for i in $(seq 1 400); do ip address change 198.51.100.3/24 dev eth1 valid_lft 2 "
+              "preferred_lft 2; sleep 0.05; done");
+    ip(host, "address change 198.51.100.3/24 dev eth1 valid_lft 2 preferred_lft 2");
+    host.run({"sh", "-c", "sh /renew >/dev/null 2>&1 & echo $! >/renewing"});
+    std::vector<std::string> notes;
+    cvagent::undo::runCalls({"nmcli device reapply eth1"}, notes);
+    const std::string renewing = "/proc/" + host.read("/renewing").value_or("");
+    EXPECT_TRUE(std::filesystem::exists(renewing.substr(0, renewing.find('\n'))))
+        << "it has not waited for the end";
+    EXPECT_THAT(notes, IsEmpty());
 }
 
 HOST_TEST_F(Network, KeepsWhatOthersHaveDoneSince) {

@@ -60,10 +60,17 @@ std::string timeText(std::uint64_t seconds) {
     return text;
 }
 
+/// Of a change whose agent has ended before it nobody writes how it ended.
+std::string stageOf(const ChangeDirectory& change, const Journal& journal) {
+    const bool isLeft =
+        journal.stage == undo::Stage::changing && !journal.isOpen() && !change.isTaken(undo::kAgentLock);
+    return isLeft ? "was broken off" : undo::stageText(journal.stage);
+}
+
 /// @return a line, and one for each thing that is not back
-std::string linesOf(unsigned number, const Journal& journal) {
-    std::string text = padded(std::to_string(number), 6) + timeText(journal.began) + "  " +
-                       padded(undo::stageText(journal.stage), 28) + printable(journal.summary) + "  (by " +
+std::string linesOf(const ChangeDirectory& change, const Journal& journal) {
+    std::string text = padded(std::to_string(change.number()), 6) + timeText(journal.began) + "  " +
+                       padded(stageOf(change, journal), 28) + printable(journal.summary) + "  (by " +
                        printable(journal.caller) + ")\n";
     for (const std::string& note : journal.notes) {
         text += "      " + printable(note) + "\n";
@@ -71,10 +78,10 @@ std::string linesOf(unsigned number, const Journal& journal) {
     return text;
 }
 
-Json objectOf(unsigned number, const Journal& journal) {
-    return {{"change", number},
+Json objectOf(const ChangeDirectory& change, const Journal& journal) {
+    return {{"change", change.number()},
             {"time", timeText(journal.began)},
-            {"stage", undo::stageText(journal.stage)},
+            {"stage", stageOf(change, journal)},
             {"summary", journal.summary},
             {"by", journal.caller},
             {"notes", journal.notes}};
@@ -153,12 +160,13 @@ ExitStatus listChanges(const Options& options) {
     const std::vector<unsigned> numbers = undo::changesIn(kChangesPlace);
     for (const unsigned number : numbers) {
         try {
-            if (const auto journal = ChangeDirectory(kChangesPlace, number).journal()) {
+            const ChangeDirectory change(kChangesPlace, number);
+            if (const auto journal = change.journal()) {
                 text +=
                     options.json
-                        ? objectOf(number, *journal).dump(-1, ' ', false, Json::error_handler_t::replace) +
+                        ? objectOf(change, *journal).dump(-1, ' ', false, Json::error_handler_t::replace) +
                               "\n"
-                        : linesOf(number, *journal);
+                        : linesOf(change, *journal);
             }
         } catch (const ChangeError& error) {
             complain("change " + std::to_string(number) + ": " + printable(error.what()));

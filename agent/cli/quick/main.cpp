@@ -24,7 +24,7 @@ namespace {
 using cvagent::ExitStatus;
 using cvagent::Options;
 
-/// Where it is not known where this program lies.
+/// For a copy that lies elsewhere, too.
 constexpr const char* kInstalled = CORVISTA_LIBEXECDIR "/cvagent";
 
 /// What the whole program finds out about a descriptor that is closed, it has to find out itself.
@@ -47,10 +47,7 @@ std::optional<ExitStatus> answerOfService(Options& options) {
 }
 
 std::string wholeProgram() {
-    const std::string here = cvagent::programDirectory();
-    return here.empty()
-               ? kInstalled
-               : cvagent::besideProgram({"../libexec"}, "cvagent").value_or(here + "/../libexec/cvagent");
+    return cvagent::besideProgram({"../libexec"}, "cvagent").value_or(kInstalled);
 }
 
 ExitStatus becomeWhole(char** words) {
