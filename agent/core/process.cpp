@@ -48,7 +48,9 @@ std::vector<std::string> PreparedProcess::keptPlaces(const ProcessSettings& sett
         places.push_back(*file);
     }
     const std::filesystem::path adapters = adapterDirectory().value_or("");
-    places.insert(places.end(), {programDirectory(), data_->path(), adapters.parent_path()});
+    // In a build tree the programs that it starts lie in the other one of its two directories.
+    const std::filesystem::path others = besideProgram({".."}, "agent").value_or("");
+    places.insert(places.end(), {programDirectory(), others, data_->path(), adapters.parent_path()});
     return places;
 }
 
